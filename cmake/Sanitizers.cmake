@@ -1,0 +1,7 @@
+# -DSANITIZE=address,undefined instruments everything that is built here.
+
+set(SANITIZE "" CACHE STRING "Sanitizers to build with, for example address,undefined")
+if(SANITIZE)
+  add_compile_options(-fsanitize=${SANITIZE} -fno-sanitize-recover=all -fno-omit-frame-pointer -g)
+  add_link_options(-fsanitize=${SANITIZE})
+endif()
