@@ -1,0 +1,11 @@
+// The constants behind the module's variables.
+
+#include "helpers/exported.h"
+#include "qexapi/types.h"
+
+extern "C" {
+
+EXPORTED extern qex_ModuleID const qex_ModuleCurrentID;
+qex_ModuleID const qex_ModuleCurrentID = 0;
+
+}  // extern "C"

@@ -1,0 +1,23 @@
+// The call trap: a library that gives up jumps back into the wrapper that called it, which raises
+// the exception that the library named. Readers and writers of fields call nothing and arm nothing.
+// Stands before every function that arms it.
+
+%{
+#include "vswitch/call_trap.h"
+%}
+
+// What the sprung trap leaves behind is deliberate: copies of text arguments may have been handed on
+// by the library that gave up, so nobody knows whether they are still in use.
+%exception {
+  exception_status = setjmp(exception_buffer);
+  if (exception_status != 0) {
+    PyErr_SetString(exceptionType, exceptionMsg);
+    return NULL;
+  }
+  $action
+}
+
+// For a function that must run outside the trap.
+%define %untrapped(NAME)
+%exception NAME "$action"
+%enddef

@@ -1,0 +1,67 @@
+// Records: one line each, then the header that declares them.
+//
+//   %record(VSInfo)               constructor, destructor, accessors, class registration
+//   %union_record(NAME)           likewise for a record that is declared as a union
+//
+// Stands before the headers; each %record line before the header of its record.
+
+// Constructors answer the raw pointer object, whatever class is registered: the class wraps it.
+%define %raw_result_of_constructor(NAME, TYPE)
+%typemap(out, noblock=1) TYPE *NAME {
+  %set_output(SWIG_NewPointerObj(%as_voidptr($1), $descriptor, SWIG_POINTER_NEW));
+}
+%enddef
+
+// Writers of a nested record copy the whole value, which therefore must be there.
+%define %nested_record(NAME)
+%typemap(memberin, noblock=1) NAME {
+  if (arg1) {
+    if (!$input) %argument_nullref("$type *", $symname, 2);
+    $1 = *$input;
+  }
+}
+%enddef
+
+// The class that shadows a record: pointers that calls and readers answer become its instances.
+%define %class_registration(NAME)
+%wrapper %{
+SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self), PyObject *args) {
+  PyObject *cls = NULL;
+  if (!PyArg_UnpackTuple(args, "swigregister", 1, 1, &cls)) return NULL;
+  SWIG_TypeNewClientData(SWIGTYPE_p_##NAME, SWIG_NewClientData(cls));
+  return SWIG_Py_Void();
+}
+%}
+%native(NAME##_swigregister) PyObject *_wrap_##NAME##_swigregister(PyObject *, PyObject *);
+%enddef
+
+%define %record(NAME)
+%raw_result_of_constructor(NAME, NAME)
+%raw_result_of_constructor(NAME, struct NAME)
+%nested_record(NAME)
+%class_registration(NAME)
+%enddef
+
+%define %union_record(NAME)
+%raw_result_of_constructor(NAME, NAME)
+%raw_result_of_constructor(NAME, union NAME)
+%nested_record(NAME)
+%class_registration(NAME)
+%enddef
+
+// Readers and methods need a real record.
+%typemap(check, noblock=1) SWIGTYPE *self {
+  if (!accepts_null_record("$symname") && !$1) {
+    %argument_nullref("$type", $symname, $argnum);
+  }
+}
+
+// Writers of arrays: the declared number of elements is copied, none for an array of size 0. Writers
+// of any kind store nothing into a null record.
+%typemap(memberin, noblock=1) SWIGTYPE [ANY], SWIGTYPE [ANY][ANY] {
+  if (arg1) {
+    if (!$input) %variable_nullref("$type", "$name");
+    memcpy($1, $input, sizeof($1));
+  }
+}
+

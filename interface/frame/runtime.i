@@ -1,0 +1,59 @@
+// The wrapper runtime, where the stock one is not what this module promises.
+// Stands before everything that generates a wrapper.
+
+%{
+#include "helpers/conversions.h"
+#include "helpers/failures.h"
+%}
+
+// Counting arguments is the interpreter's business: on another count than the right one its own
+// parser raises its own error. On the right one the items are taken straight from the tuple.
+%insert("runtime") %{
+#define TAKE_0(args) (void)0
+#define TAKE_1(args, a) *(a) = PyTuple_GET_ITEM(args, 0)
+#define TAKE_2(args, a, b) TAKE_1(args, a), *(b) = PyTuple_GET_ITEM(args, 1)
+#define TAKE_3(args, a, b, c) TAKE_2(args, a, b), *(c) = PyTuple_GET_ITEM(args, 2)
+#define TAKE_4(args, a, b, c, d) TAKE_3(args, a, b, c), *(d) = PyTuple_GET_ITEM(args, 3)
+#define TAKE_5(args, a, b, c, d, e) TAKE_4(args, a, b, c, d), *(e) = PyTuple_GET_ITEM(args, 4)
+#define TAKE_6(args, a, b, c, d, e, f) TAKE_5(args, a, b, c, d, e), *(f) = PyTuple_GET_ITEM(args, 5)
+#define TAKE_7(args, a, b, c, d, e, f, g) \
+  TAKE_6(args, a, b, c, d, e, f), *(g) = PyTuple_GET_ITEM(args, 6)
+#define TAKE_8(args, a, b, c, d, e, f, g, h) \
+  TAKE_7(args, a, b, c, d, e, f, g), *(h) = PyTuple_GET_ITEM(args, 7)
+
+#define PyArg_UnpackTuple(args, method, least, most, ...)                   \
+  (PyTuple_GET_SIZE(args) == (most) ? (TAKE_##most(args, ##__VA_ARGS__), 1) \
+                                    : wrong_argument_count(args, method, most))
+%}
+
+// A module that cannot be created must leave the interpreter's error standing; the stock start-up
+// goes on with the null pointer.
+%insert("init") %{
+#undef PyModule_Create
+#define PyModule_Create(definition) \
+  PyModule_Create2(definition, PYTHON_API_VERSION); if (!m) return NULL
+%}
+
+// The helper with which shadow classes turn flat functions into methods. It takes one object and no
+// argument tuple, which no directive can express, so it joins the module here.
+%insert("header") %{
+SWIGINTERN PyObject *instance_method_new(PyObject *SWIGUNUSEDPARM(self), PyObject *function) {
+  return PyInstanceMethod_New(function);
+}
+
+static PyMethodDef runtime_methods[] = {
+  {"SWIG_PyInstanceMethod_New", instance_method_new, METH_O, NULL},
+  {NULL, NULL, 0, NULL}
+};
+%}
+%init %{
+  if (PyModule_AddFunctions(m, runtime_methods) < 0) return NULL;
+%}
+
+// A null where a record is needed is a wrong value, not a wrong type.
+#undef %argument_nullref
+#define %argument_nullref(type, name, argn) \
+  SWIG_exception_fail(SWIG_ValueError, %argnullref_fmt(type, name, argn))
+#undef %variable_nullref
+#define %variable_nullref(type, name) \
+  SWIG_exception_fail(SWIG_ValueError, %varnullref_fmt(type, name))
