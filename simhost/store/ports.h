@@ -1,0 +1,39 @@
+// The rows of the ports and of the host's uplinks, which sit at uplink ports or are free.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "store/switches.h"
+
+namespace simhost::store {
+
+/// The numeric id of a port: never 0, unique on the host, never given to a second port.
+enum class PortNumber : std::uint32_t {};
+
+enum class PortKind { client, uplink };
+
+/// Adds a port; nothing if the switch has one of that identifier.
+std::optional<PortNumber> add_port(Transaction &transaction, SwitchKey switch_key,
+                                   std::string_view identifier, PortKind kind);
+/// How many ports of that kind the switch has.
+std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKind kind);
+
+struct AttachedUplink {
+  std::string name;
+  PortNumber port;
+};
+
+/// Adds a free uplink to the host. Its name is unique there.
+void add_uplink(Transaction &transaction, std::string_view name);
+/// The free uplinks of the host, in the order in which they were added.
+std::vector<std::string> free_uplinks(Transaction &transaction);
+/// Puts an uplink at an uplink port.
+void attach_uplink(Transaction &transaction, std::string_view name, PortNumber port);
+/// The uplinks at the ports of a switch, in the order of the ports.
+std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switch_key);
+
+}  // namespace simhost::store

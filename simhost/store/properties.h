@@ -1,0 +1,44 @@
+// The rows of the properties: bytes under a name, per switch, per switch on this host, or per port.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <string_view>
+#include <vector>
+
+#include "store/ports.h"
+
+namespace simhost::store {
+
+enum class PropertyScope { global = 0, host = 1, port = 2 };
+
+/// What a property belongs to.
+struct PropertyOwner {
+  static PropertyOwner global(SwitchKey key) { return {key, PropertyScope::global, std::nullopt}; }
+  static PropertyOwner host(SwitchKey key) { return {key, PropertyScope::host, std::nullopt}; }
+  static PropertyOwner port(SwitchKey key, PortNumber port) {
+    return {key, PropertyScope::port, port};
+  }
+
+  SwitchKey switch_key;
+  PropertyScope scope;
+  std::optional<PortNumber> port_number;
+};
+
+/// What becomes of a property when the host restarts, with the numbers that callers use.
+enum class PropertyType : std::uint32_t { transient = 4, policy = 8, config = 16, runtime = 32 };
+
+struct Property {
+  PropertyType type;
+  std::vector<std::byte> value;
+};
+
+/// Sets a property, its type included, whether or not it was there.
+void put_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name,
+                  std::span<std::byte const> value, PropertyType type);
+std::optional<Property> find_property(Transaction &transaction, PropertyOwner const &owner,
+                                      std::string_view name);
+
+}  // namespace simhost::store

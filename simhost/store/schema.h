@@ -1,0 +1,16 @@
+// The tables of a state file, and the marks by which one is recognised.
+#pragma once
+
+#include <cstdint>
+
+namespace simhost::store {
+
+/// "VSim": no other program's database carries it.
+inline constexpr std::int64_t kApplicationId = 0x5653696D;
+/// Rises with every change of the tables; a file of another version is refused, not converted.
+inline constexpr std::int64_t kSchemaVersion = 1;
+
+/// Creates the tables of an empty database.
+extern char const *const kSchema;
+
+}  // namespace simhost::store
