@@ -1,0 +1,81 @@
+// What each kind of failure looks like from outside.
+#include "core/boundary.h"
+
+#include <SQLiteCpp/Exception.h>
+#include <sqlite3.h>
+
+#include <new>
+#include <optional>
+
+#include "store/store.h"
+
+namespace simhost {
+namespace {
+
+// The status for a failure of the state file that a caller may wait out or put right.
+std::optional<QEX_ReturnStatus> status_of(SQLite::Exception const &error) {
+  switch (error.getErrorCode()) {
+    case SQLITE_BUSY:
+      return QEX_BUSY;
+    case SQLITE_FULL:
+      return QEX_NO_SPACE;
+    case SQLITE_IOERR:
+      return QEX_IO_ERROR;
+    case SQLITE_NOMEM:
+      return QEX_NO_MEMORY;
+    case SQLITE_READONLY:
+      return QEX_READ_ONLY;
+    default:
+      return std::nullopt;
+  }
+}
+
+void answer_with(Ending &ending, QEX_ReturnStatus status) {
+  ending.status = status;
+  ending.gives_up = false;
+}
+
+void give_up(Ending &ending, PanicKind kind, char const *call, char const *message) {
+  ending.gives_up = true;
+  describe(ending.report, kind, call, message);
+}
+
+}  // namespace
+
+void end_with_status(Ending &ending, char const *call) noexcept {
+  try {
+    throw;
+  } catch (Refused const &refused) {
+    answer_with(ending, refused.status());
+  } catch (HostPanic const &panic) {
+    give_up(ending, panic.kind(), call, panic.what());
+  } catch (store::UnusableState const &error) {
+    give_up(ending, PanicKind::os_error, call, error.what());
+  } catch (SQLite::Exception const &error) {
+    if (auto const status = status_of(error)) {
+      answer_with(ending, *status);
+    } else {
+      give_up(ending, PanicKind::os_error, call, error.what());
+    }
+  } catch (std::bad_alloc const &) {
+    answer_with(ending, QEX_NO_MEMORY);
+  } catch (std::exception const &error) {
+    give_up(ending, PanicKind::runtime_error, call, error.what());
+  } catch (...) {
+    give_up(ending, PanicKind::runtime_error, call, "the simulated host failed");
+  }
+}
+
+void end_without_status(Ending &ending, char const *call) noexcept {
+  try {
+    throw;
+  } catch (HostPanic const &panic) {
+    give_up(ending, panic.kind(), call, panic.what());
+  } catch (std::exception const &error) {
+    give_up(ending, PanicKind::runtime_error, call, error.what());
+  } catch (...) {
+    give_up(ending, PanicKind::runtime_error, call, "the simulated host failed");
+  }
+}
+
+}  // namespace simhost

@@ -1,0 +1,40 @@
+// One call of the host, from its entry to its answer.
+#pragma once
+
+#include <memory>
+
+#include "core/api.h"
+
+namespace simhost::store {
+class Transaction;
+}
+
+namespace simhost {
+
+class Ledger;
+
+/// Holds the host's lock for its whole life, so none of the caller's code may run meanwhile. What
+/// it changed in the state is undone when it goes without complete().
+class SIMHOST_API Call {
+ public:
+  /// `name` is a literal.
+  explicit Call(char const *name);
+  ~Call();
+  Call(Call const &) = delete;
+  Call &operator=(Call const &) = delete;
+
+  [[nodiscard]] char const *name() const { return name_; }
+  /// The call's one transaction on the state, for a call that only reads or for one that changes
+  /// it.
+  store::Transaction &reading();
+  store::Transaction &changing();
+  Ledger &ledger();
+  /// Makes the changes last.
+  void complete();
+
+ private:
+  char const *name_;
+  std::unique_ptr<store::Transaction> transaction_;
+};
+
+}  // namespace simhost

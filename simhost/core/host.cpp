@@ -1,0 +1,69 @@
+// One host per process, through forks and up to its end.
+#include "core/host.h"
+
+#include <pthread.h>
+
+#include <cstdlib>
+
+#include "core/fresh_host.h"
+
+namespace simhost {
+namespace {
+
+// An open state file must not cross a fork: file locks stay with the parent while the child's copy
+// of the connection believes to hold them, and the log would be deleted under the child's feet. So
+// it is closed before, and each side opens it again when it needs it.
+void before_fork() {
+  this_host().lock().lock();
+  this_host().close_state_file();
+}
+
+void after_fork() {
+  this_host().lock().unlock();
+}
+
+// Closing the last connection folds the log into the state file, so that the file alone is the
+// state when no process uses it.
+struct CloseAtExit {
+  ~CloseAtExit() {
+    std::scoped_lock const held(this_host().lock());
+    this_host().close_state_file();
+  }
+};
+
+Host *new_host() {
+  pthread_atfork(before_fork, after_fork, after_fork);
+  return new Host;
+}
+
+}  // namespace
+
+store::Store &Host::state() {
+  if (!configured_) {
+    if (char const *const named = std::getenv("SIMHOST_STATE");
+        named != nullptr && *named != '\0') {
+      // Absolute, because it may be opened again after the process has changed its directory.
+      state_file_ = std::filesystem::absolute(named);
+    }
+    configured_ = true;
+  }
+  if (!state_) {
+    state_.emplace(state_file_, furnish_fresh_host);
+  }
+  return *state_;
+}
+
+void Host::close_state_file() {
+  if (state_file_) {
+    state_.reset();
+  }
+}
+
+Host &this_host() {
+  // Never destroyed: other threads and the exit handlers of others may still call.
+  static Host &host = *new_host();
+  static CloseAtExit const close_at_exit;
+  return host;
+}
+
+}  // namespace simhost

@@ -1,0 +1,71 @@
+// Recording what is given out, and catching what comes back wrongly.
+#include "core/ledger.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdio>
+#include <iterator>
+#include <string>
+
+#include "core/giving_up.h"
+
+namespace simhost {
+namespace {
+
+constexpr std::size_t kRememberedReturns = 1024;
+
+std::string text_of(void const *address) {
+  std::array<char, 2 + (2 * sizeof address) + 1> text;
+  auto const length = std::snprintf(text.data(), text.size(), "%p", address);
+  return {text.data(), static_cast<std::size_t>(length)};
+}
+
+}  // namespace
+
+void *Ledger::give_out(std::size_t size, char const *call) {
+  blocks_.push_back({std::make_unique<std::byte[]>(size), size, call});
+  auto const block = std::prev(blocks_.end());
+  by_address_.emplace(block->memory.get(), block);
+  return block->memory.get();
+}
+
+void Ledger::take_back(void *memory, char const *call) {
+  if (memory == nullptr) {
+    return;
+  }
+  if (auto const found = by_address_.find(memory); found != by_address_.end()) {
+    auto const block = found->second;
+    returns_.push_back({memory, block->giver, call});
+    if (returns_.size() > kRememberedReturns) {
+      returns_.pop_front();
+    }
+    by_address_.erase(found);
+    blocks_.erase(block);
+    return;
+  }
+  auto const last = std::find_if(returns_.rbegin(), returns_.rend(),
+                                 [&](Return const &past) { return past.address == memory; });
+  if (last == returns_.rend()) {
+    throw HostPanic(PanicKind::runtime_error,
+                    "the host never gave out the memory at " + text_of(memory));
+  }
+  throw HostPanic(PanicKind::runtime_error, "the memory at " + text_of(memory) +
+                                                " is given back twice: " + last->giver +
+                                                " gave it out, " + last->taker + " took it back");
+}
+
+std::size_t Ledger::report(std::span<char> text) const noexcept {
+  std::size_t length = 0;
+  for (auto const &block : blocks_) {
+    auto const room = text.subspan(std::min(length, text.size()));
+    length += static_cast<std::size_t>(
+        std::snprintf(room.data(), room.size(), "%p %zu bytes from %s\n",
+                      static_cast<void *>(block.memory.get()), block.size, block.giver));
+  }
+  if (length == 0 && !text.empty()) {
+    text[0] = '\0';
+  }
+  return length;
+}
+
+}  // namespace simhost

@@ -1,0 +1,47 @@
+// The memory that the host has given out to its callers and not got back.
+#pragma once
+
+#include <cstddef>
+#include <deque>
+#include <list>
+#include <memory>
+#include <span>
+#include <unordered_map>
+
+#include "core/api.h"
+
+namespace simhost {
+
+/// Owns the blocks until they are given back. Names of calls are literals and are not copied.
+class Ledger {
+ public:
+  /// Gives out `size` bytes of zeros in the name of `call`. Throws std::bad_alloc.
+  SIMHOST_API void *give_out(std::size_t size, char const *call);
+  /// Frees what was given out, whichever call gave it; null does nothing. Throws HostPanic for a
+  /// pointer that was never given out, or is back already.
+  SIMHOST_API void take_back(void *memory, char const *call);
+
+  [[nodiscard]] std::size_t count() const { return blocks_.size(); }
+  /// Writes one line per block, oldest first, and a NUL into `text`, cut at its size. Returns the
+  /// length of the whole report without the NUL.
+  std::size_t report(std::span<char> text) const noexcept;
+
+ private:
+  struct Block {
+    std::unique_ptr<std::byte[]> memory;
+    std::size_t size;
+    char const *giver;
+  };
+  struct Return {
+    void const *address;
+    char const *giver;
+    char const *taker;
+  };
+
+  std::list<Block> blocks_;  // oldest first
+  std::unordered_map<void const *, std::list<Block>::iterator> by_address_;
+  // Addresses come back to life with the next allocation, so this is asked only for the dead ones.
+  std::deque<Return> returns_;
+};
+
+}  // namespace simhost

@@ -1,0 +1,44 @@
+// Switches of the host: their life, their MTU, what they tell about themselves.
+// A function that takes an alias refuses one that no switch has (QEX_NOT_FOUND).
+#pragma once
+
+#include <cstdint>
+#include <string_view>
+#include <vector>
+
+#include "core/api.h"
+#include "store/ports.h"
+#include "vswitch/switch_info.h"
+
+namespace simhost {
+
+/// What a new switch is to be. An empty identifier or portset and a 0 leave the choice to the host.
+struct SwitchSpec {
+  std::string_view alias;
+  std::string_view identifier;
+  std::string_view portset;
+  std::uint32_t max_ports;
+  bool persistent;
+  std::uint32_t version;
+  std::uint32_t mtu;  ///< bytes
+  std::uint32_t uplink_count;
+};
+
+/// Creates a switch and attaches free uplinks to its uplink ports "uplink1", "uplink2", ... Refuses
+/// an empty alias and a number out of bounds (QEX_BAD_PARAM), a name too long (QEX_NAME_TOO_LONG),
+/// a name that is taken (QEX_EXISTS), and more uplinks than are free (QEX_NO_RESOURCES).
+SIMHOST_API void create_switch(store::Transaction &transaction, SwitchSpec const &spec);
+/// Destroys a switch with its ports and properties; its uplinks become free.
+SIMHOST_API void destroy_switch(store::Transaction &transaction, std::string_view alias);
+
+/// Sets the MTU in bytes; refuses one out of bounds (QEX_BAD_PARAM).
+SIMHOST_API void set_mtu(store::Transaction &transaction, std::string_view alias,
+                         std::uint32_t mtu);
+/// The MTU in bytes.
+SIMHOST_API std::uint32_t mtu_of(store::Transaction &transaction, std::string_view alias);
+SIMHOST_API VSInfo switch_info(store::Transaction &transaction, std::string_view alias);
+/// The uplinks of a switch, in the order of its uplink ports.
+SIMHOST_API std::vector<store::AttachedUplink> uplinks_of(store::Transaction &transaction,
+                                                          std::string_view alias);
+
+}  // namespace simhost

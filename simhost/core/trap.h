@@ -1,0 +1,28 @@
+// Springing the call trap.
+#pragma once
+
+#include <array>
+#include <string_view>
+
+#include "core/api.h"
+#include "core/giving_up.h"
+
+namespace simhost {
+
+/// Why the host gives up on a call. Plain memory: a jump may leave it behind.
+struct PanicReport {
+  PanicKind kind;
+  std::array<char, 1024> text;  ///< UTF-8 with its NUL
+};
+
+/// Writes "<call>: <message>" into the report: cut at its size between two characters, and with a
+/// "?" for each byte that is no UTF-8, because the interpreter refuses a text with such bytes.
+void describe(PanicReport &report, PanicKind kind, std::string_view call,
+              std::string_view message) noexcept;
+
+/// Raises the report in the interpreter that armed the trap. In a process without the module,
+/// writes it to standard error and aborts. The caller's frame must hold nothing that wants
+/// destroying.
+[[noreturn]] SIMHOST_API void spring_trap(PanicReport const &report) noexcept;
+
+}  // namespace simhost
