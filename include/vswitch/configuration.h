@@ -5,13 +5,26 @@
  * @file
  * Configuring distributed switches: VSDVS_*.
  *
- * Every call returns a status. Texts are NUL-terminated UTF-8 and are only read. A switch is named
- * by its alias, a port by its distributed-port identifier, unless a parameter says otherwise. An
- * output is meaningful only with QEX_OK.
+ * Every call returns a status and reads or writes one property, whose key its group names. The
+ * arguments are the caller's; they are read during the call and not kept. Texts are NUL-terminated
+ * UTF-8. A switch is named by its alias and a port by its identifier, unless a parameter says
+ * otherwise; a name the host does not know is QEX_NOT_FOUND, a null where nothing allows it
+ * QEX_BAD_PARAM. An output is meaningful only with QEX_OK. What an output pointer refers to was
+ * allocated by the library and goes back through VSDVS_FreeMemory.
  */
 
+#include "qexapi/names.h"
 #include "qexapi/status.h"
+#include "qexapi/switch_ports.h"
 #include "qexapi/types.h"
+#include "vswitch/mac_learning.h"
+#include "vswitch/mcast_filter_modes.h"
+#include "vswitch/mirror.h"
+#include "vswitch/port_mac_policies.h"
+#include "vswitch/port_policies.h"
+#include "vswitch/private_vlans.h"
+#include "vswitch/teaming.h"
+#include "vswitch/uplinks.h"
 
 #ifdef __cplusplus
 extern "C" {
@@ -36,14 +49,212 @@ QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
                                      qex_Bool persistent, qex_uint32 version, qex_uint32 mtu,
                                      qex_uint32 uplinkCount);
 
-/** Destroys a switch with its ports and properties; QEX_NOT_FOUND if there is none. */
+/** Destroys a switch with its ports and properties. */
 QEX_ReturnStatus VSDVS_DestroyVSwitch(char const *switchName);
 
-/** Reads the MTU of a switch, in bytes, into `mtu`, which the caller owns. */
+/**
+ * Adds a port to a switch.
+ *
+ * @param port identifier of the new port; QEX_EXISTS if it is taken
+ * @param connectId number that the port's client must show to connect; passed through unchanged
+ */
+QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_uint32 connectId);
+
+/**
+ * Adds a port that another system manages.
+ *
+ * @param port identifier of the new port; QEX_EXISTS if it is taken
+ * @param externalId the other system's name for it; passed through unchanged
+ */
+QEX_ReturnStatus VSDVS_AddOpaqueDVPort(char const *switchName, char const *port,
+                                       char const *externalId);
+
+/** Removes a port with its properties. */
+QEX_ReturnStatus VSDVS_RemoveDVPort(char const *switchName, char const *port);
+
+/** Puts the number that the running switch gave a port into `portID`. */
+QEX_ReturnStatus VSDVS_DvPortIDToPortID(char const *switchName, char const *port, int *portID);
+
+/** VSDVS_DvPortIDToPortID for a switch that is named by its identifier. */
+QEX_ReturnStatus VSDVS_DvPortIDToPortIDFromDVSID(char const *switchId, char const *port,
+                                                 int *portID);
+
+/** Writes the alias of a set of ports into `alias`: at most 128 bytes of text and a NUL. */
+QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *alias);
+
+/** Hands out the uplink ports of a switch, as names and as identifiers in the same order. */
+QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPorts **names,
+                                            VSUplinkPortIds **ids);
+
+/** Replaces the uplink ports of a switch; both lists hold as many entries. */
+QEX_ReturnStatus VSDVS_SetSwitchUplinkPorts(char const *switchName, VSUplinkPorts const *names,
+                                            VSUplinkPortIds const *ids);
+
+/** Attaches an uplink of the host to a switch; QEX_BUSY if another switch has it. */
+QEX_ReturnStatus VSDVS_AddSwitchUplinkPort(char const *switchName, char const *uplink);
+
+/** Takes an uplink from a switch. */
+QEX_ReturnStatus VSDVS_RemoveSwitchUplinkPort(char const *switchName, char const *uplink);
+
+/** Takes all uplinks from a switch. */
+QEX_ReturnStatus VSDVS_ClearSwitchUplinkPorts(char const *switchName);
+
+/** Reads the MTU of a switch, in bytes; VSPROP_MTU. */
 QEX_ReturnStatus VSDVS_GetMTU(char const *switchName, qex_uint32 *mtu);
 
 /** Sets the MTU of a switch: 1,280 to 9,190 bytes, else QEX_BAD_PARAM. */
 QEX_ReturnStatus VSDVS_SetMTU(char const *switchName, qex_uint32 mtu);
+
+/** Fills `policy` with the teaming of a switch; VSPROP_SWITCH_TEAMING. */
+QEX_ReturnStatus VSDVS_GetTeamingPolicy(char const *switchName, VSTeamPolicy *policy);
+
+/** Sets the teaming of a switch. */
+QEX_ReturnStatus VSDVS_SetTeamingPolicy(char const *switchName, VSTeamPolicy const *policy);
+
+/** Returns the teaming of a switch to the default. */
+QEX_ReturnStatus VSDVS_ClearTeamingPolicy(char const *switchName);
+
+/** VSDVS_GetTeamingPolicy for a switch that is named by its identifier. */
+QEX_ReturnStatus VSDVS_GetTeamingPolicyFromDVSID(char const *switchId, VSTeamPolicy *policy);
+
+/** Fills `policy` with the teaming of a port; VSPROP_PORT_TEAMING_POLICY. */
+QEX_ReturnStatus VSDVS_GetPortTeamingPolicy(char const *switchName, char const *port,
+                                            VSTeamPolicy *policy);
+
+/** Sets the teaming of a port. */
+QEX_ReturnStatus VSDVS_SetPortTeamingPolicy(char const *switchName, char const *port,
+                                            VSTeamPolicy const *policy);
+
+/** Returns a port to the teaming of its switch. */
+QEX_ReturnStatus VSDVS_ClearPortTeamingPolicy(char const *switchName, char const *port);
+
+/**
+ * Reads the uplink port that a port uses whatever its teaming says; VSPROP_PORT_TEAMING_OVERRIDE.
+ *
+ * @param overrideName room for 82 bytes: at most 81 bytes of text and a NUL
+ */
+QEX_ReturnStatus VSDVS_GetPortTeamingOverride(char const *switchName, char const *port,
+                                              char *overrideName);
+
+/** Binds a port to an uplink port whatever its teaming says. */
+QEX_ReturnStatus VSDVS_SetPortTeamingOverride(char const *switchName, char const *port,
+                                              char const *overrideName);
+
+/** Returns a port to its teaming. */
+QEX_ReturnStatus VSDVS_ClearPortTeamingOverride(char const *switchName, char const *port);
+
+/** Reads whether all that a port sends goes out of an uplink; VSPROP_PORT_TX_UPLINK. */
+QEX_ReturnStatus VSDVS_GetTxUplinkAlways(char const *switchName, char const *port,
+                                         qex_Bool *enabled);
+
+/** Sets whether all that a port sends goes out of an uplink. */
+QEX_ReturnStatus VSDVS_SetTxUplinkAlways(char const *switchName, char const *port,
+                                         qex_Bool enabled);
+
+/** Fills `learning` with the MAC learning of a switch; VSPROP_SWITCH_MAC_LEARNING. */
+QEX_ReturnStatus VSDVS_GetMACLearning(char const *switchName, VSMACLearning *learning);
+
+/** Sets the MAC learning of a switch. */
+QEX_ReturnStatus VSDVS_SetMACLearning(char const *switchName, VSMACLearning const *learning);
+
+/** Returns the MAC learning of a switch to the default. */
+QEX_ReturnStatus VSDVS_ClearMACLearning(char const *switchName);
+
+/** Fills `learning` with the MAC learning of a port. */
+QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *port,
+                                          VSPMACLearning *learning);
+
+/** Sets the MAC learning of a port. */
+QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *port,
+                                          VSPMACLearning const *learning);
+
+/** Fills `security` with the security policy of a port; VSPROP_PORT_SECURITY. */
+QEX_ReturnStatus VSDVS_GetPortSecurity(char const *switchName, char const *port,
+                                       VSPropSecurity *security);
+
+/** Sets the security policy of a port. */
+QEX_ReturnStatus VSDVS_SetPortSecurity(char const *switchName, char const *port,
+                                       VSPropSecurity const *security);
+
+/** Fills `filter` with the extra frames a port accepts; VSPROP_PORT_EXTRA_ETH_FRP. */
+QEX_ReturnStatus VSDVS_GetExtraEthFilter(char const *switchName, char const *port,
+                                         VSExtraEthFilter *filter);
+
+/** Sets the extra frames a port accepts. */
+QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *port,
+                                         VSExtraEthFilter const *filter);
+
+/** Leaves a port with the frames for its client. */
+QEX_ReturnStatus VSDVS_ClearExtraEthFilter(char const *switchName, char const *port);
+
+/** Reads whether a port takes the frames that no other port of its switch takes. */
+QEX_ReturnStatus VSDVS_IsSinkPortEnabled(char const *switchName, char const *port,
+                                         qex_Bool *enabled);
+
+/** Sets whether a port takes the frames that no other port of its switch takes. */
+QEX_ReturnStatus VSDVS_ConfigureSinkPort(char const *switchName, char const *port,
+                                         qex_Bool enabled);
+
+/** Puts the VSMcastFilterMode of a switch into `mode`; VSPROP_MULTICAST_FILTER. */
+QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode);
+
+/** Sets how a switch filters multicast. */
+QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode);
+
+/** Hands out the VLANs of a port, and its priority; VSPROP_PORT_VLAN, VSPROP_PORT_PRIORITY. */
+QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *port,
+                                         VSPortVlanPolicy **policy, int *priority);
+
+/**
+ * Sets the VLANs of a port.
+ *
+ * The module passes every argument through unchanged.
+ *
+ * @param vlanID VLAN of untagged frames; 0 is none
+ * @param priority priority of the port's frames, 0 to 7; -1 leaves it to the frames
+ * @param guestTagging whether the client tags its frames itself, with VLANs of the ranges
+ * @param privateVlan whether `vlanID` is a secondary VLAN of the switch's private-VLAN map
+ * @param ranges the VLANs of a trunk; null with none
+ * @param numRanges how many ranges
+ */
+QEX_ReturnStatus VSDVS_SetPortVLANPolicy(char const *switchName, char const *port,
+                                         qex_uint16 vlanID, int priority, qex_Bool guestTagging,
+                                         qex_Bool privateVlan, qex_NEBPortVIDRange *ranges,
+                                         qex_uint16 numRanges);
+
+/** Takes a port out of all VLANs. */
+QEX_ReturnStatus VSDVS_ClearPortVLANPolicy(char const *switchName, char const *port);
+
+/** Reads whether the client of a port may nest its VLAN tags; VSPROP_PORT_VLAN_NESTEDTAG. */
+QEX_ReturnStatus VSDVS_GetPortNestedVLANTagging(char const *switchName, char const *port,
+                                                qex_Bool *enabled);
+
+/** Sets whether the client of a port may nest its VLAN tags. */
+QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char const *port,
+                                                qex_Bool enabled);
+
+/** Hands out the private-VLAN map of a switch as an array of `count` entries; VSPROP_PVLAN_MAP. */
+QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry **entries,
+                                         int *count);
+
+/** Replaces the private-VLAN map of a switch; null with a count of 0 empties it. */
+QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry const *entries,
+                                         int count);
+
+/** Hands out the mirror sessions of a port; VSPROP_PORT_MIRROR_SESSIONS. */
+QEX_ReturnStatus VSDVS_GetDVMirrorSessions(char const *switchName, char const *port,
+                                           DVMirrorSessionTable **table);
+
+/** Adds the sessions of `table` to those of a port; QEX_EXISTS if an identifier is taken. */
+QEX_ReturnStatus VSDVS_AppendDVMirrorSessions(char const *switchName, char const *port,
+                                              DVMirrorSessionTable *table);
+
+/** Removes the session with the identifier `sid` from a port. */
+QEX_ReturnStatus VSDVS_RemoveDVMirrorSession(char const *switchName, char const *port,
+                                             char const sid[32]);
+
+/** Removes all mirror sessions from a port. */
+QEX_ReturnStatus VSDVS_ClearDVMirrorSessions(char const *switchName, char const *port);
 
 /**
  * Gives back memory that a VSDVS_* call handed out.

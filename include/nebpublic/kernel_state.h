@@ -1,0 +1,185 @@
+#ifndef NEBPUBLIC_KERNEL_STATE_H
+#define NEBPUBLIC_KERNEL_STATE_H
+
+/**
+ * @file
+ * The kernel's switches, ports and their properties: DVSQEX_*.
+ *
+ * Every call returns a status; a null where nothing allows it is QEX_BAD_PARAM. The arguments are
+ * the caller's; they are read during the call and not kept. Texts are NUL-terminated UTF-8. A
+ * switch is named by its identifier, a port by its own; a name the host does not know is
+ * QEX_NOT_FOUND. Lengths are bytes. The module passes every argument through unchanged.
+ *
+ * An output is meaningful only with QEX_OK. What an output pointer refers to was allocated by the
+ * library and goes back through DVSQEX_DataFree. `propertyType` is one of CONFIG_PROP_TYPE,
+ * RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and POLICY_PROP_TYPE; `propertyTypes` is a mask of them.
+ */
+
+#include "nebpublic/handles.h"
+#include "nebpublic/ports.h"
+#include "qexapi/status.h"
+#include "qexapi/types.h"
+
+#ifdef __cplusplus
+extern "C" {
+#endif
+
+/** Gives the kernel a state that DVSQEX_StateGet read; null with a length of 0 is an empty one. */
+QEX_ReturnStatus DVSQEX_StateInit(void *state, int length);
+
+/** Hands out the whole state. */
+QEX_ReturnStatus DVSQEX_StateGet(void **state, int *length);
+
+/** Hands out the part of the state that survives a restart of the host. */
+QEX_ReturnStatus DVSQEX_PersistentStateGet(void **state, int *length);
+
+/** Drops what the state holds of switches and ports that are gone. */
+QEX_ReturnStatus DVSQEX_StateSanitize(void);
+
+/** Empties the state. */
+QEX_ReturnStatus DVSQEX_StateCleanup(void);
+
+/**
+ * Gives back memory that a DVSQEX_* call handed out.
+ *
+ * @param data what the library allocated, once; null does nothing
+ */
+void DVSQEX_DataFree(void *data);
+
+/**
+ * Adds a switch.
+ *
+ * @param switchId identifier of the new switch; QEX_EXISTS if it is taken
+ * @param alias its name; QEX_EXISTS if it is taken
+ * @param maxPorts room for ports
+ */
+QEX_ReturnStatus DVSQEX_SwitchAdd(char const *switchId, char const *alias, qex_uint32 maxPorts,
+                                  NEBVersion version);
+
+/** Removes a switch with its ports and properties. */
+QEX_ReturnStatus DVSQEX_SwitchRemove(char const *switchId);
+
+/** Starts running a switch on this host. */
+QEX_ReturnStatus DVSQEX_SwitchAssociate(char const *switchId);
+
+/** Stops running a switch on this host; its state stays. */
+QEX_ReturnStatus DVSQEX_SwitchDissociate(char const *switchId);
+
+/** Sets the version of a switch. */
+QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion version);
+
+/** Sets how many ports a switch has room for. */
+QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts);
+
+/** Hands out the ports of one type. */
+QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type);
+
+/**
+ * Has a switch carry out a command of its own kind.
+ *
+ * @param command name of the command
+ * @param input what the command takes, `inputLength` bytes; null with a length of 0
+ * @param output receives what the command gives
+ * @param outputLength receives its length
+ */
+QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command, void *input,
+                                int inputLength, void **output, int *outputLength);
+
+/** Hands out the value of a global property of a switch. */
+QEX_ReturnStatus DVSQEX_GlobalPropGet(char const *switchId, char const *key, void **data,
+                                      int *length);
+
+/** Sets a global property of a switch; the type may change from one set to the next. */
+QEX_ReturnStatus DVSQEX_GlobalPropSet(char const *switchId, char const *key, void *data, int length,
+                                      qex_uint32 propertyType);
+
+/** Clears a global property of a switch. */
+QEX_ReturnStatus DVSQEX_GlobalPropClear(char const *switchId, char const *key);
+
+/** Hands out the value of a host property of a switch. */
+QEX_ReturnStatus DVSQEX_HostPropGet(char const *switchId, char const *key, void **data,
+                                    int *length);
+
+/** Sets a host property of a switch; the type may change from one set to the next. */
+QEX_ReturnStatus DVSQEX_HostPropSet(char const *switchId, char const *key, void *data, int length,
+                                    qex_uint32 propertyType);
+
+/** Clears a host property of a switch. */
+QEX_ReturnStatus DVSQEX_HostPropClear(char const *switchId, char const *key);
+
+/**
+ * Adds a port to a switch.
+ *
+ * @param port identifier of the new port; QEX_EXISTS if it is taken
+ * @param state a state that DVSQEX_PortStateGet or DVSQEX_PersistentPortStateGet gave, for the
+ *              port to start with; null with a length of 0 for none
+ */
+QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *state,
+                                int stateLength);
+
+/** Removes a port with its properties. */
+QEX_ReturnStatus DVSQEX_PortRemove(char const *switchId, char const *port);
+
+/** QEX_OK if the switch has the port. */
+QEX_ReturnStatus DVSQEX_PortFind(char const *switchId, char const *port);
+
+/** Hands out the port that another system knows as `externalId`. */
+QEX_ReturnStatus DVSQEX_PortGetByExternalId(char const *switchId, char const *externalId,
+                                            OpaqueDVPortData **port);
+
+/** Hands out the value of a property of a port. */
+QEX_ReturnStatus DVSQEX_PortDataGet(char const *switchId, char const *port, char const *key,
+                                    void **data, int *length);
+
+/** Sets a property of a port; the type may change from one set to the next. */
+QEX_ReturnStatus DVSQEX_PortDataSet(char const *switchId, char const *port, char const *key,
+                                    void *data, int length, qex_uint32 propertyType);
+
+/** Clears a property of a port. */
+QEX_ReturnStatus DVSQEX_PortDataClear(char const *switchId, char const *port, char const *key);
+
+/** Hands out all properties of a port. */
+QEX_ReturnStatus DVSQEX_PortStateGet(char const *switchId, char const *port, void **state,
+                                     int *length);
+
+/** Hands out the properties of a port that survive a restart, written for one version. */
+QEX_ReturnStatus DVSQEX_PersistentPortStateGet(char const *switchId, char const *port,
+                                               NEBVersion version, void **state, int *length);
+
+/** Hands out the value of a property of the uplink port with the number `portID`. */
+QEX_ReturnStatus DVSQEX_UplinkDataGet(char const *switchId, char const *key, qex_uint32 portID,
+                                      void **data, int *length);
+
+/** Sets a property of the uplink port with the number `portID`. */
+QEX_ReturnStatus DVSQEX_UplinkDataSet(char const *switchId, char const *key, qex_uint32 portID,
+                                      void *data, int length, qex_uint32 propertyType);
+
+/**
+ * Puts the global properties that this kind of switch adds into `list`.
+ *
+ * Here and in the calls below, the caller gives the list to DVSData_Free.
+ */
+QEX_ReturnStatus DVSQEX_VendorGlobalPropList(char const *switchId, DVSDataHandle *list,
+                                             qex_uint32 propertyTypes);
+
+/** Puts the host properties that this kind of switch adds into `list`. */
+QEX_ReturnStatus DVSQEX_VendorHostPropList(char const *switchId, DVSDataHandle *list,
+                                           qex_uint32 propertyTypes);
+
+/** Puts the properties that this kind of switch adds to a port into `list`. */
+QEX_ReturnStatus DVSQEX_VendorPortPropList(char const *switchId, char const *port,
+                                           DVSDataHandle *list, qex_uint32 propertyTypes);
+
+/** Puts the properties of a switch that no kind of switch knows into `list`. */
+QEX_ReturnStatus DVSQEX_ExtraConfigPropList(char const *switchId, DVSDataHandle *list,
+                                            qex_uint32 propertyTypes);
+
+/** Puts the properties of a port that no kind of switch knows into `list`. */
+QEX_ReturnStatus DVSQEX_ExtraConfigPortPropList(char const *switchId, char const *port,
+                                                DVSDataHandle *list, qex_uint32 propertyTypes);
+
+#ifdef __cplusplus
+}
+#endif
+
+#endif  // NEBPUBLIC_KERNEL_STATE_H
