@@ -1,0 +1,24 @@
+"""The contract tests need the recording host under the module, or they stop right here."""
+
+from typing import Iterator
+
+import _libvswitch  # noqa: F401 (the host is loaded by the module, so that it finds the trap)
+import pytest
+from recording_host import RecordingHost, WrongHost
+
+
+def pytest_sessionstart() -> None:
+    """Refuse to run on another host: its answers would prove nothing."""
+    try:
+        RecordingHost()
+    except WrongHost as error:
+        pytest.exit(f"contract tests: {error}", returncode=3)
+
+
+@pytest.fixture(name="host")
+def fixture_host() -> Iterator[RecordingHost]:
+    """Give each test the recording host with nothing recorded and nothing told."""
+    host = RecordingHost()
+    host.reset()
+    yield host
+    host.reset()

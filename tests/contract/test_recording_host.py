@@ -1,0 +1,80 @@
+"""The recording host itself: it replaces the host of an unchanged module, and it can tell."""
+
+import ctypes
+import os
+import subprocess
+import sys
+from pathlib import Path
+from typing import Dict, Optional
+
+import _libvswitch as vs
+import pytest
+from _pointers import pointer
+from recording_host import RecordingHost, loaded_files
+
+HERE = Path(__file__).parent
+BUILD = Path(os.environ["BUILD_DIR"])
+
+
+def run(*arguments: str, library_path: Optional[Path]) -> "subprocess.CompletedProcess[str]":
+    """Run Python with the host's libraries from that folder, or where the module leads to."""
+    environment: Dict[str, str] = dict(os.environ)
+    environment.pop("LD_LIBRARY_PATH")
+    if library_path:
+        environment["LD_LIBRARY_PATH"] = str(library_path)
+    command = [sys.executable, *arguments]
+    return subprocess.run(command, env=environment, capture_output=True, text=True, check=False)
+
+
+@pytest.mark.parametrize("folder", [None, "tests/recording_host"])
+def test_the_library_path_changes_the_host_under_an_unchanged_module(folder: str) -> None:
+    script = (
+        f"import sys; sys.path.insert(0, {str(HERE)!r}); import _libvswitch, recording_host as r;"
+        "print(_libvswitch.__file__, *r.loaded_files('libvswitch.so'))"
+    )
+    result = run("-c", script, library_path=BUILD / folder if folder else None)
+    library = BUILD / (folder or "simhost") / "libvswitch.so"
+    assert result.stdout.split() == [vs.__file__, str(library)], result.stderr
+
+
+def test_contract_tests_refuse_another_host() -> None:
+    result = run("-m", "pytest", "-p", "no:cacheprovider", str(HERE), library_path=None)
+    assert result.returncode == 3
+    assert "which is not the recording host" in result.stdout + result.stderr
+
+
+def test_this_process_runs_on_the_recording_host(host: RecordingHost) -> None:
+    assert loaded_files("libvswitch.so") == [BUILD / "tests/recording_host/libvswitch.so"]
+    assert host.functions["VSDVS_SetMTU"].parameters == ("const char*", "unsigned int")
+
+
+def test_rules_hold_for_the_nth_call_or_for_every_other(host: RecordingHost) -> None:
+    host.answer("VSDVS_SetMTU", 10)
+    host.answer("VSDVS_SetMTU", 20, nth=2)
+    host.spring("VSDVS_SetMTU", RuntimeError, "third", nth=3)
+    assert [vs.VSDVS_SetMTU("a", 1), vs.VSDVS_SetMTU("a", 2)] == [10, 20]
+    with pytest.raises(RuntimeError, match="^third$"):
+        vs.VSDVS_SetMTU("a", 3)
+    assert vs.VSDVS_SetMTU("a", 4) == 10
+    assert [call.values[1] for call in host.calls()] == [1, 2, 3, 4]
+
+    host.reset()
+    assert vs.VSDVS_SetMTU("a", 5) == 0
+    assert host.calls() == [("VSDVS_SetMTU", (b"a", 5))]
+
+
+def test_captured_memory_is_what_the_call_found(host: RecordingHost) -> None:
+    data = ctypes.create_string_buffer(b"before\0behind", 16)
+    host.capture("VSDVS_FreeMemory", 1, 16)
+    vs.VSDVS_FreeMemory(pointer("unsigned int *", ctypes.addressof(data)))
+    data.value = b"after"
+    assert host.details()[0].memory == (b"before\0behind\0\0\0",)
+
+
+def test_what_does_not_exist_cannot_be_told_anything(host: RecordingHost) -> None:
+    with pytest.raises(ValueError):
+        host.answer("VSDVS_NoSuchCall", 0)
+    with pytest.raises(ValueError):
+        host.capture("VSDVS_SetMTU", 3, 1)
+    with pytest.raises(ValueError):
+        host.spring("Panic", RuntimeError, "nowhere to go")
