@@ -1,5 +1,6 @@
 """The recording host itself: it replaces the host of an unchanged module, and it can tell."""
 
+import collections
 import ctypes
 import os
 import subprocess
@@ -78,3 +79,10 @@ def test_what_does_not_exist_cannot_be_told_anything(host: RecordingHost) -> Non
         host.capture("VSDVS_SetMTU", 3, 1)
     with pytest.raises(ValueError):
         host.spring("Panic", RuntimeError, "nowhere to go")
+
+
+def test_every_call_of_the_host_is_recorded(host: RecordingHost) -> None:
+    families = collections.Counter(name.split("_")[0] for name in host.functions)
+    assert families.pop("VSDVS") == 53
+    assert families.pop("VSQEX") == 26
+    assert sum(families.values()) == 67
