@@ -41,7 +41,7 @@ void declare(std::string_view function, std::string_view result,
              std::span<Parameter const> parameters) noexcept;
 
 /** Notes one call, fills its output parameters as told, and says what to answer. */
-Answer record(std::string_view function, std::span<Argument const> arguments) noexcept;
+Answer record(std::string_view name, std::span<Argument const> arguments) noexcept;
 
 /** Gives up on the call in progress, as record() was told; its frames hold nothing to destroy. */
 [[noreturn]] void spring() noexcept;

@@ -103,6 +103,7 @@ struct Declaration {
 
 }  // namespace recording
 
+// NOLINTBEGIN(bugprone-macro-parentheses): the arguments are names
 // A function cannot be defined from its type, but its symbol can be resolved to one that was. The
 // resolver runs while the library is being relocated, so it does nothing else.
 #define CALL(function)                                                                 \
@@ -114,5 +115,6 @@ struct Declaration {
   static recording::Declaration const declare_##function {                             \
     recording::Call<#function, decltype(function)> {}                                  \
   }
+// NOLINTEND(bugprone-macro-parentheses)
 
 #endif  // TESTS_CONTRACT_HOST_RECORDING_H
