@@ -1,0 +1,3 @@
+#define BIT_FIELD_TABLE bit_fields_in_c
+#define BIT_FIELD_COUNT bit_fields_in_c_count
+#include "bit_field_table.inc"
