@@ -6,8 +6,10 @@
 
 #include "headers.inc"
 
-#define SAME_TYPE(NAME, TYPE) \
-  static_assert(_Generic((NAME *)0, TYPE * : 1, default : 0), #NAME " names " #TYPE)
+// One variable may be declared twice only with one type.
+#define SAME_TYPE(NAME, TYPE)  \
+  extern NAME NAME##_variable; \
+  extern TYPE NAME##_variable
 
 // C cannot ask for the type of a bit field; that check is left to C++.
 #define FIELD_TYPE(RECORD, FIELD, TYPE) \

@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Writes the layout checks that the table of records calls for, valid in C and in C++.
 
-    generate.py CHECKS WRITERS
+    layout_checks.py CHECKS WRITERS
 
 CHECKS receives the assertions on sizes, offsets, widths and types. WRITERS receives, for each bit
 field, a line BIT_FIELD(record, field, type, ones, size, offset, first, count).
@@ -11,9 +11,7 @@ import sys
 from pathlib import Path
 from typing import Iterator, List
 
-sys.path.insert(0, str(Path(__file__).resolve().parent.parent / "surface"))
-
-import records as surface  # noqa: E402
+import records as surface
 
 
 def checks(record: surface.Record) -> Iterator[str]:
