@@ -56,18 +56,16 @@ consteval Parameter parameter() {
   }
 }
 
-/** Enumerations are C ints to the host; a value that no enumerator has must survive. */
+/** Enumerations cross as C ints, and may carry values that no enumerator has. */
 template <typename T>
-Argument seen(T const &value) {
+using Passed = std::conditional_t<std::is_enum_v<T>, int, T>;
+
+template <typename T>
+Argument seen(T value) {
   if constexpr (std::is_pointer_v<T>) {
     return {reinterpret_cast<std::uint64_t>(value)};
   } else {
-    using Integer = typename std::conditional_t<std::is_enum_v<T>, std::type_identity<int>,
-                                                std::type_identity<T>>::type;
-    Integer integer;
-    static_assert(sizeof integer == sizeof value);
-    std::memcpy(&integer, &value, sizeof integer);
-    return {static_cast<std::uint64_t>(static_cast<std::int64_t>(integer))};
+    return {static_cast<std::uint64_t>(static_cast<std::int64_t>(value))};
   }
 }
 
@@ -79,15 +77,15 @@ struct Call<name, Result(Parameters...)> {
   static constexpr std::array<Parameter, sizeof...(Parameters)> parameters{
       parameter<Parameters>()...};
 
-  static Result call(Parameters... arguments) {
+  static Passed<Result> call(Passed<Parameters>... arguments) {
     std::array<Argument, sizeof...(Parameters)> const all{seen(arguments)...};
     Answer const answer = record(name.text, all);
     if (answer.sprung) {
       spring();
     }
     if constexpr (!std::is_void_v<Result>) {
-      // Byte order makes the low bytes the first; an enumeration may carry any int.
-      Result result;
+      // Byte order makes the low bytes the first.
+      Passed<Result> result;
       std::memcpy(&result, &answer.bits, sizeof result);
       return result;
     }
@@ -108,7 +106,8 @@ struct Declaration {
 // resolver runs while the library is being relocated, so it does nothing else.
 #define CALL(function)                                                                 \
   extern "C" decltype(&function) resolve_##function() {                                \
-    return &recording::Call<#function, decltype(function)>::call;                      \
+    return reinterpret_cast<decltype(&function)>(                                      \
+        &recording::Call<#function, decltype(function)>::call);                        \
   }                                                                                    \
   extern "C" __attribute__((visibility("default"),                                     \
                             ifunc("resolve_" #function))) decltype(function) function; \
