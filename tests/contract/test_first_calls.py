@@ -19,14 +19,17 @@ CALLS: List[Tuple[str, Tuple[Any, ...]]] = [
     ("VSDVS_SetMTU", ("dvs0", 9000)),
     ("VSDVS_FreeMemory", (None,)),
     ("VSQEX_GetVSInfo", ("dvs0", None)),
+    ("VSQEX_GetUplinks", ("dvs0",)),
     ("VSQEX_FreeMemory", (None,)),
     ("QEX_ReturnStatusToString", (0,)),
 ]
-STATUS_CALLS = [
-    (call, arguments)
-    for call, arguments in CALLS
-    if call not in ("VSDVS_FreeMemory", "VSQEX_FreeMemory", "QEX_ReturnStatusToString")
-]
+OTHER_RESULTS = {
+    "VSDVS_FreeMemory",
+    "VSQEX_FreeMemory",
+    "VSQEX_GetUplinks",
+    "QEX_ReturnStatusToString",
+}
+STATUS_CALLS = [(call, arguments) for call, arguments in CALLS if call not in OTHER_RESULTS]
 
 
 @pytest.mark.parametrize("text", ["", "dvs0", "größe-\N{SNOWMAN}", "x" * 100_000, None])
@@ -101,6 +104,30 @@ def test_the_callers_record_is_passed_and_filled(host: RecordingHost) -> None:
     assert after == filled
     assert host.calls()[0] == ("VSQEX_GetVSInfo", (b"dvs0", int(info)))
     vs.delete_VSInfo(info)
+
+
+@pytest.mark.parametrize("status", STATUSES)
+def test_the_hosts_record_comes_with_the_status_whatever_that_is(
+    host: RecordingHost, status: int
+) -> None:
+    record = ctypes.create_string_buffer(64)
+    host.answer("VSQEX_GetUplinks", status, outputs={2: ctypes.addressof(record)})
+    result = vs.VSQEX_GetUplinks("dvs0")
+    assert type(result) is list
+    assert result[0] == status
+    assert int(result[1]) == ctypes.addressof(record)
+    assert "'VSUplinks *'" in repr(result[1])
+    assert not result[1].own()
+    assert len(result) == 2
+
+    (call,) = host.calls()
+    assert (call.function, call.values[0]) == ("VSQEX_GetUplinks", b"dvs0")
+    assert host.details()[0].types == ("const char*", "VSUplinks**")
+
+
+def test_a_null_record_of_the_host_is_none(host: RecordingHost) -> None:
+    host.answer("VSQEX_GetUplinks", 0x0BAD0003, outputs={2: 0})
+    assert vs.VSQEX_GetUplinks("dvs0") == [0x0BAD0003, None]
 
 
 @pytest.mark.parametrize("call", ["VSDVS_FreeMemory", "VSQEX_FreeMemory"])
