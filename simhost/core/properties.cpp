@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "core/giving_up.h"
+#include "vswitch/properties.h"
 
 namespace simhost {
 namespace {
@@ -19,6 +20,7 @@ struct Rule {
   bool (*accepts)(std::span<std::byte const> value);
 };
 
+// 4 bytes, host byte order.
 bool is_mtu(std::span<std::byte const> value) {
   std::uint32_t mtu = 0;
   if (value.size() != sizeof mtu) {
@@ -28,7 +30,7 @@ bool is_mtu(std::span<std::byte const> value) {
   return mtu >= kLeastMtu && mtu <= kGreatestMtu;
 }
 
-constexpr std::array kRules{Rule{.key = kMtuKey, .accepts = is_mtu}};
+constexpr std::array kRules{Rule{.key = VSPROP_MTU, .accepts = is_mtu}};
 
 }  // namespace
 

@@ -9,9 +9,6 @@
 
 namespace simhost {
 
-/// The key of a switch's MTU: 4 bytes, host byte order.
-inline constexpr std::string_view kMtuKey = "com.quorix.vswitch.mtu";
-
 /// Sets a property. Refuses bytes that the key does not allow (QEX_BAD_PARAM); a key without rules
 /// takes any.
 void set_property(store::Transaction &transaction, store::PropertyOwner const &owner,

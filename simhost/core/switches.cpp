@@ -14,6 +14,9 @@
 #include "store/properties.h"
 #include "store/store.h"
 #include "store/switches.h"
+#include "vswitch/device.h"
+#include "vswitch/mirror.h"
+#include "vswitch/properties.h"
 
 namespace simhost {
 namespace {
@@ -24,19 +27,20 @@ using store::SwitchName;
 constexpr std::uint32_t kDefaultMaxPorts = 128;
 constexpr std::uint32_t kGreatestMaxPorts = 65535;
 constexpr std::uint32_t kDefaultMtu = 1500;
-constexpr std::uint32_t kDefaultVersion = 200;
+constexpr std::uint32_t kDefaultVersion = VS_YKT_NEB_VERSION_20;
 
 // Bytes without the terminating NUL: what the fixed texts of the callers' records have room for.
 constexpr std::size_t kLongestAlias = sizeof(VSInfo::dvsName) - 1;
 constexpr std::size_t kLongestIdentifier = sizeof(VSInfo::nebID) - 1;
-constexpr std::size_t kLongestPortset = 127;
+constexpr std::size_t kLongestPortset = VS_PORTSET_NAME_MAX - 1;
 
 // VLAN 0 is "untagged" and 4095 is reserved.
 constexpr std::uint16_t kLeastVlan = 1;
 constexpr std::uint16_t kGreatestVlan = 4094;
 
-store::FoundSwitch known_switch(store::Transaction &transaction, std::string_view alias) {
-  auto found = store::find_switch(transaction, SwitchName::alias, alias);
+store::FoundSwitch known_switch(store::Transaction &transaction, std::string_view name,
+                                SwitchName kind = SwitchName::alias) {
+  auto found = store::find_switch(transaction, kind, name);
   if (!found) {
     throw Refused(QEX_NOT_FOUND);
   }
@@ -92,14 +96,14 @@ store::Switch row_of(store::Transaction &transaction, SwitchSpec const &spec) {
 }
 
 void store_mtu(store::Transaction &transaction, store::SwitchKey key, std::uint32_t mtu) {
-  set_property(transaction, PropertyOwner::global(key), kMtuKey, std::as_bytes(std::span(&mtu, 1)),
-               store::PropertyType::config);
+  set_property(transaction, PropertyOwner::global(key), VSPROP_MTU,
+               std::as_bytes(std::span(&mtu, 1)), store::PropertyType::config);
 }
 
 std::uint32_t stored_mtu(store::Transaction &transaction, store::SwitchKey key) {
   std::uint32_t mtu = kDefaultMtu;
   if (auto const property =
-          store::find_property(transaction, PropertyOwner::global(key), kMtuKey)) {
+          store::find_property(transaction, PropertyOwner::global(key), VSPROP_MTU)) {
     std::memcpy(&mtu, property->value.data(), sizeof mtu);
   }
   return mtu;
@@ -157,6 +161,18 @@ VSInfo switch_info(store::Transaction &transaction, std::string_view alias) {
   copy_name(info.dvsName, row.alias);
   copy_name(info.nebID, row.identifier);
   return info;
+}
+
+std::string identifier_of(store::Transaction &transaction, std::string_view alias) {
+  return known_switch(transaction, alias).row.identifier;
+}
+
+std::string portset_of(store::Transaction &transaction, std::string_view alias) {
+  return known_switch(transaction, alias).row.portset;
+}
+
+std::string alias_of_portset(store::Transaction &transaction, std::string_view portset) {
+  return known_switch(transaction, portset, SwitchName::portset).row.alias;
 }
 
 std::vector<store::AttachedUplink> uplinks_of(store::Transaction &transaction,

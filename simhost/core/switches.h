@@ -1,8 +1,9 @@
-// Switches of the host: their life, their MTU, what they tell about themselves.
-// A function that takes an alias refuses one that no switch has (QEX_NOT_FOUND).
+// Switches of the host: their life, their names, their MTU, what they tell about themselves.
+// A function that takes a name of a switch refuses one that no switch has (QEX_NOT_FOUND).
 #pragma once
 
 #include <cstdint>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -30,6 +31,11 @@ struct SwitchSpec {
 SIMHOST_API void create_switch(store::Transaction &transaction, SwitchSpec const &spec);
 /// Destroys a switch with its ports and properties; its uplinks become free.
 SIMHOST_API void destroy_switch(store::Transaction &transaction, std::string_view alias);
+
+/// From one name of a switch to another.
+SIMHOST_API std::string identifier_of(store::Transaction &transaction, std::string_view alias);
+SIMHOST_API std::string portset_of(store::Transaction &transaction, std::string_view alias);
+SIMHOST_API std::string alias_of_portset(store::Transaction &transaction, std::string_view portset);
 
 /// Sets the MTU in bytes; refuses one out of bounds (QEX_BAD_PARAM).
 SIMHOST_API void set_mtu(store::Transaction &transaction, std::string_view alias,

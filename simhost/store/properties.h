@@ -8,6 +8,7 @@
 #include <string_view>
 #include <vector>
 
+#include "nebpublic/property_types.h"
 #include "store/ports.h"
 
 namespace simhost::store {
@@ -27,8 +28,13 @@ struct PropertyOwner {
   std::optional<PortNumber> port_number;
 };
 
-/// What becomes of a property when the host restarts, with the numbers that callers use.
-enum class PropertyType : std::uint32_t { transient = 4, policy = 8, config = 16, runtime = 32 };
+/// What becomes of a property when the host restarts, by the numbers that callers use.
+enum class PropertyType : std::uint32_t {
+  config = CONFIG_PROP_TYPE,
+  runtime = RUNTIME_PROP_TYPE,
+  transient = VOLATILE_PROP_TYPE,
+  policy = POLICY_PROP_TYPE,
+};
 
 struct Property {
   PropertyType type;

@@ -1,0 +1,50 @@
+// From one name of a switch to another.
+#include "nebpublic/names.h"
+
+#include <algorithm>
+#include <string>
+
+#include "core/boundary.h"
+#include "core/switches.h"
+
+using simhost::answer;
+using simhost::Call;
+using simhost::required;
+using simhost::required_text;
+
+namespace {
+
+// Every name that the host accepts fits the field that the caller has for its kind.
+void copy_text(std::string const &text, char *output) {
+  *std::copy(text.begin(), text.end(), output) = '\0';
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus DVSAliasToSwitchId(char const *alias, char switchId[64]) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = required_text(alias);
+    auto *const output = &required(switchId);
+    copy_text(simhost::identifier_of(call.reading(), name), output);
+  });
+}
+
+QEX_ReturnStatus DVSPortsetNameToAlias(char const *portsetName, char alias[128]) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = required_text(portsetName);
+    auto *const output = &required(alias);
+    copy_text(simhost::alias_of_portset(call.reading(), name), output);
+  });
+}
+
+QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetName) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = required_text(alias);
+    auto *const output = &required(portsetName);
+    copy_text(simhost::portset_of(call.reading(), name), output);
+  });
+}
+
+}  // extern "C"
