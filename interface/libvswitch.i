@@ -10,16 +10,33 @@
 %include "frame/scalars.i"
 %include "frame/texts.i"
 %include "frame/records.i"
+%include "frame/arrays.i"
 %include "frame/results.i"
 
-// The host kernel interface.
+// The host kernel interface: scalars, names, management, packets, links, ports.
 %include "records/types.i"
-%include "records/status.i"
-%include "records/variables.i"
+%include "records/kernel.i"
+%include "records/current_module.i"
 %include "records/names.i"
+%include "records/management.i"
+%include "records/packets.i"
+%include "records/links.i"
+%include "records/switch_ports.i"
+%include "records/socket_addresses.i"
 
-// libvswitch.
-%include "records/switch_info.i"
+// The two libraries: what runs, what is configured, what the state holds.
+%include "records/runtime_option_names.i"
+%include "records/ports.i"
+%include "records/mac_tables.i"
+%include "records/device.i"
+%include "records/mcast_filters.i"
+%include "records/lags.i"
+%include "records/runtime_options.i"
+%include "records/mirror.i"
+%include "records/policies.i"
+%include "records/uplinks.i"
+
+// The calls.
 %include "calls/configuration.i"
 %include "calls/queries.i"
-%include "calls/status_text.i"
+%include "calls/state.i"

@@ -1,7 +1,21 @@
-// VSDVS_*: configuring switches. Every call returns a status; VSDVS_FreeMemory takes back what the
-// others handed out.
+// VSDVS_*: configuring switches. Every call answers a status, with the outputs below behind it.
+// VSDVS_FreeMemory takes back what the others hand out.
 
 %{
 #include "vswitch/configuration.h"
 %}
+
+%integer_out(int *portID)                               // VSDVS_DvPortIDToPortID*
+%text_out(char *alias, 128)                             // VSDVS_GetAliasFromPortset
+%record_out(VSUplinkPorts **names)                      // VSDVS_GetSwitchUplinkPorts
+%record_out(VSUplinkPortIds **ids)
+%text_out(char *overrideName, 81)                       // VSDVS_GetPortTeamingOverride
+%boolean_out(qex_Bool *enabled)                         // VSDVS_GetTxUplinkAlways, ...
+%integer_out(int *mode)                                 // VSDVS_GetMcastFilterMode
+%record_out(VSPortVlanPolicy **policy)                  // VSDVS_GetPortVLANPolicy
+%integer_out(int *priority)
+%record_out_as(VSPvlanMapEntry **entries, VSUplinkPorts)  // VSDVS_GetPrivateVLANMap: the type
+%integer_out(int *count)                                // that tools have always been given
+%record_out(DVMirrorSessionTable **table)               // VSDVS_GetDVMirrorSessions
+
 %include "vswitch/configuration.h"

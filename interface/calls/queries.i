@@ -1,7 +1,19 @@
-// VSQEX_*: what the running switches tell. Records that a call answers belong to the library until
-// VSQEX_FreeMemory takes them back.
+// VSQEX_*: asking the running switches, and commanding them. Every call answers a status, with the
+// outputs below behind it. Records among them belong to the library until VSQEX_FreeMemory.
 
 %{
 #include "vswitch/queries.h"
 %}
+
+%record_out(VSMACTable **table)                         // VSQEX_GetTeamMACTable, ...
+%integer_out(int *state)                                // VSQEX_GetUplinkLinkState, ...
+%record_out(VSUplinks **uplinks)                        // VSQEX_GetUplinks
+%text_out(char *port, 48)                               // VSQEX_GetUplinkDVPortID
+%record_out(VSMcastFilters **filters)                   // VSQEX_GetMcastFilters
+%raw_bytes(unsigned char const *group)                  // VSQEX_GetMcastFilterStats
+%record_out(VSMcastFilterStats **stats)
+%record_out(VSDVMirrorSessionIDs **ids)                 // VSQEX_GetDVMirrorSessionIDs
+%record_out(VSPromiscSessionActiveDsts **ports)         // VSQEX_GetPromiscSessionActiveDsts
+%record_out(VSRuntimeOptions **options)                 // VSQEX_GetRuntimeOptions
+
 %include "vswitch/queries.h"

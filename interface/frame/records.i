@@ -1,9 +1,13 @@
 // Records: one line each, then the header that declares them.
 //
-//   %record(VSInfo)               constructor, destructor, accessors, class registration
-//   %union_record(NAME)           likewise for a record that is declared as a union
+//   %record(VSInfo)             constructor, destructor, accessors, class registration
+//   %union_record(NAME)         likewise for a record that is declared as a union
+//   %sized_record(NAME, make)   likewise, the constructor takes the size that `make` takes
+//   %inner_record(NAME)         a record that only shows as a view into its parent
+//   %view_only(RECORD, field)   a field that has a reader and no writer
+//   %required(PARAMETER)        a method's record or text argument that must not be null
 //
-// Stands before the headers; each %record line before the header of its record.
+// Stands before the headers; each line before the header of its record.
 
 // Constructors answer the raw pointer object, whatever class is registered: the class wraps it.
 %define %raw_result_of_constructor(NAME, TYPE)
@@ -49,12 +53,38 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self),
 %class_registration(NAME)
 %enddef
 
+%define %sized_record(NAME, MAKE)
+%record(NAME)
+%extend NAME {
+  NAME(int size) { return MAKE(size); }
+}
+%enddef
+
+%define %inner_record(NAME)
+%nodefaultctor NAME;
+%nodefaultdtor NAME;
+%rename("$ignore", %$ismember, fullname=1, regextarget=1) "^" #NAME "::";
+%enddef
+
+%define %view_only(RECORD, FIELD)
+%immutable RECORD::FIELD;
+%enddef
+
 // Readers and methods need a real record.
 %typemap(check, noblock=1) SWIGTYPE *self {
   if (!accepts_null_record("$symname") && !$1) {
     %argument_nullref("$type", $symname, $argnum);
   }
 }
+
+%typemap(check, noblock=1) SWIGTYPE *REQUIRED, char *REQUIRED {
+  if (!$1) {
+    %argument_nullref("$type", $symname, $argnum);
+  }
+}
+%define %required(PARAMETER...)
+%typemap(check) PARAMETER = SWIGTYPE *REQUIRED;
+%enddef
 
 // Writers of arrays: the declared number of elements is copied, none for an array of size 0. Writers
 // of any kind store nothing into a null record.
@@ -64,4 +94,3 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self),
     memcpy($1, $input, sizeof($1));
   }
 }
-

@@ -1,0 +1,35 @@
+// Switches, their ports and uplinks as the kernel runs them, and the commands of its device. The
+// caller makes the records, queries fill them.
+
+%record(VSInfo)
+%record(VSStats)
+%record(VSRARPStats)
+%record(VSServicePortTeamingStats)
+%record(VSPortList)
+%record(VSPortInfo_ethFrpAccepted)
+%record(VSPortInfo_vlan)
+%record(VSPortInfo)
+%record(VSVLANBitmap)
+%record(VSVLAN)
+%view_only(VSPortInfo, ethFrpAccepted)
+%view_only(VSPortInfo, vlan)
+
+%record(VSIOCtlQuery)
+%record(VSIOCtlData)
+%inner_record(VSIOCtlQuery_mcastFilter)
+%inner_record(VSIOCtlQuery_uplink)
+%view_only(VSIOCtlQuery, mcastFilter)
+%view_only(VSIOCtlQuery, uplink)
+
+%{
+#include "vswitch/device_queries.h"
+#include "vswitch/mcast_filter_modes.h"
+#include "vswitch/port_info.h"
+#include "vswitch/statistics.h"
+#include "vswitch/switch_info.h"
+%}
+%include "vswitch/switch_info.h"
+%include "vswitch/statistics.h"
+%include "vswitch/device_queries.h"
+%include "vswitch/mcast_filter_modes.h"
+%include "vswitch/port_info.h"

@@ -1,0 +1,9 @@
+// Link aggregation groups. The library fills the records; see the query for who frees them.
+
+%record(VSLAGStatus)
+%record(VSLAGTable)
+
+%{
+#include "vswitch/lags.h"
+%}
+%include "vswitch/lags.h"

@@ -1,0 +1,56 @@
+// Mirror session tables, and what running sessions tell. A table that the caller allocates, the
+// caller frees; one that a call answers goes back to the library. Sessions and entities lie in their
+// table.
+
+%record(DVMirrorIP)
+%record(DVMirrorEntity)
+%record(DVMirrorSession)
+%record(DVMirrorSessionTable)
+%record(VSDVMirrorSessionStats)
+%record(VSDVMirrorSessionIDs)
+%record(VSPromiscSessionActiveDsts)
+
+%{
+#include "helpers/mirror.h"
+#include "vswitch/properties.h"
+%}
+%include "vswitch/properties.h"
+%include "vswitch/mirror.h"
+
+%required(DVMirrorSession const *session)
+%required(qex_SwitchPortID const *port)
+%required(char const *text)
+
+DVMirrorSessionTable *alloc_dvmirror_session_table(int numSessions, int numEntities);
+void free_dvmirror_session_table(DVMirrorSessionTable *table);
+void MIRROR_ENCAP_TYPE(void);
+void MIRROR_ASSERT(void);
+
+%extend DVMirrorSessionTable {
+  DVMirrorSession *get_first_session() { return mirror_first_session($self); }
+  DVMirrorSession *__getitem__(int index) { return mirror_session_at($self, index); }
+  void __setitem__(int index, DVMirrorSession const *session) {
+    mirror_set_session_at($self, index, session);
+  }
+  DVMirrorEntity *get_first_session_entity(int index) { return mirror_entity_at($self, index); }
+}
+
+%extend DVMirrorEntity {
+  DVMirrorEntity *next() { return mirror_next_entity($self); }
+  PyObject *get_entity() {
+    MirrorEntityText const text = mirror_entity_text($self);
+    return SWIG_FromCharPtr(text.text);
+  }
+  void set_entity(char const *text) { mirror_set_entity_text($self, text); }
+}
+
+%extend VSDVMirrorSessionIDs {
+  PyObject *__getitem__(int index) { return mirror_session_ids_at($self, index); }
+}
+
+%extend VSPromiscSessionActiveDsts {
+  qex_SwitchPortID *__getitem__(int index) { return promisc_destination_at($self, index); }
+  void __setitem__(int index, qex_SwitchPortID const *port) {
+    promisc_set_destination_at($self, index, port);
+  }
+}

@@ -1,0 +1,34 @@
+// Runtime options lists. A caller builds one and frees it; one that a query answers goes back to the
+// library through VSQEX_FreeMemory. Headers lie in their list.
+
+%record(VSRuntimeOptionHeader)
+%sized_record(VSRuntimeOptions, runtime_options_new)
+
+%include "vswitch/runtime_options.h"
+
+%required(VSRuntimeOptionHeader *at)
+%required(VSRuntimeOptionHeader *option)
+%required(char *name)
+%required(char *value)
+
+%extend VSRuntimeOptions {
+  VSRuntimeOptionHeader *add_int_option(VSRuntimeOptionHeader *at, char *name, int type, int value) {
+    return runtime_options_add_int($self, at, name, type, value);
+  }
+  VSRuntimeOptionHeader *add_str_option(VSRuntimeOptionHeader *at, char *name, int type,
+                                        char *value) {
+    return runtime_options_add_text($self, at, name, type, value);
+  }
+  void set_options_length(int used) { runtime_options_set_length($self, used); }
+  VSRuntimeOptionHeader *get_first_option() { return runtime_options_first($self); }
+  VSRuntimeOptionHeader *get_next_option(VSRuntimeOptionHeader *option) {
+    return runtime_options_next($self, option);
+  }
+}
+
+%extend VSRuntimeOptionHeader {
+  char const *get_option_name() { return runtime_option_name($self); }
+  PyObject *get_option_value() { return runtime_option_value($self); }
+}
+
+int get_runtime_option_type_from_name(char *name);

@@ -1,0 +1,33 @@
+// Uplinks: the physical links of a switch and its uplink ports. The library allocates the lists that
+// calls answer, and takes them back; the caller makes and frees its own.
+
+%record(VSUplinks_entries)
+%sized_record(VSUplinks, uplinks_new)
+%sized_record(VSUplinkPorts, uplink_ports_new)
+%sized_record(VSUplinkPortIds, uplink_port_ids_new)
+%view_only(VSUplinks, entries)
+
+%{
+#include "helpers/uplinks.h"
+%}
+%include "vswitch/uplinks.h"
+
+%required(char const *text)
+
+%extend VSUplinks {
+  qex_uint32 __len__() { return $self->numEntries; }
+  char const *__getitem__(int index) { return uplinks_name_at($self, index); }
+  void __setitem__(int index, char const *text) { uplinks_set_name_at($self, index, text); }
+}
+
+%extend VSUplinkPorts {
+  qex_uint32 __len__() { return $self->nUplinkPorts; }
+  char const *__getitem__(int index) { return uplink_ports_name_at($self, index); }
+  void __setitem__(int index, char const *text) { uplink_ports_set_name_at($self, index, text); }
+}
+
+%extend VSUplinkPortIds {
+  qex_uint32 __len__() { return $self->nUplinkPorts; }
+  char const *__getitem__(int index) { return uplink_port_ids_id_at($self, index); }
+  void __setitem__(int index, char const *text) { uplink_port_ids_set_id_at($self, index, text); }
+}
