@@ -16,13 +16,13 @@ namespace simhost {
 /// What a new switch is to be. An empty identifier or portset and a 0 leave the choice to the host.
 struct SwitchSpec {
   std::string_view alias;
-  std::string_view identifier;
-  std::string_view portset;
-  std::uint32_t max_ports;
-  bool persistent;
-  std::uint32_t version;
-  std::uint32_t mtu;  ///< bytes
-  std::uint32_t uplink_count;
+  std::string_view identifier = {};
+  std::string_view portset = {};
+  std::uint32_t max_ports = 0;  ///< uplink ports not counted
+  bool persistent = false;
+  std::uint32_t version = 0;
+  std::uint32_t mtu = 0;  ///< bytes
+  std::uint32_t uplink_count = 0;
 };
 
 /// Creates a switch and attaches free uplinks to its uplink ports "uplink1", "uplink2", ... Refuses

@@ -80,7 +80,9 @@ Query &Query::with(std::string_view text) {
 }
 
 Query &Query::with(std::span<std::byte const> bytes) {
-  statement_.bind(++bound_, bytes.data(), static_cast<int>(bytes.size()));
+  // SQLite takes no bytes at a null address for NULL, which is not the same as no bytes.
+  void const *const first = bytes.empty() ? "" : static_cast<void const *>(bytes.data());
+  statement_.bind(++bound_, first, static_cast<int>(bytes.size()));
   return *this;
 }
 
@@ -128,7 +130,12 @@ Store::Store(std::optional<std::filesystem::path> const &file, Furnish const &fu
 
 void Store::prepare_file(Furnish const &furnish) {
   // Nothing may be written before is_blank() has looked at what is there.
-  if (patiently([&] { return is_blank(database_); })) {
+  auto const looks_blank = [&] {
+    // In one transaction, or another process could create the state between two of the questions.
+    Transaction const look(*this, Access::read);
+    return is_blank(database_);
+  };
+  if (patiently(looks_blank)) {
     patiently([&] { database_.exec("PRAGMA journal_mode = WAL"); });
     patiently([&] { create_if_blank(furnish); });
   }
