@@ -1,0 +1,133 @@
+// The ledger: what is out, what came back, and what should not have come.
+#include "core/ledger.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <array>
+#include <cstdio>
+#include <string>
+#include <vector>
+
+#include "core/giving_up.h"
+
+namespace {
+
+using simhost::HostPanic;
+using simhost::Ledger;
+using simhost::PanicKind;
+
+std::string text_of(void const *address) {
+  std::array<char, 32> text{};
+  std::snprintf(text.data(), text.size(), "%p", address);
+  return text.data();
+}
+
+std::string panic_of(Ledger &ledger, void *memory) {
+  try {
+    ledger.take_back(memory, "Taker");
+    return "";
+  } catch (HostPanic const &panic) {
+    EXPECT_EQ(panic.kind(), PanicKind::runtime_error);
+    return panic.what();
+  }
+}
+
+std::string report_of(Ledger const &ledger) {
+  std::vector<char> text(ledger.report({}) + 1);
+  EXPECT_EQ(ledger.report(text), text.size() - 1);
+  return text.data();
+}
+
+TEST(Ledger, GivesOutZeroedMemory) {
+  Ledger ledger;
+  auto *const block = static_cast<unsigned char *>(ledger.give_out(4096, "Giver"));
+  EXPECT_TRUE(std::all_of(block, block + 4096, [](unsigned char byte) { return byte == 0; }));
+}
+
+TEST(Ledger, CountsWhatIsOut) {
+  Ledger ledger;
+  auto *const first = ledger.give_out(1, "Giver");
+  auto *const second = ledger.give_out(1, "Giver");
+  EXPECT_EQ(ledger.count(), 2U);
+  ledger.take_back(first, "Taker");
+  EXPECT_EQ(ledger.count(), 1U);
+  ledger.take_back(second, "Taker");
+  EXPECT_EQ(ledger.count(), 0U);
+}
+
+TEST(Ledger, TakesNullForNothing) {
+  Ledger ledger;
+  ledger.give_out(1, "Giver");
+  ledger.take_back(nullptr, "Taker");
+  EXPECT_EQ(ledger.count(), 1U);
+}
+
+TEST(Ledger, RefusesMemoryOfOthers) {
+  Ledger ledger;
+  int mine = 0;
+  EXPECT_EQ(panic_of(ledger, &mine), "the host never gave out the memory at " + text_of(&mine));
+}
+
+TEST(Ledger, RefusesTheInsideOfABlock) {
+  Ledger ledger;
+  auto *const inside = static_cast<char *>(ledger.give_out(8, "Giver")) + 4;
+  EXPECT_EQ(panic_of(ledger, inside), "the host never gave out the memory at " + text_of(inside));
+  EXPECT_EQ(ledger.count(), 1U);
+}
+
+TEST(Ledger, NamesBothCallsWhenMemoryComesBackTwice) {
+  Ledger ledger;
+  auto *const block = ledger.give_out(8, "Giver");
+  ledger.take_back(block, "FirstTaker");
+  EXPECT_EQ(panic_of(ledger, block), "the memory at " + text_of(block) +
+                                         " is given back twice: Giver gave it out, FirstTaker "
+                                         "took it back");
+}
+
+TEST(Ledger, NamesTheLastLifeOfAnAddressThatCameBackToLife) {
+  Ledger ledger;
+  auto *const first = ledger.give_out(8, "FirstGiver");
+  ledger.take_back(first, "FirstTaker");
+  // The allocator hands the same address out again sooner or later; a bounded search will do.
+  std::vector<void *> others;
+  void *again = nullptr;
+  while (again != first && others.size() < 10000) {
+    again = ledger.give_out(8, "SecondGiver");
+    others.push_back(again);
+  }
+  if (again != first) {
+    GTEST_FAIL() << "the allocator did not reuse an address; the case cannot be shown";
+  }
+  ledger.take_back(again, "SecondTaker");
+  EXPECT_THAT(panic_of(ledger, again),
+              testing::EndsWith("SecondGiver gave it out, SecondTaker took it back"));
+}
+
+TEST(Ledger, ReportsOldestFirst) {
+  Ledger ledger;
+  auto *const first = ledger.give_out(80, "VSQEX_GetUplinks");
+  auto *const gone = ledger.give_out(1, "VSQEX_GetUplinks");
+  auto *const last = ledger.give_out(3, "DVSQEX_StateGet");
+  ledger.take_back(gone, "VSQEX_FreeMemory");
+  EXPECT_EQ(report_of(ledger), text_of(first) + " 80 bytes from VSQEX_GetUplinks\n" +
+                                   text_of(last) + " 3 bytes from DVSQEX_StateGet\n");
+}
+
+TEST(Ledger, ReportsNothingWhenNothingIsOut) {
+  std::array<char, 4> text{'x', 'x', 'x', 'x'};
+  EXPECT_EQ(Ledger().report(text), 0U);
+  EXPECT_STREQ(text.data(), "");
+}
+
+TEST(Ledger, CutsTheReportAtTheCallersRoom) {
+  Ledger ledger;
+  auto const line = text_of(ledger.give_out(7, "Giver")) + " 7 bytes from Giver\n";
+  ledger.give_out(7, "Giver");
+  std::array<char, 8> text{};
+  EXPECT_EQ(ledger.report(std::span(text).first(6)), ledger.report({}));
+  EXPECT_EQ(std::string(text.data()), line.substr(0, 5));
+}
+
+}  // namespace
