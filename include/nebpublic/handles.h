@@ -29,7 +29,7 @@ typedef void *DVSDataItem;
  * Called for each switch, port or item of a walk.
  *
  * The first argument is the handle of what was reached, the second what the caller gave to the
- * walk. A result of 0 goes on, any other ends the walk.
+ * walk. A result of 0 ends the walk, any other goes on.
  */
 typedef char (*DVSwitchCallback)(void *, void *);
 typedef char (*DVSPortCallback)(void *, void *);
