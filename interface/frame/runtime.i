@@ -28,15 +28,27 @@
 
 // A module that cannot be created must leave the interpreter's error standing; the stock start-up
 // goes on with the null pointer.
-%insert("init") %{
+%{
 #undef PyModule_Create
 #define PyModule_Create(definition) \
   PyModule_Create2(definition, PYTHON_API_VERSION); if (!m) return NULL
 %}
 
+// A second initialisation finds the object with the variables in place; it must not add them again.
+%{
+static void add_variable_once(PyObject *variables, char const *name, PyObject *(*get)(void),
+                              int (*set)(PyObject *)) {
+  swig_globalvar const *variable = ((swig_varlinkobject *)variables)->vars;
+  while (variable && strcmp(variable->name, name) != 0) variable = variable->next;
+  if (!variable) SWIG_Python_addvarlink(variables, name, get, set);
+}
+#undef SWIG_addvarlink
+#define SWIG_addvarlink add_variable_once
+%}
+
 // The helper with which shadow classes turn flat functions into methods. It takes one object and no
 // argument tuple, which no directive can express, so it joins the module here.
-%insert("header") %{
+%{
 SWIGINTERN PyObject *instance_method_new(PyObject *SWIGUNUSEDPARM(self), PyObject *function) {
   return PyInstanceMethod_New(function);
 }

@@ -1,0 +1,66 @@
+#!/usr/bin/env python3
+"""First steps with a virtual switch: create one, configure it, ask the running switch about it.
+
+Runs on any host; without a real one, the simulated host answers. Prints what it does.
+"""
+
+import _libvswitch as vs
+
+SWITCH = "demo-switch"
+
+
+def status_text(status: int) -> str:
+    """The library's own words for a status."""
+    return str(vs.QEX_ReturnStatusToString(status))
+
+
+def show(call: str, status: int) -> None:
+    print(f"{call:<58} {status_text(status)}")
+
+
+def create_switch() -> None:
+    # Alias; identifier and portset name, which the host chooses; ports, persistence, version, MTU;
+    # and how many of the host's uplinks to attach.
+    status = vs.VSDVS_CreateVSwitch(SWITCH, None, None, 64, 1, 0, 0, 2)
+    show(f"VSDVS_CreateVSwitch({SWITCH!r}, ...)", status)
+
+
+def set_mtu(mtu: int) -> None:
+    show(f"VSDVS_SetMTU({SWITCH!r}, {mtu})", vs.VSDVS_SetMTU(SWITCH, mtu))
+
+
+def read_back() -> None:
+    """The caller makes the record, the query fills it, the caller deletes it."""
+    info = vs.new_VSInfo()
+    show(f"VSQEX_GetVSInfo({SWITCH!r}, info)", vs.VSQEX_GetVSInfo(SWITCH, info))
+    print(f"    MTU {vs.VSInfo_mtu_get(info)}, at most {vs.VSInfo_maxPorts_get(info)} ports")
+    vs.delete_VSInfo(info)
+
+
+def list_uplinks() -> None:
+    """The library makes this record; it goes back to the library, and only once."""
+    status, uplinks = vs.VSQEX_GetUplinks(SWITCH)
+    show(f"VSQEX_GetUplinks({SWITCH!r})", status)
+    names = [vs.VSUplinks___getitem__(uplinks, i) for i in range(vs.VSUplinks___len__(uplinks))]
+    print(f"    {', '.join(names)}")
+
+    vs.VSQEX_FreeMemory(uplinks)
+    print("VSQEX_FreeMemory(uplinks), twice by mistake:")
+    try:
+        vs.VSQEX_FreeMemory(uplinks)
+    except RuntimeError as error:
+        print(f"    {type(error).__name__}: {error}")
+
+
+def main() -> None:
+    create_switch()
+    set_mtu(9000)
+    read_back()
+    set_mtu(1)
+    list_uplinks()
+    show(f"VSDVS_DestroyVSwitch({SWITCH!r})", vs.VSDVS_DestroyVSwitch(SWITCH))
+    show(f"VSDVS_DestroyVSwitch({SWITCH!r}) once more", vs.VSDVS_DestroyVSwitch(SWITCH))
+
+
+if __name__ == "__main__":
+    main()

@@ -1,0 +1,51 @@
+"""What the tests of the module share: paths, a clean environment, records."""
+
+import os
+import sys
+from typing import Any, Callable, Iterator
+
+import pytest
+
+# The simulated host reads these at its first call; whatever the shell has set is not under test.
+for _variable in ("SIMHOST_STATE", "SIMHOST_SCENARIO"):
+    os.environ.pop(_variable, None)
+
+# The modules that the build made for these tests, and the reference tables. Child processes need
+# them too.
+_BESIDE = [
+    os.path.join(os.environ["BUILD_DIR"], "tests", "python"),
+    os.path.join(os.path.dirname(os.path.dirname(__file__)), "surface"),
+]
+sys.path.extend(_BESIDE)
+os.environ["PYTHONPATH"] = os.pathsep.join([os.environ.get("PYTHONPATH", ""), *_BESIDE])
+
+import _libvswitch as vs  # noqa: E402  (after the environment is clean)
+
+import native  # noqa: E402
+
+
+@pytest.fixture
+def armed() -> Iterator[Callable[[Callable[[], Any]], bool]]:
+    """Whether a call arms the trap: only arming sets the status back to 0."""
+
+    def check(call: Callable[[], Any]) -> bool:
+        native.exception_status.value = 77
+        call()
+        return native.exception_status.value == 0
+
+    yield check
+    native.exception_status.value = 0
+
+
+@pytest.fixture
+def info() -> Iterator[Any]:
+    record = vs.new_VSInfo()
+    yield record
+    vs.delete_VSInfo(record)
+
+
+@pytest.fixture
+def name() -> Iterator[Any]:
+    record = vs.new_qex_Name()
+    yield record
+    vs.delete_qex_Name(record)
