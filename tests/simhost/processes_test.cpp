@@ -29,6 +29,7 @@ class Worker {
     }
     words.insert(words.begin(), WORKER);
     std::vector<char *> arguments;
+    arguments.reserve(words.size() + 1);
     for (auto &word : words) {
       arguments.push_back(word.data());
     }
@@ -145,6 +146,7 @@ TEST(Processes, MayAllStartOnANewFileTogether) {
   constexpr int kWorkers = 6;
   {
     std::vector<std::unique_ptr<Worker>> workers;
+    workers.reserve(kWorkers);
     for (int number = 0; number < kWorkers; ++number) {
       workers.push_back(std::make_unique<Worker>(
           state, std::vector<std::string>{"create-many", "w" + std::to_string(number), "20"}));

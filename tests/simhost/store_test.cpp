@@ -157,11 +157,11 @@ TEST(Store, LookUpsUseAnIndex) {
   TemporaryFolder const folder;
   { Store const store(folder.file("host.db"), furnish_nothing); }
   SQLite::Database database(folder.file("host.db").string());
+  constexpr auto kProperty =
+      "property WHERE switch = 1 AND scope = 0 AND ifnull(port, 0) = 0 AND name = ''";
   for (auto const *condition :
        {"switch WHERE alias = ''", "switch WHERE identifier = ''", "switch WHERE portset = ''",
-        "uplink WHERE name = ''", "port WHERE switch = 1 AND identifier = ''",
-        "property WHERE switch = 1 AND scope = 0 AND ifnull(port, 0) = 0 "
-        "AND name = ''"}) {
+        "uplink WHERE name = ''", "port WHERE switch = 1 AND identifier = ''", kProperty}) {
     SQLite::Statement plan(database, std::string("EXPLAIN QUERY PLAN SELECT * FROM ") + condition);
     ASSERT_TRUE(plan.executeStep());
     auto const step = plan.getColumn("detail").getString();
