@@ -32,3 +32,6 @@
 }
 
 int get_runtime_option_type_from_name(char *name);
+
+// A library call passes a null name or value on.
+%clear char *name, char *value;
