@@ -82,7 +82,6 @@ std::string integer(Parameter const &parameter, std::uint64_t bits) {
 }
 
 std::string described(Parameter const &parameter, std::uint64_t bits, std::size_t capture) {
-  // NOLINTNEXTLINE(performance-no-int-to-ptr): it was a pointer when the library was called
   auto const *address = reinterpret_cast<char const *>(bits);
   std::string value = "null";
   std::string memory = "null";
@@ -173,7 +172,6 @@ Answer record(std::string_view name, std::span<Argument const> arguments) noexce
   std::this_thread::sleep_for(rule.delay);
   if (!rule.trap || rule.trap->after_outputs) {
     for (auto const &[argument, bytes] : rule.outputs) {
-      // NOLINTNEXTLINE(performance-no-int-to-ptr): it was a pointer when the library was called
       if (auto *target = reinterpret_cast<void *>(arguments[argument - 1].bits)) {
         std::memcpy(target, bytes.data(), bytes.size());
       }
