@@ -116,7 +116,7 @@ def test_the_hosts_record_comes_with_the_status_whatever_that_is(
     assert type(result) is list
     assert result[0] == status
     assert int(result[1]) == ctypes.addressof(record)
-    assert "'VSUplinks *'" in repr(result[1])
+    assert "VSUplinks *'" in repr(result[1])
     assert not result[1].own()
     assert len(result) == 2
 

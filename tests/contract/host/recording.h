@@ -19,7 +19,6 @@ namespace recording {
 /** A text as a template argument. */
 template <std::size_t size>
 struct Name {
-  // NOLINTNEXTLINE(google-explicit-constructor): a literal is to convert by itself
   consteval Name(char const (&literal)[size]) {
     for (std::size_t i = 0; i < size; ++i) {
       text[i] = literal[i];
