@@ -11,6 +11,8 @@
 #include <vector>
 
 #include "control/simhost.h"
+#include "nebpublic/data.h"
+#include "nebpublic/kernel_state.h"
 #include "nebpublic/names.h"
 #include "trap_globals.h"
 #include "vswitch/configuration.h"
@@ -183,6 +185,17 @@ TEST_F(Boundary, TheOtherDoorKnowsItToo) {
                                "VSQEX_FreeMemory took it back"}));
 }
 
+TEST_F(Boundary, TheThirdDoorTakesMemoryBackToo) {
+  auto *const list = uplinks();
+  EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }), std::nullopt);
+  EXPECT_EQ(simhost_ledger_count(), 0U);
+  EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }),
+            (Raised{.type = "RuntimeError",
+                    .message = "DVSQEX_DataFree: the memory at " + text_of(list) +
+                               " is given back twice: VSQEX_GetUplinks gave it out, "
+                               "DVSQEX_DataFree took it back"}));
+}
+
 TEST_F(Boundary, MemoryOfTheCallerSpringsTheTrap) {
   VSInfo info{};
   EXPECT_EQ(raised_by([&] { VSQEX_FreeMemory(&info); }),
@@ -245,6 +258,23 @@ TEST(StateFile, AnEmptyNameMeansMemory) {
         std::exit(create("s") == QEX_OK ? 0 : 1);
       },
       testing::ExitedWithCode(0), "");
+}
+
+TEST(Unmodelled, ACallWithAStatusIsRefused) {
+  EXPECT_EQ(VSDVS_AddDVPort("s", "p", 1), QEX_NOT_IMPLEMENTED);
+  EXPECT_EQ(DVSQEX_SwitchAdd("i", "s", 0, 0), QEX_NOT_IMPLEMENTED);
+  VSMACTable *table = nullptr;
+  EXPECT_EQ(VSQEX_GetTeamMACTable("s", VS_MAC_ADDR_TYPE_ALL, &table), QEX_NOT_IMPLEMENTED);
+  EXPECT_EQ(table, nullptr);
+}
+
+TEST(Unmodelled, ACallWithoutAStatusSpringsTheTrap) {
+  EXPECT_EQ(raised_by([] { DVS_SwitchId(nullptr); }),
+            (Raised{.type = "RuntimeError",
+                    .message = "DVS_SwitchId: the simulated host does not model this call yet"}));
+  EXPECT_EQ(raised_by([] { DVSData_Free(nullptr); }),
+            (Raised{.type = "RuntimeError",
+                    .message = "DVSData_Free: the simulated host does not model this call yet"}));
 }
 
 TEST(StatusText, OfSuccessAndOfFailures) {
