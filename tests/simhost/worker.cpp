@@ -4,6 +4,11 @@
 //   set NAME MTU       sets its MTU
 //   get NAME           writes its MTU
 //   create-many P N    creates P-0 to P-(N-1)
+//   orphan             ends; a child goes on with the rest once this process is gone
+//   vanish             ends at once, without closing anything
+#include <unistd.h>
+
+#include <array>
 #include <cstdio>
 #include <cstdlib>
 #include <string>
@@ -26,6 +31,22 @@ QEX_ReturnStatus create(std::string const &name) {
   return VSDVS_CreateVSwitch(name.c_str(), nullptr, nullptr, 0, 1, 0, 0, 0);
 }
 
+void go_on_as_orphan() {
+  std::array<int, 2> ends{};
+  if (pipe(ends.data()) != 0) {
+    std::exit(2);
+  }
+  if (fork() != 0) {
+    std::exit(0);
+  }
+  // The other end closes with the last of the parent.
+  close(ends[1]);
+  char nothing = 0;
+  if (read(ends[0], &nothing, 1) != 0) {
+    std::exit(2);
+  }
+}
+
 }  // namespace
 
 int main(int count, char **values) {
@@ -33,6 +54,13 @@ int main(int count, char **values) {
   for (std::size_t at = 0; at < words.size();) {
     auto const word = [&] { return words.at(at++); };
     auto const command = word();
+    if (command == "orphan") {
+      go_on_as_orphan();
+      continue;
+    }
+    if (command == "vanish") {
+      _exit(0);
+    }
     auto const name = word();
     if (command == "create") {
       done(create(name), name);
