@@ -95,7 +95,7 @@ int unsigned_long_from_object(PyObject *object, unsigned long *value) {
   }
   int overflow = 0;
   long const low = PyLong_AsLongAndOverflow(object, &overflow);
-  unsigned long reading = static_cast<unsigned long>(low);
+  auto reading = static_cast<unsigned long>(low);
   if (overflow < 0) {
     return kWrongType;
   }
@@ -207,7 +207,7 @@ int char_array_from_text(char const *text, size_t size, char *array, size_t capa
 }
 
 EXPORTED size_t SWIG_strnlen(const char *s, size_t maxlen) {
-  return ::strnlen(s, maxlen);
+  return maxlen == 0 ? 0 : ::strnlen(s, maxlen);
 }
 
 }  // extern "C"

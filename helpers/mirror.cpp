@@ -4,6 +4,7 @@
 
 #include <arpa/inet.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -18,7 +19,17 @@ size_t table_size(int sessions, int entities) {
   auto const size = static_cast<qex_uint32>(entities) * sizeof(DVMirrorEntity) +
                     static_cast<qex_uint32>(sessions) * sizeof(DVMirrorSession) +
                     sizeof(DVMirrorSessionTable);
-  return static_cast<size_t>(static_cast<int>(static_cast<qex_uint32>(size)));
+  // Fewer bytes than the header takes would be overrun by setting it.
+  return std::max(static_cast<size_t>(static_cast<int>(static_cast<qex_uint32>(size))),
+                  sizeof(DVMirrorSessionTable));
+}
+
+/// The type of an entity as a plain number: callers may store any, the enumeration holds only its
+/// own.
+int type_of(DVMirrorEntity const *entity) {
+  int type = 0;
+  std::memcpy(&type, &entity->type, sizeof type);
+  return type;
 }
 
 void print_address(DVMirrorIP const &ip, std::span<char> text) {
@@ -90,7 +101,7 @@ DVMirrorEntity *mirror_next_entity(DVMirrorEntity *entity) {
 MirrorEntityText mirror_entity_text(DVMirrorEntity const *entity) {
   MirrorEntityText result = {};
   std::span<char> const text = result.text;
-  switch (static_cast<int>(entity->type)) {
+  switch (type_of(entity)) {
     case MIRROR_ENTTYPE_DVPORT:
       std::memcpy(text.data(), entity->dvPortId, strnlen(entity->dvPortId, 48));
       break;
@@ -113,7 +124,7 @@ MirrorEntityText mirror_entity_text(DVMirrorEntity const *entity) {
 }
 
 void mirror_set_entity_text(DVMirrorEntity *entity, char const *text) {
-  switch (static_cast<int>(entity->type)) {
+  switch (type_of(entity)) {
     case MIRROR_ENTTYPE_DVPORT:
       fill_slot(entity->dvPortId, text);
       break;

@@ -70,7 +70,7 @@ EXPORTED int get_runtime_option_type_from_name(char *name) {
 
 VSRuntimeOptions *runtime_options_new(int size) {
   // Fewer bytes than the length takes would be overrun by setting it.
-  size_t const bytes = static_cast<size_t>(size);
+  auto const bytes = static_cast<size_t>(size);
   auto *const list = static_cast<VSRuntimeOptions *>(std::malloc(std::max(bytes, kLengthSize)));
   if (list != nullptr) {
     list->totalLength = static_cast<qex_uint32>(size);

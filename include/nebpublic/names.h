@@ -24,10 +24,10 @@ QEX_ReturnStatus DVSPortsetNameToAlias(char const *portsetName, char alias[128])
 /**
  * Writes the name of the set of ports of the switch with an alias.
  *
- * @param portsetName room for 129 bytes; a name takes at most PORTSET_NAME_MAX of them, NUL
+ * @param portsetBuffer room for 129 bytes; a name takes at most PORTSET_NAME_MAX of them, NUL
  * included
  */
-QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetName);
+QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetBuffer);
 
 /** Whether the switch with the identifier `switchId` has a port: 1 or 0. */
 char DVPortExist(char const *switchId, char const *port);

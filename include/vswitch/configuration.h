@@ -79,8 +79,8 @@ QEX_ReturnStatus VSDVS_DvPortIDToPortID(char const *switchName, char const *port
 QEX_ReturnStatus VSDVS_DvPortIDToPortIDFromDVSID(char const *switchId, char const *port,
                                                  int *portID);
 
-/** Writes the alias of a set of ports into `alias`: at most 128 bytes of text and a NUL. */
-QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *alias);
+/** Writes the alias of a set of ports into `aliasBuffer`: at most 128 bytes of text and a NUL. */
+QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *aliasBuffer);
 
 /** Hands out the uplink ports of a switch, as names and as identifiers in the same order. */
 QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPorts **names,
@@ -131,10 +131,10 @@ QEX_ReturnStatus VSDVS_ClearPortTeamingPolicy(char const *switchName, char const
 /**
  * Reads the uplink port that a port uses whatever its teaming says; VSPROP_PORT_TEAMING_OVERRIDE.
  *
- * @param overrideName room for 82 bytes: at most 81 bytes of text and a NUL
+ * @param overrideBuffer room for 82 bytes: at most 81 bytes of text and a NUL
  */
 QEX_ReturnStatus VSDVS_GetPortTeamingOverride(char const *switchName, char const *port,
-                                              char *overrideName);
+                                              char *overrideBuffer);
 
 /** Binds a port to an uplink port whatever its teaming says. */
 QEX_ReturnStatus VSDVS_SetPortTeamingOverride(char const *switchName, char const *port,

@@ -71,8 +71,9 @@ QEX_ReturnStatus VSQEX_GetUplinkLACPLinkState(char const *switchName, char const
 /** Hands out the uplinks of a switch. */
 QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks);
 
-/** Writes the identifier of an uplink's port into `port`: at most 48 bytes of text and a NUL. */
-QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *port);
+/** Writes the identifier of an uplink's port into `portBuffer`: at most 48 bytes of text and a NUL.
+ */
+QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer);
 
 /** Hands out the multicast groups of a port, in the form of one mode. */
 QEX_ReturnStatus VSQEX_GetMcastFilters(char const *switchName, qex_SwitchPortID port,

@@ -6,10 +6,10 @@
 %}
 
 %integer_out(int *portID)                               // VSDVS_DvPortIDToPortID*
-%text_out(char *alias, 128)                             // VSDVS_GetAliasFromPortset
+%text_out(char *aliasBuffer, 128)                       // VSDVS_GetAliasFromPortset
 %record_out(VSUplinkPorts **names)                      // VSDVS_GetSwitchUplinkPorts
 %record_out(VSUplinkPortIds **ids)
-%text_out(char *overrideName, 81)                       // VSDVS_GetPortTeamingOverride
+%text_out(char *overrideBuffer, 81)                     // VSDVS_GetPortTeamingOverride
 %boolean_out(qex_Bool *enabled)                         // VSDVS_GetTxUplinkAlways, ...
 %integer_out(int *mode)                                 // VSDVS_GetMcastFilterMode
 %record_out(VSPortVlanPolicy **policy)                  // VSDVS_GetPortVLANPolicy

@@ -8,7 +8,7 @@
 %record_out(VSMACTable **table)                         // VSQEX_GetTeamMACTable, ...
 %integer_out(int *state)                                // VSQEX_GetUplinkLinkState, ...
 %record_out(VSUplinks **uplinks)                        // VSQEX_GetUplinks
-%text_out(char *port, 48)                               // VSQEX_GetUplinkDVPortID
+%text_out(char *portBuffer, 48)                         // VSQEX_GetUplinkDVPortID
 %record_out(VSMcastFilters **filters)                   // VSQEX_GetMcastFilters
 %raw_bytes(unsigned char const *group)                  // VSQEX_GetMcastFilterStats
 %record_out(VSMcastFilterStats **stats)

@@ -16,7 +16,7 @@
 
 // One C function under two shapes: with a text behind the status, or with an array of the caller's
 // whose contents are discarded.
-%text_out(char *portsetName, 128)
+%text_out(char *portsetBuffer, 128)
 %include "nebpublic/names.h"
 QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128]);
 

@@ -5,7 +5,8 @@
 //   %sized_record(NAME, make)   likewise, the constructor takes the size that `make` takes
 //   %inner_record(NAME)         a record that only shows as a view into its parent
 //   %view_only(RECORD, field)   a field that has a reader and no writer
-//   %required(PARAMETER)        a method's record or text argument that must not be null
+//   %required(PARAMETER)        a method's record or text argument that must not be null; const or
+//                               not, so its name must be one that no call uses
 //
 // Stands before the headers; each line before the header of its record.
 

@@ -6,10 +6,11 @@
 //   %record_out_as(X **entries, Y)           likewise, under the type of another record
 //   %integer_out(int *portID)                a signed integer
 //   %boolean_out(qex_Bool *enabled)          one byte, as a signed integer
-//   %text_out(char *alias, 128)              at most so many bytes of text
+//   %text_out(char *aliasBuffer, 128)        at most so many bytes of text
 //   %raw_bytes(void const *group)            an argument: the inside of a bytes object
 //
-// Stands before the calls; each line before the header of its calls.
+// A line also matches parameters of that name that are const, so the buffers of texts have names that
+// no input has. Stands before the calls; each line before the header of its calls.
 
 %define %record_out(PARAMETER...)
 %typemap(in, numinputs=0, noblock=1) PARAMETER ($*1_ltype record = NULL) {

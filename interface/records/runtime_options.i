@@ -8,16 +8,17 @@
 
 %required(VSRuntimeOptionHeader *at)
 %required(VSRuntimeOptionHeader *option)
-%required(char *name)
-%required(char *value)
+%required(char *option_name)
+%required(char *option_text)
 
 %extend VSRuntimeOptions {
-  VSRuntimeOptionHeader *add_int_option(VSRuntimeOptionHeader *at, char *name, int type, int value) {
-    return runtime_options_add_int($self, at, name, type, value);
+  VSRuntimeOptionHeader *add_int_option(VSRuntimeOptionHeader *at, char *option_name, int type,
+                                        int value) {
+    return runtime_options_add_int($self, at, option_name, type, value);
   }
-  VSRuntimeOptionHeader *add_str_option(VSRuntimeOptionHeader *at, char *name, int type,
-                                        char *value) {
-    return runtime_options_add_text($self, at, name, type, value);
+  VSRuntimeOptionHeader *add_str_option(VSRuntimeOptionHeader *at, char *option_name, int type,
+                                        char *option_text) {
+    return runtime_options_add_text($self, at, option_name, type, option_text);
   }
   void set_options_length(int used) { runtime_options_set_length($self, used); }
   VSRuntimeOptionHeader *get_first_option() { return runtime_options_first($self); }
@@ -31,7 +32,7 @@
   PyObject *get_option_value() { return runtime_option_value($self); }
 }
 
-int get_runtime_option_type_from_name(char *name);
+int get_runtime_option_type_from_name(char *option_name);
 
 // A library call passes a null name or value on.
 %clear char *name, char *value;

@@ -165,7 +165,7 @@ TEST(Text, KeepsWhatStandsBehindAnEmbeddedNul) {
   char *text = nullptr;
   size_t size = 0;
   ASSERT_EQ(kConverted, text_from_str(python("'a\\0b'").get(), &text, &size));
-  EXPECT_EQ(std::string("a\0b", 4), std::string(text, size));
+  EXPECT_EQ(std::string({'a', '\0', 'b', '\0'}), std::string(text, size));
   std::free(text);
 }
 
@@ -181,7 +181,7 @@ TEST(Text, RefusesWhatUtf8CannotEncode) {
 TEST(CharArray, HoldsOneCharLessThanItsCapacity) {
   std::vector<char> array(5, 'x');
   EXPECT_EQ(kConverted, char_array_from_str(python("'abcd'").get(), array.data(), 5));
-  EXPECT_EQ(std::string("abcd\0", 5), std::string(array.data(), 5));
+  EXPECT_EQ(std::string({'a', 'b', 'c', 'd', '\0'}), std::string(array.data(), 5));
   EXPECT_EQ(kWrongType, char_array_from_str(python("'abcde'").get(), array.data(), 5));
   EXPECT_EQ(kWrongType, char_array_from_str(python("'abc\\u00e9'").get(), array.data(), 5));
   EXPECT_EQ(std::string("abcd\0", 5), std::string(array.data(), 5)) << "refused: must be unchanged";

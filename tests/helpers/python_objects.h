@@ -31,7 +31,7 @@ inline std::string take_error_type() {
   PyObject *value = nullptr;
   PyObject *traceback = nullptr;
   PyErr_Fetch(&type, &value, &traceback);
-  std::string const name = type != nullptr ? reinterpret_cast<PyTypeObject *>(type)->tp_name : "";
+  std::string name = type != nullptr ? reinterpret_cast<PyTypeObject *>(type)->tp_name : "";
   Py_XDECREF(type);
   Py_XDECREF(value);
   Py_XDECREF(traceback);
