@@ -33,6 +33,3 @@
 }
 
 int get_runtime_option_type_from_name(char *option_name);
-
-// A library call passes a null name or value on.
-%clear char *name, char *value;
