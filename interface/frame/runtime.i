@@ -62,6 +62,11 @@ static PyMethodDef runtime_methods[] = {
   if (PyModule_AddFunctions(m, runtime_methods) < 0) return NULL;
 %}
 
+// Arguments that fit no form of a call are no error of type: that form of the call does not exist.
+%{
+#define SWIG_Python_RaiseOrModifyTypeError(text) PyErr_SetString(PyExc_NotImplementedError, text)
+%}
+
 // A null where a record is needed is a wrong value, not a wrong type.
 #undef %argument_nullref
 #define %argument_nullref(type, name, argn) \
