@@ -4,6 +4,30 @@
 #include "store/store.h"
 
 namespace simhost::store {
+namespace {
+
+PortNumber number_at(Query const &query, int column) {
+  return PortNumber(static_cast<std::uint32_t>(query.integer(column)));
+}
+
+// Of a row of number, switch, identifier, is_uplink.
+Port port_at(Query const &query) {
+  return {.number = number_at(query, 0),
+          .switch_key = SwitchKey{query.integer(1)},
+          .identifier = query.text(2),
+          .kind = query.integer(3) != 0 ? PortKind::uplink : PortKind::client};
+}
+
+// Of a row of name, port; numbers of ports begin at 1.
+Uplink uplink_at(Query const &query) {
+  Uplink uplink{.name = query.text(0), .port = std::nullopt};
+  if (auto const number = number_at(query, 1); number != PortNumber{}) {
+    uplink.port = number;
+  }
+  return uplink;
+}
+
+}  // namespace
 
 std::optional<PortNumber> add_port(Transaction &transaction, SwitchKey switch_key,
                                    std::string_view identifier, PortKind kind) {
@@ -18,11 +42,59 @@ std::optional<PortNumber> add_port(Transaction &transaction, SwitchKey switch_ke
   return PortNumber(static_cast<std::uint32_t>(transaction.last_key()));
 }
 
+std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
+                              std::string_view identifier) {
+  auto select = transaction.query(
+      "SELECT number, switch, identifier, is_uplink FROM port"
+      " WHERE switch = ? AND identifier = ?");
+  if (!select.with(std::int64_t(switch_key)).with(identifier).next()) {
+    return std::nullopt;
+  }
+  return port_at(select);
+}
+
+std::optional<Port> find_port(Transaction &transaction, PortNumber number) {
+  auto select = transaction.query(
+      "SELECT number, switch, identifier, is_uplink FROM port WHERE number = ?");
+  if (!select.with(std::int64_t(number)).next()) {
+    return std::nullopt;
+  }
+  return port_at(select);
+}
+
+std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key) {
+  auto select = transaction.query(
+      "SELECT number, switch, identifier, is_uplink FROM port WHERE switch = ? ORDER BY number");
+  select.with(std::int64_t(switch_key));
+  std::vector<Port> ports;
+  while (select.next()) {
+    ports.push_back(port_at(select));
+  }
+  return ports;
+}
+
 std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKind kind) {
   auto select = transaction.query("SELECT count(*) FROM port WHERE switch = ? AND is_uplink = ?");
   select.with(std::int64_t(switch_key)).with(std::int64_t{kind == PortKind::uplink});
   select.next();
   return static_cast<std::uint32_t>(select.integer(0));
+}
+
+std::optional<Uplink> find_uplink(Transaction &transaction, std::string_view name) {
+  auto select = transaction.query("SELECT name, port FROM uplink WHERE name = ?");
+  if (!select.with(name).next()) {
+    return std::nullopt;
+  }
+  return uplink_at(select);
+}
+
+std::vector<Uplink> all_uplinks(Transaction &transaction) {
+  auto select = transaction.query("SELECT name, port FROM uplink ORDER BY position");
+  std::vector<Uplink> uplinks;
+  while (select.next()) {
+    uplinks.push_back(uplink_at(select));
+  }
+  return uplinks;
 }
 
 void add_uplink(Transaction &transaction, std::string_view name) {
@@ -50,8 +122,7 @@ std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switc
   select.with(std::int64_t(switch_key));
   std::vector<AttachedUplink> attached;
   while (select.next()) {
-    attached.push_back({.name = select.text(0),
-                        .port = PortNumber(static_cast<std::uint32_t>(select.integer(1)))});
+    attached.push_back({.name = select.text(0), .port = number_at(select, 1)});
   }
   return attached;
 }

@@ -19,6 +19,20 @@ enum class PortKind { client, uplink };
 /// Adds a port; nothing if the switch has one of that identifier.
 std::optional<PortNumber> add_port(Transaction &transaction, SwitchKey switch_key,
                                    std::string_view identifier, PortKind kind);
+struct Port {
+  PortNumber number;
+  SwitchKey switch_key;
+  std::string identifier;
+  PortKind kind;
+};
+
+/// The port of a switch that has an identifier.
+std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
+                              std::string_view identifier);
+/// The port that has a number, whichever its switch is.
+std::optional<Port> find_port(Transaction &transaction, PortNumber number);
+/// The ports of a switch, in the order in which they were added.
+std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key);
 /// How many ports of that kind the switch has.
 std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKind kind);
 
@@ -27,6 +41,14 @@ struct AttachedUplink {
   PortNumber port;
 };
 
+struct Uplink {
+  std::string name;
+  std::optional<PortNumber> port;  ///< none while it is free
+};
+
+std::optional<Uplink> find_uplink(Transaction &transaction, std::string_view name);
+/// All uplinks of the host, in the order in which they were added.
+std::vector<Uplink> all_uplinks(Transaction &transaction);
 /// Adds a free uplink to the host. Its name is unique there.
 void add_uplink(Transaction &transaction, std::string_view name);
 /// The free uplinks of the host, in the order in which they were added.

@@ -21,6 +21,17 @@ std::string_view query_by(SwitchName kind) {
   __builtin_unreachable();
 }
 
+// Of a row with the columns that query_by() selects.
+FoundSwitch switch_at(Query const &query) {
+  return {.key = SwitchKey{query.integer(0)},
+          .row = {.alias = query.text(1),
+                  .identifier = query.text(2),
+                  .portset = query.text(3),
+                  .max_ports = static_cast<std::uint32_t>(query.integer(4)),
+                  .version = static_cast<std::uint32_t>(query.integer(5)),
+                  .persistent = query.integer(6) != 0}};
+}
+
 }  // namespace
 
 std::optional<SwitchKey> add_switch(Transaction &transaction, Switch const &row) {
@@ -41,13 +52,18 @@ std::optional<FoundSwitch> find_switch(Transaction &transaction, SwitchName kind
   if (!select.with(name).next()) {
     return std::nullopt;
   }
-  return FoundSwitch{.key = SwitchKey{select.integer(0)},
-                     .row = {.alias = select.text(1),
-                             .identifier = select.text(2),
-                             .portset = select.text(3),
-                             .max_ports = static_cast<std::uint32_t>(select.integer(4)),
-                             .version = static_cast<std::uint32_t>(select.integer(5)),
-                             .persistent = select.integer(6) != 0}};
+  return switch_at(select);
+}
+
+std::vector<FoundSwitch> all_switches(Transaction &transaction) {
+  auto select = transaction.query(
+      "SELECT key, alias, identifier, portset, max_ports, version, persistent"
+      " FROM switch ORDER BY key");
+  std::vector<FoundSwitch> all;
+  while (select.next()) {
+    all.push_back(switch_at(select));
+  }
+  return all;
 }
 
 void remove_switch(Transaction &transaction, SwitchKey key) {

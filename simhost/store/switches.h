@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace simhost::store {
 
@@ -34,6 +35,8 @@ std::optional<SwitchKey> add_switch(Transaction &transaction, Switch const &row)
 /// The switch that bears `name`, which is of the given kind.
 std::optional<FoundSwitch> find_switch(Transaction &transaction, SwitchName kind,
                                        std::string_view name);
+/// All switches of the host, in the order in which they were added.
+std::vector<FoundSwitch> all_switches(Transaction &transaction);
 /// Removes a switch with its ports and properties; its uplinks become free.
 void remove_switch(Transaction &transaction, SwitchKey key);
 
