@@ -10,11 +10,12 @@ calls are modelled is written down nowhere but in their code, and in the library
 import os
 import re
 import sys
+from typing import List, Tuple
 
 DECLARATION = re.compile(r"^([a-zA-Z][\w \n]*?[ *])(\w+)\(([^(){};]*)\);", re.MULTILINE)
 
 
-def declarations(header: str) -> list[tuple[str, str, str]]:
+def declarations(header: str) -> List[Tuple[str, str, str]]:
     """The result, name and parameters of each function that a header declares."""
     code = re.sub(r"/\*.*?\*/|//[^\n]*|^#[^\n]*", "", header, flags=re.DOTALL | re.MULTILINE)
     return [

@@ -10,19 +10,65 @@ import errno
 import os
 import re
 import sys
+from typing import List
 
 ACRONYMS = {
-    "acpi", "ats", "cow", "cpu", "dma", "elf", "fifo", "fs", "ft", "hba", "hw", "id", "io", "ioctl",
-    "lv", "lvm", "nfs", "pi", "pmem", "pty", "rpc", "scsi", "svm", "tar", "uid", "vcpu", "vlan",
-    "vmm", "vsi", "vt", "wlx",
+    "acpi",
+    "ats",
+    "cow",
+    "cpu",
+    "dma",
+    "elf",
+    "fifo",
+    "fs",
+    "ft",
+    "hba",
+    "hw",
+    "id",
+    "io",
+    "ioctl",
+    "lv",
+    "lvm",
+    "nfs",
+    "pi",
+    "pmem",
+    "pty",
+    "rpc",
+    "scsi",
+    "svm",
+    "tar",
+    "uid",
+    "vcpu",
+    "vlan",
+    "vmm",
+    "vsi",
+    "vt",
+    "wlx",
 }
 RESPELLED = {
-    "addr": "address", "asyncio": "async IO", "bufferspace": "buffer space", "buf": "buffer",
-    "conn": "connection", "dev": "device", "dir": "directory", "err": "error", "fmt": "format",
-    "gt": "greater than", "info": "information", "init": "initialization", "lpage": "large page",
-    "lt": "less than", "mem": "memory", "num": "number of", "param": "parameter",
-    "perm": "permanent", "ptr": "pointer", "res": "resource", "unsupp": "unsupported",
-    "vlanid": "VLAN id", "wont": "won't",
+    "addr": "address",
+    "asyncio": "async IO",
+    "bufferspace": "buffer space",
+    "buf": "buffer",
+    "conn": "connection",
+    "dev": "device",
+    "dir": "directory",
+    "err": "error",
+    "fmt": "format",
+    "gt": "greater than",
+    "info": "information",
+    "init": "initialization",
+    "lpage": "large page",
+    "lt": "less than",
+    "mem": "memory",
+    "num": "number of",
+    "param": "parameter",
+    "perm": "permanent",
+    "ptr": "pointer",
+    "res": "resource",
+    "unsupp": "unsupported",
+    "vlanid": "VLAN id",
+    "wont": "won't",
 }
 
 
@@ -40,7 +86,7 @@ def readable(name: str) -> str:
     return text[0].upper() + text[1:]
 
 
-def status_names(header: str) -> list[str]:
+def status_names(header: str) -> List[str]:
     """The enumerators of QEX_ReturnStatus, in their order and without their prefix."""
     body = re.search(r"enum QEX_ReturnStatus \{(.*?)\}", header, re.DOTALL)
     if body is None:
