@@ -2,7 +2,8 @@
 
 usage: make_unmodelled_calls.py OUTPUT INCLUDE_FOLDER HEADER...
 
-A library is loaded only if it has every call, so the calls that are not modelled need an answer too.
+A library is loaded only if it has every call, so the calls that are not modelled need an answer
+too.
 A modelled call's own definition takes the place of the weak one when the library is linked: which
 calls are modelled is written down nowhere but in their code, and in the library's symbol table.
 """

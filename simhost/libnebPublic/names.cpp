@@ -39,10 +39,10 @@ QEX_ReturnStatus DVSPortsetNameToAlias(char const *portsetName, char alias[128])
   });
 }
 
-QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetName) {
+QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetBuffer) {
   return answer(__func__, [&](Call &call) {
     auto const name = required_text(alias);
-    auto *const output = &required(portsetName);
+    auto *const output = &required(portsetBuffer);
     copy_text(simhost::portset_of(call.reading(), name), output);
   });
 }
