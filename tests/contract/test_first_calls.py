@@ -5,7 +5,7 @@ from typing import Any, List, Tuple, Type
 
 import _libvswitch as vs
 import pytest
-from _pointers import pointer
+from peer import pointer_object
 from recording_host import RecordingHost, Value
 
 UINT32_MAX = 2**32 - 1
@@ -77,7 +77,7 @@ def test_an_argument_that_does_not_convert_makes_no_call(host: RecordingHost) ->
 def test_get_mtu_writes_through_the_callers_pointer(host: RecordingHost) -> None:
     mtu = ctypes.c_uint32(1)
     host.answer("VSDVS_GetMTU", outputs={2: UINT32_MAX})
-    assert vs.VSDVS_GetMTU("dvs0", pointer("unsigned int *", ctypes.addressof(mtu))) == 0
+    assert vs.VSDVS_GetMTU("dvs0", pointer_object(ctypes.addressof(mtu), "unsigned int *")) == 0
     assert mtu.value == UINT32_MAX
     assert host.calls() == [("VSDVS_GetMTU", (b"dvs0", ctypes.addressof(mtu)))]
 
@@ -133,7 +133,7 @@ def test_a_null_record_of_the_host_is_none(host: RecordingHost) -> None:
 @pytest.mark.parametrize("call", ["VSDVS_FreeMemory", "VSQEX_FreeMemory"])
 def test_memory_of_any_type_goes_back(host: RecordingHost, call: str) -> None:
     info = vs.new_VSInfo()
-    number = pointer("unsigned int *", 0x1234)
+    number = pointer_object(0x1234, "unsigned int *")
     results = [getattr(vs, call)(memory) for memory in (info, number, None)]
     assert results == [None, None, None]
     assert host.calls() == [(call, (int(info),)), (call, (0x1234,)), (call, (None,))]
@@ -187,7 +187,7 @@ def test_outputs_written_before_the_trap_springs_stay(host: RecordingHost) -> No
     host.answer("VSDVS_GetMTU", outputs={2: 9000})
     host.spring("VSDVS_GetMTU", RuntimeError, "late", after_outputs=True)
     with pytest.raises(RuntimeError, match="^late$"):
-        vs.VSDVS_GetMTU("dvs0", pointer("unsigned int *", ctypes.addressof(mtu)))
+        vs.VSDVS_GetMTU("dvs0", pointer_object(ctypes.addressof(mtu), "unsigned int *"))
     assert mtu.value == 9000
 
 

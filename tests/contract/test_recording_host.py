@@ -10,7 +10,7 @@ from typing import Dict, Optional
 
 import _libvswitch as vs
 import pytest
-from _pointers import pointer
+from peer import pointer_object
 from recording_host import RecordingHost, loaded_files
 
 HERE = Path(__file__).parent
@@ -67,7 +67,7 @@ def test_rules_hold_for_the_nth_call_or_for_every_other(host: RecordingHost) -> 
 def test_captured_memory_is_what_the_call_found(host: RecordingHost) -> None:
     data = ctypes.create_string_buffer(b"before\0behind", 16)
     host.capture("VSDVS_FreeMemory", 1, 16)
-    vs.VSDVS_FreeMemory(pointer("unsigned int *", ctypes.addressof(data)))
+    vs.VSDVS_FreeMemory(pointer_object(ctypes.addressof(data), "unsigned int *"))
     data.value = b"after"
     assert host.details()[0].memory == (b"before\0behind\0\0\0",)
 

@@ -1,7 +1,6 @@
-"""What the tests of the module share: paths, a clean environment, records."""
+"""What the tests of the module share: a clean environment, records."""
 
 import os
-import sys
 from typing import Any, Callable, Iterator
 
 import pytest
@@ -9,15 +8,6 @@ import pytest
 # The simulated host reads these at its first call; whatever the shell has set is not under test.
 for _variable in ("SIMHOST_STATE", "SIMHOST_SCENARIO"):
     os.environ.pop(_variable, None)
-
-# The modules that the build made for these tests, and the reference tables. Child processes need
-# them too.
-_BESIDE = [
-    os.path.join(os.environ["BUILD_DIR"], "tests", "python"),
-    os.path.join(os.path.dirname(os.path.dirname(__file__)), "surface"),
-]
-sys.path.extend(_BESIDE)
-os.environ["PYTHONPATH"] = os.pathsep.join([os.environ.get("PYTHONPATH", ""), *_BESIDE])
 
 import _libvswitch as vs  # noqa: E402  (after the environment is clean)
 

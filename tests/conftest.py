@@ -1,0 +1,16 @@
+"""Puts beside the module, for every suite, what the build made for tests, and the tables."""
+
+import os
+import sys
+from pathlib import Path
+
+_HERE = Path(__file__).parent
+_BESIDE = [
+    str(Path(os.environ["BUILD_DIR"], "tests", "python")),
+    str(_HERE / "support"),
+    str(_HERE / "surface"),
+]
+sys.path.extend(_BESIDE)
+# Child processes need them too.
+_PATH = [*filter(None, [os.environ.get("PYTHONPATH")]), *_BESIDE]
+os.environ["PYTHONPATH"] = os.pathsep.join(_PATH)
