@@ -54,8 +54,8 @@ std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
 }
 
 std::optional<Port> find_port(Transaction &transaction, PortNumber number) {
-  auto select = transaction.query(
-      "SELECT number, switch, identifier, is_uplink FROM port WHERE number = ?");
+  auto select =
+      transaction.query("SELECT number, switch, identifier, is_uplink FROM port WHERE number = ?");
   if (!select.with(std::int64_t(number)).next()) {
     return std::nullopt;
   }

@@ -8,9 +8,11 @@ namespace simhost::store {
 /// "VSim": no other program's database carries it.
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables; a file of another version is refused, not converted.
-inline constexpr std::int64_t kSchemaVersion = 1;
+inline constexpr std::int64_t kSchemaVersion = 2;
 
 /// Creates the tables of an empty database.
 extern char const *const kSchema;
+/// Likewise those of what runs on the configuration that the tables of kSchema hold.
+extern char const *const kRunningSchema;
 
 }  // namespace simhost::store

@@ -150,6 +150,7 @@ void Store::create_if_blank(Furnish const &furnish) {
     database_.exec("PRAGMA application_id = " + std::to_string(kApplicationId));
     database_.exec("PRAGMA user_version = " + std::to_string(kSchemaVersion));
     database_.exec(kSchema);
+    database_.exec(kRunningSchema);
     furnish(transaction);
   }
   transaction.commit();

@@ -12,6 +12,7 @@
 
 #include "store/ports.h"
 #include "store/switches.h"
+#include "store/schema.h"
 #include "temporary_folder.h"
 
 namespace {
@@ -241,9 +242,10 @@ TEST(UnusableStateFile, ThatHasAnotherSchema) {
   TemporaryFolder const folder;
   auto const file = folder.file("host.db");
   { Store const store(file, furnish_nothing); }
-  SQLite::Database(file.string(), SQLite::OPEN_READWRITE).exec("PRAGMA user_version = 7");
+  SQLite::Database(file.string(), SQLite::OPEN_READWRITE).exec("PRAGMA user_version = 70");
   EXPECT_EQ(refusal_of(file), "the state file " + file.string() +
-                                  " cannot be used: it has schema version 7, this host reads 1");
+                                  " cannot be used: it has schema version 70, this host reads " +
+                                  std::to_string(simhost::store::kSchemaVersion));
 }
 
 TEST(UnusableStateFile, AnEmptyFileIsANewState) {
