@@ -9,6 +9,9 @@
 %record(VSDVMirrorSessionStats)
 %record(VSDVMirrorSessionIDs)
 %record(VSPromiscSessionActiveDsts)
+%required(DVMirrorSession const *session)
+%required(qex_SwitchPortID const *port)
+%required(char const *text)
 
 %{
 #include "helpers/mirror.h"
@@ -16,10 +19,6 @@
 %}
 %include "vswitch/properties.h"
 %include "vswitch/mirror.h"
-
-%required(DVMirrorSession const *session)
-%required(qex_SwitchPortID const *port)
-%required(char const *text)
 
 DVMirrorSessionTable *alloc_dvmirror_session_table(int numSessions, int numEntities);
 void free_dvmirror_session_table(DVMirrorSessionTable *table);

@@ -9,6 +9,7 @@
 %record(VSTeamPolicy)
 %record(VSPMACLearning)
 %record(VSPMACManagement)
+%required(char const *text)
 
 %{
 #include "helpers/policies.h"
@@ -23,8 +24,6 @@
 %include "vswitch/port_policies.h"
 %include "vswitch/teaming.h"
 %include "vswitch/port_mac_policies.h"
-
-%required(char const *text)
 
 %extend VSPvlanMapEntry {
   VSPvlanMapEntry __getitem__(int index) { return pvlan_entry_at($self, index); }

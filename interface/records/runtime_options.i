@@ -3,13 +3,12 @@
 
 %record(VSRuntimeOptionHeader)
 %sized_record(VSRuntimeOptions, runtime_options_new)
-
-%include "vswitch/runtime_options.h"
-
 %required(VSRuntimeOptionHeader *at)
 %required(VSRuntimeOptionHeader *option)
 %required(char *option_name)
 %required(char *option_text)
+
+%include "vswitch/runtime_options.h"
 
 %extend VSRuntimeOptions {
   VSRuntimeOptionHeader *add_int_option(VSRuntimeOptionHeader *at, char *option_name, int type,

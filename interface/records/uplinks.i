@@ -6,13 +6,12 @@
 %sized_record(VSUplinkPorts, uplink_ports_new)
 %sized_record(VSUplinkPortIds, uplink_port_ids_new)
 %view_only(VSUplinks, entries)
+%required(char const *text)
 
 %{
 #include "helpers/uplinks.h"
 %}
 %include "vswitch/uplinks.h"
-
-%required(char const *text)
 
 %extend VSUplinks {
   qex_uint32 __len__() { return $self->numEntries; }
