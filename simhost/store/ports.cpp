@@ -62,6 +62,41 @@ std::optional<Port> find_port(Transaction &transaction, PortNumber number) {
   return port_at(select);
 }
 
+std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey switch_key,
+                                             std::string_view external_id) {
+  auto select = transaction.query(
+      "SELECT number, switch, identifier, is_uplink FROM port"
+      " WHERE switch = ? AND external_id = ?");
+  if (!select.with(std::int64_t(switch_key)).with(external_id).next()) {
+    return std::nullopt;
+  }
+  return port_at(select);
+}
+
+std::optional<Port> next_port(Transaction &transaction, SwitchKey switch_key, PortNumber number) {
+  auto select = transaction.query(
+      "SELECT number, switch, identifier, is_uplink FROM port"
+      " WHERE switch = ? AND number > ? ORDER BY number LIMIT 1");
+  if (!select.with(std::int64_t(switch_key)).with(std::int64_t(number)).next()) {
+    return std::nullopt;
+  }
+  return port_at(select);
+}
+
+std::string external_id_of(Transaction &transaction, PortNumber number) {
+  auto select = transaction.query("SELECT ifnull(external_id, '') FROM port WHERE number = ?");
+  return select.with(std::int64_t(number)).next() ? select.text(0) : std::string();
+}
+
+bool set_external_id(Transaction &transaction, PortNumber number, std::string_view external_id) {
+  auto update = transaction.query("UPDATE OR IGNORE port SET external_id = ? WHERE number = ?");
+  return update.with(external_id).with(std::int64_t(number)).run() != 0;
+}
+
+void remove_port(Transaction &transaction, PortNumber number) {
+  transaction.query("DELETE FROM port WHERE number = ?").with(std::int64_t(number)).run();
+}
+
 std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key) {
   auto select = transaction.query(
       "SELECT number, switch, identifier, is_uplink FROM port WHERE switch = ? ORDER BY number");
@@ -74,10 +109,11 @@ std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key) {
 }
 
 std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKind kind) {
-  auto select = transaction.query("SELECT count(*) FROM port WHERE switch = ? AND is_uplink = ?");
-  select.with(std::int64_t(switch_key)).with(std::int64_t{kind == PortKind::uplink});
-  select.next();
-  return static_cast<std::uint32_t>(select.integer(0));
+  auto select = transaction.query(kind == PortKind::client
+                                      ? "SELECT clients FROM switch WHERE key = ?"
+                                      : "SELECT count(*) FROM port WHERE switch = ? AND is_uplink");
+  select.with(std::int64_t(switch_key));
+  return select.next() ? static_cast<std::uint32_t>(select.integer(0)) : 0;
 }
 
 std::optional<Uplink> find_uplink(Transaction &transaction, std::string_view name) {
@@ -113,6 +149,30 @@ std::vector<std::string> free_uplinks(Transaction &transaction) {
 void attach_uplink(Transaction &transaction, std::string_view name, PortNumber port) {
   auto update = transaction.query("UPDATE uplink SET port = ? WHERE name = ?");
   update.with(std::int64_t(port)).with(name).run();
+}
+
+void detach_uplink(Transaction &transaction, std::string_view name) {
+  transaction.query("UPDATE uplink SET port = NULL WHERE name = ?").with(name).run();
+}
+
+std::vector<Port> uplink_ports_of(Transaction &transaction, SwitchKey switch_key) {
+  auto select = transaction.query(
+      "SELECT number, switch, identifier, is_uplink FROM port"
+      " WHERE switch = ? AND is_uplink ORDER BY number");
+  select.with(std::int64_t(switch_key));
+  std::vector<Port> ports;
+  while (select.next()) {
+    ports.push_back(port_at(select));
+  }
+  return ports;
+}
+
+std::optional<std::string> uplink_at(Transaction &transaction, PortNumber number) {
+  auto select = transaction.query("SELECT name FROM uplink WHERE port = ?");
+  if (!select.with(std::int64_t(number)).next()) {
+    return std::nullopt;
+  }
+  return select.text(0);
 }
 
 std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switch_key) {

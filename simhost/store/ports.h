@@ -31,6 +31,17 @@ std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
                               std::string_view identifier);
 /// The port that has a number, whichever its switch is.
 std::optional<Port> find_port(Transaction &transaction, PortNumber number);
+/// The port of a switch that another system knows by `external_id`.
+std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey switch_key,
+                                             std::string_view external_id);
+/// The first port of a switch that was added after `number`; PortNumber{} comes before all.
+std::optional<Port> next_port(Transaction &transaction, SwitchKey switch_key, PortNumber number);
+/// What another system calls the port; empty if none does.
+std::string external_id_of(Transaction &transaction, PortNumber number);
+/// False if another port of the switch is known by it.
+bool set_external_id(Transaction &transaction, PortNumber number, std::string_view external_id);
+/// Removes a port with its properties; an uplink at it becomes free.
+void remove_port(Transaction &transaction, PortNumber number);
 /// The ports of a switch, in the order in which they were added.
 std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key);
 /// How many ports of that kind the switch has.
@@ -55,6 +66,12 @@ void add_uplink(Transaction &transaction, std::string_view name);
 std::vector<std::string> free_uplinks(Transaction &transaction);
 /// Puts an uplink at an uplink port.
 void attach_uplink(Transaction &transaction, std::string_view name, PortNumber port);
+/// Frees an uplink.
+void detach_uplink(Transaction &transaction, std::string_view name);
+/// The uplink ports of a switch in their order, with or without an uplink.
+std::vector<Port> uplink_ports_of(Transaction &transaction, SwitchKey switch_key);
+/// The uplink at a port.
+std::optional<std::string> uplink_at(Transaction &transaction, PortNumber number);
 /// The uplinks at the ports of a switch, in the order of the ports.
 std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switch_key);
 

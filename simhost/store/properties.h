@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <optional>
 #include <span>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -46,5 +47,17 @@ void put_property(Transaction &transaction, PropertyOwner const &owner, std::str
                   std::span<std::byte const> value, PropertyType type);
 std::optional<Property> find_property(Transaction &transaction, PropertyOwner const &owner,
                                       std::string_view name);
+/// False if the property was not there.
+bool remove_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name);
+
+struct NamedProperty {
+  std::string name;
+  Property property;
+};
+
+/// The properties of an owner, in the order of their names.
+std::vector<NamedProperty> properties_of(Transaction &transaction, PropertyOwner const &owner);
+/// Removes every property of that type from the host.
+void remove_properties(Transaction &transaction, PropertyType type);
 
 }  // namespace simhost::store

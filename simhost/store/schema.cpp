@@ -11,7 +11,10 @@ char const *const kSchema = R"sql(
     portset     TEXT NOT NULL UNIQUE,
     max_ports   INTEGER NOT NULL,
     version     INTEGER NOT NULL,
-    persistent  INTEGER NOT NULL
+    persistent  INTEGER NOT NULL,
+    associated  INTEGER NOT NULL DEFAULT 1,
+    -- Kept by the triggers below: counting the rows would make each new port dearer than the last.
+    clients     INTEGER NOT NULL DEFAULT 0
   ) STRICT;
 
   -- The number is what callers see as a numeric port id: never used twice, and 32 bits wide.
@@ -20,8 +23,18 @@ char const *const kSchema = R"sql(
     switch      INTEGER NOT NULL REFERENCES switch ON DELETE CASCADE,
     identifier  TEXT NOT NULL,
     is_uplink   INTEGER NOT NULL,
-    UNIQUE (switch, identifier)
+    external_id TEXT,
+    UNIQUE (switch, identifier),
+    UNIQUE (switch, external_id)
   ) STRICT;
+  CREATE INDEX port_by_switch ON port (switch, number);
+  CREATE INDEX uplink_port ON port (switch) WHERE is_uplink;
+  CREATE TRIGGER client_added AFTER INSERT ON port WHEN NOT new.is_uplink BEGIN
+    UPDATE switch SET clients = clients + 1 WHERE key = new.switch;
+  END;
+  CREATE TRIGGER client_removed AFTER DELETE ON port WHEN NOT old.is_uplink BEGIN
+    UPDATE switch SET clients = clients - 1 WHERE key = old.switch;
+  END;
 
   -- An uplink belongs to the host; it is free while it is at no port.
   CREATE TABLE uplink (
