@@ -13,6 +13,7 @@ import native
 import peer
 import records
 import reports
+import scalars
 from fields import Case, each, of_kind
 
 DEBUG_INTERPRETER = hasattr(sys, "gettotalrefcount")
@@ -137,13 +138,13 @@ def test_a_field_has_a_writer_unless_it_is_read_only(case: Case) -> None:
 
 def overflow(case: Case) -> Any:
     """The error for a value that is just out of range."""
-    return TypeError if fields.SCALARS[case.field.type] == fields.UNSIGNED_64 else OverflowError
+    return TypeError if scalars.BOUNDS[case.field.type] == scalars.UNSIGNED_64 else OverflowError
 
 
 @each(of_kind("plain"))
 def test_plain_fields_take_their_whole_range(case: Case, made: Any) -> None:
     field = case.field
-    low, high = fields.SCALARS[field.type]
+    low, high = scalars.BOUNDS[field.type]
     for value in (high, low, 1, True):
         assert case.set(made, value) is None
         assert case.get(made) == int(value)
@@ -158,7 +159,7 @@ def test_plain_fields_take_their_whole_range(case: Case, made: Any) -> None:
 
 @each(of_kind("plain", "bits"))
 def test_values_out_of_range_are_refused(case: Case, made: Any) -> None:
-    low, high = fields.SCALARS[case.field.type]
+    low, high = scalars.BOUNDS[case.field.type]
     before = contents(case, made)
     text = reports.argument(case.writer, 2, case.field.type)
     reports.raises(overflow(case), text, case.set, made, high + 1)
@@ -172,13 +173,13 @@ def test_what_is_no_integer_is_refused(case: Case, made: Any) -> None:
     text = reports.argument(case.writer, 2, case.field.type)
     for value in (1.0, "1", b"1", None, [], made):
         reports.raises(TypeError, text, case.set, made, value)
-    if fields.SCALARS[case.field.type] != fields.SIGNED_32:
+    if scalars.BOUNDS[case.field.type] != scalars.SIGNED_32:
         reports.raises(TypeError, text, case.set, made, 2**64)
         reports.raises(TypeError, text, case.set, made, -(2**63) - 1)
     assert contents(case, made) == before
 
 
-@each(case for case in of_kind("plain") if fields.SCALARS[case.field.type] == fields.SIGNED_32)
+@each(case for case in of_kind("plain") if scalars.BOUNDS[case.field.type] == scalars.SIGNED_32)
 def test_beyond_64_bits_minus_one_is_stored_and_the_error_follows(case: Case, made: Any) -> None:
     if DEBUG_INTERPRETER:
         pytest_child_aborts(case)
@@ -234,7 +235,7 @@ def bits_of(case: Case) -> Tuple[int, int]:
 def test_bit_fields_lie_where_they_must_and_leave_their_neighbours(case: Case, made: Any) -> None:
     size = size_of(case)
     shift, mask = bits_of(case)
-    _, high = fields.SCALARS[case.field.type]
+    _, high = scalars.BOUNDS[case.field.type]
     everything = (1 << (8 * size)) - 1
     for background in (0, everything):
         for value in (0, 1, mask, mask >> 1, high & ~mask, 5):

@@ -4,10 +4,11 @@ import json
 import os
 import subprocess
 import sys
-from typing import Any, Dict, FrozenSet, List, Set, Tuple
+from typing import Any, Dict, List, Set, Tuple
 
 import _libvswitch as vs
 import functions
+import pointer_types
 import records
 
 IMPORT_ATTRIBUTES = {"__name__", "__doc__", "__package__", "__loader__", "__spec__", "__file__"}
@@ -26,12 +27,6 @@ def expected_constants() -> List[Tuple[str, Any]]:
             name, value = line.split(" = ")
             rows.append((name, value[1:-1] if value.startswith('"') else int(value)))
     return rows
-
-
-def expected_types() -> Set[FrozenSet[str]]:
-    text = (records.TABLE.parent / "types.txt").read_text(encoding="ascii")
-    lines = [line for line in text.splitlines() if line and not line.startswith("#")]
-    return {frozenset(line.split("|")) for line in lines}
 
 
 def test_constants_in_order() -> None:
@@ -80,7 +75,7 @@ def test_types() -> None:
         [sys.executable, "-c", program, folder], check=True, capture_output=True, text=True
     )
     (table,) = json.loads(done.stdout)
-    assert {frozenset(spellings) for spellings in table.values()} == expected_types()
+    assert {frozenset(spellings) for spellings in table.values()} == set(pointer_types.read())
     assert len(table) == 158
 
 

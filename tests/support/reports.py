@@ -9,6 +9,11 @@ def argument(method: str, position: int, c_type: str) -> str:
     return f"in method '{method}', argument {position} of type '{c_type}'"
 
 
+def argument_count(method: str, expected: int, given: int) -> str:
+    plural = "" if expected == 1 else "s"
+    return f"{method}() takes exactly {expected} argument{plural} ({given} given)"
+
+
 def null_argument(method: str, position: int, c_type: str) -> str:
     return "invalid null reference " + argument(method, position, c_type)
 
