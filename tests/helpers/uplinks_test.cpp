@@ -63,7 +63,7 @@ using Lists = testing::Types<Uplinks, Ports, PortIds>;
 TYPED_TEST_SUITE(UplinkList, Lists);
 
 TYPED_TEST(UplinkList, IsMadeWithItsRoomAndItsCountAlone) {
-  constexpr int kCount = 100;
+  constexpr int kCount = 45;
   constexpr size_t kSize = TypeParam::kHeader + kCount * TypeParam::kRoom;
   FreshMemoryIsNotZero const guard;
   std::string expected = fresh_memory(kSize);
@@ -72,7 +72,7 @@ TYPED_TEST(UplinkList, IsMadeWithItsRoomAndItsCountAlone) {
   ASSERT_NE(nullptr, list);
   EXPECT_GE(malloc_usable_size(list.get()), kSize);
   EXPECT_LT(malloc_usable_size(list.get()), kSize + kRounding);
-  expected.replace(TypeParam::kHeader - 4, 4, std::string("d\0\0\0", 4));
+  expected.replace(TypeParam::kHeader - 4, 4, std::string("-\0\0\0", 4));
   EXPECT_EQ(expected, std::string(reinterpret_cast<char const *>(list.get()), kSize));
 }
 
