@@ -1,0 +1,60 @@
+// Looking up, and refusing.
+#include "core/known.h"
+
+#include <optional>
+#include <utility>
+
+#include "core/giving_up.h"
+#include "store/store.h"
+
+namespace simhost {
+namespace {
+
+template <typename Found>
+Found known(std::optional<Found> found) {
+  if (!found) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  return *std::move(found);
+}
+
+}  // namespace
+
+store::FoundSwitch known_switch(store::Transaction &transaction, std::string_view name,
+                                store::SwitchName kind) {
+  return known(store::find_switch(transaction, kind, name));
+}
+
+store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                       std::string_view identifier) {
+  return known(store::find_port(transaction, switch_key, identifier));
+}
+
+store::Port known_port(store::Transaction &transaction, store::PortNumber number) {
+  return known(store::find_port(transaction, number));
+}
+
+store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                       store::PortNumber number) {
+  auto port = known_port(transaction, number);
+  if (port.switch_key != switch_key) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  return port;
+}
+
+store::Uplink known_uplink(store::Transaction &transaction, std::string_view name) {
+  return known(store::find_uplink(transaction, name));
+}
+
+store::Uplink known_uplink(store::Transaction &transaction, store::SwitchKey switch_key,
+                           std::string_view name) {
+  auto uplink = known_uplink(transaction, name);
+  if (!uplink.port) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  known_port(transaction, switch_key, *uplink.port);
+  return uplink;
+}
+
+}  // namespace simhost
