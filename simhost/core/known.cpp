@@ -25,6 +25,19 @@ store::FoundSwitch known_switch(store::Transaction &transaction, std::string_vie
   return known(store::find_switch(transaction, kind, name));
 }
 
+store::FoundSwitch running_switch(store::Transaction &transaction, std::string_view alias) {
+  auto found = known_switch(transaction, alias);
+  if (!found.row.associated) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  return found;
+}
+
+store::Port known_port(store::Transaction &transaction, store::SwitchName kind,
+                       std::string_view switch_name, std::string_view identifier) {
+  return known_port(transaction, known_switch(transaction, switch_name, kind).key, identifier);
+}
+
 store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_key,
                        std::string_view identifier) {
   return known(store::find_port(transaction, switch_key, identifier));

@@ -1,48 +1,143 @@
-// The rules of the keys that have a meaning to the host.
+// What is stored under a key and what the host keeps elsewhere, as one set of properties.
 #include "core/properties.h"
 
 #include <algorithm>
-#include <array>
-#include <cstdint>
-#include <cstring>
+#include <utility>
 
 #include "core/giving_up.h"
-#include "vswitch/properties.h"
+#include "store/store.h"
 
 namespace simhost {
 namespace {
 
-constexpr std::uint32_t kLeastMtu = 1280;
-constexpr std::uint32_t kGreatestMtu = 9190;
+constexpr std::size_t kLongestKey = 255;
 
-struct Rule {
-  std::string_view key;
-  bool (*accepts)(std::span<std::byte const> value);
-};
-
-// 4 bytes, host byte order.
-bool is_mtu(std::span<std::byte const> value) {
-  std::uint32_t mtu = 0;
-  if (value.size() != sizeof mtu) {
-    return false;
-  }
-  std::memcpy(&mtu, value.data(), sizeof mtu);
-  return mtu >= kLeastMtu && mtu <= kGreatestMtu;
+// The key, if it has a meaning for such an owner.
+PropertyKey const *key_of(store::PropertyOwner const &owner, std::string_view name) {
+  auto const *const key = find_property_key(name);
+  return key != nullptr && key->scope == owner.scope ? key : nullptr;
 }
 
-constexpr std::array kRules{Rule{.key = VSPROP_MTU, .accepts = is_mtu}};
+void check_key(store::PropertyOwner const &owner, std::string_view name) {
+  if (name.empty()) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  if (name.size() > kLongestKey) {
+    throw Refused(QEX_NAME_TOO_LONG);
+  }
+  auto const *const key = find_property_key(name);
+  if (key != nullptr && key->scope != owner.scope) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+}
+
+std::optional<store::Property> kept_elsewhere(store::Transaction &transaction,
+                                              store::PropertyOwner const &owner,
+                                              PropertyKey const &key) {
+  auto value = key.read(transaction, owner);
+  if (!value) {
+    return std::nullopt;
+  }
+  return store::Property{.type = key.type, .value = *std::move(value)};
+}
+
+bool by_name(store::NamedProperty const &left, store::NamedProperty const &right) {
+  return left.name < right.name;
+}
 
 }  // namespace
 
+store::PropertyType property_type(std::uint32_t number) {
+  switch (number) {
+    case CONFIG_PROP_TYPE:
+    case RUNTIME_PROP_TYPE:
+    case VOLATILE_PROP_TYPE:
+    case POLICY_PROP_TYPE:
+      return store::PropertyType(number);
+    default:
+      throw Refused(QEX_BAD_PARAM);
+  }
+}
+
 void set_property(store::Transaction &transaction, store::PropertyOwner const &owner,
-                  std::string_view key, std::span<std::byte const> value,
-                  store::PropertyType type) {
-  auto const rule =
-      std::find_if(kRules.begin(), kRules.end(), [&](Rule const &r) { return r.key == key; });
-  if (rule != kRules.end() && !rule->accepts(value)) {
+                  std::string_view key, BytesView value, store::PropertyType type) {
+  check_key(owner, key);
+  auto const *const known = key_of(owner, key);
+  if (known == nullptr) {
+    store::put_property(transaction, owner, key, value, type);
+    return;
+  }
+  Setting const setting{.transaction = transaction, .owner = owner, .value = value};
+  if (known->read != nullptr && known->write == nullptr) {
+    throw Refused(QEX_READ_ONLY);
+  }
+  known->check(setting);
+  if (known->write != nullptr) {
+    known->write(setting);
+  } else {
+    store::put_property(transaction, owner, key, value, type);
+  }
+}
+
+void set_property(store::Transaction &transaction, store::PropertyOwner const &owner,
+                  std::string_view key, BytesView value) {
+  auto const *const known = key_of(owner, key);
+  if (known == nullptr) {
     throw Refused(QEX_BAD_PARAM);
   }
-  store::put_property(transaction, owner, key, value, type);
+  set_property(transaction, owner, key, value, known->type);
+}
+
+std::optional<store::Property> get_property(store::Transaction &transaction,
+                                            store::PropertyOwner const &owner,
+                                            std::string_view key) {
+  auto const *const known = key_of(owner, key);
+  return known != nullptr && known->read != nullptr ? kept_elsewhere(transaction, owner, *known)
+                                                    : store::find_property(transaction, owner, key);
+}
+
+std::vector<store::NamedProperty> list_properties(store::Transaction &transaction,
+                                                  store::PropertyOwner const &owner) {
+  auto all = store::properties_of(transaction, owner);
+  for (auto const &key : property_keys()) {
+    if (key.scope == owner.scope && key.read != nullptr) {
+      if (auto property = kept_elsewhere(transaction, owner, key)) {
+        all.push_back({.name = std::string(key.name), .property = *std::move(property)});
+      }
+    }
+  }
+  std::sort(all.begin(), all.end(), by_name);
+  return all;
+}
+
+std::optional<store::NamedProperty> next_property(store::Transaction &transaction,
+                                                  store::PropertyOwner const &owner,
+                                                  std::string_view name) {
+  auto all = list_properties(transaction, owner);
+  auto const next = std::find_if(all.begin(), all.end(), [&](store::NamedProperty const &property) {
+    return property.name > name;
+  });
+  if (next == all.end()) {
+    return std::nullopt;
+  }
+  return std::move(*next);
+}
+
+void clear_property(store::Transaction &transaction, store::PropertyOwner const &owner,
+                    std::string_view key) {
+  check_key(owner, key);
+  auto const *const known = key_of(owner, key);
+  if (known != nullptr && known->read != nullptr) {
+    throw Refused(QEX_READ_ONLY);
+  }
+  if (!store::remove_property(transaction, owner, key)) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+}
+
+void reset_property(store::Transaction &transaction, store::PropertyOwner const &owner,
+                    std::string_view key) {
+  store::remove_property(transaction, owner, key);
 }
 
 }  // namespace simhost

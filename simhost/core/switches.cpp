@@ -4,12 +4,13 @@
 #include <algorithm>
 #include <array>
 #include <cstdio>
-#include <cstring>
 #include <random>
 #include <span>
 #include <string>
 
 #include "core/giving_up.h"
+#include "core/known.h"
+#include "core/ports.h"
 #include "core/properties.h"
 #include "store/properties.h"
 #include "store/store.h"
@@ -38,18 +39,16 @@ constexpr std::size_t kLongestPortset = VS_PORTSET_NAME_MAX - 1;
 constexpr std::uint16_t kLeastVlan = 1;
 constexpr std::uint16_t kGreatestVlan = 4094;
 
-store::FoundSwitch known_switch(store::Transaction &transaction, std::string_view name,
-                                SwitchName kind = SwitchName::alias) {
-  auto found = store::find_switch(transaction, kind, name);
-  if (!found) {
-    throw Refused(QEX_NOT_FOUND);
-  }
-  return *std::move(found);
-}
-
 void check_length(std::string_view name, std::size_t longest) {
   if (name.size() > longest) {
     throw Refused(QEX_NAME_TOO_LONG);
+  }
+}
+
+void check_alias(std::string_view alias) {
+  check_length(alias, kLongestAlias);
+  if (alias.empty()) {
+    throw Refused(QEX_BAD_PARAM);
   }
 }
 
@@ -80,11 +79,11 @@ std::string fresh_portset(store::Transaction &transaction) {
 }
 
 store::Switch row_of(store::Transaction &transaction, SwitchSpec const &spec) {
-  check_length(spec.alias, kLongestAlias);
+  check_alias(spec.alias);
   check_length(spec.identifier, kLongestIdentifier);
   check_length(spec.portset, kLongestPortset);
   auto const max_ports = or_default(spec.max_ports, kDefaultMaxPorts);
-  if (spec.alias.empty() || max_ports > kGreatestMaxPorts) {
+  if (max_ports > kGreatestMaxPorts) {
     throw Refused(QEX_BAD_PARAM);
   }
   return {.alias = std::string(spec.alias),
@@ -92,22 +91,11 @@ store::Switch row_of(store::Transaction &transaction, SwitchSpec const &spec) {
           .portset = spec.portset.empty() ? fresh_portset(transaction) : std::string(spec.portset),
           .max_ports = max_ports,
           .version = or_default(spec.version, kDefaultVersion),
-          .persistent = spec.persistent};
+          .persistent = spec.persistent,
+          .associated = spec.associated};
 }
 
-void store_mtu(store::Transaction &transaction, store::SwitchKey key, std::uint32_t mtu) {
-  set_property(transaction, PropertyOwner::global(key), VSPROP_MTU,
-               std::as_bytes(std::span(&mtu, 1)), store::PropertyType::config);
-}
-
-std::uint32_t stored_mtu(store::Transaction &transaction, store::SwitchKey key) {
-  std::uint32_t mtu = kDefaultMtu;
-  if (auto const property =
-          store::find_property(transaction, PropertyOwner::global(key), VSPROP_MTU)) {
-    std::memcpy(&mtu, property->value.data(), sizeof mtu);
-  }
-  return mtu;
-}
+constexpr RecordProperty<std::uint32_t> kMtu{.key = VSPROP_MTU, .unset = kDefaultMtu};
 
 void attach_free_uplinks(store::Transaction &transaction, store::SwitchKey key,
                          std::uint32_t count) {
@@ -116,15 +104,12 @@ void attach_free_uplinks(store::Transaction &transaction, store::SwitchKey key,
     throw Refused(QEX_NO_RESOURCES);
   }
   for (std::uint32_t at = 0; at < count; ++at) {
-    auto const port = store::add_port(transaction, key, "uplink" + std::to_string(at + 1),
-                                      store::PortKind::uplink);
-    store::attach_uplink(transaction, free[at], port.value());
+    add_uplink_port(transaction, key, free[at]);
   }
 }
 
-// The caller's field is longer than any name that the host accepts, and zeroed.
-void copy_name(std::span<qex_uint8> field, std::string_view name) {
-  std::copy(name.begin(), name.end(), field.begin());
+store::Switch row_behind(store::Transaction &transaction, store::SwitchKey key) {
+  return store::find_switch(transaction, key).value().row;
 }
 
 }  // namespace
@@ -134,7 +119,7 @@ void create_switch(store::Transaction &transaction, SwitchSpec const &spec) {
   if (!key) {
     throw Refused(QEX_EXISTS);
   }
-  store_mtu(transaction, *key, or_default(spec.mtu, kDefaultMtu));
+  write(transaction, PropertyOwner::global(*key), kMtu, or_default(spec.mtu, kDefaultMtu));
   attach_free_uplinks(transaction, *key, spec.uplink_count);
 }
 
@@ -142,24 +127,43 @@ void destroy_switch(store::Transaction &transaction, std::string_view alias) {
   store::remove_switch(transaction, known_switch(transaction, alias).key);
 }
 
+void change_version(store::Transaction &transaction, store::SwitchKey key, std::uint32_t version) {
+  if (version == 0) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  store::set_version(transaction, key, version);
+}
+
+void change_max_ports(store::Transaction &transaction, store::SwitchKey key,
+                      std::uint32_t max_ports) {
+  if (max_ports == 0 || max_ports > kGreatestMaxPorts) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  if (max_ports < store::count_ports(transaction, key, store::PortKind::client)) {
+    throw Refused(QEX_LIMIT_EXCEEDED);
+  }
+  store::set_max_ports(transaction, key, max_ports);
+}
+
 void set_mtu(store::Transaction &transaction, std::string_view alias, std::uint32_t mtu) {
-  store_mtu(transaction, known_switch(transaction, alias).key, mtu);
+  auto const owner = PropertyOwner::global(known_switch(transaction, alias).key);
+  write(transaction, owner, kMtu, mtu);
 }
 
 std::uint32_t mtu_of(store::Transaction &transaction, std::string_view alias) {
-  return stored_mtu(transaction, known_switch(transaction, alias).key);
+  return read(transaction, PropertyOwner::global(known_switch(transaction, alias).key), kMtu);
 }
 
 VSInfo switch_info(store::Transaction &transaction, std::string_view alias) {
-  auto const [key, row] = known_switch(transaction, alias);
+  auto const [key, row] = running_switch(transaction, alias);
   VSInfo info{};
-  info.mtu = stored_mtu(transaction, key);
+  info.mtu = read(transaction, PropertyOwner::global(key), kMtu);
   info.minValidVlan = kLeastVlan;
   info.maxValidVlan = kGreatestVlan;
   info.activePorts = store::count_ports(transaction, key, store::PortKind::client);
   info.maxPorts = row.max_ports;
-  copy_name(info.dvsName, row.alias);
-  copy_name(info.nebID, row.identifier);
+  put_text(info.dvsName, row.alias);
+  put_text(info.nebID, row.identifier);
   return info;
 }
 
@@ -177,7 +181,37 @@ std::string alias_of_portset(store::Transaction &transaction, std::string_view p
 
 std::vector<store::AttachedUplink> uplinks_of(store::Transaction &transaction,
                                               std::string_view alias) {
-  return store::uplinks_of(transaction, known_switch(transaction, alias).key);
+  return store::uplinks_of(transaction, running_switch(transaction, alias).key);
+}
+
+std::optional<Bytes> read_alias(store::Transaction &transaction,
+                                store::PropertyOwner const &owner) {
+  return bytes_of_text(row_behind(transaction, owner.switch_key).alias);
+}
+
+std::optional<Bytes> read_version(store::Transaction &transaction,
+                                  store::PropertyOwner const &owner) {
+  auto const version = row_behind(transaction, owner.switch_key).version;
+  auto const bytes = bytes_of(version);
+  return Bytes(bytes.begin(), bytes.end());
+}
+
+std::optional<Bytes> read_portset(store::Transaction &transaction,
+                                  store::PropertyOwner const &owner) {
+  return bytes_of_text(row_behind(transaction, owner.switch_key).portset);
+}
+
+void write_alias(Setting const &setting) {
+  auto const alias = text_of(setting.value);
+  check_alias(alias);
+  if (!store::rename_switch(setting.transaction, setting.owner.switch_key, alias)) {
+    throw Refused(QEX_EXISTS);
+  }
+}
+
+void write_version(Setting const &setting) {
+  change_version(setting.transaction, setting.owner.switch_key,
+                 record_of<std::uint32_t>(setting.value));
 }
 
 }  // namespace simhost

@@ -3,15 +3,21 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "core/api.h"
+#include "core/property_keys.h"
 #include "store/ports.h"
 #include "vswitch/switch_info.h"
 
 namespace simhost {
+
+/// MTUs in bytes.
+inline constexpr std::uint32_t kLeastMtu = 1280;
+inline constexpr std::uint32_t kGreatestMtu = 9190;
 
 /// What a new switch is to be. An empty identifier or portset and a 0 leave the choice to the host.
 struct SwitchSpec {
@@ -23,6 +29,7 @@ struct SwitchSpec {
   std::uint32_t version = 0;
   std::uint32_t mtu = 0;  ///< bytes
   std::uint32_t uplink_count = 0;
+  bool associated = true;  ///< runs on this host
 };
 
 /// Creates a switch and attaches free uplinks to its uplink ports "uplink1", "uplink2", ... Refuses
@@ -31,6 +38,14 @@ struct SwitchSpec {
 SIMHOST_API void create_switch(store::Transaction &transaction, SwitchSpec const &spec);
 /// Destroys a switch with its ports and properties; its uplinks become free.
 SIMHOST_API void destroy_switch(store::Transaction &transaction, std::string_view alias);
+
+/// Refuses 0 (QEX_BAD_PARAM).
+SIMHOST_API void change_version(store::Transaction &transaction, store::SwitchKey key,
+                                std::uint32_t version);
+/// Refuses 0 and more than a switch can have (QEX_BAD_PARAM), and fewer than it has
+/// (QEX_LIMIT_EXCEEDED).
+SIMHOST_API void change_max_ports(store::Transaction &transaction, store::SwitchKey key,
+                                  std::uint32_t max_ports);
 
 /// From one name of a switch to another.
 SIMHOST_API std::string identifier_of(store::Transaction &transaction, std::string_view alias);
@@ -46,5 +61,15 @@ SIMHOST_API VSInfo switch_info(store::Transaction &transaction, std::string_view
 /// The uplinks of a switch, in the order of its uplink ports.
 SIMHOST_API std::vector<store::AttachedUplink> uplinks_of(store::Transaction &transaction,
                                                           std::string_view alias);
+
+/// The values of QEX_NEBPROP_SWITCH_ALIAS, QEX_NEBPROP_SWITCH_VERSION and QEX_NEBPROP_HOST_PROXY,
+/// which are names and a number of the switch; the first two can be set.
+std::optional<Bytes> read_alias(store::Transaction &transaction, store::PropertyOwner const &owner);
+std::optional<Bytes> read_version(store::Transaction &transaction,
+                                  store::PropertyOwner const &owner);
+std::optional<Bytes> read_portset(store::Transaction &transaction,
+                                  store::PropertyOwner const &owner);
+void write_alias(Setting const &setting);
+void write_version(Setting const &setting);
 
 }  // namespace simhost

@@ -1,0 +1,303 @@
+// Ports over the store: bounds, what they are called, which uplink is where.
+#include "core/ports.h"
+
+#include <algorithm>
+#include <set>
+
+#include "core/giving_up.h"
+#include "core/known.h"
+#include "core/properties.h"
+#include "qexapi/links.h"
+#include "qexapi/switch_ports.h"
+#include "qexapi/switch_properties.h"
+#include "store/store.h"
+#include "store/switches.h"
+#include "vswitch/teaming.h"
+#include "vswitch/uplinks.h"
+
+namespace simhost {
+namespace {
+
+constexpr std::size_t kLongestIdentifier = QEX_NEB_PORT_ID_MAX_LEN - 1;
+constexpr std::size_t kLongestName = QEX_NEB_NAME_MAX_LEN - 1;
+
+void check_name(std::string_view name, std::size_t longest) {
+  if (name.empty()) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  if (name.size() > longest) {
+    throw Refused(QEX_NAME_TOO_LONG);
+  }
+}
+
+store::Port added_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                       std::string_view identifier, store::PortKind kind) {
+  check_name(identifier, kLongestIdentifier);
+  auto const number = store::add_port(transaction, switch_key, identifier, kind);
+  if (!number) {
+    throw Refused(QEX_EXISTS);
+  }
+  return {.number = *number,
+          .switch_key = switch_key,
+          .identifier = std::string(identifier),
+          .kind = kind};
+}
+
+std::string name_of(store::Transaction &transaction, store::Port const &port) {
+  return alias_of(transaction, port).value_or(port.identifier);
+}
+
+void check_uplink_ports(std::vector<UplinkPort> const &ports) {
+  if (ports.size() > QEX_TEAM_MAX_UPLINKS) {
+    throw Refused(QEX_LIMIT_EXCEEDED);
+  }
+  std::set<std::string_view> names;
+  std::set<std::string_view> identifiers;
+  for (auto const &port : ports) {
+    check_name(port.name, kLongestName);
+    check_name(port.identifier, kLongestIdentifier);
+    if (!names.insert(port.name).second || !identifiers.insert(port.identifier).second) {
+      throw Refused(QEX_EXISTS);
+    }
+  }
+}
+
+// An uplink port of that identifier, whether or not the switch has it yet.
+store::Port uplink_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                        std::string const &identifier) {
+  auto const found = store::find_port(transaction, switch_key, identifier);
+  if (!found) {
+    return added_port(transaction, switch_key, identifier, store::PortKind::uplink);
+  }
+  if (found->kind != store::PortKind::uplink) {
+    throw Refused(QEX_EXISTS);
+  }
+  return *found;
+}
+
+// "uplink1", "uplink2", ...: the first that no port of the switch is called.
+std::string fresh_uplink_identifier(store::Transaction &transaction, store::SwitchKey switch_key) {
+  for (unsigned number = 1;; ++number) {
+    auto identifier = "uplink" + std::to_string(number);
+    if (!store::find_port(transaction, switch_key, identifier)) {
+      return identifier;
+    }
+  }
+}
+
+store::Port vacant_uplink_port(store::Transaction &transaction, store::SwitchKey switch_key) {
+  auto const ports = store::uplink_ports_of(transaction, switch_key);
+  auto const vacant = std::find_if(ports.begin(), ports.end(), [&](store::Port const &port) {
+    return !store::uplink_at(transaction, port.number);
+  });
+  if (vacant != ports.end()) {
+    return *vacant;
+  }
+  if (ports.size() >= QEX_TEAM_MAX_UPLINKS) {
+    throw Refused(QEX_LIMIT_EXCEEDED);
+  }
+  return added_port(transaction, switch_key, fresh_uplink_identifier(transaction, switch_key),
+                    store::PortKind::uplink);
+}
+
+// A count and as many texts of `Width` bytes.
+template <std::size_t Width>
+Bytes list_of(std::vector<UplinkPort> const &ports, std::string UplinkPort::*text) {
+  auto const count = static_cast<qex_uint32>(ports.size());
+  auto const head = bytes_of(count);
+  Bytes list(head.begin(), head.end());
+  for (auto const &port : ports) {
+    auto const field = list.insert(list.end(), Width, std::byte{0});
+    auto const bytes = std::as_bytes(std::span(port.*text));
+    std::copy(bytes.begin(), bytes.end(), field);
+  }
+  return list;
+}
+
+template <std::size_t Width>
+std::vector<std::string> texts_of(BytesView list) {
+  auto const count = record_at<qex_uint32>(list);
+  auto const fields = list.subspan(sizeof count);
+  if (fields.size() != std::size_t{count} * Width) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  std::vector<std::string> texts;
+  for (std::size_t at = 0; at < fields.size(); at += Width) {
+    auto const *const text = reinterpret_cast<char const *>(&fields[at]);
+    texts.emplace_back(text_in(std::span(text, Width)));
+  }
+  return texts;
+}
+
+}  // namespace
+
+store::Port add_client_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                            std::string_view identifier) {
+  auto port = added_port(transaction, switch_key, identifier, store::PortKind::client);
+  auto const count = store::count_ports(transaction, switch_key, store::PortKind::client);
+  if (count > store::find_switch(transaction, switch_key).value().row.max_ports) {
+    throw Refused(QEX_LIMIT_EXCEEDED);
+  }
+  return port;
+}
+
+void set_external_id(store::Transaction &transaction, store::Port const &port,
+                     std::string_view external_id) {
+  check_name(external_id, kLongestIdentifier);
+  if (!store::set_external_id(transaction, port.number, external_id)) {
+    throw Refused(QEX_EXISTS);
+  }
+}
+
+void remove_port(store::Transaction &transaction, store::Port const &port) {
+  if (store::uplink_at(transaction, port.number)) {
+    throw Refused(QEX_BUSY);
+  }
+  store::remove_port(transaction, port.number);
+}
+
+store::Port known_external_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                                std::string_view external_id) {
+  auto port = store::find_port_by_external_id(transaction, switch_key, external_id);
+  if (!port) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  return *std::move(port);
+}
+
+store::Port known_uplink_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                              std::uint32_t number) {
+  auto port = store::find_port(transaction, store::PortNumber(number));
+  if (!port || port->switch_key != switch_key || port->kind != store::PortKind::uplink) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  return *std::move(port);
+}
+
+DVSPortType type_of(store::Transaction &transaction, store::Port const &port) {
+  return read(transaction, owner_of(port),
+              RecordProperty<DVSPortType>{QEX_NEBPROP_PORT_TYPE, DVSPORT_TYPE_ACTIVE});
+}
+
+std::uint32_t connect_id_of(store::Transaction &transaction, store::Port const &port) {
+  return read(transaction, owner_of(port),
+              RecordProperty<std::uint32_t>{QEX_NEBPROP_PORT_CONNECTID, 0});
+}
+
+std::optional<std::string> alias_of(store::Transaction &transaction, store::Port const &port) {
+  auto const property = get_property(transaction, owner_of(port), QEX_NEBPROP_PORT_ALIAS);
+  return property ? std::optional(text_of(property->value)) : std::nullopt;
+}
+
+std::vector<UplinkPort> named_uplink_ports(store::Transaction &transaction,
+                                           store::SwitchKey switch_key) {
+  std::vector<UplinkPort> ports;
+  for (auto const &port : store::uplink_ports_of(transaction, switch_key)) {
+    ports.push_back({.name = name_of(transaction, port), .identifier = port.identifier});
+  }
+  return ports;
+}
+
+void set_uplink_ports(store::Transaction &transaction, store::SwitchKey switch_key,
+                      std::vector<UplinkPort> const &ports) {
+  check_uplink_ports(ports);
+  for (auto const &port : store::uplink_ports_of(transaction, switch_key)) {
+    if (std::none_of(ports.begin(), ports.end(),
+                     [&](UplinkPort const &kept) { return kept.identifier == port.identifier; })) {
+      store::remove_port(transaction, port.number);
+    }
+  }
+  for (auto const &[name, identifier] : ports) {
+    auto const port = uplink_port(transaction, switch_key, identifier);
+    if (name_of(transaction, port) != name) {
+      set_property(transaction, owner_of(port), QEX_NEBPROP_PORT_ALIAS, bytes_of_text(name));
+    }
+  }
+}
+
+void add_uplink_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                     std::string_view uplink) {
+  auto const found = store::find_uplink(transaction, uplink);
+  if (!found) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  if (found->port) {
+    auto const port = store::find_port(transaction, *found->port).value();
+    throw Refused(port.switch_key == switch_key ? QEX_EXISTS : QEX_BUSY);
+  }
+  store::attach_uplink(transaction, uplink, vacant_uplink_port(transaction, switch_key).number);
+}
+
+void remove_uplink_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                        std::string_view uplink) {
+  auto const found = store::find_uplink(transaction, uplink);
+  if (!found || !found->port ||
+      store::find_port(transaction, *found->port).value().switch_key != switch_key) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  store::remove_port(transaction, *found->port);
+}
+
+std::optional<Bytes> read_uplink_names(store::Transaction &transaction,
+                                       store::PropertyOwner const &owner) {
+  return list_of<QEX_NEB_NAME_MAX_LEN>(named_uplink_ports(transaction, owner.switch_key),
+                                       &UplinkPort::name);
+}
+
+std::optional<Bytes> read_uplink_ids(store::Transaction &transaction,
+                                     store::PropertyOwner const &owner) {
+  return list_of<QEX_NEB_PORT_ID_MAX_LEN>(named_uplink_ports(transaction, owner.switch_key),
+                                          &UplinkPort::identifier);
+}
+
+std::optional<Bytes> read_port_status(store::Transaction &transaction,
+                                      store::PropertyOwner const &owner) {
+  auto const port = store::find_port(transaction, owner.port_number.value()).value();
+  bool const in_use =
+      port.kind == store::PortKind::uplink
+          ? store::uplink_at(transaction, port.number).has_value()
+          : get_property(transaction, owner, QEX_NEBPROP_PORT_VNIC_CONNECTEE).has_value();
+  auto const link =
+      read(transaction, owner,
+           RecordProperty<qex_uint32>{QEX_NEBPROP_PORT_LINK_STATUS, QEX_LINK_STATE_UP});
+  bool const blocked =
+      read(transaction, owner, RecordProperty<qex_Bool>{QEX_NEBPROP_PORT_BLOCK, 0}) != 0;
+  qex_NEBPortStatus status{};
+  status.flags =
+      (in_use ? qex_uint64{QEX_NEBPORT_STATUS_INUSE} : 0U) |
+      (in_use && link == QEX_LINK_STATE_UP ? qex_uint64{QEX_NEBPORT_STATUS_LINKUP} : 0U) |
+      (blocked ? qex_uint64{QEX_NEBPORT_STATUS_BLOCKED} : 0U);
+  status.portID = static_cast<qex_uint32>(port.number);
+  name_of(transaction, port).copy(status.displayStr, sizeof status.displayStr - 1);
+  auto const bytes = bytes_of(status);
+  return Bytes(bytes.begin(), bytes.end());
+}
+
+void write_uplink_names(Setting const &setting) {
+  auto const names = texts_of<QEX_NEB_NAME_MAX_LEN>(setting.value);
+  auto ports = named_uplink_ports(setting.transaction, setting.owner.switch_key);
+  ports.resize(std::min(ports.size(), names.size()));
+  for (std::size_t at = 0; at < names.size(); ++at) {
+    if (at < ports.size()) {
+      ports[at].name = names[at];
+    } else {
+      ports.push_back({.name = names[at], .identifier = names[at]});
+    }
+  }
+  set_uplink_ports(setting.transaction, setting.owner.switch_key, ports);
+}
+
+void write_uplink_ids(Setting const &setting) {
+  auto const before = named_uplink_ports(setting.transaction, setting.owner.switch_key);
+  std::vector<UplinkPort> ports;
+  for (auto const &identifier : texts_of<QEX_NEB_PORT_ID_MAX_LEN>(setting.value)) {
+    auto const kept = std::find_if(before.begin(), before.end(), [&](UplinkPort const &port) {
+      return port.identifier == identifier;
+    });
+    ports.push_back(
+        kept != before.end() ? *kept : UplinkPort{.name = identifier, .identifier = identifier});
+  }
+  set_uplink_ports(setting.transaction, setting.owner.switch_key, ports);
+}
+
+}  // namespace simhost

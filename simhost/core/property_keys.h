@@ -1,0 +1,46 @@
+// The keys that have a meaning to the host: whose they are, what their bytes may be, who keeps
+// them.
+#pragma once
+
+#include <optional>
+#include <span>
+#include <string_view>
+
+#include "core/bytes.h"
+#include "store/properties.h"
+
+namespace simhost {
+
+/// A property and the bytes that it is to have.
+struct Setting {
+  store::Transaction &transaction;
+  store::PropertyOwner const &owner;
+  BytesView value;
+};
+
+/// Who defines a key.
+enum class KeyFamily {
+  common,  ///< distributed switches of every kind
+  vendor,  ///< this kind of switch
+  extra,   ///< nobody here
+};
+
+struct PropertyKey {
+  std::string_view name;
+  store::PropertyScope scope;
+  KeyFamily family;
+  store::PropertyType type;  ///< what the typed calls store it as
+  /// Refuses bytes that the property may not have.
+  void (*check)(Setting const &setting);
+  /// If the host keeps the value elsewhere than under the key: reads it; nothing if it has none.
+  std::optional<Bytes> (*read)(store::Transaction &, store::PropertyOwner const &) = nullptr;
+  /// Likewise: writes it; null if callers may only read it.
+  void (*write)(Setting const &setting) = nullptr;
+};
+
+/// All of them.
+std::span<PropertyKey const> property_keys();
+/// The key of that name; null if the name has no meaning to the host.
+PropertyKey const *find_property_key(std::string_view name);
+
+}  // namespace simhost
