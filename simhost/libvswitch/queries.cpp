@@ -1,11 +1,12 @@
-// VSQEX_*: asking the running switches.
+// VSQEX_*: asking the running switches about themselves, and giving back what they answered with.
 #include "vswitch/queries.h"
 
 #include <algorithm>
+#include <vector>
 
-#include "core/boundary.h"
-#include "core/ledger.h"
+#include "core/known.h"
 #include "core/switches.h"
+#include "libvswitch/results.h"
 
 using simhost::answer;
 using simhost::Call;
@@ -16,7 +17,7 @@ namespace {
 
 VSUplinks_entries entry_of(simhost::store::AttachedUplink const &uplink) {
   VSUplinks_entries entry{};
-  uplink.name.copy(entry.name.string, sizeof entry.name.string - 1);
+  entry.name = simhost::name_of(uplink.name);
   entry.portID = static_cast<qex_SwitchPortID>(uplink.port);
   return entry;
 }
@@ -37,12 +38,23 @@ QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks) {
     auto const alias = required_text(switchName);
     auto &output = required(uplinks);
     auto const attached = simhost::uplinks_of(call.reading(), alias);
-    auto const size = sizeof(VSUplinks) + (attached.size() * sizeof(VSUplinks_entries));
-    auto *const record = static_cast<VSUplinks *>(call.ledger().give_out(size, call.name()));
-    record->totalEntries = static_cast<qex_uint32>(attached.size());
-    record->numEntries = record->totalEntries;
-    std::transform(attached.begin(), attached.end(), record->entries, entry_of);
-    output = record;
+    std::vector<VSUplinks_entries> entries(attached.size());
+    std::transform(attached.begin(), attached.end(), entries.begin(), entry_of);
+    output = simhost::give_list<VSUplinks>(call, entries);
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = required_text(uplink);
+    auto *const output = &required(portBuffer);
+    auto &state = call.reading();
+    auto const found = simhost::known_uplink(state, name);
+    if (!found.port) {
+      simhost::refuse(QEX_IS_DISCONNECTED);
+    }
+    auto const identifier = simhost::known_port(state, *found.port).identifier;
+    output[identifier.copy(output, 48)] = '\0';
   });
 }
 

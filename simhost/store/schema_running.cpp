@@ -38,6 +38,9 @@ char const *const kRunningSchema = R"sql(
     uplink      TEXT NOT NULL UNIQUE REFERENCES uplink (name) ON DELETE CASCADE
   ) STRICT;
   CREATE INDEX lag_uplink_by_lag ON lag_uplink (lag);
+  CREATE TRIGGER uplink_moved AFTER UPDATE OF port ON uplink BEGIN
+    DELETE FROM lag_uplink WHERE uplink = new.name;
+  END;
 
   -- Without a port, the address is reached through the switch's team of uplinks.
   CREATE TABLE address (
@@ -51,7 +54,7 @@ char const *const kRunningSchema = R"sql(
     seen        INTEGER NOT NULL,
     UNIQUE (switch, mac, vid, vni)
   ) STRICT;
-  CREATE INDEX address_by_port ON address (port);
+  CREATE INDEX address_by_place ON address (port, switch);
 
   -- The length of the address is its family: 6, 4 or 16 bytes.
   CREATE TABLE mcast_group (

@@ -1,0 +1,101 @@
+// Counters in SQL.
+#include "dataplane/counters.h"
+
+#include <algorithm>
+#include <array>
+#include <limits>
+
+#include "core/giving_up.h"
+#include "store/store.h"
+
+namespace simhost::dataplane {
+namespace {
+
+constexpr std::uint64_t k32Bits = std::numeric_limits<std::uint32_t>::max();
+constexpr std::uint64_t k64Bits = std::numeric_limits<std::uint64_t>::max();
+
+constexpr std::array kOfSwitch{
+    CounterName{.name = "rarpPktsSent", .greatest = k32Bits},
+    CounterName{.name = "maxRARPTime", .greatest = k32Bits},
+    CounterName{.name = "rarpTime", .greatest = k64Bits},
+    CounterName{.name = "txFromSrvPort", .greatest = k64Bits},
+    CounterName{.name = "txUsingSrvPortFRP", .greatest = k64Bits},
+    CounterName{.name = "txUsingPktSrcPortFRP", .greatest = k64Bits},
+    CounterName{.name = "txErrors", .greatest = k64Bits},
+    CounterName{.name = "rxToSrvPort", .greatest = k64Bits},
+    CounterName{.name = "rxRpfOverride", .greatest = k64Bits},
+};
+constexpr std::array kOfPort{
+    CounterName{.name = "noLearningAllowedPkts", .greatest = k64Bits},
+    CounterName{.name = "noLearningDroppedPkts", .greatest = k64Bits},
+    CounterName{.name = "numMACsMoved", .greatest = k64Bits},
+};
+constexpr std::array kOfSession{
+    CounterName{.name = "mirrorPktCnt", .greatest = k64Bits},
+    CounterName{.name = "mirrorPktFailCnt", .greatest = k64Bits},
+    CounterName{.name = "mirroredPkts", .greatest = k64Bits},
+    CounterName{.name = "discardedPkts", .greatest = k64Bits},
+    CounterName{.name = "failedPkts", .greatest = k64Bits},
+};
+
+std::int64_t port_or_none(CounterOwner const &owner) {
+  return owner.port ? std::int64_t(*owner.port) : 0;
+}
+
+CounterName known_name(CounterOwner const &owner, std::string_view name) {
+  auto const names = counter_names(owner);
+  auto const found = std::find_if(names.begin(), names.end(),
+                                  [&](auto const &known) { return known.name == name; });
+  if (found == names.end()) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  return *found;
+}
+
+}  // namespace
+
+std::span<CounterName const> counter_names(CounterOwner const &owner) {
+  if (!owner.session.empty()) {
+    return kOfSession;
+  }
+  return owner.port ? std::span<CounterName const>(kOfPort) : kOfSwitch;
+}
+
+Counters counters_of(store::Transaction &transaction, CounterOwner const &owner) {
+  auto select = transaction.query(
+      "SELECT name, value FROM counter"
+      " WHERE switch = ? AND ifnull(port, 0) = ? AND session = ?");
+  select.with(std::int64_t(owner.switch_key)).with(port_or_none(owner)).with(owner.session);
+  Counters counters;
+  while (select.next()) {
+    counters.emplace(select.text(0), static_cast<std::uint64_t>(select.integer(1)));
+  }
+  return counters;
+}
+
+void set_counter(store::Transaction &transaction, CounterOwner const &owner, std::string_view name,
+                 std::uint64_t value) {
+  if (value > known_name(owner, name).greatest) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  auto upsert = transaction.query(
+      "INSERT INTO counter (switch, port, session, name, value) VALUES (?, nullif(?, 0), ?, ?, ?)"
+      " ON CONFLICT (switch, ifnull(port, 0), session, name) DO UPDATE SET value = excluded.value");
+  upsert.with(std::int64_t(owner.switch_key)).with(port_or_none(owner)).with(owner.session);
+  upsert.with(name).with(static_cast<std::int64_t>(value)).run();
+}
+
+void add_to_counter(store::Transaction &transaction, CounterOwner const &owner,
+                    std::string_view name, std::uint64_t more) {
+  auto const before = counters_of(transaction, owner);
+  auto const found = before.find(name);
+  auto const value = found == before.end() ? 0 : found->second;
+  auto const room = known_name(owner, name).greatest - value;
+  set_counter(transaction, owner, name, value + std::min(more, room));
+}
+
+void forget_counters(store::Transaction &transaction) {
+  transaction.query("DELETE FROM counter").run();
+}
+
+}  // namespace simhost::dataplane

@@ -1,0 +1,132 @@
+// Links and link-aggregation groups in SQL.
+#include "dataplane/links.h"
+
+#include <algorithm>
+
+#include "core/clock.h"
+#include "core/giving_up.h"
+#include "core/known.h"
+#include "store/store.h"
+#include "vswitch/lags.h"
+
+namespace simhost {
+
+bool Lag::up() const {
+  return std::any_of(members.begin(), members.end(), [](Member const &m) { return m.up; });
+}
+
+namespace dataplane {
+namespace {
+
+std::optional<std::int64_t> find_lag(store::Transaction &transaction, store::SwitchKey switch_key,
+                                     std::string_view name) {
+  auto select = transaction.query("SELECT id FROM lag WHERE switch = ? AND name = ?");
+  if (!select.with(std::int64_t(switch_key)).with(name).next()) {
+    return std::nullopt;
+  }
+  return select.integer(0);
+}
+
+std::int64_t add_lag(store::Transaction &transaction, store::SwitchKey switch_key,
+                     std::string_view name) {
+  if (lags_of(transaction, switch_key).size() >= VS_MAX_LAGS) {
+    throw Refused(QEX_LIMIT_EXCEEDED);
+  }
+  auto insert = transaction.query("INSERT INTO lag (switch, name) VALUES (?, ?)");
+  insert.with(std::int64_t(switch_key)).with(name).run();
+  return transaction.last_key();
+}
+
+std::vector<Lag::Member> members_of(store::Transaction &transaction, std::int64_t lag) {
+  auto select = transaction.query("SELECT uplink FROM lag_uplink WHERE lag = ? ORDER BY position");
+  select.with(lag);
+  std::vector<Lag::Member> members;
+  while (select.next()) {
+    members.push_back({.uplink = select.text(0), .up = false});
+  }
+  for (auto &member : members) {
+    auto const link = link_of(transaction, member.uplink);
+    member.up = link.up() && link.partner;
+  }
+  return members;
+}
+
+}  // namespace
+
+Link link_of(store::Transaction &transaction, std::string_view uplink) {
+  auto select = transaction.query(
+      "SELECT carrier, admin, partner, speed, full_duplex, up_since FROM link WHERE uplink = ?");
+  if (!select.with(uplink).next()) {
+    return {};
+  }
+  return {.carrier = select.integer(0) != 0,
+          .admin = select.integer(1) != 0,
+          .partner = select.integer(2) != 0,
+          .speed = static_cast<std::uint32_t>(select.integer(3)),
+          .full_duplex = select.integer(4) != 0,
+          .up_since = ClockTime(select.integer(5))};
+}
+
+void put_link(store::Transaction &transaction, std::string_view uplink, Link const &link) {
+  auto const before = link_of(transaction, uplink);
+  auto const up_since = link.up() && !before.up() ? clock_now(transaction) : before.up_since;
+  auto upsert = transaction.query(
+      "INSERT INTO link (uplink, carrier, admin, partner, speed, full_duplex, up_since)"
+      " VALUES (?, ?, ?, ?, ?, ?, ?)"
+      " ON CONFLICT (uplink) DO UPDATE SET carrier = excluded.carrier, admin = excluded.admin,"
+      " partner = excluded.partner, speed = excluded.speed, full_duplex = excluded.full_duplex,"
+      " up_since = excluded.up_since");
+  upsert.with(uplink).with(std::int64_t{link.carrier}).with(std::int64_t{link.admin});
+  upsert.with(std::int64_t{link.partner}).with(std::int64_t{link.speed});
+  upsert.with(std::int64_t{link.full_duplex}).with(up_since.count()).run();
+}
+
+std::vector<Lag> lags_of(store::Transaction &transaction, store::SwitchKey switch_key) {
+  auto select = transaction.query("SELECT id, name FROM lag WHERE switch = ? ORDER BY id");
+  select.with(std::int64_t(switch_key));
+  std::vector<Lag> lags;
+  while (select.next()) {
+    lags.push_back({.id = static_cast<std::uint32_t>(select.integer(0)),
+                    .name = select.text(1),
+                    .members = {}});
+  }
+  for (auto &lag : lags) {
+    lag.members = members_of(transaction, lag.id);
+  }
+  return lags;
+}
+
+bool is_aggregated(store::Transaction &transaction, std::string_view uplink) {
+  return transaction.query("SELECT 1 FROM lag_uplink WHERE uplink = ?").with(uplink).next();
+}
+
+void put_lag(store::Transaction &transaction, store::SwitchKey switch_key, std::string_view name,
+             std::vector<std::string> const &uplinks) {
+  if (name.empty()) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  if (name.size() >= VS_LACP_LAG_NAME_LENGTH) {
+    throw Refused(QEX_NAME_TOO_LONG);
+  }
+  if (uplinks.size() > VS_MAX_UPLINKS_IN_LAG) {
+    throw Refused(QEX_LIMIT_EXCEEDED);
+  }
+  auto lag = find_lag(transaction, switch_key, name);
+  if (!lag) {
+    lag = add_lag(transaction, switch_key, name);
+  }
+  transaction.query("DELETE FROM lag_uplink WHERE lag = ?").with(*lag).run();
+  for (auto const &uplink : uplinks) {
+    known_uplink(transaction, switch_key, uplink);
+    if (is_aggregated(transaction, uplink)) {
+      throw Refused(QEX_BUSY);
+    }
+    transaction.query("INSERT INTO lag_uplink (lag, uplink) VALUES (?, ?)")
+        .with(*lag)
+        .with(uplink)
+        .run();
+  }
+}
+
+}  // namespace dataplane
+}  // namespace simhost

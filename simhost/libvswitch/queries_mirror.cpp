@@ -1,0 +1,92 @@
+// VSQEX_*: mirror sessions as they run.
+#include <algorithm>
+#include <array>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "core/data_plane.h"
+#include "core/known.h"
+#include "core/running_mirrors.h"
+#include "core/runtime_options.h"
+#include "libvswitch/results.h"
+#include "vswitch/queries.h"
+
+using simhost::answer;
+using simhost::Call;
+using simhost::data_plane;
+using simhost::required;
+using simhost::required_text;
+
+namespace {
+
+using Sid = std::array<char, sizeof(DVMirrorSID)>;
+
+Sid sid_of(simhost::MirrorSession const &session) {
+  Sid sid{};
+  session.sid().copy(sid.data(), sid.size());
+  return sid;
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus VSQEX_GetDVMirrorSessionIDs(char const *switchName, VSDVMirrorSessionIDs **ids) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = required_text(switchName);
+    auto &output = required(ids);
+    auto &work = call.reading();
+    auto const key = simhost::known_switch(work, alias).key;
+    std::vector<Sid> running;
+    for (auto const &session : simhost::mirrors_of(work, key)) {
+      auto const sid = sid_of(session);
+      if (session.runs() && std::find(running.begin(), running.end(), sid) == running.end()) {
+        running.push_back(sid);
+      }
+    }
+    output = simhost::give_list<VSDVMirrorSessionIDs>(call, running);
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char const sid[32],
+                                               VSDVMirrorSessionStats *stats) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = required_text(switchName);
+    auto const *const first = &required(sid);
+    std::string const wanted(first, strnlen(first, sizeof(DVMirrorSID)));
+    auto &output = required(stats);
+    auto &work = call.reading();
+    auto const key = simhost::known_switch(work, alias).key;
+    auto const sessions = simhost::mirrors_of(work, key);
+    auto const found = std::find_if(sessions.begin(), sessions.end(),
+                                    [&](auto const &session) { return session.sid() == wanted; });
+    if (found == sessions.end()) {
+      simhost::refuse(QEX_NOT_FOUND);
+    }
+    if (!found->runs() || simhost::runtime_number(work, VS_RT_OPT_ALLOW_MIRROR_STATS) == 0) {
+      simhost::refuse(QEX_IS_DISABLED);
+    }
+    auto counters = data_plane().counters(work, {.switch_key = key, .session = wanted});
+    output.mirrorPktCnt = counters["mirrorPktCnt"];
+    output.mirrorPktFailCnt = counters["mirrorPktFailCnt"];
+    output.mirroredPkts = counters["mirroredPkts"];
+    output.discardedPkts = counters["discardedPkts"];
+    output.failedPkts = counters["failedPkts"];
+    static_assert(sizeof output.name == sizeof found->record.dname);
+    std::memcpy(output.name, found->record.dname, sizeof output.name);
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetPromiscSessionActiveDsts(char const *switchName,
+                                                   VSPromiscSessionActiveDsts **ports) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = required_text(switchName);
+    auto &output = required(ports);
+    auto &work = call.reading();
+    auto const active = simhost::promiscuous_ports(work, simhost::known_switch(work, alias).key);
+    output = simhost::give_list<VSPromiscSessionActiveDsts>(call, active);
+  });
+}
+
+}  // extern "C"

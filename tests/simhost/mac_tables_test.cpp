@@ -1,0 +1,282 @@
+// MAC tables: what is learned, what ages when, what has no room.
+#include "dataplane/mac_tables.h"
+
+#include <gmock/gmock.h>
+
+#include <array>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "core/host_settings.h"
+#include "plane.h"
+#include "vswitch/mac_learning.h"
+#include "vswitch/port_mac_policies.h"
+#include "vswitch/properties.h"
+
+namespace {
+
+using simhost::Place;
+using simhost::dataplane::learn;
+using simhost::dataplane::Sighting;
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+VSMACEntry entry(unsigned char last, VSMACAddrType type = VS_MAC_ADDR_TYPE_USER,
+                 qex_VlanID vid = 0) {
+  VSMACEntry made{};
+  made.macAddress[0] = 0x02;
+  made.macAddress[5] = last;
+  made.macAddrType = type;
+  made.vid = vid;
+  return made;
+}
+
+struct MacTables : Plane {
+  MacTables() {
+    at1 = {.switch_key = key, .port = p1.number};
+    at2 = {.switch_key = key, .port = p2.number};
+    team = {.switch_key = key, .port = std::nullopt};
+    set_learning(p1, 4096, VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW);
+    set_learning(p2, 4096, VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW);
+  }
+
+  void set_learning(simhost::store::Port const &port, qex_uint32 limit,
+                    VSPortMACLearningLimitPolicy limit_policy, bool on = true) {
+    VSPMACManagement management{};
+    management.portMACLearning.learning = static_cast<qex_Bool>(on);
+    management.portMACLearning.macLimit = limit;
+    management.portMACLearning.macLimitPolicy = limit_policy;
+    set_policy(of(port), VSPROP_PORT_MAC_MANAGEMENT, management);
+  }
+  void set_switch_learning(unsigned aging, qex_uint32 limit, unsigned learn_static = 0) {
+    VSMACLearning learning{};
+    learning.agingTime = aging & 0xFFFFFFU;
+    learning.learnStatic = learn_static & 1U;
+    learning.macLimit = limit;
+    set_policy(of_switch(), VSPROP_SWITCH_MAC_LEARNING, learning);
+  }
+
+  /// The last bytes of the addresses at a place.
+  std::vector<int> at(Place const &place, VSMACAddrType type = VS_MAC_ADDR_TYPE_ALL) {
+    std::vector<int> lasts;
+    for (auto const &found : simhost::dataplane::addresses(work, place, type)) {
+      lasts.push_back(found.macAddress[5]);
+    }
+    return lasts;
+  }
+  QEX_ReturnStatus put(Place const &place, VSMACEntry const &wanted) {
+    return status_of([&] { simhost::dataplane::put_address(work, place, wanted); });
+  }
+  QEX_ReturnStatus remove(Place const &place, VSMACEntry const &wanted) {
+    return status_of([&] { simhost::dataplane::remove_address(work, place, wanted); });
+  }
+
+  Place at1;
+  Place at2;
+  Place team;
+};
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+TEST_F(MacTables, LearnWhereAnAddressIs) {
+  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::learned);
+  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::refreshed);
+  EXPECT_EQ(learn(work, team, entry(9)), Sighting::learned);
+  EXPECT_THAT(at(at1), ElementsAre(1));
+  EXPECT_THAT(at(at2), IsEmpty());
+  EXPECT_THAT(at(team), ElementsAre(9));
+}
+
+TEST_F(MacTables, EntriesSayWhatIsKnown) {
+  learn(work, at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 42));
+  simhost::step_clock(work, milliseconds(2999));
+  auto const found = simhost::dataplane::addresses(work, at1, VS_MAC_ADDR_TYPE_ALL).at(0);
+  EXPECT_EQ(std::memcmp(found.macAddress, entry(1).macAddress, sizeof found.macAddress), 0);
+  EXPECT_EQ(found.macAddrType, VS_MAC_ADDR_TYPE_LEARNED);
+  EXPECT_EQ(found.aging, 1);
+  EXPECT_EQ(found.vid, 42);
+  EXPECT_EQ(found.elapsed, 2U);
+}
+
+TEST_F(MacTables, VlansAndNetworksAreApart) {
+  learn(work, at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 1));
+  EXPECT_EQ(learn(work, at2, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 2)), Sighting::learned);
+  auto overlay = entry(1, VS_MAC_ADDR_TYPE_LEARNED, 1);
+  overlay.vni = 7;
+  EXPECT_EQ(learn(work, at2, overlay), Sighting::learned);
+  EXPECT_THAT(at(at2), ElementsAre(1, 1));
+}
+
+TEST_F(MacTables, AgeToTheMillisecond) {
+  learn(work, at1, entry(1));
+  simhost::step_clock(work, seconds(300) - milliseconds(1));
+  EXPECT_THAT(at(at1), ElementsAre(1));
+  simhost::step_clock(work, milliseconds(1));
+  EXPECT_THAT(at(at1), IsEmpty());
+  EXPECT_EQ(simhost::dataplane::learning_stats(work, at1).numMACsLearned, 0U);
+  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::learned) << "it is new again";
+}
+
+TEST_F(MacTables, AFrameMakesAnAddressYoung) {
+  learn(work, at1, entry(1));
+  simhost::step_clock(work, seconds(299));
+  learn(work, at1, entry(1));
+  simhost::step_clock(work, seconds(299));
+  EXPECT_THAT(at(at1), ElementsAre(1));
+}
+
+TEST_F(MacTables, AgeByTheSwitchsTimeBeforeTheHosts) {
+  learn(work, at1, entry(1));
+  simhost::set_global_mac_learning(work, {.agingTime = 20, .macLimit = 10, .learnStatic = 0});
+  simhost::step_clock(work, seconds(19));
+  EXPECT_THAT(at(at1), ElementsAre(1));
+  simhost::step_clock(work, seconds(1));
+  EXPECT_THAT(at(at1), IsEmpty());
+  set_switch_learning(21, 10);
+  EXPECT_THAT(at(at1), ElementsAre(1)) << "nobody had looked";
+  simhost::step_clock(work, seconds(1));
+  EXPECT_THAT(at(at1), IsEmpty());
+}
+
+TEST_F(MacTables, WhatDoesNotAgeStays) {
+  ASSERT_EQ(put(at1, entry(1)), QEX_OK);
+  auto ageing = entry(2);
+  ageing.aging = 1;
+  ASSERT_EQ(put(at1, ageing), QEX_OK);
+  simhost::step_clock(work, seconds(300));
+  EXPECT_THAT(at(at1), ElementsAre(1));
+}
+
+TEST_F(MacTables, AskForOneTypeOrAll) {
+  put(at1, entry(1, VS_MAC_ADDR_TYPE_STATIC));
+  put(at1, entry(2, VS_MAC_ADDR_TYPE_USER));
+  learn(work, at1, entry(3));
+  EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_STATIC), ElementsAre(1));
+  EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_USER), ElementsAre(2));
+  EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_LEARNED), ElementsAre(3));
+  EXPECT_THAT(at(at1), ElementsAre(1, 2, 3));
+}
+
+TEST_F(MacTables, MovesAreCountedWhereTheyGo) {
+  learn(work, at1, entry(1));
+  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
+  EXPECT_THAT(at(at1), IsEmpty());
+  EXPECT_THAT(at(at2), ElementsAre(1));
+  EXPECT_EQ(simhost::dataplane::learning_stats(work, at1).numMACsMoved, 0U);
+  EXPECT_EQ(simhost::dataplane::learning_stats(work, at2).numMACsMoved, 1U);
+  EXPECT_EQ(learn(work, team, entry(1)), Sighting::moved);
+  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
+  EXPECT_EQ(simhost::dataplane::learning_stats(work, at2).numMACsMoved, 2U);
+}
+
+TEST_F(MacTables, AUsersAddressDoesNotMove) {
+  put(at1, entry(1, VS_MAC_ADDR_TYPE_USER));
+  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::kept_elsewhere);
+  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::refreshed);
+  EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_USER), ElementsAre(1));
+}
+
+TEST_F(MacTables, AStaticAddressMovesIfTheSwitchLearnsStaticOnes) {
+  put(at1, entry(1, VS_MAC_ADDR_TYPE_STATIC));
+  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::kept_elsewhere);
+  set_switch_learning(300, 100, 1);
+  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
+  EXPECT_THAT(at(at2, VS_MAC_ADDR_TYPE_LEARNED), ElementsAre(1));
+}
+
+TEST_F(MacTables, APortThatDoesNotLearn) {
+  set_learning(p1, 4096, VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW, false);
+  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::learning_off);
+  EXPECT_THAT(at(at1), IsEmpty());
+}
+
+TEST_F(MacTables, AFullPortFollowsItsPolicy) {
+  set_learning(p1, 2, VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW);
+  learn(work, at1, entry(1));
+  learn(work, at1, entry(2));
+  EXPECT_EQ(learn(work, at1, entry(3)), Sighting::let_through);
+  EXPECT_EQ(learn(work, at1, entry(2)), Sighting::refreshed);
+  set_learning(p1, 2, VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP);
+  EXPECT_EQ(learn(work, at1, entry(3)), Sighting::dropped);
+  EXPECT_EQ(learn(work, at1, entry(4)), Sighting::dropped);
+  EXPECT_THAT(at(at1), ElementsAre(1, 2));
+  auto const stats = simhost::dataplane::learning_stats(work, at1);
+  EXPECT_EQ(stats.numMACsLearned, 2U);
+  EXPECT_EQ(qex_uint64{stats.noLearningAllowedPkts}, 1U);
+  EXPECT_EQ(qex_uint64{stats.noLearningDroppedPkts}, 2U);
+}
+
+TEST_F(MacTables, AgeingMakesRoom) {
+  set_learning(p1, 1, VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP);
+  learn(work, at1, entry(1));
+  simhost::step_clock(work, seconds(300));
+  EXPECT_EQ(learn(work, at1, entry(2)), Sighting::learned);
+}
+
+TEST_F(MacTables, TheSwitchHasALimitForAllItsPlaces) {
+  set_switch_learning(300, 2);
+  learn(work, at1, entry(1));
+  learn(work, team, entry(2));
+  EXPECT_EQ(learn(work, at2, entry(3)), Sighting::let_through);
+  EXPECT_EQ(learn(work, team, entry(3)), Sighting::let_through);
+  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved) << "it takes no more room there";
+}
+
+TEST_F(MacTables, AUserPutsAndTakesAddresses) {
+  EXPECT_EQ(put(at1, entry(1)), QEX_OK);
+  EXPECT_EQ(put(at1, entry(1)), QEX_OK);
+  EXPECT_EQ(put(at2, entry(1)), QEX_EXISTS);
+  learn(work, at2, entry(2));
+  EXPECT_EQ(put(at1, entry(2)), QEX_OK) << "a learned address gives way";
+  EXPECT_THAT(at(at1), ElementsAre(1, 2));
+  EXPECT_EQ(remove(at2, entry(1)), QEX_NOT_FOUND);
+  EXPECT_EQ(remove(at1, entry(1, VS_MAC_ADDR_TYPE_STATIC)), QEX_NOT_FOUND);
+  EXPECT_EQ(remove(at1, entry(1)), QEX_OK);
+  EXPECT_EQ(remove(at1, entry(1)), QEX_NOT_FOUND);
+  EXPECT_EQ(remove(at1, entry(2, VS_MAC_ADDR_TYPE_ALL)), QEX_OK);
+  learn(work, at1, entry(3));
+  EXPECT_EQ(remove(at1, entry(3, VS_MAC_ADDR_TYPE_LEARNED)), QEX_OK);
+}
+
+TEST_F(MacTables, AddressesAreChecked) {
+  auto const bad = [](auto const &spoil) {
+    auto made = entry(1);
+    spoil(made);
+    return made;
+  };
+  EXPECT_EQ(put(at1, bad([](auto &e) { e.macAddress[0] = 0x01; })), QEX_INVALID_ADDRESS);
+  EXPECT_EQ(put(at1, bad([](auto &e) { std::memset(e.macAddress, 0, 6); })), QEX_INVALID_ADDRESS);
+  EXPECT_EQ(put(at1, bad([](auto &e) { e.vid = 4094; })), QEX_OK);
+  EXPECT_EQ(put(at1, bad([](auto &e) { e.vid = 4095; })), QEX_BAD_VLANID);
+  EXPECT_EQ(put(at1, bad([](auto &e) { e.vni = 0xFFFFFF; })), QEX_OK);
+  EXPECT_EQ(put(at1, bad([](auto &e) { e.vni = 0x1000000; })), QEX_BAD_PARAM);
+  EXPECT_EQ(put(at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED)), QEX_BAD_PARAM);
+  EXPECT_EQ(put(at1, entry(1, VS_MAC_ADDR_TYPE_ALL)), QEX_BAD_PARAM);
+}
+
+TEST_F(MacTables, GoWithTheirPort) {
+  learn(work, at1, entry(1));
+  simhost::remove_port(work, p1);
+  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::learned);
+}
+
+TEST_F(MacTables, GlobalPropertiesAreChecked) {
+  EXPECT_EQ(status_of([&] {
+              simhost::set_global_mac_learning(work,
+                                               {.agingTime = 0, .macLimit = 1, .learnStatic = 0});
+            }),
+            QEX_BAD_PARAM);
+  EXPECT_EQ(status_of([&] {
+              simhost::set_global_mac_learning(
+                  work, {.agingTime = 1000001, .macLimit = 1, .learnStatic = 0});
+            }),
+            QEX_BAD_PARAM);
+  auto const props = simhost::global_mac_learning(work);
+  EXPECT_EQ(qex_uint32{props.agingTime}, 300U);
+  EXPECT_EQ(qex_uint32{props.macLimit}, 65536U);
+  EXPECT_EQ(props.learnStatic, 0);
+}
+
+}  // namespace

@@ -1,0 +1,239 @@
+// Links, groups of links, and which of them a port uses.
+#include "dataplane/teaming.h"
+
+#include <gmock/gmock.h>
+
+#include <initializer_list>
+#include <set>
+#include <string>
+
+#include "core/runtime_options.h"
+#include "dataplane/counters.h"
+#include "plane.h"
+#include "vswitch/lags.h"
+#include "vswitch/properties.h"
+#include "vswitch/teaming.h"
+
+namespace {
+
+using simhost::dataplane::Link;
+using testing::ElementsAre;
+
+struct Teaming : Plane {
+  std::string hint(simhost::store::Port const &port) {
+    return simhost::data_plane().team_uplink(work, port);
+  }
+  void change(char const *uplink, void (*how)(Link &)) {
+    auto link = simhost::dataplane::link_of(work, uplink);
+    how(link);
+    simhost::dataplane::change_link(work, uplink, link);
+  }
+  void down(char const *uplink) {
+    change(uplink, [](Link &link) { link.carrier = false; });
+  }
+  void up(char const *uplink) {
+    change(uplink, [](Link &link) { link.carrier = true; });
+  }
+  std::uint64_t counted(char const *name) {
+    return simhost::dataplane::counters_of(work, {.switch_key = key})[name];
+  }
+};
+
+VSTeamPolicy policy(std::initializer_list<char const *> active,
+                    std::initializer_list<char const *> standby = {},
+                    qex_uint32 balance = TEAM_FRP_TYPE_FO_EXPLICIT) {
+  VSTeamPolicy made{};
+  made.loadBalance = balance;
+  made.linkCriteria = TEAM_FRP_CRIT_LINK_STATE;
+  for (auto const *list : {&active, &standby}) {
+    for (auto const *name : *list) {
+      std::string(name).copy(made.uplinkPortName[made.numActive + made.numStandby], 80);
+      ++(list == &active ? made.numActive : made.numStandby);
+    }
+  }
+  return made;
+}
+
+TEST_F(Teaming, WithoutAPolicyPortsSpreadOverAllUplinks) {
+  std::set<std::string> used{hint(p1), hint(p2)};
+  for (auto const *name : {"p3", "p4"}) {
+    used.insert(hint(simhost::add_client_port(work, key, name)));
+  }
+  EXPECT_THAT(used, ElementsAre("nic0", "nic1", "nic2"));
+}
+
+TEST_F(Teaming, TheSwitchsPolicyHoldsForAllPorts) {
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink2"}, {"uplink1"}));
+  EXPECT_EQ(hint(p1), "nic1");
+  EXPECT_EQ(hint(p2), "nic1");
+}
+
+TEST_F(Teaming, APortsOwnPolicyComesFirst) {
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink2"}));
+  set_policy(of(p1), VSPROP_PORT_TEAMING_POLICY, policy({"uplink3"}));
+  EXPECT_EQ(hint(p1), "nic2");
+  EXPECT_EQ(hint(p2), "nic1");
+}
+
+TEST_F(Teaming, AStandbyUplinkStepsInAndBack) {
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2", "uplink3"}));
+  EXPECT_EQ(hint(p1), "nic0");
+  down("nic0");
+  EXPECT_EQ(hint(p1), "nic1");
+  down("nic1");
+  EXPECT_EQ(hint(p1), "nic2");
+  up("nic0");
+  EXPECT_EQ(hint(p1), "nic0");
+}
+
+TEST_F(Teaming, ARollingTeamStaysWhereItIs) {
+  auto rolling = policy({"uplink1"}, {"uplink2"});
+  rolling.flags = TEAM_FRP_FLAG_ROLLING;
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, rolling);
+  EXPECT_EQ(hint(p1), "nic0");
+  simhost::step_clock(work, std::chrono::seconds(1));
+  down("nic0");
+  EXPECT_EQ(hint(p1), "nic1");
+  simhost::step_clock(work, std::chrono::seconds(1));
+  up("nic0");
+  EXPECT_EQ(hint(p1), "nic1") << "nothing moves until it must";
+  down("nic1");
+  EXPECT_EQ(hint(p1), "nic0");
+}
+
+TEST_F(Teaming, TheAdminSwitchTakesALinkDown) {
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
+  simhost::data_plane().set_admin_state(work, "nic0", false);
+  EXPECT_FALSE(simhost::data_plane().link_is_up(work, "nic0"));
+  EXPECT_EQ(hint(p1), "nic1");
+  simhost::data_plane().set_admin_state(work, "nic0", true);
+  EXPECT_TRUE(simhost::data_plane().link_is_up(work, "nic0"));
+  EXPECT_EQ(hint(p1), "nic0");
+}
+
+TEST_F(Teaming, AnUplinkIsUsedOnlyAfterTheUpDelay) {
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
+  simhost::set_runtime_option(work, VS_RT_OPT_TEAM_POLICY_UP_DELAY, 500);
+  down("nic0");
+  up("nic0");
+  simhost::step_clock(work, std::chrono::milliseconds(499));
+  EXPECT_EQ(hint(p1), "nic1");
+  simhost::step_clock(work, std::chrono::milliseconds(1));
+  EXPECT_EQ(hint(p1), "nic0");
+}
+
+TEST_F(Teaming, CriteriaTakeUplinksOut) {
+  auto fast = policy({"uplink1"}, {"uplink2"});
+  fast.linkCriteria = TEAM_FRP_CRIT_LINK_SPEED_GTE;
+  fast.speed = 10000;
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, fast);
+  EXPECT_EQ(hint(p1), "nic0");
+  change("nic0", [](Link &link) { link.speed = 1000; });
+  EXPECT_EQ(hint(p1), "nic1");
+  fast.linkCriteria = TEAM_FRP_CRIT_LINK_SPEED;
+  fast.speed = 1000;
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, fast);
+  EXPECT_EQ(hint(p1), "nic0");
+  fast.linkCriteria = TEAM_FRP_CRIT_LINK_DUPLEX;
+  fast.fullDuplex = 1;
+  change("nic0", [](Link &link) { link.full_duplex = false; });
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, fast);
+  EXPECT_EQ(hint(p1), "nic1");
+}
+
+TEST_F(Teaming, AnOverrideBindsAPort) {
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}));
+  simhost::set_property(work, of(p1), VSPROP_PORT_TEAMING_OVERRIDE,
+                        simhost::bytes_of_text("uplink3"));
+  EXPECT_EQ(hint(p1), "nic2");
+  EXPECT_EQ(hint(p2), "nic0");
+  down("nic2");
+  EXPECT_EQ(status_of([&] { hint(p1); }), QEX_ENETDOWN) << "whatever its teaming says";
+}
+
+TEST_F(Teaming, TheStatusSaysWhyThereIsNoUplink) {
+  for (auto const *uplink : {"nic0", "nic1", "nic2"}) {
+    down(uplink);
+  }
+  EXPECT_EQ(status_of([&] { hint(p1); }), QEX_ENETDOWN);
+  simhost::create_switch(work, {.alias = "alone"});
+  auto const port = simhost::add_client_port(work, simhost::known_switch(work, "alone").key, "p");
+  EXPECT_EQ(status_of([&] { hint(port); }), QEX_ENETUNREACH);
+  EXPECT_EQ(status_of([&] { hint(simhost::known_port(work, key, "uplink1")); }), QEX_NOT_SUPPORTED);
+}
+
+TEST_F(Teaming, MovesAreAnnounced) {
+  auto notifying = policy({"uplink1"}, {"uplink2"});
+  notifying.flags = TEAM_FRP_FLAG_NOTIFY_SWITCH;
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, notifying);
+  set_policy(of(p2), VSPROP_PORT_TEAMING_POLICY, policy({"uplink1"}, {"uplink2"}));
+  down("nic0");
+  EXPECT_EQ(counted("rarpPktsSent"), 1U) << "the policy of p2 does not ask for it";
+  EXPECT_EQ(counted("rarpTime"), 1000000U);
+  down("nic2");
+  EXPECT_EQ(counted("rarpPktsSent"), 1U) << "nothing moved";
+  up("nic0");
+  EXPECT_EQ(counted("rarpPktsSent"), 2U);
+  simhost::set_runtime_option(work, VS_RT_OPT_MAX_RARPS_PER_INTERVAL, 0);
+  down("nic0");
+  EXPECT_EQ(counted("rarpPktsSent"), 2U);
+}
+
+struct Lags : Teaming {
+  std::vector<simhost::Lag> lags() { return simhost::data_plane().lags(work, key); }
+  QEX_ReturnStatus put(std::string const &name, std::vector<std::string> const &uplinks) {
+    return status_of([&] { simhost::dataplane::put_lag(work, key, name, uplinks); });
+  }
+};
+
+TEST_F(Lags, AreUpWhileAnUplinkIs) {
+  ASSERT_EQ(put("lag1", {"nic0", "nic1"}), QEX_OK);
+  EXPECT_TRUE(simhost::data_plane().lacp_is_up(work, "nic0"));
+  EXPECT_FALSE(simhost::data_plane().lacp_is_up(work, "nic2")) << "it is in no group";
+  down("nic0");
+  EXPECT_TRUE(lags().at(0).up());
+  EXPECT_FALSE(lags().at(0).members.at(0).up);
+  EXPECT_TRUE(lags().at(0).members.at(1).up);
+  change("nic1", [](Link &link) { link.partner = false; });
+  EXPECT_FALSE(lags().at(0).up());
+  EXPECT_TRUE(simhost::data_plane().link_is_up(work, "nic1"));
+  EXPECT_FALSE(simhost::data_plane().lacp_is_up(work, "nic1"));
+}
+
+TEST_F(Lags, MayBeInATeam) {
+  ASSERT_EQ(put("lag1", {"nic1", "nic2"}), QEX_OK);
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"lag1"}, {"uplink1"}));
+  EXPECT_THAT((std::set<std::string>{hint(p1), hint(p2)}), ElementsAre("nic1", "nic2"));
+  down("nic1");
+  EXPECT_EQ(hint(p1), "nic2");
+  EXPECT_EQ(hint(p2), "nic2");
+  down("nic2");
+  EXPECT_EQ(hint(p1), "nic0");
+}
+
+TEST_F(Lags, AreChecked) {
+  EXPECT_EQ(put("", {}), QEX_BAD_PARAM);
+  EXPECT_EQ(put(std::string(67, 'l'), {}), QEX_OK);
+  EXPECT_EQ(put(std::string(68, 'l'), {}), QEX_NAME_TOO_LONG);
+  EXPECT_EQ(put("lag1", {"nic3"}), QEX_NOT_FOUND) << "it is not at this switch";
+  EXPECT_EQ(put("lag1", {"nic0"}), QEX_OK);
+  EXPECT_EQ(put("lag2", {"nic0"}), QEX_BUSY);
+  EXPECT_EQ(put("lag1", {"nic0", "nic1"}), QEX_OK) << "a group may get other uplinks";
+}
+
+TEST_F(Lags, AreLimited) {
+  for (int number = 0; number < VS_MAX_LAGS; ++number) {
+    ASSERT_EQ(put("lag" + std::to_string(number), {}), QEX_OK);
+  }
+  EXPECT_EQ(put("one more", {}), QEX_LIMIT_EXCEEDED);
+  EXPECT_EQ(put("lag0", {"nic0"}), QEX_OK);
+}
+
+TEST_F(Lags, LoseTheUplinksThatLeaveTheSwitch) {
+  ASSERT_EQ(put("lag1", {"nic0", "nic1"}), QEX_OK);
+  simhost::remove_uplink_port(work, key, "nic0");
+  ASSERT_EQ(lags().at(0).members.size(), 1U);
+  EXPECT_EQ(lags().at(0).members.at(0).uplink, "nic1");
+}
+
+}  // namespace
