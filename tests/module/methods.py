@@ -1,6 +1,7 @@
 """What the tests of methods share: records in blocks of their own, allocators, and the notice."""
 
 import ctypes
+import subprocess
 import sys
 from contextlib import contextmanager
 from typing import Any, Callable, Iterator, Tuple
@@ -55,6 +56,14 @@ def said(capfd: Any, function: Callable[..., Any], *arguments: Any) -> Tuple[Any
     result = function(*arguments)
     libc.fflush(None)
     return result, capfd.readouterr().out
+
+
+def aborts(program: str, text: str) -> None:
+    """Fails unless a program ends as a debug interpreter ends one that breaks its rules."""
+    assert DEBUG_INTERPRETER
+    done = subprocess.run([sys.executable, "-c", program], capture_output=True, text=True)
+    assert done.returncode == -6
+    assert text in done.stderr
 
 
 @contextmanager

@@ -167,6 +167,38 @@ def test_an_argument_of_another_type_is_refused(
         )
 
 
+# Functions to which -1 does no harm, and what they print for it.
+TAKING_MINUS_ONE = {
+    "new_VSUplinks": "",
+    "new_VSUplinkPorts": "",
+    "new_VSUplinkPortIds": "",
+    "new_VSRuntimeOptions": "",
+    "VSPromiscSessionActiveDsts___getitem__": methods.NOTICE,
+    "DVMirrorSessionTable___getitem__": methods.NOTICE,
+}
+
+
+@pytest.mark.parametrize("number", [2**63, -(2**63) - 1])
+@pytest.mark.parametrize("name", TAKING_MINUS_ONE)
+def test_beyond_64_bits_the_call_is_made_with_minus_one_and_the_error_follows(
+    capfd: Any, name: str, number: int, valid: Arguments
+) -> None:
+    if methods.DEBUG_INTERPRETER:
+        record = f"vs.new_{name.split('___')[0]}(), " if "___" in name else ""
+        program = f"import _libvswitch as vs; vs.{name}({record}{number})"
+        methods.aborts(program, "returned a result with an exception set")
+        return
+    (function,) = [function for function in FUNCTIONS if function.name == name]
+    position = len(function.arguments)
+
+    def failure() -> Any:
+        with pytest.raises(SystemError) as caught:
+            call_with(function, valid.of(function), position, number)
+        return type(caught.value.__cause__)
+
+    assert methods.said(capfd, failure) == (OverflowError, TAKING_MINUS_ONE[name])
+
+
 # Nulls
 
 
