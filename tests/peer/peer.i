@@ -1,5 +1,5 @@
-// A second module of the wrapper runtime, for tests: records that it shares with _libvswitch, and
-// pointer objects of any type that the runtime knows.
+// A second module of the wrapper runtime, for tests: records that it shares with _libvswitch, pointer
+// objects of any type that the runtime knows, and functions that C may be given.
 
 %module peer
 
@@ -10,7 +10,25 @@
 %include "qexapi/types.h"
 %include "vswitch/switch_info.h"
 
+// A function that the generator itself marks as one that C may be given.
+%callback("%s_address");
+%inline %{
+char visit(void *item, void *context) { return item != context; }
+%}
+%nocallback;
+
 %{
+static PyObject *answer_none(PyObject *self, PyObject *arguments) {
+  (void)self, (void)arguments;
+  Py_RETURN_NONE;
+}
+
+static void free_definition(PyObject *capsule) {
+  PyMethodDef *definition = PyCapsule_GetPointer(capsule, NULL);
+  free((char *)definition->ml_doc);
+  free(definition);
+}
+
 static void *no_malloc(void *context, size_t size) {
   (void)context, (void)size;
   return NULL;
@@ -34,6 +52,21 @@ PyObject *pointer_object(unsigned long address, char const *spelling) {
   swig_type_info *type = SWIG_TypeQuery(spelling);
   if (!type) return PyErr_Format(PyExc_LookupError, "no type is spelled '%s'", spelling);
   return SWIG_NewPointerObj((void *)address, type, 0);
+}
+
+/* A built-in function with any documentation, which is where the runtime looks for marks. */
+PyObject *documented_function(char const *documentation) {
+  PyMethodDef *definition = calloc(1, sizeof *definition);
+  PyObject *owner = definition ? PyCapsule_New(definition, NULL, free_definition) : PyErr_NoMemory();
+  PyObject *function;
+  if (!owner) return NULL;
+  definition->ml_name = "documented";
+  definition->ml_meth = answer_none;
+  definition->ml_flags = METH_VARARGS;
+  definition->ml_doc = documentation ? strdup(documentation) : NULL;
+  function = PyCFunction_New(definition, owner);
+  Py_DECREF(owner);
+  return function;
 }
 
 /* What an initialisation function answers while the interpreter gets no memory for objects. */
