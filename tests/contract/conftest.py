@@ -7,6 +7,15 @@ import pytest
 from recording_host import RecordingHost, WrongHost
 
 
+def pytest_configure(config: pytest.Config) -> None:
+    """Keep count of what the tests prove."""
+    config.addinivalue_line("markers", "proves(aspect): shows this of `call`, and of `position`")
+    # Only now: it looks for what the plugins that come first make findable.
+    from proof import Proof
+
+    config.pluginmanager.register(Proof())
+
+
 def pytest_sessionstart() -> None:
     """Refuse to run on another host: its answers would prove nothing."""
     try:

@@ -41,6 +41,8 @@ class Details(NamedTuple):
     """The C type of each argument, typedefs resolved."""
     memory: Tuple[Optional[bytes], ...]
     """What each pointer to a record, or with capture() any pointer, led to when the call began."""
+    addresses: Tuple[int, ...]
+    """Where each pointer led, that of a text too; whatever an integer's bits are."""
     exception_status: int
     """The module's trap when the call began: 0 if it was armed for it."""
 
@@ -103,6 +105,7 @@ class RecordingHost:
             Details(
                 tuple(argument["type"] for argument in call["arguments"]),
                 tuple(_bytes(argument["memory"]) for argument in call["arguments"]),
+                tuple(argument["address"] for argument in call["arguments"]),
                 call["exception_status"],
             )
             for call in self._calls()
@@ -112,14 +115,14 @@ class RecordingHost:
         self,
         function: str,
         result: Value = None,
-        outputs: Optional[Mapping[int, Union[int, bytes]]] = None,
+        outputs: Optional[Mapping[int, Value]] = None,
         nth: int = 0,
     ) -> None:
         """Set what a call answers: the nth one, or all that have no answer of their own.
 
         The result is an integer, a text or an address, as the call declares it. An output is an
         integer or an address, as wide as the parameter has it, or just bytes: those of a record,
-        or of a text with or without its NUL.
+        or of a text with or without its NUL; None leaves it alone.
         """
         signature = self._signature(function)
         if result is not None:
@@ -127,7 +130,8 @@ class RecordingHost:
         for argument, value in (outputs or {}).items():
             if isinstance(value, int):
                 value = _packed(signature.parameters[argument - 1], value)
-            self._check(function, "output", nth, argument, value, ctypes.c_size_t(len(value)))
+            if value is not None:
+                self._check(function, "output", nth, argument, value, ctypes.c_size_t(len(value)))
 
     def spring(
         self,

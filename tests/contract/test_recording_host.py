@@ -2,44 +2,33 @@
 
 import collections
 import ctypes
-import os
-import subprocess
-import sys
-from pathlib import Path
-from typing import Dict, Optional
+from typing import Optional
 
 import _libvswitch as vs
+import children
 import pytest
+from children import BUILD, HERE
 from peer import pointer_object
 from recording_host import RecordingHost, loaded_files
 
-HERE = Path(__file__).parent
-BUILD = Path(os.environ["BUILD_DIR"])
-
-
-def run(*arguments: str, library_path: Optional[Path]) -> "subprocess.CompletedProcess[str]":
-    """Run Python with the host's libraries from that folder, or where the module leads to."""
-    environment: Dict[str, str] = dict(os.environ)
-    environment.pop("LD_LIBRARY_PATH")
-    if library_path:
-        environment["LD_LIBRARY_PATH"] = str(library_path)
-    command = [sys.executable, *arguments]
-    return subprocess.run(command, env=environment, capture_output=True, text=True, check=False)
-
 
 @pytest.mark.parametrize("folder", [None, "tests/recording_host"])
-def test_the_library_path_changes_the_host_under_an_unchanged_module(folder: str) -> None:
+def test_the_library_path_changes_the_host_under_an_unchanged_module(
+    folder: Optional[str],
+) -> None:
     script = (
-        f"import sys; sys.path.insert(0, {str(HERE)!r}); import _libvswitch, recording_host as r;"
+        "import _libvswitch, recording_host as r;"
         "print(_libvswitch.__file__, *r.loaded_files('libvswitch.so'))"
     )
-    result = run("-c", script, library_path=BUILD / folder if folder else None)
+    path = str(BUILD / folder) if folder else None
+    result = children.run("-c", script, LD_LIBRARY_PATH=path)
     library = BUILD / (folder or "simhost") / "libvswitch.so"
     assert result.stdout.split() == [vs.__file__, str(library)], result.stderr
 
 
 def test_contract_tests_refuse_another_host() -> None:
-    result = run("-m", "pytest", "-p", "no:cacheprovider", str(HERE), library_path=None)
+    command = ["-m", "pytest", "-p", "no:cacheprovider", str(HERE)]
+    result = children.run(*command, LD_LIBRARY_PATH=None)
     assert result.returncode == 3
     assert "which is not the recording host" in result.stdout + result.stderr
 

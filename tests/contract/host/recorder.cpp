@@ -94,9 +94,8 @@ std::string described(Parameter const &parameter, std::uint64_t bits, std::size_
       memory = hex(address, capture);
     }
   }
-  return R"({"type":)" + quoted(parameter.type) + R"(,"text":)" +
-         (parameter.kind == Kind::text ? "true" : "false") + R"(,"value":)" + value +
-         R"(,"memory":)" + memory + "}";
+  return R"({"type":)" + quoted(parameter.type) + R"(,"address":)" + std::to_string(bits) +
+         R"(,"value":)" + value + R"(,"memory":)" + memory + "}";
 }
 
 /** A panic of the recorder's own: a test that goes on would prove nothing. */
