@@ -238,20 +238,30 @@ void remove_uplink_port(store::Transaction &transaction, store::SwitchKey switch
   store::remove_port(transaction, *found->port);
 }
 
-std::optional<Bytes> read_uplink_names(store::Transaction &transaction,
-                                       store::PropertyOwner const &owner) {
+std::vector<UplinkPort> uplink_ports_in(BytesView names, BytesView identifiers) {
+  auto const name_texts = texts_of<QEX_NEB_NAME_MAX_LEN>(names);
+  auto const identifier_texts = texts_of<QEX_NEB_PORT_ID_MAX_LEN>(identifiers);
+  if (name_texts.size() != identifier_texts.size()) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  std::vector<UplinkPort> ports;
+  for (std::size_t at = 0; at < name_texts.size(); ++at) {
+    ports.push_back({.name = name_texts[at], .identifier = identifier_texts[at]});
+  }
+  return ports;
+}
+
+Bytes read_uplink_names(store::Transaction &transaction, store::PropertyOwner const &owner) {
   return list_of<QEX_NEB_NAME_MAX_LEN>(named_uplink_ports(transaction, owner.switch_key),
                                        &UplinkPort::name);
 }
 
-std::optional<Bytes> read_uplink_ids(store::Transaction &transaction,
-                                     store::PropertyOwner const &owner) {
+Bytes read_uplink_ids(store::Transaction &transaction, store::PropertyOwner const &owner) {
   return list_of<QEX_NEB_PORT_ID_MAX_LEN>(named_uplink_ports(transaction, owner.switch_key),
                                           &UplinkPort::identifier);
 }
 
-std::optional<Bytes> read_port_status(store::Transaction &transaction,
-                                      store::PropertyOwner const &owner) {
+Bytes read_port_status(store::Transaction &transaction, store::PropertyOwner const &owner) {
   auto const port = store::find_port(transaction, owner.port_number.value()).value();
   bool const in_use =
       port.kind == store::PortKind::uplink

@@ -31,14 +31,9 @@ void check_key(store::PropertyOwner const &owner, std::string_view name) {
   }
 }
 
-std::optional<store::Property> kept_elsewhere(store::Transaction &transaction,
-                                              store::PropertyOwner const &owner,
-                                              PropertyKey const &key) {
-  auto value = key.read(transaction, owner);
-  if (!value) {
-    return std::nullopt;
-  }
-  return store::Property{.type = key.type, .value = *std::move(value)};
+store::Property kept_elsewhere(store::Transaction &transaction, store::PropertyOwner const &owner,
+                               PropertyKey const &key) {
+  return {.type = key.type, .value = key.read(transaction, owner)};
 }
 
 bool by_name(store::NamedProperty const &left, store::NamedProperty const &right) {
@@ -92,8 +87,10 @@ std::optional<store::Property> get_property(store::Transaction &transaction,
                                             store::PropertyOwner const &owner,
                                             std::string_view key) {
   auto const *const known = key_of(owner, key);
-  return known != nullptr && known->read != nullptr ? kept_elsewhere(transaction, owner, *known)
-                                                    : store::find_property(transaction, owner, key);
+  if (known != nullptr && known->read != nullptr) {
+    return kept_elsewhere(transaction, owner, *known);
+  }
+  return store::find_property(transaction, owner, key);
 }
 
 std::vector<store::NamedProperty> list_properties(store::Transaction &transaction,
@@ -101,9 +98,8 @@ std::vector<store::NamedProperty> list_properties(store::Transaction &transactio
   auto all = store::properties_of(transaction, owner);
   for (auto const &key : property_keys()) {
     if (key.scope == owner.scope && key.read != nullptr) {
-      if (auto property = kept_elsewhere(transaction, owner, key)) {
-        all.push_back({.name = std::string(key.name), .property = *std::move(property)});
-      }
+      all.push_back(
+          {.name = std::string(key.name), .property = kept_elsewhere(transaction, owner, key)});
     }
   }
   std::sort(all.begin(), all.end(), by_name);

@@ -20,10 +20,8 @@
 namespace simhost {
 namespace {
 
-using store::PropertyOwner;
 using store::PropertyScope;
 using store::PropertyType;
-using store::Transaction;
 
 constexpr std::size_t kLongestPortAlias = QEX_NEB_PORT_ALIAS_MAX_LEN - 1;
 // One more than the name of an uplink port has: what callers have room for.
@@ -75,10 +73,6 @@ constexpr auto kFilterMode =
     number<qex_uint32, VS_MCAST_FILTER_MODE_LEGACY, VS_MCAST_FILTER_MODE_MLD>;
 constexpr auto kPriority = number<qex_int32, QEX_VLAN_PRIORITY_MINIMUM, QEX_VLAN_PRIORITY_MAXIMUM>;
 
-std::optional<Bytes> read_vlan_info(Transaction &transaction, PropertyOwner const &owner) {
-  return vlan_info_of(transaction, owner);
-}
-
 // Keys of a switch as a whole, of the host's part of it, and of its ports.
 constexpr auto kSwitch = PropertyScope::global;
 constexpr auto kHost = PropertyScope::host;
@@ -110,7 +104,7 @@ constexpr std::array kKeys{
 
     PropertyKey{QEX_NEBPROP_PORT_STATUS, kPort, kCommon, kVolatile, anything, read_port_status},
     PropertyKey{QEX_NEBPROP_PORT_TYPE, kPort, kCommon, kVolatile, kPortType},
-    PropertyKey{QEX_NEBPROP_PORT_VLAN, kPort, kCommon, kVolatile, anything, read_vlan_info},
+    PropertyKey{QEX_NEBPROP_PORT_VLAN, kPort, kCommon, kVolatile, anything, vlan_info_of},
     PropertyKey{QEX_NEBPROP_PORT_PERSIST, kPort, kCommon, kVolatile, boolean},
     PropertyKey{QEX_NEBPROP_PORT_PTALLOWED, kPort, kCommon, kConfig, boolean},
     PropertyKey{QEX_NEBPROP_PORT_PTALLOWEDRT, kPort, kCommon, kRuntime, boolean},

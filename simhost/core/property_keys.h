@@ -32,8 +32,8 @@ struct PropertyKey {
   store::PropertyType type;  ///< what the typed calls store it as
   /// Refuses bytes that the property may not have.
   void (*check)(Setting const &setting);
-  /// If the host keeps the value elsewhere than under the key: reads it; nothing if it has none.
-  std::optional<Bytes> (*read)(store::Transaction &, store::PropertyOwner const &) = nullptr;
+  /// If the host keeps the value elsewhere than under the key: reads it.
+  Bytes (*read)(store::Transaction &, store::PropertyOwner const &) = nullptr;
   /// Likewise: writes it; null if callers may only read it.
   void (*write)(Setting const &setting) = nullptr;
 };

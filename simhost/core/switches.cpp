@@ -184,20 +184,17 @@ std::vector<store::AttachedUplink> uplinks_of(store::Transaction &transaction,
   return store::uplinks_of(transaction, running_switch(transaction, alias).key);
 }
 
-std::optional<Bytes> read_alias(store::Transaction &transaction,
-                                store::PropertyOwner const &owner) {
+Bytes read_alias(store::Transaction &transaction, store::PropertyOwner const &owner) {
   return bytes_of_text(row_behind(transaction, owner.switch_key).alias);
 }
 
-std::optional<Bytes> read_version(store::Transaction &transaction,
-                                  store::PropertyOwner const &owner) {
+Bytes read_version(store::Transaction &transaction, store::PropertyOwner const &owner) {
   auto const version = row_behind(transaction, owner.switch_key).version;
   auto const bytes = bytes_of(version);
   return Bytes(bytes.begin(), bytes.end());
 }
 
-std::optional<Bytes> read_portset(store::Transaction &transaction,
-                                  store::PropertyOwner const &owner) {
+Bytes read_portset(store::Transaction &transaction, store::PropertyOwner const &owner) {
   return bytes_of_text(row_behind(transaction, owner.switch_key).portset);
 }
 

@@ -64,11 +64,9 @@ SIMHOST_API std::vector<store::AttachedUplink> uplinks_of(store::Transaction &tr
 
 /// The values of QEX_NEBPROP_SWITCH_ALIAS, QEX_NEBPROP_SWITCH_VERSION and QEX_NEBPROP_HOST_PROXY,
 /// which are names and a number of the switch; the first two can be set.
-std::optional<Bytes> read_alias(store::Transaction &transaction, store::PropertyOwner const &owner);
-std::optional<Bytes> read_version(store::Transaction &transaction,
-                                  store::PropertyOwner const &owner);
-std::optional<Bytes> read_portset(store::Transaction &transaction,
-                                  store::PropertyOwner const &owner);
+Bytes read_alias(store::Transaction &transaction, store::PropertyOwner const &owner);
+Bytes read_version(store::Transaction &transaction, store::PropertyOwner const &owner);
+Bytes read_portset(store::Transaction &transaction, store::PropertyOwner const &owner);
 void write_alias(Setting const &setting);
 void write_version(Setting const &setting);
 

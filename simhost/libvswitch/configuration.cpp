@@ -1,15 +1,36 @@
-// VSDVS_*: configuring the switches.
+// VSDVS_*: the life of switches and their ports, their names, and memory that comes back.
 #include "vswitch/configuration.h"
+
+#include <algorithm>
 
 #include "core/boundary.h"
 #include "core/ledger.h"
+#include "core/ports.h"
 #include "core/switches.h"
+#include "core/targets.h"
+#include "qexapi/switch_properties.h"
 
 using simhost::answer;
 using simhost::Call;
 using simhost::optional_text;
 using simhost::required;
 using simhost::required_text;
+using simhost::switch_called;
+using simhost::switch_identified;
+
+namespace {
+
+// The number of a port; a switch that does not run has given its ports none.
+int running_number(Call &call, simhost::NamedPort const &target) {
+  auto &transaction = call.reading();
+  auto const [key, row] = simhost::known_switch(transaction, target.owner.name, target.owner.kind);
+  if (!row.associated) {
+    simhost::refuse(QEX_NOT_FOUND);
+  }
+  return static_cast<int>(simhost::known_port(transaction, key, target.identifier).number);
+}
+
+}  // namespace
 
 extern "C" {
 
@@ -34,6 +55,61 @@ QEX_ReturnStatus VSDVS_DestroyVSwitch(char const *switchName) {
   return answer(__func__, [&](Call &call) {
     auto const alias = required_text(switchName);
     simhost::destroy_switch(call.changing(), alias);
+  });
+}
+
+QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_uint32 connectId) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = simhost::port_of(switch_called(switchName), port);
+    auto &transaction = call.changing();
+    auto const added = simhost::add_client_port(
+        transaction, simhost::found(transaction, target.owner), target.identifier);
+    simhost::set_property(transaction, simhost::owner_of(added), QEX_NEBPROP_PORT_CONNECTID,
+                          simhost::bytes_of(connectId));
+  });
+}
+
+QEX_ReturnStatus VSDVS_AddOpaqueDVPort(char const *switchName, char const *port,
+                                       char const *externalId) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = simhost::port_of(switch_called(switchName), port);
+    auto const external = required_text(externalId);
+    auto &transaction = call.changing();
+    auto const added = simhost::add_client_port(
+        transaction, simhost::found(transaction, target.owner), target.identifier);
+    simhost::set_external_id(transaction, added, external);
+  });
+}
+
+QEX_ReturnStatus VSDVS_RemoveDVPort(char const *switchName, char const *port) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = simhost::port_of(switch_called(switchName), port);
+    auto &transaction = call.changing();
+    simhost::remove_port(transaction, simhost::found(transaction, target));
+  });
+}
+
+QEX_ReturnStatus VSDVS_DvPortIDToPortID(char const *switchName, char const *port, int *portID) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = simhost::port_of(switch_called(switchName), port);
+    required(portID) = running_number(call, target);
+  });
+}
+
+QEX_ReturnStatus VSDVS_DvPortIDToPortIDFromDVSID(char const *switchId, char const *port,
+                                                 int *portID) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = simhost::port_of(switch_identified(switchId), port);
+    required(portID) = running_number(call, target);
+  });
+}
+
+QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *aliasBuffer) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = required_text(portsetName);
+    auto *const output = &required(aliasBuffer);
+    auto const alias = simhost::alias_of_portset(call.reading(), name);
+    *std::copy(alias.begin(), alias.end(), output) = '\0';
   });
 }
 

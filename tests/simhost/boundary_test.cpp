@@ -261,7 +261,6 @@ TEST(StateFile, AnEmptyNameMeansMemory) {
 }
 
 TEST(Unmodelled, ACallWithAStatusIsRefused) {
-  EXPECT_EQ(VSDVS_AddDVPort("s", "p", 1), QEX_NOT_IMPLEMENTED);
   EXPECT_EQ(DVSQEX_SwitchAdd("i", "s", 0, 0), QEX_NOT_IMPLEMENTED);
   VSMACTable *table = nullptr;
   EXPECT_EQ(VSQEX_GetTeamMACTable("s", VS_MAC_ADDR_TYPE_ALL, &table), QEX_NOT_IMPLEMENTED);
