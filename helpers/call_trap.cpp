@@ -1,7 +1,7 @@
 // The call trap's globals: the module arms the buffer, the host's libraries fill in the rest and
 // jump.
 
-#include "vswitch/call_trap.h"
+#include "helpers/call_trap.h"
 
 #include "helpers/exported.h"
 
@@ -9,7 +9,12 @@ extern "C" {
 
 EXPORTED jmp_buf exception_buffer;
 EXPORTED int exception_status;
-EXPORTED struct _object *exceptionType;
+EXPORTED PyObject *exceptionType;
 EXPORTED char *exceptionMsg;
+
+PyObject *raise_sprung_trap(void) {
+  PyErr_SetString(exceptionType, exceptionMsg);
+  return nullptr;
+}
 
 }  // extern "C"

@@ -6,6 +6,53 @@
 
 extern "C" {
 
+PyObject *exception_of_kind(int kind) {
+  switch (kind) {
+    case -1:  // a generic error
+    case -5:
+      return PyExc_TypeError;
+    case -2:
+      return PyExc_IOError;
+    case -4:
+      return PyExc_IndexError;
+    case -6:
+      return PyExc_ZeroDivisionError;
+    case -7:
+      return PyExc_OverflowError;
+    case -8:
+      return PyExc_SyntaxError;
+    case -9:
+      return PyExc_ValueError;
+    case -10:
+      return PyExc_SystemError;
+    case -11:
+      return PyExc_AttributeError;
+    case -12:
+      return PyExc_MemoryError;
+    default:
+      return PyExc_RuntimeError;
+  }
+}
+
+void report_failure(int kind, char const *text) {
+  PyErr_SetString(exception_of_kind(kind), text);
+}
+
+void report_argument(int kind, char const *method, int position, char const *type) {
+  PyErr_Format(exception_of_kind(kind), "in method '%s', argument %d of type '%s'", method,
+               position, type);
+}
+
+void report_null_argument(char const *method, int position, char const *type) {
+  PyErr_Format(PyExc_ValueError, "invalid null reference in method '%s', argument %d of type '%s'",
+               method, position, type);
+}
+
+void report_null_variable(char const *name, char const *type) {
+  PyErr_Format(PyExc_ValueError, "invalid null reference in variable '%s' of type '%s'", name,
+               type);
+}
+
 int wrong_argument_count(PyObject *args, char const *method, int expected) {
   std::string const format = std::string(static_cast<size_t>(expected), 'O') + ":" + method;
   // The interpreter counts before it stores, so no targets are needed for a tuple of another size.

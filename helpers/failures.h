@@ -9,16 +9,37 @@
 #include <stdbool.h>
 #include <string.h>
 
+/** Keeps what leads here out of the way of what does not. */
+#define COLD __attribute__((cold))
+
 #ifdef __cplusplus
 extern "C" {
 #endif
+
+/**
+ * The exception that reports an error kind, a borrowed reference. Kinds are the small negative
+ * numbers of the wrapper runtime; a generic error is a wrong type, an unknown kind a runtime error.
+ */
+PyObject *exception_of_kind(int kind);
+
+/** Raises the exception of `kind` with `text`. */
+void report_failure(int kind, char const *text) COLD;
+
+/** "in method '...', argument <position> of type '...'", with the exception of `kind`. */
+void report_argument(int kind, char const *method, int position, char const *type) COLD;
+
+/** "invalid null reference in method '...', argument <position> of type '...'", a ValueError. */
+void report_null_argument(char const *method, int position, char const *type) COLD;
+
+/** "invalid null reference in variable '...' of type '...'", a ValueError. */
+void report_null_variable(char const *name, char const *type) COLD;
 
 /**
  * Raises the interpreter's own error for a wrong number of arguments and answers 0.
  *
  * `args` is the argument tuple, `expected` the number of arguments that `method` takes.
  */
-int wrong_argument_count(PyObject *args, char const *method, int expected);
+int wrong_argument_count(PyObject *args, char const *method, int expected) COLD;
 
 #ifdef __cplusplus
 }

@@ -3,17 +3,14 @@
 // Stands before every function that arms it.
 
 %{
-#include "vswitch/call_trap.h"
+#include "helpers/call_trap.h"
 %}
 
 // What the sprung trap leaves behind is deliberate: copies of text arguments may have been handed on
 // by the library that gave up, so nobody knows whether they are still in use.
 %exception {
   exception_status = setjmp(exception_buffer);
-  if (exception_status != 0) {
-    PyErr_SetString(exceptionType, exceptionMsg);
-    return NULL;
-  }
+  if (exception_status != 0) return raise_sprung_trap();
   $action
 }
 

@@ -10,6 +10,18 @@
 //
 // Stands before the headers; each line before the header of its record.
 
+// A pointer object of the right type, or None. A writer of a pointer takes over what the object owns.
+%typemap(in, noblock=1) SWIGTYPE * (void *pointer = NULL) {
+  if (!SWIG_IsOK(SWIG_ConvertPtr($input, &pointer, $descriptor, $disown))) {
+    %bad_argument(kWrongType, "$type");
+  }
+  $1 = ($ltype)pointer;
+}
+%typemap(in) SWIGTYPE [] = SWIGTYPE *;
+%typemap(in, noblock=1) void * {
+  if (!SWIG_IsOK(SWIG_ConvertPtr($input, &$1, 0, $disown))) %bad_argument(kWrongType, "$type");
+}
+
 // Constructors answer the raw pointer object, whatever class is registered: the class wraps it.
 %define %raw_result_of_constructor(NAME, TYPE)
 %typemap(out, noblock=1) TYPE *NAME {
@@ -21,7 +33,7 @@
 %define %nested_record(NAME)
 %typemap(memberin, noblock=1) NAME {
   if (arg1) {
-    if (!$input) %argument_nullref("$type *", $symname, 2);
+    if (!$input) %null_argument(2, "$type *");
     $1 = *$input;
   }
 }
@@ -73,15 +85,11 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self),
 
 // Readers and methods need a real record.
 %typemap(check, noblock=1) SWIGTYPE *self {
-  if (!accepts_null_record("$symname") && !$1) {
-    %argument_nullref("$type", $symname, $argnum);
-  }
+  if (!accepts_null_record("$symname") && !$1) %null_argument($argnum, "$type");
 }
 
 %typemap(check, noblock=1) SWIGTYPE *REQUIRED, char *REQUIRED {
-  if (!$1) {
-    %argument_nullref("$type", $symname, $argnum);
-  }
+  if (!$1) %null_argument($argnum, "$type");
 }
 %define %required(PARAMETER...)
 %typemap(check) PARAMETER = SWIGTYPE *REQUIRED;
@@ -91,7 +99,7 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self),
 // of any kind store nothing into a null record.
 %typemap(memberin, noblock=1) SWIGTYPE [ANY], SWIGTYPE [ANY][ANY] {
   if (arg1) {
-    if (!$input) %variable_nullref("$type", "$name");
+    if (!$input) %null_variable("$name", "$type");
     memcpy($1, $input, sizeof($1));
   }
 }

@@ -2,7 +2,7 @@
 // Stands before everything that generates a wrapper.
 
 %{
-#include "helpers/conversions.h"
+#include "helpers/fast_paths.h"
 #include "helpers/failures.h"
 %}
 
@@ -67,10 +67,25 @@ static PyMethodDef runtime_methods[] = {
 #define SWIG_Python_RaiseOrModifyTypeError(text) PyErr_SetString(PyExc_NotImplementedError, text)
 %}
 
-// A null where a record is needed is a wrong value, not a wrong type.
-#undef %argument_nullref
-#define %argument_nullref(type, name, argn) \
-  SWIG_exception_fail(SWIG_ValueError, %argnullref_fmt(type, name, argn))
-#undef %variable_nullref
-#define %variable_nullref(type, name) \
-  SWIG_exception_fail(SWIG_ValueError, %varnullref_fmt(type, name))
+// The runtime counts the records that Python owns on its capsule, but not where ownership changes
+// hands, so the count drifts both ways and would end the runtime too early or never. One reference
+// for good stands for all of them.
+%init %{
+  Py_XINCREF(Swig_Capsule_global);
+  Swig_Capsule_global = NULL;
+%}
+
+// Failures are reported out of line: what a wrapper does not need when all is well is elsewhere. The
+// macros stand in typemaps, where the method's name and the argument's position are known.
+#define %bad_argument(kind, type) \
+  do { report_argument(kind, "$symname", $argnum, type); SWIG_fail; } while (0)
+#define %null_argument(position, type) \
+  do { report_null_argument("$symname", position, type); SWIG_fail; } while (0)
+#define %null_variable(name, type) \
+  do { report_null_variable(name, type); SWIG_fail; } while (0)
+
+// The same for what stock definitions report.
+%insert("runtime") %{
+#undef SWIG_exception_fail
+#define SWIG_exception_fail(kind, text) do { report_failure(kind, text); SWIG_fail; } while (0)
+%}

@@ -1,12 +1,22 @@
-// Scalars: integers by the converters of helpers/conversions.h, which the file pyfragments.swg beside
-// this one puts in place. Stands before every function with a scalar argument.
+// Scalars: integers and bytes by the converters of helpers/conversions.h.
+// Stands before every function with a scalar argument.
 
-// An enumeration is an int: any value within 32 signed bits passes, named or not. Stock output would
-// store through the enumeration's own type, whose signedness the compiler chooses.
-%typemap(in, noblock=1, fragment=SWIG_AsVal_frag(int)) enum SWIGTYPE (int value, int ecode = 0) {
-  ecode = SWIG_AsVal(int)($input, &value);
-  if (!SWIG_IsOK(ecode)) {
-    %argument_fail(ecode, "$type", $symname, $argnum);
-  }
-  $1 = %static_cast(value, $1_ltype);
+%define %scalar(TYPE, READING)
+%typemap(in, noblock=1) TYPE (TYPE value, int kind) {
+  kind = READING($input, &value);
+  if (kind != kConverted) %bad_argument(kind, "$ltype");
+  $1 = ($ltype)value;
 }
+%enddef
+
+%scalar(int, read_int)
+%scalar(unsigned char, read_unsigned_char)
+%scalar(unsigned short, read_unsigned_short)
+%scalar(unsigned int, read_unsigned_int)
+%scalar(unsigned long, read_unsigned_long)
+%scalar(size_t, read_unsigned_long)
+%scalar(unsigned long long, read_unsigned_long_long)
+%scalar(char, char_from_object)
+
+// An enumeration is an int: any value within 32 signed bits passes, named or not.
+%typemap(in, noblock=1) enum SWIGTYPE = int;

@@ -4,18 +4,20 @@
 
 #include <gtest/gtest.h>
 
+#include <map>
+
 #include "tests/helpers/python_objects.h"
 
 namespace {
 
-std::string report(char const *arguments, int expected) {
-  EXPECT_EQ(0, wrong_argument_count(python(arguments).get(), "method", expected));
+/// Takes the pending error away, which must be of this type, and answers its text.
+std::string take_error(PyObject *expected_type) {
   PyObject *type = nullptr;
   PyObject *value = nullptr;
   PyObject *traceback = nullptr;
   PyErr_Fetch(&type, &value, &traceback);
   PyErr_NormalizeException(&type, &value, &traceback);
-  EXPECT_EQ(PyExc_TypeError, type);
+  EXPECT_EQ(expected_type, type);
   Object const text(PyObject_Str(value));
   std::string result = PyUnicode_AsUTF8(text.get());
   Py_XDECREF(type);
@@ -24,11 +26,44 @@ std::string report(char const *arguments, int expected) {
   return result;
 }
 
+std::string report_of_count(char const *arguments, int expected) {
+  EXPECT_EQ(0, wrong_argument_count(python(arguments).get(), "method", expected));
+  return take_error(PyExc_TypeError);
+}
+
+TEST(ErrorKinds, HaveTheirExceptions) {
+  std::map<int, PyObject *> const expected = {
+      {-1, PyExc_TypeError},     {-2, PyExc_IOError},         {-3, PyExc_RuntimeError},
+      {-4, PyExc_IndexError},    {-5, PyExc_TypeError},       {-6, PyExc_ZeroDivisionError},
+      {-7, PyExc_OverflowError}, {-8, PyExc_SyntaxError},     {-9, PyExc_ValueError},
+      {-10, PyExc_SystemError},  {-11, PyExc_AttributeError}, {-12, PyExc_MemoryError},
+      {-13, PyExc_RuntimeError}, {-99, PyExc_RuntimeError},   {1, PyExc_RuntimeError},
+  };
+  for (auto const &[kind, exception] : expected) {
+    EXPECT_EQ(exception, exception_of_kind(kind)) << kind;
+  }
+}
+
+TEST(Reports, AreMadeInTheModulesWords) {
+  report_failure(-7, "any text");
+  EXPECT_EQ("any text", take_error(PyExc_OverflowError));
+  report_argument(-5, "VSDVS_SetMTU", 2, "qex_uint32");
+  EXPECT_EQ("in method 'VSDVS_SetMTU', argument 2 of type 'qex_uint32'",
+            take_error(PyExc_TypeError));
+  report_null_argument("VSInfo_mtu_get", 1, "struct VSInfo *");
+  EXPECT_EQ(
+      "invalid null reference in method 'VSInfo_mtu_get', argument 1 of type 'struct VSInfo *'",
+      take_error(PyExc_ValueError));
+  report_null_variable("sha", "qex_uint8 [6]");
+  EXPECT_EQ("invalid null reference in variable 'sha' of type 'qex_uint8 [6]'",
+            take_error(PyExc_ValueError));
+}
+
 TEST(WrongArgumentCount, IsReportedInTheInterpretersWords) {
-  EXPECT_EQ("method() takes exactly 1 argument (0 given)", report("()", 1));
-  EXPECT_EQ("method() takes exactly 2 arguments (1 given)", report("(1,)", 2));
-  EXPECT_EQ("method() takes exactly 2 arguments (3 given)", report("(1, 2, 3)", 2));
-  EXPECT_EQ("method() takes exactly 8 arguments (7 given)", report("(1,) * 7", 8));
+  EXPECT_EQ("method() takes exactly 1 argument (0 given)", report_of_count("()", 1));
+  EXPECT_EQ("method() takes exactly 2 arguments (1 given)", report_of_count("(1,)", 2));
+  EXPECT_EQ("method() takes exactly 2 arguments (3 given)", report_of_count("(1, 2, 3)", 2));
+  EXPECT_EQ("method() takes exactly 8 arguments (7 given)", report_of_count("(1,) * 7", 8));
 }
 
 TEST(NullRecord, IsForWritersDestructorsAndThePrintedFormOfNames) {

@@ -1,0 +1,92 @@
+// Pointer objects and result lists, made and read the short way where the long one would do the same.
+// Stands before everything that generates a wrapper. The runtime's own functions stay behind each of
+// these: for classes, for casts between modules, and for interpreters without the fast paths.
+
+// Pointer objects come and go with every record that a call answers, so a few are kept.
+%begin %{
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+#include "helpers/fast_paths.h"
+
+#if FAST_PATHS
+#define KEPT_OBJECTS 32
+static struct {
+  PyTypeObject *type; /* of the kept objects: the raw pointer objects of this module */
+  int count;
+  PyObject *objects[KEPT_OBJECTS];
+} kept;
+
+static inline PyObject *kept_or_new(PyTypeObject *type) {
+  return type == kept.type && kept.count > 0 ? PyObject_Init(kept.objects[--kept.count], type)
+                                             : _PyObject_New(type);
+}
+
+static inline void keep_or_free(PyObject *object) {
+  if (Py_TYPE(object) == kept.type && kept.count < KEPT_OBJECTS) {
+    kept.objects[kept.count++] = object;
+  } else {
+    PyObject_Free(object);
+  }
+}
+
+#undef PyObject_NEW
+#define PyObject_NEW(record, type) ((record *)kept_or_new(type))
+#undef PyObject_DEL
+#define PyObject_DEL(object) keep_or_free((PyObject *)(object))
+#endif
+%}
+
+%wrapper %{
+#if FAST_PATHS
+/* A raw pointer object of exactly the type that is wanted. */
+static inline int convert_pointer(PyObject *object, void **pointer, swig_type_info *type, int flags) {
+  SwigPyObject *raw = (SwigPyObject *)object;
+  if (Py_TYPE(object) == kept.type && raw->ty == type) {
+    *pointer = raw->ptr;
+    if (flags & SWIG_POINTER_DISOWN) raw->own = 0;
+    return SWIG_OK;
+  }
+  return SWIG_Python_ConvertPtr(object, pointer, type, flags);
+}
+#undef SWIG_ConvertPtr
+#define SWIG_ConvertPtr(object, pointer, type, flags) \
+  convert_pointer(object, (void **)(pointer), type, flags)
+
+/* A raw pointer object for a type without a class. */
+static PyObject *new_pointer(void *pointer, swig_type_info *type, int flags) {
+  if (pointer && (!type->clientdata || (flags & SWIG_POINTER_NOSHADOW))) {
+    return SwigPyObject_New(pointer, type, flags & SWIG_POINTER_OWN);
+  }
+  return SWIG_Python_NewPointerObj(NULL, pointer, type, flags);
+}
+#undef SWIG_NewPointerObj
+#define SWIG_NewPointerObj(pointer, type, flags) new_pointer(pointer, type, flags)
+#endif
+
+/* A status and its first output are a list from the start. */
+static PyObject *append_output(PyObject *result, PyObject *output) {
+  PyObject *list = NULL;
+  if (!output) {
+    Py_XDECREF(result);
+    return NULL;
+  }
+  if (result == Py_None || PyList_Check(result)) return SWIG_Python_AppendOutput(result, output);
+  list = PyList_New(2);
+  if (!list) {
+    Py_DECREF(result);
+    Py_DECREF(output);
+    return NULL;
+  }
+  PyList_SET_ITEM(list, 0, result);
+  PyList_SET_ITEM(list, 1, output);
+  return list;
+}
+#undef SWIG_AppendOutput
+#define SWIG_Python_AppendOutput append_output
+%}
+
+%init %{
+#if FAST_PATHS
+  kept.type = SwigPyObject_type();
+#endif
+%}
