@@ -131,6 +131,8 @@ TEST_F(Sessions, AreFollowedByEntitiesThatNobodyCounts) {
   }
   table_->numEntities = 0;
   EXPECT_EQ(static_cast<void *>(byte(484)), mirror_entity_at(table_.get(), 0));
+  table_->numSessions = 1;
+  EXPECT_EQ(static_cast<void *>(byte(252)), mirror_entity_at(table_.get(), 0));
 }
 
 /// An entity whose value is all bytes of one kind.

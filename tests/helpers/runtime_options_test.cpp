@@ -235,6 +235,7 @@ TEST_F(OptionList, HasBytesUpToTheFirstNulAboveType12) {
     for (std::string const text : {"224.0.0.1", "", "\xff\x80"}) {
       SCOPED_TRACE(text);
       add(at(5), type, text);
+      at(5)->length = 0xffff;
       Object const value(runtime_option_value(at(5)));
       ASSERT_TRUE(PyBytes_CheckExact(value.get()));
       EXPECT_EQ(text, PyBytes_AS_STRING(value.get()));
