@@ -40,6 +40,10 @@ void give_up(Ending &ending, PanicKind kind, char const *call, char const *messa
   describe(ending.report, kind, call, message);
 }
 
+void give_up(Ending &ending, HostPanic const &panic, char const *call) {
+  give_up(ending, panic.kind(), panic.text() == PanicText::verbatim ? "" : call, panic.what());
+}
+
 }  // namespace
 
 void end_with_status(Ending &ending, char const *call) noexcept {
@@ -48,7 +52,7 @@ void end_with_status(Ending &ending, char const *call) noexcept {
   } catch (Refused const &refused) {
     answer_with(ending, refused.status());
   } catch (HostPanic const &panic) {
-    give_up(ending, panic.kind(), call, panic.what());
+    give_up(ending, panic, call);
   } catch (store::UnusableState const &error) {
     give_up(ending, PanicKind::os_error, call, error.what());
   } catch (SQLite::Exception const &error) {
@@ -70,7 +74,7 @@ void end_without_status(Ending &ending, char const *call) noexcept {
   try {
     throw;
   } catch (HostPanic const &panic) {
-    give_up(ending, panic.kind(), call, panic.what());
+    give_up(ending, panic, call);
   } catch (std::exception const &error) {
     give_up(ending, PanicKind::runtime_error, call, error.what());
   } catch (...) {

@@ -1,11 +1,13 @@
 // A call's hold on the host.
 #include "core/call.h"
 
+#include "core/faults.h"
 #include "core/host.h"
 
 namespace simhost {
 
 Call::Call(char const *name) : name_(name) {
+  meet_faults(name);
   this_host().lock().lock();
 }
 
@@ -26,6 +28,22 @@ store::Transaction &Call::changing() {
 
 Ledger &Call::ledger() {
   return this_host().ledger();
+}
+
+Handles &Call::handles() {
+  return this_host().handles();
+}
+
+DataLists &Call::lists() {
+  return this_host().lists();
+}
+
+Call::Aside::Aside() {
+  this_host().lock().unlock();
+}
+
+Call::Aside::~Aside() {
+  this_host().lock().lock();
 }
 
 void Call::complete() {

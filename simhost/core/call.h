@@ -11,13 +11,15 @@ class Transaction;
 
 namespace simhost {
 
+class DataLists;
+class Handles;
 class Ledger;
 
 /// Holds the host's lock for its whole life, so none of the caller's code may run meanwhile. What
 /// it changed in the state is undone when it goes without complete().
 class SIMHOST_API Call {
  public:
-  /// `name` is a literal.
+  /// `name` is a literal. Throws what a fault that waits for this call says.
   explicit Call(char const *name);
   ~Call();
   Call(Call const &) = delete;
@@ -29,10 +31,26 @@ class SIMHOST_API Call {
   store::Transaction &reading();
   store::Transaction &changing();
   Ledger &ledger();
+  Handles &handles();
+  DataLists &lists();
+  /// Lets go of the lock while `work` runs, which may then run the caller's code. Not with a
+  /// transaction.
+  template <typename Work>
+  decltype(auto) aside(Work const &work) {
+    Aside const aside;
+    return work();
+  }
   /// Makes the changes last.
   void complete();
 
  private:
+  struct SIMHOST_API Aside {
+    Aside();
+    ~Aside();
+    Aside(Aside const &) = delete;
+    Aside &operator=(Aside const &) = delete;
+  };
+
   char const *name_;
   std::unique_ptr<store::Transaction> transaction_;
 };

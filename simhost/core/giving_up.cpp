@@ -3,6 +3,16 @@
 
 namespace simhost {
 
+std::optional<PanicKind> find_panic_kind(std::string_view type) {
+#define SIMHOST_KIND(kind, name) \
+  if (type == #name) {           \
+    return PanicKind::kind;      \
+  }
+  SIMHOST_PANIC_KINDS(SIMHOST_KIND)
+#undef SIMHOST_KIND
+  return std::nullopt;
+}
+
 void refuse(QEX_ReturnStatus status) {
   throw Refused(status);
 }

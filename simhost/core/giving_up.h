@@ -2,8 +2,10 @@
 #pragma once
 
 #include <exception>
+#include <optional>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 
 #include "core/api.h"
 #include "qexapi/status.h"
@@ -21,18 +23,45 @@ class Refused : public std::exception {
   QEX_ReturnStatus status_;
 };
 
-/// The interpreter's exception types with which the host gives up.
-enum class PanicKind { runtime_error, os_error };
+// The interpreter's exception types: what a panic kind is called here, and there.
+#define SIMHOST_PANIC_KINDS(KIND)                  \
+  KIND(runtime_error, RuntimeError)                \
+  KIND(os_error, OSError)                          \
+  KIND(connection_error, ConnectionError)          \
+  KIND(index_error, IndexError)                    \
+  KIND(key_error, KeyError)                        \
+  KIND(memory_error, MemoryError)                  \
+  KIND(not_implemented_error, NotImplementedError) \
+  KIND(permission_error, PermissionError)          \
+  KIND(system_error, SystemError)                  \
+  KIND(timeout_error, TimeoutError)                \
+  KIND(type_error, TypeError)                      \
+  KIND(value_error, ValueError)
 
-/// The host gives up on the call: the call trap springs with what(), the call's name before it.
+/// The exception types with which the host gives up: by itself with the first two.
+enum class PanicKind {
+#define SIMHOST_KIND(kind, type) kind,
+  SIMHOST_PANIC_KINDS(SIMHOST_KIND)
+#undef SIMHOST_KIND
+};
+
+/// The kind of a type that the interpreter calls `type`, such as "OSError".
+std::optional<PanicKind> find_panic_kind(std::string_view type);
+
+/// Whether the trap's text begins with the name of the call.
+enum class PanicText { after_call, verbatim };
+
+/// The host gives up on the call: the call trap springs with what().
 class HostPanic : public std::runtime_error {
  public:
-  HostPanic(PanicKind kind, std::string const &message)
-      : std::runtime_error(message), kind_(kind) {}
+  HostPanic(PanicKind kind, std::string const &message, PanicText text = PanicText::after_call)
+      : std::runtime_error(message), kind_(kind), text_(text) {}
   [[nodiscard]] PanicKind kind() const { return kind_; }
+  [[nodiscard]] PanicText text() const { return text_; }
 
  private:
   PanicKind kind_;
+  PanicText text_;
 };
 
 /// Throws Refused; for the host's two libraries, which share no exception type with the core.

@@ -16,8 +16,9 @@ extern "C" {
 #pragma weak exceptionType
 #pragma weak exceptionMsg
 // NOLINTBEGIN(readability-identifier-naming): the interpreter's own names
-extern struct _object *PyExc_RuntimeError __attribute__((weak));
-extern struct _object *PyExc_OSError __attribute__((weak));
+#define SIMHOST_KIND(kind, type) extern struct _object *PyExc_##type __attribute__((weak));
+SIMHOST_PANIC_KINDS(SIMHOST_KIND)
+#undef SIMHOST_KIND
 // NOLINTEND(readability-identifier-naming)
 }
 
@@ -27,8 +28,19 @@ namespace {
 // The caller reads the message after the jump, and may keep the pointer until the next one.
 constinit PanicReport last_report{};
 
+struct _object **exception_variable(PanicKind kind) {
+  switch (kind) {
+#define SIMHOST_KIND(kind, type) \
+  case PanicKind::kind:          \
+    return &PyExc_##type;
+    SIMHOST_PANIC_KINDS(SIMHOST_KIND)
+#undef SIMHOST_KIND
+  }
+  __builtin_unreachable();
+}
+
 struct _object *exception_type(PanicKind kind) {
-  struct _object **const type = kind == PanicKind::os_error ? &PyExc_OSError : &PyExc_RuntimeError;
+  struct _object **const type = exception_variable(kind);
   return type == nullptr ? nullptr : *type;
 }
 
@@ -89,8 +101,11 @@ std::size_t append(std::span<char> target, std::size_t used, std::string_view te
 void describe(PanicReport &report, PanicKind kind, std::string_view call,
               std::string_view message) noexcept {
   report.kind = kind;
-  auto used = append(report.text, 0, call);
-  used = append(report.text, used, ": ");
+  std::size_t used = 0;
+  if (!call.empty()) {
+    used = append(report.text, used, call);
+    used = append(report.text, used, ": ");
+  }
   used = append(report.text, used, message);
   report.text.at(used) = '\0';
 }

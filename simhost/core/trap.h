@@ -15,7 +15,8 @@ struct PanicReport {
   std::array<char, 1024> text;  ///< UTF-8 with its NUL
 };
 
-/// Writes "<call>: <message>" into the report: cut at its size between two characters, and with a
+/// Writes "<call>: <message>", or the message alone without a call, into the report: cut at its
+/// size between two characters, and with a
 /// "?" for each byte that is no UTF-8, because the interpreter refuses a text with such bytes.
 void describe(PanicReport &report, PanicKind kind, std::string_view call,
               std::string_view message) noexcept;

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <map>
 #include <optional>
+#include <span>
 #include <vector>
 
 #include "core/bytes.h"
@@ -61,19 +62,17 @@ Team team_of(store::Transaction &transaction, store::SwitchKey key) {
   return team;
 }
 
-VSTeamPolicy default_policy(Team const &team) {
-  VSTeamPolicy policy{};
-  policy.loadBalance = TEAM_FRP_TYPE_LB_SRCID;
-  policy.linkCriteria = TEAM_FRP_CRIT_LINK_STATE;
-  for (auto const &uplink : team.uplinks) {
-    if (policy.numActive == QEX_TEAM_MAX_UPLINKS) {
-      break;
-    }
-    uplink.port.copy(policy.uplinkPortName[policy.numActive], QEX_NEB_NAME_MAX_LEN - 1);
-    ++policy.numActive;
-  }
-  return policy;
-}
+constexpr VSTeamPolicy kDefaultPolicy{
+    .loadBalance = TEAM_FRP_TYPE_LB_SRCID,
+    .linkCriteria = TEAM_FRP_CRIT_LINK_STATE,
+    .percentError = 0,
+    .fullDuplex = 0,
+    .speed = 0,
+    .flags = TEAM_FRP_FLAG_ALL_AVAILABLE | TEAM_FRP_FLAG_NOTIFY_SWITCH,
+    .numActive = 0,
+    .numStandby = 0,
+    .uplinkPortName = {},
+};
 
 VSTeamPolicy policy_of(store::Transaction &transaction, Team const &team, store::Port const &port) {
   auto const own =
@@ -82,7 +81,7 @@ VSTeamPolicy policy_of(store::Transaction &transaction, Team const &team, store:
   if (own) {
     return *own;
   }
-  return team.policy ? *team.policy : default_policy(team);
+  return team.policy.value_or(kDefaultPolicy);
 }
 
 bool is_usable(Team const &team, Uplink const &uplink, VSTeamPolicy const &policy) {
@@ -130,15 +129,32 @@ std::optional<Usable> usable_in_lag(Team const &team, std::string_view name,
   return usable[static_cast<std::uint32_t>(number) % usable.size()];
 }
 
+// Whom a policy names, and how many of them it wants in use.
+struct Named {
+  std::vector<std::string_view> names;
+  std::size_t active;
+};
+
+Named named_by(Team const &team, VSTeamPolicy const &policy) {
+  Named named{.names = {}, .active = policy.numActive};
+  for (auto const &name :
+       std::span(policy.uplinkPortName).first(std::size_t{policy.numActive} + policy.numStandby)) {
+    named.names.push_back(text_in(name));
+  }
+  if (named.names.empty()) {
+    for (auto const &uplink : team.uplinks) {
+      named.names.push_back(uplink.name);
+    }
+    named.active = named.names.size();
+  }
+  return named;
+}
+
 std::vector<Usable> uplinks_in_use(Team const &team, VSTeamPolicy const &policy,
                                    store::PortNumber number) {
-  auto const active = std::min<std::size_t>(policy.numActive, QEX_TEAM_MAX_UPLINKS);
-  auto const listed =
-      std::min<std::size_t>(active + std::min<std::size_t>(policy.numStandby, QEX_TEAM_MAX_UPLINKS),
-                            QEX_TEAM_MAX_UPLINKS);
+  auto const named = named_by(team, policy);
   std::vector<Usable> usable;
-  for (std::size_t at = 0; at < listed; ++at) {
-    auto const name = text_in(policy.uplinkPortName[at]);
+  for (auto const name : named.names) {
     auto found = usable_uplink(team, name, policy);
     if (!found) {
       found = usable_in_lag(team, name, policy, number);
@@ -152,7 +168,7 @@ std::vector<Usable> uplinks_in_use(Team const &team, VSTeamPolicy const &policy,
                      [](Usable const &a, Usable const &b) { return a.since < b.since; });
   }
   // A policy that has standby uplinks only uses one of them.
-  usable.resize(std::min(usable.size(), std::max<std::size_t>(active, 1)));
+  usable.resize(std::min(usable.size(), std::max<std::size_t>(named.active, 1)));
   return usable;
 }
 

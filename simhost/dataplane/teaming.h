@@ -1,7 +1,7 @@
 // Teaming: which uplink carries what a port sends, and what happens when a link changes.
 //
-// The policy of a port is its own, else its switch's, else all uplinks of the switch, active and
-// balanced. A team uses as many uplinks as the policy has active ones: the first usable ones,
+// The policy of a port is its own, else its switch's; one that names no uplinks means all of the
+// switch. A team uses as many uplinks as the policy has active ones: the first usable ones,
 // active before standby. So a standby uplink steps in for an active one whose link is down, and
 // steps back when that link returns; with TEAM_FRP_FLAG_ROLLING the uplinks that have been usable
 // for longest come first instead, so that nothing moves until it must. Among the uplinks in use

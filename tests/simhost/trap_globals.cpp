@@ -4,6 +4,7 @@
 namespace {
 _object runtime_error{"RuntimeError"};
 _object os_error{"OSError"};
+_object value_error{"ValueError"};
 }  // namespace
 
 extern "C" {
@@ -14,4 +15,5 @@ char *exceptionMsg;
 
 _object *PyExc_RuntimeError = &runtime_error;
 _object *PyExc_OSError = &os_error;
+_object *PyExc_ValueError = &value_error;
 }

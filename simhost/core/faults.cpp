@@ -1,0 +1,154 @@
+// Faults in SQL, and striking.
+#include "core/faults.h"
+
+#include <SQLiteCpp/Exception.h>
+
+#include <algorithm>
+#include <array>
+#include <mutex>
+#include <optional>
+#include <thread>
+
+#include "core/giving_up.h"
+#include "core/host.h"
+#include "store/store.h"
+
+namespace simhost {
+namespace {
+
+struct HostCall {
+  std::string_view name;
+  bool answers_status;
+};
+
+constexpr std::array kCalls{
+#define CALL(name, answers_status) HostCall{#name, answers_status},
+#include "call_names.inc"
+#undef CALL
+};
+
+void check(Fault const &fault) {
+  auto const call = std::find_if(kCalls.begin(), kCalls.end(), [&](HostCall const &known) {
+    return known.name == fault.function;
+  });
+  if (call == kCalls.end()) {
+    throw Refused(QEX_NOT_FOUND);
+  }
+  bool const status = fault.status != QEX_OK;
+  bool const exception = !fault.exception.empty();
+  // These two keep no state, and the first must return whatever happens.
+  if (fault.function == "Panic" || fault.function == "QEX_ReturnStatusToString" ||
+      (status && !call->answers_status)) {
+    throw Refused(QEX_NOT_SUPPORTED);
+  }
+  if ((status && exception) || (!status && !exception && fault.delay.count() == 0) ||
+      fault.delay.count() < 0 || fault.first < 1 || fault.last < fault.first ||
+      (exception && !find_panic_kind(fault.exception))) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+}
+
+Fault fault_at(store::Query const &row) {
+  return {.function = row.text(0),
+          .first = row.integer(1),
+          .last = row.integer(2),
+          .delay = std::chrono::milliseconds(row.integer(4)),
+          .status = static_cast<QEX_ReturnStatus>(row.integer(5)),
+          .exception = row.text(6),
+          .message = row.text(7)};
+}
+
+bool any_waits(store::Transaction &transaction, std::string_view function) {
+  return transaction.query("SELECT 1 FROM fault WHERE function = ?").with(function).next();
+}
+
+// The faults that hit the call of a function that is being made now.
+std::vector<Fault> count_call(store::Transaction &transaction, std::string_view function) {
+  transaction.query("UPDATE fault SET seen = seen + 1 WHERE function = ?").with(function).run();
+  std::vector<Fault> hits;
+  {
+    auto select = transaction.query(
+        "SELECT function, first, last, seen, delay, status, exception, message FROM fault"
+        " WHERE function = ? AND seen BETWEEN first AND last ORDER BY key");
+    select.with(function);
+    while (select.next()) {
+      hits.push_back(fault_at(select));
+    }
+  }
+  transaction.query("DELETE FROM fault WHERE function = ? AND seen >= last").with(function).run();
+  return hits;
+}
+
+std::vector<Fault> hits_on(std::string_view function) {
+  auto &host = this_host();
+  std::scoped_lock const held(host.lock());
+  auto &state = host.state();
+  {
+    store::Transaction look(state, store::Access::read);
+    if (!any_waits(look, function)) {
+      return {};
+    }
+  }
+  store::Transaction work(state, store::Access::write);
+  auto hits = count_call(work, function);
+  work.commit();
+  return hits;
+}
+
+void strike(Fault const &fault) {
+  if (fault.status != QEX_OK) {
+    throw Refused(fault.status);
+  }
+  if (!fault.exception.empty()) {
+    throw HostPanic(*find_panic_kind(fault.exception), fault.message, PanicText::verbatim);
+  }
+}
+
+}  // namespace
+
+void add_fault(store::Transaction &transaction, Fault const &fault) {
+  check(fault);
+  auto insert = transaction.query(
+      "INSERT INTO fault (function, first, last, delay, status, exception, message)"
+      " VALUES (?, ?, ?, ?, ?, ?, ?)");
+  insert.with(fault.function).with(fault.first).with(fault.last).with(fault.delay.count());
+  insert.with(std::int64_t{fault.status}).with(fault.exception).with(fault.message).run();
+}
+
+std::vector<WaitingFault> waiting_faults(store::Transaction &transaction) {
+  auto select = transaction.query(
+      "SELECT function, first, last, seen, delay, status, exception, message FROM fault"
+      " ORDER BY key");
+  std::vector<WaitingFault> waiting;
+  while (select.next()) {
+    waiting.push_back({.fault = fault_at(select), .seen = select.integer(3)});
+  }
+  return waiting;
+}
+
+void clear_faults(store::Transaction &transaction, std::string_view function) {
+  transaction.query("DELETE FROM fault WHERE ? IN ('', function)").with(function).run();
+}
+
+void meet_faults(char const *function) {
+  std::vector<Fault> hits;
+  try {
+    hits = hits_on(function);
+  } catch (store::UnusableState const &) {
+    return;  // the call itself says so, if it needs the state
+  } catch (SQLite::Exception const &) {
+    return;
+  }
+  std::chrono::milliseconds delay{0};
+  for (auto const &fault : hits) {
+    delay += fault.delay;
+  }
+  if (delay.count() > 0) {
+    std::this_thread::sleep_for(delay);
+  }
+  for (auto const &fault : hits) {
+    strike(fault);
+  }
+}
+
+}  // namespace simhost
