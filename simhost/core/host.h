@@ -5,6 +5,8 @@
 #include <mutex>
 #include <optional>
 
+#include "core/data_lists.h"
+#include "core/handles.h"
 #include "core/ledger.h"
 #include "store/store.h"
 
@@ -16,6 +18,8 @@ class Host {
   /// The lock of all below. Not recursive: nothing of the caller's may run while it is held.
   std::mutex &lock() { return lock_; }
   Ledger &ledger() { return ledger_; }
+  Handles &handles() { return handles_; }
+  DataLists &lists() { return lists_; }
   /// The state; opened on first use, from the file that SIMHOST_STATE names then, or in memory.
   /// Throws store::UnusableState.
   store::Store &state();
@@ -25,6 +29,8 @@ class Host {
  private:
   std::mutex lock_;
   Ledger ledger_;
+  Handles handles_;
+  DataLists lists_;
   bool configured_ = false;
   std::optional<std::filesystem::path> state_file_;
   std::optional<store::Store> state_;

@@ -70,4 +70,10 @@ store::Uplink known_uplink(store::Transaction &transaction, store::SwitchKey swi
   return uplink;
 }
 
+std::optional<store::Port> find_port(store::Transaction &transaction, store::SwitchName kind,
+                                     std::string_view switch_name, std::string_view identifier) {
+  auto const owner = store::find_switch(transaction, kind, switch_name);
+  return owner ? store::find_port(transaction, owner->key, identifier) : std::nullopt;
+}
+
 }  // namespace simhost

@@ -2,6 +2,7 @@
 // (QEX_NOT_FOUND).
 #pragma once
 
+#include <optional>
 #include <string_view>
 
 #include "core/api.h"
@@ -29,6 +30,12 @@ SIMHOST_API store::Uplink known_uplink(store::Transaction &transaction, std::str
 /// Likewise, at a port of one switch only.
 SIMHOST_API store::Uplink known_uplink(store::Transaction &transaction, store::SwitchKey switch_key,
                                        std::string_view name);
+
+/// Likewise, but nothing if it is not there.
+SIMHOST_API std::optional<store::Port> find_port(store::Transaction &transaction,
+                                                 store::SwitchName kind,
+                                                 std::string_view switch_name,
+                                                 std::string_view identifier);
 
 /// A port as an owner of properties.
 inline store::PropertyOwner owner_of(store::Port const &port) {

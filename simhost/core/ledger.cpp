@@ -2,23 +2,17 @@
 #include "core/ledger.h"
 
 #include <algorithm>
-#include <array>
 #include <cstdio>
 #include <iterator>
 #include <string>
 
 #include "core/giving_up.h"
+#include "core/handles.h"
 
 namespace simhost {
 namespace {
 
 constexpr std::size_t kRememberedReturns = 1024;
-
-std::string text_of(void const *address) {
-  std::array<char, 2 + (2 * sizeof address) + 1> text;
-  auto const length = std::snprintf(text.data(), text.size(), "%p", address);
-  return {text.data(), static_cast<std::size_t>(length)};
-}
 
 }  // namespace
 
@@ -47,9 +41,9 @@ void Ledger::take_back(void *memory, char const *call) {
                                  [&](Return const &past) { return past.address == memory; });
   if (last == returns_.rend()) {
     throw HostPanic(PanicKind::runtime_error,
-                    "the host never gave out the memory at " + text_of(memory));
+                    "the host never gave out the memory at " + text_of_address(memory));
   }
-  throw HostPanic(PanicKind::runtime_error, "the memory at " + text_of(memory) +
+  throw HostPanic(PanicKind::runtime_error, "the memory at " + text_of_address(memory) +
                                                 " is given back twice: " + last->giver +
                                                 " gave it out, " + last->taker + " took it back");
 }

@@ -67,7 +67,7 @@ store::Port uplink_port(store::Transaction &transaction, store::SwitchKey switch
                         std::string const &identifier) {
   auto const found = store::find_port(transaction, switch_key, identifier);
   if (!found) {
-    return added_port(transaction, switch_key, identifier, store::PortKind::uplink);
+    return add_vacant_uplink_port(transaction, switch_key, identifier);
   }
   if (found->kind != store::PortKind::uplink) {
     throw Refused(QEX_EXISTS);
@@ -93,11 +93,8 @@ store::Port vacant_uplink_port(store::Transaction &transaction, store::SwitchKey
   if (vacant != ports.end()) {
     return *vacant;
   }
-  if (ports.size() >= QEX_TEAM_MAX_UPLINKS) {
-    throw Refused(QEX_LIMIT_EXCEEDED);
-  }
-  return added_port(transaction, switch_key, fresh_uplink_identifier(transaction, switch_key),
-                    store::PortKind::uplink);
+  return add_vacant_uplink_port(transaction, switch_key,
+                                fresh_uplink_identifier(transaction, switch_key));
 }
 
 // A count and as many texts of `Width` bytes.
@@ -136,6 +133,16 @@ store::Port add_client_port(store::Transaction &transaction, store::SwitchKey sw
   auto port = added_port(transaction, switch_key, identifier, store::PortKind::client);
   auto const count = store::count_ports(transaction, switch_key, store::PortKind::client);
   if (count > store::find_switch(transaction, switch_key).value().row.max_ports) {
+    throw Refused(QEX_LIMIT_EXCEEDED);
+  }
+  return port;
+}
+
+store::Port add_vacant_uplink_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                                   std::string_view identifier) {
+  auto port = added_port(transaction, switch_key, identifier, store::PortKind::uplink);
+  auto const count = store::count_ports(transaction, switch_key, store::PortKind::uplink);
+  if (count > QEX_TEAM_MAX_UPLINKS) {
     throw Refused(QEX_LIMIT_EXCEEDED);
   }
   return port;
@@ -182,6 +189,19 @@ DVSPortType type_of(store::Transaction &transaction, store::Port const &port) {
 std::uint32_t connect_id_of(store::Transaction &transaction, store::Port const &port) {
   return read(transaction, owner_of(port),
               RecordProperty<std::uint32_t>{QEX_NEBPROP_PORT_CONNECTID, 0});
+}
+
+std::vector<DVPortData> ports_of_type(store::Transaction &transaction, store::SwitchKey switch_key,
+                                      DVSPortType type) {
+  std::vector<DVPortData> entries;
+  for (auto const &port : store::ports_of(transaction, switch_key)) {
+    if (type_of(transaction, port) == type) {
+      auto &entry = entries.emplace_back();
+      put_text(entry.dvPortId, port.identifier);
+      entry.connectId = connect_id_of(transaction, port);
+    }
+  }
+  return entries;
 }
 
 std::optional<std::string> alias_of(store::Transaction &transaction, store::Port const &port) {

@@ -20,6 +20,10 @@ namespace simhost {
 /// (QEX_LIMIT_EXCEEDED).
 SIMHOST_API store::Port add_client_port(store::Transaction &transaction,
                                         store::SwitchKey switch_key, std::string_view identifier);
+/// Adds an uplink port without an uplink, by the same rules of identifiers; refuses more than
+/// QEX_TEAM_MAX_UPLINKS (QEX_LIMIT_EXCEEDED).
+store::Port add_vacant_uplink_port(store::Transaction &transaction, store::SwitchKey switch_key,
+                                   std::string_view identifier);
 /// Sets what another system calls a port, by the rules of identifiers.
 SIMHOST_API void set_external_id(store::Transaction &transaction, store::Port const &port,
                                  std::string_view external_id);
@@ -36,6 +40,9 @@ SIMHOST_API store::Port known_uplink_port(store::Transaction &transaction,
 
 /// What a port is to this host: QEX_NEBPROP_PORT_TYPE, DVSPORT_TYPE_ACTIVE unless set.
 SIMHOST_API DVSPortType type_of(store::Transaction &transaction, store::Port const &port);
+/// The ports of a switch that are of that type, as lists of ports have them.
+SIMHOST_API std::vector<DVPortData> ports_of_type(store::Transaction &transaction,
+                                                  store::SwitchKey switch_key, DVSPortType type);
 /// The number that a port's client must show: QEX_NEBPROP_PORT_CONNECTID, 0 unless set.
 SIMHOST_API std::uint32_t connect_id_of(store::Transaction &transaction, store::Port const &port);
 /// QEX_NEBPROP_PORT_ALIAS; nothing if it is not set.

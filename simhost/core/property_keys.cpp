@@ -168,4 +168,9 @@ PropertyKey const *find_property_key(std::string_view name) {
   return found == kKeys.end() ? nullptr : found;
 }
 
+KeyFamily family_of(std::string_view name) {
+  auto const *const key = find_property_key(name);
+  return key == nullptr ? KeyFamily::extra : key->family;
+}
+
 }  // namespace simhost

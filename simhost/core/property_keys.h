@@ -6,6 +6,7 @@
 #include <span>
 #include <string_view>
 
+#include "core/api.h"
 #include "core/bytes.h"
 #include "store/properties.h"
 
@@ -42,5 +43,8 @@ struct PropertyKey {
 std::span<PropertyKey const> property_keys();
 /// The key of that name; null if the name has no meaning to the host.
 PropertyKey const *find_property_key(std::string_view name);
+
+/// KeyFamily::extra for a name without a meaning.
+SIMHOST_API KeyFamily family_of(std::string_view name);
 
 }  // namespace simhost

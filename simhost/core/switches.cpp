@@ -114,17 +114,26 @@ store::Switch row_behind(store::Transaction &transaction, store::SwitchKey key) 
 
 }  // namespace
 
-void create_switch(store::Transaction &transaction, SwitchSpec const &spec) {
+store::SwitchKey create_switch(store::Transaction &transaction, SwitchSpec const &spec) {
   auto const key = store::add_switch(transaction, row_of(transaction, spec));
   if (!key) {
     throw Refused(QEX_EXISTS);
   }
   write(transaction, PropertyOwner::global(*key), kMtu, or_default(spec.mtu, kDefaultMtu));
   attach_free_uplinks(transaction, *key, spec.uplink_count);
+  return *key;
 }
 
 void destroy_switch(store::Transaction &transaction, std::string_view alias) {
-  store::remove_switch(transaction, known_switch(transaction, alias).key);
+  destroy_switch(transaction, known_switch(transaction, alias).key);
+}
+
+void destroy_switch(store::Transaction &transaction, store::SwitchKey key) {
+  store::remove_switch(transaction, key);
+}
+
+void change_running(store::Transaction &transaction, store::SwitchKey key, bool running) {
+  store::set_associated(transaction, key, running);
 }
 
 void change_version(store::Transaction &transaction, store::SwitchKey key, std::uint32_t version) {

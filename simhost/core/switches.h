@@ -35,9 +35,14 @@ struct SwitchSpec {
 /// Creates a switch and attaches free uplinks to its uplink ports "uplink1", "uplink2", ... Refuses
 /// an empty alias and a number out of bounds (QEX_BAD_PARAM), a name too long (QEX_NAME_TOO_LONG),
 /// a name that is taken (QEX_EXISTS), and more uplinks than are free (QEX_NO_RESOURCES).
-SIMHOST_API void create_switch(store::Transaction &transaction, SwitchSpec const &spec);
+SIMHOST_API store::SwitchKey create_switch(store::Transaction &transaction, SwitchSpec const &spec);
 /// Destroys a switch with its ports and properties; its uplinks become free.
 SIMHOST_API void destroy_switch(store::Transaction &transaction, std::string_view alias);
+
+SIMHOST_API void destroy_switch(store::Transaction &transaction, store::SwitchKey key);
+/// Starts or stops running a switch on this host.
+SIMHOST_API void change_running(store::Transaction &transaction, store::SwitchKey key,
+                                bool running);
 
 /// Refuses 0 (QEX_BAD_PARAM).
 SIMHOST_API void change_version(store::Transaction &transaction, store::SwitchKey key,

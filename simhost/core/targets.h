@@ -1,6 +1,7 @@
 // Settings of a switch or a port that a caller names: what most calls of both libraries are.
 #pragma once
 
+#include <algorithm>
 #include <string_view>
 
 #include "core/boundary.h"

@@ -5,12 +5,14 @@
 #include <string>
 
 #include "core/boundary.h"
+#include "core/known.h"
 #include "core/switches.h"
 
 using simhost::answer;
 using simhost::Call;
 using simhost::required;
 using simhost::required_text;
+using simhost::store::SwitchName;
 
 namespace {
 
@@ -45,6 +47,17 @@ QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetBuffer) {
     auto *const output = &required(portsetBuffer);
     copy_text(simhost::portset_of(call.reading(), name), output);
   });
+}
+
+char DVPortExist(char const *switchId, char const *port) {
+  char exists = 0;
+  simhost::run(__func__, [&](Call &call) {
+    if (switchId != nullptr && port != nullptr) {
+      exists = static_cast<char>(
+          simhost::find_port(call.reading(), SwitchName::identifier, switchId, port).has_value());
+    }
+  });
+  return exists;
 }
 
 }  // extern "C"

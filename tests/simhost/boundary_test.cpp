@@ -260,22 +260,6 @@ TEST(StateFile, AnEmptyNameMeansMemory) {
       testing::ExitedWithCode(0), "");
 }
 
-TEST(Unmodelled, ACallWithAStatusIsRefused) {
-  EXPECT_EQ(DVSQEX_SwitchAdd("i", "s", 0, 0), QEX_NOT_IMPLEMENTED);
-  VSMACTable *table = nullptr;
-  EXPECT_EQ(VSQEX_GetTeamMACTable("s", VS_MAC_ADDR_TYPE_ALL, &table), QEX_NOT_IMPLEMENTED);
-  EXPECT_EQ(table, nullptr);
-}
-
-TEST(Unmodelled, ACallWithoutAStatusSpringsTheTrap) {
-  EXPECT_EQ(raised_by([] { DVS_SwitchId(nullptr); }),
-            (Raised{.type = "RuntimeError",
-                    .message = "DVS_SwitchId: the simulated host does not model this call yet"}));
-  EXPECT_EQ(raised_by([] { DVSData_Free(nullptr); }),
-            (Raised{.type = "RuntimeError",
-                    .message = "DVSData_Free: the simulated host does not model this call yet"}));
-}
-
 TEST(StatusText, OfSuccessAndOfFailures) {
   EXPECT_STREQ(QEX_ReturnStatusToString(QEX_OK), "Success");
   EXPECT_STREQ(QEX_ReturnStatusToString(QEX_NOT_FOUND), "Not found");

@@ -1,0 +1,113 @@
+// Lists over the caller's memory, and knowing them again.
+#include "core/data_lists.h"
+
+#include <algorithm>
+#include <new>
+
+#include "core/codec.h"
+#include "core/giving_up.h"
+#include "core/handles.h"
+
+namespace simhost {
+namespace {
+
+constexpr std::size_t kRememberedLists = 1024;
+
+}  // namespace
+
+ListMemory::ListMemory(DVSData_MemAlloc alloc, DVSData_MemFree release)
+    : alloc_(alloc), release_(release) {
+  if ((alloc == nullptr) != (release == nullptr)) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+}
+
+void *ListMemory::do_allocate(std::size_t size, std::size_t /*alignment*/) {
+  auto *const memory = is_hosts() ? ::operator new(size) : alloc_(size);
+  if (memory == nullptr) {
+    throw std::bad_alloc();
+  }
+  return memory;
+}
+
+void ListMemory::do_deallocate(void *memory, std::size_t /*size*/, std::size_t /*alignment*/) {
+  if (is_hosts()) {
+    ::operator delete(memory);
+  } else {
+    release_(memory);
+  }
+}
+
+bool ListMemory::do_is_equal(memory_resource const &other) const noexcept {
+  return this == &other;
+}
+
+DataList *DataList::make(DVSData_MemAlloc alloc, DVSData_MemFree release) {
+  ListMemory memory(alloc, release);
+  return new (memory.allocate(sizeof(DataList), alignof(DataList))) DataList(memory);
+}
+
+void DataList::destroy(DataList *list) {
+  auto own = list->memory_;
+  list->~DataList();
+  own.deallocate(list, sizeof(DataList), alignof(DataList));
+}
+
+void *DataList::allocate(std::size_t size) {
+  return memory_.allocate(size);
+}
+
+void DataList::update(std::string_view name, BytesView value, store::PropertyType type) {
+  if (name.empty()) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  std::pmr::vector<std::byte> copy(value.begin(), value.end(), &memory_);
+  auto const found = std::find_if(entries_.begin(), entries_.end(),
+                                  [&](Entry const &entry) { return entry.name == name; });
+  if (found != entries_.end()) {
+    found->value = std::move(copy);
+    found->type = type;
+  } else {
+    entries_.push_back({std::pmr::string(name, &memory_), std::move(copy), type});
+  }
+}
+
+Bytes DataList::serialized(std::uint32_t version) const {
+  if (version == 0) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  Writer writer;
+  writer.number(static_cast<std::uint32_t>(entries_.size()));
+  for (auto const &entry : entries_) {
+    writer.text(entry.name);
+    writer.number(static_cast<std::uint32_t>(entry.type));
+    writer.bytes(entry.value);
+  }
+  return writer.block(BlockKind::list, version);
+}
+
+void DataLists::add(DataList *list) {
+  lists_.insert(list);
+}
+
+DataList &DataLists::known(void *handle) const {
+  if (!lists_.contains(handle)) {
+    bool const freed = std::find(freed_.begin(), freed_.end(), handle) != freed_.end();
+    throw HostPanic(PanicKind::runtime_error,
+                    freed ? "the list " + text_of_address(handle) + " is freed already"
+                          : "the host never gave out the list " + text_of_address(handle));
+  }
+  return *static_cast<DataList *>(handle);
+}
+
+DataList *DataLists::take_back(void *handle) {
+  auto *const list = &known(handle);
+  lists_.erase(handle);
+  freed_.push_back(handle);
+  if (freed_.size() > kRememberedLists) {
+    freed_.pop_front();
+  }
+  return list;
+}
+
+}  // namespace simhost

@@ -1,0 +1,79 @@
+// What callers hold of the state: handles of switches and ports, items, and texts. They stay at
+// their addresses as long as the process lives, so that a stale one is never taken for another.
+#pragma once
+
+#include <cstddef>
+#include <deque>
+#include <map>
+#include <memory>
+#include <set>
+#include <string>
+#include <string_view>
+#include <tuple>
+#include <unordered_map>
+
+#include "core/api.h"
+#include "store/properties.h"
+
+namespace simhost {
+
+/// A property as it was when it was last looked up.
+struct Item {
+  store::PropertyOwner owner;
+  store::NamedProperty content;
+};
+
+/// Handles of one kind, one for each key.
+template <typename Key>
+class HandleTable {
+ public:
+  void *handle_of(Key key) {
+    auto const [found, is_new] = by_key_.try_emplace(key);
+    if (is_new) {
+      found->second = &slots_.emplace_back();
+      by_address_.emplace(found->second, key);
+    }
+    return found->second;
+  }
+  /// Null if the address is none of these handles.
+  Key const *key_behind(void const *address) const {
+    auto const found = by_address_.find(address);
+    return found == by_address_.end() ? nullptr : &found->second;
+  }
+
+ private:
+  std::map<Key, void *> by_key_;
+  std::unordered_map<void const *, Key> by_address_;
+  std::deque<std::byte> slots_;
+};
+
+/// Everything that takes an address throws HostPanic for one that it never gave.
+class Handles {
+ public:
+  SIMHOST_API void *of_switch(store::SwitchKey key);
+  SIMHOST_API void *of_port(store::PortNumber number);
+  /// The one item of that property, with the content that it has now.
+  SIMHOST_API Item *of_property(store::PropertyOwner const &owner, store::NamedProperty content);
+
+  [[nodiscard]] SIMHOST_API store::SwitchKey switch_behind(void const *handle) const;
+  [[nodiscard]] SIMHOST_API store::PortNumber port_behind(void const *handle) const;
+  [[nodiscard]] SIMHOST_API Item &item_behind(void const *item) const;
+
+  /// The same text at an address that stays.
+  SIMHOST_API char const *lasting(std::string_view text);
+
+ private:
+  using PropertyId =
+      std::tuple<store::SwitchKey, store::PropertyScope, store::PortNumber, std::string>;
+
+  HandleTable<store::SwitchKey> switches_;
+  HandleTable<store::PortNumber> ports_;
+  std::map<PropertyId, std::unique_ptr<Item>> items_;
+  std::unordered_map<void const *, Item *> items_by_address_;
+  std::set<std::string, std::less<>> texts_;
+};
+
+/// "0x7f...": how messages name an address.
+std::string text_of_address(void const *address);
+
+}  // namespace simhost
