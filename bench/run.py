@@ -1,0 +1,154 @@
+#!/usr/bin/env python3
+"""Compares the module's cost with that of its peers: run.py [--quick] BUILD.
+
+BUILD is a build folder with the module and the peers. The tables go to standard output, and
+results.json and calls.svg to bench/ in the build folder. README.md says what the figures mean.
+"""
+
+import argparse
+import json
+import os
+import platform
+import shutil
+import statistics
+import sys
+import time
+from pathlib import Path
+from typing import Any, Dict, List, Mapping
+
+import calls
+import report
+import targets
+from figures import EXPECTED, FIGURES, FORMS, PEERS
+
+
+class Progress:
+    """One line on a terminal that says what is being measured; elsewhere, a line now and then."""
+
+    def __init__(self) -> None:
+        self._terminal = sys.stderr.isatty()
+        self._last = float("-inf")
+
+    def __call__(self, text: str) -> None:
+        now = time.monotonic()
+        if self._terminal:
+            print(f"\r\033[K{text}", end="", file=sys.stderr, flush=True)
+        elif now - self._last > 10:
+            print(text, file=sys.stderr, flush=True)
+            self._last = now
+
+    def clear(self) -> None:
+        """Remove the line."""
+        if self._terminal:
+            print("\r\033[K", end="", file=sys.stderr, flush=True)
+
+
+def make_twin(build: Path) -> None:
+    """Copy the module, to be measured as a peer: how far the two differ is noise."""
+    twin = build / "bench" / "twin"
+    shutil.rmtree(twin, ignore_errors=True)
+    twin.mkdir(parents=True)
+    (module,) = (build / "python").glob("_libvswitch.*.so")
+    shutil.copy(module, twin)
+
+
+def check_answers(build: Path, core: int) -> List[str]:
+    """Ask every peer for every figure; what differs from the expected answer, a line each."""
+    wrong = []
+    for peer in PEERS:
+        with calls.Worker(peer, build, core, seed=0) as worker:
+            for form, peers in FORMS.items():
+                for figure in FIGURES if peer in peers else ():
+                    answer = worker.ask(form, figure)
+                    if answer != EXPECTED[figure]:
+                        wrong.append(f"{peer}, {form}, {figure}: {answer!r}")
+    return wrong
+
+
+def medians(times: calls.Times) -> Dict[str, Dict[str, Dict[str, float]]]:
+    """The median across processes of each form, figure and peer."""
+    return {
+        form: {
+            figure: {peer: statistics.median(values) for peer, values in row.items()}
+            for figure, row in rows.items()
+        }
+        for form, rows in times.items()
+    }
+
+
+def verdicts(
+    rows: Mapping[str, Mapping[str, float]], goals: Mapping[str, Mapping[str, float]]
+) -> List[Dict[str, Any]]:
+    """How each target fares."""
+    return [
+        {
+            "figure": figure,
+            "peer": peer,
+            "ratio": rows[figure]["ours"] / rows[figure][peer],
+            "target": target,
+            "met": targets.met(rows[figure]["ours"] / rows[figure][peer], target),
+        }
+        for figure, peers in goals.items()
+        for peer, target in peers.items()
+    ]
+
+
+def machine() -> Dict[str, str]:
+    """What was measured on."""
+    with open("/proc/cpuinfo", encoding="utf-8") as information:
+        names = [line.split(":")[1].strip() for line in information if "model name" in line]
+    return {
+        "processor": names[0] if names else platform.machine(),
+        "system": platform.platform(),
+        "python": platform.python_version(),
+    }
+
+
+def main() -> None:
+    """Measure, and report."""
+    parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
+    parser.add_argument("build", type=Path, help="the build folder")
+    parser.add_argument("--quick", action="store_true", help="a short run, whose figures are rough")
+    parser.add_argument("--core", type=int, help="the processor's core to stay on")
+    arguments = parser.parse_args()
+    build = arguments.build.resolve()
+    core = arguments.core if arguments.core is not None else max(os.sched_getaffinity(0))
+    os.sched_setaffinity(0, {core})
+    settings: Dict[str, Any] = (
+        {"processes": 1, "rounds": 2, "milliseconds": 0.5}
+        if arguments.quick
+        else {"processes": 9, "rounds": 9, "milliseconds": 4}
+    )
+
+    make_twin(build)
+    wrong = check_answers(build, core)
+    if wrong:
+        sys.exit("bench: these peers answer something else:\n" + "\n".join(wrong))
+    progress = Progress()
+    times = calls.measure(build, core, **settings, progress=progress)
+    progress.clear()
+    middle = medians(times)
+    judged = verdicts(middle["functions"], targets.CALLS)
+
+    print("\n".join(report.legend()), end="\n\n")
+    for form, title in (("functions", "As functions"), ("own", "In the peer's own form")):
+        goals = targets.CALLS if form == "functions" else {}
+        print("\n".join(report.table(title, "ns", FIGURES, middle[form], goals)), end="\n\n")
+    missed = [verdict for verdict in judged if not verdict["met"]]
+    print(f"{len(judged) - len(missed)} of {len(judged)} targets met")
+
+    results = {
+        "machine": machine(),
+        "settings": {**settings, "core": core, "quick": arguments.quick},
+        "calls": {"times": times, "medians": middle},
+        "targets": judged,
+    }
+    (build / "bench" / "results.json").write_text(json.dumps(results, indent=1), encoding="utf-8")
+    (build / "bench" / "calls.svg").write_text(report.picture(FIGURES, middle), encoding="utf-8")
+
+
+if __name__ == "__main__":
+    try:
+        main()
+    except calls.PeerMissing as error:
+        sys.exit(f"bench: {error}")

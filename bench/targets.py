@@ -1,0 +1,78 @@
+"""What the module is to reach: its time as a ratio to that of a peer."""
+
+from typing import Dict
+
+NOISE = 0.05
+"""What a ratio may be above its target before the target counts as missed."""
+
+CALLS: Dict[str, Dict[str, float]] = {
+    "read": {"handwritten": 1.08, "stock": 1.8, "pybind11": 0.22, "cffi": 0.55, "ctypes": 0.78},
+    "write": {
+        "handwritten": 1.02,
+        "stock": 0.80,
+        "pybind11": 0.22,
+        "cffi": 0.42,
+        "ctypes": 0.62,
+        "cython": 1.0,
+    },
+    "text_read": {
+        "handwritten": 1.10,
+        "stock": 1.5,
+        "pybind11": 0.35,
+        "cffi": 0.33,
+        "ctypes": 0.60,
+    },
+    "text_write": {
+        "handwritten": 1.10,
+        "stock": 0.58,
+        "pybind11": 0.25,
+        "cffi": 0.40,
+        "ctypes": 0.50,
+    },
+    "status": {
+        "handwritten": 0.80,
+        "stock": 0.66,
+        "pybind11": 0.38,
+        "cffi": 0.35,
+        "ctypes": 0.15,
+        "cython": 1.0,
+    },
+    "pair": {
+        "handwritten": 0.78,
+        "stock": 0.55,
+        "pybind11": 0.41,
+        "cffi": 0.22,
+        "ctypes": 0.11,
+        "cython": 1.0,
+    },
+    "filled": {
+        "handwritten": 0.83,
+        "stock": 0.64,
+        "pybind11": 0.26,
+        "cffi": 0.33,
+        "ctypes": 0.18,
+        "cython": 1.0,
+    },
+    "lifetime": {
+        "handwritten": 0.85,
+        "stock": 0.95,
+        "pybind11": 0.16,
+        "cffi": 0.48,
+        "ctypes": 0.80,
+        "cython": 1.0,
+    },
+}
+"""For each figure and peer, in the form of functions."""
+
+SURFACES: Dict[str, Dict[str, float]] = {
+    "import": {"handwritten": 1.4, "ctypes": 0.25},
+    "memory": {"handwritten": 1.6},
+    "size": {"stock": 1.1},
+    "compile": {"stock": 1.0},
+}
+"""For what is measured of whole modules."""
+
+
+def met(ratio: float, target: float) -> bool:
+    """Whether a ratio reaches its target, noise allowed for."""
+    return ratio <= target * (1 + NOISE)
