@@ -43,30 +43,30 @@ Way = Tuple[str, Callable[[RecordingHost], None], List[Any]]
 def ways_through(call: Call) -> Iterator[Way]:
     """Each way: its name, what the host is told for it, the arguments."""
 
-    def given_with(position: int, value: object) -> List[Any]:
-        given = call.given()
-        for place in call.positions(TextKind):
-            given[place - 1] = TEXTS[place]
-        if position:
-            given[position - 1] = value
+    texts = call.given()
+    for place in call.positions(TextKind):
+        texts[place - 1] = TEXTS[place]
+
+    def texts_but(position: int, value: object) -> List[Any]:
+        given = list(texts)
+        given[position - 1] = value
         return given
 
     def nothing(_: RecordingHost) -> None:
         pass
 
-    texts = given_with(0, None)
     yield "success", nothing, texts
     if call.result == "status":
         yield "failure", lambda host: host.answer(call.name, FAILURE), texts
     for position in call.positions():
         for value, error in call.kind(position).refused():
-            yield f"argument {position}: {error.__name__}", nothing, given_with(position, value)
+            yield f"argument {position}: {error.__name__}", nothing, texts_but(position, value)
     if not hasattr(sys, "gettotalrefcount"):
         # To a debug interpreter this way is fatal.
         for position in call.positions(IntegerKind):
-            yield f"argument {position}: beyond", nothing, given_with(position, 2**200)
+            yield f"argument {position}: beyond", nothing, texts_but(position, 2**200)
     for position in call.positions(BytesKind):
-        yield f"argument {position}: no bytes", nothing, given_with(position, 1)
+        yield f"argument {position}: no bytes", nothing, texts_but(position, 1)
     if call.name != "Panic":
         yield "sprung", lambda host: host.spring(call.name, RuntimeError, "sprung"), texts
 

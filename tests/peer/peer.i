@@ -29,6 +29,13 @@ static void free_definition(PyObject *capsule) {
   free(definition);
 }
 
+/* Fills the stack below the caller's frame. */
+__attribute__((noinline, no_sanitize("address"))) static void use_stack(char filling) {
+  char used[1 << 16];
+  memset(used, filling, sizeof used);
+  __asm__ volatile("" : : "r"(used) : "memory");
+}
+
 static void *no_malloc(void *context, size_t size) {
   (void)context, (void)size;
   return NULL;
@@ -67,6 +74,12 @@ PyObject *documented_function(char const *documentation) {
   function = PyCFunction_New(definition, owner);
   Py_DECREF(owner);
   return function;
+}
+
+/* What the function answers on a stack where whatever it does not initialise is the filling. */
+PyObject *call_on_used_stack(char filling, PyObject *function, PyObject *arguments) {
+  use_stack(filling);
+  return PyObject_CallObject(function, arguments);
 }
 
 /* What an initialisation function answers while the interpreter gets no memory for objects. */
