@@ -1,16 +1,277 @@
-// simhost_*: looking into the host of this process.
+// simhost_*: looking into the host of this process, and changing it from outside.
 #include "control/simhost.h"
 
+#include <cstring>
 #include <mutex>
+#include <optional>
 #include <span>
+#include <string>
 
+#include "control/lifecycle.h"
+#include "control/scenario.h"
+#include "control/texts.h"
 #include "core/api.h"
+#include "core/clock.h"
+#include "core/faults.h"
+#include "core/fresh_host.h"
+#include "core/giving_up.h"
 #include "core/host.h"
+#include "core/known.h"
+#include "dataplane/counters.h"
+#include "dataplane/links.h"
+#include "dataplane/mac_tables.h"
+#include "dataplane/teaming.h"
+
+namespace {
+
+using simhost::Refused;
+using simhost::store::Access;
+using simhost::store::Transaction;
+
+thread_local std::string last_error;
+
+int failed(QEX_ReturnStatus status, std::string why) {
+  last_error = std::move(why);
+  return status;
+}
+
+// What the exception being handled makes of a function with a status.
+int failure() noexcept {
+  try {
+    throw;
+  } catch (Refused const &refused) {
+    return failed(refused.status(), simhost::control::status_text(refused.status()));
+  } catch (simhost::control::DocumentError const &error) {
+    return failed(QEX_BAD_PARAM, error.what());
+  } catch (simhost::store::UnusableState const &error) {
+    return failed(QEX_IO_ERROR, error.what());
+  } catch (std::exception const &error) {
+    return failed(QEX_FAILURE, error.what());
+  }
+}
+
+// Does `work` on the state, in one transaction.
+template <typename Work>
+int on_state(Access access, Work const &work) noexcept {
+  last_error.clear();
+  try {
+    auto &host = simhost::this_host();
+    std::scoped_lock const held(host.lock());
+    Transaction transaction(host.state(), access);
+    work(transaction);
+    transaction.commit();
+    return QEX_OK;
+  } catch (...) {
+    return failure();
+  }
+}
+
+std::string given(char const *text) {
+  if (text == nullptr) {
+    throw Refused(QEX_BAD_PARAM);
+  }
+  return text;
+}
+
+size_t copy_out(std::string const &all, char *text, size_t size) {
+  if (size > 0) {
+    auto const length = all.copy(text, size - 1);
+    text[length] = '\0';
+  }
+  return all.size();
+}
+
+simhost::Place place_of(Transaction &work, char const *switch_name, char const *port) {
+  auto const key = simhost::known_switch(work, given(switch_name)).key;
+  if (port == nullptr) {
+    return {.switch_key = key, .port = std::nullopt};
+  }
+  return {.switch_key = key, .port = simhost::known_port(work, key, port).number};
+}
+
+// What a frame's sender learns of what became of its address.
+void refuse_unlearned(simhost::dataplane::Sighting sighting) {
+  using simhost::dataplane::Sighting;
+  switch (sighting) {
+    case Sighting::learning_off:
+      throw Refused(QEX_IS_DISABLED);
+    case Sighting::let_through:
+    case Sighting::dropped:
+      throw Refused(QEX_LIMIT_EXCEEDED);
+    case Sighting::kept_elsewhere:
+      throw Refused(QEX_EXISTS);
+    case Sighting::learned:
+    case Sighting::refreshed:
+    case Sighting::moved:
+      return;
+  }
+}
+
+VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
+  auto const bytes = simhost::control::mac_from(mac);
+  if (!bytes) {
+    throw Refused(QEX_INVALID_ADDRESS);
+  }
+  VSMACEntry source{};
+  std::memcpy(source.macAddress, bytes->data(), bytes->size());
+  source.vid = vlan;
+  source.vni = vni;
+  return source;
+}
+
+simhost::Fault fault_on(char const *function, uint32_t nth, uint32_t times) {
+  simhost::Fault fault;
+  fault.function = given(function);
+  fault.first = nth;
+  fault.last = times == 0 ? simhost::Fault::kForever : std::int64_t{nth} + times - 1;
+  return fault;
+}
+
+int add_fault(simhost::Fault const &fault) {
+  return on_state(Access::write, [&](Transaction &work) { simhost::add_fault(work, fault); });
+}
+
+}  // namespace
 
 extern "C" {
 
 SIMHOST_API char const *simhost_version() {
   return SIMHOST_VERSION;
+}
+
+SIMHOST_API char const *simhost_error() {
+  return last_error.c_str();
+}
+
+SIMHOST_API int simhost_apply(char const *document) {
+  return on_state(Access::write,
+                  [&](Transaction &work) { simhost::control::apply(work, given(document)); });
+}
+
+SIMHOST_API size_t simhost_describe(char *text, size_t size) {
+  size_t length = 0;
+  on_state(Access::read, [&](Transaction &work) {
+    length = copy_out(simhost::control::described_host(work).dump(2), text, size);
+  });
+  return length;
+}
+
+SIMHOST_API int simhost_restart() {
+  return on_state(Access::write, [](Transaction &work) { simhost::control::restart_host(work); });
+}
+
+SIMHOST_API int simhost_reset() {
+  return on_state(Access::write, [](Transaction &work) {
+    simhost::control::empty_host(work);
+    simhost::furnish_fresh_host(work);
+  });
+}
+
+SIMHOST_API int64_t simhost_clock_now() {
+  int64_t now = -1;
+  on_state(Access::read, [&](Transaction &work) { now = simhost::clock_now(work).count(); });
+  return now;
+}
+
+SIMHOST_API int simhost_clock_stop() {
+  return on_state(Access::write, [](Transaction &work) { simhost::stop_clock(work); });
+}
+
+SIMHOST_API int simhost_clock_run() {
+  return on_state(Access::write, [](Transaction &work) { simhost::run_clock(work); });
+}
+
+SIMHOST_API int simhost_clock_step(int64_t milliseconds) {
+  return on_state(Access::write, [&](Transaction &work) {
+    simhost::step_clock(work, simhost::ClockTime(milliseconds));
+  });
+}
+
+SIMHOST_API int simhost_clock_set(int64_t milliseconds) {
+  return on_state(Access::write, [&](Transaction &work) {
+    simhost::set_clock(work, simhost::ClockTime(milliseconds));
+  });
+}
+
+SIMHOST_API int simhost_set_link(char const *uplink, int up) {
+  return on_state(Access::write, [&](Transaction &work) {
+    auto const name = simhost::known_uplink(work, given(uplink)).name;
+    auto link = simhost::dataplane::link_of(work, name);
+    link.carrier = up != 0;
+    simhost::dataplane::change_link(work, name, link);
+  });
+}
+
+SIMHOST_API int simhost_learn(char const *switchName, char const *port, char const *mac,
+                              uint16_t vlan, uint32_t vni) {
+  auto sighting = simhost::dataplane::Sighting::learned;
+  auto const status = on_state(Access::write, [&](Transaction &work) {
+    sighting = simhost::dataplane::learn(work, place_of(work, switchName, port),
+                                         source_of(given(mac), vlan, vni));
+  });
+  if (status != QEX_OK) {
+    return status;
+  }
+  // Only now, because what was counted on the way has to last.
+  try {
+    refuse_unlearned(sighting);
+    return QEX_OK;
+  } catch (...) {
+    return failure();
+  }
+}
+
+SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, char const *session,
+                                    char const *name, uint64_t value) {
+  return on_state(Access::write, [&](Transaction &work) {
+    if (port != nullptr && session != nullptr) {
+      throw Refused(QEX_BAD_PARAM);
+    }
+    auto const place = place_of(work, switchName, port);
+    simhost::CounterOwner const owner{.switch_key = place.switch_key,
+                                      .port = place.port,
+                                      .session = session == nullptr ? "" : session};
+    simhost::dataplane::set_counter(work, owner, given(name), value);
+  });
+}
+
+SIMHOST_API int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int status) {
+  try {
+    auto fault = fault_on(function, nth, times);
+    fault.status = static_cast<QEX_ReturnStatus>(status);
+    return add_fault(fault);
+  } catch (...) {
+    return failure();
+  }
+}
+
+SIMHOST_API int simhost_panic_call(char const *function, uint32_t nth, uint32_t times,
+                                   char const *exception, char const *message) {
+  try {
+    auto fault = fault_on(function, nth, times);
+    fault.exception = given(exception);
+    fault.message = given(message);
+    return add_fault(fault);
+  } catch (...) {
+    return failure();
+  }
+}
+
+SIMHOST_API int simhost_delay_call(char const *function, uint32_t nth, uint32_t times,
+                                   uint32_t milliseconds) {
+  try {
+    auto fault = fault_on(function, nth, times);
+    fault.delay = std::chrono::milliseconds(milliseconds);
+    return add_fault(fault);
+  } catch (...) {
+    return failure();
+  }
+}
+
+SIMHOST_API int simhost_clear_faults(char const *function) {
+  return on_state(Access::write, [&](Transaction &work) {
+    simhost::clear_faults(work, function == nullptr ? "" : function);
+  });
 }
 
 SIMHOST_API size_t simhost_ledger_count() {
@@ -23,6 +284,12 @@ SIMHOST_API size_t simhost_ledger_report(char *text, size_t size) {
   auto &host = simhost::this_host();
   std::scoped_lock const held(host.lock());
   return host.ledger().report(std::span(text, size));
+}
+
+SIMHOST_API size_t simhost_ledger_summary(char *text, size_t size) {
+  auto &host = simhost::this_host();
+  std::scoped_lock const held(host.lock());
+  return copy_out(host.ledger().summary(), text, size);
 }
 
 }  // extern "C"

@@ -1,9 +1,14 @@
 // What only a simulated host offers: libsimhost.so exports these, so that a program which finds one
 // of them knows that the host it talks to is simulated. For C, C++ and foreign-function interfaces.
+//
+// A function with an int result answers QEX_OK, or the status that says why it did nothing; then
+// simhost_error() says it in words. None of them springs the call trap. Texts are NUL-terminated
+// UTF-8. Times are milliseconds.
 #ifndef SIMHOST_CONTROL_SIMHOST_H
 #define SIMHOST_CONTROL_SIMHOST_H
 
 #include <stddef.h>
+#include <stdint.h>
 
 #ifdef __cplusplus
 extern "C" {
@@ -11,6 +16,88 @@ extern "C" {
 
 /** The version of the simulated host: "major.minor.patch". Static text. */
 char const *simhost_version(void);
+
+/** Why the last function that this thread called failed, else empty; valid until the next. */
+char const *simhost_error(void);
+
+/* The host as a whole. */
+
+/** Changes the host as a scenario document in JSON says: all of it, or nothing of it. */
+int simhost_apply(char const *document);
+
+/**
+ * Describes the whole host as a document that simhost_apply reads.
+ *
+ * @param text receives as much as fits and a NUL; null if `size` is 0
+ * @param size bytes at `text`
+ * @return bytes of the whole document without its NUL; 0 if it failed
+ */
+size_t simhost_describe(char *text, size_t size);
+
+/** Restarts the host: what is volatile, learned or counted goes, and switches not persistent. */
+int simhost_restart(void);
+
+/** Makes the host as it was when its state was new. */
+int simhost_reset(void);
+
+/* The host's clock: real time until one of these is called. */
+
+/** What the clock shows, in milliseconds since the beginning of 1970; negative if it failed. */
+int64_t simhost_clock_now(void);
+int simhost_clock_stop(void);
+int simhost_clock_run(void);
+/** Moves the clock forward, whether or not it runs. */
+int simhost_clock_step(int64_t milliseconds);
+int simhost_clock_set(int64_t milliseconds);
+
+/* What comes to a host from outside. */
+
+/** Plugs the cable of an uplink in (1) or pulls it (0). */
+int simhost_set_link(char const *uplink, int up);
+
+/**
+ * A frame from an address arrives.
+ *
+ * QEX_IS_DISABLED if the port does not learn, QEX_LIMIT_EXCEEDED if there is no room, which is
+ * counted, and QEX_EXISTS if the address is fixed elsewhere.
+ *
+ * @param switchName alias of the switch
+ * @param port identifier of the port; null for the team of uplinks
+ * @param mac six bytes in hexadecimal with colons between them
+ * @param vni virtual network identifier, or 0
+ */
+int simhost_learn(char const *switchName, char const *port, char const *mac, uint16_t vlan,
+                  uint32_t vni);
+
+/**
+ * Sets a counter.
+ *
+ * @param port identifier of the port that counts; null for the switch or a session
+ * @param session identifier of the mirror session that counts; null for the switch or a port
+ * @param name the field of the record in which callers see it, such as "txErrors"
+ */
+int simhost_set_counter(char const *switchName, char const *port, char const *session,
+                        char const *name, uint64_t value);
+
+/* Faults: what is to happen to calls of a function. `nth` is the first call that is hit, 1 for the
+ * next; `times` is how many are, 0 for all that follow. Panic cannot be hit. */
+
+/** The calls do nothing and answer a status. */
+int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int status);
+
+/** The calls do nothing and spring the trap with an exception type such as "OSError", and a text.
+ */
+int simhost_panic_call(char const *function, uint32_t nth, uint32_t times, char const *exception,
+                       char const *message);
+
+/** The calls wait so many milliseconds of real time, then do what they do. */
+int simhost_delay_call(char const *function, uint32_t nth, uint32_t times, uint32_t milliseconds);
+
+/** Removes the faults of a function, or all for null. */
+int simhost_clear_faults(char const *function);
+
+/* The ledger: memory that the host gave out in this process. With SIMHOST_LEDGER=1 in the
+ * environment, what is still out when the process ends is summed up on standard error. */
 
 /** How many blocks of memory the host has given out in this process and not got back. */
 size_t simhost_ledger_count(void);
@@ -23,6 +110,12 @@ size_t simhost_ledger_count(void);
  * @return bytes of the whole report without its NUL
  */
 size_t simhost_ledger_report(char *text, size_t size);
+
+/**
+ * One line per function and size, in the order of the names: "<count> x <size> bytes from <call>".
+ * Parameters and result as above.
+ */
+size_t simhost_ledger_summary(char *text, size_t size);
 
 #ifdef __cplusplus
 }

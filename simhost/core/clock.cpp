@@ -54,6 +54,10 @@ void run_clock(store::Transaction &transaction) {
   keep(transaction, {.stopped = false, .value = clock_now(transaction) - real_time()});
 }
 
+void reset_clock(store::Transaction &transaction) {
+  keep(transaction, {.stopped = false, .value = ClockTime::zero()});
+}
+
 void step_clock(store::Transaction &transaction, ClockTime by) {
   auto row = row_of(transaction);
   if (by < ClockTime::zero() || by > kEnd - shown_by(row)) {

@@ -19,6 +19,8 @@ bool clock_is_stopped(store::Transaction &transaction);
 void stop_clock(store::Transaction &transaction);
 /// Lets the clock run on from what it shows.
 void run_clock(store::Transaction &transaction);
+/// Makes the clock a real one again.
+void reset_clock(store::Transaction &transaction);
 /// Moves the clock forward, whether or not it runs. Refuses to move it back, or further than a time
 /// of 64 bits reaches (QEX_BAD_PARAM).
 void step_clock(store::Transaction &transaction, ClockTime by);

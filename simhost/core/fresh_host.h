@@ -7,7 +7,8 @@ class Transaction;
 
 namespace simhost {
 
-/// Fills an empty state: four free uplinks, "nic0" to "nic3".
+/// Fills an empty state with what the document says that SIMHOST_SCENARIO names; without one, with
+/// the default host. Throws control::DocumentError for a document that cannot be used.
 void furnish_fresh_host(store::Transaction &transaction);
 
 }  // namespace simhost

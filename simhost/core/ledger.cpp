@@ -1,10 +1,15 @@
 // Recording what is given out, and catching what comes back wrongly.
 #include "core/ledger.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <cstdio>
 #include <iterator>
+#include <map>
 #include <string>
+#include <string_view>
+#include <utility>
 
 #include "core/giving_up.h"
 #include "core/handles.h"
@@ -60,6 +65,18 @@ std::size_t Ledger::report(std::span<char> text) const noexcept {
     text[0] = '\0';
   }
   return length;
+}
+
+std::string Ledger::summary() const {
+  std::map<std::pair<std::string_view, std::size_t>, std::size_t> counts;
+  for (auto const &block : blocks_) {
+    ++counts[{block.giver, block.size}];
+  }
+  std::string lines;
+  for (auto const &[what, count] : counts) {
+    lines += fmt::format("{} x {} bytes from {}\n", count, what.second, what.first);
+  }
+  return lines;
 }
 
 }  // namespace simhost

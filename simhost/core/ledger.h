@@ -6,6 +6,7 @@
 #include <list>
 #include <memory>
 #include <span>
+#include <string>
 #include <unordered_map>
 
 #include "core/api.h"
@@ -25,6 +26,8 @@ class Ledger {
   /// Writes one line per block, oldest first, and a NUL into `text`, cut at its size. Returns the
   /// length of the whole report without the NUL.
   std::size_t report(std::span<char> text) const noexcept;
+  /// One line per call and size, in the order of the names.
+  [[nodiscard]] std::string summary() const;
 
  private:
   struct Block {

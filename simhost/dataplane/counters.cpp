@@ -94,6 +94,17 @@ void add_to_counter(store::Transaction &transaction, CounterOwner const &owner,
   set_counter(transaction, owner, name, value + std::min(more, room));
 }
 
+std::vector<std::string> counting_sessions(store::Transaction &transaction, store::SwitchKey key) {
+  auto select = transaction.query(
+      "SELECT DISTINCT session FROM counter WHERE switch = ? AND session <> '' ORDER BY session");
+  select.with(std::int64_t(key));
+  std::vector<std::string> sessions;
+  while (select.next()) {
+    sessions.push_back(select.text(0));
+  }
+  return sessions;
+}
+
 void forget_counters(store::Transaction &transaction) {
   transaction.query("DELETE FROM counter").run();
 }

@@ -3,7 +3,9 @@
 
 #include <cstdint>
 #include <span>
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "core/data_plane.h"
 
@@ -26,6 +28,8 @@ void set_counter(store::Transaction &transaction, CounterOwner const &owner, std
 /// Counts on; a counter that is full stays full.
 void add_to_counter(store::Transaction &transaction, CounterOwner const &owner,
                     std::string_view name, std::uint64_t more);
+/// The mirror sessions of a switch that have counted.
+std::vector<std::string> counting_sessions(store::Transaction &transaction, store::SwitchKey key);
 void forget_counters(store::Transaction &transaction);
 
 }  // namespace simhost::dataplane

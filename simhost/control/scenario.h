@@ -1,0 +1,23 @@
+// Scenario documents: a host, or a change of one, in JSON. Every key is described in SCENARIOS.md.
+#pragma once
+
+#include <string_view>
+
+#include "control/document.h"
+
+namespace simhost::store {
+class Transaction;
+}
+
+namespace simhost::control {
+
+/// Makes the host what a document says. What the document names is added or changed; nothing else
+/// is touched. Throws DocumentError for a document that is malformed or that the host refuses; the
+/// transaction must not be committed then.
+void apply(store::Transaction &transaction, std::string_view document);
+
+/// The whole host as a document. Beside what apply() reads, switches and ports have a key
+/// "observed" with what follows from the rest, which apply() passes over.
+Json described_host(store::Transaction &transaction);
+
+}  // namespace simhost::control
