@@ -1,0 +1,493 @@
+// The state library: handles, items and walks, lists with allocators, images of the state.
+#include "nebpublic/state.h"
+
+#include <gmock/gmock.h>
+
+#include <array>
+#include <cstdio>
+#include <cstdlib>
+#include <string>
+#include <vector>
+
+#include "configured_switch.h"
+#include "nebpublic/data.h"
+#include "nebpublic/names.h"
+#include "qexapi/switch_properties.h"
+#include "trap_globals.h"
+#include "vswitch/properties.h"
+
+namespace {
+
+using StateLibrary = ConfiguredSwitch;
+
+std::string text_of(void const *address) {
+  std::array<char, 32> text{};
+  std::snprintf(text.data(), text.size(), "%p", address);
+  return text.data();
+}
+
+Raised runtime_error(std::string const &message) {
+  return {.type = "RuntimeError", .message = message};
+}
+
+TEST_F(StateLibrary, AHandleOfASwitchReadsIt) {
+  auto *const handle = DVSState_SwitchFindByAlias("s");
+  ASSERT_NE(handle, nullptr);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("s"), handle);
+  EXPECT_STREQ(DVS_SwitchId(handle), "s-id");
+  EXPECT_STREQ(DVS_SwitchName(handle), "s");
+  EXPECT_STREQ(DVS_ClassName(handle), "cswitch");
+  EXPECT_EQ(DVS_GetMaxPorts(handle), 128);
+  EXPECT_EQ(DVS_Version(handle), 200U);
+  auto const *const before = DVS_SwitchName(handle);
+  ASSERT_EQ(set_global(QEX_NEBPROP_SWITCH_ALIAS, bytes_of_text("renamed")), QEX_OK);
+  EXPECT_STREQ(DVS_SwitchName(handle), "renamed");
+  EXPECT_STREQ(before, "s") << "a text that was given stays";
+}
+
+TEST_F(StateLibrary, AHandleOfAPortReadsIt) {
+  auto *const handle = DVSState_PortFind("s-id", "p");
+  ASSERT_NE(handle, nullptr);
+  EXPECT_STREQ(DVS_PortId(handle), "p");
+  EXPECT_EQ(DVS_PortAlias(handle), nullptr);
+  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_ALIAS, bytes_of_text("desk")), QEX_OK);
+  EXPECT_STREQ(DVS_PortAlias(handle), "desk");
+}
+
+TEST_F(StateLibrary, WhatIsNotThereHasNoHandle) {
+  EXPECT_EQ(DVSState_SwitchFindByAlias("s-id"), nullptr);
+  EXPECT_EQ(DVSState_SwitchFindByAlias(nullptr), nullptr);
+  EXPECT_EQ(DVSState_PortFind("s", "p"), nullptr);
+  EXPECT_EQ(DVSState_PortFind("s-id", "q"), nullptr);
+  EXPECT_EQ(DVSState_PortFind(nullptr, "p"), nullptr);
+  EXPECT_EQ(DVSState_PortFind("s-id", nullptr), nullptr);
+}
+
+TEST_F(StateLibrary, ANullHandleIsNothing) {
+  EXPECT_EQ(DVS_SwitchId(nullptr), nullptr);
+  EXPECT_EQ(DVS_SwitchName(nullptr), nullptr);
+  EXPECT_EQ(DVS_ClassName(nullptr), nullptr);
+  EXPECT_EQ(DVS_GetMaxPorts(nullptr), 0);
+  EXPECT_EQ(DVS_Version(nullptr), 0U);
+  EXPECT_EQ(DVS_PortId(nullptr), nullptr);
+  EXPECT_EQ(DVS_PortAlias(nullptr), nullptr);
+  EXPECT_EQ(DVSData_Name(nullptr), nullptr);
+  EXPECT_EQ(DVSData_Data(nullptr, nullptr), 0U);
+  EXPECT_EQ(DVSData_PropType(nullptr), 0U);
+  EXPECT_EQ(raised_by([] { DVSData_Free(nullptr); }), std::nullopt);
+}
+
+TEST_F(StateLibrary, AHandleOfNothingSpringsTheTrap) {
+  static int mine = 0;
+  auto const address = text_of(&mine);
+  EXPECT_EQ(raised_by([] { DVS_SwitchId(&mine); }),
+            runtime_error("DVS_SwitchId: the host never gave out the switch handle " + address));
+  EXPECT_EQ(raised_by([] { DVS_PortAlias(&mine); }),
+            runtime_error("DVS_PortAlias: the host never gave out the port handle " + address));
+  EXPECT_EQ(raised_by([] { DVSData_Name(&mine); }),
+            runtime_error("DVSData_Name: the host never gave out the item " + address));
+  EXPECT_EQ(raised_by([] { DVSData_Free(&mine); }),
+            runtime_error("DVSData_Free: the host never gave out the list " + address));
+  EXPECT_EQ(raised_by([] { DVSData_Update(&mine, "n", nullptr, 0, CONFIG_PROP_TYPE); }),
+            runtime_error("DVSData_Update: the host never gave out the list " + address));
+  auto *const port = DVSState_PortFind("s-id", "p");
+  EXPECT_EQ(
+      raised_by([=] { DVS_Version(port); }),
+      runtime_error("DVS_Version: the host never gave out the switch handle " + text_of(port)))
+      << "a port is no switch";
+}
+
+TEST_F(StateLibrary, AHandleOfWhatIsGoneSpringsTheTrap) {
+  auto *const handle = DVSState_SwitchFindByAlias("s");
+  auto *const port = DVSState_PortFind("s-id", "p");
+  ASSERT_EQ(DVSQEX_StateCleanup(), QEX_OK);
+  EXPECT_EQ(raised_by([=] { DVS_SwitchName(handle); }),
+            runtime_error("DVS_SwitchName: the switch behind the handle " + text_of(handle) +
+                          " is gone"));
+  EXPECT_EQ(raised_by([=] { DVS_PortId(port); }),
+            runtime_error("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
+}
+
+// Gathers what a walk reaches; ends it when there are `most` of them.
+struct Gathered {
+  std::vector<std::string> names;
+  std::size_t most = 1000;
+};
+
+char gather(Gathered &gathered, char const *name) {
+  gathered.names.emplace_back(name);
+  return static_cast<char>(gathered.names.size() < gathered.most);
+}
+
+char gather_switch(void *handle, void *context) {
+  return gather(*static_cast<Gathered *>(context), DVS_SwitchName(handle));
+}
+
+char gather_port(void *handle, void *context) {
+  return gather(*static_cast<Gathered *>(context), DVS_PortId(handle));
+}
+
+char gather_item(void *item, void *context) {
+  return gather(*static_cast<Gathered *>(context), DVSData_Name(item));
+}
+
+TEST_F(StateLibrary, WalksReachAllInTheirOrder) {
+  ASSERT_EQ(VSDVS_CreateVSwitch("t", nullptr, nullptr, 0, 1, 0, 0, 0), QEX_OK);
+  Gathered switches;
+  DVSState_SwitchForEach(gather_switch, &switches);
+  EXPECT_THAT(switches.names, testing::ElementsAre("s", "t"));
+  auto *const handle = DVSState_SwitchFindByAlias("s");
+  Gathered ports;
+  DVSState_PortForEach(handle, gather_port, &ports);
+  EXPECT_THAT(ports.names, testing::ElementsAre("uplink1", "uplink2", "p"));
+  Gathered global_items;
+  DVSState_GlobalPropForEach(handle, gather_item, &global_items);
+  EXPECT_THAT(global_items.names,
+              testing::ElementsAre(QEX_NEBPROP_SWITCH_ALIAS, QEX_NEBPROP_SWITCH_UPLINKPORTS,
+                                   QEX_NEBPROP_SWITCH_VERSION, VSPROP_MTU));
+  Gathered host_items;
+  DVSState_HostPropForEach(handle, gather_item, &host_items);
+  EXPECT_THAT(host_items.names,
+              testing::ElementsAre(QEX_NEBPROP_HOST_PROXY, QEX_NEBPROP_HOST_UPLINKPORTS));
+  Gathered port_items;
+  DVSState_PortDataForEach(DVSState_PortFind("s-id", "p"), gather_item, &port_items);
+  EXPECT_THAT(port_items.names,
+              testing::ElementsAre(QEX_NEBPROP_PORT_CONNECTID, QEX_NEBPROP_PORT_STATUS,
+                                   QEX_NEBPROP_PORT_VLAN));
+}
+
+TEST_F(StateLibrary, AResultOfZeroEndsAWalk) {
+  ASSERT_EQ(VSDVS_CreateVSwitch("t", nullptr, nullptr, 0, 1, 0, 0, 0), QEX_OK);
+  auto *const handle = DVSState_SwitchFindByAlias("s");
+  Gathered switches{.names = {}, .most = 1};
+  DVSState_SwitchForEach(gather_switch, &switches);
+  EXPECT_THAT(switches.names, testing::ElementsAre("s"));
+  Gathered ports{.names = {}, .most = 2};
+  DVSState_PortForEach(handle, gather_port, &ports);
+  EXPECT_THAT(ports.names, testing::ElementsAre("uplink1", "uplink2"));
+  Gathered items{.names = {}, .most = 1};
+  DVSState_GlobalPropForEach(handle, gather_item, &items);
+  EXPECT_THAT(items.names, testing::ElementsAre(QEX_NEBPROP_SWITCH_ALIAS));
+}
+
+char remove_port(void *handle, void *context) {
+  auto *const count = static_cast<int *>(context);
+  auto const status = VSDVS_RemoveDVPort("s", DVS_PortId(handle));
+  *count += status == QEX_OK ? 1 : 0;
+  return 1;
+}
+
+TEST_F(StateLibrary, ACallbackMayChangeWhatItWalksOver) {
+  ASSERT_EQ(VSDVS_AddDVPort("s", "q", 0), QEX_OK);
+  int removed = 0;
+  DVSState_PortForEach(DVSState_SwitchFindByAlias("s"), remove_port, &removed);
+  EXPECT_EQ(removed, 2) << "the uplink ports stay";
+  EXPECT_EQ(DVPortExist("s-id", "p"), 0);
+}
+
+char give_back_rubbish(void * /*handle*/, void *context) {
+  VSDVS_FreeMemory(context);
+  return 1;
+}
+
+TEST_F(StateLibrary, ACallbackMaySpringTheTrap) {
+  static int mine = 0;
+  for (int round = 0; round < 100; ++round) {
+    ASSERT_TRUE(raised_by([] { DVSState_SwitchForEach(give_back_rubbish, &mine); }).has_value());
+    ASSERT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK) << "the host goes on";
+  }
+}
+
+TEST_F(StateLibrary, WalksOfNothing) {
+  Gathered gathered;
+  DVSState_PortForEach(nullptr, gather_port, &gathered);
+  DVSState_GlobalPropForEach(nullptr, gather_item, &gathered);
+  DVSState_HostPropForEach(nullptr, gather_item, &gathered);
+  DVSState_PortDataForEach(nullptr, gather_item, &gathered);
+  EXPECT_THAT(gathered.names, testing::IsEmpty());
+  EXPECT_EQ(raised_by([] { DVSState_SwitchForEach(nullptr, nullptr); }), std::nullopt);
+}
+
+TEST_F(StateLibrary, AnItemIsASnapshot) {
+  DVSDataItem item = nullptr;
+  ASSERT_EQ(DVSState_GlobalPropLookup("s-id", VSPROP_MTU, &item), QEX_OK);
+  EXPECT_STREQ(DVSData_Name(item), VSPROP_MTU);
+  EXPECT_EQ(DVSData_PropType(item), static_cast<qex_uint32>(CONFIG_PROP_TYPE));
+  void *data = nullptr;
+  ASSERT_EQ(DVSData_Data(item, &data), sizeof(qex_uint32));
+  ASSERT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK);
+  EXPECT_EQ(*static_cast<qex_uint32 *>(data), 1500U) << "until it is looked up again";
+  DVSDataItem again = nullptr;
+  ASSERT_EQ(DVSState_GlobalPropLookup("s-id", VSPROP_MTU, &again), QEX_OK);
+  EXPECT_EQ(again, item);
+  ASSERT_EQ(DVSData_Data(item, &data), sizeof(qex_uint32));
+  EXPECT_EQ(*static_cast<qex_uint32 *>(data), 9000U);
+  EXPECT_EQ(DVSState_GlobalPropLookup("s-id", "com.example.none", &item), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSState_GlobalPropLookup("s", VSPROP_MTU, &item), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSState_HostPropLookup("s-id", VSPROP_MTU, &item), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSState_HostPropLookup("s-id", QEX_NEBPROP_HOST_PROXY, &item), QEX_OK);
+  EXPECT_EQ(DVSState_HostPropLookup("s-id", QEX_NEBPROP_HOST_PROXY, nullptr), QEX_BAD_PARAM);
+}
+
+// An allocator that counts what is out and can run dry.
+int blocks_out = 0;
+int blocks_left = 0;
+
+void *counted_alloc(size_t size) {
+  if (blocks_left == 0) {
+    return nullptr;
+  }
+  --blocks_left;
+  ++blocks_out;
+  return std::malloc(size);
+}
+
+void counted_free(void *memory) {
+  --blocks_out;
+  std::free(memory);
+}
+
+TEST_F(StateLibrary, AListUsesTheCallersAllocator) {
+  blocks_left = 1000;
+  DVSDataHandle list = nullptr;
+  ASSERT_EQ(DVSData_Alloc(&list, counted_alloc, counted_free), QEX_OK);
+  EXPECT_GT(blocks_out, 0);
+  std::array<unsigned char, 100> data{1, 2, 3};
+  EXPECT_EQ(DVSData_Update(list, "com.example.a", data.data(), data.size(), POLICY_PROP_TYPE),
+            QEX_OK);
+  EXPECT_EQ(DVSData_Update(list, "com.example.a", nullptr, 0, CONFIG_PROP_TYPE), QEX_OK);
+  void *bytes = nullptr;
+  qex_uint32 length = 0;
+  ASSERT_EQ(DVSData_Serialize(list, &bytes, &length, 200), QEX_OK);
+  EXPECT_GT(length, 0U);
+  EXPECT_EQ(simhost_ledger_count(), 0U) << "the block is the caller's, too";
+  counted_free(bytes);
+  EXPECT_EQ(raised_by([=] { DVSData_Free(list); }), std::nullopt);
+  EXPECT_EQ(blocks_out, 0);
+  EXPECT_EQ(raised_by([=] { DVSData_Free(list); }),
+            runtime_error("DVSData_Free: the list " + text_of(list) + " is freed already"));
+}
+
+TEST_F(StateLibrary, AnAllocatorMayRunDry) {
+  bool done = false;
+  for (int room = 0; !done; ++room) {
+    ASSERT_LT(room, 20);
+    blocks_left = room;
+    DVSDataHandle list = nullptr;
+    std::array<unsigned char, 100> data{};
+    auto status = DVSData_Alloc(&list, counted_alloc, counted_free);
+    if (status == QEX_OK) {
+      status = DVSData_Update(list, "com.example.a.name.that.is.long", data.data(), data.size(),
+                              CONFIG_PROP_TYPE);
+      done = status == QEX_OK;
+      DVSData_Free(list);
+    }
+    EXPECT_EQ(status, done ? QEX_OK : QEX_NO_MEMORY);
+    EXPECT_EQ(blocks_out, 0);
+  }
+}
+
+TEST_F(StateLibrary, AListInTheHostsMemory) {
+  DVSDataHandle list = nullptr;
+  EXPECT_EQ(DVSData_Alloc(nullptr, nullptr, nullptr), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSData_Alloc(&list, counted_alloc, nullptr), QEX_BAD_PARAM);
+  ASSERT_EQ(DVSData_Alloc(&list, nullptr, nullptr), QEX_OK);
+  EXPECT_EQ(DVSData_Update(list, nullptr, nullptr, 0, CONFIG_PROP_TYPE), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSData_Update(list, "", nullptr, 0, CONFIG_PROP_TYPE), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSData_Update(list, "n", nullptr, 1, CONFIG_PROP_TYPE), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSData_Update(list, "n", nullptr, 0, 3), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSData_Update(nullptr, "n", nullptr, 0, CONFIG_PROP_TYPE), QEX_BAD_PARAM);
+  void *bytes = nullptr;
+  qex_uint32 length = 0;
+  EXPECT_EQ(DVSData_Serialize(list, &bytes, &length, 0), QEX_BAD_PARAM);
+  ASSERT_EQ(DVSData_Serialize(list, &bytes, &length, 200), QEX_OK);
+  EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(bytes); }), std::nullopt);
+  DVSData_Free(list);
+}
+
+// The serialised form of a list that a call makes; it tells lists apart and goes back at once.
+std::string listed(QEX_ReturnStatus status, DVSDataHandle list) {
+  if (status != QEX_OK) {
+    return "";
+  }
+  void *bytes = nullptr;
+  qex_uint32 length = 0;
+  EXPECT_EQ(DVSData_Serialize(list, &bytes, &length, 200), QEX_OK);
+  std::string text(static_cast<char const *>(bytes), length);
+  DVSQEX_DataFree(bytes);
+  DVSData_Free(list);
+  return text;
+}
+
+TEST_F(StateLibrary, ListsOfPropertiesByFamilyAndType) {
+  ASSERT_EQ(set_global("com.example.mine", {1}, POLICY_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(set_host("com.example.host", {1}, VOLATILE_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(set_port("com.example.port", {1}), QEX_OK);
+  ASSERT_EQ(set_port(VSPROP_PORT_TX_UPLINK, {1}), QEX_OK);
+  ASSERT_EQ(set_host(VSPROP_SWITCH_STATUS, bytes_of(1)), QEX_OK);
+  using testing::AllOf;
+  using testing::HasSubstr;
+  using testing::Not;
+  DVSDataHandle list = nullptr;
+  auto const all = static_cast<qex_uint32>(ALL_PROP_TYPE);
+  auto status = DVSQEX_VendorGlobalPropList("s-id", &list, all);
+  EXPECT_THAT(listed(status, list), AllOf(HasSubstr(VSPROP_MTU), Not(HasSubstr("com.example"))));
+  status = DVSQEX_VendorGlobalPropList("s-id", &list, POLICY_PROP_TYPE);
+  EXPECT_THAT(listed(status, list), Not(HasSubstr(VSPROP_MTU)));
+  status = DVSQEX_VendorHostPropList("s-id", &list, all);
+  EXPECT_THAT(listed(status, list),
+              AllOf(HasSubstr(VSPROP_SWITCH_STATUS), Not(HasSubstr(QEX_NEBPROP_HOST_PROXY))));
+  status = DVSQEX_VendorPortPropList("s-id", "p", &list, all);
+  EXPECT_THAT(listed(status, list),
+              AllOf(HasSubstr(VSPROP_PORT_TX_UPLINK), Not(HasSubstr(QEX_NEBPROP_PORT_CONNECTID))));
+  status = DVSQEX_ExtraConfigPropList("s-id", &list, all);
+  EXPECT_THAT(listed(status, list),
+              AllOf(HasSubstr("com.example.mine"), HasSubstr("com.example.host"),
+                    Not(HasSubstr(VSPROP_MTU)), Not(HasSubstr("com.example.port"))));
+  status = DVSQEX_ExtraConfigPropList("s-id", &list, POLICY_PROP_TYPE);
+  EXPECT_THAT(listed(status, list),
+              AllOf(HasSubstr("com.example.mine"), Not(HasSubstr("com.example.host"))));
+  status = DVSQEX_ExtraConfigPortPropList("s-id", "p", &list, all);
+  EXPECT_THAT(listed(status, list),
+              AllOf(HasSubstr("com.example.port"), Not(HasSubstr(VSPROP_PORT_TX_UPLINK))));
+  EXPECT_EQ(DVSQEX_VendorGlobalPropList("s-id", &list, 0), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_VendorGlobalPropList("s-id", &list, 1), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_VendorGlobalPropList("s-id", nullptr, all), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_VendorGlobalPropList("s", &list, all), QEX_NOT_FOUND);
+}
+
+Bytes image(QEX_ReturnStatus (*get)(void **, int *)) {
+  void *data = nullptr;
+  int length = 0;
+  EXPECT_EQ(get(&data, &length), QEX_OK);
+  return taken(data, length);
+}
+
+QEX_ReturnStatus deserialize(Bytes bytes) {
+  return DVSState_ConfigDeserialize(bytes.data(), static_cast<int>(bytes.size()));
+}
+
+TEST_F(StateLibrary, TheConfigurationComesBackFromItsImage) {
+  ASSERT_EQ(set_port(VSPROP_PORT_TX_UPLINK, {1}, "p", POLICY_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(set_port("com.example.soon", {1}, "p", RUNTIME_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(VSDVS_AddOpaqueDVPort("s", "q", "theirs"), QEX_OK);
+  ASSERT_EQ(VSDVS_CreateVSwitch("fleeting", nullptr, nullptr, 0, 0, 0, 0, 0), QEX_OK);
+  auto const persistent = image(DVSQEX_PersistentStateGet);
+  ASSERT_EQ(DVSState_ConfigReset(), QEX_OK);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("s"), nullptr);
+  EXPECT_EQ(deserialize(persistent), QEX_OK);
+  EXPECT_EQ(port(VSPROP_PORT_TX_UPLINK), Bytes{1});
+  EXPECT_EQ(port("com.example.soon"), std::nullopt);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("fleeting"), nullptr);
+  OpaqueDVPortData *opaque = nullptr;
+  ASSERT_EQ(DVSQEX_PortGetByExternalId("s-id", "theirs", &opaque), QEX_OK);
+  DVSQEX_DataFree(opaque);
+  EXPECT_EQ(VSDVS_AddSwitchUplinkPort("s", "nic0"), QEX_EXISTS) << "the uplinks are back";
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), persistent);
+}
+
+TEST_F(StateLibrary, TheWholeStateComesBackFromItsImage) {
+  ASSERT_EQ(set_port("com.example.soon", {1}, "p", RUNTIME_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(VSDVS_CreateVSwitch("fleeting", nullptr, nullptr, 0, 0, 0, 0, 0), QEX_OK);
+  ASSERT_EQ(DVSQEX_SwitchAdd("i", "waiting", 0, 0), QEX_OK);
+  auto whole = image(DVSQEX_StateGet);
+  ASSERT_EQ(DVSQEX_StateInit(nullptr, 0), QEX_OK);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("s"), nullptr);
+  EXPECT_EQ(deserialize(whole), QEX_BAD_PARAM) << "it is more than a configuration";
+  EXPECT_EQ(DVSQEX_StateInit(whole.data(), static_cast<int>(whole.size())), QEX_OK);
+  EXPECT_EQ(port("com.example.soon"), Bytes{1});
+  EXPECT_NE(DVSState_SwitchFindByAlias("fleeting"), nullptr);
+  EXPECT_EQ(image(DVSQEX_StateGet), whole);
+}
+
+TEST_F(StateLibrary, DamagedImagesAreRefusedAndChangeNothing) {
+  ASSERT_EQ(set_port(VSPROP_PORT_TX_UPLINK, {1}), QEX_OK);
+  auto const good = image(DVSQEX_PersistentStateGet);
+  for (std::size_t length = 0; length < good.size(); ++length) {
+    ASSERT_NE(deserialize(Bytes(good.begin(), good.begin() + static_cast<std::ptrdiff_t>(length))),
+              QEX_OK)
+        << length;
+  }
+  for (std::size_t at = 0; at < good.size(); ++at) {
+    auto bad = good;
+    bad[at] ^= 0x55;
+    // The version of the switch that a block is for changes nothing in it.
+    if (at < 12 || at >= 16) {
+      ASSERT_NE(deserialize(bad), QEX_OK) << at;
+    }
+  }
+  EXPECT_EQ(deserialize(good + Bytes{0}), QEX_INVALID_METADATA);
+  EXPECT_EQ(DVSState_ConfigDeserialize(nullptr, 0), QEX_INVALID_METADATA);
+  EXPECT_EQ(DVSState_ConfigDeserialize(nullptr, 8), QEX_BAD_PARAM);
+  auto byte = Bytes{0};
+  EXPECT_EQ(DVSState_ConfigDeserialize(byte.data(), -1), QEX_BAD_PARAM);
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), good);
+}
+
+// Past the checksum: what it covers may still be anything. The sum is the last field of the header.
+TEST_F(StateLibrary, ImagesWithARightChecksumAreReadWithCareToo) {
+  constexpr std::size_t kHeader = 24;
+  auto const good = image(DVSQEX_PersistentStateGet);
+  auto const with_sum = [](Bytes bytes) {
+    qex_uint32 sum = 2166136261U;
+    for (std::size_t at = kHeader; at < bytes.size(); ++at) {
+      sum = (sum ^ bytes[at]) * 16777619U;
+    }
+    std::memcpy(&bytes[kHeader - sizeof sum], &sum, sizeof sum);
+    return bytes;
+  };
+  ASSERT_EQ(with_sum(good), good) << "this test computes the sum as the host does";
+  int refused = 0;
+  for (std::size_t at = kHeader; at < good.size(); ++at) {
+    for (unsigned char const change : {0x01, 0x80, 0xFF}) {
+      auto bad = good;
+      bad[at] ^= change;
+      refused += deserialize(with_sum(bad)) == QEX_OK ? 0 : 1;
+    }
+  }
+  EXPECT_GT(refused, 100) << "most of these are no state";
+  EXPECT_EQ(deserialize(good), QEX_OK);
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), good);
+}
+
+TEST_F(StateLibrary, SanitizingDropsWhatIsGone) {
+  ASSERT_EQ(VSDVS_AddDVPort("s", "q", 0), QEX_OK);
+  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_TYPE, bytes_of(DVSPORT_TYPE_ZOMBIE), "q"), QEX_OK);
+  ASSERT_EQ(VSDVS_CreateVSwitch("fleeting", "f", nullptr, 0, 0, 0, 0, 0), QEX_OK);
+  EXPECT_EQ(DVSQEX_StateSanitize(), QEX_OK);
+  EXPECT_EQ(DVPortExist("s-id", "q"), 0);
+  EXPECT_EQ(DVPortExist("s-id", "p"), 1);
+  EXPECT_NE(DVSState_SwitchFindByAlias("fleeting"), nullptr) << "it runs";
+  ASSERT_EQ(DVSQEX_SwitchDissociate("f"), QEX_OK);
+  EXPECT_EQ(DVSQEX_StateSanitize(), QEX_OK);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("fleeting"), nullptr);
+}
+
+TEST_F(StateLibrary, KernelSwitches) {
+  EXPECT_EQ(DVSQEX_SwitchAdd("i", "a", 64, 100), QEX_OK);
+  auto *const handle = DVSState_SwitchFindByAlias("a");
+  EXPECT_STREQ(DVS_SwitchId(handle), "i");
+  EXPECT_EQ(DVS_GetMaxPorts(handle), 64);
+  EXPECT_EQ(DVS_Version(handle), 100U);
+  EXPECT_EQ(DVSQEX_SwitchAdd("i", "b", 0, 0), QEX_EXISTS);
+  EXPECT_EQ(DVSQEX_SwitchAdd("j", "a", 0, 0), QEX_EXISTS);
+  EXPECT_EQ(DVSQEX_SwitchAdd("", "b", 0, 0), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_SwitchAdd("j", "", 0, 0), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_SwitchAdd(nullptr, "b", 0, 0), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_SwitchAdd("j", nullptr, 0, 0), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_SwitchSetVersion("i", 0), QEX_BAD_PARAM);
+  EXPECT_EQ(DVSQEX_SwitchSetVersion("a", 1), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSQEX_SwitchAssociate("a"), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSQEX_SwitchDissociate("a"), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSQEX_SwitchRemove("a"), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSQEX_SwitchRemove("i"), QEX_OK);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("a"), nullptr);
+}
+
+TEST_F(StateLibrary, NoSwitchHasCommandsOfItsOwn) {
+  EXPECT_EQ(DVSQEX_CmdExec("s-id", "anything", nullptr, 0, nullptr, nullptr), QEX_NOT_SUPPORTED);
+  EXPECT_EQ(DVSQEX_CmdExec("none", "anything", nullptr, 0, nullptr, nullptr), QEX_NOT_FOUND);
+  EXPECT_EQ(DVSQEX_CmdExec("s-id", nullptr, nullptr, 0, nullptr, nullptr), QEX_BAD_PARAM);
+}
+
+}  // namespace

@@ -1,0 +1,540 @@
+// Typed calls and raw property calls are doors to the same bytes, in both directions, for every
+// key.
+#include <gmock/gmock.h>
+
+#include <algorithm>
+#include <array>
+#include <functional>
+#include <string>
+
+#include "configured_switch.h"
+#include "qexapi/switch_properties.h"
+#include "vswitch/properties.h"
+
+namespace {
+
+template <std::size_t Size>
+void put(char (&field)[Size], std::string_view text) {
+  ASSERT_LT(text.size(), Size);
+  text.copy(field, text.size());
+}
+
+VSTeamPolicy teaming(qex_uint32 load_balance) {
+  VSTeamPolicy policy{};
+  policy.loadBalance = load_balance;
+  policy.flags = TEAM_FRP_FLAG_ROLLING;
+  policy.numActive = 1;
+  policy.numStandby = 1;
+  put(policy.uplinkPortName[0], "uplink2");
+  put(policy.uplinkPortName[1], "uplink1");
+  return policy;
+}
+
+VSExtraEthFilter filter(qex_uint32 flags) {
+  VSExtraEthFilter record{};
+  record.flags = flags;
+  record.numMulticastAddrs = 1;
+  record.multicastAddrs[0][0] = 0x01;
+  record.multicastAddrs[0][5] = 0x42;
+  return record;
+}
+
+// A table of one session with a destination of a VLAN.
+Bytes mirror_table(std::string_view sid) {
+  DVMirrorSessionTable header{};
+  header.magicNum = VS_DVMIRROR_MAGIC_NUM;
+  header.version = VS_DVMIRROR_VERSION_V2;
+  header.numSessions = 1;
+  header.numEntities = 1;
+  DVMirrorSession session{};
+  put(session.sid, sid);
+  session.numDstEntities = 1;
+  DVMirrorEntity entity{};
+  entity.type = MIRROR_ENTTYPE_VLAN;
+  entity.vlan = 5;
+  return bytes_of(header) + bytes_of(session) + bytes_of(entity);
+}
+
+Bytes vlan_policy(qex_uint16 flags, qex_uint16 vlan,
+                  std::vector<qex_NEBPortVIDRange> const &ranges) {
+  VSPortVlanPolicy policy{};
+  policy.flags = flags;
+  policy.vlanID = vlan;
+  policy.numRanges = static_cast<qex_uint16>(ranges.size());
+  auto bytes = bytes_of(policy);
+  for (auto const &range : ranges) {
+    bytes = bytes + bytes_of(range);
+  }
+  return bytes;
+}
+
+// One key: two values, a typed set of each, and a typed get in the form of the raw bytes.
+struct Doors {
+  char const *key;
+  bool of_port;
+  std::array<Bytes, 2> values;
+  std::function<QEX_ReturnStatus(Bytes const &)> typed_set;
+  std::function<Bytes()> typed_get;
+};
+
+// The record that the bytes are, for a typed call to take.
+template <typename Record>
+Record as(Bytes const &bytes) {
+  Record record;
+  EXPECT_EQ(bytes.size(), sizeof record);
+  std::memcpy(&record, bytes.data(), sizeof record);
+  return record;
+}
+
+template <typename Record, typename Get>
+std::function<Bytes()> getter(Get get) {
+  return [get] {
+    Record record{};
+    EXPECT_EQ(get(&record), QEX_OK);
+    return bytes_of(record);
+  };
+}
+
+template <typename Record, typename Set>
+std::function<QEX_ReturnStatus(Bytes const &)> setter(Set set) {
+  return [set](Bytes const &bytes) {
+    auto const record = as<Record>(bytes);
+    return set(record);
+  };
+}
+
+// A typed get that hands out a record of varying size.
+template <typename Record, typename Get, typename SizeOf>
+std::function<Bytes()> handed_out(Get get, SizeOf size_of) {
+  return [get, size_of] {
+    Record *record = nullptr;
+    EXPECT_EQ(get(&record), QEX_OK);
+    auto const *const first = reinterpret_cast<unsigned char const *>(record);
+    Bytes bytes(first, first + size_of(*record));
+    VSDVS_FreeMemory(record);
+    return bytes;
+  };
+}
+
+std::vector<Doors> all_doors() {
+  using std::placeholders::_1;
+  auto const s = [](auto call) { return [call](auto... more) { return call("s", more...); }; };
+  auto const p = [](auto call) { return [call](auto... more) { return call("s", "p", more...); }; };
+  auto const by_address = [](auto call) {
+    return [call](auto const &record) { return call(&record); };
+  };
+  VSMACLearning learning{};
+  learning.agingTime = 60;
+  learning.macLimit = 10;
+  VSMACLearning other_learning = learning;
+  other_learning.learnStatic = 1;
+  VSPMACManagement management{};
+  management.portMACLearning.learning = 1;
+  management.portMACLearning.macLimit = 8;
+  VSPMACManagement other_management = management;
+  other_management.portMACLearning.macLimitPolicy = VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP;
+  VSPvlanMapEntry const promiscuous{
+      .primaryVID = 10, .secondaryVID = 10, .pvlanType = VSPORT_PVLAN_TYPE_PROMISC, .pad = {}};
+  VSPvlanMapEntry const isolated{
+      .primaryVID = 10, .secondaryVID = 11, .pvlanType = VSPORT_PVLAN_TYPE_ISOLATED, .pad = {}};
+  VSPropSecurity const security{.flags = VSPORT_SECURITY_DISALLOW_PROMISC};
+  VSPropSecurity const other_security{.flags = VSPORT_SECURITY_DISALLOW_FORGED_SRC};
+
+  auto const map_set = [](Bytes const &bytes) {
+    return VSDVS_SetPrivateVLANMap("s", reinterpret_cast<VSPvlanMapEntry const *>(bytes.data()),
+                                   static_cast<int>(bytes.size() / sizeof(VSPvlanMapEntry)));
+  };
+  auto const map_get = [] {
+    VSPvlanMapEntry *entries = nullptr;
+    int count = 0;
+    EXPECT_EQ(VSDVS_GetPrivateVLANMap("s", &entries, &count), QEX_OK);
+    auto const *const first = reinterpret_cast<unsigned char const *>(entries);
+    Bytes bytes(first, first + (count * sizeof(VSPvlanMapEntry)));
+    VSDVS_FreeMemory(entries);
+    return bytes;
+  };
+  auto const override_set = [](Bytes const &bytes) {
+    return VSDVS_SetPortTeamingOverride("s", "p", reinterpret_cast<char const *>(bytes.data()));
+  };
+  auto const override_get = [] {
+    std::array<char, 82> text{};
+    EXPECT_EQ(VSDVS_GetPortTeamingOverride("s", "p", text.data()), QEX_OK);
+    return bytes_of_text(text.data());
+  };
+  auto const vlan_set = [](Bytes const &bytes) {
+    Bytes copy = bytes;
+    auto *const policy = reinterpret_cast<VSPortVlanPolicy *>(copy.data());
+    return VSDVS_SetPortVLANPolicy(
+        "s", "p", policy->vlanID, -1, (policy->flags & VSPORT_VLAN_GUEST_TAGGING) != 0,
+        (policy->flags & VSPORT_VLAN_PVLAN_ENABLED) != 0, policy->vidRanges, policy->numRanges);
+  };
+  auto const vlan_get = handed_out<VSPortVlanPolicy>(
+      [](VSPortVlanPolicy **policy) {
+        int priority = 0;
+        return VSDVS_GetPortVLANPolicy("s", "p", policy, &priority);
+      },
+      [](VSPortVlanPolicy const &policy) {
+        return sizeof policy + (policy.numRanges * sizeof(qex_NEBPortVIDRange));
+      });
+  auto const priority_set = [](Bytes const &bytes) {
+    return VSDVS_SetPortVLANPolicy("s", "p", 3, as<int>(bytes), 0, 0, nullptr, 0);
+  };
+  auto const priority_get = [] {
+    VSPortVlanPolicy *policy = nullptr;
+    int priority = 0;
+    EXPECT_EQ(VSDVS_GetPortVLANPolicy("s", "p", &policy, &priority), QEX_OK);
+    VSDVS_FreeMemory(policy);
+    return bytes_of(priority);
+  };
+  auto const mirror_set = [](Bytes const &bytes) {
+    Bytes copy = bytes;
+    EXPECT_EQ(VSDVS_ClearDVMirrorSessions("s", "p"), QEX_OK);
+    return VSDVS_AppendDVMirrorSessions("s", "p",
+                                        reinterpret_cast<DVMirrorSessionTable *>(copy.data()));
+  };
+  auto const mirror_get = handed_out<DVMirrorSessionTable>(
+      p(VSDVS_GetDVMirrorSessions), [](DVMirrorSessionTable const &table) {
+        return sizeof table + (table.numSessions * sizeof(DVMirrorSession)) +
+               (table.numEntities * sizeof(DVMirrorEntity));
+      });
+  auto const port_learning_set = [](Bytes const &bytes) {
+    auto const record = as<VSPMACManagement>(bytes);
+    auto const learning_part = record.portMACLearning;
+    return VSDVS_SetPortMACLearning("s", "p", &learning_part);
+  };
+  auto const port_learning_get = [] {
+    VSPMACManagement record{};
+    VSPMACLearning learning_part{};
+    EXPECT_EQ(VSDVS_GetPortMACLearning("s", "p", &learning_part), QEX_OK);
+    record.portMACLearning = learning_part;
+    return bytes_of(record);
+  };
+
+  return {
+      {VSPROP_MTU,
+       false,
+       {bytes_of(qex_uint32{9000}), bytes_of(qex_uint32{1600})},
+       setter<qex_uint32>(s(VSDVS_SetMTU)),
+       getter<qex_uint32>(s(VSDVS_GetMTU))},
+      {VSPROP_SWITCH_TEAMING,
+       false,
+       {bytes_of(teaming(1)), bytes_of(teaming(4))},
+       setter<VSTeamPolicy>(by_address(s(VSDVS_SetTeamingPolicy))),
+       getter<VSTeamPolicy>(s(VSDVS_GetTeamingPolicy))},
+      {VSPROP_SWITCH_TEAMING,
+       false,
+       {bytes_of(teaming(2)), bytes_of(teaming(3))},
+       setter<VSTeamPolicy>(by_address(s(VSDVS_SetTeamingPolicy))),
+       getter<VSTeamPolicy>(
+           [](VSTeamPolicy *policy) { return VSDVS_GetTeamingPolicyFromDVSID("s-id", policy); })},
+      {VSPROP_SWITCH_MAC_LEARNING,
+       false,
+       {bytes_of(learning), bytes_of(other_learning)},
+       setter<VSMACLearning>(by_address(s(VSDVS_SetMACLearning))),
+       getter<VSMACLearning>(s(VSDVS_GetMACLearning))},
+      {VSPROP_PVLAN_MAP,
+       false,
+       {bytes_of(promiscuous) + bytes_of(isolated), bytes_of(promiscuous)},
+       map_set,
+       map_get},
+      {VSPROP_MULTICAST_FILTER,
+       false,
+       {bytes_of(1), bytes_of(2)},
+       setter<VSMcastFilterMode>(s(VSDVS_SetMcastFilterMode)),
+       getter<int>(s(VSDVS_GetMcastFilterMode))},
+      {VSPROP_PORT_SECURITY,
+       true,
+       {bytes_of(security), bytes_of(other_security)},
+       setter<VSPropSecurity>(by_address(p(VSDVS_SetPortSecurity))),
+       getter<VSPropSecurity>(p(VSDVS_GetPortSecurity))},
+      {VSPROP_PORT_TEAMING_POLICY,
+       true,
+       {bytes_of(teaming(1)), bytes_of(teaming(4))},
+       setter<VSTeamPolicy>(by_address(p(VSDVS_SetPortTeamingPolicy))),
+       getter<VSTeamPolicy>(p(VSDVS_GetPortTeamingPolicy))},
+      {VSPROP_PORT_TEAMING_OVERRIDE,
+       true,
+       {bytes_of_text("uplink1"), bytes_of_text("uplink2")},
+       override_set,
+       override_get},
+      {VSPROP_PORT_VLAN,
+       true,
+       {vlan_policy(VSPORT_VLAN_GUEST_TAGGING, 0, {{1, 9}, {20, 20}}), vlan_policy(0, 4094, {})},
+       vlan_set,
+       vlan_get},
+      {VSPROP_PORT_PRIORITY, true, {bytes_of(7), bytes_of(0)}, priority_set, priority_get},
+      {VSPROP_PORT_TX_UPLINK,
+       true,
+       {bytes_of(qex_Bool{1}), bytes_of(qex_Bool{0})},
+       setter<qex_Bool>(p(VSDVS_SetTxUplinkAlways)),
+       getter<qex_Bool>(p(VSDVS_GetTxUplinkAlways))},
+      {VSPROP_PORT_VLAN_NESTEDTAG,
+       true,
+       {bytes_of(qex_Bool{1}), bytes_of(qex_Bool{0})},
+       setter<qex_Bool>(p(VSDVS_SetPortNestedVLANTagging)),
+       getter<qex_Bool>(p(VSDVS_GetPortNestedVLANTagging))},
+      {VSPROP_PORT_EXTRA_ETH_FRP,
+       true,
+       {bytes_of(filter(QEX_ETH_FILTER_ALLMULTI)), bytes_of(filter(QEX_ETH_FILTER_SINK))},
+       setter<VSExtraEthFilter>(by_address(p(VSDVS_SetExtraEthFilter))),
+       getter<VSExtraEthFilter>(p(VSDVS_GetExtraEthFilter))},
+      {VSPROP_PORT_MIRROR_SESSIONS,
+       true,
+       {mirror_table("one"), mirror_table("two")},
+       mirror_set,
+       mirror_get},
+      {VSPROP_PORT_MAC_MANAGEMENT,
+       true,
+       {bytes_of(management), bytes_of(other_management)},
+       port_learning_set,
+       port_learning_get},
+  };
+}
+
+using TwoDoors = ConfiguredSwitch;
+
+std::optional<Bytes> raw(Doors const &doors) {
+  return doors.of_port ? TwoDoors::port(doors.key) : TwoDoors::global(doors.key);
+}
+
+QEX_ReturnStatus set_raw(Doors const &doors, Bytes const &value) {
+  return doors.of_port ? TwoDoors::set_port(doors.key, value)
+                       : TwoDoors::set_global(doors.key, value);
+}
+
+TEST_F(TwoDoors, WhatATypedCallWritesTheRawCallReads) {
+  for (auto const &doors : all_doors()) {
+    for (auto const &value : doors.values) {
+      EXPECT_EQ(doors.typed_set(value), QEX_OK) << doors.key;
+      EXPECT_EQ(raw(doors), value) << doors.key;
+    }
+  }
+}
+
+TEST_F(TwoDoors, WhatTheRawCallWritesATypedCallReads) {
+  for (auto const &doors : all_doors()) {
+    for (auto const &value : doors.values) {
+      EXPECT_EQ(set_raw(doors, value), QEX_OK) << doors.key;
+      EXPECT_EQ(doors.typed_get(), value) << doors.key;
+    }
+  }
+}
+
+TEST_F(TwoDoors, TheRawDoorTakesNoOtherSize) {
+  for (auto const &doors : all_doors()) {
+    auto const &value = doors.values[0];
+    ASSERT_EQ(set_raw(doors, value), QEX_OK) << doors.key;
+    auto const longer = value + Bytes{0};
+    auto const shorter = Bytes(value.begin(), value.end() - 1);
+    EXPECT_EQ(set_raw(doors, longer), QEX_BAD_PARAM) << doors.key;
+    EXPECT_EQ(set_raw(doors, shorter), QEX_BAD_PARAM) << doors.key;
+    EXPECT_EQ(raw(doors), value) << doors.key << " after refused calls";
+  }
+}
+
+TEST_F(TwoDoors, AClearedPropertyReadsAsItsDefault) {
+  for (auto const &doors : all_doors()) {
+    auto const clear = [&] {
+      return doors.of_port ? DVSQEX_PortDataClear("s-id", "p", doors.key)
+                           : DVSQEX_GlobalPropClear("s-id", doors.key);
+    };
+    clear();
+    auto const unset = doors.typed_get();
+    EXPECT_EQ(clear(), QEX_NOT_FOUND) << doors.key;
+    for (auto const &value : doors.values) {
+      ASSERT_EQ(doors.typed_set(value), QEX_OK) << doors.key;
+    }
+    EXPECT_EQ(clear(), QEX_OK) << doors.key;
+    EXPECT_EQ(raw(doors), std::nullopt) << doors.key;
+    EXPECT_EQ(doors.typed_get(), unset) << doors.key;
+  }
+}
+
+TEST_F(TwoDoors, TypedClearsAreRawClears) {
+  struct {
+    char const *key;
+    bool of_port;
+    std::function<QEX_ReturnStatus()> clear;
+  } const clears[] = {
+      {VSPROP_SWITCH_TEAMING, false, [] { return VSDVS_ClearTeamingPolicy("s"); }},
+      {VSPROP_SWITCH_MAC_LEARNING, false, [] { return VSDVS_ClearMACLearning("s"); }},
+      {VSPROP_PORT_TEAMING_POLICY, true, [] { return VSDVS_ClearPortTeamingPolicy("s", "p"); }},
+      {VSPROP_PORT_TEAMING_OVERRIDE, true, [] { return VSDVS_ClearPortTeamingOverride("s", "p"); }},
+      {VSPROP_PORT_VLAN, true, [] { return VSDVS_ClearPortVLANPolicy("s", "p"); }},
+      {VSPROP_PORT_PRIORITY, true, [] { return VSDVS_ClearPortVLANPolicy("s", "p"); }},
+      {VSPROP_PORT_EXTRA_ETH_FRP, true, [] { return VSDVS_ClearExtraEthFilter("s", "p"); }},
+      {VSPROP_PORT_MIRROR_SESSIONS, true, [] { return VSDVS_ClearDVMirrorSessions("s", "p"); }},
+  };
+  auto const doors = all_doors();
+  for (auto const &[key, of_port, clear] : clears) {
+    auto const found =
+        std::find_if(doors.begin(), doors.end(),
+                     [key = std::string_view(key)](auto const &d) { return d.key == key; });
+    ASSERT_NE(found, doors.end()) << key;
+    ASSERT_EQ(found->typed_set(found->values[0]), QEX_OK) << key;
+    ASSERT_TRUE((of_port ? port(key) : global(key)).has_value()) << key;
+    EXPECT_EQ(clear(), QEX_OK) << key;
+    EXPECT_EQ(of_port ? port(key) : global(key), std::nullopt) << key;
+    EXPECT_EQ(clear(), QEX_OK) << key << ": what is clear stays clear";
+  }
+}
+
+TEST_F(TwoDoors, TheSinkPortIsABitOfTheFilter) {
+  ASSERT_EQ(set_port(VSPROP_PORT_EXTRA_ETH_FRP, bytes_of(filter(QEX_ETH_FILTER_ALLMULTI))), QEX_OK);
+  qex_Bool sink = 1;
+  EXPECT_EQ(VSDVS_IsSinkPortEnabled("s", "p", &sink), QEX_OK);
+  EXPECT_EQ(sink, 0);
+  EXPECT_EQ(VSDVS_ConfigureSinkPort("s", "p", 1), QEX_OK);
+  EXPECT_EQ(VSDVS_IsSinkPortEnabled("s", "p", &sink), QEX_OK);
+  EXPECT_EQ(sink, 1);
+  EXPECT_EQ(port(VSPROP_PORT_EXTRA_ETH_FRP),
+            bytes_of(filter(QEX_ETH_FILTER_ALLMULTI | QEX_ETH_FILTER_SINK)));
+  EXPECT_EQ(VSDVS_ConfigureSinkPort("s", "p", 0), QEX_OK);
+  EXPECT_EQ(port(VSPROP_PORT_EXTRA_ETH_FRP), bytes_of(filter(QEX_ETH_FILTER_ALLMULTI)));
+}
+
+TEST_F(TwoDoors, MacLearningLeavesTheRestOfTheManagementAlone) {
+  VSPMACManagement management{};
+  management.macChangeAllowed = 1;
+  ASSERT_EQ(set_port(VSPROP_PORT_MAC_MANAGEMENT, bytes_of(management)), QEX_OK);
+  VSPMACLearning learning{};
+  learning.learning = 1;
+  ASSERT_EQ(VSDVS_SetPortMACLearning("s", "p", &learning), QEX_OK);
+  management.portMACLearning = learning;
+  EXPECT_EQ(port(VSPROP_PORT_MAC_MANAGEMENT), bytes_of(management));
+}
+
+TEST_F(TwoDoors, APortWithoutTeamingHasItsSwitchs) {
+  auto const policy = teaming(TEAM_FRP_TYPE_FO_EXPLICIT);
+  ASSERT_EQ(VSDVS_SetTeamingPolicy("s", &policy), QEX_OK);
+  VSTeamPolicy read{};
+  EXPECT_EQ(VSDVS_GetPortTeamingPolicy("s", "p", &read), QEX_OK);
+  EXPECT_EQ(bytes_of(read), bytes_of(policy));
+}
+
+TEST_F(TwoDoors, TheAliasIsAPropertyToo) {
+  EXPECT_EQ(global(QEX_NEBPROP_SWITCH_ALIAS), bytes_of_text("s"));
+  EXPECT_EQ(set_global(QEX_NEBPROP_SWITCH_ALIAS, bytes_of_text("renamed")), QEX_OK);
+  EXPECT_EQ(VSDVS_SetMTU("s", 9000), QEX_NOT_FOUND);
+  EXPECT_EQ(VSDVS_SetMTU("renamed", 9000), QEX_OK);
+  ASSERT_EQ(VSDVS_CreateVSwitch("other", "o", nullptr, 0, 1, 0, 0, 0), QEX_OK);
+  EXPECT_EQ(set_global(QEX_NEBPROP_SWITCH_ALIAS, bytes_of_text("other")), QEX_EXISTS);
+  EXPECT_EQ(set_global(QEX_NEBPROP_SWITCH_ALIAS, bytes_of_text("")), QEX_BAD_PARAM);
+  EXPECT_EQ(set_global(QEX_NEBPROP_SWITCH_ALIAS, bytes_of_text(std::string(128, 'n'))),
+            QEX_NAME_TOO_LONG);
+  EXPECT_EQ(global(QEX_NEBPROP_SWITCH_ALIAS), bytes_of_text("renamed"));
+}
+
+TEST_F(TwoDoors, TheVersionIsAPropertyToo) {
+  EXPECT_EQ(global(QEX_NEBPROP_SWITCH_VERSION), bytes_of(qex_uint32{200}));
+  EXPECT_EQ(DVSQEX_SwitchSetVersion("s-id", 100), QEX_OK);
+  EXPECT_EQ(global(QEX_NEBPROP_SWITCH_VERSION), bytes_of(qex_uint32{100}));
+  EXPECT_EQ(set_global(QEX_NEBPROP_SWITCH_VERSION, bytes_of(qex_uint32{300})), QEX_OK);
+  EXPECT_EQ(global(QEX_NEBPROP_SWITCH_VERSION), bytes_of(qex_uint32{300}));
+  EXPECT_EQ(set_global(QEX_NEBPROP_SWITCH_VERSION, bytes_of(qex_uint32{0})), QEX_BAD_PARAM);
+}
+
+TEST_F(TwoDoors, ThePortsetIsAPropertyThatCallersOnlyRead) {
+  EXPECT_EQ(host(QEX_NEBPROP_HOST_PROXY), bytes_of_text("s-ports"));
+  EXPECT_EQ(set_host(QEX_NEBPROP_HOST_PROXY, bytes_of_text("x")), QEX_READ_ONLY);
+  EXPECT_EQ(DVSQEX_HostPropClear("s-id", QEX_NEBPROP_HOST_PROXY), QEX_READ_ONLY);
+}
+
+TEST_F(TwoDoors, TheConnectIdIsAPropertyOfThePort) {
+  EXPECT_EQ(port(QEX_NEBPROP_PORT_CONNECTID), bytes_of(qex_uint32{7}));
+  EXPECT_EQ(set_port(QEX_NEBPROP_PORT_CONNECTID, bytes_of(qex_uint32{8})), QEX_OK);
+  DVPortList *list = nullptr;
+  ASSERT_EQ(DVSQEX_SwitchPortList("s-id", &list, DVSPORT_TYPE_ACTIVE), QEX_OK);
+  ASSERT_EQ(list->nports, 3);
+  EXPECT_STREQ(list->dvPort[2].dvPortId, "p");
+  EXPECT_EQ(list->dvPort[2].connectId, 8U);
+  DVSQEX_DataFree(list);
+}
+
+TEST_F(TwoDoors, TheTypeOfAPortIsItsProperty) {
+  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_TYPE, bytes_of(DVSPORT_TYPE_SHADOW)), QEX_OK);
+  DVPortList *list = nullptr;
+  ASSERT_EQ(DVSQEX_SwitchPortList("s-id", &list, DVSPORT_TYPE_SHADOW), QEX_OK);
+  ASSERT_EQ(list->nports, 1);
+  EXPECT_EQ(list->type, DVSPORT_TYPE_SHADOW);
+  EXPECT_STREQ(list->dvPort[0].dvPortId, "p");
+  DVSQEX_DataFree(list);
+  EXPECT_EQ(set_port(QEX_NEBPROP_PORT_TYPE, bytes_of(0)), QEX_BAD_PARAM);
+  EXPECT_EQ(set_port(QEX_NEBPROP_PORT_TYPE, bytes_of(5)), QEX_BAD_PARAM);
+}
+
+TEST_F(TwoDoors, TheUplinkPortsArePropertiesOfTheSwitchAndOfTheHost) {
+  VSUplinkPorts *names = nullptr;
+  VSUplinkPortIds *ids = nullptr;
+  ASSERT_EQ(VSDVS_GetSwitchUplinkPorts("s", &names, &ids), QEX_OK);
+  ASSERT_EQ(names->nUplinkPorts, 2U);
+  ASSERT_EQ(ids->nUplinkPorts, 2U);
+  EXPECT_STREQ(text_in(names, 1), "uplink2");
+  EXPECT_STREQ(text_in(ids, 1), "uplink2");
+  auto const bytes = [](auto const *record, std::size_t width) {
+    auto const *const first = reinterpret_cast<unsigned char const *>(record);
+    return Bytes(first, first + 4 + (2 * width));
+  };
+  EXPECT_EQ(global(QEX_NEBPROP_SWITCH_UPLINKPORTS), bytes(names, QEX_NEB_NAME_MAX_LEN));
+  EXPECT_EQ(host(QEX_NEBPROP_HOST_UPLINKPORTS), bytes(ids, QEX_NEB_PORT_ID_MAX_LEN));
+  std::memcpy(text_in(names, 0), "left", 5);
+  EXPECT_EQ(set_global(QEX_NEBPROP_SWITCH_UPLINKPORTS, bytes(names, QEX_NEB_NAME_MAX_LEN)), QEX_OK);
+  std::memcpy(text_in(ids, 1), "right", 6);
+  EXPECT_EQ(set_host(QEX_NEBPROP_HOST_UPLINKPORTS, bytes(ids, QEX_NEB_PORT_ID_MAX_LEN)), QEX_OK);
+  VSDVS_FreeMemory(names);
+  VSDVS_FreeMemory(ids);
+  ASSERT_EQ(VSDVS_GetSwitchUplinkPorts("s", &names, &ids), QEX_OK);
+  EXPECT_STREQ(text_in(names, 0), "left");
+  EXPECT_STREQ(text_in(ids, 0), "uplink1");
+  EXPECT_STREQ(text_in(names, 1), "right");
+  EXPECT_STREQ(text_in(ids, 1), "right");
+  VSDVS_FreeMemory(names);
+  VSDVS_FreeMemory(ids);
+}
+
+TEST_F(TwoDoors, ThePortStatusFollowsItsProperties) {
+  auto const flags = [](char const *name) {
+    return as<qex_NEBPortStatus>(port(QEX_NEBPROP_PORT_STATUS, name).value()).flags;
+  };
+  EXPECT_EQ(flags("p"), 0U);
+  EXPECT_EQ(flags("uplink1"), QEX_NEBPORT_STATUS_INUSE | QEX_NEBPORT_STATUS_LINKUP);
+  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_VNIC_CONNECTEE, bytes_of_text("vm")), QEX_OK);
+  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_BLOCK, {1}), QEX_OK);
+  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_LINK_STATUS, bytes_of(0)), QEX_OK);
+  EXPECT_EQ(flags("p"), QEX_NEBPORT_STATUS_INUSE | QEX_NEBPORT_STATUS_BLOCKED);
+  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_ALIAS, bytes_of_text("desk")), QEX_OK);
+  auto const status = as<qex_NEBPortStatus>(port(QEX_NEBPROP_PORT_STATUS).value());
+  EXPECT_STREQ(status.displayStr, "desk");
+  int number = 0;
+  ASSERT_EQ(VSDVS_DvPortIDToPortID("s", "p", &number), QEX_OK);
+  EXPECT_EQ(status.portID, static_cast<qex_uint32>(number));
+  EXPECT_EQ(set_port(QEX_NEBPROP_PORT_STATUS, bytes_of(status)), QEX_READ_ONLY);
+}
+
+TEST_F(TwoDoors, TheVlanInfoFollowsTheVlanPolicy) {
+  ASSERT_EQ(set_port(VSPROP_PORT_VLAN, vlan_policy(0, 5, {{7, 9}})), QEX_OK);
+  EXPECT_EQ(port(QEX_NEBPROP_PORT_VLAN), (Bytes{5, 0, 1, 0, 7, 0, 9, 0}));
+  EXPECT_EQ(set_port(QEX_NEBPROP_PORT_VLAN, {5, 0, 0, 0}), QEX_READ_ONLY);
+}
+
+TEST_F(TwoDoors, AnUplinkPortHasAThirdDoor) {
+  int number = 0;
+  ASSERT_EQ(VSDVS_DvPortIDToPortID("s", "uplink2", &number), QEX_OK);
+  auto const id = static_cast<qex_uint32>(number);
+  Bytes value{1};
+  EXPECT_EQ(
+      DVSQEX_UplinkDataSet("s-id", VSPROP_PORT_TX_UPLINK, id, value.data(), 1, POLICY_PROP_TYPE),
+      QEX_OK);
+  EXPECT_EQ(port(VSPROP_PORT_TX_UPLINK, "uplink2"), value);
+  void *data = nullptr;
+  int length = 0;
+  ASSERT_EQ(DVSQEX_UplinkDataGet("s-id", VSPROP_PORT_TX_UPLINK, id, &data, &length), QEX_OK);
+  EXPECT_EQ(taken(data, length), value);
+  ASSERT_EQ(VSDVS_DvPortIDToPortID("s", "p", &number), QEX_OK);
+  EXPECT_EQ(DVSQEX_UplinkDataGet("s-id", VSPROP_PORT_TX_UPLINK, static_cast<qex_uint32>(number),
+                                 &data, &length),
+            QEX_NOT_FOUND)
+      << "it is no uplink port";
+}
+
+}  // namespace
