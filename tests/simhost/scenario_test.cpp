@@ -1,0 +1,281 @@
+// Scenario documents: what they make of a host, what is refused and how it is told.
+#include "control/scenario.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <fstream>
+#include <functional>
+#include <string>
+
+#include "control/lifecycle.h"
+#include "core/fresh_host.h"
+#include "core/known.h"
+#include "store/store.h"
+#include "temporary_folder.h"
+
+namespace {
+
+using simhost::control::DocumentError;
+using simhost::store::Access;
+using simhost::store::Transaction;
+
+void furnish_nothing(Transaction &) {}
+
+struct Scenario : testing::Test {
+  simhost::store::Store store{std::nullopt, furnish_nothing};
+
+  /// What is wrong with a document; empty if nothing is. Nothing of it lasts.
+  std::string refusal(std::string const &document) {
+    Transaction work(store, Access::write);
+    try {
+      simhost::control::apply(work, document);
+      return "";
+    } catch (DocumentError const &error) {
+      return error.what();
+    }
+  }
+  std::string refusal_in_switch(std::string const &members) {
+    return refusal(R"({"uplinks": [{"name": "nic0"}], "switches": [{"alias": "s", )" + members +
+                   "}]}");
+  }
+  std::string refusal_in_port(std::string const &members) {
+    return refusal_in_switch(R"("ports": [{"id": "p", )" + members + "}]");
+  }
+};
+
+TEST_F(Scenario, ErrorsHaveThePathOfTheKey) {
+  EXPECT_EQ(refusal("{}"), "");
+  EXPECT_EQ(refusal("[]"), "the document: must be an object");
+  EXPECT_EQ(refusal(R"({"switchs": []})"), "switchs: unknown key");
+  EXPECT_EQ(refusal(R"({"switches": {}})"), "switches: must be an array");
+  EXPECT_EQ(refusal(R"({"switches": [{}]})"), "switches[0]: 'alias' is missing");
+  EXPECT_EQ(refusal(R"({"switches": [{"alias": "s"}, {"alias": 1}]})"),
+            "switches[1].alias: must be a text");
+  EXPECT_EQ(refusal_in_switch(R"("mtu": 99)"), "switches[0].mtu: 99 is below 1280");
+  EXPECT_EQ(refusal_in_switch(R"("mtu": 9191)"), "switches[0].mtu: 9191 is above 9190");
+  EXPECT_EQ(refusal_in_switch(R"("mtu": 18446744073709551615)"),
+            "switches[0].mtu: 18446744073709551615 is above 9190");
+  EXPECT_EQ(refusal_in_switch(R"("mtu": 1500.5)"), "switches[0].mtu: must be a whole number");
+  EXPECT_EQ(refusal_in_switch(R"("persistent": 1)"),
+            "switches[0].persistent: must be true or false");
+  EXPECT_EQ(refusal_in_switch(R"("multicast": "some")"),
+            "switches[0].multicast: 'some' is none of legacy, snooping, igmp, mld");
+  EXPECT_EQ(refusal_in_port(R"("addresses": [{"mac": "2"}])"),
+            "switches[0].ports[0].addresses[0].mac: must be six bytes such as 02:00:00:00:00:01");
+  EXPECT_EQ(refusal_in_port(R"("groups": [{"address": "here"}])"),
+            "switches[0].ports[0].groups[0].address: must be an address of Ethernet, IPv4 or IPv6");
+  EXPECT_EQ(refusal_in_port(R"("counters": {"numMACsMoved": -1})"),
+            "switches[0].ports[0].counters.numMACsMoved: must be a whole number, 0 or more");
+  EXPECT_EQ(
+      refusal_in_port(R"("properties": {"a.b": {"type": "config", "hex": "0"}})"),
+      "switches[0].ports[0].properties.a.b.hex: must be hexadecimal digits, two for each byte");
+  EXPECT_EQ(refusal(R"({"clock": {"now": "noon"}})"), "clock.now: must be a number of seconds");
+  EXPECT_EQ(refusal(R"({"runtime_options": {"IGMPVersion": 4}})"),
+            "runtime_options.IGMPVersion: 4 is above 3");
+  EXPECT_EQ(refusal(R"({"runtime_options": {"Speed": 4}})"),
+            "runtime_options.Speed: unknown option");
+  EXPECT_EQ(refusal(R"({"faults": [{"call": "VSDVS_SetMTU", "status": "QEX_ODD"}]})"),
+            "faults[0].status: 'QEX_ODD' is the name of no status");
+}
+
+TEST_F(Scenario, WhatTheHostRefusesIsToldLikewise) {
+  EXPECT_EQ(refusal_in_switch(R"("uplinks": ["nic0", "nic9"])"),
+            "switches[0].uplinks[1]: the host refuses it: Not found (QEX_NOT_FOUND)");
+  EXPECT_EQ(refusal_in_port(R"("addresses": [{"mac": "01:00:00:00:00:01"}])"),
+            "switches[0].ports[0].addresses[0]: the host refuses it: Invalid address "
+            "(QEX_INVALID_ADDRESS)");
+  EXPECT_EQ(refusal_in_port(R"("counters": {"txErrors": 1})"),
+            "switches[0].ports[0].counters.txErrors: the host refuses it: Not found "
+            "(QEX_NOT_FOUND)");
+  EXPECT_EQ(refusal(R"({"runtime_options": {"IGMPRouterIP": "::"}})"),
+            "runtime_options.IGMPRouterIP: the host refuses it: Invalid address "
+            "(QEX_INVALID_ADDRESS)");
+  EXPECT_EQ(refusal(R"({"faults": [{"call": "Panic", "delay": 1}]})"),
+            "faults[0]: the host refuses it: Not supported (QEX_NOT_SUPPORTED)");
+}
+
+TEST_F(Scenario, TextsThatAreNoJson) {
+  EXPECT_THAT(refusal("{"), testing::StartsWith("no JSON: "));
+  EXPECT_THAT(refusal(""), testing::StartsWith("no JSON: "));
+  EXPECT_THAT(refusal("\xFF"), testing::StartsWith("no JSON: "));
+  EXPECT_EQ(refusal(R"({"switches": [{"alias": "a", "alias": "b"}]})"),
+            "the key 'alias' is there twice");
+}
+
+TEST_F(Scenario, WhatExistsIsChangedAndTheRestIsLeftAlone) {
+  Transaction work(store, Access::write);
+  simhost::control::apply(work, R"({"uplinks": [{"name": "nic0", "speed": 1000}],
+      "switches": [{"alias": "s", "mtu": 9000, "uplinks": ["nic0"], "ports": [{"id": "p"}]}]})");
+  auto const before = simhost::control::described_host(work);
+  simhost::control::apply(work, R"({"uplinks": [{"name": "nic0", "link": "down"}],
+      "switches": [{"alias": "s", "uplinks": ["nic0"], "ports": [{"id": "q"}]}]})");
+  auto const after = simhost::control::described_host(work);
+  EXPECT_EQ(after["uplinks"][0]["link"], "down");
+  EXPECT_EQ(after["uplinks"][0]["speed"], 1000);
+  EXPECT_EQ(after["switches"].size(), 1U);
+  EXPECT_EQ(after["switches"][0]["mtu"], 9000);
+  EXPECT_EQ(after["switches"][0]["id"], before["switches"][0]["id"]);
+  EXPECT_EQ(after["switches"][0]["ports"].size(), 2U);
+}
+
+TEST_F(Scenario, WhatASwitchWasMadeWithStays) {
+  Transaction work(store, Access::write);
+  simhost::control::apply(work, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
+  simhost::control::apply(work, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
+  try {
+    simhost::control::apply(work, R"({"switches": [{"alias": "s", "max_ports": 6}]})");
+    FAIL() << "it changed";
+  } catch (DocumentError const &error) {
+    EXPECT_STREQ(error.what(), "switches[0].max_ports: cannot change while the switch exists");
+  }
+}
+
+// Everything that a document can say, so that nothing is lost on the way there and back.
+constexpr char const *kEverything = R"({
+  "clock": {"stopped": true, "now": 1234.5},
+  "uplinks": [{"name": "nic0", "link": "down", "admin": "up", "lacp": "down", "speed": 1000,
+               "duplex": "half"}, {"name": "nic1", "admin": "down"}, {"name": "nic2"}],
+  "runtime_options": {"TeamPolicyUpDelay": 250, "MLDRouterIP": "fe80::1"},
+  "mac_learning": {"aging_time": 60, "limit": 100, "learn_static": true},
+  "switches": [
+    {"alias": "s", "id": "the-id", "portset": "the-ports", "max_ports": 10, "persistent": false,
+     "version": 100, "mtu": 9000, "uplinks": ["nic0", "nic1"],
+     "lags": [{"name": "lag1", "uplinks": ["nic1"]}],
+     "teaming": {"balance": "explicit", "criteria": ["lacp", "link"], "flags": ["rolling"],
+                 "speed": 100, "full_duplex": true, "active": ["lag1"], "standby": ["uplink1"]},
+     "mac_learning": {"aging_time": 30, "limit": 20, "learn_static": true},
+     "multicast": "mld", "counters": {"txErrors": 18446744073709551615},
+     "mirror_counters": {"m": {"failedPkts": 3}},
+     "addresses": [{"mac": "02:00:00:00:00:09", "vlan": 7, "age": 3}],
+     "properties": {"com.example.note": {"type": "policy", "hex": "00ff"}},
+     "ports": [
+       {"id": "p", "uplink": "uplink2",
+        "teaming": {"balance": "port", "active": ["uplink1"]},
+        "mac_learning": {"learning": true, "flooding": true, "limit": 3, "limit_policy": "drop",
+                         "mac_change": true},
+        "mirror_sessions": [{"sid": "m", "name": "n", "type": "mixed", "snap_length": 64,
+          "sampling_rate": 2, "disabled": true, "promiscuous": true,
+          "to": [{"port": "p"}, {"ip": "10.0.0.1"}, {"ip": "fe80::1"}],
+          "received_by": [{"uplink": "nic0"}, {"vlan": 5}], "sent_by": [{"number": 4}]}],
+        "addresses": [{"mac": "02:00:00:00:00:01", "type": "static"},
+                      {"mac": "02:00:00:00:00:02", "type": "user", "vni": 9, "ages": true}],
+        "groups": [{"address": "239.1.1.1", "version": 3, "source_mode": "include",
+                    "sources": ["10.0.0.1"], "vni": 4}, {"address": "ff02::1"},
+                   {"address": "01:00:5e:00:00:01"}],
+        "counters": {"numMACsMoved": 5},
+        "properties": {"com.example.more": {"type": "volatile", "text": "hello"}}}]}],
+  "faults": [{"call": "VSDVS_GetMTU", "nth": 2, "times": 0, "status": "QEX_BUSY"},
+             {"call": "VSDVS_SetMTU", "exception": "OSError", "message": "no", "delay": 0.25}]
+})";
+
+TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
+  Transaction work(store, Access::write);
+  simhost::control::apply(work, kEverything);
+  auto const first = simhost::control::described_host(work);
+  simhost::control::empty_host(work);
+  EXPECT_TRUE(simhost::control::described_host(work)["switches"].empty());
+  simhost::control::apply(work, first.dump());
+  auto second = simhost::control::described_host(work);
+  // Numbers of ports and groups are never used again.
+  auto expected = first;
+  for (auto *host : {&expected, &second}) {
+    (*host)["switches"][0]["ports"][0]["observed"].erase("number");
+    (*host)["switches"][0]["lags"][0]["observed"].erase("id");
+  }
+  EXPECT_EQ(second, expected);
+}
+
+TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {
+  Transaction work(store, Access::write);
+  simhost::control::apply(work, kEverything);
+  auto const host = simhost::control::described_host(work);
+  // Each key of the document, wherever it stands, is found with its value.
+  std::function<void(simhost::control::Json const &, simhost::control::Json const &,
+                     std::string const &)> const compare = [&](auto const &said, auto const &shown,
+                                                               std::string const &path) {
+    if (said.is_object() && !said.contains("text")) {
+      for (auto const &[key, value] : said.items()) {
+        ASSERT_TRUE(shown.contains(key)) << path << "." << key;
+        compare(value, shown[key], path + "." + key);
+      }
+    } else if (said.is_array() && path.find("groups") == std::string::npos) {
+      ASSERT_EQ(said.size(), shown.size()) << path;
+      for (std::size_t at = 0; at < said.size(); ++at) {
+        compare(said[at], shown[at], path + "[" + std::to_string(at) + "]");
+      }
+    } else if (!said.is_array() && !said.is_object()) {
+      EXPECT_EQ(said, shown) << path;
+    }
+  };
+  compare(simhost::control::parsed(kEverything), host, "");
+  EXPECT_EQ(host["switches"][0]["ports"][0]["properties"]["com.example.more"]["hex"],
+            "68656c6c6f00");
+  EXPECT_EQ(host["switches"][0]["ports"][0]["groups"].size(), 3U);
+}
+
+TEST_F(Scenario, ARestartedHostLosesWhatIsVolatile) {
+  Transaction work(store, Access::write);
+  simhost::control::apply(work, R"({"switches": [{"alias": "s", "properties": {
+      "com.example.keep": {"type": "policy", "text": "x"},
+      "com.example.go": {"type": "volatile", "text": "x"},
+      "com.example.gone": {"type": "runtime", "text": "x"}}}]})");
+  simhost::control::restart_host(work);
+  auto const host = simhost::control::described_host(work);
+  auto const &properties = host["switches"][0]["properties"];
+  EXPECT_TRUE(properties.contains("com.example.keep"));
+  EXPECT_FALSE(properties.contains("com.example.go"));
+  EXPECT_FALSE(properties.contains("com.example.gone"));
+}
+
+struct FreshHost : Scenario {
+  ~FreshHost() override { unsetenv("SIMHOST_SCENARIO"); }
+  FreshHost() = default;
+  FreshHost(FreshHost const &) = delete;
+  FreshHost &operator=(FreshHost const &) = delete;
+};
+
+TEST_F(FreshHost, IsWorthPlayingWith) {
+  unsetenv("SIMHOST_SCENARIO");
+  Transaction work(store, Access::write);
+  simhost::furnish_fresh_host(work);
+  auto const host = simhost::control::described_host(work);
+  EXPECT_GE(simhost::store::free_uplinks(work).size(), 2U);
+  ASSERT_EQ(host["switches"].size(), 1U);
+  EXPECT_GE(host["switches"][0]["ports"].size(), 2U);
+  EXPECT_FALSE(host["switches"][0]["addresses"].empty());
+}
+
+TEST_F(FreshHost, IsWhatADocumentSays) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.json");
+  std::ofstream(file) << "{}";
+  setenv("SIMHOST_SCENARIO", file.c_str(), 1);
+  Transaction work(store, Access::write);
+  simhost::furnish_fresh_host(work);
+  auto const host = simhost::control::described_host(work);
+  EXPECT_TRUE(host["switches"].empty());
+  EXPECT_TRUE(host["uplinks"].empty());
+}
+
+TEST_F(FreshHost, NamesTheDocumentThatCannotBeUsed) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.json");
+  setenv("SIMHOST_SCENARIO", file.c_str(), 1);
+  Transaction work(store, Access::write);
+  auto const refused = [&]() -> std::string {
+    try {
+      simhost::furnish_fresh_host(work);
+      return "";
+    } catch (DocumentError const &error) {
+      return error.what();
+    }
+  };
+  EXPECT_EQ(refused(), "the scenario " + file.string() + " cannot be used: it cannot be read");
+  std::ofstream(file) << R"({"switches": [{"alias": "s", "mtu": 99}]})";
+  EXPECT_EQ(refused(),
+            "the scenario " + file.string() + " cannot be used: switches[0].mtu: 99 is below 1280");
+}
+
+}  // namespace
