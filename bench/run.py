@@ -14,7 +14,7 @@ import statistics
 import sys
 import time
 from pathlib import Path
-from typing import Any, Dict, List, Mapping
+from typing import Any, Dict, Iterator, List, Mapping
 
 import calls
 import report
@@ -52,17 +52,28 @@ def make_twin(build: Path) -> None:
     shutil.copy(module, twin)
 
 
-def check_answers(build: Path, core: int) -> List[str]:
-    """Ask every peer for every figure; what differs from the expected answer, a line each."""
-    wrong = []
+Answers = Dict[str, Dict[str, Dict[str, Any]]]
+"""For each form, peer and figure, what the peer answers."""
+
+
+def ask_all(build: Path, core: int) -> Answers:
+    """Ask every peer for every figure."""
+    answers: Answers = {form: {} for form in FORMS}
     for peer in PEERS:
         with calls.Worker(peer, build, core, seed=0) as worker:
             for form, peers in FORMS.items():
-                for figure in FIGURES if peer in peers else ():
-                    answer = worker.ask(form, figure)
-                    if answer != EXPECTED[figure]:
-                        wrong.append(f"{peer}, {form}, {figure}: {answer!r}")
-    return wrong
+                if peer in peers:
+                    answers[form][peer] = {figure: worker.ask(form, figure) for figure in FIGURES}
+    return answers
+
+
+def wrong(answers: Answers) -> Iterator[str]:
+    """The answers that differ from what is expected, a line each."""
+    for form, peers in answers.items():
+        for peer, figures in peers.items():
+            for figure, answer in figures.items():
+                if answer != EXPECTED[figure]:
+                    yield f"{peer}, {form}, {figure}: {answer!r}"
 
 
 def medians(times: calls.Times) -> Dict[str, Dict[str, Dict[str, float]]]:
@@ -121,9 +132,9 @@ def main() -> None:
     )
 
     make_twin(build)
-    wrong = check_answers(build, core)
-    if wrong:
-        sys.exit("bench: these peers answer something else:\n" + "\n".join(wrong))
+    answers = ask_all(build, core)
+    if mistakes := list(wrong(answers)):
+        sys.exit("bench: these peers answer something else:\n" + "\n".join(mistakes))
     progress = Progress()
     times = calls.measure(build, core, **settings, progress=progress)
     progress.clear()
@@ -140,7 +151,7 @@ def main() -> None:
     results = {
         "machine": machine(),
         "settings": {**settings, "core": core, "quick": arguments.quick},
-        "calls": {"times": times, "medians": middle},
+        "calls": {"answers": answers, "times": times, "medians": middle},
         "targets": judged,
     }
     (build / "bench" / "results.json").write_text(json.dumps(results, indent=1), encoding="utf-8")

@@ -1,0 +1,14 @@
+"""Where the tests of the comparison find what was built."""
+
+import os
+from pathlib import Path
+
+import pytest
+
+
+@pytest.fixture(name="build", scope="session")
+def fixture_build() -> Path:
+    """Return the build folder, which holds the module and the peers."""
+    build = Path(os.environ["BUILD_DIR"]).resolve()
+    assert (build / "bench" / "peers").is_dir(), "the peers are not built: see ./dev bench"
+    return build
