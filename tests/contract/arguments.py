@@ -121,7 +121,10 @@ class IntegerKind(Kind):
         return Sample(position, position)
 
     def samples(self) -> List[Sample]:
+        # The interpreter keeps integers in digits of 30 bits.
+        edges = [2**30 - 1, 2**30, -(2**30) + 1, -(2**30)]
         values = [self.low, self.high, 0, 1, self.high // 2 + 1, True, Integer(7)]
+        values += [value for value in edges if self.low <= value <= self.high]
         return [Sample(value, int(value)) for value in values]
 
     def refused(self) -> List[Refused]:
@@ -170,16 +173,13 @@ class TextKind(Kind):
         return self._of(f"argument {position}")
 
     def samples(self) -> List[Sample]:
-        texts = (
-            "",
-            "dvs0",
-            "größe-\N{SNOWMAN}-\U0001f600",
-            "x" * 300,
-            "y" * 70_000,
-            Text("derived"),
-        )
+        texts = ("", "dvs0", "größe-\N{SNOWMAN}-\U0001f600", "y" * 300, "y" * 70_000)
+        # Whatever the size of an array for short texts, one of these just does not fit it.
+        lengths = (size + more for size in (16, 32, 64, 128, 256, 512, 1024) for more in (-1, 0))
         return [
             *map(self._of, texts),
+            *(self._of("x" * length) for length in lengths),
+            self._of(Text("derived")),
             self._of("seen\0unseen"),
             Sample(None, None),
             Sample(_TEXT_POINTER, _TEXT.value, _TEXT.raw),
