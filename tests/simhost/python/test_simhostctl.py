@@ -1,0 +1,205 @@
+"""simhostctl, beside processes that use the same host through the module."""
+
+import time
+from pathlib import Path
+
+from simulated_host import Host
+
+HINT = """
+number, name = vs.VSDVS_DvPortIDToPortID("vswitch0", "web-1")[1], vs.new_qex_Name()
+print(vs.VSQEX_PortGetTeamUplinkHint(number, name) or vs.qex_Name_string_get(name))
+vs.delete_qex_Name(name)
+"""
+ADDRESSES = """
+status, table = vs.VSQEX_GetPortMACTable("vswitch0", "web-1", vs.VS_MAC_ADDR_TYPE_LEARNED)
+entries = vs.VSMACTable_macEntries_get(table)
+for index in range(vs.VSMACTable_numEntries_get(table)):
+    entry = vs.VSMACEntry___getitem__(entries, index)
+    print(vs.VSMACEntry_macAddress_get(entry), vs.VSMACEntry_elapsed_get(entry))
+    vs.delete_VSMACEntry(entry)
+"""
+
+
+def test_shows_the_host_as_a_tree(host: Host) -> None:
+    host.ctl("clock", "stop")
+    host.ctl("clock", "set", "12.5")
+    lines = host.ctl("show").splitlines()
+    assert lines[:3] == ["host", "|-- clock stopped at 12.500 s", "|-- uplinks"]
+    assert "|   |-- nic0       link up, 10000 Mbit/s full duplex, free" in lines
+    assert "`-- switch vswitch0: 3 of 128 ports, MTU 1500" in lines
+    ports = [line for line in lines if "port web-1" in line]
+    assert len(ports) == 1 and ports[0].endswith(", sends over nic4")
+
+
+def test_what_it_shows_it_applies(host: Host, tmp_path: Path) -> None:
+    host.ctl("clock", "stop")
+    document = tmp_path / "host.json"
+    document.write_text(host.ctl("show", "--json"))
+    # The groups that the ports have joined are reported anew, at the time that the clock shows.
+    host.ctl("apply", str(document))
+    shown = host.ctl("show", "--json")
+    host.ctl("apply", str(document))
+    assert host.ctl("show", "--json") == shown
+
+
+def test_a_document_describes_the_fresh_host(host: Host, tmp_path: Path) -> None:
+    document = tmp_path / "empty.json"
+    document.write_text("{}")
+    host.environment["SIMHOST_SCENARIO"] = str(document)
+    assert host.described()["uplinks"] == []
+    assert host.lines('print(vs.VSDVS_CreateVSwitch("s", None, None, 0, 1, 0, 0, 0))') == ["0"]
+
+
+def test_a_document_that_cannot_be_used_raises(host: Host, tmp_path: Path) -> None:
+    document = tmp_path / "host.json"
+    document.write_text('{"switches": [{"alias": "s", "mtu": 99}]}')
+    host.environment["SIMHOST_SCENARIO"] = str(document)
+    lines = host.lines(
+        """
+try:
+    vs.VSDVS_SetMTU("s", 1500)
+except RuntimeError as error:
+    print(error)
+"""
+    )
+    assert lines == [
+        f"VSDVS_SetMTU: the scenario {document} cannot be used: "
+        "switches[0].mtu: 99 is below 1280"
+    ]
+
+
+def test_a_refused_document_changes_nothing(host: Host) -> None:
+    host.ctl("clock", "stop")
+    before = host.described()
+    wrong = '{"switches": [{"alias": "new"}, {"alias": "bad", "mtu": 99}]}'
+    assert host.refusal("apply", "-", given=wrong) == (
+        "simhostctl: -: switches[1].mtu: 99 is below 1280\n"
+    )
+    assert host.described() == before
+
+
+def test_a_link_that_fails_moves_the_hint(host: Host) -> None:
+    assert host.lines(HINT) == ["nic4"]
+    host.ctl("link", "nic4", "down")
+    assert host.lines(HINT) == ["nic5"]
+    host.ctl("link", "nic4", "up")
+    assert host.lines(HINT) == ["nic4"]
+    assert host.refusal("link", "nic9", "down") == "simhostctl: Not found (QEX_NOT_FOUND)\n"
+
+
+def test_learned_addresses_age_by_the_clock(host: Host) -> None:
+    host.ctl("clock", "stop")
+    host.ctl("learn", "vswitch0", "02:00:00:00:0a:01", "--port", "web-1", "--vlan", "4")
+    assert "02:00:00:00:0a:01 0" in host.lines(ADDRESSES)
+    host.ctl("clock", "step", "299.999")
+    assert host.lines(ADDRESSES) == ["02:00:00:00:0a:01 299"]
+    host.ctl("clock", "step", "0.001")
+    assert host.lines(ADDRESSES) == []
+
+
+def test_the_clock_stands_and_runs(host: Host) -> None:
+    host.ctl("clock", "stop")
+    host.ctl("clock", "set", "100")
+    assert host.ctl("clock", "show") == "100.000\n"
+    assert host.ctl("clock", "show") == "100.000\n"
+    host.ctl("clock", "run")
+    time.sleep(0.01)
+    shown = float(host.ctl("clock", "show"))
+    assert 100.01 <= shown < 160
+    assert host.run("clock", "step", "-1").returncode != 0
+
+
+def test_counters_are_what_the_queries_say(host: Host) -> None:
+    host.ctl("counter", "vswitch0", "txErrors", str(2**64 - 1))
+    assert (
+        host.lines(
+            """
+stats = vs.new_VSServicePortTeamingStats()
+print(vs.VSQEX_GetServicePortTeamingStats("vswitch0", stats))
+print(vs.VSServicePortTeamingStats_txErrors_get(stats))
+vs.delete_VSServicePortTeamingStats(stats)
+"""
+        )
+        == ["0", str(2**64 - 1)]
+    )
+    assert "QEX_NOT_FOUND" in host.refusal("counter", "vswitch0", "txMistakes", "1")
+
+
+def test_faults_hit_other_processes(host: Host) -> None:
+    host.ctl("fault", "add", "VSDVS_SetMTU", "--nth", "2", "--status", "QEX_BUSY")
+    host.ctl(
+        "fault", "add", "VSDVS_SetMTU", "--nth", "3", "--exception", "KeyError", "--message", "lost"
+    )
+    assert host.ctl("fault", "list").splitlines() == [
+        "VSDVS_SetMTU from call 2 on, 1 x: answers QEX_BUSY; 0 made",
+        "VSDVS_SetMTU from call 3 on, 1 x: KeyError: lost; 0 made",
+    ]
+    call = 'print(vs.VSDVS_SetMTU("vswitch0", 2000))\n'
+    assert host.lines(call + f"print({0x0BAD0001 + 3})\n" + call) == [
+        "0",
+        str(0x0BAD0004),
+        str(0x0BAD0004),
+    ]
+    raised = host.lines(
+        f"""
+try:
+    {call}
+except KeyError as error:
+    print(repr(error))
+"""
+    )
+    assert raised == ["KeyError('lost')"]
+    assert host.ctl("fault", "list") == ""
+    assert host.lines(call) == ["0"]
+
+
+def test_faults_are_cleared(host: Host) -> None:
+    host.ctl("fault", "add", "VSDVS_SetMTU", "--times", "0", "--status", "QEX_BUSY")
+    host.ctl("fault", "clear", "VSDVS_SetMTU")
+    assert host.ctl("fault", "list") == ""
+    assert "QEX_NOT_SUPPORTED" in host.refusal("fault", "add", "Panic", "--status", "QEX_BUSY")
+
+
+def test_a_restart_takes_what_is_not_persistent(host: Host) -> None:
+    host.apply({"switches": [{"alias": "brief", "persistent": False}]})
+    host.ctl("learn", "vswitch0", "02:00:00:00:0a:01", "--port", "web-1")
+    host.ctl("restart")
+    shown = host.described()
+    assert [switch["alias"] for switch in shown["switches"]] == ["vswitch0"]
+    addresses = [a for port in shown["switches"][0]["ports"] for a in port["addresses"]]
+    assert {address["type"] for address in addresses} == {"static"}
+
+
+def test_a_reset_makes_the_host_fresh(host: Host) -> None:
+    fresh = host.ctl("show").splitlines()[2:]
+    host.apply({"uplinks": [{"name": "extra"}], "switches": [{"alias": "more"}]})
+    host.ctl("link", "nic0", "down")
+    host.ctl("reset")
+    numbers = ("number",)
+    again = host.ctl("show").splitlines()[2:]
+    assert [line for line in again if not any(word in line for word in numbers)] == [
+        line for line in fresh if not any(word in line for word in numbers)
+    ]
+
+
+def test_needs_to_know_which_host(host: Host, tmp_path: Path) -> None:
+    state = host.environment.pop("SIMHOST_STATE")
+    assert "--state FILE or SIMHOST_STATE" in host.refusal("show")
+    assert host.ctl("--state", state, "show").startswith("host\n")
+
+
+def test_explains_itself(host: Host) -> None:
+    text = host.ctl("--help")
+    for command in (
+        "show",
+        "apply",
+        "link",
+        "learn",
+        "counter",
+        "clock",
+        "fault",
+        "restart",
+        "reset",
+    ):
+        assert f"  {command} " in text
+        assert host.ctl(command, "--help")
