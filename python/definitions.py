@@ -1,0 +1,261 @@
+"""The binding definitions as the generator parsed them, read from the tree that it writes as XML.
+
+What is made beside the module, such as its stubs, is made from this and so cannot drift from it.
+"""
+
+import re
+import textwrap
+import xml.etree.ElementTree as ET
+from dataclasses import dataclass, field
+from pathlib import Path
+from typing import Dict, Iterator, List, Optional, Tuple
+
+_Attributes = Dict[str, str]
+
+
+@dataclass(frozen=True)
+class Type:
+    """A C type: a name behind pointers ("p."), arrays ("a(3).", "a()."), in the generator's order.
+
+    Qualifiers are dropped. A function is one word, "f(...)", with its result as the name.
+    """
+
+    layers: Tuple[str, ...]
+    name: str
+
+    @property
+    def is_pointer(self) -> bool:
+        return self.layers[:1] == ("p",)
+
+    @property
+    def is_array(self) -> bool:
+        return self.layers[:1] != () and self.layers[0].startswith("a(")
+
+    @property
+    def target(self) -> "Type":
+        """What a pointer points to, or what an array holds."""
+        return Type(self.layers[1:], self.name)
+
+    @property
+    def count(self) -> Optional[int]:
+        """How many elements an array has; None for one that goes on past its record."""
+        digits = self.layers[0][2:-1]
+        return int(digits) if digits not in ("", "0") else None
+
+    def spelled(self) -> str:
+        """In C, for a pointer, an array of arrays' pointer or a name."""
+        text, rest = "", list(self.layers)
+        for layer in rest:
+            if layer == "p":
+                text = f"*{text}"
+            elif layer.startswith("a("):
+                text = f"({text})" if text.startswith("*") else text
+                text = f"{text}[{layer[2:-1]}]"
+        return f"{self.name} {text}".strip()
+
+
+@dataclass(frozen=True)
+class Parameter:
+    name: str
+    type: Type
+    is_output: bool  # the wrapper owns it and appends its value to the result
+    output_record: str  # of an output that is a record: under which type it is answered
+    is_required: bool  # null is refused
+
+
+@dataclass(frozen=True)
+class Function:
+    name: str
+    parameters: Tuple[Parameter, ...]
+    result: Type
+    doc: str
+    takes_more: bool = False
+    answers: str = ""  # in Python, where the C type says nothing
+
+    @property
+    def inputs(self) -> List[Parameter]:
+        return [parameter for parameter in self.parameters if not parameter.is_output]
+
+    @property
+    def outputs(self) -> List[Parameter]:
+        return [parameter for parameter in self.parameters if parameter.is_output]
+
+
+@dataclass(frozen=True)
+class Field:
+    name: str
+    type: Type
+    is_writable: bool
+    reads_as_text: bool
+    doc: str
+    count: str  # the field that says how many elements an array without a size has
+
+
+@dataclass
+class Record:
+    name: str
+    doc: str
+    is_inner: bool  # shows as a view into its parent only: no class, no accessors
+    header: str
+    count: str  # of a sequence: the field that counts its elements, or their number
+    fields: List[Field] = field(default_factory=list)
+    methods: List[Function] = field(default_factory=list)
+    constructor: Tuple[Parameter, ...] = ()
+
+
+@dataclass(frozen=True)
+class Constant:
+    name: str
+    is_text: bool
+    doc: str
+    family: str  # the enumeration it belongs to, if that has a name
+
+
+@dataclass
+class Definitions:
+    records: Dict[str, Record] = field(default_factory=dict)
+    functions: List[Function] = field(default_factory=list)
+    constants: List[Constant] = field(default_factory=list)
+    variables: List[str] = field(default_factory=list)
+    typedefs: Dict[str, Type] = field(default_factory=dict)
+
+    def resolve(self, given: Type) -> Type:
+        """The type behind typedefs; a record keeps its name."""
+        layers, name = given.layers, _bare(given.name)
+        while name not in self.records and name in self.typedefs:
+            behind = self.typedefs[name]
+            layers, name = layers + behind.layers, _bare(behind.name)
+        return Type(layers, name)
+
+
+def read(path: Path) -> Definitions:
+    found = Definitions()
+    _collect(ET.parse(path).getroot(), found, "", "")
+    return found
+
+
+def _bare(name: str) -> str:
+    return re.sub(r"^(struct|union) ", "", name)
+
+
+def _attributes(node: ET.Element) -> _Attributes:
+    listed = node.find("attributelist")
+    if listed is None:
+        return {}
+    return {item.get("name", ""): item.get("value", "") for item in listed.findall("attribute")}
+
+
+def _children(node: ET.Element) -> Iterator[Tuple[ET.Element, _Attributes]]:
+    for child in node:
+        if child.tag != "attributelist":
+            yield child, _attributes(child)
+
+
+def _collect(node: ET.Element, found: Definitions, header: str, family: str) -> None:
+    for child, seen in _children(node):
+        if child.tag == "class":
+            record = Record(
+                seen["name"],
+                _text(seen),
+                is_inner=not any(member.tag == "destructor" for member in child),
+                header=header,
+                count=seen.get("feature_count", ""),
+            )
+            _collect_members(child, record)
+            found.records[record.name] = record
+        elif child.tag == "cdecl" and seen.get("kind") == "typedef":
+            found.typedefs[seen["name"]] = _type(seen["decl"] + seen["type"])
+        elif child.tag == "cdecl" and seen.get("kind") == "function":
+            found.functions.append(_function(child, seen))
+        elif child.tag == "cdecl" and seen.get("view") == "variableHandler":
+            found.variables.append(seen["name"])
+        elif child.tag == "enum":
+            found.typedefs[f"enum {seen.get('name', '')}"] = Type((), "int")
+            _collect(child, found, header, seen.get("name", ""))
+        elif child.tag == "enumitem":
+            found.constants.append(Constant(seen["sym_name"], False, _text(seen), family))
+        elif child.tag == "constant":
+            is_text = seen["type"] == "p.char" or seen["type"].endswith("char")
+            found.constants.append(Constant(seen["sym_name"], is_text, _text(seen), ""))
+        elif child.tag in ("include", "extern", "module"):
+            _collect(child, found, seen.get("name", ""), family)
+
+
+def _collect_members(node: ET.Element, record: Record) -> None:
+    for child, seen in _children(node):
+        if child.tag == "extend":
+            _collect_members(child, record)
+        elif child.tag == "constructor":
+            record.constructor = _parameters(child)
+        elif child.tag == "cdecl" and seen.get("kind") == "function":
+            record.methods.append(_function(child, seen))
+        elif child.tag == "cdecl" and "sym_name" in seen:
+            record.fields.append(
+                Field(
+                    seen["sym_name"],
+                    _type(seen["decl"] + seen["type"]),
+                    is_writable=seen.get("feature_immutable") != "1",
+                    reads_as_text="mac_text" in seen.get("tmap_out", ""),
+                    doc=_text(seen),
+                    count=seen.get("feature_count", ""),
+                )
+            )
+
+
+def _function(node: ET.Element, seen: _Attributes) -> Function:
+    whole = _split_layers(seen["decl"] + seen["type"])
+    parameters = _parameters(node)
+    named = tuple(parameter for parameter in parameters if parameter.type.name != "...")
+    return Function(
+        seen["sym_name"],
+        named,
+        _type(".".join(whole[1:])),
+        _text(seen),
+        takes_more=len(named) != len(parameters),
+        answers=seen.get("feature_answers", ""),
+    )
+
+
+def _parameters(node: ET.Element) -> Tuple[Parameter, ...]:
+    found = []
+    listed = node.find("attributelist/parmlist")
+    for parm in [] if listed is None else list(listed):
+        seen = _attributes(parm)
+        if seen.get("type") == "void":
+            continue
+        answered = re.search(r"SWIGTYPE_p_(\w+)", seen.get("tmap_argout", ""))
+        found.append(
+            Parameter(
+                seen.get("name", ""),
+                Type((), "...") if seen["type"] == "v(...)" else _type(seen["type"]),
+                is_output=seen.get("tmap_in_numinputs") == "0",
+                output_record=answered.group(1) if answered else "",
+                is_required="tmap_check" in seen,
+            )
+        )
+    # An argument of several C parameters is one of Python's.
+    return tuple(one for one in found if one.type.name != "SIZE")
+
+
+def _split_layers(encoded: str) -> List[str]:
+    """Parts of the generator's spelling at the dots that no parentheses enclose."""
+    parts, depth, last = [], 0, ""
+    for char in encoded:
+        depth += (char == "(") - (char == ")")
+        if char == "." and depth == 0 and not last.endswith(".."):
+            parts.append(last)
+            last = ""
+        else:
+            last += char
+    return parts + [last]
+
+
+def _type(encoded: str) -> Type:
+    *layers, name = _split_layers(encoded)
+    return Type(tuple(layer for layer in layers if not layer.startswith("q(")), _bare(name))
+
+
+def _text(seen: _Attributes) -> str:
+    """The header's comment without its decoration."""
+    lines = [re.sub(r"^\s*\*? ?", "", line) for line in seen.get("doxygen", "").splitlines()]
+    return textwrap.dedent("\n".join(line.rstrip() for line in lines)).strip()

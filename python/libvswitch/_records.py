@@ -1,0 +1,282 @@
+"""What all classes share: printing, keeping memory alive, sequences and arrays of records."""
+
+import ctypes
+import weakref
+from typing import Any, ClassVar, Dict, Iterator, List, Optional, Sequence, Tuple, Type
+
+from libvswitch import _layout, _memory, _pointers
+
+CLASSES: Dict[str, Type["Record"]] = {}
+
+# How many elements of a long array are printed.
+_PRINTED = 16
+
+
+class _Pointing:
+    """An object that the wrapper runtime takes for the pointer object in its `this`.
+
+    The runtime looks for `this` in the object's dictionary and nowhere else.
+    """
+
+    this: Any
+
+    def __int__(self) -> int:
+        return _pointers.address_of(self)
+
+    def __eq__(self, other: object) -> bool:
+        """Whether both are the same memory, as with plain pointer objects."""
+        if isinstance(other, _Pointing):
+            return type(self) is type(other) and int(self) == int(other)
+        return NotImplemented
+
+    def __hash__(self) -> int:
+        return hash(int(self))
+
+    def _handed_out(self) -> List["_Pointing"]:
+        """What a call of the library has handed out through this object."""
+        return [self]
+
+
+def place_in(owner: Any, view: Any) -> Any:
+    """Ties a view to the object whose memory it shows: it keeps that alive and ends with it."""
+    if isinstance(view, _Pointing) and isinstance(owner, _Pointing):
+        views: Dict[int, Any] = owner.__dict__.setdefault("_views", {})
+        key = id(view)
+        views[key] = weakref.ref(view, lambda _: views.pop(key, None))
+        view.__dict__["_owner"] = owner
+    return view
+
+
+def end(pointing: Any) -> None:
+    """Makes an object null, and all views into it."""
+    for view in list(pointing.__dict__.get("_views", {}).values()):
+        if view() is not None:
+            end(view())
+    cell = pointing.__dict__.get("_cell")
+    if cell is not None:
+        cell.value = None
+    _pointers.clear(pointing)
+
+
+class Record(_Pointing):
+    """A record of the host: a C structure in memory, its fields as attributes.
+
+    A record that Python owns is freed when it is collected. What lies in another record keeps that
+    one alive. Two records are equal if they are the same memory.
+    """
+
+    thisown: bool
+    _fields: ClassVar[Tuple[str, ...]] = ()
+
+    def __init_subclass__(cls) -> None:
+        members = vars(cls)
+        if "thisown" not in members:
+            return
+        # Unless it has a printed form of its own, it prints as all records do.
+        if members["__repr__"].__name__ == "_swig_repr":
+            del cls.__repr__
+        # A name with two underscores in front is another one inside a class body.
+        hidden = f"_{cls.__name__.lstrip('_')}__"
+        for name in [name for name in members if name.startswith(hidden)]:
+            setattr(cls, name[len(hidden) - 2 :], members[name])
+            delattr(cls, name)
+        cls._fields = tuple(
+            name for name, member in vars(cls).items() if isinstance(member, property)
+        )[1:]
+        # An access by index alone would let Python iterate without an end.
+        if "__getitem__" in vars(cls) and not issubclass(cls, Table):
+            cls.__iter__ = None  # type: ignore[attr-defined]
+        CLASSES[cls.__name__] = cls
+
+    def __setattr__(self, name: str, value: Any) -> None:
+        if name in self._fields:
+            self._require()
+        elif name not in ("this", "thisown"):
+            raise AttributeError(f"{type(self).__name__} has no field {name!r}")
+        object.__setattr__(self, name, value)
+
+    def __repr__(self) -> str:
+        if not int(self):
+            return f"<{type(self).__name__} that is gone>"
+        shown = [f"{name}={_shown(getattr(self, name))}" for name in self._fields]
+        return f"{type(self).__name__}({', '.join(shown)})"
+
+    def own(self, owned: Optional[bool] = None) -> bool:
+        """Whether Python owned the record; with an argument, makes it so."""
+        before: bool = self.this.own() if owned is None else self.this.own(owned)
+        return before
+
+    def acquire(self) -> None:
+        self.this.acquire()
+
+    def disown(self) -> None:
+        self.this.disown()
+
+    def _require(self) -> None:
+        if not int(self):
+            raise ValueError(f"this {type(self).__name__} is gone: its memory was given back")
+
+
+class Table(Record):
+    """A record that is a sequence: it has a length, elements by index, and can be iterated."""
+
+    def __iter__(self) -> Iterator[Any]:
+        for index in range(len(self)):
+            yield self[index]
+
+    def __len__(self) -> int:
+        self._require()
+        count = _layout.TABLES[type(self).__name__]
+        return int(count) if count.isdigit() else int(getattr(self, count))
+
+    def __getitem__(self, index: int) -> Any:
+        raise NotImplementedError
+
+
+class Array(_Pointing, Sequence[Any]):
+    """Elements of one C type, one after the other in memory.
+
+    Numbers read as `int`, arrays of chars as `str`, arrays of bytes as `bytes`, records as views.
+    An array whose length only the data around it tells has none: `first(n)` gives one that has.
+    """
+
+    _element: str
+    _count: Optional[int]
+    _inner: int
+    _address: int
+
+    def __init__(
+        self,
+        pointer: Any,
+        element: str,
+        count: Optional[int],
+        inner: int = 0,
+        address: Optional[int] = None,
+    ) -> None:
+        self.__dict__.update(
+            this=pointer,
+            _element=element,
+            _count=count,
+            _inner=inner,
+            _address=_pointers.address_of(pointer) if address is None else address,
+        )
+
+    @property
+    def size(self) -> int:
+        """Bytes of an element."""
+        if self._inner:
+            return self._inner
+        if self._element in CLASSES:
+            return _memory.RECORD_SIZES[self._element]
+        return ctypes.sizeof(_memory.scalar(self._element))
+
+    def first(self, count: int) -> "Array":
+        """The same array with a length that the caller knows."""
+        if count < 0:
+            raise ValueError("a length is not negative")
+        self._require()
+        shorter = Array(self.this, self._element, count, self._inner, self._address)
+        place_in(self, shorter)
+        return shorter
+
+    def __len__(self) -> int:
+        self._require()
+        if self._count is None:
+            raise TypeError("only the data around this array tells its length; see first()")
+        return self._count
+
+    def __iter__(self) -> Iterator[Any]:
+        for index in range(len(self)):
+            yield self[index]
+
+    def __getitem__(self, index: Any) -> Any:
+        if isinstance(index, slice):
+            return [self[at] for at in range(*index.indices(len(self)))]
+        address = self._address_of(index)
+        if self._inner:
+            if self._element == "char":
+                return _memory.text_at(address, self._inner)
+            return ctypes.string_at(address, self._inner)
+        if self._element in CLASSES:
+            return place_in(self, record_at(self._element, address))
+        return _memory.scalar(self._element).from_address(address).value
+
+    def __setitem__(self, index: Any, value: Any) -> None:
+        if isinstance(index, slice):
+            places = range(*index.indices(len(self)))
+            values = list(value)
+            if len(values) != len(places):
+                raise ValueError(f"{len(places)} elements are wanted, not {len(values)}")
+            for at, one in zip(places, values):
+                self[at] = one
+            return
+        address = self._address_of(index)
+        if self._inner and self._element == "char":
+            _memory.put_text(address, self._inner, value)
+        elif self._inner:
+            if len(value) != self._inner:
+                raise ValueError(f"{self._inner} bytes are wanted, not {len(value)}")
+            ctypes.memmove(address, bytes(value), self._inner)
+        elif self._element in CLASSES:
+            if not isinstance(value, CLASSES[self._element]):
+                raise TypeError(f"a {self._element} is wanted, not {type(value).__name__}")
+            value._require()
+            ctypes.memmove(address, int(value), self.size)
+        else:
+            number = _memory.checked(self._element, value)
+            _memory.scalar(self._element).from_address(address).value = number
+
+    def __bytes__(self) -> bytes:
+        """The memory of all elements."""
+        length = len(self)
+        return ctypes.string_at(self._address, length * self.size)
+
+    def __eq__(self, other: object) -> bool:
+        """Whether the elements are equal to those of another sequence."""
+        if isinstance(other, bytes):
+            return bytes(self) == other
+        if isinstance(other, Sequence):
+            return list(self) == list(other)
+        return NotImplemented
+
+    __hash__ = None  # type: ignore[assignment]
+
+    def __repr__(self) -> str:
+        if not int(self):
+            return "<array that is gone>"
+        if self._count is None:
+            return "<array whose length is not known>"
+        if self._element == "unsigned char" and not self._inner:
+            return repr(bytes(self).rstrip(b"\0"))
+        shown = [_shown(value) for value in self[:_PRINTED]]
+        return f"[{', '.join(shown)}{', ...' if self._count > _PRINTED else ''}]"
+
+    def __setattr__(self, name: str, value: Any) -> None:
+        raise AttributeError("an array's attributes cannot be set; its elements can")
+
+    def _require(self) -> None:
+        if not int(self):
+            raise ValueError("this array is gone: its memory was given back")
+
+    def _address_of(self, index: int) -> int:
+        count = len(self)
+        if not -count <= index < count:
+            raise IndexError(f"index {index} is not within {count} elements")
+        return self._address + (index % count) * self.size
+
+
+def record_at(name: str, address: int) -> Record:
+    """A record of which Python knows nothing but the place."""
+    return wrap(name, _pointers.pointer_object(address, f"{name} *"))
+
+
+def wrap(name: str, pointer: Any) -> Record:
+    made = CLASSES[name].__new__(CLASSES[name])
+    made.__dict__["this"] = pointer
+    return made
+
+
+def _shown(value: Any) -> str:
+    if isinstance(value, (int, str, bytes, _Pointing)) or value is None:
+        return repr(value)
+    return hex(int(value))

@@ -1,0 +1,179 @@
+"""Cells: memory of one C type for calls that read or fill it, and functions that C may call."""
+
+import ctypes
+from typing import Any, Callable, Dict, Iterable, List, Optional, Union
+
+from libvswitch import _layout, _memory, _ownership, _pointers, _records
+
+
+class Pointer(_records._Pointing):
+    """A pointer to memory that it keeps alive."""
+
+    def __init__(self, address: int, spelling: str, owner: object) -> None:
+        self.this = _pointers.pointer_object(address, spelling)
+        self._owner = owner
+
+    def __repr__(self) -> str:
+        return f"<{type(self).__name__} to {int(self):#x}>"
+
+
+class Cell(_records._Pointing):
+    """Memory that holds one value of a C type, or several.
+
+    >>> mtu = Cell('qex_uint32')
+    >>> VSDVS_GetMTU('tour', mtu.pointer)
+    0
+    >>> mtu.value
+    9000
+
+    The type is a scalar, under any of its names; `void *` or a handle; or a pointer to a record,
+    such as `VSLAGTable *`. Scalars start as zero, pointers as null. `Cell(type, 7)` starts with a
+    value, `Cell(type, [1, 2, 3])` holds three, and bytes are as many of one byte each.
+    """
+
+    def __init__(
+        self, type: str, value: Union[None, int, bytes, Iterable[int], _records.Record, Any] = None
+    ) -> None:
+        self.type = type.strip()
+        self.door: Optional[str] = None
+        self._is_scalar = _memory.is_scalar(self.type)
+        if not self._is_scalar and not self._is_pointer():
+            raise TypeError(f"no cell can hold a {self.type!r}")
+        many = isinstance(value, Iterable) and not isinstance(value, _records._Pointing)
+        values: List[Any] = list(value) if many else [value]  # type: ignore[arg-type]
+        self._is_single = not many
+        # What pointers here read as: the same object as long as they stay the same.
+        self._found: Dict[int, Any] = {}
+        kind: Any = _memory.scalar(self.type) if self._is_scalar else ctypes.c_void_p
+        self._memory = (kind * max(len(values), 1))()
+        self.pointer = Pointer(ctypes.addressof(self._memory), _spelled_pointer(self.type), self)
+        # The runtime then takes a cell for its pointer.
+        self.this = self.pointer.this
+        for index, one in enumerate(values):
+            if one is not None:
+                self[index] = one
+        self._length = len(values)
+
+    @property
+    def value(self) -> Any:
+        """The value; of several, the first.
+
+        A pointer reads as a record, as a plain pointer object, or as None if it is null. What a
+        call of the library has put here goes back through `owned`.
+        """
+        return self[0]
+
+    @value.setter
+    def value(self, value: Any) -> None:
+        self[0] = value
+
+    def __getitem__(self, index: int) -> Any:
+        if not 0 <= index < len(self._memory):
+            raise IndexError(f"index {index} is not within {len(self._memory)} values")
+        held = self._memory[index]
+        if self._is_scalar:
+            return held
+        if not held:
+            return None
+        found = self._found.get(index)
+        if found is None or int(found) != held:
+            if self._target() in _records.CLASSES:
+                found = _records.record_at(self._target(), held)
+            else:
+                found = Pointer(held, "void *", None)
+            found.__dict__["_cell"] = self
+            self._found[index] = found
+        _ownership.hand_out(found, self.door)
+        return found
+
+    def __setitem__(self, index: int, value: Any) -> None:
+        if self._is_scalar:
+            self._memory[index] = _memory.checked(self.type, value)
+        else:
+            self._memory[index] = None if value is None else _pointers.address_of(value)
+
+    def __len__(self) -> int:
+        return self._length
+
+    def __iter__(self) -> Any:
+        return (self[index] for index in range(len(self)))
+
+    def __bytes__(self) -> bytes:
+        """The memory of the cell itself."""
+        return bytes(self._memory)
+
+    def read(self, length: int) -> bytes:
+        """So many bytes of what a pointer in this cell points to."""
+        if self._is_scalar:
+            raise TypeError(f"a {self.type} points to nothing")
+        held = self._memory[0]
+        if not held:
+            raise ValueError("the pointer is null")
+        if length < 0:
+            raise ValueError("a length is not negative")
+        return ctypes.string_at(held, length)
+
+    def __repr__(self) -> str:
+        held = self.value if self._is_single else list(self)
+        return f"Cell({self.type!r}, {held!r})"
+
+    def _handed_out(self) -> List[_records._Pointing]:
+        held = None if self._is_scalar else self.value
+        return [] if held is None else [held]
+
+    def _target(self) -> str:
+        return self.type[:-1].strip() if self.type.endswith("*") else ""
+
+    def _is_pointer(self) -> bool:
+        return (
+            self.type in _layout.POINTERS
+            or self._target() == "void"
+            or self._target() in _layout.RECORDS
+        )
+
+
+def cell_behind(argument: Any) -> Optional[Cell]:
+    """The cell that an argument is or points to."""
+    if isinstance(argument, Pointer):
+        argument = argument.__dict__["_owner"]
+    return argument if isinstance(argument, Cell) else None
+
+
+class Callback(_records._Pointing):
+    """A function that the library may call for each item of a walk.
+
+    It is called with the item's handle and with the context that the walk was given, each a pointer
+    or None. A result that is false ends the walk; None does not. What it raises ends the walk too,
+    and `reraise` raises it.
+    """
+
+    _TYPE = ctypes.CFUNCTYPE(ctypes.c_byte, ctypes.c_void_p, ctypes.c_void_p)
+
+    def __init__(self, function: Callable[[Any, Any], Any]) -> None:
+        self._function = function
+        self._raised: Optional[BaseException] = None
+        self._thunk = self._TYPE(self._call)
+        address = ctypes.cast(self._thunk, ctypes.c_void_p).value or 0
+        self.pointer = Pointer(address, "DVSwitchCallback", self)
+        self.this = self.pointer.this
+
+    def _call(self, item: Optional[int], context: Optional[int]) -> int:
+        try:
+            answer = self._function(_handle(item), _handle(context))
+        except BaseException as raised:  # nothing may leave through the library's frames
+            self._raised = raised
+            return 0
+        return 1 if answer is None or answer else 0
+
+    def reraise(self) -> None:
+        raised, self._raised = self._raised, None
+        if raised is not None:
+            raise raised
+
+
+def _handle(address: Optional[int]) -> Optional[Pointer]:
+    return Pointer(address, "void *", None) if address else None
+
+
+def _spelled_pointer(type: str) -> str:
+    return f"{type}*" if type.endswith("*") else f"{type} *"

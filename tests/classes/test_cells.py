@@ -1,0 +1,194 @@
+"""Cells make every call usable: those that fill or read what a pointer points to, and walks."""
+
+import ctypes
+from typing import Any, List
+
+import libvswitch as vs
+import pytest
+from libvswitch import Cell
+
+
+def test_a_number_that_a_call_fills(switch: str) -> None:
+    mtu = Cell("qex_uint32")
+    assert vs.VSDVS_SetMTU(switch, 9000) == vs.QEX_OK
+    assert vs.VSDVS_GetMTU(switch, mtu.pointer) == vs.QEX_OK
+    assert mtu.value == 9000
+    # The cell stands for its pointer.
+    assert vs.VSDVS_SetMTU(switch, 1500) == vs.QEX_OK
+    assert vs.VSDVS_GetMTU(switch, mtu) == vs.QEX_OK
+    assert mtu.value == 1500
+
+
+def test_an_array_that_a_call_reads() -> None:
+    wanted = [vs.VS_RT_OPT_IGMP_V3_MAX_SRC_IP_NUM, vs.VS_RT_OPT_ALLOW_FAST_PATH]
+    ids = Cell("qex_uint16", wanted)
+    assert list(ids) == wanted and len(ids) == len(wanted)
+    with vs.owned(vs.VSQEX_GetRuntimeOptions(ids.pointer, len(ids))) as (status, options):
+        assert status == vs.QEX_OK
+        found = []
+        option = options.get_first_option()
+        while option is not None:
+            found.append(option.type)
+            option = options.get_next_option(option)
+    assert found == wanted
+
+
+def test_a_property_through_the_raw_door(switch: str, switch_id: str) -> None:
+    data, length = Cell("void *"), Cell("int")
+    assert (
+        vs.DVSQEX_GlobalPropGet(switch_id, vs.VSPROP_MTU, data.pointer, length.pointer) == vs.QEX_OK
+    )
+    assert length.value == 4
+    assert int.from_bytes(data.read(length.value), "little") == 1500
+    with vs.owned(data):
+        pass
+    assert data.value is None
+    with pytest.raises(ValueError):
+        data.read(4)
+
+    mtu = Cell("qex_uint32", 2000)
+    assert (
+        vs.DVSQEX_GlobalPropSet(
+            switch_id, vs.VSPROP_MTU, mtu.pointer, len(bytes(mtu)), vs.CONFIG_PROP_TYPE
+        )
+        == vs.QEX_OK
+    )
+    assert vs.VSDVS_GetMTU(switch, mtu.pointer) == vs.QEX_OK
+    assert mtu.value == 2000
+
+
+def test_a_record_behind_a_pointer(switch: str, switch_id: str) -> None:
+    lags = Cell("VSLAGTable *")
+    assert [*lags] == [None]
+    assert vs.VSQEX_GetLAGTable(switch, lags.pointer) == vs.QEX_OK
+    with vs.owned(lags):
+        table = lags.value
+        assert table.numLAGs == 0
+    assert lags.value is None
+    with pytest.raises(ValueError):
+        table.numLAGs
+
+    ports = Cell("DVPortList *")
+    kind = vs.DVSPORT_TYPE_ACTIVE
+    assert vs.DVSQEX_SwitchPortList(switch_id, ports.pointer, kind) == vs.QEX_OK
+    with vs.owned(ports.value) as found:
+        assert "web" in [port.dvPortId for port in found.dvPort]
+
+    assert vs.VSDVS_AddOpaqueDVPort(switch, "opaque", "theirs") == vs.QEX_OK
+    opaque = Cell("OpaqueDVPortData *")
+    assert vs.DVSQEX_PortGetByExternalId(switch_id, "theirs", opaque.pointer) == vs.QEX_OK
+    with vs.owned(opaque.value) as port:
+        assert (port.dvPortId, port.externalId) == ("opaque", "theirs")
+
+
+def test_lists_and_items(switch_id: str) -> None:
+    made = Cell("DVSDataHandle")
+    assert vs.DVSData_Alloc(made.pointer, None, None) == vs.QEX_OK
+    with vs.owned(made):
+        value = Cell("qex_uint32", 5)
+        kind = vs.CONFIG_PROP_TYPE
+        assert vs.DVSData_Update(made.value, "five", value.pointer, 4, kind) == vs.QEX_OK
+    assert made.value is None
+
+    item, data = Cell("DVSDataItem"), Cell("void *")
+    assert vs.DVSState_GlobalPropLookup(switch_id, vs.VSPROP_MTU, item.pointer) == vs.QEX_OK
+    assert vs.DVSData_Name(item.value) == vs.VSPROP_MTU
+    assert vs.DVSData_Data(item.value, data.pointer) == 4
+    assert int.from_bytes(data.read(4), "little") == 1500
+    # A look at the state is nobody's to give back.
+    with pytest.raises(ValueError, match="name the door"):
+        vs.owned(item)
+
+
+def test_walks_take_functions(switch: str, switch_id: str) -> None:
+    names: List[Any] = []
+    vs.DVSState_SwitchForEach(lambda handle, context: names.append(vs.DVS_SwitchName(handle)), None)
+    assert switch in names
+
+    seen: List[Any] = []
+
+    def visit(handle: Any, context: Any) -> bool:
+        seen.append((vs.DVS_PortId(handle), context))
+        return False
+
+    vs.DVSState_PortForEach(vs.DVSState_SwitchFindByAlias(switch), visit, None)
+    assert len(seen) == 1 and seen[0][1] is None
+
+    def fail(handle: Any, context: Any) -> None:
+        raise LookupError("from inside")
+
+    with pytest.raises(LookupError, match="from inside"):
+        vs.DVSState_SwitchForEach(fail, None)
+
+
+def test_the_private_vlan_map_is_an_array_of_its_entries(switch: str) -> None:
+    status, found, count = vs.VSDVS_GetPrivateVLANMap(switch)
+    assert (status, found, count) == (vs.QEX_OK, None, 0)
+
+    entries = vs.new_pvlanmapentryArray(2)
+    wanted = [
+        (10, 10, vs.VSPORT_PVLAN_TYPE_PROMISC),
+        (10, 11, vs.VSPORT_PVLAN_TYPE_ISOLATED),
+    ]
+    for entry, (primary, secondary, kind) in zip(entries, wanted):
+        entry.primaryVID, entry.secondaryVID, entry.pvlanType = primary, secondary, kind
+        entry.pad = ""
+    assert vs.VSDVS_SetPrivateVLANMap(switch, entries, len(entries)) == vs.QEX_OK
+    with vs.owned(vs.VSDVS_GetPrivateVLANMap(switch)) as (status, found, count):
+        assert (status, count) == (vs.QEX_OK, 2)
+        read = [(entry.primaryVID, entry.secondaryVID, entry.pvlanType) for entry in found]
+        assert read == wanted
+    with pytest.raises(ValueError):
+        found[0]
+
+
+def test_a_port_exists_or_not(switch_id: str) -> None:
+    assert vs.DVPortExist(switch_id, "web") is True
+    assert vs.DVPortExist(switch_id, "none") is False
+
+
+@pytest.mark.parametrize(
+    "type, least, most",
+    [
+        ("int", -(2**31), 2**31 - 1),
+        ("qex_uint8", 0, 255),
+        ("qex_uint16", 0, 2**16 - 1),
+        ("qex_uint32", 0, 2**32 - 1),
+        ("qex_uint64", 0, 2**64 - 1),
+        ("qex_int64", -(2**63), 2**63 - 1),
+        ("NEBVersion", 0, 2**32 - 1),
+    ],
+)
+def test_numbers_within_their_type(type: str, least: int, most: int) -> None:
+    for value in (least, most, 1):
+        assert Cell(type, value).value == value
+    for value in (least - 1, most + 1):
+        with pytest.raises(OverflowError):
+            Cell(type, value)
+    with pytest.raises(TypeError):
+        Cell(type, "1")
+    with pytest.raises(IndexError):
+        Cell(type)[1]
+
+
+def test_bytes_are_numbers_of_one_byte() -> None:
+    assert bytes(Cell("char", b"abc")) == b"abc"
+    assert list(Cell("qex_uint8", b"\1\2")) == [1, 2]
+
+
+@pytest.mark.parametrize("type", ["", "nothing", "VSInfo", "nothing *", "float"])
+def test_what_no_cell_holds(type: str) -> None:
+    with pytest.raises(TypeError):
+        Cell(type)
+
+
+def test_a_cell_of_the_wrong_type_is_refused(switch: str) -> None:
+    with pytest.raises(TypeError):
+        vs.VSDVS_GetMTU(switch, Cell("qex_uint64").pointer)
+
+
+def test_a_pointer_keeps_its_cell_alive(switch: str) -> None:
+    pointers = [Cell("qex_uint32", number).pointer for number in range(500)]
+    cells = [Cell("qex_uint32", 0) for _ in range(500)]
+    values = [int.from_bytes(ctypes.string_at(int(one), 4), "little") for one in pointers]
+    assert values == list(range(500)) and len(cells) == 500
