@@ -6,6 +6,7 @@
 
 // The frame: how calls are made and how values cross. Each file states what must stand before it.
 %include "frame/runtime.i"
+%include "frame/pointer_objects.i"
 %include "frame/pointers.i"
 %include "frame/call_trap.i"
 %include "frame/scalars.i"

@@ -46,7 +46,7 @@ static inline int convert_pointer(PyObject *object, void **pointer, swig_type_in
     if (flags & SWIG_POINTER_DISOWN) raw->own = 0;
     return SWIG_OK;
   }
-  return SWIG_Python_ConvertPtr(object, pointer, type, flags);
+  return convert_any_pointer(object, pointer, type, flags);
 }
 #undef SWIG_ConvertPtr
 #define SWIG_ConvertPtr(object, pointer, type, flags) \

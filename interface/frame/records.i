@@ -45,8 +45,7 @@
 SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self), PyObject *args) {
   PyObject *cls = NULL;
   if (!PyArg_UnpackTuple(args, "swigregister", 1, 1, &cls)) return NULL;
-  SWIG_TypeNewClientData(SWIGTYPE_p_##NAME, SWIG_NewClientData(cls));
-  return SWIG_Py_Void();
+  return register_class(SWIGTYPE_p_##NAME, cls);
 }
 %}
 %native(NAME##_swigregister) PyObject *_wrap_##NAME##_swigregister(PyObject *, PyObject *);
