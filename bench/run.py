@@ -17,6 +17,7 @@ from pathlib import Path
 from typing import Any, Dict, Iterator, List, Mapping
 
 import calls
+import modules
 import report
 import targets
 from figures import EXPECTED, FIGURES, FORMS, PEERS
@@ -76,15 +77,17 @@ def wrong(answers: Answers) -> Iterator[str]:
                     yield f"{peer}, {form}, {figure}: {answer!r}"
 
 
+def middle_of(rows: Mapping[str, Mapping[str, List[float]]]) -> Dict[str, Dict[str, float]]:
+    """The median of what was measured, for each figure and peer."""
+    return {
+        figure: {peer: statistics.median(values) for peer, values in row.items()}
+        for figure, row in rows.items()
+    }
+
+
 def medians(times: calls.Times) -> Dict[str, Dict[str, Dict[str, float]]]:
     """The median across processes of each form, figure and peer."""
-    return {
-        form: {
-            figure: {peer: statistics.median(values) for peer, values in row.items()}
-            for figure, row in rows.items()
-        }
-        for form, rows in times.items()
-    }
+    return {form: middle_of(rows) for form, rows in times.items()}
 
 
 def verdicts(
@@ -137,14 +140,24 @@ def main() -> None:
         sys.exit("bench: these peers answer something else:\n" + "\n".join(mistakes))
     progress = Progress()
     times = calls.measure(build, core, **settings, progress=progress)
-    progress.clear()
     middle = medians(times)
     judged = verdicts(middle["functions"], targets.CALLS)
+    whole: modules.Values = {}
+    if not arguments.quick:
+        whole = modules.measure(build, processes=21, compilations=3, progress=progress)
+        judged += verdicts(middle_of(whole), targets.MODULES)
+    progress.clear()
 
     print("\n".join(report.legend()), end="\n\n")
     for form, title in (("functions", "As functions"), ("own", "In the peer's own form")):
         goals = targets.CALLS if form == "functions" else {}
         print("\n".join(report.table(title, "ns", FIGURES, middle[form], goals)), end="\n\n")
+    if whole:
+        titles, goals = modules.TITLES, targets.MODULES
+        print(
+            "\n".join(report.table("Whole modules", "", titles, middle_of(whole), goals)),
+            end="\n\n",
+        )
     missed = [verdict for verdict in judged if not verdict["met"]]
     print(f"{len(judged) - len(missed)} of {len(judged)} targets met")
 
@@ -152,6 +165,7 @@ def main() -> None:
         "machine": machine(),
         "settings": {**settings, "core": core, "quick": arguments.quick},
         "calls": {"answers": answers, "times": times, "medians": middle},
+        "modules": {"values": whole, "medians": middle_of(whole)},
         "targets": judged,
     }
     (build / "bench" / "results.json").write_text(json.dumps(results, indent=1), encoding="utf-8")

@@ -1,9 +1,9 @@
 #!/usr/bin/env python3
 """Writes the whole surface of the module as if by hand: handwritten.py OUTPUT.
 
-Each function comes out as one would write it with the helpers of contract.h, under the same contract
-as the measured module: so many functions, so much code, so many constants, and nothing of a
-generator's own runtime.
+Each function comes out as one would write it with the helpers of contract.h, under the same
+contract as the measured module: so many functions, so much code, so many constants, and nothing of
+a generator's own runtime.
 """
 
 import json
@@ -259,7 +259,9 @@ def call(
     function: surface.Function, prototype: headers.Prototype, name: str, *, required: bool
 ) -> Iterator[str]:
     """A call of C: the host's, a helper's, or a method's body."""
-    body, passed, outputs = Body(), [], []
+    body = Body()
+    passed: List[str] = []
+    outputs: List[str] = []
     left = list(function.arguments)
     number = 0
     for spelled, parameter in prototype.parameters:
