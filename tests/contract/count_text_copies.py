@@ -75,8 +75,8 @@ def ways_through(call: Call) -> Iterator[Way]:
 def main() -> None:
     """Take every way and add up what it leaves."""
     host = RecordingHost()
-    # Nothing else may come or go while a call is counted: not what the interpreter collects, nor the
-    # host's own record, which reaches its final size with this.
+    # Nothing else may come or go while a call is counted: not what the interpreter collects, nor
+    # more of the host's own record, which reaches its final size with this.
     gc.disable()
     _libvswitch.VSDVS_AddOpaqueDVPort(*["x" * 100_000] * 3)
     found: Dict[str, Dict[str, List[int]]] = {}
