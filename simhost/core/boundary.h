@@ -44,13 +44,13 @@ QEX_ReturnStatus answer(char const *name, Body const &body) {
   return ending.status;
 }
 
-/// Likewise for a call without a result.
-template <typename Body>
-void run(char const *name, Body const &body) {
+/// Likewise for a call without a result; `how` is nothing, or Call::Resumed.
+template <typename Body, typename... How>
+void run(char const *name, Body const &body, How... how) {
   static_assert(std::is_trivially_destructible_v<Body>, "a jump leaves the captures behind");
   Ending ending;
   try {
-    Call call(name);
+    Call call(name, how...);
     body(call);
     call.complete();
     return;

@@ -23,6 +23,11 @@ BytesView bytes_of(Record const &record) {
   return std::as_bytes(std::span(&record, 1));
 }
 
+/// The bytes as a value of their own.
+inline Bytes copied(BytesView bytes) {
+  return {bytes.begin(), bytes.end()};
+}
+
 /// A text with its terminating NUL.
 inline Bytes bytes_of_text(std::string_view text) {
   auto const bytes = std::as_bytes(std::span(text));

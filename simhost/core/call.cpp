@@ -6,8 +6,9 @@
 
 namespace simhost {
 
-Call::Call(char const *name) : name_(name) {
-  meet_faults(name);
+Call::Call(char const *name) : Call((meet_faults(name), name), Resumed{}) {}
+
+Call::Call(char const *name, Resumed /*unused*/) : name_(name) {
   this_host().lock().lock();
 }
 

@@ -21,6 +21,10 @@ class SIMHOST_API Call {
  public:
   /// `name` is a literal. Throws what a fault that waits for this call says.
   explicit Call(char const *name);
+  /// Goes on with a call that another Call began and has let go of: it is no further call, so no
+  /// fault that waits for one meets it.
+  struct Resumed {};
+  Call(char const *name, Resumed);
   ~Call();
   Call(Call const &) = delete;
   Call &operator=(Call const &) = delete;

@@ -9,6 +9,7 @@
 #include <set>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "core/api.h"
@@ -61,7 +62,7 @@ class SIMHOST_API DataList {
     store::PropertyType type;
   };
 
-  explicit DataList(ListMemory const &memory) : memory_(memory), entries_(&memory_) {}
+  explicit DataList(ListMemory memory) : memory_(std::move(memory)), entries_(&memory_) {}
   ~DataList() = default;
 
   ListMemory memory_;

@@ -144,8 +144,7 @@ Bytes written(Table const &table) {
     auto const tail = std::as_bytes(std::span(own));
     entities.insert(entities.end(), tail.begin(), tail.end());
   }
-  auto const head = bytes_of(header);
-  Bytes all(head.begin(), head.end());
+  auto all = copied(bytes_of(header));
   all.insert(all.end(), sessions.begin(), sessions.end());
   all.insert(all.end(), entities.begin(), entities.end());
   return all;

@@ -101,8 +101,7 @@ store::Port vacant_uplink_port(store::Transaction &transaction, store::SwitchKey
 template <std::size_t Width>
 Bytes list_of(std::vector<UplinkPort> const &ports, std::string UplinkPort::*text) {
   auto const count = static_cast<qex_uint32>(ports.size());
-  auto const head = bytes_of(count);
-  Bytes list(head.begin(), head.end());
+  auto list = copied(bytes_of(count));
   for (auto const &port : ports) {
     auto const field = list.insert(list.end(), Width, std::byte{0});
     auto const bytes = std::as_bytes(std::span(port.*text));
@@ -299,8 +298,7 @@ Bytes read_port_status(store::Transaction &transaction, store::PropertyOwner con
       (blocked ? qex_uint64{QEX_NEBPORT_STATUS_BLOCKED} : 0U);
   status.portID = static_cast<qex_uint32>(port.number);
   name_of(transaction, port).copy(status.displayStr, sizeof status.displayStr - 1);
-  auto const bytes = bytes_of(status);
-  return Bytes(bytes.begin(), bytes.end());
+  return copied(bytes_of(status));
 }
 
 void write_uplink_names(Setting const &setting) {

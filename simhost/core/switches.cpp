@@ -199,8 +199,7 @@ Bytes read_alias(store::Transaction &transaction, store::PropertyOwner const &ow
 
 Bytes read_version(store::Transaction &transaction, store::PropertyOwner const &owner) {
   auto const version = row_behind(transaction, owner.switch_key).version;
-  auto const bytes = bytes_of(version);
-  return Bytes(bytes.begin(), bytes.end());
+  return copied(bytes_of(version));
 }
 
 Bytes read_portset(store::Transaction &transaction, store::PropertyOwner const &owner) {

@@ -135,9 +135,8 @@ void set_vlans(store::Transaction &transaction, store::Port const &port, VlanSpe
   policy.flags = static_cast<qex_uint16>(flags);
   policy.vlanID = spec.vlan;
   policy.numRanges = static_cast<qex_uint16>(spec.ranges.size());
-  auto const head = bytes_of(policy);
+  auto value = copied(bytes_of(policy));
   auto const tail = std::as_bytes(spec.ranges);
-  Bytes value(head.begin(), head.end());
   value.insert(value.end(), tail.begin(), tail.end());
 
   auto const owner = owner_of(port);
@@ -164,8 +163,7 @@ Bytes vlan_info_of(store::Transaction &transaction, store::PropertyOwner const &
     info.numRanges = policy.numRanges;
     ranges = BytesView(property->value).subspan(sizeof policy);
   }
-  auto const head = bytes_of(info);
-  Bytes value(head.begin(), head.end());
+  auto value = copied(bytes_of(info));
   value.insert(value.end(), ranges.begin(), ranges.end());
   return value;
 }

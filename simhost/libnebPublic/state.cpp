@@ -49,10 +49,13 @@ void walk_properties(char const *name, void const *handle, DVSPortDataCallback c
     item = item_after(call, transaction, owner_of(call, transaction, handle), nullptr);
   });
   while (item != nullptr && callback(item, context) != 0) {
-    simhost::run(name, [&](Call &call) {
-      auto const owner = call.handles().item_behind(item).owner;
-      item = item_after(call, call.reading(), owner, item);
-    });
+    simhost::run(
+        name,
+        [&](Call &call) {
+          auto const owner = call.handles().item_behind(item).owner;
+          item = item_after(call, call.reading(), owner, item);
+        },
+        Call::Resumed{});
   }
 }
 
@@ -115,9 +118,11 @@ void DVSState_SwitchForEach(DVSwitchCallback callback, void *context) {
   }
   SwitchKey last{};
   void *handle = nullptr;
-  do {
-    simhost::run(__func__, [&](Call &call) { handle = simhost::handle_after(call, last); });
-  } while (handle != nullptr && callback(handle, context) != 0);
+  auto const step = [&](Call &call) { handle = simhost::handle_after(call, last); };
+  simhost::run(__func__, step);
+  while (handle != nullptr && callback(handle, context) != 0) {
+    simhost::run(__func__, step, Call::Resumed{});
+  }
 }
 
 void DVSState_PortForEach(DVSwitchHandle handle, DVSPortCallback callback, void *context) {
@@ -129,8 +134,9 @@ void DVSState_PortForEach(DVSwitchHandle handle, DVSPortCallback callback, void 
                [&](Call &call) { key = simhost::live_switch(call, call.reading(), handle).key; });
   PortNumber last{};
   void *port = nullptr;
+  auto const step = [&](Call &call) { port = simhost::handle_after(call, key, last); };
   do {
-    simhost::run(__func__, [&](Call &call) { port = simhost::handle_after(call, key, last); });
+    simhost::run(__func__, step, Call::Resumed{});
   } while (port != nullptr && callback(port, context) != 0);
 }
 
