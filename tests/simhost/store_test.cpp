@@ -11,8 +11,8 @@
 #include <string>
 
 #include "store/ports.h"
-#include "store/switches.h"
 #include "store/schema.h"
+#include "store/switches.h"
 #include "temporary_folder.h"
 
 namespace {
@@ -162,11 +162,15 @@ TEST(Store, LookUpsUseAnIndex) {
       "property WHERE switch = 1 AND scope = 0 AND ifnull(port, 0) = 0 AND name = ''";
   for (auto const *condition :
        {"switch WHERE alias = ''", "switch WHERE identifier = ''", "switch WHERE portset = ''",
-        "uplink WHERE name = ''", "port WHERE switch = 1 AND identifier = ''", kProperty}) {
+        "switch WHERE key > 1 ORDER BY key LIMIT 1", "uplink WHERE name = ''",
+        "port WHERE switch = 1 AND identifier = ''", "port WHERE switch = 1 AND external_id = ''",
+        "port WHERE switch = 1 AND number > 1 ORDER BY number LIMIT 1",
+        "port WHERE switch = 1 AND is_uplink", kProperty}) {
     SQLite::Statement plan(database, std::string("EXPLAIN QUERY PLAN SELECT * FROM ") + condition);
     ASSERT_TRUE(plan.executeStep());
     auto const step = plan.getColumn("detail").getString();
     EXPECT_EQ(step.rfind("SEARCH", 0), 0U) << condition << ": " << step;
+    EXPECT_FALSE(plan.executeStep()) << condition << ": a second step, to sort";
   }
 }
 
