@@ -165,7 +165,8 @@ Json described_session_counters(Transaction &work, store::SwitchKey key) {
 }
 
 Json described_switch(Transaction &work, store::FoundSwitch const &known) {
-  auto const &[key, row] = known;
+  auto const &key = known.key;
+  auto const &row = known.row;
   auto const owner = PropertyOwner::global(key);
   Json described{{"alias", row.alias},
                  {"id", row.identifier},

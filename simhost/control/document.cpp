@@ -54,9 +54,9 @@ void Node::fail(std::string const &why) const {
 }
 
 void Node::only(std::initializer_list<std::string_view> keys) const {
-  for (auto const &[key, node] : members()) {
-    if (std::find(keys.begin(), keys.end(), key) == keys.end()) {
-      node.fail("unknown key");
+  for (auto const &member : members()) {
+    if (std::find(keys.begin(), keys.end(), member.key) == keys.end()) {
+      member.value.fail("unknown key");
     }
   }
 }
@@ -80,13 +80,13 @@ std::optional<Node> Node::find(std::string_view key) const {
   return Node(*found, path_.empty() ? std::string(key) : path_ + "." + std::string(key));
 }
 
-std::vector<std::pair<std::string, Node>> Node::members() const {
+std::vector<Member> Node::members() const {
   if (!value_->is_object()) {
     fail("must be an object");
   }
-  std::vector<std::pair<std::string, Node>> all;
+  std::vector<Member> all;
   for (auto const &[key, value] : value_->items()) {
-    all.emplace_back(key, at(key));
+    all.push_back({.key = key, .value = at(key)});
   }
   return all;
 }

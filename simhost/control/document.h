@@ -43,6 +43,8 @@ Json described_choice(Value value, std::array<Choice<Value>, kCount> const &choi
   return found == choices.end() ? Json() : Json(found->text);
 }
 
+struct Member;
+
 /// A value of a document and its path. The document must outlive it.
 class Node {
  public:
@@ -55,7 +57,7 @@ class Node {
   void only(std::initializer_list<std::string_view> keys) const;
   [[nodiscard]] Node at(std::string_view key) const;
   [[nodiscard]] std::optional<Node> find(std::string_view key) const;
-  [[nodiscard]] std::vector<std::pair<std::string, Node>> members() const;
+  [[nodiscard]] std::vector<Member> members() const;
   /// The value must be an array.
   [[nodiscard]] std::vector<Node> items() const;
 
@@ -91,6 +93,12 @@ class Node {
  private:
   Json const *value_;
   std::string path_;
+};
+
+/// A key of an object and its value.
+struct Member {
+  std::string key;
+  Node value;
 };
 
 }  // namespace simhost::control

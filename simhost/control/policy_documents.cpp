@@ -108,7 +108,8 @@ DVMirrorEntity entity_from(Node const &node) {
   if (members.size() != 1) {
     node.fail("must have one of the keys port, uplink, vlan, ip, number");
   }
-  auto const &[kind, value] = members.front();
+  auto const &kind = members.front().key;
+  auto const &value = members.front().value;
   DVMirrorEntity entity{};
   if (kind == "port") {
     entity.type = MIRROR_ENTTYPE_DVPORT;

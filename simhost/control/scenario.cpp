@@ -68,6 +68,13 @@ void for_each_in(Node const &node, std::string_view key, Each const &each) {
   }
 }
 
+template <typename Each>
+void for_each_member(Node const &object, Each const &each) {
+  for (auto const &member : object.members()) {
+    do_at(member.value, [&] { each(member.key, member.value); });
+  }
+}
+
 template <typename Use>
 void if_there(Node const &node, std::string_view key, Use const &use) {
   if (auto const found = node.find(key)) {
@@ -116,14 +123,12 @@ void apply_runtime_option(Transaction &work, std::string const &name, Node const
     node.fail("unknown option");
   }
   auto const type = static_cast<unsigned>(found - options.begin());
-  do_at(node, [&] {
-    if (node.is_text()) {
-      set_runtime_option(work, type, node.text());
-    } else {
-      set_runtime_option(work, type,
-                         static_cast<std::int32_t>(node.integer(found->least, found->greatest)));
-    }
-  });
+  if (node.is_text()) {
+    set_runtime_option(work, type, node.text());
+  } else {
+    auto const number = node.integer(found->least, found->greatest);
+    set_runtime_option(work, type, static_cast<std::int32_t>(number));
+  }
 }
 
 void apply_global_learning(Transaction &work, Node const &node) {
@@ -155,20 +160,22 @@ Bytes bytes_from(Node const &node) {
 
 void apply_properties(Transaction &work, PropertyOwner const &owner, Node const &node) {
   if_there(node, "properties", [&](Node const &properties) {
-    for (auto const &[key, property] : properties.members()) {
+    for_each_member(properties, [&](std::string const &key, Node const &property) {
       property.only({"type", "hex", "text"});
       auto const type = property.at("type").choice(std::span(kPropertyTypes));
-      do_at(property, [&] { set_property(work, owner, key, bytes_from(property), type); });
-    }
+      set_property(work, owner, key, bytes_from(property), type);
+    });
+  });
+}
+
+void set_counters(Transaction &work, CounterOwner const &owner, Node const &counters) {
+  for_each_member(counters, [&](std::string const &name, Node const &value) {
+    dataplane::set_counter(work, owner, name, value.counter());
   });
 }
 
 void apply_counters(Transaction &work, CounterOwner const &owner, Node const &node) {
-  if_there(node, "counters", [&](Node const &counters) {
-    for (auto const &[name, value] : counters.members()) {
-      do_at(value, [&] { dataplane::set_counter(work, owner, name, value.counter()); });
-    }
-  });
+  if_there(node, "counters", [&](Node const &counters) { set_counters(work, owner, counters); });
 }
 
 VSMACEntry address_entry_from(Node const &node) {
@@ -307,13 +314,9 @@ void apply_lag(Transaction &work, store::SwitchKey key, Node const &node) {
 
 void apply_session_counters(Transaction &work, store::SwitchKey key, Node const &node) {
   if_there(node, "mirror_counters", [&](Node const &sessions) {
-    for (auto const &[sid, counters] : sessions.members()) {
-      for (auto const &[name, value] : counters.members()) {
-        do_at(value, [&] {
-          dataplane::set_counter(work, {.switch_key = key, .session = sid}, name, value.counter());
-        });
-      }
-    }
+    for_each_member(sessions, [&](std::string const &sid, Node const &counters) {
+      set_counters(work, {.switch_key = key, .session = sid}, counters);
+    });
   });
 }
 
@@ -381,9 +384,9 @@ void apply(Transaction &transaction, std::string_view document) {
   if_there(node, "clock", [&](Node const &clock) { apply_clock(transaction, clock); });
   for_each_in(node, "uplinks", [&](Node const &item) { apply_uplink(transaction, item); });
   if_there(node, "runtime_options", [&](Node const &options) {
-    for (auto const &[name, value] : options.members()) {
+    for_each_member(options, [&](std::string const &name, Node const &value) {
       apply_runtime_option(transaction, name, value);
-    }
+    });
   });
   if_there(node, "mac_learning",
            [&](Node const &learning) { apply_global_learning(transaction, learning); });

@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <charconv>
 #include <cstring>
+#include <iterator>
 
 namespace simhost::control {
 namespace {
@@ -17,16 +18,17 @@ struct Status {
   std::string_view text;
 };
 
-constexpr std::array kStatuses{
+// Not an std::array, whose length compilers would have to deduce from that many arguments.
+constexpr Status kStatuses[] = {
 #define STATUS_TEXT(status, text) Status{status, #status, text},
 #include "status_texts.inc"
 #undef STATUS_TEXT
 };
 
 Status const *find_status(QEX_ReturnStatus status) {
-  auto const *const found = std::find_if(kStatuses.begin(), kStatuses.end(),
+  auto const *const found = std::find_if(std::begin(kStatuses), std::end(kStatuses),
                                          [&](Status const &s) { return s.status == status; });
-  return found == kStatuses.end() ? nullptr : found;
+  return found == std::end(kStatuses) ? nullptr : found;
 }
 
 std::optional<std::byte> byte_from(std::string_view digits) {
@@ -114,9 +116,9 @@ std::string hex_text(std::span<std::byte const> bytes) {
 }
 
 std::optional<QEX_ReturnStatus> status_named(std::string_view name) {
-  auto const *const found = std::find_if(kStatuses.begin(), kStatuses.end(),
+  auto const *const found = std::find_if(std::begin(kStatuses), std::end(kStatuses),
                                          [&](Status const &s) { return s.name == name; });
-  return found == kStatuses.end() ? std::nullopt : std::optional(found->status);
+  return found == std::end(kStatuses) ? std::nullopt : std::optional(found->status);
 }
 
 std::string status_name(QEX_ReturnStatus status) {
