@@ -41,8 +41,8 @@ char const *DVS_PortAlias(DVSPortHandle handle);
  * Makes an empty list of items.
  *
  * @param list receives the list, which the caller gives to DVSData_Free
- * @param alloc how the list allocates; null for the library's own way
- * @param release how it frees; null for the library's own way
+ * @param alloc how the list allocates; null, like `release`, for the library's own way
+ * @param release how it frees
  */
 QEX_ReturnStatus DVSData_Alloc(DVSDataHandle *list, DVSData_MemAlloc alloc,
                                DVSData_MemFree release);
@@ -66,7 +66,8 @@ QEX_ReturnStatus DVSData_Update(DVSDataHandle list, char const *name, void *data
 /**
  * Writes a list as one block, which is allocated with the list's own allocator.
  *
- * @param bytes receives the block, which the caller frees the same way
+ * @param bytes receives the block, which the caller frees the same way; what the library allocated
+ *              goes back through DVSQEX_DataFree
  * @param length receives its bytes
  * @param version version of the distributed switch to write for
  */

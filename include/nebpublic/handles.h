@@ -22,7 +22,10 @@ typedef void *DVSPortHandle;
 /** A list of named data items. DVSData_Free ends what DVSData_Alloc made. */
 typedef void *DVSDataHandle;
 
-/** An item of such a list, which owns it. */
+/**
+ * A property of the state as it was when it was looked up. The library owns it; it stays as it is
+ * until the same property is looked up or walked over again.
+ */
 typedef void *DVSDataItem;
 
 /**

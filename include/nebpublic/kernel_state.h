@@ -33,7 +33,10 @@ QEX_ReturnStatus DVSQEX_StateGet(void **state, int *length);
 /** Hands out the part of the state that survives a restart of the host. */
 QEX_ReturnStatus DVSQEX_PersistentStateGet(void **state, int *length);
 
-/** Drops what the state holds of switches and ports that are gone. */
+/**
+ * Drops ports of type DVSPORT_TYPE_ZOMBIE, and switches that neither run on this host nor survive a
+ * restart of it.
+ */
 QEX_ReturnStatus DVSQEX_StateSanitize(void);
 
 /** Empties the state. */
@@ -47,7 +50,8 @@ QEX_ReturnStatus DVSQEX_StateCleanup(void);
 void DVSQEX_DataFree(void *data);
 
 /**
- * Adds a switch.
+ * Adds a switch, which survives a restart and does not run on this host before
+ * DVSQEX_SwitchAssociate.
  *
  * @param switchId identifier of the new switch; QEX_EXISTS if it is taken
  * @param alias its name; QEX_EXISTS if it is taken
@@ -71,7 +75,7 @@ QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion versio
 /** Sets how many ports a switch has room for. */
 QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts);
 
-/** Hands out the ports of one type. */
+/** Hands out the ports of one type, uplink ports among them. */
 QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type);
 
 /**
@@ -155,9 +159,10 @@ QEX_ReturnStatus DVSQEX_UplinkDataSet(char const *switchId, char const *key, qex
                                       void *data, int length, qex_uint32 propertyType);
 
 /**
- * Puts the global properties that this kind of switch adds into `list`.
+ * Puts the global properties that this kind of switch adds into a new list at `list`.
  *
- * Here and in the calls below, the caller gives the list to DVSData_Free.
+ * Here and in the calls below, the library makes the list in its own memory and the caller gives it
+ * to DVSData_Free.
  */
 QEX_ReturnStatus DVSQEX_VendorGlobalPropList(char const *switchId, DVSDataHandle *list,
                                              qex_uint32 propertyTypes);

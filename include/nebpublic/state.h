@@ -6,7 +6,8 @@
  * The host's copy of the distributed-switch state, read in place: DVSState_*.
  *
  * Handles that a call gives point into the state; nothing frees them, a reset ends them. Texts are
- * NUL-terminated UTF-8 and are only read.
+ * NUL-terminated UTF-8 and are only read. A walk over a null handle, or with a null callback, does
+ * nothing. A callback may call the host and may change what is walked over.
  */
 
 #include "nebpublic/handles.h"

@@ -53,9 +53,9 @@ QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
 QEX_ReturnStatus VSDVS_DestroyVSwitch(char const *switchName);
 
 /**
- * Adds a port to a switch.
+ * Adds a port to a switch; QEX_LIMIT_EXCEEDED if the switch has no room for another.
  *
- * @param port identifier of the new port; QEX_EXISTS if it is taken
+ * @param port identifier of the new port, 1 to 47 bytes; QEX_EXISTS if it is taken
  * @param connectId number that the port's client must show to connect; passed through unchanged
  */
 QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_uint32 connectId);
@@ -69,7 +69,7 @@ QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_u
 QEX_ReturnStatus VSDVS_AddOpaqueDVPort(char const *switchName, char const *port,
                                        char const *externalId);
 
-/** Removes a port with its properties. */
+/** Removes a port with its properties; QEX_BUSY for an uplink port with its uplink. */
 QEX_ReturnStatus VSDVS_RemoveDVPort(char const *switchName, char const *port);
 
 /** Puts the number that the running switch gave a port into `portID`. */
@@ -86,17 +86,26 @@ QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *aliasB
 QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPorts **names,
                                             VSUplinkPortIds **ids);
 
-/** Replaces the uplink ports of a switch; both lists hold as many entries. */
+/**
+ * Makes the uplink ports of a switch those with `ids`; both lists hold as many entries.
+ *
+ * A port that the switch has keeps its uplink and gets its new name, a new one has no uplink, and
+ * what is left out is removed. QEX_EXISTS for a name or an identifier twice.
+ */
 QEX_ReturnStatus VSDVS_SetSwitchUplinkPorts(char const *switchName, VSUplinkPorts const *names,
                                             VSUplinkPortIds const *ids);
 
-/** Attaches an uplink of the host to a switch; QEX_BUSY if another switch has it. */
+/**
+ * Attaches an uplink of the host to an uplink port of a switch that has none, or to a new one.
+ *
+ * @param uplink its name; QEX_EXISTS if the switch has it, QEX_BUSY if another does
+ */
 QEX_ReturnStatus VSDVS_AddSwitchUplinkPort(char const *switchName, char const *uplink);
 
-/** Takes an uplink from a switch. */
+/** Takes an uplink from a switch, with its uplink port. */
 QEX_ReturnStatus VSDVS_RemoveSwitchUplinkPort(char const *switchName, char const *uplink);
 
-/** Takes all uplinks from a switch. */
+/** Takes all uplinks and uplink ports from a switch. */
 QEX_ReturnStatus VSDVS_ClearSwitchUplinkPorts(char const *switchName);
 
 /** Reads the MTU of a switch, in bytes; VSPROP_MTU. */
@@ -117,7 +126,10 @@ QEX_ReturnStatus VSDVS_ClearTeamingPolicy(char const *switchName);
 /** VSDVS_GetTeamingPolicy for a switch that is named by its identifier. */
 QEX_ReturnStatus VSDVS_GetTeamingPolicyFromDVSID(char const *switchId, VSTeamPolicy *policy);
 
-/** Fills `policy` with the teaming of a port; VSPROP_PORT_TEAMING_POLICY. */
+/**
+ * Fills `policy` with the teaming of a port, its switch's if it has none of its own;
+ * VSPROP_PORT_TEAMING_POLICY.
+ */
 QEX_ReturnStatus VSDVS_GetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy *policy);
 
@@ -129,7 +141,8 @@ QEX_ReturnStatus VSDVS_SetPortTeamingPolicy(char const *switchName, char const *
 QEX_ReturnStatus VSDVS_ClearPortTeamingPolicy(char const *switchName, char const *port);
 
 /**
- * Reads the uplink port that a port uses whatever its teaming says; VSPROP_PORT_TEAMING_OVERRIDE.
+ * Reads the uplink port that a port uses whatever its teaming says, empty if there is none;
+ * VSPROP_PORT_TEAMING_OVERRIDE.
  *
  * @param overrideBuffer room for 82 bytes: at most 81 bytes of text and a NUL
  */
@@ -160,7 +173,7 @@ QEX_ReturnStatus VSDVS_SetMACLearning(char const *switchName, VSMACLearning cons
 /** Returns the MAC learning of a switch to the default. */
 QEX_ReturnStatus VSDVS_ClearMACLearning(char const *switchName);
 
-/** Fills `learning` with the MAC learning of a port. */
+/** Fills `learning` with the MAC learning of a port, a part of VSPROP_PORT_MAC_MANAGEMENT. */
 QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *port,
                                           VSPMACLearning *learning);
 
@@ -187,7 +200,10 @@ QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *por
 /** Leaves a port with the frames for its client. */
 QEX_ReturnStatus VSDVS_ClearExtraEthFilter(char const *switchName, char const *port);
 
-/** Reads whether a port takes the frames that no other port of its switch takes. */
+/**
+ * Reads whether a port takes the frames that no other port of its switch takes; the bit
+ * QEX_ETH_FILTER_SINK of VSPROP_PORT_EXTRA_ETH_FRP.
+ */
 QEX_ReturnStatus VSDVS_IsSinkPortEnabled(char const *switchName, char const *port,
                                          qex_Bool *enabled);
 
@@ -201,7 +217,10 @@ QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode);
 /** Sets how a switch filters multicast. */
 QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode);
 
-/** Hands out the VLANs of a port, and its priority; VSPROP_PORT_VLAN, VSPROP_PORT_PRIORITY. */
+/**
+ * Hands out the VLANs of a port, and its priority, -1 if it has none; VSPROP_PORT_VLAN,
+ * VSPROP_PORT_PRIORITY.
+ */
 QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *port,
                                          VSPortVlanPolicy **policy, int *priority);
 
@@ -210,11 +229,11 @@ QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *por
  *
  * The module passes every argument through unchanged.
  *
- * @param vlanID VLAN of untagged frames; 0 is none
+ * @param vlanID VLAN of untagged frames; 0 is none, QEX_BAD_VLANID for more than 4094
  * @param priority priority of the port's frames, 0 to 7; -1 leaves it to the frames
  * @param guestTagging whether the client tags its frames itself, with VLANs of the ranges
  * @param privateVlan whether `vlanID` is a secondary VLAN of the switch's private-VLAN map
- * @param ranges the VLANs of a trunk; null with none
+ * @param ranges the VLANs of a trunk in rising order, none with `privateVlan`; null with none
  * @param numRanges how many ranges
  */
 QEX_ReturnStatus VSDVS_SetPortVLANPolicy(char const *switchName, char const *port,
@@ -233,7 +252,10 @@ QEX_ReturnStatus VSDVS_GetPortNestedVLANTagging(char const *switchName, char con
 QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char const *port,
                                                 qex_Bool enabled);
 
-/** Hands out the private-VLAN map of a switch as an array of `count` entries; VSPROP_PVLAN_MAP. */
+/**
+ * Hands out the private-VLAN map of a switch as an array of `count` entries, null if there are none;
+ * VSPROP_PVLAN_MAP.
+ */
 QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry **entries,
                                          int *count);
 
