@@ -253,8 +253,8 @@ QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char con
                                                 qex_Bool enabled);
 
 /**
- * Hands out the private-VLAN map of a switch as an array of `count` entries, null if there are none;
- * VSPROP_PVLAN_MAP.
+ * Hands out the private-VLAN map of a switch as an array of `count` entries, null if there are
+ * none; VSPROP_PVLAN_MAP.
  */
 QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry **entries,
                                          int *count);
