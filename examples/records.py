@@ -5,7 +5,7 @@ Needs no switch: everything here happens in the tool's own memory. Prints what i
 """
 
 import ctypes
-from typing import Any, Iterator, Tuple
+from typing import Any, Dict, Iterator, Tuple, Union
 
 import _libvswitch as vs
 
@@ -74,13 +74,18 @@ def show_mirror_table() -> None:
 
 # A runtime options list is a length and the options behind it, one after the other.
 
-OPTIONS = {"MaxRARPsPerInterval": 20, "AllowFastPath": 1, "IGMPRouterIP": "192.0.2.1"}
+OPTIONS: Dict[str, Union[int, str]] = {
+    "MaxRARPsPerInterval": 20,
+    "AllowFastPath": 1,
+    "IGMPRouterIP": "192.0.2.1",
+}
 
 
 def build_options() -> Any:
     """Writes each option where the one before it ended."""
     options = vs.new_VSRuntimeOptions(64)
-    first = at = vs.VSRuntimeOptions_get_first_option(options)
+    first = vs.VSRuntimeOptions_get_first_option(options)
+    at: Any = first
     for name, value in OPTIONS.items():
         kind = vs.get_runtime_option_type_from_name(name)
         if isinstance(value, int):
@@ -97,7 +102,7 @@ def show_options() -> None:
     heading("A runtime options list")
     options = build_options()
     print(f"{vs.VSRuntimeOptions_totalLength_get(options)} bytes")
-    option = vs.VSRuntimeOptions_get_first_option(options)
+    option: Any = vs.VSRuntimeOptions_get_first_option(options)
     while option is not None:
         name = vs.VSRuntimeOptionHeader_get_option_name(option)
         value = vs.VSRuntimeOptionHeader_get_option_value(option)

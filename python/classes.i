@@ -6,6 +6,8 @@
 //   %counted(RECORD::field, count)  an array without a size, and the field that counts its elements
 //   %answers(METHOD, type)        what a method answers, where the definitions only say an object
 
+//   %null(METHOD, when)           that it answers null never, or only on a failure
+
 %module libvswitch
 
 %pythonbegin %{
@@ -26,6 +28,10 @@ from libvswitch._records import Record, Table
 
 %define %answers(METHOD, TYPE...)
 %feature("answers", "TYPE") METHOD;
+%enddef
+
+%define %null(METHOD, WHEN)
+%feature("null", "WHEN") METHOD;
 %enddef
 
 %table(VSUplinks, numEntries)
@@ -63,6 +69,21 @@ from libvswitch._records import Record, Table
 %answers(DVMirrorEntity::get_entity, str)
 %answers(VSDVMirrorSessionIDs::__getitem__, bytes)
 
+%null(VSUplinks::__getitem__, failure)
+%null(VSUplinkPorts::__getitem__, failure)
+%null(VSUplinkPortIds::__getitem__, failure)
+%null(VSTeamPolicy::__getitem__, failure)
+%null(VSPromiscSessionActiveDsts::__getitem__, failure)
+%null(DVMirrorSessionTable::__getitem__, failure)
+%null(DVMirrorSessionTable::get_first_session, never)
+%null(DVMirrorSessionTable::get_first_session_entity, never)
+%null(DVMirrorEntity::next, never)
+%null(VSRuntimeOptions::get_first_option, never)
+%null(VSRuntimeOptionHeader::get_option_name, never)
+%null(alloc_dvmirror_session_table, failure)
+%null(new_vidrangeArray, failure)
+%null(new_pvlanmapentryArray, failure)
+
 // Records that only show as views into their parent have no class to register.
 %ignore VSIOCtlQuery_mcastFilter;
 %ignore VSIOCtlQuery_uplink;
@@ -73,3 +94,9 @@ from libvswitch._records import Record, Table
 array of the caller's as well, only the status.";
 
 %include "libvswitch.i"
+
+// Every class has registered itself; nobody else is to.
+%pythoncode %{
+for _name in [_name for _name in globals() if _name.endswith("_swigregister")]:
+    del globals()[_name]
+%}

@@ -61,6 +61,7 @@ class Parameter:
     is_output: bool  # the wrapper owns it and appends its value to the result
     output_record: str  # of an output that is a record: under which type it is answered
     is_required: bool  # null is refused
+    is_bytes: bool  # the inside of a bytes object
 
 
 @dataclass(frozen=True)
@@ -71,6 +72,8 @@ class Function:
     doc: str
     takes_more: bool = False
     answers: str = ""  # in Python, where the C type says nothing
+    owns_elements: bool = False  # answers a new array
+    null: str = ""  # when it answers null: "never", only on "failure", or in the course of things
 
     @property
     def inputs(self) -> List[Parameter]:
@@ -213,6 +216,8 @@ def _function(node: ET.Element, seen: _Attributes) -> Function:
         _text(seen),
         takes_more=len(named) != len(parameters),
         answers=seen.get("feature_answers", ""),
+        owns_elements=seen.get("feature_new") == "1",
+        null=seen.get("feature_null", ""),
     )
 
 
@@ -231,6 +236,7 @@ def _parameters(node: ET.Element) -> Tuple[Parameter, ...]:
                 is_output=seen.get("tmap_in_numinputs") == "0",
                 output_record=answered.group(1) if answered else "",
                 is_required="tmap_check" in seen,
+                is_bytes="PyBytes_AsString" in seen.get("tmap_in", ""),
             )
         )
     # An argument of several C parameters is one of Python's.

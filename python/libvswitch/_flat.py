@@ -7,12 +7,15 @@ show alive, and calls that note which door takes back what they hand out.
 
 import ctypes
 from functools import wraps
-from typing import Any, Callable, Dict, Optional
+from typing import Any, Callable, Dict, List, Optional
 
 import _libvswitch
 from libvswitch import _layout, _memory, _records
 from libvswitch._ownership import DOORS, door_of, hand_out, release
 from libvswitch.cells import Callback, Cell, cell_behind
+
+# For the generated classes, which name what they want.
+__all__: List[str] = []
 
 _Function = Callable[..., Any]
 _here: Dict[str, Any] = globals()
@@ -49,9 +52,11 @@ def _truth(reader: _Function) -> _Function:
 def _array(record: str, reader: _Function, element: str, inner: int, count: Any) -> _Function:
     length: Optional[Callable[[Any], int]] = None if count is None else _length(record, count)
 
-    def read(owner: Any) -> _records.Array:
+    def read(owner: Any) -> "_records.Array[Any]":
         pointer = reader(owner)
-        array = _records.Array(pointer, element, length(owner) if length else None, inner)
+        array: _records.Array[Any] = _records.Array(
+            pointer, element, length(owner) if length else None, inner
+        )
         _records.place_in(owner, array)
         return array
 
@@ -187,7 +192,7 @@ def _allocating(make: _Function, door: str) -> _Function:
 def _new_array(make: _Function, element: str) -> _Function:
     """Elements of the caller's own: an array that knows its length and frees itself."""
 
-    def new(length: int) -> _records.Array:
+    def new(length: int) -> "_records.Array[Any]":
         made = make(length)
         if made is None:
             raise MemoryError(f"no memory for {length} elements")
@@ -212,7 +217,7 @@ def _private_vlan_map(call: _Function) -> _Function:
         status, entries, count = call(*arguments)
         if entries is not None:
             place = _records.record_at("VSPvlanMapEntry", int(entries))
-            array = _records.Array(place.this, "VSPvlanMapEntry", count)
+            array: _records.Array[Any] = _records.Array(place.this, "VSPvlanMapEntry", count)
             hand_out(array, door_of("VSDVS_GetPrivateVLANMap"))
             entries = array
         return status, entries, count

@@ -1,9 +1,12 @@
 """Memory of the library: through which door it goes back, once."""
 
-from typing import Any, Callable, Generic, Iterator, Optional, TypeVar, Union
+import typing
+from typing import Any, Callable, Optional, TypeVar, Union
 
 import _libvswitch
 from libvswitch import _records
+
+__all__ = ["DOORS", "door_of", "hand_out", "owned", "release"]
 
 T = TypeVar("T")
 Door = Union[str, Callable[[Any], Any]]
@@ -46,7 +49,7 @@ def release(given: Any, free: Callable[[Any], Any]) -> None:
         _records.end(given)
 
 
-class owned(Generic[T]):
+class owned(typing.Generic[T]):
     """Library memory for the time of a block: `with owned(VSQEX_GetUplinks('tour')) as result:`.
 
     Takes the result of a call, or a record, an array, a cell or a pointer of one, and gives what
@@ -83,7 +86,7 @@ class owned(Generic[T]):
         return free
 
 
-def _pointing(result: Any) -> Iterator[Any]:
+def _pointing(result: Any) -> typing.Iterator[Any]:
     if isinstance(result, (tuple, list)):
         for one in result:
             yield from _pointing(one)

@@ -1,10 +1,15 @@
 """What all classes share: printing, keeping memory alive, sequences and arrays of records."""
 
 import ctypes
+import typing
 import weakref
-from typing import Any, ClassVar, Dict, Iterator, List, Optional, Sequence, Tuple, Type
+from typing import Any, ClassVar, Dict, List, Optional, Tuple, Type, TypeVar, overload
 
 from libvswitch import _layout, _memory, _pointers
+
+__all__ = ["Array", "CLASSES", "Record", "Table", "end", "place_in", "record_at", "wrap"]
+
+T = TypeVar("T")
 
 CLASSES: Dict[str, Type["Record"]] = {}
 
@@ -66,6 +71,7 @@ class Record(_Pointing):
     """
 
     thisown: bool
+    __swig_destroy__: ClassVar[Any]
     _fields: ClassVar[Tuple[str, ...]] = ()
 
     def __init_subclass__(cls) -> None:
@@ -79,10 +85,11 @@ class Record(_Pointing):
         hidden = f"_{cls.__name__.lstrip('_')}__"
         for name in [name for name in members if name.startswith(hidden)]:
             setattr(cls, name[len(hidden) - 2 :], members[name])
-            delattr(cls, name)
         cls._fields = tuple(
-            name for name, member in vars(cls).items() if isinstance(member, property)
-        )[1:]
+            name
+            for name, member in vars(cls).items()
+            if isinstance(member, property) and name != "thisown" and not name.startswith(hidden)
+        )
         # An access by index alone would let Python iterate without an end.
         if "__getitem__" in vars(cls) and not issubclass(cls, Table):
             cls.__iter__ = None  # type: ignore[attr-defined]
@@ -117,10 +124,10 @@ class Record(_Pointing):
             raise ValueError(f"this {type(self).__name__} is gone: its memory was given back")
 
 
-class Table(Record):
+class Table(Record, typing.Generic[T]):
     """A record that is a sequence: it has a length, elements by index, and can be iterated."""
 
-    def __iter__(self) -> Iterator[Any]:
+    def __iter__(self) -> typing.Iterator[T]:
         for index in range(len(self)):
             yield self[index]
 
@@ -129,11 +136,11 @@ class Table(Record):
         count = _layout.TABLES[type(self).__name__]
         return int(count) if count.isdigit() else int(getattr(self, count))
 
-    def __getitem__(self, index: int) -> Any:
+    def __getitem__(self, index: int) -> T:
         raise NotImplementedError
 
 
-class Array(_Pointing, Sequence[Any]):
+class Array(_Pointing, typing.Sequence[T]):
     """Elements of one C type, one after the other in memory.
 
     Numbers read as `int`, arrays of chars as `str`, arrays of bytes as `bytes`, records as views.
@@ -170,12 +177,12 @@ class Array(_Pointing, Sequence[Any]):
             return _memory.RECORD_SIZES[self._element]
         return ctypes.sizeof(_memory.scalar(self._element))
 
-    def first(self, count: int) -> "Array":
+    def first(self, count: int) -> "Array[T]":
         """The same array with a length that the caller knows."""
         if count < 0:
             raise ValueError("a length is not negative")
         self._require()
-        shorter = Array(self.this, self._element, count, self._inner, self._address)
+        shorter: Array[T] = Array(self.this, self._element, count, self._inner, self._address)
         place_in(self, shorter)
         return shorter
 
@@ -185,9 +192,17 @@ class Array(_Pointing, Sequence[Any]):
             raise TypeError("only the data around this array tells its length; see first()")
         return self._count
 
-    def __iter__(self) -> Iterator[Any]:
+    def __iter__(self) -> typing.Iterator[T]:
         for index in range(len(self)):
             yield self[index]
+
+    @overload
+    def __getitem__(self, index: int) -> T:
+        ...
+
+    @overload
+    def __getitem__(self, index: slice) -> List[T]:
+        ...
 
     def __getitem__(self, index: Any) -> Any:
         if isinstance(index, slice):
@@ -200,6 +215,14 @@ class Array(_Pointing, Sequence[Any]):
         if self._element in CLASSES:
             return place_in(self, record_at(self._element, address))
         return _memory.scalar(self._element).from_address(address).value
+
+    @overload
+    def __setitem__(self, index: int, value: T) -> None:
+        ...
+
+    @overload
+    def __setitem__(self, index: slice, value: typing.Iterable[T]) -> None:
+        ...
 
     def __setitem__(self, index: Any, value: Any) -> None:
         if isinstance(index, slice):
@@ -235,7 +258,7 @@ class Array(_Pointing, Sequence[Any]):
         """Whether the elements are equal to those of another sequence."""
         if isinstance(other, bytes):
             return bytes(self) == other
-        if isinstance(other, Sequence):
+        if isinstance(other, typing.Sequence):
             return list(self) == list(other)
         return NotImplemented
 

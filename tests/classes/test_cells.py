@@ -63,7 +63,7 @@ def test_a_record_behind_a_pointer(switch: str, switch_id: str) -> None:
     assert vs.VSQEX_GetLAGTable(switch, lags.pointer) == vs.QEX_OK
     with vs.owned(lags):
         table = lags.value
-        assert table.numLAGs == 0
+        assert table is not None and table.numLAGs == 0
     assert lags.value is None
     with pytest.raises(ValueError):
         table.numLAGs
@@ -72,12 +72,14 @@ def test_a_record_behind_a_pointer(switch: str, switch_id: str) -> None:
     kind = vs.DVSPORT_TYPE_ACTIVE
     assert vs.DVSQEX_SwitchPortList(switch_id, ports.pointer, kind) == vs.QEX_OK
     with vs.owned(ports.value) as found:
+        assert found is not None
         assert "web" in [port.dvPortId for port in found.dvPort]
 
     assert vs.VSDVS_AddOpaqueDVPort(switch, "opaque", "theirs") == vs.QEX_OK
     opaque = Cell("OpaqueDVPortData *")
     assert vs.DVSQEX_PortGetByExternalId(switch_id, "theirs", opaque.pointer) == vs.QEX_OK
     with vs.owned(opaque.value) as port:
+        assert port is not None
         assert (port.dvPortId, port.externalId) == ("opaque", "theirs")
 
 
@@ -159,7 +161,7 @@ def test_a_port_exists_or_not(switch_id: str) -> None:
         ("NEBVersion", 0, 2**32 - 1),
     ],
 )
-def test_numbers_within_their_type(type: str, least: int, most: int) -> None:
+def test_numbers_within_their_type(type: Any, least: int, most: int) -> None:
     for value in (least, most, 1):
         assert Cell(type, value).value == value
     for value in (least - 1, most + 1):
@@ -177,7 +179,7 @@ def test_bytes_are_numbers_of_one_byte() -> None:
 
 
 @pytest.mark.parametrize("type", ["", "nothing", "VSInfo", "nothing *", "float"])
-def test_what_no_cell_holds(type: str) -> None:
+def test_what_no_cell_holds(type: Any) -> None:
     with pytest.raises(TypeError):
         Cell(type)
 

@@ -30,12 +30,13 @@ def test_what_went_back_raises_when_used(switch: str) -> None:
     for use in uses(uplinks):
         with pytest.raises(ValueError):
             use()
-    for use in (
+    others: List[Callable[[], Any]] = [
         lambda: entries[0],
         lambda: len(entries),
         lambda: first.portID,
         lambda: name.string,
-    ):
+    ]
+    for use in others:
         with pytest.raises(ValueError):
             use()
     assert repr(uplinks) == "<VSUplinks that is gone>"

@@ -1,0 +1,118 @@
+"""The stubs say what is there, and the examples satisfy them."""
+
+import os
+import subprocess
+import sys
+from pathlib import Path
+from typing import List
+
+import pytest
+
+ROOT = Path(__file__).resolve().parents[2]
+FOLDER = Path(os.environ["BUILD_DIR"], "python")
+# Where Debian keeps mypy, whatever interpreter the module is built for.
+PYTHON = "/usr/bin/python3"
+
+
+def run(arguments: List[str], tmp_path: Path) -> "subprocess.CompletedProcess[str]":
+    environment = {**os.environ, "MYPYPATH": str(FOLDER), "PYTHONPATH": str(FOLDER)}
+    return subprocess.run(
+        arguments, cwd=tmp_path, env=environment, capture_output=True, text=True, timeout=300
+    )
+
+
+def check(program: str, tmp_path: Path) -> "subprocess.CompletedProcess[str]":
+    file = tmp_path / "program.py"
+    file.write_text(program, encoding="utf-8")
+    return run([PYTHON, "-m", "mypy", "--config-file=", "--strict", str(file)], tmp_path)
+
+
+@pytest.mark.parametrize("module", ["_libvswitch", "libvswitch"])
+def test_stubs_and_modules_have_no_difference(module: str, tmp_path: Path) -> None:
+    done = run([sys.executable, "-m", "mypy.stubtest", module], tmp_path)
+    assert done.returncode == 0, done.stdout + done.stderr
+    assert "Success: no issues found" in done.stdout
+
+
+def test_a_difference_would_be_found(tmp_path: Path) -> None:
+    for name in ("_libvswitch.pyi",):
+        text = (FOLDER / name).read_text(encoding="utf-8")
+        (tmp_path / name).write_text(f"{text}\ndef not_there() -> int: ...\n", encoding="utf-8")
+    environment = {**os.environ, "MYPYPATH": str(tmp_path), "PYTHONPATH": str(FOLDER)}
+    done = subprocess.run(
+        [sys.executable, "-m", "mypy.stubtest", "_libvswitch"],
+        cwd=tmp_path,
+        env=environment,
+        capture_output=True,
+        text=True,
+    )
+    assert done.returncode == 1
+    assert "_libvswitch.not_there is not present at runtime" in done.stdout
+
+
+def test_the_examples_satisfy_the_stubs(tmp_path: Path) -> None:
+    examples = sorted(map(str, (ROOT / "examples").glob("*.py")))
+    assert examples
+    done = run([PYTHON, "-m", "mypy", "--config-file=", "--strict", *examples], tmp_path)
+    assert done.returncode == 0, done.stdout + done.stderr
+
+
+PRECISE = """
+from typing import List, Optional, Tuple
+import _libvswitch as flat
+import libvswitch as vs
+
+status, uplinks = vs.VSQEX_GetUplinks("a")
+names: List[str] = [*uplinks]
+entry: vs.VSUplinks_entries = uplinks.entries[0]
+both: Tuple[int, int] = vs.VSDVS_GetMcastFilterMode("a")
+mtu = vs.Cell("qex_uint32")
+value: int = mtu.value
+ok: int = vs.VSDVS_GetMTU("a", mtu.pointer)
+lags = vs.Cell("VSLAGTable *")
+table: Optional[vs.VSLAGTable] = lags.value
+bits: List[int] = vs.VSVLANBitmap().bits[0:3]
+truth: bool = vs.VSMACEntry().aging
+with vs.owned(vs.VSQEX_GetUplinks("a")) as (_, found):
+    first: str = found[0]
+flat.VSInfo_mtu_set(vs.VSInfo(), 9000)
+vs.DVSState_SwitchForEach(lambda handle, context: True, None)
+"""
+
+
+def test_what_is_right_passes(tmp_path: Path) -> None:
+    done = check(PRECISE, tmp_path)
+    assert done.returncode == 0, done.stdout
+
+
+@pytest.mark.parametrize(
+    "wrong",
+    [
+        'vs.VSDVS_SetMTU("a", "9000")',
+        "vs.VSDVS_SetMTU(7, 9000)",
+        'vs.VSQEX_GetVSInfo("a", vs.VSStats())',
+        'vs.VSDVS_GetMTU("a", vs.Cell("qex_uint64").pointer)',
+        'vs.VSQEX_GetLAGTable("a", vs.Cell("DVPortList *").pointer)',
+        "vs.VSInfo().mut",
+        'vs.VSInfo().mtu = "9000"',
+        'x: str = vs.VSQEX_GetVSInfo("a", vs.VSInfo())',
+        'vs.Cell("nothing")',
+        "for entry in vs.VSMACEntry(): pass",
+        "flat.VSInfo_mtu_get(flat.new_VSStats())",
+        "flat.VSInfo_mtu_get(None)",
+        'a, b, c = flat.VSQEX_GetUplinks("a")',
+        "vs.QEX_OK = 1",
+        'vs.VSVLANBitmap().bits[0] = "1"',
+    ],
+)
+def test_what_is_wrong_is_found(wrong: str, tmp_path: Path) -> None:
+    done = check(f"import _libvswitch as flat\nimport libvswitch as vs\n{wrong}\n", tmp_path)
+    assert done.returncode == 1, done.stdout
+    assert "error: " in done.stdout and "program.py:3:" in done.stdout
+
+
+def test_the_stubs_carry_the_documentation() -> None:
+    text = (FOLDER / "libvswitch" / "_classes.pyi").read_text(encoding="utf-8")
+    assert "Sets the MTU of a switch: 1,280 to 9,190 bytes, else QEX_BAD_PARAM." in text
+    assert "how many ranges" in text
+    assert (FOLDER / "libvswitch" / "py.typed").exists()
