@@ -1,9 +1,12 @@
 """Where the tests of the comparison find what was built."""
 
 import os
+import sys
 from pathlib import Path
 
 import pytest
+
+sys.path.append(str(Path(__file__).resolve().parents[1] / "tests" / "surface"))
 
 
 @pytest.fixture(name="build", scope="session")

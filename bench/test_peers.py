@@ -2,16 +2,19 @@
 
 import json
 import os
+import re
 import subprocess
 import sys
 from pathlib import Path
 from typing import Any, Dict
 
+import functions
 import pytest
 import targets
 from figures import EXPECTED, FIGURES, FORMS
 
 HERE = Path(__file__).resolve().parent
+ROOT = HERE.parent
 
 FAILURES = """
 import json, sys
@@ -126,6 +129,16 @@ def test_every_peer_answers_the_same_for_every_figure(quick: Dict[str, Any]) -> 
     assert quick["calls"]["answers"] == expected
 
 
+def test_stock_frame_knows_the_vocabulary_of_the_definitions(tmp_path: Path) -> None:
+    source = tmp_path / "stock.c"
+    folders = [HERE / "surfaces" / "stock", ROOT / "interface", ROOT / "include", ROOT]
+    command = ["swig", "-python", *(f"-I{folder}" for folder in folders), "-outdir", tmp_path]
+    subprocess.run([*command, "-o", source, folders[0] / "stock_surface.i"], check=True)
+    made = set(re.findall(r'^\t \{ "(\w+)", ', source.read_text(), flags=re.M))
+    expected = {function.name for function in functions.read() if function.kind != "runtime"}
+    assert expected <= made
+
+
 def test_every_figure_of_every_peer_is_measured(quick: Dict[str, Any]) -> None:
     times = quick["calls"]["times"]
     assert {form: set(figures) for form, figures in times.items()} == {
@@ -158,6 +171,6 @@ def test_peer_by_hand_fails_like_the_module(build: Path) -> None:
 @pytest.mark.parametrize("module", ["_libvswitch", "handwritten"])
 def test_call_trap_is_armed(build: Path, module: str) -> None:
     host = build / "tests" / "recording_host"
-    contract = HERE.parent / "tests" / "contract"
+    contract = ROOT / "tests" / "contract"
     folders = build / "python", build / "bench" / "peers", contract
     assert run(PANIC, module, host, *folders) == "the host gives up; 0 0"

@@ -30,6 +30,10 @@
 %array_functions(TYPE, NAME)
 %enddef
 
+// Arguments.
+
+%define %array_argument(PARAMETER...)
+%enddef
 #define %bad_argument(kind, type) %argument_fail(SWIG_TypeError, type, $symname, $argnum)
 
 // Results.
