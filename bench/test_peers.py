@@ -132,8 +132,9 @@ def test_every_peer_answers_the_same_for_every_figure(quick: Dict[str, Any]) -> 
 def test_stock_frame_knows_the_vocabulary_of_the_definitions(tmp_path: Path) -> None:
     source = tmp_path / "stock.c"
     folders = [HERE / "surfaces" / "stock", ROOT / "interface", ROOT / "include", ROOT]
-    command = ["swig", "-python", *(f"-I{folder}" for folder in folders), "-outdir", tmp_path]
-    subprocess.run([*command, "-o", source, folders[0] / "stock_surface.i"], check=True)
+    command = ["swig", "-python", *(f"-I{folder}" for folder in folders)]
+    output = ["-outdir", str(tmp_path), "-o", str(source)]
+    subprocess.run([*command, *output, str(folders[0] / "stock_surface.i")], check=True)
     made = set(re.findall(r'^\t \{ "(\w+)", ', source.read_text(), flags=re.M))
     expected = {function.name for function in functions.read() if function.kind != "runtime"}
     assert expected <= made
