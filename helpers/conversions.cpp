@@ -184,26 +184,25 @@ int text_from_str(PyObject *str, char **text, size_t *size) {
   return kConverted;
 }
 
-int char_array_from_str(PyObject *str, char *array, size_t capacity) {
+int array_text_from_str(PyObject *str, size_t capacity, ArrayText *text) {
   Utf8 const utf8 = utf8_of(str);
   if (utf8.failure != kConverted) {
     return utf8.failure;
   }
-  return char_array_from_text(utf8.bytes.data(), utf8.bytes.size() + 1, array, capacity);
+  *text = {utf8.bytes.data(), utf8.bytes.size() + 1};
+  return fit_array_text(capacity, text);
 }
 
-int char_array_from_text(char const *text, size_t size, char *array, size_t capacity) {
-  size_t const needed = capacity == 1 && size == 2 ? 1 : size;
-  if (needed > capacity) {
-    return kWrongType;
+int array_text_from_chars(char const *chars, size_t capacity, ArrayText *text) {
+  *text = {chars, chars != nullptr ? std::strlen(chars) + 1 : 0};
+  return fit_array_text(capacity, text);
+}
+
+void store_array_text(char *array, size_t capacity, ArrayText text) {
+  if (text.size != 0) {
+    std::memmove(array, text.bytes, text.size);
   }
-  if (array != nullptr) {
-    if (needed != 0) {
-      std::memcpy(array, text, needed);
-    }
-    std::memset(array + needed, 0, capacity - needed);
-  }
-  return kConverted;
+  std::memset(array + text.size, 0, capacity - text.size);
 }
 
 EXPORTED size_t SWIG_strnlen(const char *s, size_t maxlen) {

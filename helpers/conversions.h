@@ -58,17 +58,30 @@ int char_from_object(PyObject *object, char *value);
  */
 int text_from_str(PyObject *str, char **text, size_t *size);
 
+/** A text on its way into an array of chars; null bytes are no text. */
+typedef struct ArrayText {
+  char const *bytes; /**< somebody else's: valid while the object that was read lives */
+  size_t size;       /**< bytes to store, the NUL counted */
+} ArrayText;
+
 /**
- * The UTF-8 bytes of a `str` in an array of `capacity` chars, zero-filled behind the text.
+ * A text for an array of `capacity` chars: of a `str`, or of C chars that end with a NUL.
  *
  * Text and NUL must fit, except that an array of one char takes a one-byte text without its NUL.
- * The object must be a `str`; `array` may be null.
  */
-int char_array_from_str(PyObject *str, char *array, size_t capacity);
+int array_text_from_str(PyObject *str, size_t capacity, ArrayText *text);
+int array_text_from_chars(char const *chars, size_t capacity, ArrayText *text);
 
-/** As `char_array_from_str`, from `size` bytes of C text that count their NUL; 0 bytes are no text.
- */
-int char_array_from_text(char const *text, size_t size, char *array, size_t capacity);
+/** Whether a text fits, and if so how much of it is stored; the rule behind the two above. */
+static inline int fit_array_text(size_t capacity, ArrayText *text) {
+  if (capacity == 1 && text->size == 2) {
+    text->size = 1;
+  }
+  return text->size <= capacity ? kConverted : kWrongType;
+}
+
+/** Stores a text that fits, with zeros to the end of the array. It may lie in the array itself. */
+void store_array_text(char *array, size_t capacity, ArrayText text);
 
 /** The number of chars before the first NUL of `s`, of which no more than `maxlen` are read. */
 size_t SWIG_strnlen(const char *s, size_t maxlen);

@@ -77,15 +77,37 @@ static inline bool is_ascii_text(PyObject *object, char const **text, size_t *le
   return false;
 }
 
+/** Copies `SIZE` bytes from both ends, which together cover any length from `SIZE` to twice that.
+ */
+#define COPY_BOTH_ENDS(SIZE)                      \
+  do {                                            \
+    char tail[SIZE];                              \
+    memcpy(tail, source + length - (SIZE), SIZE); \
+    memcpy(target, source, SIZE);                 \
+    memcpy(target + length - (SIZE), tail, SIZE); \
+  } while (0)
+
 /**
- * Copies `length` bytes, fewer than 256.
- *
- * The compiler must not learn that bound: it would copy with a string instruction, whose start
- * alone takes longer than the library's copy of a short text.
+ * Copies `length` bytes, at least one. Names are mostly short, and a call for each is what a copy
+ * costs; the compiler would make it a string instruction, which costs more.
  */
 static inline void copy_short(char *target, char const *source, size_t length) {
-  __asm__("" : "+r"(length));
-  memcpy(target, source, length);
+  if (length > 32) {
+    __asm__("" : "+r"(length)); /* hides the bound */
+    memcpy(target, source, length);
+  } else if (length >= 16) {
+    COPY_BOTH_ENDS(16);
+  } else if (length >= 8) {
+    COPY_BOTH_ENDS(8);
+  } else if (length >= 4) {
+    COPY_BOTH_ENDS(4);
+  } else if (length >= 2) {
+    COPY_BOTH_ENDS(2);
+  } else {
+    *target = *source;
+  }
 }
+
+#undef COPY_BOTH_ENDS
 
 #endif

@@ -17,5 +17,6 @@
 %record_out_as(VSPvlanMapEntry **entries, VSUplinkPorts)  // VSDVS_GetPrivateVLANMap: the type
 %integer_out(int *count)                                // that tools have always been given
 %record_out(DVMirrorSessionTable **table)               // VSDVS_GetDVMirrorSessions
+%array_argument(char const sid[32])                     // VSDVS_RemoveDVMirrorSession
 
 %include "vswitch/configuration.h"

@@ -17,6 +17,9 @@
 // One C function under two shapes: with a text behind the status, or with an array of the caller's
 // whose contents are discarded.
 %text_out(char *portsetBuffer, 128)
+%array_argument(char switchId[64])                      // DVSAliasToSwitchId
+%array_argument(char alias[128])                        // DVSPortsetNameToAlias
+%array_argument(char portsetName[128])                  // DVSAliasToPortsetName
 %include "nebpublic/names.h"
 QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128]);
 

@@ -16,8 +16,18 @@ static struct {
   PyObject *objects[KEPT_OBJECTS];
 } kept;
 
+/* A kept object still has its type; what it lost is its only reference. */
+static inline PyObject *revived(PyObject *object) {
+#if defined(Py_REF_DEBUG) || defined(Py_TRACE_REFS) || PY_VERSION_HEX < 0x03090000
+  return PyObject_Init(object, Py_TYPE(object));
+#else
+  Py_SET_REFCNT(object, 1);
+  return object;
+#endif
+}
+
 static inline PyObject *kept_or_new(PyTypeObject *type) {
-  return type == kept.type && kept.count > 0 ? PyObject_Init(kept.objects[--kept.count], type)
+  return type == kept.type && kept.count > 0 ? revived(kept.objects[--kept.count])
                                              : _PyObject_New(type);
 }
 

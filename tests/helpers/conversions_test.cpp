@@ -178,40 +178,67 @@ TEST(Text, RefusesWhatUtf8CannotEncode) {
   EXPECT_EQ("", take_error_type());
 }
 
-TEST(CharArray, HoldsOneCharLessThanItsCapacity) {
+/// Stores the text of a Python expression into an array as a writer does; the failure otherwise.
+int store(std::string const &expression, std::vector<char> &array) {
+  Object const object = python(expression);
+  ArrayText text = {};
+  int const kind = array_text_from_str(object.get(), array.size(), &text);
+  if (kind == kConverted) {
+    store_array_text(array.data(), array.size(), text);
+  }
+  return kind;
+}
+
+std::string held(std::vector<char> const &array) {
+  return {array.begin(), array.end()};
+}
+
+TEST(ArrayTextOfStr, TakesOneByteLessThanTheCapacity) {
   std::vector<char> array(5, 'x');
-  EXPECT_EQ(kConverted, char_array_from_str(python("'abcd'").get(), array.data(), 5));
-  EXPECT_EQ(std::string({'a', 'b', 'c', 'd', '\0'}), std::string(array.data(), 5));
-  EXPECT_EQ(kWrongType, char_array_from_str(python("'abcde'").get(), array.data(), 5));
-  EXPECT_EQ(kWrongType, char_array_from_str(python("'abc\\u00e9'").get(), array.data(), 5));
-  EXPECT_EQ(std::string("abcd\0", 5), std::string(array.data(), 5)) << "refused: must be unchanged";
+  EXPECT_EQ(kConverted, store("'abcd'", array));
+  EXPECT_EQ(std::string({'a', 'b', 'c', 'd', '\0'}), held(array));
+  EXPECT_EQ(kWrongType, store("'abcde'", array));
+  EXPECT_EQ(kWrongType, store("'abc\\u00e9'", array));
+  EXPECT_EQ(kWrongType, store("'\\ud800'", array));
+  EXPECT_EQ(std::string({'a', 'b', 'c', 'd', '\0'}), held(array)) << "refused: must be unchanged";
 }
 
-TEST(CharArray, IsFilledWithZerosBehindTheText) {
-  std::vector<char> array(6, 'x');
-  EXPECT_EQ(kConverted, char_array_from_str(python("'ab'").get(), array.data(), 5));
-  EXPECT_EQ(std::string("ab\0\0\0x", 6), std::string(array.data(), 6));
+TEST(ArrayTextOfStr, IsFollowedByZeros) {
+  std::vector<char> array(5, 'x');
+  EXPECT_EQ(kConverted, store("'ab'", array));
+  EXPECT_EQ(std::string({'a', 'b', '\0', '\0', '\0'}), held(array));
 }
 
-TEST(CharArray, OfOneCharTakesOneByteWithoutANul) {
-  char array = 'x';
-  EXPECT_EQ(kConverted, char_array_from_str(python("'a'").get(), &array, 1));
-  EXPECT_EQ('a', array);
-  EXPECT_EQ(kConverted, char_array_from_str(python("''").get(), &array, 1));
-  EXPECT_EQ('\0', array);
-  EXPECT_EQ(kWrongType, char_array_from_str(python("'ab'").get(), &array, 1));
+TEST(ArrayTextOfStr, NeedsNoNulInAnArrayOfOneChar) {
+  std::vector<char> array(1, 'x');
+  EXPECT_EQ(kConverted, store("'a'", array));
+  EXPECT_EQ("a", held(array));
+  EXPECT_EQ(kConverted, store("''", array));
+  EXPECT_EQ(std::string({'\0'}), held(array));
+  EXPECT_EQ(kWrongType, store("'ab'", array));
 }
 
-TEST(CharArray, OfNoTextIsAllZeros) {
+TEST(ArrayTextOfChars, CountsItsNul) {
+  ArrayText text = {};
+  EXPECT_EQ(kConverted, array_text_from_chars("abcd", 5, &text));
+  EXPECT_EQ(5U, text.size);
+  EXPECT_EQ(kWrongType, array_text_from_chars("abcde", 5, &text));
+}
+
+TEST(ArrayTextOfChars, IsAllZerosWhereThereIsNoText) {
   std::vector<char> array(3, 'x');
-  EXPECT_EQ(kConverted, char_array_from_text(nullptr, 0, array.data(), 3));
-  EXPECT_EQ(std::string(3, '\0'), std::string(array.data(), 3));
+  ArrayText text = {"y", 1};
+  EXPECT_EQ(kConverted, array_text_from_chars(nullptr, array.size(), &text));
+  store_array_text(array.data(), array.size(), text);
+  EXPECT_EQ(std::string({'\0', '\0', '\0'}), held(array));
 }
 
-TEST(CharArray, IsOnlyTestedWithoutATarget) {
-  EXPECT_EQ(kConverted, char_array_from_str(python("'abcd'").get(), nullptr, 5));
-  EXPECT_EQ(kWrongType, char_array_from_str(python("'abcde'").get(), nullptr, 5));
-  EXPECT_EQ(kWrongType, char_array_from_str(python("'\\ud800'").get(), nullptr, 5));
+TEST(ArrayTextOfChars, MayComeFromTheArrayItself) {
+  std::vector<char> array = {'a', 'b', 'c', '\0', 'x'};
+  ArrayText text = {};
+  EXPECT_EQ(kConverted, array_text_from_chars(array.data() + 1, array.size(), &text));
+  store_array_text(array.data(), array.size(), text);
+  EXPECT_EQ(std::string({'b', 'c', '\0', '\0', '\0'}), held(array));
 }
 
 TEST(Strnlen, StopsAtTheFirstNulAndAtTheMaximum) {
