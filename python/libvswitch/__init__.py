@@ -43,7 +43,8 @@ def _load() -> None:
 
 
 def __getattr__(name: str) -> _Any:
-    if name in _MODULES or (name.startswith("__") and name != "__all__"):
+    # The parts of this package are found without loading it.
+    if name in _MODULES or (name.startswith("_") and name != "__all__"):
         raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
     _load()
     try:

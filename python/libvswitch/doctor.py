@@ -1,0 +1,347 @@
+"""Says what is loaded from where, and what is wrong: python3 -m libvswitch.doctor [--json]
+
+Looks at the files first and loads the module in a child process only, so that nothing which is
+wrong with it or with the host's libraries can end the doctor. The status is 0 if all is well, 1 if
+something has to be done, 2 for a wrong command line.
+"""
+
+import argparse
+import json
+import os
+import platform
+import signal
+import subprocess
+import sys
+import sysconfig
+from dataclasses import asdict, dataclass, field
+from importlib.machinery import EXTENSION_SUFFIXES, PathFinder
+from pathlib import Path
+from typing import Any, Dict, List, Optional, Sequence, Set
+
+from libvswitch import _elf
+
+MODULE = "_libvswitch"
+HOST = ("libvswitch.so", "libnebPublic.so")
+OK, WARNING, ERROR = "ok", "warning", "error"
+_BUILD = "build one with ./dev build, or put its folder in PYTHONPATH"
+_TIMEOUT = 60
+
+# Loads the module, and answers which files that brought in and how large records are: as the
+# classes know it, and as the room shows that the flat constructors make.
+_CHILD = """
+import json, sys
+sys.path[:] = json.loads(sys.argv[1])
+import _libvswitch
+found = {"module": _libvswitch.__file__}
+with open("/proc/self/maps") as maps:
+    found["files"] = sorted({line.split(None, 5)[5].strip() for line in maps if ".so" in line})
+print(json.dumps(found), flush=True)
+import ctypes
+from libvswitch import _pointers
+libc = ctypes.CDLL(None)
+libc.malloc.restype = ctypes.c_void_p
+libc.malloc_usable_size.restype = ctypes.c_size_t
+# Memory that is used again may have some bytes to spare; the least of many has none.
+def room(addresses):
+    return min(libc.malloc_usable_size(ctypes.c_void_p(one)) for one in addresses)
+found["sizes"] = {}
+for name, size in _pointers.record_sizes().items():
+    try:
+        made = [getattr(_libvswitch, "new_" + name)() for _ in range(64)]
+    except TypeError:
+        continue  # it takes a size
+    plain = [libc.malloc(ctypes.c_size_t(size)) for _ in range(64)]
+    found["sizes"][name] = [room(map(int, made)), room(plain)]
+    for one in made:
+        getattr(_libvswitch, "delete_" + name)(one)
+print(json.dumps(found), flush=True)
+"""
+
+
+@dataclass
+class Finding:
+    level: str
+    about: str
+    text: str
+    advice: str = ""
+
+
+@dataclass
+class Report:
+    interpreter: Dict[str, str] = field(default_factory=dict)
+    module: Optional[str] = None
+    host: Dict[str, Optional[str]] = field(default_factory=dict)
+    simulated: Optional[bool] = None
+    missing_symbols: List[str] = field(default_factory=list)
+    findings: List[Finding] = field(default_factory=list)
+
+    def add(self, level: str, about: str, text: str, advice: str = "") -> None:
+        self.findings.append(Finding(level, about, text, advice))
+
+    @property
+    def is_well(self) -> bool:
+        return all(finding.level != ERROR for finding in self.findings)
+
+
+def examine() -> Report:
+    report = Report()
+    _interpreter(report)
+    module = _module(report)
+    if module is None:
+        return report
+    libraries = _host(report, module)
+    _symbols(report, module, libraries)
+    _load(report)
+    return report
+
+
+def _interpreter(report: Report) -> None:
+    report.interpreter = {
+        "executable": sys.executable,
+        "version": platform.python_version(),
+        "interface": str(sysconfig.get_config_var("SOABI")),
+        "machine": platform.machine(),
+    }
+    text = f"{sys.executable}, {platform.python_version()} ({report.interpreter['interface']})"
+    report.add(OK, "interpreter", text)
+
+
+def _module(report: Report) -> Optional[_elf.Elf]:
+    spec = PathFinder.find_spec(MODULE)
+    if spec is None or not spec.origin:
+        others = _of_other_interpreters()
+        if others:
+            report.add(
+                ERROR,
+                "module",
+                f"{others[0]} is for another interpreter than {sys.executable}, which loads "
+                f"{' or '.join(EXTENSION_SUFFIXES)}",
+                "run the interpreter it was built for, or ./dev build --python with this one",
+            )
+        else:
+            report.add(ERROR, "module", f"no {MODULE} in {_shown(sys.path)}", _BUILD)
+        return None
+    report.module = spec.origin
+    try:
+        elf = _elf.read(Path(spec.origin))
+    except (OSError, _elf.NotElf) as error:
+        report.add(ERROR, "module", f"cannot be read: {error}", _BUILD)
+        return None
+    if elf.machine != platform.machine():
+        report.add(
+            ERROR,
+            "module",
+            f"{spec.origin} is for {elf.machine}, this machine is {platform.machine()}",
+            "build it on this machine",
+        )
+        return None
+    report.add(OK, "module", spec.origin)
+    return elf
+
+
+def _of_other_interpreters() -> List[Path]:
+    return [
+        file
+        for folder in sys.path
+        for file in sorted(Path(folder or ".").glob(f"{MODULE}*.so"))
+        if file.is_file()
+    ]
+
+
+def _shown(folders: Sequence[str]) -> str:
+    return ", ".join(folder or "the current folder" for folder in folders)
+
+
+def _host(report: Report, module: _elf.Elf) -> List[_elf.Elf]:
+    """The host's libraries where the loader will find them."""
+    found = []
+    for name in HOST:
+        report.host[name] = None
+        if name not in module.needed:
+            report.add(WARNING, "host", f"the module does not ask for {name}", _BUILD)
+        for path in _candidates(name, module):
+            try:
+                machine = _elf.machine_of(path)
+                if machine != module.machine:
+                    raise _elf.NotElf(f"{path} is for {machine}, the module for {module.machine}")
+                found.append(_elf.read(path))
+            except (OSError, _elf.NotElf) as error:
+                report.add(
+                    ERROR,
+                    "host",
+                    f"{name}: {error}",
+                    "put this host's own library there, or take its folder out of LD_LIBRARY_PATH",
+                )
+                continue
+            report.host[name] = str(path)
+            report.add(OK, "host", f"{name}: {path}")
+            break
+        else:
+            report.add(
+                ERROR,
+                "host",
+                f"{name} is nowhere the loader looks",
+                "point LD_LIBRARY_PATH at the folder that holds it, or build the simulated host "
+                "with ./dev build",
+            )
+    return found
+
+
+def _candidates(name: str, module: _elf.Elf) -> List[Path]:
+    """Files of that name in the order in which the loader tries them."""
+    folders = [one or "." for one in os.environ.get("LD_LIBRARY_PATH", "").split(":") if one]
+    origin = str(module.path.resolve().parent)
+    for folder in module.runpath:
+        folders.append(folder.replace("$ORIGIN", origin).replace("${ORIGIN}", origin))
+    files = [Path(folder, name) for folder in folders] + _cached(name)
+    multiarch = str(sysconfig.get_config_var("MULTIARCH") or "")
+    for folder in ("/lib", "/usr/lib", "/lib64", "/usr/lib64"):
+        files += [Path(folder, multiarch, name), Path(folder, name)]
+    found: List[Path] = []
+    for file in files:
+        if file.is_file() and Path(os.path.abspath(file)) not in found:
+            found.append(Path(os.path.abspath(file)))
+    return found
+
+
+def _cached(name: str) -> List[Path]:
+    """What the loader's cache knows under that name."""
+    for program in ("/sbin/ldconfig", "/usr/sbin/ldconfig"):
+        try:
+            done = subprocess.run([program, "-p"], stdout=subprocess.PIPE, timeout=_TIMEOUT)
+        except (OSError, subprocess.SubprocessError):
+            continue
+        lines = done.stdout.decode("utf-8", "replace").splitlines()
+        return [
+            Path(line.split(" => ")[1]) for line in lines if line.strip().startswith(f"{name} ")
+        ]
+    return []
+
+
+def _symbols(report: Report, module: _elf.Elf, libraries: List[_elf.Elf]) -> None:
+    """Whether the host has every call that the module makes."""
+    if len(libraries) < len(HOST):
+        return
+    wanted = {name for name in module.wanted if not name.startswith(("Py", "_Py"))}
+    offered: Set[str] = set()
+    for library in libraries:
+        offered |= library.defined
+    report.missing_symbols = sorted(wanted - offered)
+    if report.missing_symbols:
+        report.add(
+            ERROR,
+            "symbols",
+            f"the host lacks {len(report.missing_symbols)} of {len(wanted)} calls: "
+            f"{', '.join(report.missing_symbols)}",
+            "the host's libraries are older than this module: update the host, or build the module "
+            "against them",
+        )
+    else:
+        report.add(OK, "symbols", f"the host has all {len(wanted)} calls")
+
+
+def _load(report: Report) -> None:
+    """What a child finds that loads the module as a tool would."""
+    try:
+        done = subprocess.run(
+            [sys.executable, "-c", _CHILD, json.dumps(sys.path)],
+            stdout=subprocess.PIPE,
+            stderr=subprocess.PIPE,
+            timeout=_TIMEOUT,
+        )
+    except (OSError, subprocess.SubprocessError) as error:
+        report.add(ERROR, "loading", f"no child process could load the module: {error}")
+        return
+    found: Dict[str, Any] = {}
+    for line in done.stdout.decode("utf-8", "replace").splitlines():
+        try:
+            found = json.loads(line)
+        except ValueError:
+            continue  # what the libraries print on their own
+    if done.returncode != 0 and "sizes" not in found:
+        _not_loaded(report, done.returncode, done.stderr.decode("utf-8", "replace"), found)
+    if found:
+        _loaded(report, [Path(name) for name in found["files"]])
+    if "sizes" in found:
+        _sizes(report, found["sizes"])
+
+
+def _not_loaded(report: Report, status: int, errors: str, found: Dict[str, Any]) -> None:
+    what = f"{MODULE} loads, its classes do not" if found else f"{MODULE} does not load"
+    if status < 0:
+        try:
+            ended = signal.Signals(-status).name
+        except ValueError:
+            ended = f"signal {-status}"
+        report.add(
+            ERROR,
+            "loading",
+            f"{what}: the process ends with {ended}",
+            "the host's libraries fail as they start: see what they log, or try the simulated host",
+        )
+        return
+    last = (errors.strip().splitlines() or ["no reason given"])[-1]
+    advice = "" if any(one.level == ERROR for one in report.findings) else _BUILD
+    report.add(ERROR, "loading", f"{what}: {last}", advice or "see above")
+
+
+def _loaded(report: Report, files: List[Path]) -> None:
+    """Which libraries it really was, and whether they simulate."""
+    simulated = False
+    for file in files:
+        if file.name in HOST:
+            expected = report.host.get(file.name)
+            if expected and not os.path.samefile(expected, file):
+                report.add(WARNING, "host", f"{file.name} was loaded from {file} after all")
+            report.host[file.name] = str(file)
+        try:
+            if not simulated and not file.name.startswith(("libc.", "libpython")):
+                names = _elf.read(file).defined
+                simulated = any(name.startswith("simhost_") for name in names)
+        except (OSError, _elf.NotElf):
+            continue  # gone since, or nothing to look into
+    report.simulated = simulated
+    report.add(OK, "host", "the host is simulated" if simulated else "the host is a real one")
+
+
+def _sizes(report: Report, sizes: Dict[str, List[int]]) -> None:
+    """Whether module and classes lay out records alike, as far as the allocator can tell."""
+    wrong = sorted(name for name, (made, plain) in sizes.items() if made != plain)
+    if wrong or not sizes:
+        report.add(
+            ERROR,
+            "records",
+            f"module and classes disagree on the size of {', '.join(wrong) or 'all records'}",
+            "they are of different builds: install both from one",
+        )
+    else:
+        report.add(OK, "records", f"module and classes agree on the size of {len(sizes)} records")
+
+
+def show(report: Report) -> str:
+    lines = []
+    for finding in report.findings:
+        lines.append(f"{finding.level:<8} {finding.about:<12} {finding.text}")
+        if finding.advice:
+            lines.append(f"{'':<21} -> {finding.advice}")
+    lines.append("All is well." if report.is_well else "Something has to be done.")
+    return "\n".join(lines)
+
+
+def main(arguments: Optional[Sequence[str]] = None) -> int:
+    parser = argparse.ArgumentParser(
+        prog="python3 -m libvswitch.doctor",
+        description="Says which interpreter, module and host are loaded, and what is wrong.",
+    )
+    parser.add_argument("--json", action="store_true", help="write the report as JSON")
+    as_json = parser.parse_args(arguments).json
+    report = examine()
+    if as_json:
+        print(json.dumps({**asdict(report), "is_well": report.is_well}, indent=2))
+    else:
+        print(show(report))
+    return 0 if report.is_well else 1
+
+
+if __name__ == "__main__":
+    sys.exit(main())

@@ -1,0 +1,194 @@
+"""The doctor names what is wrong, survives it, and says what to do."""
+
+import json
+import os
+import shutil
+import subprocess
+import sys
+from pathlib import Path
+from typing import Any, Dict, List
+
+import pytest
+from libvswitch import _elf, doctor
+
+FOLDER = Path(os.environ["BUILD_DIR"], "python")
+SIMHOST = Path(os.environ["BUILD_DIR"], "simhost")
+HOST = ("libvswitch.so", "libnebPublic.so")
+
+
+def run(
+    python: Path = FOLDER, host: str = "", *arguments: str
+) -> "subprocess.CompletedProcess[str]":
+    environment = {**os.environ, "PYTHONPATH": str(python)}
+    environment.pop("LD_LIBRARY_PATH", None)
+    if host:
+        environment["LD_LIBRARY_PATH"] = host
+    return subprocess.run(
+        [sys.executable, "-m", "libvswitch.doctor", *arguments],
+        cwd="/",
+        env=environment,
+        capture_output=True,
+        text=True,
+        timeout=120,
+    )
+
+
+def report(done: "subprocess.CompletedProcess[str]") -> Dict[str, Any]:
+    assert done.stderr == ""
+    found: Dict[str, Any] = json.loads(done.stdout)
+    assert found["is_well"] == (done.returncode == 0)
+    return found
+
+
+def errors(found: Dict[str, Any]) -> List[str]:
+    return [one["about"] for one in found["findings"] if one["level"] == "error"]
+
+
+def text_of(found: Dict[str, Any], about: str) -> str:
+    return " ".join(one["text"] for one in found["findings"] if one["about"] == about)
+
+
+@pytest.fixture
+def elsewhere(tmp_path: Path) -> Path:
+    """A copy of the built package and module, where no host is beside them."""
+    shutil.copytree(FOLDER, tmp_path / "one" / "python")
+    return tmp_path / "one" / "python"
+
+
+def library(folder: Path, name: str, source: str) -> None:
+    folder.mkdir(exist_ok=True)
+    (folder / "library.c").write_text(source, encoding="ascii")
+    subprocess.run(
+        ["cc", "-shared", "-fPIC", f"-Wl,-soname,{name}", "-o", name, "library.c"],
+        cwd=folder,
+        check=True,
+    )
+
+
+def test_a_good_build_is_well() -> None:
+    done = run()
+    assert done.returncode == 0, done.stdout
+    for part in ("All is well.", sys.executable, str(FOLDER), "146 calls", "the host is simulated"):
+        assert part in done.stdout
+    found = report(run(FOLDER, "", "--json"))
+    assert found["simulated"] is True
+    assert found["missing_symbols"] == []
+    for name in HOST:
+        assert os.path.samefile(found["host"][name], SIMHOST / name)
+    assert "size of 85 records" in text_of(found, "records")
+
+
+def test_no_module(tmp_path: Path) -> None:
+    shutil.copytree(FOLDER / "libvswitch", tmp_path / "libvswitch")
+    found = report(run(tmp_path, "", "--json"))
+    assert errors(found) == ["module"]
+    assert "no _libvswitch in" in text_of(found, "module")
+
+
+def test_a_module_for_another_interpreter(elsewhere: Path) -> None:
+    (module,) = elsewhere.glob("_libvswitch*.so")
+    module.rename(elsewhere / "_libvswitch.cpython-27-x86_64-linux-gnu.so")
+    found = report(run(elsewhere, "", "--json"))
+    assert errors(found) == ["module"]
+    assert "is for another interpreter" in text_of(found, "module")
+
+
+def test_a_module_for_another_machine(elsewhere: Path) -> None:
+    (module,) = elsewhere.glob("_libvswitch*.so")
+    held = bytearray(module.read_bytes())
+    held[18] = 0xF3
+    module.write_bytes(held)
+    found = report(run(elsewhere, "", "--json"))
+    assert errors(found) == ["module"]
+    assert "is for riscv64, this machine is x86_64" in text_of(found, "module")
+
+
+@pytest.mark.parametrize("length", [0, 4, 64, 5000])
+def test_a_module_that_was_cut_off(elsewhere: Path, length: int) -> None:
+    (module,) = elsewhere.glob("_libvswitch*.so")
+    module.write_bytes(module.read_bytes()[:length])
+    assert errors(report(run(elsewhere, "", "--json"))) == ["module"]
+
+
+def test_no_host(elsewhere: Path) -> None:
+    found = report(run(elsewhere, "", "--json"))
+    assert errors(found) == ["host", "host", "loading"]
+    assert found["host"] == {name: None for name in HOST}
+    assert "LD_LIBRARY_PATH" in found["findings"][2]["advice"]
+
+
+def test_a_host_that_lacks_calls(elsewhere: Path, tmp_path: Path) -> None:
+    every = _elf.read(next(elsewhere.glob("_libvswitch*.so"))).wanted
+    calls = sorted(name for name in every if not name.startswith(("Py", "_Py")))
+    assert len(calls) == 146
+    lacking = {"VSDVS_GetMTU", "DVSData_Free"}
+    source = "".join(f"void {name}(void) {{}}\n" for name in calls if name not in lacking)
+    library(tmp_path / "host", "libvswitch.so", source)
+    library(tmp_path / "host", "libnebPublic.so", "")
+    found = report(run(elsewhere, str(tmp_path / "host"), "--json"))
+    assert errors(found) == ["symbols", "loading"]
+    assert found["missing_symbols"] == sorted(lacking)
+    assert "lacks 2 of 146 calls" in text_of(found, "symbols")
+
+
+def test_a_real_host_is_none_that_simulates(elsewhere: Path, tmp_path: Path) -> None:
+    every = _elf.read(next(elsewhere.glob("_libvswitch*.so"))).wanted
+    calls = sorted(name for name in every if not name.startswith(("Py", "_Py")))
+    library(tmp_path / "host", "libvswitch.so", "".join(f"void {n}(void) {{}}\n" for n in calls))
+    library(tmp_path / "host", "libnebPublic.so", "")
+    found = report(run(elsewhere, str(tmp_path / "host"), "--json"))
+    assert (errors(found), found["simulated"]) == ([], False)
+
+
+def test_a_host_for_another_machine(elsewhere: Path, tmp_path: Path) -> None:
+    host = tmp_path / "host"
+    host.mkdir()
+    for name in HOST:
+        held = bytearray((SIMHOST / name).read_bytes())
+        held[18] = 0xB7
+        (host / name).write_bytes(held)
+    found = report(run(elsewhere, str(host), "--json"))
+    assert "host" in errors(found)
+    assert "is for aarch64, the module for x86_64" in text_of(found, "host")
+
+
+def test_a_host_that_crashes_as_it_loads(tmp_path: Path, elsewhere: Path) -> None:
+    every = _elf.read(next(elsewhere.glob("_libvswitch*.so"))).wanted
+    calls = sorted(name for name in every if not name.startswith(("Py", "_Py")))
+    source = "".join(f"void {name}(void) {{}}\n" for name in calls)
+    source += "__attribute__((constructor)) static void start(void) { __builtin_trap(); }\n"
+    library(tmp_path / "host", "libvswitch.so", source)
+    library(tmp_path / "host", "libnebPublic.so", "")
+    found = report(run(elsewhere, str(tmp_path / "host"), "--json"))
+    assert errors(found) == ["loading"]
+    assert "the process ends with SIGILL" in text_of(found, "loading")
+
+
+def test_classes_of_another_build() -> None:
+    found = doctor.Report()
+    doctor._sizes(found, {"VSInfo": [232, 232], "VSStats": [120, 136]})
+    (finding,) = found.findings
+    assert (finding.level, finding.about) == ("error", "records")
+    assert "VSStats" in finding.text and "VSInfo" not in finding.text
+
+
+def test_the_doctor_does_not_load_what_it_examines() -> None:
+    """In its own process neither the module nor the host's libraries appear."""
+    program = (
+        "import runpy, sys; sys.argv = ['-m']\n"
+        "from libvswitch import doctor\n"
+        "doctor.examine()\n"
+        "loaded = open('/proc/self/maps').read()\n"
+        "print('_libvswitch' in sys.modules, 'libvswitch.so' in loaded)"
+    )
+    done = subprocess.run([sys.executable, "-c", program], capture_output=True, text=True)
+    assert (done.stdout, done.stderr) == ("False False\n", "")
+
+
+def test_importing_a_package_without_a_host_says_so(elsewhere: Path) -> None:
+    environment = {**os.environ, "PYTHONPATH": str(elsewhere)}
+    done = subprocess.run(
+        [sys.executable, "-c", "import libvswitch"], env=environment, capture_output=True, text=True
+    )
+    assert done.returncode == 1
+    assert "ImportError: libvswitch.so: cannot open shared object file" in done.stderr
