@@ -23,11 +23,11 @@ VSMACAddrType checked(VSMACAddrType type) {
 }
 
 Place team(Transaction &work, std::string_view alias) {
-  return {.switch_key = simhost::known_switch(work, alias).key, .port = std::nullopt};
+  return {.switch_key = simhost::running_switch(work, alias).key, .port = std::nullopt};
 }
 
 Place port_of(Transaction &work, std::string_view alias, std::string_view identifier) {
-  auto const key = simhost::known_switch(work, alias).key;
+  auto const key = simhost::running_switch(work, alias).key;
   return {.switch_key = key, .port = simhost::known_port(work, key, identifier).number};
 }
 

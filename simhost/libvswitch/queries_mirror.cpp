@@ -37,7 +37,7 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionIDs(char const *switchName, VSDVMirrorS
     auto const alias = required_text(switchName);
     auto &output = required(ids);
     auto &work = call.reading();
-    auto const key = simhost::known_switch(work, alias).key;
+    auto const key = simhost::running_switch(work, alias).key;
     std::vector<Sid> running;
     for (auto const &session : simhost::mirrors_of(work, key)) {
       auto const sid = sid_of(session);
@@ -57,7 +57,7 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char cons
     std::string const wanted(first, strnlen(first, sizeof(DVMirrorSID)));
     auto &output = required(stats);
     auto &work = call.reading();
-    auto const key = simhost::known_switch(work, alias).key;
+    auto const key = simhost::running_switch(work, alias).key;
     auto const sessions = simhost::mirrors_of(work, key);
     auto const found = std::find_if(sessions.begin(), sessions.end(),
                                     [&](auto const &session) { return session.sid() == wanted; });
@@ -84,7 +84,7 @@ QEX_ReturnStatus VSQEX_GetPromiscSessionActiveDsts(char const *switchName,
     auto const alias = required_text(switchName);
     auto &output = required(ports);
     auto &work = call.reading();
-    auto const active = simhost::promiscuous_ports(work, simhost::known_switch(work, alias).key);
+    auto const active = simhost::promiscuous_ports(work, simhost::running_switch(work, alias).key);
     output = simhost::give_list<VSPromiscSessionActiveDsts>(call, active);
   });
 }

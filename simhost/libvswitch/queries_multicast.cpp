@@ -35,7 +35,7 @@ std::size_t address_length(VSMcastFilterMode mode) {
 
 simhost::store::PortNumber port_of(simhost::store::Transaction &work, std::string_view alias,
                                    qex_SwitchPortID port) {
-  auto const key = simhost::known_switch(work, alias).key;
+  auto const key = simhost::running_switch(work, alias).key;
   return simhost::known_port(work, key, simhost::store::PortNumber{port}).number;
 }
 
@@ -92,7 +92,7 @@ QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode) {
     auto &output = required(mode);
     auto &work = call.reading();
     auto const owner =
-        simhost::store::PropertyOwner::global(simhost::known_switch(work, alias).key);
+        simhost::store::PropertyOwner::global(simhost::running_switch(work, alias).key);
     simhost::RecordProperty<int> const filter{.key = VSPROP_MULTICAST_FILTER,
                                               .unset = VS_MCAST_FILTER_MODE_LEGACY};
     output = simhost::read(work, owner, filter);

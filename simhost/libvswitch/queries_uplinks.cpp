@@ -22,7 +22,7 @@ void link_state(Call &call, char const *switch_name, char const *uplink, int *st
   auto const name = required_text(uplink);
   auto &output = required(state);
   auto &work = call.reading();
-  auto const key = simhost::known_switch(work, alias).key;
+  auto const key = simhost::running_switch(work, alias).key;
   bool const up = ask(work, simhost::known_uplink(work, key, name).name);
   output = up ? QEX_LINK_STATE_UP : QEX_LINK_STATE_DOWN;
 }
@@ -30,7 +30,7 @@ void link_state(Call &call, char const *switch_name, char const *uplink, int *st
 simhost::Counters switch_counters(Call &call, char const *switch_name) {
   auto const alias = required_text(switch_name);
   auto &work = call.reading();
-  return data_plane().counters(work, {.switch_key = simhost::known_switch(work, alias).key});
+  return data_plane().counters(work, {.switch_key = simhost::running_switch(work, alias).key});
 }
 
 std::size_t size_of(simhost::Lag const &lag) {
@@ -84,7 +84,7 @@ QEX_ReturnStatus VSQEX_SetUplinkAdminLinkState(char const *switchName, char cons
       simhost::refuse(QEX_BAD_PARAM);
     }
     auto &work = call.changing();
-    auto const key = simhost::known_switch(work, alias).key;
+    auto const key = simhost::running_switch(work, alias).key;
     auto const known = simhost::known_uplink(work, key, name);
     data_plane().set_admin_state(work, known.name, state == QEX_LINK_STATE_UP);
   });
@@ -95,7 +95,7 @@ QEX_ReturnStatus VSQEX_GetLAGTable(char const *switchName, VSLAGTable **table) {
     auto const alias = required_text(switchName);
     auto &output = required(table);
     auto &work = call.reading();
-    auto const lags = data_plane().lags(work, simhost::known_switch(work, alias).key);
+    auto const lags = data_plane().lags(work, simhost::running_switch(work, alias).key);
     std::size_t trailing = 0;
     for (auto const &lag : lags) {
       trailing += size_of(lag);

@@ -106,6 +106,10 @@ TEST_F(Ports, OfASwitchThatDoesNotRunHaveNoNumber) {
   EXPECT_EQ(VSDVS_DvPortIDToPortID("s", "p", &number), QEX_NOT_FOUND);
   VSInfo info{};
   EXPECT_EQ(VSQEX_GetVSInfo("s", &info), QEX_NOT_FOUND);
+  VSUplinks *list = nullptr;
+  EXPECT_EQ(VSQEX_GetUplinks("s", &list), QEX_NOT_FOUND);
+  VSMACTable *addresses = nullptr;
+  EXPECT_EQ(VSQEX_GetTeamMACTable("s", VS_MAC_ADDR_TYPE_ALL, &addresses), QEX_NOT_FOUND);
   EXPECT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK) << "it can still be configured";
   ASSERT_EQ(DVSQEX_SwitchAssociate("s-id"), QEX_OK);
   EXPECT_EQ(VSDVS_DvPortIDToPortID("s", "p", &number), QEX_OK);
