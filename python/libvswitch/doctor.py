@@ -6,6 +6,7 @@ something has to be done, 2 for a wrong command line.
 """
 
 import argparse
+import dataclasses
 import json
 import os
 import platform
@@ -13,10 +14,9 @@ import signal
 import subprocess
 import sys
 import sysconfig
-from dataclasses import asdict, dataclass, field
 from importlib.machinery import EXTENSION_SUFFIXES, PathFinder
 from pathlib import Path
-from typing import Any, Dict, List, Optional, Sequence, Set
+from typing import Any, Dict, List, Optional, Set
 
 from libvswitch import _elf
 
@@ -58,7 +58,7 @@ print(json.dumps(found), flush=True)
 """
 
 
-@dataclass
+@dataclasses.dataclass
 class Finding:
     level: str
     about: str
@@ -66,14 +66,14 @@ class Finding:
     advice: str = ""
 
 
-@dataclass
+@dataclasses.dataclass
 class Report:
-    interpreter: Dict[str, str] = field(default_factory=dict)
+    interpreter: Dict[str, str] = dataclasses.field(default_factory=dict)
     module: Optional[str] = None
-    host: Dict[str, Optional[str]] = field(default_factory=dict)
+    host: Dict[str, Optional[str]] = dataclasses.field(default_factory=dict)
     simulated: Optional[bool] = None
-    missing_symbols: List[str] = field(default_factory=list)
-    findings: List[Finding] = field(default_factory=list)
+    missing_symbols: List[str] = dataclasses.field(default_factory=list)
+    findings: List[Finding] = dataclasses.field(default_factory=list)
 
     def add(self, level: str, about: str, text: str, advice: str = "") -> None:
         self.findings.append(Finding(level, about, text, advice))
@@ -148,7 +148,7 @@ def _of_other_interpreters() -> List[Path]:
     ]
 
 
-def _shown(folders: Sequence[str]) -> str:
+def _shown(folders: List[str]) -> str:
     return ", ".join(folder or "the current folder" for folder in folders)
 
 
@@ -328,7 +328,7 @@ def show(report: Report) -> str:
     return "\n".join(lines)
 
 
-def main(arguments: Optional[Sequence[str]] = None) -> int:
+def main(arguments: Optional[List[str]] = None) -> int:
     parser = argparse.ArgumentParser(
         prog="python3 -m libvswitch.doctor",
         description="Says which interpreter, module and host are loaded, and what is wrong.",
@@ -337,7 +337,7 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
     as_json = parser.parse_args(arguments).json
     report = examine()
     if as_json:
-        print(json.dumps({**asdict(report), "is_well": report.is_well}, indent=2))
+        print(json.dumps({**dataclasses.asdict(report), "is_well": report.is_well}, indent=2))
     else:
         print(show(report))
     return 0 if report.is_well else 1
