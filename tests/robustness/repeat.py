@@ -20,6 +20,7 @@ import fields
 import peer
 from arguments import AnyPointerKind, IntegerKind, Kind
 from every import AnyObject, Function, Plain
+from recording_host import RecordingHost
 
 WARM_UP = 3
 ROUNDS = 20
@@ -268,13 +269,15 @@ def references(kind: str) -> None:
 
 def memory(kind: str, calls: int) -> None:
     """Whether the heap, or Python's share of it, is larger after each third of the calls."""
-    found = list(ways(kind))
+    host, found = RecordingHost(), list(ways(kind))
     rounds = max(1, calls // 3 // len(found))
     sizes = []
     for _ in range(3):
         for _ in range(rounds):
             for way in found:
                 way.go()
+            # The host keeps a record of its calls.
+            host.reset()
         gc.collect()
         sizes.append((heap(), sys.getallocatedblocks()))
     # The first part fills caches. What each call loses for good shows in every part.

@@ -1,0 +1,140 @@
+"""Lets the host give up on one call after another, and reports what goes wrong or grows.
+
+    panics.py PANICS
+
+Prints a line for each thing that is wrong, and at the end how many times the host gave up.
+"""
+
+import gc
+import itertools
+import os
+import sys
+from typing import Any, Iterator, List, NamedTuple, Tuple, Type
+
+import calls
+import faulty
+import results
+from calls import Call
+from recording_host import RecordingHost
+from repeat import heap, say
+
+
+class Failing(Exception):
+    """Cannot be made."""
+
+    def __init__(self, *arguments: object) -> None:
+        raise ArithmeticError("not made")
+
+
+class Demanding(Exception):
+    """Wants more than a text."""
+
+    def __init__(self, first: object, second: object) -> None:
+        super().__init__(first, second)
+
+
+class Impostor(Exception):
+    """Makes something else of itself."""
+
+    def __new__(cls, *arguments: object) -> Any:
+        return 7
+
+
+class Exit(BaseException):
+    """No Exception."""
+
+
+class Panic(NamedTuple):
+    """What the host names when it gives up, and what the call raises then."""
+
+    type: Type[BaseException]
+    text: bytes
+    raised: Tuple[Type[BaseException], ...]
+    """Which of these may depend on the interpreter."""
+
+
+PANICS = [
+    Panic(RuntimeError, b"given up", (RuntimeError,)),
+    Panic(Exit, b"", (Exit,)),
+    Panic(KeyboardInterrupt, b"given up", (KeyboardInterrupt,)),
+    Panic(SystemExit, b"3", (SystemExit,)),
+    Panic(StopIteration, b"x" * 5000, (StopIteration,)),
+    Panic(MemoryError, b"given up", (MemoryError,)),
+    Panic(Failing, b"given up", (ArithmeticError,)),
+    Panic(Demanding, b"given up", (TypeError,)),
+    Panic(Impostor, b"given up", (TypeError,)),
+    Panic(UnicodeDecodeError, b"given up", (TypeError,)),
+    Panic(RuntimeError, b"no text: \xff", (RuntimeError, UnicodeDecodeError)),
+]
+
+
+class Target(NamedTuple):
+    """A call with short texts, of which no copy is left behind."""
+
+    call: Call
+    given: List[Any]
+    outputs: List[Tuple[int, Any]]
+
+
+def targets() -> Iterator[Target]:
+    """Every call that arms the trap."""
+    for call in calls.ALL:
+        if call.name != "Panic":
+            told = [results.kind(output).answers()[-1].told for output in call.outputs]
+            outputs = [(call.output_position(index), value) for index, value in enumerate(told)]
+            yield Target(call, call.given(), outputs)
+
+
+def panic(host: RecordingHost, target: Target, chosen: Panic, after_outputs: bool) -> str:
+    """Give up once, then answer; what is wrong, or nothing."""
+    call = target.call
+    host.reset()
+    host.answer(call.name, outputs=dict(target.outputs))
+    host.spring(call.name, chosen.type, chosen.text, nth=1, after_outputs=after_outputs)
+    try:
+        call(*target.given)
+    except BaseException as error:
+        raised: Any = type(error)
+    else:
+        raised = None
+    try:
+        call(*target.given)
+    except BaseException as error:
+        return f"{call}: the call after {chosen.type.__name__} raised {error!r}"
+    if raised not in chosen.raised:
+        return f"{call}: {chosen.type.__name__} raised {raised}"
+    return ""
+
+
+def all_of_them() -> Iterator[Tuple[Target, Panic, bool]]:
+    """Every call with every way of giving up."""
+    return itertools.product(list(targets()), PANICS, (False, True))
+
+
+def main(count: int) -> None:
+    """Give up so many times, in three parts that must end with the same memory."""
+    host = RecordingHost()
+    found = list(all_of_them())
+    rounds = max(1, count // 3 // len(found))
+    leaks = os.environ.get("PLANTED")
+    sizes = []
+    for _ in range(3):
+        for _ in range(rounds):
+            for target, chosen, after_outputs in found:
+                wrong = panic(host, target, chosen, after_outputs)
+                if wrong:
+                    say(wrong)
+                if leaks:
+                    faulty.leak_memory()
+        host.reset()
+        gc.collect()
+        sizes.append((heap(), sys.getallocatedblocks()))
+    for index, (what, noise) in enumerate([("bytes of the heap", 8192), ("objects", 300)]):
+        grown = [after[index] - before[index] for before, after in zip(sizes, sizes[1:])]
+        if min(grown) > noise:
+            say(f"grows: {grown} {what}")
+    say(str(3 * rounds * len(found)))
+
+
+if __name__ == "__main__":
+    main(int(sys.argv[1]))
