@@ -57,8 +57,6 @@ def legend() -> List[str]:
 
 
 _COLOURS = {
-    "ours": "#d62728",
-    "twin": "#f4a3a3",
     "handwritten": "#1f77b4",
     "fastcall": "#17becf",
     "stock": "#7f7f7f",
@@ -66,13 +64,17 @@ _COLOURS = {
     "cffi": "#2ca02c",
     "ctypes": "#bcbd22",
     "cython": "#ff7f0e",
+    "ours": "#d62728",
 }
+"""In the order of drawing: the module lies over the others."""
 
 
 def _dots(y: int, forms: Medians, across: Callable[[float], float]) -> Iterator[str]:
     for form, row in forms.items():
-        for peer, value in row.items():
-            colour, x = _COLOURS[peer], across(value)
+        for peer, colour in _COLOURS.items():
+            if peer not in row:
+                continue
+            x = across(row[peer])
             if form == "functions":
                 yield f'<circle cx="{x:.1f}" cy="{y}" r="5" fill="{colour}" fill-opacity="0.85"/>'
             elif peer != "ours":
