@@ -164,6 +164,9 @@ std::vector<Doors> all_doors() {
   auto const vlan_set = [](Bytes const &bytes) {
     Bytes copy = bytes;
     auto *const policy = reinterpret_cast<VSPortVlanPolicy *>(copy.data());
+    auto const has = [&](unsigned flag) {
+      return static_cast<qex_Bool>((policy->flags & flag) != 0 ? 1 : 0);
+    };
     return VSDVS_SetPortVLANPolicy(
         "s", "p", policy->vlanID, -1, (policy->flags & VSPORT_VLAN_GUEST_TAGGING) != 0,
         (policy->flags & VSPORT_VLAN_PVLAN_ENABLED) != 0, policy->vidRanges, policy->numRanges);
