@@ -2,7 +2,10 @@
 
 #include "helpers/failures.h"
 
-#include <string>
+#include <algorithm>
+#include <array>
+#include <cassert>
+#include <cstring>
 
 extern "C" {
 
@@ -54,9 +57,14 @@ void report_null_variable(char const *name, char const *type) {
 }
 
 int wrong_argument_count(PyObject *args, char const *method, int expected) {
-  std::string const format = std::string(static_cast<size_t>(expected), 'O') + ":" + method;
+  // "OO...:method"; the longest name has some fifty characters.
+  std::array<char, 128> format;
+  assert(static_cast<size_t>(expected) + std::strlen(method) + 2 <= format.size());
+  auto const objects = static_cast<size_t>(expected);
+  std::fill_n(format.begin(), objects, 'O');
+  PyOS_snprintf(format.data() + objects, format.size() - objects, ":%s", method);
   // The interpreter counts before it stores, so no targets are needed for a tuple of another size.
-  return PyArg_ParseTuple(args, format.c_str());
+  return PyArg_ParseTuple(args, format.data());
 }
 
 }  // extern "C"

@@ -49,9 +49,10 @@ int wrong_argument_count(PyObject *args, char const *method, int expected) COLD;
  * Whether `method` accepts a null record: writers then store nothing, destructors have nothing to
  * free, and the printed form of no name is no text. Everything else needs a real record.
  *
- * Inline, because with the literal that every wrapper passes the compiler knows the answer.
+ * Always inline, because with the literal that every wrapper passes the compiler knows the answer;
+ * left to itself it gives up in a file of that size.
  */
-static inline bool accepts_null_record(char const *method) {
+__attribute__((always_inline)) static inline bool accepts_null_record(char const *method) {
   size_t const length = strlen(method);
   return (length > 4 && strcmp(method + length - 4, "_set") == 0) ||
          strncmp(method, "delete_", 7) == 0 || strcmp(method, "qex_Name___repr__") == 0;
