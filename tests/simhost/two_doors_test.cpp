@@ -167,9 +167,9 @@ std::vector<Doors> all_doors() {
     auto const has = [&](unsigned flag) {
       return static_cast<qex_Bool>((policy->flags & flag) != 0 ? 1 : 0);
     };
-    return VSDVS_SetPortVLANPolicy(
-        "s", "p", policy->vlanID, -1, (policy->flags & VSPORT_VLAN_GUEST_TAGGING) != 0,
-        (policy->flags & VSPORT_VLAN_PVLAN_ENABLED) != 0, policy->vidRanges, policy->numRanges);
+    return VSDVS_SetPortVLANPolicy("s", "p", policy->vlanID, -1, has(VSPORT_VLAN_GUEST_TAGGING),
+                                   has(VSPORT_VLAN_PVLAN_ENABLED), policy->vidRanges,
+                                   policy->numRanges);
   };
   auto const vlan_get = handed_out<VSPortVlanPolicy>(
       [](VSPortVlanPolicy **policy) {
