@@ -9,10 +9,11 @@ import ctypes
 import re
 from dataclasses import dataclass
 from functools import lru_cache
-from typing import Any, List, NamedTuple, Optional, Tuple, Type
+from typing import Any, FrozenSet, Iterator, List, NamedTuple, Optional, Tuple, Type
 from unittest.mock import ANY
 
-import _libvswitch  # noqa: F401 (the types that `peer` makes pointers of are this module's)
+import _libvswitch as vs
+import functions
 import peer
 import pointer_types
 import scalars
@@ -52,7 +53,7 @@ class Bytes(bytes):
 class Proxy:
     """What a class over the flat functions looks like to them."""
 
-    def __init__(self, this: object) -> None:
+    def __init__(self, this: Any) -> None:
         self.this = this
 
 
@@ -61,12 +62,31 @@ _ROOM = 1 << 16
 _MEMORY = ctypes.create_string_buffer(bytes(range(1, 256)) * 2560)
 _MEMORY_SEEN = 16
 
-# Some lie in memory that is read; where none of them leads is of no concern to the module.
 _SPELLINGS = pointer_types.read()
-_POINTERS = [
-    (spellings, peer.pointer_object(ctypes.addressof(_MEMORY) + offset, min(spellings)))
-    for offset, spellings in enumerate(_SPELLINGS)
-]
+
+
+def spellings_of(c_type: str) -> FrozenSet[str]:
+    """All spellings of the pointer type that a parameter has, which `const` does not change."""
+    plain = c_type.replace(" const *", " *")
+    (found,) = [spellings for spellings in _SPELLINGS if plain in spellings]
+    return found
+
+
+def _pointers() -> Iterator[Tuple[FrozenSet[str], Any]]:
+    """A pointer object of each type, and of each type of record one more.
+
+    Those that the module itself makes are of another Python type than those of its peer.
+    """
+    for offset, spellings in enumerate(_SPELLINGS):
+        yield spellings, peer.pointer_object(ctypes.addressof(_MEMORY) + offset, min(spellings))
+    for function in functions.read():
+        if function.kind == "constructor":
+            record = getattr(vs, function.name)(*(4096 for _ in function.arguments))
+            record.disown()
+            yield spellings_of(function.result.replace("own ", "")), record
+
+
+_POINTERS = list(_pointers())
 
 _NO_POINTERS = [(value, TypeError) for value in (1, 0, "a", b"a", [], 1.0, object(), Proxy(1))]
 
@@ -77,16 +97,9 @@ def address(position: int) -> int:
     return ctypes.addressof(_MEMORY) + position * _ROOM
 
 
-def spellings_of(c_type: str) -> List[str]:
-    """All spellings of the pointer type that a parameter has, which `const` does not change."""
-    plain = c_type.replace(" const *", " *")
-    (found,) = [spellings for spellings in _SPELLINGS if plain in spellings]
-    return sorted(found)
-
-
 def pointers_but(c_type: str) -> List[Refused]:
     """Pointer objects of every type but one, which refuses them all."""
-    own = frozenset(spellings_of(c_type))
+    own = spellings_of(c_type)
     return [(pointer, TypeError) for spellings, pointer in _POINTERS if spellings != own]
 
 
@@ -245,15 +258,21 @@ class PointerKind(Kind):
         return Sample(pointer, address(position), pattern)
 
     def samples(self) -> List[Sample]:
-        pointer = peer.pointer_object(address(0), self._spelling)
-        return [Sample(None, None), Sample(pointer, address(0)), Sample(Proxy(pointer), address(0))]
+        own = spellings_of(self.type)
+        pointers = [pointer for spellings, pointer in _POINTERS if spellings == own]
+        proxies = [Proxy(pointer) for pointer in pointers]
+        return [
+            Sample(None, None),
+            *(Sample(pointer, int(pointer)) for pointer in pointers),
+            *(Sample(proxy, int(proxy.this)) for proxy in proxies),
+        ]
 
     def refused(self) -> List[Refused]:
         return [*_NO_POINTERS, *pointers_but(self.type)]
 
     @property
     def _spelling(self) -> str:
-        return spellings_of(self.type)[0]
+        return min(spellings_of(self.type))
 
 
 @dataclass(frozen=True)

@@ -30,7 +30,7 @@ def described(value: Any) -> Any:
     if type(value).__name__ == "SwigPyObject":
         match = re.fullmatch(r"<Swig Object of type '(.+)' at 0x[0-9a-f]+>", repr(value))
         assert match, repr(value)
-        return PointerTo(frozenset(arguments.spellings_of(match[1])), int(value), value.own())
+        return PointerTo(arguments.spellings_of(match[1]), int(value), value.own())
     if type(value) is list:
         return [described(item) for item in value]
     return (type(value), value)
@@ -124,7 +124,7 @@ class PointerResult:
     type: str
 
     def answers(self) -> List[Answer]:
-        spellings = frozenset(arguments.spellings_of(self.type))
+        spellings = arguments.spellings_of(self.type)
         addresses = (0x1000, 2**64 - 16)
         pointers = [Answer(place, PointerTo(spellings, place, False)) for place in addresses]
         return [Answer(0, None), *pointers]

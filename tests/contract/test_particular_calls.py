@@ -87,3 +87,12 @@ def test_a_group_is_passed_where_it_lies(host: RecordingHost) -> None:
     vs.VSQEX_GetMcastFilterStats("a", 1, 2, GROUP)
     (call,) = host.calls()
     assert call.values[3] == contents_of(GROUP)
+
+
+def test_what_a_call_answers_can_be_passed_on(host: RecordingHost) -> None:
+    host.answer("DVSState_SwitchFindByAlias", 0x1000)
+    host.answer("VSQEX_GetMcastFilters", outputs={4: 0x2000})
+    vs.DVS_SwitchName(vs.DVSState_SwitchFindByAlias("alias"))
+    vs.VSQEX_FreeMemory(vs.VSQEX_GetMcastFilters("a", 1, 2)[1])
+    seen = [call.values for call in host.calls()]
+    assert (seen[1], seen[3]) == ((0x1000,), (0x2000,))
