@@ -144,8 +144,18 @@ static void drop_pointer(PyObject *self) {
   Py_XDECREF(link);
 }
 
+/* The object with the variables reports failures by 1, which not every caller takes for one. */
+static setattrfunc set_variable;
+static int set_variable_or_fail(PyObject *variables, char *name, PyObject *value) {
+  return set_variable(variables, name, value) ? -1 : 0;
+}
+
 static int ready_type(PyTypeObject *type) {
   PyMethodDef *method = swigobject_methods;
+  if (type->tp_setattr) {
+    set_variable = type->tp_setattr;
+    type->tp_setattr = set_variable_or_fail;
+  }
   if (type->tp_methods != swigobject_methods) return PyType_Ready(type);
   type->tp_richcompare = compare_pointers;
   type->tp_repr = show_pointer;
@@ -170,6 +180,8 @@ static int has_instances(PyObject *cls) {
   Py_XDECREF(make);
   return make != NULL;
 }
+
+#define PyType_Ready(type) ready_type(type)
 
 /* Makes a class the shadow of a type; pointers of that type become its instances. */
 static PyObject *register_class(swig_type_info *type, PyObject *cls) {

@@ -126,6 +126,14 @@ def test_a_truth_that_cannot_be_told_changes_no_ownership(view: Callable[[], Any
     ]
 
 
+def test_a_variable_that_is_not_deleted_says_so() -> None:
+    reports.raises(
+        AttributeError,
+        "Variable qex_ModuleCurrentID is read-only.",
+        *(delattr, vs.cvar, "qex_ModuleCurrentID"),
+    )
+
+
 def registered_and_used(cls: str) -> str:
     """A program that registers a class, and makes and drops an instance that owns its record."""
     return f"""
