@@ -175,7 +175,7 @@ def _pointers() -> Iterator[Value]:
         yield Value(f"temporary {spelling}", _temporary(int(made), spelling), spellings)
     chained = every.pointer("VSInfo *", 8)
     chained.append(every.pointer("VSStats *", 8))
-    both = spellings_of("VSInfo *") + spellings_of("VSStats *")
+    both = {*spellings_of("VSInfo *"), *spellings_of("VSStats *")}
     yield Value("chained pointers", chained, frozenset(both))
 
 

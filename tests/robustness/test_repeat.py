@@ -55,7 +55,9 @@ def test_memory_stays_as_large_as_it_was(kind: str) -> None:
 
 
 def test_what_is_planted_is_found() -> None:
-    names = ["a reference", "of None", "an object", "memory"]
+    # From 3.12 on None counts no references.
+    of_none = ["of None"] if sys.version_info < (3, 12) else []
+    names = ["a reference", *of_none, "an object", "memory"]
     assert repeated("references", "planted") == ([f"grows: {name}" for name in names], 5)
     grown, _ = repeated("memory", "planted", str(CALLS))
     # Objects are not counted where they too are on the heap.

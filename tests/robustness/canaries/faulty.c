@@ -92,6 +92,7 @@ static PyMethodDef methods[] = {
 static struct PyModuleDef module = {
     .m_base = PyModuleDef_HEAD_INIT, .m_name = "faulty", .m_size = -1, .m_methods = methods};
 
-PyMODINIT_FUNC PyInit_faulty(void) {
+/* Not every version exports it without being asked. */
+__attribute__((visibility("default"))) PyMODINIT_FUNC PyInit_faulty(void) {
   return PyModule_Create(&module);
 }
