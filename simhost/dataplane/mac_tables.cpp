@@ -200,8 +200,9 @@ void describe_address(store::Transaction &transaction, Place const &place,
   if (known && !known->here && known->type != VS_MAC_ADDR_TYPE_LEARNED) {
     throw Refused(QEX_EXISTS);
   }
-  store_address(transaction, place, entry,
-                clock_now(transaction) - std::chrono::seconds(entry.elapsed));
+  // By value: a field of a packed record may lie where no reference can.
+  qex_uint32 const elapsed = entry.elapsed;
+  store_address(transaction, place, entry, clock_now(transaction) - std::chrono::seconds(elapsed));
 }
 
 void remove_address(store::Transaction &transaction, Place const &place, VSMACEntry const &entry) {

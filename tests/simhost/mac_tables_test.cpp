@@ -96,8 +96,8 @@ TEST_F(MacTables, EntriesSayWhatIsKnown) {
   EXPECT_EQ(std::memcmp(found.macAddress, entry(1).macAddress, sizeof found.macAddress), 0);
   EXPECT_EQ(found.macAddrType, VS_MAC_ADDR_TYPE_LEARNED);
   EXPECT_EQ(found.aging, 1);
-  EXPECT_EQ(found.vid, 42);
-  EXPECT_EQ(found.elapsed, 2U);
+  EXPECT_EQ(qex_VlanID{found.vid}, 42);
+  EXPECT_EQ(qex_uint32{found.elapsed}, 2U);
 }
 
 TEST_F(MacTables, VlansAndNetworksAreApart) {
@@ -115,7 +115,8 @@ TEST_F(MacTables, AgeToTheMillisecond) {
   EXPECT_THAT(at(at1), ElementsAre(1));
   simhost::step_clock(work, milliseconds(1));
   EXPECT_THAT(at(at1), IsEmpty());
-  EXPECT_EQ(simhost::dataplane::learning_stats(work, at1).numMACsLearned, 0U);
+  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at1).numMACsLearned),
+            0U);
   EXPECT_EQ(learn(work, at1, entry(1)), Sighting::learned) << "it is new again";
 }
 
@@ -164,11 +165,14 @@ TEST_F(MacTables, MovesAreCountedWhereTheyGo) {
   EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
   EXPECT_THAT(at(at1), IsEmpty());
   EXPECT_THAT(at(at2), ElementsAre(1));
-  EXPECT_EQ(simhost::dataplane::learning_stats(work, at1).numMACsMoved, 0U);
-  EXPECT_EQ(simhost::dataplane::learning_stats(work, at2).numMACsMoved, 1U);
+  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at1).numMACsMoved),
+            0U);
+  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at2).numMACsMoved),
+            1U);
   EXPECT_EQ(learn(work, team, entry(1)), Sighting::moved);
   EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
-  EXPECT_EQ(simhost::dataplane::learning_stats(work, at2).numMACsMoved, 2U);
+  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at2).numMACsMoved),
+            2U);
 }
 
 TEST_F(MacTables, AUsersAddressDoesNotMove) {
