@@ -8,10 +8,10 @@
 namespace {
 
 void write_behind_a_block() {
-  auto *volatile block = static_cast<char *>(std::malloc(20));
+  auto *volatile block = static_cast<char volatile *>(std::malloc(20));
   int volatile const size = 20;
   block[size] = 1;
-  std::free(block);
+  std::free(const_cast<char *>(block));
 }
 
 int overflow_an_integer() {
@@ -23,7 +23,7 @@ void leak_a_block() {
   auto *volatile lost = static_cast<char *>(std::malloc(20));
   std::memset(lost, 1, 20);
   lost = nullptr;
-}
+}  // NOLINT(clang-analyzer-unix.Malloc): it is what the program is for
 
 }  // namespace
 
