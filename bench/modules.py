@@ -69,8 +69,7 @@ def staged(known: Dict[str, Module], folder: Path) -> Dict[str, Module]:
     for key, module in known.items():
         copies[key] = module._replace(folder=folder / key)
         copies[key].folder.mkdir(parents=True)
-        (file,) = module.folder.glob(f"{module.name}.*")
-        shutil.copy(file, copies[key].folder)
+        shutil.copy(_library(module), copies[key].folder)
     return copies
 
 
@@ -121,7 +120,8 @@ def _import(build: Path, *arguments: str) -> List[int]:
 
 
 def _library(module: Module) -> Path:
-    (path,) = module.folder.glob(f"{module.name}.*")
+    """The module's own file; stubs for type checkers may lie beside it."""
+    (path,) = (p for p in module.folder.glob(f"{module.name}.*") if p.suffix != ".pyi")
     return path
 
 
