@@ -1,0 +1,1 @@
+"""The simulated host for tests: a pytest plug-in that gives each test a host of its own."""
