@@ -1,0 +1,11 @@
+# Where `cmake --install` puts things below its prefix: as they lie in the build folder, unless a
+# package says otherwise. Its components are module, simhost and development.
+
+include(GNUInstallDirs)
+
+set(PYTHON_INSTALL_DIR "${CMAKE_INSTALL_LIBDIR}/libvswitch/python" CACHE STRING
+    "Where the module, its classes and the pytest plug-in are installed")
+set(SIMHOST_INSTALL_DIR "${CMAKE_INSTALL_LIBDIR}/libvswitch/simhost" CACHE STRING
+    "Where the simulated host's libraries and simhostctl are installed")
+set(HOST_RUNPATH "$ORIGIN/../simhost" CACHE STRING
+    "Where the module looks for the host after LD_LIBRARY_PATH and before the system's folders")
