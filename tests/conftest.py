@@ -4,6 +4,9 @@ import os
 import sys
 from pathlib import Path
 
+# For the tests of the plug-in; pytest takes this from the first conftest only.
+pytest_plugins = ["pytester"]
+
 _HERE = Path(__file__).parent
 _BESIDE = [
     str(Path(os.environ["BUILD_DIR"], "tests", "python")),
