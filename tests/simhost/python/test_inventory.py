@@ -1,0 +1,76 @@
+"""examples/inventory.py"""
+
+import json
+import sys
+from typing import Any, Callable
+
+import pytest
+from simhost import SharedHost
+
+LAB = {
+    "uplinks": [{"name": "nic0", "link": "down"}, {"name": "nic1"}],
+    "switches": [
+        {"alias": "zoo", "id": "z-1", "mtu": 9000, "max_ports": 8, "uplinks": ["nic0", "nic1"]},
+        {"alias": "lab", "id": "l-1", "ports": [{"id": "b"}, {"id": "a"}]},
+    ],
+}
+TABLE = """\
+SWITCH  MTU   PORTS     UPLINKS
+lab     1500  2 of 128  none
+zoo     9000  0 of 8    nic0 down, nic1 up
+"""
+
+
+@pytest.mark.scenario(LAB)
+def test_a_table(example: Callable[..., Any]) -> None:
+    assert example("inventory") == (0, TABLE.splitlines(), "")
+
+
+@pytest.mark.scenario(LAB)
+def test_json(example: Callable[..., Any]) -> None:
+    status, lines, errors = example("inventory", "--json")
+    assert (status, errors) == (0, "")
+    lab = {"alias": "lab", "identifier": "l-1", "mtu": 1500, "max_ports": 128, "ports": ["a", "b"]}
+    zoo = {"alias": "zoo", "identifier": "z-1", "mtu": 9000, "max_ports": 8, "ports": []}
+    links = [{"name": "nic0", "link": "down"}, {"name": "nic1", "link": "up"}]
+    assert json.loads("\n".join(lines)) == [
+        {**lab, "running": True, "uplinks": []},
+        {**zoo, "running": True, "uplinks": links},
+    ]
+
+
+@pytest.mark.scenario(LAB)
+def test_chosen_switches(example: Callable[..., Any]) -> None:
+    status, lines, errors = example("inventory", "zoo")
+    assert (status, errors) == (0, "")
+    assert [line.split()[0] for line in lines] == ["SWITCH", "zoo"]
+
+
+@pytest.mark.scenario({})
+def test_a_host_without_switches(example: Callable[..., Any]) -> None:
+    assert example("inventory") == (0, ["SWITCH  MTU  PORTS  UPLINKS"], "")
+    assert example("inventory", "--json") == (0, ["[]"], "")
+
+
+def test_a_switch_that_does_not_run(shared_host: SharedHost, example: Callable[..., Any]) -> None:
+    add = "import _libvswitch as vs; print(vs.DVSQEX_SwitchAdd('s-1', 'still', 16, 200))"
+    assert shared_host.run([sys.executable, "-c", add]).stdout == "0\n"
+    status, lines, errors = example("inventory", "still")
+    assert (status, errors) == (0, "")
+    assert lines[1] == "still   1500  0 of 16  does not run"
+
+
+def test_an_unknown_switch(example: Callable[..., Any]) -> None:
+    errors = "inventory: there is no switch 'nope'\n"
+    assert example("inventory", "vswitch0", "nope") == (1, [], errors)
+
+
+def test_a_query_that_is_refused(shared_host: SharedHost, example: Callable[..., Any]) -> None:
+    shared_host.fault("VSQEX_GetUplinkLinkState", nth=2, status="QEX_BUSY")
+    errors = "inventory: VSQEX_GetUplinkLinkState('vswitch0', 'nic5'): Busy\n"
+    assert example("inventory") == (1, [], errors)
+
+
+def test_a_host_that_gives_up(shared_host: SharedHost, example: Callable[..., Any]) -> None:
+    shared_host.fault("VSQEX_GetUplinks", panic=(OSError, "the device is gone"))
+    assert example("inventory") == (1, [], "inventory: the device is gone\n")
