@@ -1,6 +1,7 @@
 """The plug-in in runs of pytest: fixtures, marks, memory that is left out, refused hosts."""
 
 import os
+import re
 import subprocess
 import textwrap
 from pathlib import Path
@@ -430,8 +431,19 @@ def test_explains_itself(pytester: pytest.Pytester) -> None:
         assert any(line.startswith(f"@pytest.mark.{mark}") for line in marks)
     fixtures = pytester.runpytest_subprocess("--fixtures").stdout.str()
     for fixture in ("host", "shared_host", "scenario"):
-        assert f"\n{fixture} -- " in fixtures
-    assert "no docstring available" not in fixtures
+        said = fixtures.split(f"\n{fixture} -- ")[1].splitlines()[1].strip()
+        assert said and said != "no docstring available"
+
+
+def test_the_readme_shows_what_passes(pytester: pytest.Pytester) -> None:
+    root = Path(__file__).resolve().parents[2]
+    text = (root / "simhost/python/README.md").read_text(encoding="utf-8")
+    code = "".join(re.findall(r"^```python\n(.*?)^```$", text, re.M | re.S))
+    tests = len(re.findall(r"^ *def test_", code, re.M))
+    assert tests > 5
+    run(pytester, code).assert_outcomes(passed=tests)
+    said = re.search(r"^_+ test_the_uplinks _+\n(.*?)^```$", text, re.M | re.S)
+    assert said and said[1].rstrip() == left_out("the test", "VSQEX_GetUplinks: 80 bytes")
 
 
 def test_is_typed(tmp_path: Path) -> None:
