@@ -269,4 +269,8 @@ Json described_host(Transaction &transaction) {
   return host;
 }
 
+std::string description(Transaction &transaction) {
+  return described_host(transaction).dump(2, ' ', false, Json::error_handler_t::replace);
+}
+
 }  // namespace simhost::control

@@ -41,7 +41,7 @@ Json parsed(std::string_view text) {
   try {
     LikeKeys like_keys;
     return Json::parse(text.begin(), text.end(), std::ref(like_keys));
-  } catch (Json::parse_error const &error) {
+  } catch (Json::exception const &error) {
     std::string_view const what = error.what();
     // Without the library's own number of the error in front.
     auto const message = what.substr(what.find("] ") + 2);

@@ -1,6 +1,7 @@
 // Scenario documents: a host, or a change of one, in JSON. Every key is described in SCENARIOS.md.
 #pragma once
 
+#include <string>
 #include <string_view>
 
 #include "control/document.h"
@@ -19,5 +20,9 @@ void apply(store::Transaction &transaction, std::string_view document);
 /// The whole host as a document. Beside what apply() reads, switches and ports have a key
 /// "observed" with what follows from the rest, which apply() passes over.
 Json described_host(store::Transaction &transaction);
+
+/// Likewise, as text. JSON holds UTF-8 only: bytes of a name that are none, which raw calls and
+/// images can set, are shown as U+FFFD.
+std::string description(store::Transaction &transaction);
 
 }  // namespace simhost::control

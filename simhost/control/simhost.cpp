@@ -151,7 +151,7 @@ SIMHOST_API int simhost_apply(char const *document) {
 SIMHOST_API size_t simhost_describe(char *text, size_t size) {
   size_t length = 0;
   on_state(Access::read, [&](Transaction &work) {
-    length = copy_out(simhost::control::described_host(work).dump(2), text, size);
+    length = copy_out(simhost::control::description(work), text, size);
   });
   return length;
 }

@@ -12,6 +12,7 @@
 #include "control/lifecycle.h"
 #include "core/fresh_host.h"
 #include "core/known.h"
+#include "core/switches.h"
 #include "store/store.h"
 #include "temporary_folder.h"
 
@@ -100,6 +101,7 @@ TEST_F(Scenario, TextsThatAreNoJson) {
   EXPECT_THAT(refusal("{"), testing::StartsWith("no JSON: "));
   EXPECT_THAT(refusal(""), testing::StartsWith("no JSON: "));
   EXPECT_THAT(refusal("\xFF"), testing::StartsWith("no JSON: "));
+  EXPECT_EQ(refusal("1e999"), "no JSON: number overflow parsing '1e999'");
   EXPECT_EQ(refusal(R"({"switches": [{"alias": "a", "alias": "b"}]})"),
             "the key 'alias' is there twice");
 }
@@ -185,6 +187,12 @@ TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
     (*host)["switches"][0]["lags"][0]["observed"].erase("id");
   }
   EXPECT_EQ(second, expected);
+}
+
+TEST_F(Scenario, NamesThatAreNoUtf8AreDescribedByAReplacement) {
+  Transaction work(store, Access::write);
+  simhost::create_switch(work, {.alias = "dvs\xFF"});
+  EXPECT_THAT(simhost::control::description(work), testing::HasSubstr("\"dvs\uFFFD\""));
 }
 
 TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {
