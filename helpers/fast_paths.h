@@ -40,14 +40,15 @@ static inline bool is_small_integer(PyObject *object, long *value) {
 }
 
 /** The readings of conversions.h, with the small integers first. */
-#define DEFINE_READING(NAME, TYPE, LEAST, MOST)                       \
-  static inline int read_##NAME(PyObject *object, TYPE *value) {      \
-    long small = 0;                                                   \
-    if (is_small_integer(object, &small) && LEAST && small <= MOST) { \
-      *value = (TYPE)small;                                           \
-      return kConverted;                                              \
-    }                                                                 \
-    return NAME##_from_object(object, value);                         \
+// NOLINTBEGIN(bugprone-macro-parentheses): types cannot have them
+#define DEFINE_READING(NAME, TYPE, LEAST, MOST)                           \
+  static inline int read_##NAME(PyObject *object, TYPE *value) {          \
+    long small = 0;                                                       \
+    if (is_small_integer(object, &small) && (LEAST) && small <= (MOST)) { \
+      *value = (TYPE)small;                                               \
+      return kConverted;                                                  \
+    }                                                                     \
+    return NAME##_from_object(object, value);                             \
   }
 
 DEFINE_READING(int, int, true, INT_MAX)
@@ -58,6 +59,7 @@ DEFINE_READING(unsigned_long, unsigned long, small >= 0, LONG_MAX)
 DEFINE_READING(unsigned_long_long, unsigned long long, small >= 0, LONG_MAX)
 
 #undef DEFINE_READING
+// NOLINTEND(bugprone-macro-parentheses)
 
 /** The size of the array that a wrapper keeps in its frame for a text argument. */
 enum { kFrameText = 256 };

@@ -1,0 +1,126 @@
+#!/usr/bin/env python3
+"""Runs the fuzzers, from seeds that are made here, and tells of an input that one fails on.
+
+    fuzzing.py FUZZER [--seconds N] [--seed N]
+"""
+
+import argparse
+import os
+import random
+import re
+import subprocess
+import sys
+from pathlib import Path
+from typing import List, NamedTuple
+
+HERE = Path(__file__).parent
+ROOT = HERE.parent.parent
+BUILD = Path(os.environ.get("FUZZERS_DIR", ROOT / "build-fuzzers"))
+
+NAMES = ["mirror", "properties", "runtime_options", "scenario", "state_image", "tables", "texts"]
+"""Each is a harness of this folder."""
+
+# A run that takes so long hangs; all take far below a second, sanitizers included.
+PATIENCE = 60
+
+MARKDOWN_EXAMPLE = re.compile(r"```json\n(.*?)```", re.DOTALL)
+
+
+class Outcome(NamedTuple):
+    """What became of a run."""
+
+    inputs: int
+    """How many were tried."""
+    wrong: List[str]
+
+
+def documents() -> List[str]:
+    """The scenario documents that there are: the default host, and each example of a key."""
+    simhost = ROOT / "simhost"
+    examples = MARKDOWN_EXAMPLE.findall((simhost / "SCENARIOS.md").read_text(encoding="utf-8"))
+    return [(simhost / "control" / "default_host.json").read_text(encoding="utf-8"), *examples]
+
+
+def vocabulary() -> List[str]:
+    """The keys and texts of all documents."""
+    return sorted(set(re.findall(r'"[^"\\]*"', "\n".join(documents()))))
+
+
+def write_seeds(name: str, folder: Path) -> None:
+    """Documents for the harness that reads them, and for the others, whose inputs are rows of
+    choices, choices at random."""
+    if name == "scenario":
+        for number, document in enumerate(documents()):
+            (folder / f"seed-{number}").write_text(document, encoding="utf-8")
+        return
+    chance = random.Random(name)
+    for number in range(24):
+        size = 16 << number % 8
+        (folder / f"seed-{number}").write_bytes(bytes(chance.choices(range(256), k=size)))
+
+
+def write_dictionary(file: Path) -> None:
+    lines = [text.replace('"', '\\"') for text in vocabulary()]
+    file.write_text("".join(f'"{line}"\n' for line in lines if line.isascii()), encoding="ascii")
+
+
+def _findings() -> Path:
+    folder = BUILD / "findings"
+    folder.mkdir(parents=True, exist_ok=True)
+    return folder
+
+
+def run(
+    name: str, corpus: Path, seed: int, *limits: str, patience: int = PATIENCE, planted: str = ""
+) -> Outcome:
+    """Run a fuzzer on a corpus, which it adds to, until it finds something or reaches a limit.
+
+    An input that it fails on stays in the folder of findings.
+    """
+    corpus.mkdir(parents=True, exist_ok=True)
+    write_seeds(name, corpus)
+    options = [f"-seed={seed}", f"-timeout={patience}", "-max_len=4096", "-close_fd_mask=1"]
+    if name == "scenario":
+        write_dictionary(BUILD / "scenario.dict")
+        options.append(f"-dict={BUILD / 'scenario.dict'}")
+    fuzzer = BUILD / "fuzzers" / name
+    prefix = f"{_findings() / name}-"
+    done = subprocess.run(
+        [fuzzer, *options, f"-artifact_prefix={prefix}", "-print_final_stats=1", *limits, corpus],
+        env={**os.environ, "PLANTED": planted},
+        stdout=subprocess.DEVNULL,
+        stderr=subprocess.PIPE,
+        text=True,
+        errors="replace",
+        check=False,
+    )
+    tried = re.search(r"stat::number_of_executed_units: +(\d+)", done.stderr)
+    return Outcome(
+        int(tried[1]) if tried else 0, [] if done.returncode == 0 else [told(fuzzer, done.stderr)]
+    )
+
+
+def told(fuzzer: Path, said: str) -> str:
+    """What a fuzzer said of the input that it failed on, and how to see it again."""
+    what = re.findall(r"does not hold: .*|\S*: runtime error: .*|SUMMARY: .*|^==.*ERROR: .*", said)
+    left = re.search(r"Test unit written to (\S+)", said)
+    again = f"to see it again: {fuzzer} {left[1]}" if left else said[-2000:]
+    return "\n".join([*dict.fromkeys(what), again])
+
+
+def main() -> int:
+    """Run one fuzzer on a corpus that lasts."""
+    parser = argparse.ArgumentParser()
+    parser.add_argument("fuzzer", choices=NAMES)
+    parser.add_argument("--seconds", type=int, default=60)
+    parser.add_argument("--seed", type=int, default=random.randrange(1, 2**31))
+    options = parser.parse_args()
+    print(f"seed {options.seed}", flush=True)
+    corpus = BUILD / "corpus" / options.fuzzer
+    done = run(options.fuzzer, corpus, options.seed, f"-max_total_time={options.seconds}")
+    print(f"{done.inputs:,} inputs", *done.wrong, sep="\n")
+    return 1 if done.wrong else 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())
