@@ -74,6 +74,7 @@ class Function:
     answers: str = ""  # in Python, where the C type says nothing
     owns_elements: bool = False  # answers a new array
     null: str = ""  # when it answers null: "never", only on "failure", or in the course of things
+    body: str = ""  # of a method, in C
 
     @property
     def inputs(self) -> List[Parameter]:
@@ -92,6 +93,7 @@ class Field:
     reads_as_text: bool
     doc: str
     count: str  # the field that says how many elements an array without a size has
+    is_bit_field: bool = False
 
 
 @dataclass
@@ -112,6 +114,8 @@ class Constant:
     is_text: bool
     doc: str
     family: str  # the enumeration it belongs to, if that has a name
+    header: str
+    type: Type  # in which the module holds it
 
 
 @dataclass
@@ -176,10 +180,12 @@ def _collect(node: ET.Element, found: Definitions, header: str, family: str) -> 
             found.typedefs[f"enum {seen.get('name', '')}"] = Type((), "int")
             _collect(child, found, header, seen.get("name", ""))
         elif child.tag == "enumitem":
-            found.constants.append(Constant(seen["sym_name"], False, _text(seen), family))
+            name, number = seen["sym_name"], Type((), "int")
+            found.constants.append(Constant(name, False, _text(seen), family, header, number))
         elif child.tag == "constant":
             is_text = seen["type"] == "p.char" or seen["type"].endswith("char")
-            found.constants.append(Constant(seen["sym_name"], is_text, _text(seen), ""))
+            name, type_ = seen["sym_name"], _type(seen["type"])
+            found.constants.append(Constant(name, is_text, _text(seen), "", header, type_))
         elif child.tag in ("include", "extern", "module"):
             _collect(child, found, seen.get("name", ""), family)
 
@@ -201,6 +207,7 @@ def _collect_members(node: ET.Element, record: Record) -> None:
                     reads_as_text="mac_text" in seen.get("tmap_out", ""),
                     doc=_text(seen),
                     count=seen.get("feature_count", ""),
+                    is_bit_field="bitfield" in seen,
                 )
             )
 
@@ -218,6 +225,7 @@ def _function(node: ET.Element, seen: _Attributes) -> Function:
         answers=seen.get("feature_answers", ""),
         owns_elements=seen.get("feature_new") == "1",
         null=seen.get("feature_null", ""),
+        body=seen.get("code", ""),
     )
 
 
@@ -262,6 +270,10 @@ def _type(encoded: str) -> Type:
 
 
 def _text(seen: _Attributes) -> str:
-    """The header's comment without its decoration."""
-    lines = [re.sub(r"^\s*\*? ?", "", line) for line in seen.get("doxygen", "").splitlines()]
+    return undecorated(seen.get("doxygen", ""))
+
+
+def undecorated(comment: str) -> str:
+    """A header's comment without what makes it one."""
+    lines = [re.sub(r"^\s*\*? ?", "", line) for line in comment.splitlines()]
     return textwrap.dedent("\n".join(line.rstrip() for line in lines)).strip()

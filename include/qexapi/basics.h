@@ -30,6 +30,7 @@ enum { qexApiDebug = 0 };
 #define QEX_PETABYTE 0x4000000000000LL
 #define QEX_EXABYTE 0x1000000000000000LL
 
+/** Bits of a byte. */
 #define QEX_BITS_PER_BYTE 8
 
 #endif  // QEXAPI_BASICS_H
