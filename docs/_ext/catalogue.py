@@ -1,0 +1,302 @@
+"""All there is to describe, put together: definitions, comments, layouts, types in Python."""
+
+import re
+from dataclasses import dataclass
+from pathlib import Path
+from typing import Dict, Iterable, List, Optional, Tuple
+
+import comments
+import definitions
+import layout
+from comments import Comment, Family, Header
+from definitions import Field, Function, Parameter, Record, Type
+from make_stubs import Stubs, method_arguments, overloads
+from pictures import Shape
+
+CLASSES, FLAT = "libvswitch", "_libvswitch"
+_VIEW = "a view of what stays the library's; nothing frees it"
+
+# Methods and helpers with no text of their own anywhere else.
+_ARRAYS = {
+    "new_": "Room for `nelements` elements, not zero-filled; Python owns it. "
+    "None if there is no memory.",
+    "delete_": "Frees an array of `new_{array}`; the object no longer owns it.",
+    "_getitem": "A copy of an element, which Python owns. The index is not checked.",
+    "_setitem": "Copies a value into an element. The index is not checked.",
+}
+
+
+@dataclass(frozen=True)
+class Argument:
+    name: str
+    c_type: str
+    types: Tuple[str, str]  # in the module of the classes, and in the flat one
+    meaning: str
+
+
+@dataclass(frozen=True)
+class Call:
+    """A function as both modules have it."""
+
+    name: str
+    method_of: str
+    prototype: str
+    comment: Comment
+    arguments: Tuple[Argument, ...]
+    forms: Tuple[Tuple[str, ...], ...]  # the names of the arguments; mostly one form
+    results: Tuple[str, str]
+    shape: Tuple[str, ...]  # the names of what a list holds; empty for a single result
+    ownership: Tuple[str, ...]
+    header: str
+
+    @property
+    def attribute(self) -> str:
+        """The name in its class, or in its module."""
+        return self.name[len(self.method_of) + 1 :] if self.method_of else self.name
+
+
+class Catalogue:
+    def __init__(self, root: Path, build: Path) -> None:
+        self.known = definitions.read(build / "classes/made/tree.xml")
+        self.layout = layout.read(build / "docs/layout.tsv")
+        self.headers = _headers(root / "include")
+        self.helpers = {
+            name: text
+            for header in _headers(root / "helpers").values()
+            for name, text in header.comments.items()
+        }
+        self.helper_prototypes = {
+            name: text
+            for header in _headers(root / "helpers").values()
+            for name, text in header.prototypes.items()
+        }
+        self.statuses = {
+            name for family in self.headers["qexapi/status.h"].families for name in family.names
+        }
+        self.stubs = (Stubs(self.known, "_flat."), Stubs(self.known))
+        self._pointers: Dict[str, str] = {}
+        self.calls: Dict[str, Call] = {}
+        self.methods: Dict[str, List[Call]] = {}
+        for name, forms in overloads(self.known).items():
+            self.calls[name] = self._call(name, forms)
+        for record in self.known.records.values():
+            self.methods[record.name] = [self._method(record, one) for one in record.methods]
+
+    def title_of(self, family: Family) -> str:
+        """What a family is called: its name, if no other has the same, or its comment."""
+        namesakes = [
+            one
+            for header in self.headers.values()
+            for one in header.families
+            if one.title == family.title
+        ]
+        if family.title and len(namesakes) == 1:
+            return family.title
+        return re.split(r"[.;:](?:\s|$)", family.text, maxsplit=1)[0].replace("\n", " ")
+
+    def header_of(self, record: Record) -> str:
+        return "/".join(Path(record.header).parts[-2:])
+
+    def shapes(self, record: Record) -> List[Shape]:
+        return [self._shape(record, one) for one in record.fields]
+
+    def _shape(self, record: Record, one: Field) -> Shape:
+        place = self.layout.places[record.name][one.name]
+        type_ = self.known.resolve(one.type)
+        count, element = "", 0
+        if type_.is_array:
+            element = self._size(type_.target)
+            if type_.count is None:
+                count = one.count or "as many as fit,"
+        return Shape(one.name, one.type.spelled(), self._kind(one), place, element, count)
+
+    def _size(self, type_: Type) -> int:
+        """Bytes of an array's element."""
+        if type_.is_array:
+            return (type_.count or 0) * self._size(type_.target)
+        if type_.is_pointer:
+            return 8
+        if type_.name in self.layout.sizes:
+            return self.layout.sizes[type_.name]
+        sizes = {"char": 1, "short": 2, "int": 4, "long": 8, "long long": 8}
+        return sizes[re.sub(r"^(un)?signed ", "", type_.name)]
+
+    def _kind(self, one: Field) -> str:
+        type_ = self.known.resolve(one.type)
+        if type_.is_pointer:
+            return "pointer"
+        if one.reads_as_text or (type_.is_array and type_.name == "char"):
+            return "text"
+        if type_.name in self.known.records:
+            return "record"
+        if type_.is_array:
+            return "array"
+        return "bits" if one.is_bit_field else "number"
+
+    def _call(self, name: str, forms: List[Function]) -> Call:
+        header, prototype, text = self._said_of(name)
+        longest = max(forms, key=lambda one: len(one.inputs))
+        comment = comments.parted(text)
+        return Call(
+            name,
+            "",
+            prototype,
+            comment,
+            tuple(self._arguments(longest, comment)),
+            tuple(self._names(one) for one in forms),
+            self._results(forms[0]),
+            _shape_of_result(forms[0]),
+            tuple(self._ownership(longest, prototype, header, comment)),
+            header,
+        )
+
+    def _names(self, form: Function) -> Tuple[str, ...]:
+        names = tuple(_said(one.name) for one in form.inputs)
+        return names + (("*more",) if form.takes_more else ())
+
+    def _said_of(self, name: str) -> Tuple[str, str, str]:
+        for header in self.headers.values():
+            if name in header.prototypes:
+                return header.name, header.prototypes[name], header.comments[name]
+        if name in self.helpers:
+            return "", self.helper_prototypes[name], self.helpers[name]
+        for part, text in _ARRAYS.items():
+            if part in name:
+                return "", "", text.format(array=name[len(part) :])
+        raise KeyError(f"no header says anything of {name}")
+
+    def _method(self, record: Record, one: Function) -> Call:
+        called = re.search(r"(\w+)\(\$self", one.body)
+        text = self.helpers.get(called[1], "") if called else ""
+        if one.name == "__len__":
+            text = "How many entries the record says it has."
+        if not text:
+            raise KeyError(f"no header says anything of {record.name}.{one.name}")
+        comment = comments.parted(text)
+        name = f"{record.name}_{one.name}"
+        typed = [dict(method_arguments(stubs, one)) for stubs in self.stubs]
+        arguments = tuple(
+            Argument(
+                parameter.name,
+                parameter.type.spelled(),
+                (self._plain(typed[0][parameter.name]), self._plain(typed[1][parameter.name])),
+                comment.parameters.get(parameter.name, ""),
+            )
+            for parameter in one.inputs
+        )
+        names = tuple(parameter.name for parameter in one.inputs)
+        return Call(
+            name, record.name, "", comment, arguments, (names,), self._results(one), (), (), ""
+        )
+
+    def _arguments(self, function: Function, comment: Comment) -> Iterable[Argument]:
+        typed = [dict(self.stubs[0].arguments(function))]
+        typed.append({one.name: self.stubs[1].argument(one) for one in function.inputs})
+        for one in function.inputs:
+            forms = self._plain(typed[0][one.name]), self._plain(typed[1][one.name])
+            meaning = comment.parameters.get(one.name, "")
+            if self._is_cell(one):
+                forms = f'Cell("{one.type.target.spelled()}").pointer', forms[1]
+            yield Argument(_said(one.name), one.type.spelled(), forms, meaning)
+
+    def _is_cell(self, one: Parameter) -> bool:
+        """Whether a call fills or reads a number or a pointer behind this one."""
+        type_ = self.known.resolve(one.type)
+        if type_.layers == ("p", "p"):
+            return True
+        is_number = type_.name not in ("void", "char") and type_.name not in self.known.records
+        return type_.layers == ("p",) and is_number and not one.is_bytes
+
+    def _results(self, function: Function) -> Tuple[str, str]:
+        plain = self._plain(self.stubs[0].result(function))
+        if re.fullmatch(r"unsigned int \* pointer", plain):
+            plain = "int"  # the classes read it
+        if function.outputs:
+            plain = f"({plain[1:-1]})"  # a tuple; the flat answer is a list
+        return plain, self._plain(self.stubs[1].result(function))
+
+    def _plain(self, hint: str) -> str:
+        """A type of the stubs in words: `str or None`, `VSInfo`, `unsigned int * pointer`."""
+        hint = re.sub(r",(?=\S)", ", ", hint.replace("_flat.", ""))
+        hint = hint.replace("Union[str, _CharPointer]", "str").replace("str, _CharPointer", "str")
+        hint = re.sub(r"Callable\[\[Any, Any\], Any\]", "function", hint)
+        hint = re.sub(r"_Pointer\b(?!\w)", "any pointer", hint)
+        hint = re.sub(r"\b_(\w+)", lambda match: self._pointer(match[1]), hint)
+        before = ""
+        while before != hint:
+            before = hint
+            hint = re.sub(r"Union\[([^\[\]]*), Any\]", r"\1", hint)
+            hint = re.sub(r"Optional\[([^\[\]]*)\]", r"\1 or None", hint)
+            hint = re.sub(
+                r"Union\[([^\[\]]*)\]", lambda match: match[1].replace(", ", " or "), hint
+            )
+            hint = re.sub(r"Tuple\[([^\[\]]*)\]", r"list(\1)", hint)
+            hint = hint.replace("Array[", "Array(") if "Array[" in hint else hint
+            hint = re.sub(r"Array\((\w+)\]", r"array of \1", hint)
+        return re.sub(r"list\((.*)\)$", r"[\1]", hint)
+
+    def _pointer(self, name: str) -> str:
+        """The C type behind the name of a class of pointers."""
+        if name in self.known.records:
+            return f"{name} * pointer"
+        if "Function" in name:
+            return "function pointer"
+        target, stars = name, 0
+        while target.endswith("Pointer"):
+            target, stars = target[: -len("Pointer")], stars + 1
+        words = re.sub(r"(?<=[a-z])(?=[A-Z])", " ", re.sub(r"Array\d+$", "", target))
+        spelled = target if target in self.known.records else words.lower()
+        return f"{spelled} {'*' * max(stars, 1)} pointer"
+
+    def _ownership(
+        self, function: Function, prototype: str, header: str, comment: Comment
+    ) -> Iterable[str]:
+        """Who owns what a call takes and answers."""
+        door = self.door(function.name, header, comment)
+        for one in function.parameters:
+            type_ = self.known.resolve(one.type)
+            if type_.layers == ("p", "p") and function.name != "DVSData_Data":
+                said = f"the library's memory, to be given back once with {door}"
+                yield f"`{one.name}`: {said if door else _VIEW}."
+            elif type_.layers == ("p", "p"):
+                yield f"`{one.name}`: {_VIEW}."
+            elif type_.layers == ("p",) and type_.name in self.known.records:
+                is_read = re.search(rf"\bconst \*{one.name}\b", prototype) or re.search(
+                    r"_(Set|Append|Clear)", function.name
+                )
+                said = "the caller's, only read" if is_read else "the caller's; the call fills it"
+                if header and not function.name.endswith(("Free", "FreeMemory")):
+                    yield f"`{one.name}`: {said}."
+
+    def door(self, name: str, header: str, comment: Comment) -> Optional[str]:
+        """The call that takes back what this one hands out, as its comment or its file's says."""
+        if name.endswith("PropList"):
+            return "DVSData_Free"
+        spoken = r"(?:goes back through|gives to|to be given back with) (\w+)"
+        texts = [comment.text, *comment.parameters.values()]
+        if header:
+            texts.append(self.headers[header].text.text)
+        for text in texts:
+            found = re.search(spoken, re.sub(r"\s+", " ", text))
+            if found:
+                return found[1]
+        return None
+
+
+def _said(name: str) -> str:
+    """The name of a parameter; in capitals, it tells the generator how to treat an array."""
+    return "array" if name.isupper() else name
+
+
+def _headers(folder: Path) -> Dict[str, Header]:
+    found = {}
+    for path in sorted(folder.rglob("*.h")):
+        name = str(path.relative_to(folder))
+        found[name] = comments.read(path, name)
+    return found
+
+
+def _shape_of_result(function: Function) -> Tuple[str, ...]:
+    if not function.outputs:
+        return ()
+    return ("status", *(one.name for one in function.outputs))

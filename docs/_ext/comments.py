@@ -1,0 +1,141 @@
+"""What the headers say in words: of files, functions, families of constants."""
+
+import re
+from dataclasses import dataclass, field
+from pathlib import Path
+from typing import Dict, List, Tuple
+
+from definitions import undecorated
+
+
+@dataclass(frozen=True)
+class Comment:
+    """A comment, parted at its commands."""
+
+    text: str
+    parameters: Dict[str, str]
+    returns: str
+
+
+@dataclass(frozen=True)
+class Family:
+    """Constants under one comment: an enumeration, or definitions in a row."""
+
+    title: str  # the enumeration's name; what the names share, with a star; or nothing
+    text: str
+    names: Tuple[str, ...]
+    remarks: Dict[str, str]  # what is said of single ones
+
+
+@dataclass
+class Header:
+    name: str
+    text: Comment
+    families: List[Family] = field(default_factory=list)
+    prototypes: Dict[str, str] = field(default_factory=dict)
+    comments: Dict[str, str] = field(default_factory=dict)  # of functions
+
+
+_COMMENT = r"/\*\*(?!<)(?P<comment>(?:[^*]|\*(?!/))*)\*/"
+_ITEM = re.compile(
+    r"(?:/\*\*(?P<above>[^<](?:[^*]|\*(?!/))*)\*/\s*)?"
+    r"(?P<name>\b\w+)\s*(?:=\s*[^,}/]+?)?\s*(?:,|$)[ \t]*"
+    r"(?:/\*\*<(?P<behind>(?:[^*]|\*(?!/))*)\*/)?",
+    re.MULTILINE,
+)
+
+
+def parted(comment: str) -> Comment:
+    """Takes an undecorated comment apart."""
+    first, *commands = re.split(r"^@(?=\w)", comment, flags=re.MULTILINE)
+    parameters: Dict[str, str] = {}
+    text, returns = first.strip(), ""
+    for command in commands:
+        kind, _, rest = command.partition(" ")
+        rest = re.sub(r"\s*\n\s*", " ", rest.strip()) if kind != "file" else command[4:].strip()
+        name, _, meaning = rest.partition(" ")
+        if kind.strip().startswith("file"):
+            text = f"{text}\n\n{command[4:].strip()}".strip()
+        elif kind == "param":
+            parameters[name] = meaning
+        elif kind in ("return", "returns"):
+            returns = rest
+        else:
+            raise ValueError(f"unknown command @{kind} in a comment")
+    return Comment(text, parameters, returns)
+
+
+def statuses_in(text: str) -> Dict[str, str]:
+    """The statuses that a text names, each with what it says of it.
+
+    Either way round: `QEX_EXISTS if it is taken`, `a name the host does not know is QEX_NOT_FOUND`.
+    """
+    found: Dict[str, str] = {}
+    status = r"QEX_[A-Z][A-Z_0-9]+"
+    when = rf"{status} (?:if|for|when|while|past|unless)\b"
+    for sentence in re.split(r"(?<=[.;:])\s+", re.sub(r"\s+", " ", text)):
+        for part in re.split(rf",? (?:and |else )?(?={when})|(?<=[A-Z]), ", sentence):
+            part = part.rstrip(".;:, ")
+            for name in re.findall(rf"\b{status}\b", part):
+                said = re.sub(rf"^{name} (?=\w)|(?:,? is|,? else|,)? {name}$", "", part)
+                found[name] = "; ".join(filter(None, [found.get(name, ""), said]))
+    return found
+
+
+def read(path: Path, name: str) -> Header:
+    source = path.read_text(encoding="ascii")
+    file = re.search(_COMMENT.replace("(?P<comment>", r"(?P<comment>\s*\*?\s*@file"), source)
+    if file is None:  # the helpers open with a comment about themselves
+        file = re.match(_COMMENT, source)
+    header = Header(name, parted(undecorated(file["comment"]) if file else ""))
+    _read_families(source, header)
+    _read_functions(source, header)
+    return header
+
+
+def _read_families(source: str, header: Header) -> None:
+    enumeration = (
+        rf"{_COMMENT}\s*(?:typedef )?enum\s*\w*\s*\{{(?P<items>[^}}]*)\}}\s*(?P<title>\w*);"
+    )
+    definitions = rf"{_COMMENT}\n(?P<lines>(?:#define \w+ .*\n)+)"
+    found = []
+    for match in re.finditer(enumeration, source):
+        items = list(_ITEM.finditer(match["items"]))
+        remarks = {
+            item["name"]: undecorated(item["above"] or item["behind"])
+            for item in items
+            if item["above"] or item["behind"]
+        }
+        names = tuple(item["name"] for item in items)
+        title = match["title"] or common_start(names)
+        text = undecorated(match["comment"])
+        found.append((match.start(), Family(title, text, names, remarks)))
+    for match in re.finditer(definitions, source):
+        names = tuple(re.findall(r"#define (\w+)", match["lines"]))
+        text = undecorated(match["comment"])
+        found.append((match.start(), Family(common_start(names), text, names, {})))
+    header.families = [family for _, family in sorted(found, key=lambda one: one[0])]
+
+
+def common_start(names: Tuple[str, ...]) -> str:
+    """What names share up to an underscore, with a star; of a single one, itself."""
+    if len(names) == 1:
+        return names[0]
+    parts = [name.split("_") for name in names]
+    shared: List[str] = []
+    for column in zip(*parts):
+        if len(set(column)) > 1:
+            break
+        shared.append(column[0])
+    return "_".join([*shared, "*"]) if shared else ""
+
+
+def _read_functions(source: str, header: Header) -> None:
+    declaration = r"(?:[A-Za-z_][\w \n*]*?\b\w+\([^;{]*\);\n?)"
+    for match in re.finditer(rf"{_COMMENT}\n(?P<declarations>{declaration}+)", source):
+        for one in re.findall(declaration, match["declarations"]):
+            prototype = re.sub(r"\s+", " ", one.strip())
+            name = re.search(r"(\w+)\(", prototype)
+            if name and not prototype.startswith("typedef"):
+                header.prototypes[name[1]] = prototype
+                header.comments[name[1]] = undecorated(match["comment"])

@@ -1,0 +1,37 @@
+"""The site, as Sphinx is told. ./dev docs builds it."""
+
+import os
+import sys
+from pathlib import Path
+
+HERE = Path(__file__).resolve().parent
+sys.path.insert(0, str(HERE / "_ext"))
+
+project = "libvswitch"
+author = "the authors of libvswitch"
+project_copyright = author
+html_title = "libvswitch for Python"
+
+extensions = ["myst_parser", "documents", "reference"]
+build_folder = os.environ.get("BUILD_DIR", str(HERE.parent / "build"))
+exclude_patterns = ["_ext", "_static"]
+
+nitpicky = True
+toc_object_entries_show_parents = "hide"
+add_function_parentheses = False
+smartquotes = False
+add_module_names = True
+myst_heading_anchors = 3
+myst_enable_extensions = ["deflist"]
+pygments_style = "friendly"
+# Only colour is lost where a quoted text of a shell session goes on in the next line.
+suppress_warnings = ["misc.highlighting_failure"]
+highlight_language = "none"
+
+html_theme = "furo"
+html_static_path = ["_static"]
+html_css_files = ["site.css"]
+html_copy_source = False
+html_show_sphinx = False
+html_show_copyright = False
+html_theme_options = {"navigation_with_keys": True}

@@ -1,0 +1,38 @@
+"""The site, built once for all tests, and the modules that make its reference."""
+
+import os
+import subprocess
+import sys
+from pathlib import Path
+from typing import Dict
+
+import pytest
+
+ROOT = Path(__file__).resolve().parents[2]
+BUILD = Path(os.environ["BUILD_DIR"])
+sys.path[:0] = [str(ROOT / "docs/_ext"), str(ROOT / "tests/surface")]
+# At the end, for the package of the classes that lies there is not built.
+sys.path.append(str(ROOT / "python"))
+
+import pages  # noqa: E402
+from catalogue import Catalogue  # noqa: E402
+
+
+@pytest.fixture(scope="session")
+def site(tmp_path_factory: pytest.TempPathFactory) -> Dict[str, pages.Page]:
+    """The pages by their paths in the site; a build that warns is an error."""
+    folder = tmp_path_factory.mktemp("docs")
+    command = [
+        "/usr/bin/python3",
+        *("-m", "sphinx", "-W", "--keep-going", "-n", "-q"),
+        *("-d", str(folder / "doctrees"), str(ROOT / "docs"), str(folder / "html")),
+    ]
+    done = subprocess.run(command, capture_output=True, text=True)
+    assert done.returncode == 0, done.stdout + done.stderr
+    assert done.stderr == ""
+    return pages.read(folder / "html")
+
+
+@pytest.fixture(scope="session")
+def catalogue() -> Catalogue:
+    return Catalogue(ROOT, BUILD)

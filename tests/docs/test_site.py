@@ -1,0 +1,162 @@
+"""The site: whatever the reference tables list has its place, no link is broken, the search
+finds."""
+
+import json
+import subprocess
+from pathlib import Path
+from typing import Any, Dict, List, Tuple
+from urllib.parse import unquote, urlsplit
+
+import functions
+import pytest
+import records
+from pages import Page
+
+HERE = Path(__file__).parent
+SURFACE = HERE.parent / "surface"
+
+Site = Dict[str, Page]
+
+
+def place_of(site: Site, folder: str, anchor: str) -> Tuple[Page, str]:
+    """The page of a part of the reference that has an anchor, and what stands there."""
+    holders = [
+        page
+        for path, page in site.items()
+        if path.startswith(f"reference/{folder}/") and anchor in page.starts
+    ]
+    assert len(holders) == 1, f"{anchor} stands on {len(holders)} pages"
+    return holders[0], holders[0].below(anchor)
+
+
+def of_kind(kind: str) -> List[str]:
+    return sorted({one.name for one in functions.read() if one.kind == kind})
+
+
+def entry(site: Site, folder: str, name: str) -> str:
+    """What a page says of a function, up to the next one."""
+    _, text = place_of(site, folder, f"_libvswitch.{name}")
+    return text.partition("\nlibvswitch.")[0]
+
+
+def test_every_call(site: Site) -> None:
+    calls = of_kind("call")
+    assert len(calls) == 146
+    listed = {one.name: one for one in functions.read() if one.kind == "call"}
+    for name in calls:
+        place_of(site, "calls", f"libvswitch.{name}")
+        text = entry(site, "calls", name)
+        assert "Answers" in text, name
+        assert "Simulated host" in text, name
+        assert ("Statuses" in text) == ("status" in listed[name].result), name
+        assert ("Parameter" in text) == bool(listed[name].arguments), name
+
+
+def test_only_what_is_not_modelled_is_said_not_to_be(site: Site) -> None:
+    fixed = [name for name in of_kind("call") if "answers always" in entry(site, "calls", name)]
+    table = HERE.parent / "simhost/python/fixed_answers.txt"
+    lines = [line for line in table.read_text().splitlines() if line and line[0] != "#"]
+    assert fixed == [line.split()[0] for line in lines]
+
+
+def test_every_method_and_helper(site: Site) -> None:
+    methods = of_kind("method")
+    assert len(methods) == 44
+    for name in methods:
+        is_of_record = name.partition("_")[0] in records.read() or name.startswith("qex_Name_")
+        assert "Answers" in entry(site, "records" if is_of_record else "calls", name)
+    assert len(of_kind("helper")) == 3
+    for name in of_kind("helper"):
+        assert "Answers" in entry(site, "calls", name)
+
+
+def test_every_record(site: Site) -> None:
+    listed = records.read()
+    assert len(listed) == 89
+    for record in listed.values():
+        page, text = place_of(site, "records", f"libvswitch.{record.name}")
+        source = page.path.read_text(encoding="utf-8")
+        assert source.count(f'aria-label="The {record.size} bytes of {record.name}:') == 1
+        assert f"{record.size:,} bytes, declared in" in text
+        assert f"new_{record.name}" in text
+        for field in record.fields:
+            assert f"libvswitch.{record.name}.{field.name}" in page.starts
+            row = page.below(f"libvswitch.{record.name}.{field.name}", 2000)
+            words = row.split()
+            assert words[0] == field.name
+            assert str(field.offset) in words[1:8], (record.name, field.name)
+            accessors = row[: row.index("_get") + 1500].split()
+            assert f"{record.name}_{field.name}_get" in accessors
+            writer = f"_libvswitch.{record.name}_{field.name}_set"
+            assert (writer in page.starts) == field.writable
+
+
+def test_every_constant(site: Site) -> None:
+    lines = (SURFACE / "constants.txt").read_text().splitlines()
+    listed = dict(line.split(" = ", 1) for line in lines if " = " in line and line[0] != "#")
+    assert len(listed) == 919
+    for name, value in listed.items():
+        page, text = place_of(site, "constants", f"_libvswitch.{name}")
+        words = text.split(None, 2)
+        assert words[0] == name
+        assert text[text.index(name) + len(name) :].strip().startswith(value), name
+
+
+def test_links(site: Site) -> None:
+    known = {page.path.resolve(): set(page.anchors) for page in site.values()}
+    broken = []
+    for page in site.values():
+        for link in page.links:
+            parts = urlsplit(link)
+            if parts.scheme or parts.netloc:
+                continue
+            target = (page.path.parent / unquote(parts.path)).resolve() if parts.path else page.path
+            anchor = unquote(parts.fragment)
+            if not target.exists() or (anchor and anchor not in known.get(target, {anchor})):
+                broken.append(f"{page.path.name}: {link}")
+    assert broken == []
+    assert sum(len(page.links) for page in site.values()) > 1000
+
+
+def test_a_broken_link_would_be_found(site: Site) -> None:
+    page = Page(next(iter(site.values())).path.with_name("planted.html"), links=["nowhere.html"])
+    with pytest.raises(AssertionError, match="nowhere.html"):
+        test_links({**site, "planted": page})
+
+
+def test_no_page_is_in_two_places(site: Site) -> None:
+    for page in site.values():
+        assert len(page.anchors) == len(set(page.anchors)), page.path
+
+
+@pytest.mark.parametrize(
+    "query, page",
+    [
+        ("VSDVS_SetPortVLANPolicy", "reference/calls/configuration"),
+        ("VSMACLearning", "reference/records/mac"),
+        ("VSMACLearning_agingTime_get", "reference/records/mac"),
+        ("QEX_NICTEAMING_SLAVE", "reference/constants/status"),
+        ("VSUplinks___len__", "reference/records/uplinks"),
+        ("reverse-ARP announcements", "reference/calls/queries"),
+        ("scenario", "guides/describing_a_host"),
+        ("trap", "guides/errors"),
+    ],
+)
+def test_search(site: Site, query: str, page: str) -> None:
+    assert page in search(site, query)[:3]
+
+
+def test_search_of_nothing(site: Site) -> None:
+    assert search(site, "VSDVS_NoSuchCall") == []
+
+
+def search(site: Site, query: str) -> List[str]:
+    """The pages that the site's own search finds, as a browser would run it."""
+    static = next(iter(site.values())).path.parents[0]
+    while not (static / "searchindex.js").exists():
+        static = static.parent
+    command = ["node", str(HERE / "search.js"), str(static), query]
+    done = subprocess.run(command, capture_output=True, text=True, timeout=60)
+    assert done.returncode == 0, done.stderr
+    found: Any = json.loads(done.stdout)
+    return [str(page) for page in found]
