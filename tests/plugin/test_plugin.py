@@ -7,7 +7,9 @@ import textwrap
 from pathlib import Path
 
 import pytest
+import simhost
 
+README = Path(__file__).resolve().parents[2] / "simhost/python/README.md"
 DOCTOR = "python3 -m libvswitch.doctor says which host is loaded, and from where."
 ADVICE = "Give each block back once; libvswitch.owned does at the end of its block of code."
 
@@ -436,14 +438,20 @@ def test_explains_itself(pytester: pytest.Pytester) -> None:
 
 
 def test_the_readme_shows_what_passes(pytester: pytest.Pytester) -> None:
-    root = Path(__file__).resolve().parents[2]
-    text = (root / "simhost/python/README.md").read_text(encoding="utf-8")
+    text = README.read_text(encoding="utf-8")
     code = "".join(re.findall(r"^```python\n(.*?)^```$", text, re.M | re.S))
-    tests = len(re.findall(r"^ *def test_", code, re.M))
-    assert tests > 5
-    run(pytester, code).assert_outcomes(passed=tests)
+    tests = re.findall(r"^def test_", code, re.M)
+    assert tests
+    run(pytester, code).assert_outcomes(passed=len(tests))
     said = re.search(r"^_+ test_the_uplinks _+\n(.*?)^```$", text, re.M | re.S)
     assert said and said[1].rstrip() == left_out("the test", "VSQEX_GetUplinks: 80 bytes")
+
+
+def test_the_readme_names_all_there_is() -> None:
+    text = README.read_text(encoding="utf-8")
+    for kind in (simhost.SimulatedHost, simhost.Host, simhost.SharedHost, simhost.Clock):
+        for name in vars(kind):
+            assert name.startswith("_") or re.search(rf"[`.]{name}\b", text), name
 
 
 def test_is_typed(tmp_path: Path) -> None:
