@@ -9,3 +9,4 @@ set(SIMHOST_INSTALL_DIR "${CMAKE_INSTALL_LIBDIR}/libvswitch/simhost" CACHE STRIN
     "Where the simulated host's libraries and simhostctl are installed")
 set(HOST_RUNPATH "$ORIGIN/../simhost" CACHE STRING
     "Where the module looks for the host after LD_LIBRARY_PATH and before the system's folders")
+option(INSTALL_METADATA "Install what tells Python tools the name and version of each package" ON)

@@ -181,8 +181,8 @@ def _host(report: Report, module: _elf.Elf) -> List[_elf.Elf]:
                 ERROR,
                 "host",
                 f"{name} is nowhere the loader looks",
-                "point LD_LIBRARY_PATH at the folder that holds it, or build the simulated host "
-                "with ./dev build",
+                "point LD_LIBRARY_PATH at the folder that holds it, or get the simulated host: the "
+                "package libvswitch-simhost, or ./dev build",
             )
     return found
 

@@ -1,0 +1,10 @@
+"""Runs the simhostctl that a wheel carries beside the simulated host's libraries."""
+
+import os
+import sys
+from pathlib import Path
+
+
+def main() -> None:
+    program = str(Path(__file__).resolve().with_name("lib") / "simhostctl")
+    os.execv(program, [program, *sys.argv[1:]])
