@@ -1,0 +1,82 @@
+"""The wheel, installed into an environment on a machine that has nothing else of this, and removed.
+
+The tests go on where the one before left the environment: it ends as it began.
+"""
+
+from pathlib import Path
+from typing import Set
+
+import pytest
+from on_a_machine import HOST, Machine
+from roots import Root
+
+EXAMPLES = Path(__file__).resolve().parents[2] / "examples"
+
+ENVIRONMENT = "/tmp/environment"
+PACKAGES = f"{ENVIRONMENT}/lib/python3.11/site-packages"
+SIMHOST = f"{PACKAGES}/simhost/lib"
+
+
+def files(root: Root) -> Set[str]:
+    """What the environment holds, but for the byte code of its own tools."""
+    found = root.run("find", ENVIRONMENT).splitlines()
+    return {file for file in found if not file.startswith(f"{PACKAGES}/pip/")}
+
+
+@pytest.fixture(scope="module")
+def before(root: Root) -> Set[str]:
+    root.satisfy("python3-venv, python3-pytest, mypy")
+    root.run("python3", "-m", "venv", ENVIRONMENT)
+    return files(root)
+
+
+@pytest.fixture(scope="module")
+def machine(root: Root, before: Set[str], wheel: Path) -> Machine:
+    assert before
+    for example in EXAMPLES.glob("*.py"):
+        root.put(example, "/tmp/examples")
+    file = root.put(wheel, "/tmp/wheel")
+    root.run(f"{ENVIRONMENT}/bin/pip", "install", "--no-index", file)
+    return Machine(root, f"{ENVIRONMENT}/bin/python", f"{ENVIRONMENT}/bin/simhostctl")
+
+
+def test_it_says_which_host_it_found(machine: Machine) -> None:
+    machine.finds_simulated_host(SIMHOST)
+
+
+def test_the_examples_run(machine: Machine) -> None:
+    machine.runs_the_examples("/tmp/examples")
+
+
+def test_simhostctl_controls_the_host(machine: Machine) -> None:
+    machine.controls_the_host()
+
+
+def test_the_plugin_is_found(machine: Machine) -> None:
+    # An environment has no pytest of its own; that of the system is lent to it.
+    machine.runs_tests_with_the_plugin(PYTHONPATH="/usr/lib/python3/dist-packages")
+
+
+def test_type_checkers_find_the_stubs(machine: Machine) -> None:
+    machine.type_checks("--python-executable", machine.python)
+
+
+def test_it_brings_its_host_and_prefers_it_to_the_systems(
+    machine: Machine, real_host: Path
+) -> None:
+    for name in HOST:
+        machine.root.put(real_host / name, "/usr/lib")
+        machine.root.put(real_host / name, "/opt/host")
+    machine.root.run("ldconfig")
+    machine.finds_simulated_host(SIMHOST)
+    assert machine.answer_of_the_host() != 4242
+    assert machine.answer_of_the_host(LD_LIBRARY_PATH="/opt/host") == 4242
+    found = machine.doctor(LD_LIBRARY_PATH="/opt/host")
+    assert (found["is_well"], found["simulated"]) == (True, False)
+    assert found["host"] == {name: f"/opt/host/{name}" for name in HOST}
+
+
+def test_nothing_is_left_after_uninstalling(machine: Machine, before: Set[str]) -> None:
+    assert f"{SIMHOST}/libvswitch.so" in files(machine.root) - before
+    machine.root.run(f"{ENVIRONMENT}/bin/pip", "uninstall", "-y", "libvswitch")
+    assert files(machine.root) ^ before == set()
