@@ -96,14 +96,15 @@ int simhost_delay_call(char const *function, uint32_t nth, uint32_t times, uint3
 /** Removes the faults of a function, or all for null. */
 int simhost_clear_faults(char const *function);
 
-/* The ledger: memory that the host gave out in this process. With SIMHOST_LEDGER=1 in the
- * environment, what is still out when the process ends is summed up on standard error. */
+/* The ledger: memory and lists that the host gave out in this process. With SIMHOST_LEDGER=1 in the
+ * environment, what is still out when the process ends is summed up on standard error. The size of
+ * a list is what it takes with all that it holds, in whosever memory. */
 
-/** How many blocks of memory the host has given out in this process and not got back. */
+/** How many blocks of memory and lists the host has given out in this process and not got back. */
 size_t simhost_ledger_count(void);
 
 /**
- * One line per block that is out, oldest first: "<address> <size> bytes from <call>".
+ * One line per block or list that is out, oldest first: "<address> <size> bytes from <call>".
  *
  * @param text receives as much as fits and a NUL; null if `size` is 0
  * @param size bytes at `text`

@@ -27,10 +27,12 @@ void *ListMemory::do_allocate(std::size_t size, std::size_t /*alignment*/) {
   if (memory == nullptr) {
     throw std::bad_alloc();
   }
+  in_use_ += size;
   return memory;
 }
 
-void ListMemory::do_deallocate(void *memory, std::size_t /*size*/, std::size_t /*alignment*/) {
+void ListMemory::do_deallocate(void *memory, std::size_t size, std::size_t /*alignment*/) {
+  in_use_ -= size;
   if (is_hosts()) {
     ::operator delete(memory);
   } else {
@@ -44,7 +46,8 @@ bool ListMemory::do_is_equal(memory_resource const &other) const noexcept {
 
 DataList *DataList::make(DVSData_MemAlloc alloc, DVSData_MemFree release) {
   ListMemory memory(alloc, release);
-  return new (memory.allocate(sizeof(DataList), alignof(DataList))) DataList(memory);
+  auto *const place = memory.allocate(sizeof(DataList), alignof(DataList));
+  return new (place) DataList(ListMemory(alloc, release));
 }
 
 void DataList::destroy(DataList *list) {
@@ -54,7 +57,8 @@ void DataList::destroy(DataList *list) {
 }
 
 void *DataList::allocate(std::size_t size) {
-  return memory_.allocate(size);
+  auto leaving = memory_;
+  return leaving.allocate(size);
 }
 
 void DataList::update(std::string_view name, BytesView value, store::PropertyType type) {
@@ -86,8 +90,13 @@ Bytes DataList::serialized(std::uint32_t version) const {
   return writer.block(BlockKind::list, version);
 }
 
-void DataLists::add(DataList *list) {
+void DataLists::add(DataList *list, char const *call) {
   lists_.insert(list);
+  ledger_.note(list, list->size(), call, "DVSData_Free");
+}
+
+void DataLists::changed(DataList const &list) {
+  ledger_.resize(&list, list.size());
 }
 
 DataList &DataLists::known(void *handle) const {
@@ -103,6 +112,7 @@ DataList &DataLists::known(void *handle) const {
 DataList *DataLists::take_back(void *handle) {
   auto *const list = &known(handle);
   lists_.erase(handle);
+  ledger_.forget(handle);
   freed_.push_back(handle);
   if (freed_.size() > kRememberedLists) {
     freed_.pop_front();

@@ -6,14 +6,15 @@
 #include <deque>
 #include <list>
 #include <memory_resource>
-#include <set>
 #include <string>
 #include <string_view>
+#include <unordered_set>
 #include <utility>
 #include <vector>
 
 #include "core/api.h"
 #include "core/bytes.h"
+#include "core/ledger.h"
 #include "nebpublic/handles.h"
 #include "store/properties.h"
 
@@ -27,6 +28,8 @@ class ListMemory : public std::pmr::memory_resource {
   ListMemory(DVSData_MemAlloc alloc, DVSData_MemFree release);
 
   [[nodiscard]] bool is_hosts() const { return alloc_ == nullptr; }
+  /// Bytes that are allocated in it.
+  [[nodiscard]] std::size_t in_use() const { return in_use_; }
 
  private:
   void *do_allocate(std::size_t size, std::size_t alignment) override;
@@ -35,6 +38,7 @@ class ListMemory : public std::pmr::memory_resource {
 
   DVSData_MemAlloc alloc_;
   DVSData_MemFree release_;
+  std::size_t in_use_ = 0;
 };
 
 /// A list lives, with all that it holds, in its own memory. Its functions run the caller's
@@ -48,6 +52,8 @@ class SIMHOST_API DataList {
   DataList &operator=(DataList const &) = delete;
 
   [[nodiscard]] bool is_in_hosts_memory() const { return memory_.is_hosts(); }
+  /// Bytes of the list and all that it holds.
+  [[nodiscard]] std::size_t size() const { return sizeof(DataList) + memory_.in_use(); }
   /// Memory of the list's kind for a block that leaves it.
   void *allocate(std::size_t size);
   /// Adds an item or replaces the one of that name. Refuses no name (QEX_BAD_PARAM).
@@ -69,16 +75,21 @@ class SIMHOST_API DataList {
   std::pmr::list<Entry> entries_;
 };
 
-/// The lists that are out.
+/// The lists that are out, which the ledger is told of.
 class DataLists {
  public:
-  SIMHOST_API void add(DataList *list);
+  explicit DataLists(Ledger &ledger) : ledger_(ledger) {}
+
+  SIMHOST_API void add(DataList *list, char const *call);
+  /// The list holds more or less than before.
+  SIMHOST_API void changed(DataList const &list);
   /// These throw HostPanic for a list that was never made, or is freed already.
   [[nodiscard]] SIMHOST_API DataList &known(void *handle) const;
   SIMHOST_API DataList *take_back(void *handle);
 
  private:
-  std::set<void *> lists_;
+  Ledger &ledger_;
+  std::unordered_set<void *> lists_;
   std::deque<void *> freed_;
 };
 

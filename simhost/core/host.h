@@ -30,7 +30,7 @@ class Host {
   std::mutex lock_;
   Ledger ledger_;
   Handles handles_;
-  DataLists lists_;
+  DataLists lists_{ledger_};
   bool configured_ = false;
   std::optional<std::filesystem::path> state_file_;
   std::optional<store::Store> state_;

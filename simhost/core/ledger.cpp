@@ -22,25 +22,53 @@ constexpr std::size_t kRememberedReturns = 1024;
 }  // namespace
 
 void *Ledger::give_out(std::size_t size, char const *call) {
-  blocks_.push_back({std::make_unique<std::byte[]>(size), size, call});
-  auto const block = std::prev(blocks_.end());
-  by_address_.emplace(block->memory.get(), block);
-  return block->memory.get();
+  auto memory = std::make_unique<std::byte[]>(size);
+  auto *const address = memory.get();
+  blocks_.push_back(
+      {.address = address, .memory = std::move(memory), .size = size, .giver = call, .taker = ""});
+  by_address_.emplace(address, std::prev(blocks_.end()));
+  return address;
 }
 
 void Ledger::take_back(void *memory, char const *call) {
   if (memory == nullptr) {
     return;
   }
+  auto const found = by_address_.find(memory);
+  if (found == by_address_.end() || !found->second->memory) {
+    refuse(memory);
+  }
+  auto const block = found->second;
+  returns_.push_back({memory, block->giver, call});
+  if (returns_.size() > kRememberedReturns) {
+    returns_.pop_front();
+  }
+  by_address_.erase(found);
+  blocks_.erase(block);
+}
+
+void Ledger::note(void const *address, std::size_t size, char const *call, char const *taker) {
+  blocks_.push_back(
+      {.address = address, .memory = nullptr, .size = size, .giver = call, .taker = taker});
+  by_address_.emplace(address, std::prev(blocks_.end()));
+}
+
+void Ledger::resize(void const *address, std::size_t size) {
+  by_address_.at(address)->size = size;
+}
+
+void Ledger::forget(void const *address) {
+  auto const found = by_address_.find(address);
+  blocks_.erase(found->second);
+  by_address_.erase(found);
+}
+
+void Ledger::refuse(void const *memory) const {
   if (auto const found = by_address_.find(memory); found != by_address_.end()) {
-    auto const block = found->second;
-    returns_.push_back({memory, block->giver, call});
-    if (returns_.size() > kRememberedReturns) {
-      returns_.pop_front();
-    }
-    by_address_.erase(found);
-    blocks_.erase(block);
-    return;
+    throw HostPanic(PanicKind::runtime_error, std::string(found->second->giver) +
+                                                  " gave out what is at " +
+                                                  text_of_address(memory) + ", and " +
+                                                  found->second->taker + " takes it back");
   }
   auto const last = std::find_if(returns_.rbegin(), returns_.rend(),
                                  [&](Return const &past) { return past.address == memory; });
@@ -57,9 +85,9 @@ std::size_t Ledger::report(std::span<char> text) const noexcept {
   std::size_t length = 0;
   for (auto const &block : blocks_) {
     auto const room = text.subspan(std::min(length, text.size()));
-    length += static_cast<std::size_t>(
-        std::snprintf(room.data(), room.size(), "%p %zu bytes from %s\n",
-                      static_cast<void *>(block.memory.get()), block.size, block.giver));
+    length +=
+        static_cast<std::size_t>(std::snprintf(room.data(), room.size(), "%p %zu bytes from %s\n",
+                                               block.address, block.size, block.giver));
   }
   if (length == 0 && !text.empty()) {
     text[0] = '\0';

@@ -1,4 +1,4 @@
-// The memory that the host has given out to its callers and not got back.
+// What the host has given out to its callers and not got back: memory, and lists.
 #pragma once
 
 #include <cstddef>
@@ -22,6 +22,14 @@ class Ledger {
   /// pointer that was never given out, or is back already.
   SIMHOST_API void take_back(void *memory, char const *call);
 
+  /// Notes that something of `size` bytes at `address` is out which is not the ledger's memory, and
+  /// which `taker` takes back.
+  SIMHOST_API void note(void const *address, std::size_t size, char const *call, char const *taker);
+  /// What was noted has another size now.
+  SIMHOST_API void resize(void const *address, std::size_t size);
+  /// What was noted is back.
+  SIMHOST_API void forget(void const *address);
+
   [[nodiscard]] std::size_t count() const { return blocks_.size(); }
   /// Writes one line per block, oldest first, and a NUL into `text`, cut at its size. Returns the
   /// length of the whole report without the NUL.
@@ -31,15 +39,19 @@ class Ledger {
 
  private:
   struct Block {
-    std::unique_ptr<std::byte[]> memory;
+    void const *address;
+    std::unique_ptr<std::byte[]> memory;  // null for what was noted only
     std::size_t size;
     char const *giver;
+    char const *taker;  // of what was noted
   };
   struct Return {
     void const *address;
     char const *giver;
     char const *taker;
   };
+
+  [[noreturn]] void refuse(void const *memory) const;
 
   std::list<Block> blocks_;  // oldest first
   std::unordered_map<void const *, std::list<Block>::iterator> by_address_;

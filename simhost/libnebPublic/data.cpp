@@ -39,7 +39,7 @@ QEX_ReturnStatus DVSData_Alloc(DVSDataHandle *list, DVSData_MemAlloc alloc,
   return answer(__func__, [&](Call &call) {
     auto &output = required(list);
     auto *const made = call.aside([&] { return DataList::make(alloc, release); });
-    call.lists().add(made);
+    call.lists().add(made, call.name());
     output = made;
   });
 }
@@ -61,6 +61,7 @@ QEX_ReturnStatus DVSData_Update(DVSDataHandle list, char const *name, void *data
     auto const value = simhost::argument_bytes(data, length);
     auto const type = simhost::property_type(propertyType);
     call.aside([&] { known.update(item, value, type); });
+    call.lists().changed(known);
   });
 }
 

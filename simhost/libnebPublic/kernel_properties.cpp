@@ -1,5 +1,6 @@
 // DVSQEX_*: properties by their keys, one by one and as lists.
 #include <array>
+#include <memory>
 #include <string_view>
 
 #include "core/boundary.h"
@@ -96,12 +97,13 @@ void make_list(Call &call, DVSDataHandle *output, Choice const &choice, Targets 
   }
   auto &transaction = call.reading();
   std::array const owners{owner_of(transaction, targets)...};
-  auto *const made = simhost::DataList::make(nullptr, nullptr);
-  call.lists().add(made);
+  std::unique_ptr<simhost::DataList, decltype(&simhost::DataList::destroy)> made(
+      simhost::DataList::make(nullptr, nullptr), &simhost::DataList::destroy);
   for (auto const &owner : owners) {
     add_chosen(*made, transaction, owner, choice);
   }
-  handle = made;
+  call.lists().add(made.get(), call.name());
+  handle = made.release();
 }
 
 }  // namespace

@@ -117,6 +117,22 @@ TEST(Ledger, ReportsOldestFirst) {
                                    text_of(last) + " 3 bytes from DVSQEX_StateGet\n");
 }
 
+TEST(Ledger, NotesWhatIsNotItsMemory) {
+  Ledger ledger;
+  int noted = 0;
+  ledger.note(&noted, 10, "Giver", "ItsTaker");
+  EXPECT_EQ(ledger.count(), 1U);
+  ledger.resize(&noted, 20);
+  EXPECT_EQ(ledger.summary(), "1 x 20 bytes from Giver\n");
+  EXPECT_EQ(report_of(ledger), text_of(&noted) + " 20 bytes from Giver\n");
+  EXPECT_EQ(panic_of(ledger, &noted),
+            "Giver gave out what is at " + text_of(&noted) + ", and ItsTaker takes it back");
+  EXPECT_EQ(ledger.count(), 1U);
+  ledger.forget(&noted);
+  EXPECT_EQ(ledger.count(), 0U);
+  EXPECT_EQ(panic_of(ledger, &noted), "the host never gave out the memory at " + text_of(&noted));
+}
+
 TEST(Ledger, ReportsNothingWhenNothingIsOut) {
   std::array<char, 4> text{'x', 'x', 'x', 'x'};
   EXPECT_EQ(Ledger().report(text), 0U);

@@ -1,0 +1,110 @@
+// The state as a whole in bytes: what an image brings back, and images that are none.
+#include "nebpublic/state.h"
+
+#include <gmock/gmock.h>
+
+#include <cstddef>
+#include <cstring>
+
+#include "configured_switch.h"
+#include "vswitch/properties.h"
+
+namespace {
+
+using StateImages = ConfiguredSwitch;
+
+Bytes image(QEX_ReturnStatus (*get)(void **, int *)) {
+  void *data = nullptr;
+  int length = 0;
+  EXPECT_EQ(get(&data, &length), QEX_OK);
+  return taken(data, length);
+}
+
+QEX_ReturnStatus deserialize(Bytes bytes) {
+  return DVSState_ConfigDeserialize(bytes.data(), static_cast<int>(bytes.size()));
+}
+
+TEST_F(StateImages, TheConfigurationComesBackFromItsImage) {
+  ASSERT_EQ(set_port(VSPROP_PORT_TX_UPLINK, {1}, "p", POLICY_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(set_port("com.example.soon", {1}, "p", RUNTIME_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(VSDVS_AddOpaqueDVPort("s", "q", "theirs"), QEX_OK);
+  ASSERT_EQ(VSDVS_CreateVSwitch("fleeting", nullptr, nullptr, 0, 0, 0, 0, 0), QEX_OK);
+  auto const persistent = image(DVSQEX_PersistentStateGet);
+  ASSERT_EQ(DVSState_ConfigReset(), QEX_OK);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("s"), nullptr);
+  EXPECT_EQ(deserialize(persistent), QEX_OK);
+  EXPECT_EQ(port(VSPROP_PORT_TX_UPLINK), Bytes{1});
+  EXPECT_EQ(port("com.example.soon"), std::nullopt);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("fleeting"), nullptr);
+  OpaqueDVPortData *opaque = nullptr;
+  ASSERT_EQ(DVSQEX_PortGetByExternalId("s-id", "theirs", &opaque), QEX_OK);
+  DVSQEX_DataFree(opaque);
+  EXPECT_EQ(VSDVS_AddSwitchUplinkPort("s", "nic0"), QEX_EXISTS) << "the uplinks are back";
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), persistent);
+}
+
+TEST_F(StateImages, TheWholeStateComesBackFromItsImage) {
+  ASSERT_EQ(set_port("com.example.soon", {1}, "p", RUNTIME_PROP_TYPE), QEX_OK);
+  ASSERT_EQ(VSDVS_CreateVSwitch("fleeting", nullptr, nullptr, 0, 0, 0, 0, 0), QEX_OK);
+  ASSERT_EQ(DVSQEX_SwitchAdd("i", "waiting", 0, 0), QEX_OK);
+  auto whole = image(DVSQEX_StateGet);
+  ASSERT_EQ(DVSQEX_StateInit(nullptr, 0), QEX_OK);
+  EXPECT_EQ(DVSState_SwitchFindByAlias("s"), nullptr);
+  EXPECT_EQ(deserialize(whole), QEX_BAD_PARAM) << "it is more than a configuration";
+  EXPECT_EQ(DVSQEX_StateInit(whole.data(), static_cast<int>(whole.size())), QEX_OK);
+  EXPECT_EQ(port("com.example.soon"), Bytes{1});
+  EXPECT_NE(DVSState_SwitchFindByAlias("fleeting"), nullptr);
+  EXPECT_EQ(image(DVSQEX_StateGet), whole);
+}
+
+TEST_F(StateImages, DamagedImagesAreRefusedAndChangeNothing) {
+  ASSERT_EQ(set_port(VSPROP_PORT_TX_UPLINK, {1}), QEX_OK);
+  auto const good = image(DVSQEX_PersistentStateGet);
+  for (std::size_t length = 0; length < good.size(); ++length) {
+    ASSERT_NE(deserialize(Bytes(good.begin(), good.begin() + static_cast<std::ptrdiff_t>(length))),
+              QEX_OK)
+        << length;
+  }
+  for (std::size_t at = 0; at < good.size(); ++at) {
+    auto bad = good;
+    bad[at] ^= 0x55;
+    // The version of the switch that a block is for changes nothing in it.
+    if (at < 12 || at >= 16) {
+      ASSERT_NE(deserialize(bad), QEX_OK) << at;
+    }
+  }
+  EXPECT_EQ(deserialize(good + Bytes{0}), QEX_INVALID_METADATA);
+  EXPECT_EQ(DVSState_ConfigDeserialize(nullptr, 0), QEX_INVALID_METADATA);
+  EXPECT_EQ(DVSState_ConfigDeserialize(nullptr, 8), QEX_BAD_PARAM);
+  auto byte = Bytes{0};
+  EXPECT_EQ(DVSState_ConfigDeserialize(byte.data(), -1), QEX_BAD_PARAM);
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), good);
+}
+
+// Past the checksum: what it covers may still be anything. The sum is the last field of the header.
+TEST_F(StateImages, ImagesWithARightChecksumAreReadWithCareToo) {
+  constexpr std::size_t kHeader = 24;
+  auto const good = image(DVSQEX_PersistentStateGet);
+  auto const with_sum = [](Bytes bytes) {
+    qex_uint32 sum = 2166136261U;
+    for (std::size_t at = kHeader; at < bytes.size(); ++at) {
+      sum = (sum ^ bytes[at]) * 16777619U;
+    }
+    std::memcpy(&bytes[kHeader - sizeof sum], &sum, sizeof sum);
+    return bytes;
+  };
+  ASSERT_EQ(with_sum(good), good) << "this test computes the sum as the host does";
+  int refused = 0;
+  for (std::size_t at = kHeader; at < good.size(); ++at) {
+    for (unsigned char const change : {0x01, 0x80, 0xFF}) {
+      auto bad = good;
+      bad[at] ^= change;
+      refused += deserialize(with_sum(bad)) == QEX_OK ? 0 : 1;
+    }
+  }
+  EXPECT_GT(refused, 100) << "most of these are no state";
+  EXPECT_EQ(deserialize(good), QEX_OK);
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), good);
+}
+
+}  // namespace
