@@ -42,7 +42,10 @@ Json described_uplink(Transaction &work, store::Uplink const &uplink) {
                  {"admin", described_choice(link.admin, kUpDown)},
                  {"lacp", described_choice(link.partner, kUpDown)},
                  {"speed", link.speed},
-                 {"duplex", described_choice(link.full_duplex, kDuplex)}};
+                 {"duplex", described_choice(link.full_duplex, kDuplex)},
+                 {"beacons", described_choice(link.beacons, kUpDown)},
+                 {"error_percent", link.error_percent},
+                 {"driver", link.driver}};
   if (uplink.port) {
     auto const port = known_port(work, *uplink.port);
     described["observed"] = {{"switch", store::find_switch(work, port.switch_key)->row.alias},
@@ -127,7 +130,8 @@ Json described_counters(Transaction &work, CounterOwner const &owner) {
   return list;
 }
 
-Json described_port(Transaction &work, store::Port const &port) {
+Json described_port(Transaction &work, store::Port const &port,
+                    dataplane::Carriers const &carriers) {
   auto const owner = PropertyOwner::port(port.switch_key, port.number);
   Place const place{.switch_key = port.switch_key, .port = port.number};
   Json described{{"id", port.identifier}};
@@ -147,7 +151,7 @@ Json described_port(Transaction &work, store::Port const &port) {
   describe_properties(described, work, owner);
   Json observed{{"number", static_cast<std::uint32_t>(port.number)}};
   try {
-    observed["uplink"] = dataplane::team_uplink(work, port);
+    observed["uplink"] = carriers.required_of(port);
   } catch (Refused const &refused) {
     observed["uplink"] = nullptr;
     observed["why"] = status_text(refused.status());
@@ -198,9 +202,11 @@ Json described_switch(Transaction &work, store::FoundSwitch const &known) {
     described["multicast"] = described_choice(record_of<std::uint32_t>(mode->value), kFilterModes);
   }
   Json ports = Json::array();
+  auto const own = dataplane::own_teamings(work, key);
+  dataplane::Carriers const carriers(dataplane::team_of(work, key), own);
   for (auto const &port : store::ports_of(work, key)) {
     if (port.kind == store::PortKind::client) {
-      ports.push_back(described_port(work, port));
+      ports.push_back(described_port(work, port, carriers));
     }
   }
   described["ports"] = std::move(ports);

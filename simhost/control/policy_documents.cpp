@@ -193,7 +193,8 @@ DVMirrorSession session_from(Node const &node, std::vector<DVMirrorEntity> &enti
 }  // namespace
 
 VSTeamPolicy teaming_from(Node const &node) {
-  node.only({"balance", "criteria", "flags", "speed", "full_duplex", "active", "standby"});
+  node.only({"balance", "criteria", "flags", "speed", "full_duplex", "error_percent", "active",
+             "standby"});
   VSTeamPolicy policy{};
   policy.loadBalance = node.get("balance", qex_uint32{TEAM_FRP_TYPE_LB_SRCID},
                                 [](Node const &given) { return given.choice(Bits(kBalances)); });
@@ -204,6 +205,8 @@ VSTeamPolicy teaming_from(Node const &node) {
   policy.speed =
       node.get("speed", qex_uint16{0}, [](Node const &given) { return given.integer(0, 0xFFFF); });
   policy.fullDuplex = node.get("full_duplex", qex_uint8{0}, &Node::flag_of);
+  policy.percentError = node.get("error_percent", qex_uint8{0},
+                                 [](Node const &given) { return given.integer(0, 100); });
   if (auto const active = node.find("active")) {
     policy.numActive = append_names(policy, 0, *active);
   }
@@ -219,6 +222,7 @@ Json described(VSTeamPolicy const &policy) {
           {"flags", described_bits(policy.flags, kTeamFlags)},
           {"speed", qex_uint16{policy.speed}},
           {"full_duplex", policy.fullDuplex != 0},
+          {"error_percent", policy.percentError},
           {"active", described_names(policy, 0, policy.numActive)},
           {"standby", described_names(policy, policy.numActive, policy.numStandby)}};
 }

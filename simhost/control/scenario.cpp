@@ -95,7 +95,8 @@ void apply_clock(Transaction &work, Node const &node) {
 }
 
 void apply_uplink(Transaction &work, Node const &node) {
-  node.only({"name", "link", "admin", "lacp", "speed", "duplex", "observed"});
+  node.only({"name", "link", "admin", "lacp", "speed", "duplex", "beacons", "error_percent",
+             "driver", "observed"});
   auto const name = node.at("name").text();
   if (name.empty() || name.size() >= QEX_MISC_NAME_MAX) {
     node.at("name").fail("must have 1 to 31 bytes");
@@ -112,6 +113,10 @@ void apply_uplink(Transaction &work, Node const &node) {
       node.get("speed", before.speed, [](Node const &speed) { return speed.integer(1, 1000000); });
   link.full_duplex = node.get("duplex", before.full_duplex,
                               [](Node const &duplex) { return duplex.choice(std::span(kDuplex)); });
+  link.beacons = node.get("beacons", before.beacons, up_or_down);
+  link.error_percent = node.get("error_percent", before.error_percent,
+                                [](Node const &percent) { return percent.integer(0, 100); });
+  link.driver = node.get("driver", before.driver, [](Node const &driver) { return driver.flag(); });
   dataplane::change_link(work, name, link);
 }
 

@@ -55,7 +55,8 @@ std::vector<Lag::Member> members_of(store::Transaction &transaction, std::int64_
 
 Link link_of(store::Transaction &transaction, std::string_view uplink) {
   auto select = transaction.query(
-      "SELECT carrier, admin, partner, speed, full_duplex, up_since FROM link WHERE uplink = ?");
+      "SELECT carrier, admin, partner, speed, full_duplex, up_since, beacons, errors, driver"
+      " FROM link WHERE uplink = ?");
   if (!select.with(uplink).next()) {
     return {};
   }
@@ -64,6 +65,9 @@ Link link_of(store::Transaction &transaction, std::string_view uplink) {
           .partner = select.integer(2) != 0,
           .speed = static_cast<std::uint32_t>(select.integer(3)),
           .full_duplex = select.integer(4) != 0,
+          .beacons = select.integer(6) != 0,
+          .error_percent = static_cast<std::uint32_t>(select.integer(7)),
+          .driver = select.integer(8) != 0,
           .up_since = ClockTime(select.integer(5))};
 }
 
@@ -71,14 +75,17 @@ void put_link(store::Transaction &transaction, std::string_view uplink, Link con
   auto const before = link_of(transaction, uplink);
   auto const up_since = link.up() && !before.up() ? clock_now(transaction) : before.up_since;
   auto upsert = transaction.query(
-      "INSERT INTO link (uplink, carrier, admin, partner, speed, full_duplex, up_since)"
-      " VALUES (?, ?, ?, ?, ?, ?, ?)"
+      "INSERT INTO link (uplink, carrier, admin, partner, speed, full_duplex, up_since, beacons,"
+      " errors, driver) VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"
       " ON CONFLICT (uplink) DO UPDATE SET carrier = excluded.carrier, admin = excluded.admin,"
       " partner = excluded.partner, speed = excluded.speed, full_duplex = excluded.full_duplex,"
-      " up_since = excluded.up_since");
+      " up_since = excluded.up_since, beacons = excluded.beacons, errors = excluded.errors,"
+      " driver = excluded.driver");
   upsert.with(uplink).with(std::int64_t{link.carrier}).with(std::int64_t{link.admin});
   upsert.with(std::int64_t{link.partner}).with(std::int64_t{link.speed});
-  upsert.with(std::int64_t{link.full_duplex}).with(up_since.count()).run();
+  upsert.with(std::int64_t{link.full_duplex}).with(up_since.count());
+  upsert.with(std::int64_t{link.beacons}).with(std::int64_t{link.error_percent});
+  upsert.with(std::int64_t{link.driver}).run();
 }
 
 std::vector<Lag> lags_of(store::Transaction &transaction, store::SwitchKey switch_key) {

@@ -16,6 +16,9 @@ struct Link {
   bool partner = true;          ///< the other end answers link aggregation
   std::uint32_t speed = 10000;  ///< Mbit/s
   bool full_duplex = true;
+  bool beacons = true;              ///< the beacons of the other uplinks arrive
+  std::uint32_t error_percent = 0;  ///< of its frames are damaged
+  bool driver = true;               ///< the driver of the card is loaded
   ClockTime up_since = {};  ///< when it came up last; the beginning of time if it was never down
 
   [[nodiscard]] bool up() const { return carrier && admin; }

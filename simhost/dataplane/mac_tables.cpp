@@ -115,30 +115,35 @@ void store_address(store::Transaction &transaction, Place const &place, VSMACEnt
   upsert.with(seen.count()).run();
 }
 
-std::int64_t count_learned(store::Transaction &transaction, Place const &place,
+static_assert(VS_MAC_ADDR_TYPE_LEARNED == 2, "the tables count what is of this type");
+
+// At a place, or kEverywhere: with what is too old and has not been removed yet.
+constexpr std::int64_t kEverywhere = -1;
+
+std::int64_t count_learned(store::Transaction &transaction, store::SwitchKey key,
+                           std::int64_t place) {
+  auto select = transaction.query("SELECT addresses FROM learned WHERE switch = ? AND place = ?");
+  return select.with(std::int64_t(key)).with(place).next() ? select.integer(0) : 0;
+}
+
+std::int64_t count_too_old(store::Transaction &transaction, Place const &place,
                            VSMACLearning const &learning) {
   auto select = transaction.query(
-      "SELECT count(*) FROM address WHERE switch = ? AND port IS nullif(?, 0) AND type = ?"
-      " AND NOT (ages AND seen <= ?)");
-  select.with(std::int64_t(place.switch_key)).with(port_or_none(place));
-  select.with(std::int64_t{VS_MAC_ADDR_TYPE_LEARNED}).with(gone_if_seen_by(transaction, learning));
-  select.next();
+      "SELECT count(*) FROM address WHERE switch = ? AND ages AND seen <= ?"
+      " AND ifnull(port, 0) = ? AND type = ?");
+  select.with(std::int64_t(place.switch_key)).with(gone_if_seen_by(transaction, learning));
+  select.with(port_or_none(place)).with(std::int64_t{VS_MAC_ADDR_TYPE_LEARNED}).next();
   return select.integer(0);
 }
 
 // Of a switch from which what is too old has been removed.
-std::int64_t count_learned(store::Transaction &transaction, store::SwitchKey key) {
-  auto select = transaction.query("SELECT count(*) FROM address WHERE switch = ? AND type = ?");
-  select.with(std::int64_t(key)).with(std::int64_t{VS_MAC_ADDR_TYPE_LEARNED}).next();
-  return select.integer(0);
-}
-
 bool has_room(store::Transaction &transaction, Place const &place, VSMACLearning const &learning,
               VSPMACLearning const &port, bool new_to_switch) {
   auto const limit =
       place.port ? port.macLimit : std::uint32_t{TEAM_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT};
-  return count_learned(transaction, place, learning) < limit &&
-         !(new_to_switch && count_learned(transaction, place.switch_key) >= learning.macLimit);
+  auto const key = place.switch_key;
+  return count_learned(transaction, key, port_or_none(place)) < limit &&
+         !(new_to_switch && count_learned(transaction, key, kEverywhere) >= learning.macLimit);
 }
 
 // A source that is not learned because there is no room.
@@ -160,7 +165,7 @@ std::vector<VSMACEntry> addresses(store::Transaction &transaction, Place const &
   auto const now = clock_now(transaction);
   auto select = transaction.query(
       "SELECT mac, type, ages, vid, vni, seen FROM address"
-      " WHERE switch = ? AND port IS nullif(?, 0) AND ? IN (type, ?)"
+      " WHERE switch = ? AND ifnull(port, 0) = ? AND ? IN (type, ?)"
       " AND NOT (ages AND seen <= ?) ORDER BY mac, vid, vni");
   auto const gone = gone_if_seen_by(transaction, learning_of(transaction, place.switch_key));
   select.with(std::int64_t(place.switch_key)).with(port_or_none(place));
@@ -255,7 +260,9 @@ VSPMACLearningStats learning_stats(store::Transaction &transaction, Place const 
   auto counters = counters_of(transaction, {.switch_key = place.switch_key, .port = place.port});
   auto const learning = learning_of(transaction, place.switch_key);
   VSPMACLearningStats stats{};
-  stats.numMACsLearned = static_cast<qex_uint32>(count_learned(transaction, place, learning));
+  stats.numMACsLearned =
+      static_cast<qex_uint32>(count_learned(transaction, place.switch_key, port_or_none(place)) -
+                              count_too_old(transaction, place, learning));
   stats.noLearningAllowedPkts = counters["noLearningAllowedPkts"];
   stats.noLearningDroppedPkts = counters["noLearningDroppedPkts"];
   stats.numMACsMoved = counters["numMACsMoved"];

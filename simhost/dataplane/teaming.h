@@ -10,13 +10,48 @@
 // groups.
 #pragma once
 
+#include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
+#include <unordered_map>
+#include <vector>
 
 #include "core/data_plane.h"
 #include "dataplane/links.h"
+#include "dataplane/team.h"
 
 namespace simhost::dataplane {
+
+/// What a port has of its own instead of its switch's.
+struct OwnTeaming {
+  std::optional<VSTeamPolicy> policy;
+  std::optional<std::string> uplink;  ///< the one that it is bound to
+};
+
+/// The ports of a switch that have something of their own; most have nothing.
+using OwnTeamings = std::unordered_map<std::uint32_t, OwnTeaming>;
+OwnTeamings own_teamings(store::Transaction &transaction, store::SwitchKey key);
+
+/// Which uplinks carry what the ports of one switch send, for many ports at one moment.
+class Carriers {
+ public:
+  Carriers(Team team, OwnTeamings const &own);
+
+  /// The uplink of a port; empty if none of its team is in use.
+  [[nodiscard]] std::string_view of(store::PortNumber number) const;
+  /// See DataPlane::team_uplink.
+  [[nodiscard]] std::string required_of(store::Port const &port) const;
+  /// Whether the port's policy wants its moves to be announced.
+  [[nodiscard]] bool announces(store::PortNumber number) const;
+
+ private:
+  [[nodiscard]] OwnTeaming const *own_of(store::PortNumber number) const;
+
+  Team team_;
+  std::vector<Slot> shared_;  // what the switch's policy has in use
+  OwnTeamings const &own_;
+};
 
 /// See DataPlane::team_uplink.
 std::string team_uplink(store::Transaction &transaction, store::Port const &port);

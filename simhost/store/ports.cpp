@@ -108,6 +108,16 @@ std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key) {
   return ports;
 }
 
+std::vector<PortNumber> client_numbers(Transaction &transaction, SwitchKey switch_key) {
+  auto select = transaction.query("SELECT number FROM port WHERE switch = ? AND NOT is_uplink");
+  select.with(std::int64_t(switch_key));
+  std::vector<PortNumber> numbers;
+  while (select.next()) {
+    numbers.push_back(number_at(select, 0));
+  }
+  return numbers;
+}
+
 std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKind kind) {
   auto select = transaction.query(kind == PortKind::client
                                       ? "SELECT clients FROM switch WHERE key = ?"

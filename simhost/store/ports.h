@@ -44,6 +44,8 @@ bool set_external_id(Transaction &transaction, PortNumber number, std::string_vi
 void remove_port(Transaction &transaction, PortNumber number);
 /// The ports of a switch, in the order in which they were added.
 std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key);
+/// The numbers of the ports of a switch that are no uplink ports.
+std::vector<PortNumber> client_numbers(Transaction &transaction, SwitchKey switch_key);
 /// How many ports of that kind the switch has.
 std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKind kind);
 

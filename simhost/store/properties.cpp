@@ -63,6 +63,19 @@ std::vector<NamedProperty> properties_of(Transaction &transaction, PropertyOwner
   return all;
 }
 
+std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey key,
+                                          std::string_view name) {
+  auto select = transaction.query(
+      "SELECT port, value FROM property WHERE switch = ? AND name = ? AND port IS NOT NULL");
+  select.with(std::int64_t(key)).with(name);
+  std::vector<PortProperty> all;
+  while (select.next()) {
+    all.push_back({.port = PortNumber(static_cast<std::uint32_t>(select.integer(0))),
+                   .value = select.bytes(1)});
+  }
+  return all;
+}
+
 void remove_properties(Transaction &transaction, PropertyType type) {
   transaction.query("DELETE FROM property WHERE type = ?").with(std::int64_t(type)).run();
 }

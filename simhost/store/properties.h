@@ -57,6 +57,15 @@ struct NamedProperty {
 
 /// The properties of an owner, in the order of their names.
 std::vector<NamedProperty> properties_of(Transaction &transaction, PropertyOwner const &owner);
+
+struct PortProperty {
+  PortNumber port;
+  std::vector<std::byte> value;
+};
+
+/// The property of that name of every port of a switch that has it.
+std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey key,
+                                          std::string_view name);
 /// Removes every property of that type from the host.
 void remove_properties(Transaction &transaction, PropertyType type);
 

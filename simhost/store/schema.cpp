@@ -53,6 +53,7 @@ char const *const kSchema = R"sql(
   ) STRICT;
   CREATE UNIQUE INDEX property_by_owner ON property (switch, scope, ifnull(port, 0), name);
   CREATE INDEX property_by_port ON property (port);
+  CREATE INDEX property_by_name ON property (switch, name, port);
 )sql";
 
 }  // namespace simhost::store

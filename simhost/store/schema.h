@@ -8,7 +8,7 @@ namespace simhost::store {
 /// "VSim": no other program's database carries it.
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables; a file of another version is refused, not converted.
-inline constexpr std::int64_t kSchemaVersion = 2;
+inline constexpr std::int64_t kSchemaVersion = 3;
 
 /// Creates the tables of an empty database.
 extern char const *const kSchema;

@@ -21,6 +21,9 @@ char const *const kRunningSchema = R"sql(
     partner     INTEGER NOT NULL,
     speed       INTEGER NOT NULL,
     full_duplex INTEGER NOT NULL,
+    beacons     INTEGER NOT NULL,
+    errors      INTEGER NOT NULL,
+    driver      INTEGER NOT NULL,
     up_since    INTEGER NOT NULL
   ) STRICT;
 
@@ -54,7 +57,37 @@ char const *const kRunningSchema = R"sql(
     seen        INTEGER NOT NULL,
     UNIQUE (switch, mac, vid, vni)
   ) STRICT;
-  CREATE INDEX address_by_place ON address (port, switch);
+  CREATE INDEX address_by_port ON address (port);
+  CREATE INDEX address_by_place ON address (switch, ifnull(port, 0), mac, vid, vni);
+  CREATE INDEX address_by_age ON address (switch, seen) WHERE ages;
+
+  -- How many addresses are learned (type 2) at a place, a port's number or 0 for the team, and under
+  -- -1 at all places of a switch: counting the rows would make each new address dearer than the last.
+  CREATE TABLE learned (
+    switch      INTEGER NOT NULL REFERENCES switch ON DELETE CASCADE,
+    place       INTEGER NOT NULL,
+    addresses   INTEGER NOT NULL,
+    PRIMARY KEY (switch, place)
+  ) STRICT, WITHOUT ROWID;
+  CREATE TRIGGER address_added AFTER INSERT ON address WHEN new.type = 2 BEGIN
+    INSERT INTO learned VALUES (new.switch, ifnull(new.port, 0), 1), (new.switch, -1, 1)
+      ON CONFLICT DO UPDATE SET addresses = addresses + 1;
+  END;
+  CREATE TRIGGER address_removed AFTER DELETE ON address WHEN old.type = 2 BEGIN
+    UPDATE learned SET addresses = addresses - 1
+      WHERE switch = old.switch AND place IN (ifnull(old.port, 0), -1);
+    DELETE FROM learned
+      WHERE switch = old.switch AND place = ifnull(old.port, 0) AND addresses = 0;
+  END;
+  CREATE TRIGGER address_changed AFTER UPDATE OF port, type ON address
+    WHEN new.port IS NOT old.port OR new.type <> old.type BEGIN
+    UPDATE learned SET addresses = addresses - 1
+      WHERE old.type = 2 AND switch = old.switch AND place IN (ifnull(old.port, 0), -1);
+    INSERT INTO learned
+      SELECT new.switch, value, 1 FROM json_each(json_array(ifnull(new.port, 0), -1))
+      WHERE new.type = 2
+      ON CONFLICT DO UPDATE SET addresses = addresses + 1;
+  END;
 
   -- The length of the address is its family: 6, 4 or 16 bytes.
   CREATE TABLE mcast_group (

@@ -228,6 +228,45 @@ TEST_F(MacTables, TheSwitchHasALimitForAllItsPlaces) {
   EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved) << "it takes no more room there";
 }
 
+// The counts are kept beside the addresses, so every way in which one comes, goes or changes
+// counts.
+TEST_F(MacTables, CountsFollowEveryChange) {
+  auto const counted = [&](Place const &place) {
+    return qex_uint32{simhost::dataplane::learning_stats(work, place).numMACsLearned};
+  };
+  auto const learned = [&](std::initializer_list<unsigned char> lasts, Place const &place) {
+    for (auto const last : lasts) {
+      learn(work, place, entry(last));
+    }
+  };
+  learned({1, 2, 3}, at1);
+  learned({4}, team);
+  EXPECT_EQ(counted(at1), 3U);
+  EXPECT_EQ(counted(team), 1U);
+  learned({3}, at2);
+  EXPECT_EQ(counted(at1), 2U) << "one moved";
+  EXPECT_EQ(counted(at2), 1U);
+  put(at1, entry(1, VS_MAC_ADDR_TYPE_STATIC));
+  EXPECT_EQ(counted(at1), 1U) << "one became static";
+  put(at1, entry(4, VS_MAC_ADDR_TYPE_USER));
+  EXPECT_EQ(counted(team), 0U) << "one gave way";
+  remove(at1, entry(2, VS_MAC_ADDR_TYPE_LEARNED));
+  EXPECT_EQ(counted(at1), 0U) << "one was removed";
+  simhost::step_clock(work, seconds(299));
+  learned({5}, at2);
+  simhost::step_clock(work, seconds(1));
+  EXPECT_EQ(counted(at2), 1U) << "one is too old and still in the table";
+  learned({5}, at2);
+  EXPECT_EQ(counted(at2), 1U) << "and then it is not";
+  set_switch_learning(300, 1);
+  EXPECT_NE(learn(work, at2, entry(6)), Sighting::learned) << "the switch has its one";
+  simhost::remove_port(work, p2);
+  EXPECT_EQ(learn(work, at1, entry(6)), Sighting::learned) << "it went with its port";
+  simhost::data_plane().restart(work);
+  EXPECT_EQ(counted(at1), 0U);
+  EXPECT_EQ(learn(work, at1, entry(7)), Sighting::learned);
+}
+
 TEST_F(MacTables, AUserPutsAndTakesAddresses) {
   EXPECT_EQ(put(at1, entry(1)), QEX_OK);
   EXPECT_EQ(put(at1, entry(1)), QEX_OK);

@@ -165,7 +165,13 @@ TEST(Store, LookUpsUseAnIndex) {
         "switch WHERE key > 1 ORDER BY key LIMIT 1", "uplink WHERE name = ''",
         "port WHERE switch = 1 AND identifier = ''", "port WHERE switch = 1 AND external_id = ''",
         "port WHERE switch = 1 AND number > 1 ORDER BY number LIMIT 1",
-        "port WHERE switch = 1 AND is_uplink", kProperty}) {
+        "port WHERE switch = 1 AND is_uplink", kProperty,
+        "property WHERE switch = 1 AND name = '' AND port IS NOT NULL",
+        "address WHERE switch = 1 AND mac = x'' AND vid = 0 AND vni = 0",
+        "address WHERE switch = 1 AND ifnull(port, 0) = 1 ORDER BY mac, vid, vni",
+        "address WHERE switch = 1 AND ages AND seen <= 1", "learned WHERE switch = 1 AND place = 0",
+        "counter WHERE switch = 1 AND ifnull(port, 0) = 0 AND session = ''",
+        "mcast_group WHERE port = 1 AND address = x''"}) {
     SQLite::Statement plan(database, std::string("EXPLAIN QUERY PLAN SELECT * FROM ") + condition);
     ASSERT_TRUE(plan.executeStep());
     auto const step = plan.getColumn("detail").getString();

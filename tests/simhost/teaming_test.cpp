@@ -3,13 +3,16 @@
 
 #include <gmock/gmock.h>
 
+#include <cstddef>
 #include <initializer_list>
 #include <set>
 #include <string>
+#include <vector>
 
 #include "core/runtime_options.h"
 #include "dataplane/counters.h"
 #include "plane.h"
+#include "qexapi/switch_properties.h"
 #include "vswitch/lags.h"
 #include "vswitch/properties.h"
 #include "vswitch/teaming.h"
@@ -139,6 +142,62 @@ TEST_F(Teaming, CriteriaTakeUplinksOut) {
   change("nic0", [](Link &link) { link.full_duplex = false; });
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, fast);
   EXPECT_EQ(hint(p1), "nic1");
+}
+
+// Each criterion takes an uplink out for its own reason, and only where a policy names it.
+TEST_F(Teaming, CriteriaLookAtWhatAnUplinkIsLike) {
+  struct {
+    qex_uint32 criterion;
+    void (*spoil)(Link &);
+  } const cases[] = {
+      {TEAM_FRP_CRIT_BEACON_STATE, [](Link &link) { link.beacons = false; }},
+      {TEAM_FRP_CRIT_LINK_ERR, [](Link &link) { link.error_percent = 6; }},
+      {TEAM_FRP_CRIT_DRV_PRESENT, [](Link &link) { link.driver = false; }},
+  };
+  for (auto const &[criterion, spoil] : cases) {
+    auto careful = policy({"uplink1"}, {"uplink2"});
+    careful.percentError = 5;
+    change("nic0", spoil);
+    set_policy(of_switch(), VSPROP_SWITCH_TEAMING, careful);
+    EXPECT_EQ(hint(p1), "nic0") << "criterion " << criterion << " is not asked for";
+    careful.linkCriteria |= criterion;
+    set_policy(of_switch(), VSPROP_SWITCH_TEAMING, careful);
+    EXPECT_EQ(hint(p1), "nic1") << "criterion " << criterion;
+    change("nic0", [](Link &link) { link = Link{}; });
+    EXPECT_EQ(hint(p1), "nic0") << "criterion " << criterion;
+  }
+}
+
+TEST_F(Teaming, AnUplinkFailsWithMoreErrorsThanThePolicyBears) {
+  auto careful = policy({"uplink1"}, {"uplink2"});
+  careful.linkCriteria = TEAM_FRP_CRIT_LINK_ERR;
+  careful.percentError = 5;
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, careful);
+  change("nic0", [](Link &link) { link.error_percent = 5; });
+  EXPECT_EQ(hint(p1), "nic0");
+  change("nic0", [](Link &link) { link.error_percent = 6; });
+  EXPECT_EQ(hint(p1), "nic1");
+}
+
+TEST_F(Teaming, ABlockedUplinkPortIsNotUsedWhereItIsACriterion) {
+  auto const uplink_port = simhost::known_port(work, key, "uplink1");
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
+  simhost::set_property(work, of(uplink_port), QEX_NEBPROP_PORT_BLOCK, std::vector{std::byte{1}});
+  EXPECT_EQ(hint(p1), "nic0");
+  auto careful = policy({"uplink1"}, {"uplink2"});
+  careful.linkCriteria = TEAM_FRP_CRIT_PORT_BLOCKED;
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, careful);
+  EXPECT_EQ(hint(p1), "nic1");
+}
+
+TEST_F(Teaming, APolicyNamesUplinkPortsByTheirNames) {
+  auto const uplink_port = simhost::known_port(work, key, "uplink2");
+  simhost::set_property(work, of(uplink_port), QEX_NEBPROP_PORT_ALIAS,
+                        simhost::bytes_of_text("right"));
+  for (auto const *name : {"right", "uplink2", "nic1"}) {
+    set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({name}));
+    EXPECT_EQ(hint(p1), "nic1") << name;
+  }
 }
 
 TEST_F(Teaming, AnOverrideBindsAPort) {
