@@ -7,7 +7,6 @@
 #include "core/giving_up.h"
 #include "core/known.h"
 #include "core/properties.h"
-#include "qexapi/links.h"
 #include "qexapi/switch_ports.h"
 #include "qexapi/switch_properties.h"
 #include "store/store.h"
@@ -278,27 +277,6 @@ Bytes read_uplink_names(store::Transaction &transaction, store::PropertyOwner co
 Bytes read_uplink_ids(store::Transaction &transaction, store::PropertyOwner const &owner) {
   return list_of<QEX_NEB_PORT_ID_MAX_LEN>(named_uplink_ports(transaction, owner.switch_key),
                                           &UplinkPort::identifier);
-}
-
-Bytes read_port_status(store::Transaction &transaction, store::PropertyOwner const &owner) {
-  auto const port = store::find_port(transaction, owner.port_number.value()).value();
-  bool const in_use =
-      port.kind == store::PortKind::uplink
-          ? store::uplink_at(transaction, port.number).has_value()
-          : get_property(transaction, owner, QEX_NEBPROP_PORT_VNIC_CONNECTEE).has_value();
-  auto const link =
-      read(transaction, owner,
-           RecordProperty<qex_uint32>{QEX_NEBPROP_PORT_LINK_STATUS, QEX_LINK_STATE_UP});
-  bool const blocked =
-      read(transaction, owner, RecordProperty<qex_Bool>{QEX_NEBPROP_PORT_BLOCK, 0}) != 0;
-  qex_NEBPortStatus status{};
-  status.flags =
-      (in_use ? qex_uint64{QEX_NEBPORT_STATUS_INUSE} : 0U) |
-      (in_use && link == QEX_LINK_STATE_UP ? qex_uint64{QEX_NEBPORT_STATUS_LINKUP} : 0U) |
-      (blocked ? qex_uint64{QEX_NEBPORT_STATUS_BLOCKED} : 0U);
-  status.portID = static_cast<qex_uint32>(port.number);
-  name_of(transaction, port).copy(status.displayStr, sizeof status.displayStr - 1);
-  return copied(bytes_of(status));
 }
 
 void write_uplink_names(Setting const &setting) {

@@ -79,13 +79,12 @@ SIMHOST_API void remove_uplink_port(store::Transaction &transaction, store::Swit
 /// VSUplinkPortIds. Refuses lists that are not as long as they say, or each other (QEX_BAD_PARAM).
 SIMHOST_API std::vector<UplinkPort> uplink_ports_in(BytesView names, BytesView identifiers);
 
-/// The values of QEX_NEBPROP_SWITCH_UPLINKPORTS, of QEX_NEBPROP_HOST_UPLINKPORTS and of
-/// QEX_NEBPROP_PORT_STATUS: a VSUplinkPorts, a VSUplinkPortIds and a qex_NEBPortStatus.
+/// The values of QEX_NEBPROP_SWITCH_UPLINKPORTS and of QEX_NEBPROP_HOST_UPLINKPORTS: a
+/// VSUplinkPorts and a VSUplinkPortIds.
 SIMHOST_API Bytes read_uplink_names(store::Transaction &transaction,
                                     store::PropertyOwner const &owner);
 SIMHOST_API Bytes read_uplink_ids(store::Transaction &transaction,
                                   store::PropertyOwner const &owner);
-Bytes read_port_status(store::Transaction &transaction, store::PropertyOwner const &owner);
 /// Names for the uplink ports in their order; further ones add ports, missing ones remove ports.
 void write_uplink_names(Setting const &setting);
 /// The identifiers that the uplink ports are to have; new ports are named after theirs.

@@ -96,6 +96,11 @@ std::optional<store::Property> get_property(store::Transaction &transaction,
 std::vector<store::NamedProperty> list_properties(store::Transaction &transaction,
                                                   store::PropertyOwner const &owner) {
   auto all = store::properties_of(transaction, owner);
+  // Of a key that is read elsewhere, what is stored is only a part of the value.
+  std::erase_if(all, [&](store::NamedProperty const &property) {
+    auto const *const key = key_of(owner, property.name);
+    return key != nullptr && key->read != nullptr;
+  });
   for (auto const &key : property_keys()) {
     if (key.scope == owner.scope && key.read != nullptr) {
       all.push_back(

@@ -8,6 +8,7 @@
 #include "core/mirror_sessions.h"
 #include "core/policies.h"
 #include "core/ports.h"
+#include "core/running_ports.h"
 #include "core/switches.h"
 #include "core/vlans.h"
 #include "qexapi/links.h"
@@ -108,15 +109,16 @@ constexpr std::array kKeys{
     PropertyKey{QEX_NEBPROP_PORT_PERSIST, kPort, kCommon, kVolatile, boolean},
     PropertyKey{QEX_NEBPROP_PORT_PTALLOWED, kPort, kCommon, kConfig, boolean},
     PropertyKey{QEX_NEBPROP_PORT_PTALLOWEDRT, kPort, kCommon, kRuntime, boolean},
-    PropertyKey{QEX_NEBPROP_PORT_STATISTICS, kPort, kCommon, kRuntime,
-                any_record<qex_NEBPortStatistics>},
+    PropertyKey{QEX_NEBPROP_PORT_STATISTICS, kPort, kCommon, kRuntime, anything,
+                read_port_statistics},
     PropertyKey{QEX_NEBPROP_PORT_ALIAS, kPort, kCommon, kConfig, text<kLongestPortAlias>},
     PropertyKey{QEX_NEBPROP_PORT_CONNECTID, kPort, kCommon, kConfig, any_record<qex_uint32>},
     PropertyKey{QEX_NEBPROP_PORT_QEXNIC_VLANID, kPort, kCommon, kConfig, vlan_number},
     PropertyKey{QEX_NEBPROP_PORT_VNIC_CONNECTEE, kPort, kCommon, kRuntime, anything},
     PropertyKey{QEX_NEBPROP_PORT_PORTGROUP, kPort, kCommon, kConfig, anything},
     PropertyKey{QEX_NEBPROP_PORT_BLOCK, kPort, kCommon, kPolicy, boolean},
-    PropertyKey{QEX_NEBPROP_PORT_LINK_STATUS, kPort, kCommon, kRuntime, kLink},
+    PropertyKey{QEX_NEBPROP_PORT_LINK_STATUS, kPort, kCommon, kRuntime, kLink, read_link_status,
+                write_link_status},
     PropertyKey{QEX_NEBPROP_PORT_RESPOOLS_CFG, kPort, kCommon, kConfig, anything},
     PropertyKey{QEX_NEBPROP_PORT_RESPOOL_ASSOC, kPort, kCommon, kConfig, anything},
     PropertyKey{QEX_NEBPROP_PORT_SHAPER_INPUT, kPort, kCommon, kPolicy, anything},
@@ -152,8 +154,8 @@ constexpr std::array kKeys{
                 record<VSExtraEthFilter, check_eth_filter>},
     PropertyKey{VSPROP_PORT_MAC_MANAGEMENT, kPort, kVendor, kPolicy,
                 record<VSPMACManagement, check_mac_management>},
-    PropertyKey{VSPROP_PORT_MAC_LEARNING_STATS, kPort, kVendor, kRuntime,
-                any_record<VSPMACLearningStats>},
+    PropertyKey{VSPROP_PORT_MAC_LEARNING_STATS, kPort, kVendor, kRuntime, anything,
+                read_learning_stats},
 };
 
 }  // namespace

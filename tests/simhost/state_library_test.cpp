@@ -152,8 +152,9 @@ TEST_F(StateLibrary, WalksReachAllInTheirOrder) {
   Gathered port_items;
   DVSState_PortDataForEach(DVSState_PortFind("s-id", "p"), gather_item, &port_items);
   EXPECT_THAT(port_items.names,
-              testing::ElementsAre(QEX_NEBPROP_PORT_CONNECTID, QEX_NEBPROP_PORT_STATUS,
-                                   QEX_NEBPROP_PORT_VLAN));
+              testing::ElementsAre(QEX_NEBPROP_PORT_CONNECTID, QEX_NEBPROP_PORT_LINK_STATUS,
+                                   QEX_NEBPROP_PORT_STATISTICS, QEX_NEBPROP_PORT_STATUS,
+                                   QEX_NEBPROP_PORT_VLAN, VSPROP_PORT_MAC_LEARNING_STATS));
 }
 
 TEST_F(StateLibrary, AResultOfZeroEndsAWalk) {

@@ -495,25 +495,6 @@ TEST_F(TwoDoors, TheUplinkPortsArePropertiesOfTheSwitchAndOfTheHost) {
   VSDVS_FreeMemory(ids);
 }
 
-TEST_F(TwoDoors, ThePortStatusFollowsItsProperties) {
-  auto const flags = [](char const *name) {
-    return as<qex_NEBPortStatus>(port(QEX_NEBPROP_PORT_STATUS, name).value()).flags;
-  };
-  EXPECT_EQ(flags("p"), 0U);
-  EXPECT_EQ(flags("uplink1"), QEX_NEBPORT_STATUS_INUSE | QEX_NEBPORT_STATUS_LINKUP);
-  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_VNIC_CONNECTEE, bytes_of_text("vm")), QEX_OK);
-  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_BLOCK, {1}), QEX_OK);
-  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_LINK_STATUS, bytes_of(0)), QEX_OK);
-  EXPECT_EQ(flags("p"), QEX_NEBPORT_STATUS_INUSE | QEX_NEBPORT_STATUS_BLOCKED);
-  ASSERT_EQ(set_port(QEX_NEBPROP_PORT_ALIAS, bytes_of_text("desk")), QEX_OK);
-  auto const status = as<qex_NEBPortStatus>(port(QEX_NEBPROP_PORT_STATUS).value());
-  EXPECT_STREQ(status.displayStr, "desk");
-  int number = 0;
-  ASSERT_EQ(VSDVS_DvPortIDToPortID("s", "p", &number), QEX_OK);
-  EXPECT_EQ(status.portID, static_cast<qex_uint32>(number));
-  EXPECT_EQ(set_port(QEX_NEBPROP_PORT_STATUS, bytes_of(status)), QEX_READ_ONLY);
-}
-
 TEST_F(TwoDoors, TheVlanInfoFollowsTheVlanPolicy) {
   ASSERT_EQ(set_port(VSPROP_PORT_VLAN, vlan_policy(0, 5, {{7, 9}})), QEX_OK);
   EXPECT_EQ(port(QEX_NEBPROP_PORT_VLAN), (Bytes{5, 0, 1, 0, 7, 0, 9, 0}));
