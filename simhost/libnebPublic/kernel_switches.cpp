@@ -102,15 +102,4 @@ QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports,
   });
 }
 
-QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command, void * /*input*/,
-                                int /*inputLength*/, void ** /*output*/, int * /*outputLength*/) {
-  return answer(__func__, [&](Call &call) {
-    auto const target = switch_identified(switchId);
-    required_text(command);
-    simhost::found(call.reading(), target);
-    // No switch here has commands of its own.
-    simhost::refuse(QEX_NOT_SUPPORTED);
-  });
-}
-
 }  // extern "C"
