@@ -22,8 +22,7 @@ add_function_parentheses = False
 smartquotes = False
 add_module_names = True
 myst_heading_anchors = 3
-myst_enable_extensions = ["deflist"]
-pygments_style = "friendly"
+pygments_style = "tango"
 # Only colour is lost where a quoted text of a shell session goes on in the next line.
 suppress_warnings = ["misc.highlighting_failure"]
 highlight_language = "none"

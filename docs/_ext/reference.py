@@ -5,6 +5,7 @@
     .. records:: vswitch/lags.h        every record of headers, its bytes as a picture
     .. constants:: qexapi/links.h      the constants of headers, by family
     .. overview:: calls                a table of all calls, or of all records
+    .. record-picture:: VSMACLearning  a picture alone
 """
 
 import sys
@@ -169,7 +170,8 @@ class _Functions(_Described):
             plain, flat = one.types
             types: List[nodes.Node] = [self.words.code(plain)]
             if flat != plain:
-                types += [nodes.inline(text="flat: ", classes=["flat"]), self.words.code(flat)]
+                said = nodes.Text("flat: "), self.words.code(flat)
+                types.append(nodes.inline("", "", *said, classes=["flat", "below"]))
             name = [nodes.literal(text=one.name)]
             meaning = self.words.inline(one.meaning or self._meaning(call, one.name))
             rows.append(((name, types, [self.words.code(one.c_type)], meaning), ()))
@@ -190,6 +192,10 @@ class _Functions(_Described):
             "sid": "identifier of the session, up to 31 bytes",
         }
         meaning = said.get(name, "")
+        record = next((one.types[0] for one in call.arguments if one.name == name), "")
+        if record.replace(" or None", "") in self.catalogue.known.records:
+            described = self.catalogue.known.records[record.replace(" or None", "")]
+            meaning = meaning or _sentence(described.doc).rstrip(".")
         if name == "port" and not any(one.c_type == "char *" for one in call.arguments[1:]):
             meaning = "number of the port" if "PortID" in call.prototype else meaning
         return meaning
@@ -256,7 +262,9 @@ class Calls(_Functions):
 
     def run(self) -> List[nodes.Node]:
         header = self.catalogue.headers[self.arguments[0]]
-        found = self.words.paragraphs(header.text.text)
+        # The first paragraph says what the page's own heading does.
+        _, _, text = header.text.text.partition("\n\n")
+        found = self.words.paragraphs(text)
         for call in self.catalogue.calls.values():
             if call.header == header.name:
                 found += self.function(call)
@@ -366,6 +374,16 @@ class Records(_Functions):
         )
 
 
+class RecordPicture(_Described):
+    required_arguments = 1
+
+    def run(self) -> List[nodes.Node]:
+        name = self.arguments[0]
+        shapes = self.catalogue.shapes(self.catalogue.known.records[name])
+        drawn = picture(name, shapes, self.catalogue.layout.sizes[name])
+        return [nodes.raw("", f'<div class="picture">{drawn}</div>', format="html")]
+
+
 class Constants(_Described):
     required_arguments = 1
     optional_arguments = 30
@@ -456,4 +474,5 @@ def setup(app: Sphinx) -> Dict[str, bool]:
     app.add_directive("records", Records)
     app.add_directive("constants", Constants)
     app.add_directive("overview", Overview)
+    app.add_directive("record-picture", RecordPicture)
     return {"parallel_read_safe": True, "parallel_write_safe": True}

@@ -8,7 +8,7 @@ from sphinx.addnodes import pending_xref
 
 from catalogue import CLASSES, FLAT, Catalogue
 
-_WORDS = re.compile(r"`([^`]+)`|(?<![\w./])([A-Za-z_]\w*\w|[A-Z]\w*_)(\*?)")
+_WORDS = re.compile(r"`([^`]+)`|(?<![\w./])([A-Za-z_]\w*\w|[A-Z]\w*_)(\*?)(?!\w)")
 
 
 class Words:

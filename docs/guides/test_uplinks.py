@@ -9,7 +9,7 @@ from simhost import Host, SharedHost
 
 
 def uplinks_of(switch: str) -> List[str]:
-    """What is tested here: the names of a switch's uplinks; none of a switch that is not there."""
+    """What is tested here: the uplinks of a switch; none if there is no such switch."""
     with vs.owned(vs.VSQEX_GetUplinks(switch)) as (status, uplinks):
         return list(uplinks) if status == vs.QEX_OK else []
 

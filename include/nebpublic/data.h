@@ -5,7 +5,8 @@
  * @file
  * Switches, ports and data items behind their handles: DVS_* and DVSData_*.
  *
- * Texts that a call returns belong to the library and live as long as what the handle designates.
+ * Texts that a call returns belong to the library and live as long as what the handle designates. A
+ * null where nothing allows it is QEX_BAD_PARAM.
  */
 
 #include "nebpublic/handles.h"
@@ -58,7 +59,7 @@ void DVSData_Free(DVSDataHandle list);
  * @param data `length` bytes; null with a length of 0
  * @param length bytes of data
  * @param propertyType one of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
- *                     POLICY_PROP_TYPE
+ *                     POLICY_PROP_TYPE; QEX_BAD_PARAM for another
  */
 QEX_ReturnStatus DVSData_Update(DVSDataHandle list, char const *name, void *data, qex_uint32 length,
                                 qex_uint32 propertyType);

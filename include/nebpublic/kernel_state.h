@@ -24,7 +24,13 @@
 extern "C" {
 #endif
 
-/** Gives the kernel a state that DVSQEX_StateGet read; null with a length of 0 is an empty one. */
+/**
+ * Gives the kernel a state that DVSQEX_StateGet read; null with a length of 0 is an empty one.
+ *
+ * A state that cannot be read changes nothing. QEX_INVALID_METADATA for one that is cut short,
+ * QEX_CHECKSUM_MISMATCH for one that is damaged, QEX_VERSION_MISMATCH_MAJOR for one of another
+ * format, QEX_BAD_PARAM for one of another kind.
+ */
 QEX_ReturnStatus DVSQEX_StateInit(void *state, int length);
 
 /** Hands out the whole state. */
@@ -72,14 +78,15 @@ QEX_ReturnStatus DVSQEX_SwitchDissociate(char const *switchId);
 /** Sets the version of a switch. */
 QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion version);
 
-/** Sets how many ports a switch has room for. */
+/** Sets how many ports a switch has room for; QEX_LIMIT_EXCEEDED if it has more. */
 QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts);
 
 /** Hands out the ports of one type, uplink ports among them. */
 QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type);
 
 /**
- * Has a switch carry out a command of its own kind.
+ * Has a switch carry out a command of its own kind; QEX_NOT_SUPPORTED for one that it does not
+ * have.
  *
  * @param command name of the command
  * @param input what the command takes, `inputLength` bytes; null with a length of 0
@@ -89,32 +96,47 @@ QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports,
 QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command, void *input,
                                 int inputLength, void **output, int *outputLength);
 
-/** Hands out the value of a global property of a switch. */
+/** Hands out the value of a global property of a switch; QEX_NOT_FOUND if it is not set. */
 QEX_ReturnStatus DVSQEX_GlobalPropGet(char const *switchId, char const *key, void **data,
                                       int *length);
 
-/** Sets a global property of a switch; the type may change from one set to the next. */
+/**
+ * Sets a global property of a switch; the type may change from one set to the next.
+ *
+ * Here and in the sets below, the bytes are what the typed call of that property carries.
+ * QEX_BAD_PARAM for other bytes and for a key of something else, QEX_NAME_TOO_LONG for a key of
+ * more than 255 bytes.
+ */
 QEX_ReturnStatus DVSQEX_GlobalPropSet(char const *switchId, char const *key, void *data, int length,
                                       qex_uint32 propertyType);
 
-/** Clears a global property of a switch. */
+/** Clears a global property of a switch; QEX_NOT_FOUND if it is not set. */
 QEX_ReturnStatus DVSQEX_GlobalPropClear(char const *switchId, char const *key);
 
-/** Hands out the value of a host property of a switch. */
+/** Hands out the value of a host property of a switch; QEX_NOT_FOUND if it is not set. */
 QEX_ReturnStatus DVSQEX_HostPropGet(char const *switchId, char const *key, void **data,
                                     int *length);
 
-/** Sets a host property of a switch; the type may change from one set to the next. */
+/**
+ * Sets a host property of a switch; the type may change from one set to the next.
+ *
+ * QEX_BAD_PARAM for bytes that are not the property's and for a key of something else,
+ * QEX_READ_ONLY for a property that is only read, QEX_NAME_TOO_LONG for a key of more than 255
+ * bytes.
+ */
 QEX_ReturnStatus DVSQEX_HostPropSet(char const *switchId, char const *key, void *data, int length,
                                     qex_uint32 propertyType);
 
-/** Clears a host property of a switch. */
+/** Clears a host property of a switch; QEX_NOT_FOUND if it is not set. */
 QEX_ReturnStatus DVSQEX_HostPropClear(char const *switchId, char const *key);
 
 /**
  * Adds a port to a switch.
  *
- * @param port identifier of the new port; QEX_EXISTS if it is taken
+ * QEX_LIMIT_EXCEEDED if the switch has no room for another.
+ *
+ * @param port identifier of the new port, 1 to 47 bytes; QEX_EXISTS if it is taken,
+ *             QEX_NAME_TOO_LONG if it is longer
  * @param state a state that DVSQEX_PortStateGet or DVSQEX_PersistentPortStateGet gave, for the
  *              port to start with; null with a length of 0 for none
  */
@@ -124,22 +146,28 @@ QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *st
 /** Removes a port with its properties. */
 QEX_ReturnStatus DVSQEX_PortRemove(char const *switchId, char const *port);
 
-/** QEX_OK if the switch has the port. */
+/** Whether the switch has the port: QEX_OK if so, QEX_NOT_FOUND if not. */
 QEX_ReturnStatus DVSQEX_PortFind(char const *switchId, char const *port);
 
 /** Hands out the port that another system knows as `externalId`. */
 QEX_ReturnStatus DVSQEX_PortGetByExternalId(char const *switchId, char const *externalId,
                                             OpaqueDVPortData **port);
 
-/** Hands out the value of a property of a port. */
+/** Hands out the value of a property of a port; QEX_NOT_FOUND if it is not set. */
 QEX_ReturnStatus DVSQEX_PortDataGet(char const *switchId, char const *port, char const *key,
                                     void **data, int *length);
 
-/** Sets a property of a port; the type may change from one set to the next. */
+/**
+ * Sets a property of a port; the type may change from one set to the next.
+ *
+ * QEX_BAD_PARAM for bytes that are not the property's and for a key of something else,
+ * QEX_READ_ONLY for a property that is only read, QEX_NAME_TOO_LONG for a key of more than 255
+ * bytes.
+ */
 QEX_ReturnStatus DVSQEX_PortDataSet(char const *switchId, char const *port, char const *key,
                                     void *data, int length, qex_uint32 propertyType);
 
-/** Clears a property of a port. */
+/** Clears a property of a port; QEX_NOT_FOUND if it is not set. */
 QEX_ReturnStatus DVSQEX_PortDataClear(char const *switchId, char const *port, char const *key);
 
 /** Hands out all properties of a port. */
@@ -150,11 +178,20 @@ QEX_ReturnStatus DVSQEX_PortStateGet(char const *switchId, char const *port, voi
 QEX_ReturnStatus DVSQEX_PersistentPortStateGet(char const *switchId, char const *port,
                                                NEBVersion version, void **state, int *length);
 
-/** Hands out the value of a property of the uplink port with the number `portID`. */
+/**
+ * Hands out the value of a property of the uplink port with the number `portID`; QEX_NOT_FOUND if
+ * it is not set.
+ */
 QEX_ReturnStatus DVSQEX_UplinkDataGet(char const *switchId, char const *key, qex_uint32 portID,
                                       void **data, int *length);
 
-/** Sets a property of the uplink port with the number `portID`. */
+/**
+ * Sets a property of the uplink port with the number `portID`.
+ *
+ * QEX_BAD_PARAM for bytes that are not the property's and for a key of something else,
+ * QEX_READ_ONLY for a property that is only read, QEX_NAME_TOO_LONG for a key of more than 255
+ * bytes.
+ */
 QEX_ReturnStatus DVSQEX_UplinkDataSet(char const *switchId, char const *key, qex_uint32 portID,
                                       void *data, int length, qex_uint32 propertyType);
 

@@ -5,7 +5,8 @@
  * @file
  * From one name of a switch to another, and whether a port exists.
  *
- * Texts are NUL-terminated UTF-8. Outputs are the caller's memory, of the size their type says,
+ * Texts are NUL-terminated UTF-8. A name the host does not know is QEX_NOT_FOUND, a null
+ * QEX_BAD_PARAM. Outputs are the caller's memory, of the size their type says,
  * NUL included, and are written only with QEX_OK.
  */
 

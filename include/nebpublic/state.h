@@ -7,7 +7,8 @@
  *
  * Handles that a call gives point into the state; nothing frees them, a reset ends them. Texts are
  * NUL-terminated UTF-8 and are only read. A walk over a null handle, or with a null callback, does
- * nothing. A callback may call the host and may change what is walked over.
+ * nothing. A callback may call the host and may change what is walked over. A null where nothing
+ * allows it is QEX_BAD_PARAM.
  */
 
 #include "nebpublic/handles.h"
@@ -18,7 +19,10 @@ extern "C" {
 #endif
 
 /**
- * Replaces the configuration.
+ * Replaces the configuration; a state that cannot be read changes nothing.
+ *
+ * QEX_INVALID_METADATA for one that is cut short, QEX_CHECKSUM_MISMATCH for one that is damaged,
+ * QEX_VERSION_MISMATCH_MAJOR for one of another format, QEX_BAD_PARAM for one of another kind.
  *
  * @param state what DVSQEX_PersistentStateGet gave; only read
  * @param length its bytes; passed through unchanged

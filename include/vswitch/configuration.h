@@ -33,16 +33,19 @@ extern "C" {
 /**
  * Creates a distributed switch on this host.
  *
- * The module passes every argument through unchanged.
+ * The module passes every argument through unchanged. QEX_EXISTS if one of the three names is
+ * taken, QEX_NAME_TOO_LONG if one is too long, QEX_BAD_PARAM for a number out of its bounds.
  *
- * @param alias name of the new switch; QEX_EXISTS if it is taken
- * @param switchId identifier of the distributed switch; null or empty lets the host choose
- * @param portsetName name of its set of ports; null or empty lets the host choose
+ * @param alias name of the new switch, 1 to 127 bytes
+ * @param switchId identifier of the distributed switch, up to 63 bytes; null or empty lets the host
+ *                 choose
+ * @param portsetName name of its set of ports, up to 127 bytes; null or empty lets the host choose
  * @param maxPorts room for ports, uplink ports not counted, at most 65,535; 0 is the default of 128
  * @param persistent whether the switch survives a restart of the host
  * @param version version of the distributed switch; 0 is VS_YKT_NEB_VERSION_20
  * @param mtu 1,280 to 9,190 bytes; 0 is the default of 1,500
- * @param uplinkCount free uplinks of the host to attach to uplink ports `uplink1`, `uplink2`, ...
+ * @param uplinkCount free uplinks of the host to attach to uplink ports `uplink1`, `uplink2`, ...;
+ *                    QEX_NO_RESOURCES if there are not so many
  */
 QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
                                      char const *portsetName, qex_uint32 maxPorts,
@@ -55,15 +58,19 @@ QEX_ReturnStatus VSDVS_DestroyVSwitch(char const *switchName);
 /**
  * Adds a port to a switch; QEX_LIMIT_EXCEEDED if the switch has no room for another.
  *
- * @param port identifier of the new port, 1 to 47 bytes; QEX_EXISTS if it is taken
+ * @param port identifier of the new port, 1 to 47 bytes; QEX_EXISTS if it is taken,
+ *             QEX_NAME_TOO_LONG if it is longer
  * @param connectId number that the port's client must show to connect; passed through unchanged
  */
 QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_uint32 connectId);
 
 /**
- * Adds a port that another system manages.
+ * Adds a port that another system manages; QEX_LIMIT_EXCEEDED if the switch has no room for
+ * another.
  *
- * @param port identifier of the new port; QEX_EXISTS if it is taken
+ * Both names are 1 to 47 bytes; QEX_EXISTS if one is taken, QEX_NAME_TOO_LONG if one is longer.
+ *
+ * @param port identifier of the new port
  * @param externalId the other system's name for it; passed through unchanged
  */
 QEX_ReturnStatus VSDVS_AddOpaqueDVPort(char const *switchName, char const *port,
@@ -90,13 +97,16 @@ QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPort
  * Makes the uplink ports of a switch those with `ids`; both lists hold as many entries.
  *
  * A port that the switch has keeps its uplink and gets its new name, a new one has no uplink, and
- * what is left out is removed. QEX_EXISTS for a name or an identifier twice.
+ * what is left out is removed. QEX_EXISTS for a name or an identifier twice, QEX_LIMIT_EXCEEDED for
+ * more than 32 ports.
  */
 QEX_ReturnStatus VSDVS_SetSwitchUplinkPorts(char const *switchName, VSUplinkPorts const *names,
                                             VSUplinkPortIds const *ids);
 
 /**
  * Attaches an uplink of the host to an uplink port of a switch that has none, or to a new one.
+ *
+ * QEX_LIMIT_EXCEEDED if the switch has 32 uplink ports, none of them free.
  *
  * @param uplink its name; QEX_EXISTS if the switch has it, QEX_BUSY if another does
  */
@@ -117,7 +127,12 @@ QEX_ReturnStatus VSDVS_SetMTU(char const *switchName, qex_uint32 mtu);
 /** Fills `policy` with the teaming of a switch; VSPROP_SWITCH_TEAMING. */
 QEX_ReturnStatus VSDVS_GetTeamingPolicy(char const *switchName, VSTeamPolicy *policy);
 
-/** Sets the teaming of a switch. */
+/**
+ * Sets the teaming of a switch.
+ *
+ * QEX_LIMIT_EXCEEDED for more names than there are slots, QEX_NAME_TOO_LONG for a name that fills
+ * its slot without a NUL, QEX_BAD_PARAM for an unknown value or bit. Names need not exist yet.
+ */
 QEX_ReturnStatus VSDVS_SetTeamingPolicy(char const *switchName, VSTeamPolicy const *policy);
 
 /** Returns the teaming of a switch to the default. */
@@ -133,7 +148,12 @@ QEX_ReturnStatus VSDVS_GetTeamingPolicyFromDVSID(char const *switchId, VSTeamPol
 QEX_ReturnStatus VSDVS_GetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy *policy);
 
-/** Sets the teaming of a port. */
+/**
+ * Sets the teaming of a port.
+ *
+ * QEX_LIMIT_EXCEEDED for more names than there are slots, QEX_NAME_TOO_LONG for a name that fills
+ * its slot without a NUL, QEX_BAD_PARAM for an unknown value or bit.
+ */
 QEX_ReturnStatus VSDVS_SetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy const *policy);
 
@@ -149,7 +169,10 @@ QEX_ReturnStatus VSDVS_ClearPortTeamingPolicy(char const *switchName, char const
 QEX_ReturnStatus VSDVS_GetPortTeamingOverride(char const *switchName, char const *port,
                                               char *overrideBuffer);
 
-/** Binds a port to an uplink port whatever its teaming says. */
+/**
+ * Binds a port to an uplink port whatever its teaming says; QEX_NAME_TOO_LONG for a name of more
+ * than 81 bytes.
+ */
 QEX_ReturnStatus VSDVS_SetPortTeamingOverride(char const *switchName, char const *port,
                                               char const *overrideName);
 
@@ -167,7 +190,7 @@ QEX_ReturnStatus VSDVS_SetTxUplinkAlways(char const *switchName, char const *por
 /** Fills `learning` with the MAC learning of a switch; VSPROP_SWITCH_MAC_LEARNING. */
 QEX_ReturnStatus VSDVS_GetMACLearning(char const *switchName, VSMACLearning *learning);
 
-/** Sets the MAC learning of a switch. */
+/** Sets the MAC learning of a switch; QEX_BAD_PARAM for an ageing time out of its bounds. */
 QEX_ReturnStatus VSDVS_SetMACLearning(char const *switchName, VSMACLearning const *learning);
 
 /** Returns the MAC learning of a switch to the default. */
@@ -177,7 +200,10 @@ QEX_ReturnStatus VSDVS_ClearMACLearning(char const *switchName);
 QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *port,
                                           VSPMACLearning *learning);
 
-/** Sets the MAC learning of a port. */
+/**
+ * Sets the MAC learning of a port; QEX_LIMIT_EXCEEDED for more than
+ * VSPORT_MAC_LEARNING_LIMIT_ENTRIES_MAX addresses, QEX_BAD_PARAM for an unknown value.
+ */
 QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *port,
                                           VSPMACLearning const *learning);
 
@@ -185,7 +211,7 @@ QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *po
 QEX_ReturnStatus VSDVS_GetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity *security);
 
-/** Sets the security policy of a port. */
+/** Sets the security policy of a port; QEX_BAD_PARAM for an unknown bit. */
 QEX_ReturnStatus VSDVS_SetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity const *security);
 
@@ -193,7 +219,10 @@ QEX_ReturnStatus VSDVS_SetPortSecurity(char const *switchName, char const *port,
 QEX_ReturnStatus VSDVS_GetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter *filter);
 
-/** Sets the extra frames a port accepts. */
+/**
+ * Sets the extra frames a port accepts; QEX_LIMIT_EXCEEDED for more addresses than there are
+ * places, QEX_BAD_PARAM for an unknown bit.
+ */
 QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter const *filter);
 
@@ -214,7 +243,7 @@ QEX_ReturnStatus VSDVS_ConfigureSinkPort(char const *switchName, char const *por
 /** Puts the VSMcastFilterMode of a switch into `mode`; VSPROP_MULTICAST_FILTER. */
 QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode);
 
-/** Sets how a switch filters multicast. */
+/** Sets how a switch filters multicast; QEX_BAD_PARAM for an unknown mode. */
 QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode);
 
 /**
@@ -227,12 +256,14 @@ QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *por
 /**
  * Sets the VLANs of a port.
  *
- * The module passes every argument through unchanged.
+ * The module passes every argument through unchanged. QEX_BAD_VLANID for a VLAN past 4094,
+ * QEX_BAD_PARAM for ranges that share a VLAN or do not rise, and for another priority.
  *
- * @param vlanID VLAN of untagged frames; 0 is none, QEX_BAD_VLANID for more than 4094
+ * @param vlanID VLAN of untagged frames; 0 is none
  * @param priority priority of the port's frames, 0 to 7; -1 leaves it to the frames
  * @param guestTagging whether the client tags its frames itself, with VLANs of the ranges
- * @param privateVlan whether `vlanID` is a secondary VLAN of the switch's private-VLAN map
+ * @param privateVlan whether `vlanID` is a secondary VLAN of the switch's private-VLAN map;
+ *                    QEX_BAD_VLANID if it is not
  * @param ranges the VLANs of a trunk in rising order, none with `privateVlan`; null with none
  * @param numRanges how many ranges
  */
@@ -259,7 +290,12 @@ QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char con
 QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry **entries,
                                          int *count);
 
-/** Replaces the private-VLAN map of a switch; null with a count of 0 empties it. */
+/**
+ * Replaces the private-VLAN map of a switch; null with a count of 0 empties it.
+ *
+ * QEX_BAD_VLANID for a VLAN of 0 or past 4094, QEX_BAD_PARAM for a map that contradicts itself: a
+ * VLAN that is secondary twice, or secondary and primary, two isolated VLANs of one primary.
+ */
 QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry const *entries,
                                          int count);
 
@@ -267,11 +303,16 @@ QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
 QEX_ReturnStatus VSDVS_GetDVMirrorSessions(char const *switchName, char const *port,
                                            DVMirrorSessionTable **table);
 
-/** Adds the sessions of `table` to those of a port; QEX_EXISTS if an identifier is taken. */
+/**
+ * Adds the sessions of `table` to those of a port; QEX_EXISTS if an identifier is taken.
+ *
+ * QEX_VERSION_MISMATCH_MAJOR for a table of an unknown version, QEX_BAD_PARAM for one that does not
+ * hold what it counts, QEX_LIMIT_EXCEEDED for more than 1,024 sessions of a port.
+ */
 QEX_ReturnStatus VSDVS_AppendDVMirrorSessions(char const *switchName, char const *port,
                                               DVMirrorSessionTable *table);
 
-/** Removes the session with the identifier `sid` from a port. */
+/** Removes the session with the identifier `sid` from a port; QEX_NOT_FOUND if there is none. */
 QEX_ReturnStatus VSDVS_RemoveDVMirrorSession(char const *switchName, char const *port,
                                              char const sid[32]);
 

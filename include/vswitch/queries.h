@@ -38,26 +38,37 @@ QEX_ReturnStatus VSQEX_GetVSInfo(char const *switchName, VSInfo *info);
 QEX_ReturnStatus VSQEX_GetPortMACLearningStats(char const *switchName, char const *port,
                                                VSPMACLearningStats *stats);
 
-/** Hands out the addresses of one kind that a switch's team of uplinks knows. */
+/**
+ * Hands out the addresses of one kind that a switch's team of uplinks knows; QEX_BAD_PARAM for an
+ * unknown kind.
+ */
 QEX_ReturnStatus VSQEX_GetTeamMACTable(char const *switchName, VSMACAddrType type,
                                        VSMACTable **table);
 
-/** Hands out the addresses of one kind that a port knows. */
+/** Hands out the addresses of one kind that a port knows; QEX_BAD_PARAM for an unknown kind. */
 QEX_ReturnStatus VSQEX_GetPortMACTable(char const *switchName, char const *port, VSMACAddrType type,
                                        VSMACTable **table);
 
-/** Puts an address into the table of a port. */
+/**
+ * Puts an address, static or a user's, into the table of a port.
+ *
+ * QEX_BAD_PARAM for another kind, QEX_INVALID_ADDRESS for an address that is zero or multicast,
+ * QEX_BAD_VLANID for a VLAN past 4094, QEX_EXISTS if the address is static or a user's elsewhere.
+ */
 QEX_ReturnStatus VSQEX_SetPortMACTable(char const *switchName, char const *port,
                                        VSMACEntry const *entry);
 
-/** Takes an address out of the table of a port. */
+/**
+ * Takes an address out of the table of a port; QEX_NOT_FOUND for an address of another kind than
+ * the entry says, unless it says all.
+ */
 QEX_ReturnStatus VSQEX_ClearPortMACTable(char const *switchName, char const *port,
                                          VSMACEntry const *entry);
 
 /** Hands out the link-aggregation groups of a switch. */
 QEX_ReturnStatus VSQEX_GetLAGTable(char const *switchName, VSLAGTable **table);
 
-/** Takes an uplink of a switch up or down. */
+/** Takes an uplink of a switch up or down; QEX_BAD_PARAM for another state. */
 QEX_ReturnStatus VSQEX_SetUplinkAdminLinkState(char const *switchName, char const *uplink,
                                                qex_LinkState state);
 
@@ -71,16 +82,23 @@ QEX_ReturnStatus VSQEX_GetUplinkLACPLinkState(char const *switchName, char const
 /** Hands out the uplinks of a switch. */
 QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks);
 
-/** Writes the identifier of an uplink's port into `portBuffer`: at most 48 bytes of text and a NUL.
+/**
+ * Writes the identifier of an uplink's port into `portBuffer`: at most 48 bytes of text and a NUL.
+ *
+ * QEX_IS_DISCONNECTED for an uplink at no port.
  */
 QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer);
 
-/** Hands out the multicast groups of a port, in the form of one mode. */
+/**
+ * Hands out the multicast groups of a port, in the form of one mode; QEX_BAD_PARAM for a mode that
+ * is no form.
+ */
 QEX_ReturnStatus VSQEX_GetMcastFilters(char const *switchName, qex_SwitchPortID port,
                                        VSMcastFilterMode mode, VSMcastFilters **filters);
 
 /**
- * Hands out one multicast group of a port and its sources.
+ * Hands out one multicast group of a port and its sources; QEX_NOT_FOUND if the port has not joined
+ * it, QEX_BAD_PARAM for a mode that is no form.
  *
  * @param mode the form of the group's address
  * @param group the group's address in network byte order, as many bytes as the mode's form has
@@ -92,7 +110,10 @@ QEX_ReturnStatus VSQEX_GetMcastFilterStats(char const *switchName, qex_SwitchPor
 /** Puts the VSMcastFilterMode that a switch runs into `mode`. */
 QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode);
 
-/** Fills `stats` with the counters of the running mirror session `sid`. */
+/**
+ * Fills `stats` with the counters of the running mirror session `sid`; QEX_IS_DISABLED for a
+ * disabled session, and for all while the option VS_RT_OPT_ALLOW_MIRROR_STATS is 0.
+ */
 QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char const sid[32],
                                                VSDVMirrorSessionStats *stats);
 
@@ -111,7 +132,7 @@ QEX_ReturnStatus VSQEX_GetServicePortTeamingStats(char const *switchName,
 QEX_ReturnStatus VSQEX_GetRARPStats(char const *switchName, VSRARPStats *stats);
 
 /**
- * Hands out runtime options of the host.
+ * Hands out runtime options of the host; QEX_NOT_SUPPORTED for an unknown one.
  *
  * @param ids the options to hand out, each a VSRuntimeOptionType; null with a count of 0 means all
  * @param count how many
@@ -119,16 +140,29 @@ QEX_ReturnStatus VSQEX_GetRARPStats(char const *switchName, VSRARPStats *stats);
 QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count,
                                          VSRuntimeOptions **options);
 
-/** Sets runtime options of the host. */
+/**
+ * Sets runtime options of the host, all or none.
+ *
+ * QEX_BAD_PARAM for a malformed list or a number out of its bounds, QEX_INVALID_ADDRESS for a text
+ * that is no address, QEX_NOT_SUPPORTED for an unknown option.
+ */
 QEX_ReturnStatus VSQEX_SetRuntimeOptions(VSRuntimeOptions *options);
 
 /** Fills `props` with the MAC learning of all switches of the host. */
 QEX_ReturnStatus VSQEX_GetGlobalMACLearningProps(VSMACLearningGlobalProps *props);
 
-/** Sets the MAC learning of all switches of the host. */
+/**
+ * Sets the MAC learning of all switches of the host; QEX_BAD_PARAM for an ageing time of 0 or past
+ * VS_MAC_LEARNING_AGING_TIME_MAX.
+ */
 QEX_ReturnStatus VSQEX_SetGlobalMACLearningProps(VSMACLearningGlobalProps *props);
 
-/** Fills `name` with the uplink that a port's teaming has chosen for it. */
+/**
+ * Fills `name` with the uplink that a port's teaming has chosen for it.
+ *
+ * QEX_ENETDOWN if no link of the team is usable, QEX_ENETUNREACH if the team has no uplinks,
+ * QEX_NOT_SUPPORTED for an uplink port, QEX_NOT_FOUND for a number that no port has.
+ */
 QEX_ReturnStatus VSQEX_PortGetTeamUplinkHint(qex_SwitchPortID port, qex_Name *name);
 
 /**

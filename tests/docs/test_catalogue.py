@@ -45,7 +45,7 @@ def test_doors(catalogue: Catalogue) -> None:
                 "QEX_BAD_PARAM": "a null where nothing allows it",
             },
         ),
-        ("1,280 to 9,190 bytes, else QEX_BAD_PARAM.", {"QEX_BAD_PARAM": "1,280 to 9,190 bytes"}),
+        ("Sets it: 0 to 7, else QEX_BAD_PARAM.", {"QEX_BAD_PARAM": "if not 0 to 7"}),
         ("Nothing at all.", {}),
     ],
 )
