@@ -1,5 +1,6 @@
 """All there is to describe, put together: definitions, comments, layouts, types in Python."""
 
+import json
 import re
 from dataclasses import dataclass
 from pathlib import Path
@@ -60,6 +61,7 @@ class Catalogue:
         self.known = definitions.read(build / "classes/made/tree.xml")
         self.layout = layout.read(build / "docs/layout.tsv")
         self.headers = _headers(root / "include")
+        self.simulated = _simulated(build / "simhost/calls.json")
         self.helpers = {
             name: text
             for header in _headers(root / "helpers").values()
@@ -294,6 +296,17 @@ def _headers(folder: Path) -> Dict[str, Header]:
         name = str(path.relative_to(folder))
         found[name] = comments.read(path, name)
     return found
+
+
+def _simulated(table: Path) -> Dict[str, str]:
+    """What the simulated host does with each call; nothing if none was built."""
+    if not table.exists():
+        return {}
+    rows = json.loads(table.read_text(encoding="utf-8"))
+    return {
+        row["call"]: f"answers always {row['status']}" if "status" in row else row["answer"]
+        for row in rows
+    }
 
 
 def _shape_of_result(function: Function) -> Tuple[str, ...]:

@@ -240,21 +240,11 @@ class _Functions(_Described):
         return found
 
     def _simulated(self, call: Call) -> Iterable[nodes.Node]:
-        answered = _fixed_answers().get(call.name)
-        if answered:
-            yield nodes.Text("answers always ")
-            yield from self.words.inline(answered)
-            yield nodes.Text(".")
+        answer = self.catalogue.simulated.get(call.name)
+        if answer is None:
+            yield nodes.Text("not built beside this site, which is of another host.")
         else:
-            yield nodes.Text("modelled.")
-
-
-def _fixed_answers() -> Dict[str, str]:
-    """The calls that the simulated host does not model; a test holds it to this list."""
-    path = ROOT / "tests/simhost/python/fixed_answers.txt"
-    lines = path.read_text(encoding="ascii").splitlines()
-    pairs = (line.split() for line in lines if line and not line.startswith("#"))
-    return {name: status for name, status in pairs}
+            yield from self.words.inline(f"{answer}.")
 
 
 class Calls(_Functions):
