@@ -100,7 +100,7 @@ class HostMachine(RuleBasedStateMachine):
             raise AssertionError(f"{name} does not raise {fault}")
         made = make(*arguments)
         answers = list(made) if isinstance(made, (list, tuple)) else [made]
-        expected: Refusals = {fault} if fault else refusals or {"QEX_OK"}
+        expected: Refusals = {str(fault)} if fault else refusals or {"QEX_OK"}
         said = vs.QEX_ReturnStatusToString(answers[0])
         assert answers[0] in {
             getattr(vs, known) for known in expected

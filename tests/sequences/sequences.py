@@ -13,7 +13,7 @@ import time
 from typing import Any, List, Tuple, Type
 
 import host_machine
-from hypothesis import HealthCheck, Phase, Verbosity, seed, settings
+from hypothesis import HealthCheck, Phase, seed, settings
 from hypothesis.stateful import RuleBasedStateMachine, run_state_machine_as_test
 
 STEPS = 50
@@ -28,7 +28,6 @@ def options(sequences: int, shrink: bool) -> settings:
         database=None,
         phases=[Phase.generate, *[Phase.shrink] * shrink],
         report_multiple_bugs=False,
-        verbosity=Verbosity.quiet,
         suppress_health_check=list(HealthCheck),
     )
 
@@ -57,15 +56,15 @@ def run(
             counted, settings=options(sequences, shrink)
         )
     except Exception as error:
-        return counted.made, [shortest(error)]
+        return counted.made, [told(error)]
     return counted.made, []
 
 
-def shortest(error: Exception) -> str:
-    """The shortest sequence that goes wrong, and what is wrong then."""
+def told(error: Exception) -> str:
+    """The sequence that goes wrong, without what is looked at after each step, and the reason."""
     lines = [line for note in getattr(error, "__notes__", []) for line in note.splitlines()]
-    steps = [line for line in lines if not line.startswith("state.the_")]
-    return "\n".join([*steps, f"{type(error).__name__}: {error}"])
+    shown = [line for line in lines if not line.startswith("state.the_")]
+    return "\n".join([*shown, f"{type(error).__name__}: {error}"])
 
 
 def main() -> int:

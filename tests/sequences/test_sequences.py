@@ -65,7 +65,7 @@ class SlowClock(HostMachine):
 
 FAULTS = {
     UnexpectedStatus: "VSDVS_SetMcastFilterMode('",
-    LostMemory: "the_ledger_lists_what_is_out",
+    LostMemory: "get_raw",
     VolatileHost: "restart",
     SlowClock: "step_the_clock",
 }
