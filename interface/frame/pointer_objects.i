@@ -133,6 +133,10 @@ static PyObject *show_pointer_by_name(PyObject *self, PyObject *SWIGUNUSEDPARM(n
 
 static void drop_pointer(PyObject *self) {
   PyObject *link = ((SwigPyObject *)self)->next;
+  if (!link && ((SwigPyObject *)self)->own != SWIG_POINTER_OWN) {
+    PyObject_DEL(self);
+    return;
+  }
   ((SwigPyObject *)self)->next = NULL;
   SwigPyObject_dealloc(self);
   while (link && Py_REFCNT(link) == 1) {
