@@ -6,6 +6,7 @@
 #include <array>
 #include <cassert>
 #include <cstring>
+#include <string_view>
 
 extern "C" {
 
@@ -56,7 +57,13 @@ void report_null_variable(char const *name, char const *type) {
                type);
 }
 
-int wrong_argument_count(PyObject *args, char const *method, int expected) {
+bool accepts_null_record(char const *method) {
+  std::string_view const name = method;
+  return (name.ends_with("_set") && name != "_set") || name.starts_with("delete_") ||
+         name == "qex_Name___repr__";
+}
+
+void report_argument_count(PyObject *args, char const *method, int expected) {
   // "OO...:method"; the longest name has some fifty characters.
   std::array<char, 128> format;
   assert(static_cast<size_t>(expected) + std::strlen(method) + 2 <= format.size());
@@ -64,7 +71,8 @@ int wrong_argument_count(PyObject *args, char const *method, int expected) {
   std::fill_n(format.begin(), objects, 'O');
   PyOS_snprintf(format.data() + objects, format.size() - objects, ":%s", method);
   // The interpreter counts before it stores, so no targets are needed for a tuple of another size.
-  return PyArg_ParseTuple(args, format.data());
+  [[maybe_unused]] int const counted = PyArg_ParseTuple(args, format.data());
+  assert(counted == 0);
 }
 
 }  // extern "C"

@@ -7,7 +7,6 @@
 
 #include <Python.h>
 #include <stdbool.h>
-#include <string.h>
 
 /** Keeps what leads here out of the way of what does not. */
 #define COLD __attribute__((cold))
@@ -35,27 +34,20 @@ void report_null_argument(char const *method, int position, char const *type) CO
 void report_null_variable(char const *name, char const *type) COLD;
 
 /**
- * Raises the interpreter's own error for a wrong number of arguments and answers 0.
+ * Raises the interpreter's own error for a wrong number of arguments.
  *
  * `args` is the argument tuple, `expected` the number of arguments that `method` takes.
  */
-int wrong_argument_count(PyObject *args, char const *method, int expected) COLD;
-
-#ifdef __cplusplus
-}
-#endif
+void report_argument_count(PyObject *args, char const *method, int expected) COLD;
 
 /**
  * Whether `method` accepts a null record: writers then store nothing, destructors have nothing to
  * free, and the printed form of no name is no text. Everything else needs a real record.
- *
- * Always inline, because with the literal that every wrapper passes the compiler knows the answer;
- * left to itself it gives up in a file of that size.
  */
-__attribute__((always_inline)) static inline bool accepts_null_record(char const *method) {
-  size_t const length = strlen(method);
-  return (length > 4 && strcmp(method + length - 4, "_set") == 0) ||
-         strncmp(method, "delete_", 7) == 0 || strcmp(method, "qex_Name___repr__") == 0;
+bool accepts_null_record(char const *method) COLD;
+
+#ifdef __cplusplus
 }
+#endif
 
 #endif

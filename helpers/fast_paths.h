@@ -15,6 +15,7 @@
 #include <string.h>
 
 #include "helpers/conversions.h"
+#include "helpers/failures.h"
 
 #if !defined(NO_FAST_PATHS) && !defined(Py_GIL_DISABLED) && !defined(PYPY_VERSION)
 #define FAST_PATHS 1
@@ -22,16 +23,16 @@
 #define FAST_PATHS 0
 #endif
 
-/** Whether `object` is an int of one digit, and its value. */
-static inline bool is_small_integer(PyObject *object, long *value) {
+/** Whether `object` is an int of one digit, and its value, which has less than 31 bits. */
+static inline bool is_small_integer(PyObject *object, int *value) {
 #if FAST_PATHS && PY_VERSION_HEX >= 0x030C0000
   if (PyLong_CheckExact(object) && PyUnstable_Long_IsCompact((PyLongObject *)object)) {
-    *value = PyUnstable_Long_CompactValue((PyLongObject *)object);
+    *value = (int)PyUnstable_Long_CompactValue((PyLongObject *)object);
     return true;
   }
 #elif FAST_PATHS
   if (PyLong_CheckExact(object) && (size_t)(Py_SIZE(object) + 1) <= 2) {
-    *value = (long)((PyLongObject *)object)->ob_digit[0] * Py_SIZE(object);
+    *value = (int)((PyLongObject *)object)->ob_digit[0] * (int)Py_SIZE(object);
     return true;
   }
 #endif
@@ -39,24 +40,34 @@ static inline bool is_small_integer(PyObject *object, long *value) {
   return false;
 }
 
-/** The readings of conversions.h, with the small integers first. */
+/**
+ * The readings of conversions.h for an argument, the small integers first: whether it was read, and
+ * if not, there is an error that names the method, the argument and its type.
+ */
 // NOLINTBEGIN(bugprone-macro-parentheses): types cannot have them
-#define DEFINE_READING(NAME, TYPE, LEAST, MOST)                           \
-  static inline int read_##NAME(PyObject *object, TYPE *value) {          \
-    long small = 0;                                                       \
-    if (is_small_integer(object, &small) && (LEAST) && small <= (MOST)) { \
-      *value = (TYPE)small;                                               \
-      return kConverted;                                                  \
-    }                                                                     \
-    return NAME##_from_object(object, value);                             \
+#define DEFINE_READING(NAME, TYPE, FITS)                                                          \
+  __attribute__((noinline, unused)) static bool read_other_##NAME(                                \
+      PyObject *object, TYPE *value, char const *method, int position, char const *type) {        \
+    int const kind = NAME##_from_object(object, value);                                           \
+    if (kind != kConverted) report_argument(kind, method, position, type);                        \
+    return kind == kConverted;                                                                    \
+  }                                                                                               \
+  static inline bool read_##NAME(PyObject *object, TYPE *value, char const *method, int position, \
+                                 char const *type) {                                              \
+    int small = 0;                                                                                \
+    if (is_small_integer(object, &small) && (FITS)) {                                             \
+      *value = (TYPE)small;                                                                       \
+      return true;                                                                                \
+    }                                                                                             \
+    return read_other_##NAME(object, value, method, position, type);                              \
   }
 
-DEFINE_READING(int, int, true, INT_MAX)
-DEFINE_READING(unsigned_int, unsigned int, small >= 0, LONG_MAX)
-DEFINE_READING(unsigned_short, unsigned short, small >= 0, USHRT_MAX)
-DEFINE_READING(unsigned_char, unsigned char, small >= 0, UCHAR_MAX)
-DEFINE_READING(unsigned_long, unsigned long, small >= 0, LONG_MAX)
-DEFINE_READING(unsigned_long_long, unsigned long long, small >= 0, LONG_MAX)
+DEFINE_READING(int, int, true)
+DEFINE_READING(unsigned_int, unsigned int, small >= 0)
+DEFINE_READING(unsigned_short, unsigned short, (unsigned int)small <= USHRT_MAX)
+DEFINE_READING(unsigned_char, unsigned char, (unsigned int)small <= UCHAR_MAX)
+DEFINE_READING(unsigned_long, unsigned long, small >= 0)
+DEFINE_READING(unsigned_long_long, unsigned long long, small >= 0)
 
 #undef DEFINE_READING
 // NOLINTEND(bugprone-macro-parentheses)
@@ -68,10 +79,9 @@ enum { kFrameText = 256 };
  */
 static inline bool is_ascii_text(PyObject *object, char const **text, size_t *length) {
 #if FAST_PATHS
-  if (PyUnicode_CheckExact(object) && PyUnicode_IS_READY(object) &&
-      PyUnicode_IS_COMPACT_ASCII(object)) {
-    *text = (char const *)PyUnicode_1BYTE_DATA(object);
-    *length = (size_t)PyUnicode_GET_LENGTH(object);
+  if (PyUnicode_CheckExact(object) && PyUnicode_IS_COMPACT_ASCII(object)) {
+    *text = (char const *)object + sizeof(PyASCIIObject);
+    *length = (size_t)((PyASCIIObject *)object)->length;
     return true;
   }
 #endif
@@ -79,37 +89,23 @@ static inline bool is_ascii_text(PyObject *object, char const **text, size_t *le
   return false;
 }
 
-/** Copies `SIZE` bytes from both ends, which together cover any length from `SIZE` to twice that.
- */
-#define COPY_BOTH_ENDS(SIZE)                      \
-  do {                                            \
-    char tail[SIZE];                              \
-    memcpy(tail, source + length - (SIZE), SIZE); \
-    memcpy(target, source, SIZE);                 \
-    memcpy(target + length - (SIZE), tail, SIZE); \
-  } while (0)
+/** Names are mostly shorter than this. */
+enum { kShortText = 32 };
 
 /**
- * Copies `length` bytes, at least one. Names are mostly short, and a call for each is what a copy
- * costs; the compiler would make it a string instruction, which costs more.
+ * A copy, somewhere in `frame`, of an ASCII text that is short; null if `object` is another.
+ *
+ * It takes the 32 bytes that end with the text's NUL, whatever its length, which a processor that
+ * had to branch on it would guess wrong. What lies before the text is its object's own head, which
+ * is longer than that.
  */
-static inline void copy_short(char *target, char const *source, size_t length) {
-  if (length > 32) {
-    __asm__("" : "+r"(length)); /* hides the bound */
-    memcpy(target, source, length);
-  } else if (length >= 16) {
-    COPY_BOTH_ENDS(16);
-  } else if (length >= 8) {
-    COPY_BOTH_ENDS(8);
-  } else if (length >= 4) {
-    COPY_BOTH_ENDS(4);
-  } else if (length >= 2) {
-    COPY_BOTH_ENDS(2);
-  } else {
-    *target = *source;
-  }
+static inline char *copy_short_text(PyObject *object, char frame[kShortText]) {
+  char const *text = NULL;
+  size_t length = 0;
+  if (sizeof(PyASCIIObject) < kShortText || !is_ascii_text(object, &text, &length)) return NULL;
+  if (length >= kShortText) return NULL;
+  memcpy(frame, text + length + 1 - kShortText, kShortText);
+  return frame + kShortText - 1 - length;
 }
-
-#undef COPY_BOTH_ENDS
 
 #endif

@@ -47,25 +47,52 @@ static inline void keep_or_free(PyObject *object) {
 %}
 
 %wrapper %{
+/* The pointer in a raw pointer object of exactly the type that is wanted; null for all else. */
+static inline void *raw_pointer(PyObject *object, swig_type_info *type, int flags) {
 #if FAST_PATHS
-/* A raw pointer object of exactly the type that is wanted. */
-static inline int convert_pointer(PyObject *object, void **pointer, swig_type_info *type, int flags) {
   SwigPyObject *raw = (SwigPyObject *)object;
   if (Py_TYPE(object) == kept.type && raw->ty == type) {
-    *pointer = raw->ptr;
     if (flags & SWIG_POINTER_DISOWN) raw->own = 0;
-    return SWIG_OK;
+    return raw->ptr;
   }
-  return convert_any_pointer(object, pointer, type, flags);
+#endif
+  (void)object, (void)type, (void)flags;
+  return NULL;
 }
-#undef SWIG_ConvertPtr
-#define SWIG_ConvertPtr(object, pointer, type, flags) \
-  convert_pointer(object, (void **)(pointer), type, flags)
 
+/* What an argument without a pointer answers, for null is one. */
+static char no_pointer;
+#define NO_POINTER ((void *)&no_pointer)
+
+/* The pointer in an argument, or NO_POINTER with an error. */
+static void *read_pointer(PyObject *object, swig_type_info *type, int flags, char const *method,
+                          int position, char const *spelling) {
+  void *pointer = NULL;
+  if (SWIG_IsOK(SWIG_ConvertPtr(object, &pointer, type, flags))) return pointer;
+  report_argument(kWrongType, method, position, spelling);
+  return NO_POINTER;
+}
+
+/* Likewise of a method's own record, which most need. */
+static void *read_record(PyObject *object, swig_type_info *type, int flags, char const *method,
+                         int position, char const *spelling) {
+  void *record = read_pointer(object, type, flags, method, position, spelling);
+  if (record || accepts_null_record(method)) return record;
+  report_null_argument(method, position, spelling);
+  return NO_POINTER;
+}
+
+#if FAST_PATHS
 /* A raw pointer object for a type without a class. */
 static PyObject *new_pointer(void *pointer, swig_type_info *type, int flags) {
   if (pointer && (!type->clientdata || (flags & SWIG_POINTER_NOSHADOW))) {
-    return SwigPyObject_New(pointer, type, flags & SWIG_POINTER_OWN);
+    SwigPyObject *raw = (SwigPyObject *)kept_or_new(kept.type);
+    if (!raw) return NULL;
+    raw->ptr = pointer;
+    raw->ty = type;
+    raw->own = flags & SWIG_POINTER_OWN;
+    raw->next = NULL;
+    return (PyObject *)raw;
   }
   return SWIG_Python_NewPointerObj(NULL, pointer, type, flags);
 }

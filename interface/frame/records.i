@@ -11,12 +11,17 @@
 // Stands before the headers; each line before the header of its record.
 
 // A pointer object of the right type, or None. A writer of a pointer takes over what the object owns.
-%typemap(in, noblock=1) SWIGTYPE * (void *pointer = NULL) {
-  if (!SWIG_IsOK(SWIG_ConvertPtr($input, &pointer, $descriptor, $disown))) {
-    %bad_argument(kWrongType, "$type");
+%define %pointer_argument(PARAMETER, READ)
+%typemap(in, noblock=1) PARAMETER {
+  $1 = ($ltype)raw_pointer($input, $descriptor, $disown);
+  if (!$1) {
+    $1 = ($ltype)READ($input, $descriptor, $disown, "$symname", $argnum, "$type");
+    if ((void *)$1 == NO_POINTER) SWIG_fail;
   }
-  $1 = ($ltype)pointer;
 }
+%enddef
+%pointer_argument(SWIGTYPE *, read_pointer)
+%pointer_argument(SWIGTYPE *self, read_record)
 %typemap(in) SWIGTYPE [] = SWIGTYPE *;
 %typemap(in, noblock=1) void * {
   if (!SWIG_IsOK(SWIG_ConvertPtr($input, &$1, 0, $disown))) %bad_argument(kWrongType, "$type");
@@ -82,11 +87,7 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self),
 %immutable RECORD::FIELD;
 %enddef
 
-// Readers and methods need a real record.
-%typemap(check, noblock=1) SWIGTYPE *self {
-  if (!accepts_null_record("$symname") && !$1) %null_argument($argnum, "$type");
-}
-
+// Other arguments that a method needs.
 %typemap(check, noblock=1) SWIGTYPE *REQUIRED, char *REQUIRED {
   if (!$1) %null_argument($argnum, "$type");
 }

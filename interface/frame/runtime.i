@@ -23,7 +23,7 @@
 
 #define PyArg_UnpackTuple(args, method, least, most, ...)                   \
   (PyTuple_GET_SIZE(args) == (most) ? (TAKE_##most(args, ##__VA_ARGS__), 1) \
-                                    : wrong_argument_count(args, method, most))
+                                    : (report_argument_count(args, method, most), 0))
 %}
 
 // A module that cannot be created must leave the interpreter's error standing; the stock start-up

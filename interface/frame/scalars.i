@@ -1,10 +1,9 @@
 // Scalars: integers and bytes by the converters of helpers/conversions.h.
 // Stands before every function with a scalar argument.
 
-%define %scalar(TYPE, READING)
-%typemap(in, noblock=1) TYPE (TYPE value, int kind) {
-  kind = READING($input, &value);
-  if (kind != kConverted) %bad_argument(kind, "$ltype");
+%define %scalar(TYPE, READ)
+%typemap(in, noblock=1) TYPE (TYPE value) {
+  if (!READ($input, &value, "$symname", $argnum, "$ltype")) SWIG_fail;
   $1 = ($ltype)value;
 }
 %enddef
@@ -16,7 +15,12 @@
 %scalar(unsigned long, read_unsigned_long)
 %scalar(size_t, read_unsigned_long)
 %scalar(unsigned long long, read_unsigned_long_long)
-%scalar(char, char_from_object)
+
+%typemap(in, noblock=1) char (char value, int kind) {
+  kind = char_from_object($input, &value);
+  if (kind != kConverted) %bad_argument(kind, "$ltype");
+  $1 = ($ltype)value;
+}
 
 // An enumeration is an int: any value within 32 signed bits passes, named or not.
 %typemap(in, noblock=1) enum SWIGTYPE = int;

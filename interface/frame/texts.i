@@ -1,8 +1,7 @@
 // Texts: `char *` arguments, and arrays of chars in records and arguments.
 // Stands before every function with a text.
 
-// A copy of the text's UTF-8 bytes: of a short ASCII text in the wrapper's frame, of any other on the
-// heap. What is no str may be a `char *` object, which is handed on as it is; None is null.
+// What is no str may be a `char *` object, which is handed on as it is; None is null.
 %{
 SWIGINTERN int text_from_pointer(PyObject *object, char **text) {
   static swig_type_info *type = NULL;
@@ -13,29 +12,7 @@ SWIGINTERN int text_from_pointer(PyObject *object, char **text) {
   return kConverted;
 }
 
-SWIGINTERN int other_text(PyObject *object, char **heap, char **text) {
-  int kind;
-  if (!PyUnicode_Check(object)) return text_from_pointer(object, text);
-  kind = text_from_str(object, heap, NULL);
-  *text = *heap;
-  return kind;
-}
-
-/* One copy for all wrappers: a call costs less than the code at every argument would. */
-__attribute__((noinline)) SWIGINTERN int read_text(PyObject *object, char *frame, char **heap,
-                                                   char **text) {
-  char const *ascii = NULL;
-  size_t length = 0;
-  if (is_ascii_text(object, &ascii, &length) && length < kFrameText) {
-    copy_short(frame, ascii, length + 1);
-    *text = frame;
-    return kConverted;
-  }
-  return other_text(object, heap, text);
-}
-
-__attribute__((noinline)) SWIGINTERN int read_array_text(PyObject *object, size_t capacity,
-                                                         ArrayText *text) {
+SWIGINTERN int array_text_from_object(PyObject *object, size_t capacity, ArrayText *text) {
   char *pointer = NULL;
   int kind;
   if (is_ascii_text(object, &text->bytes, &text->size)) {
@@ -46,13 +23,45 @@ __attribute__((noinline)) SWIGINTERN int read_array_text(PyObject *object, size_
   kind = text_from_pointer(object, &pointer);
   return kind == kConverted ? array_text_from_chars(pointer, capacity, text) : kind;
 }
+
+SWIGINTERN bool read_array_text(PyObject *object, size_t capacity, ArrayText *text,
+                                char const *method, int position, char const *type) {
+  int const kind = array_text_from_object(object, capacity, text);
+  if (kind != kConverted) report_argument(kind, method, position, type);
+  return kind == kConverted;
+}
 %}
 
-%typemap(in, noblock=1) char * (char frame[kFrameText], char *heap = NULL, char *text = NULL,
-                                int kind) {
-  kind = read_text($input, frame, &heap, &text);
-  if (kind != kConverted) %bad_argument(kind, "$type");
-  $1 = text;
+// An argument that is a text: a copy of its UTF-8 bytes, of an ASCII text that is not long in the
+// wrapper's frame, of any other on the heap.
+%wrapper %{
+SWIGINTERN char *read_text(PyObject *object, char frame[kFrameText], char **heap, char const *method,
+                           int position, char const *type) {
+  char const *ascii = NULL;
+  char *text = NULL;
+  size_t length = 0;
+  int kind;
+  if (is_ascii_text(object, &ascii, &length) && length < kFrameText) {
+    __asm__("" : "+r"(length)); /* hides the bound, for which this would be a string instruction */
+    return memcpy(frame, ascii, length + 1);
+  }
+  if (PyUnicode_Check(object)) {
+    kind = text_from_str(object, heap, NULL);
+    text = *heap;
+  } else {
+    kind = text_from_pointer(object, &text);
+  }
+  if (kind == kConverted) return text;
+  report_argument(kind, method, position, type);
+  return NO_POINTER;
+}
+%}
+%typemap(in, noblock=1) char * (char frame[kFrameText], char *heap = NULL) {
+  $1 = copy_short_text($input, frame);
+  if (!$1) {
+    $1 = read_text($input, frame, &heap, "$symname", $argnum, "$type");
+    if ((void *)$1 == NO_POINTER) SWIG_fail;
+  }
 }
 %typemap(freearg, noblock=1, match="in") char * {
   if (heap$argnum) free(heap$argnum);
@@ -61,10 +70,15 @@ __attribute__((noinline)) SWIGINTERN int read_array_text(PyObject *object, size_
 %typemap(freearg, match="in") char const * = char *;
 
 // A field that is an array of chars: the text goes straight into it, with zeros to the end; no text is
-// all zeros, and a null record keeps what it has not got.
-%typemap(in, noblock=1) char [ANY] (ArrayText text, int kind) {
-  kind = read_array_text($input, $1_dim0, &text);
-  if (kind != kConverted) %bad_argument(kind, "$type");
+// all zeros, and a null record keeps what it has not got. A short text brings zeros of its own.
+%typemap(in, noblock=1) char [ANY] (ArrayText text, char room[2 * kShortText]) {
+  text.bytes = $1_dim0 < kShortText ? NULL : copy_short_text($input, room);
+  if (text.bytes) {
+    text.size = kShortText;
+    memset(room + kShortText, 0, kShortText);
+  } else if (!read_array_text($input, $1_dim0, &text, "$symname", $argnum, "$type")) {
+    SWIG_fail;
+  }
   $1 = (char *)&text;
 }
 %typemap(memberin, noblock=1) char [ANY] {
@@ -75,9 +89,8 @@ __attribute__((noinline)) SWIGINTERN int read_array_text(PyObject *object, size_
 //
 //   %array_argument(char const sid[32])
 %define %array_argument(PARAMETER...)
-%typemap(in, noblock=1) PARAMETER (ArrayText text, char array[$1_dim0], int kind) {
-  kind = read_array_text($input, $1_dim0, &text);
-  if (kind != kConverted) %bad_argument(kind, "$type");
+%typemap(in, noblock=1) PARAMETER (ArrayText text, char array[$1_dim0]) {
+  if (!read_array_text($input, $1_dim0, &text, "$symname", $argnum, "$type")) SWIG_fail;
   store_array_text(array, sizeof(array), text);
   $1 = array;
 }
@@ -92,5 +105,5 @@ __attribute__((noinline)) SWIGINTERN int read_array_text(PyObject *object, size_
 }
 %typemap(typecheck, precedence=SWIG_TYPECHECK_STRING, noblock=1) char [ANY], char const [ANY] {
   ArrayText unused;
-  $1 = read_array_text($input, $1_dim0, &unused) == kConverted;
+  $1 = array_text_from_object($input, $1_dim0, &unused) == kConverted;
 }

@@ -42,16 +42,24 @@ Reading read(int (*convert)(PyObject *, Value *), PyObject *object) {
   return {outcome, outcome == kConverted ? std::optional<Wide>(value) : std::nullopt};
 }
 
-/// A fast path, of which no target may be null, and the conversion behind it.
-template <typename Value>
-Reading read_both(int (*fast)(PyObject *, Value *), int (*convert)(PyObject *, Value *),
-                  PyObject *object) {
-  Value value{};
-  int const outcome = fast(object, &value);
+/// The outcome that an error reports, or that of no error; it is gone then.
+int taken_outcome() {
+  int const outcome = PyErr_Occurred() == nullptr                        ? kConverted
+                      : PyErr_ExceptionMatches(PyExc_OverflowError) != 0 ? kOutOfRange
+                                                                         : kWrongType;
   PyErr_Clear();
-  Reading const quick{outcome, outcome == kConverted ? std::optional<Wide>(value) : std::nullopt};
-  require(quick == read(convert, object), "a fast path is a conversion");
-  return quick;
+  return outcome;
+}
+
+/// An argument of a method, which reports what it cannot read, and the conversion behind it.
+template <typename Value>
+Reading read_both(bool (*argument)(PyObject *, Value *, char const *, int, char const *),
+                  int (*convert)(PyObject *, Value *), PyObject *object) {
+  Value value{};
+  bool const was_read = argument(object, &value, "method", 1, "type");
+  Reading const reported{taken_outcome(), was_read ? std::optional<Wide>(value) : std::nullopt};
+  require(reported == read(convert, object), "an argument is read as its conversion does");
+  return reported;
 }
 
 Reading signed_reading(Wide number, Wide least, Wide most) {

@@ -27,7 +27,7 @@ std::string take_error(PyObject *expected_type) {
 }
 
 std::string report_of_count(char const *arguments, int expected) {
-  EXPECT_EQ(0, wrong_argument_count(python(arguments).get(), "method", expected));
+  report_argument_count(python(arguments).get(), "method", expected);
   return take_error(PyExc_TypeError);
 }
 
