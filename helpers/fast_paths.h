@@ -84,8 +84,13 @@ static inline bool is_ascii_text(PyObject *object, char const **text, size_t *le
     *length = (size_t)((PyASCIIObject *)object)->length;
     return true;
   }
+#else
+  if (PyUnicode_CheckExact(object) && PyUnicode_IS_READY(object) && PyUnicode_IS_ASCII(object)) {
+    *text = PyUnicode_AsUTF8(object);
+    *length = (size_t)PyUnicode_GET_LENGTH(object);
+    return true;
+  }
 #endif
-  (void)object, (void)text, (void)length;
   return false;
 }
 
@@ -102,8 +107,8 @@ enum { kShortText = 32 };
 static inline char *copy_short_text(PyObject *object, char frame[kShortText]) {
   char const *text = NULL;
   size_t length = 0;
-  if (sizeof(PyASCIIObject) < kShortText || !is_ascii_text(object, &text, &length)) return NULL;
-  if (length >= kShortText) return NULL;
+  bool const has_head = FAST_PATHS && sizeof(PyASCIIObject) >= kShortText;
+  if (!has_head || !is_ascii_text(object, &text, &length) || length >= kShortText) return NULL;
   memcpy(frame, text + length + 1 - kShortText, kShortText);
   return frame + kShortText - 1 - length;
 }

@@ -42,13 +42,9 @@ Reading read(int (*convert)(PyObject *, Value *), PyObject *object) {
   return {outcome, outcome == kConverted ? std::optional<Wide>(value) : std::nullopt};
 }
 
-/// The outcome that an error reports, or that of no error; it is gone then.
-int taken_outcome() {
-  int const outcome = PyErr_Occurred() == nullptr                        ? kConverted
-                      : PyErr_ExceptionMatches(PyExc_OverflowError) != 0 ? kOutOfRange
-                                                                         : kWrongType;
-  PyErr_Clear();
-  return outcome;
+/// What the error reports.
+int reported_outcome() {
+  return PyErr_ExceptionMatches(PyExc_OverflowError) != 0 ? kOutOfRange : kWrongType;
 }
 
 /// An argument of a method, which reports what it cannot read, and the conversion behind it.
@@ -56,8 +52,13 @@ template <typename Value>
 Reading read_both(bool (*argument)(PyObject *, Value *, char const *, int, char const *),
                   int (*convert)(PyObject *, Value *), PyObject *object) {
   Value value{};
-  bool const was_read = argument(object, &value, "method", 1, "type");
-  Reading const reported{taken_outcome(), was_read ? std::optional<Wide>(value) : std::nullopt};
+  Reading reported{kConverted, std::nullopt};
+  if (argument(object, &value, "method", 1, "type")) {
+    reported.value = value;
+  } else {
+    reported.outcome = reported_outcome();
+  }
+  PyErr_Clear();
   require(reported == read(convert, object), "an argument is read as its conversion does");
   return reported;
 }
@@ -197,14 +198,17 @@ void str_to_char(Str const &str) {
   }
 }
 
-/// Short texts are copied without a call.
+/// Short texts are copied whatever their length.
 void copy_ascii(Str const &str) {
   char const *text = nullptr;
   std::size_t length = 0;
-  if (is_ascii_text(str.object.get(), &text, &length) && length > 0) {
-    Block const copy(length);
-    copy_short(copy.chars(), Block::of(std::string(text, length)).chars(), length);
-    require(copy.text() == str.bytes, "a copy is the text");
+  bool const is_short = is_ascii_text(str.object.get(), &text, &length) && length < kShortText;
+  Block const frame(kShortText);
+  char const *const copy = copy_short_text(str.object.get(), frame.chars());
+  require((copy != nullptr) == is_short, "short texts are copied, and no other");
+  if (copy != nullptr) {
+    require(copy + length + 1 == frame.chars() + kShortText, "a copy ends where the frame does");
+    require(std::string(copy, length) == str.bytes, "a copy is the text");
   }
 }
 
