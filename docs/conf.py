@@ -23,6 +23,7 @@ smartquotes = False
 add_module_names = True
 myst_heading_anchors = 3
 pygments_style = "tango"
+pygments_dark_style = "tango"  # there is no dark form of the theme, see site.css
 # Only colour is lost where a quoted text of a shell session goes on in the next line.
 suppress_warnings = ["misc.highlighting_failure"]
 highlight_language = "none"

@@ -15,6 +15,7 @@ from make_stubs import Stubs, method_arguments, overloads
 from pictures import Shape
 
 CLASSES, FLAT = "libvswitch", "_libvswitch"
+TYPES = "C"  # where the names of C types have their places
 _VIEW = "a view of what stays the library's; nothing frees it"
 
 # Methods and helpers with no text of their own anywhere else.
@@ -62,6 +63,9 @@ class Catalogue:
         self.layout = layout.read(build / "docs/layout.tsv")
         self.headers = _headers(root / "include")
         self.simulated = _simulated(build / "simhost/calls.json")
+        self.types = {
+            name: text for header in self.headers.values() for name, text in header.types.items()
+        }
         self.helpers = {
             name: text
             for header in _headers(root / "helpers").values()

@@ -34,6 +34,7 @@ class Header:
     families: List[Family] = field(default_factory=list)
     prototypes: Dict[str, str] = field(default_factory=dict)
     comments: Dict[str, str] = field(default_factory=dict)  # of functions
+    types: Dict[str, str] = field(default_factory=dict)  # what is said of each
 
 
 _COMMENT = r"/\*\*(?!<)(?P<comment>(?:[^*]|\*(?!/))*)\*/"
@@ -91,6 +92,7 @@ def read(path: Path, name: str) -> Header:
     header = Header(name, parted(undecorated(file["comment"]) if file else ""))
     _read_families(source, header)
     _read_functions(source, header)
+    _read_types(source, header)
     return header
 
 
@@ -129,6 +131,16 @@ def common_start(names: Tuple[str, ...]) -> str:
             break
         shared.append(column[0])
     return "_".join([*shared, "*"]) if shared else ""
+
+
+def _read_types(source: str, header: Header) -> None:
+    """Other names of types, which a comment may say of several in a row."""
+    definition = r"typedef [^;{}]*;\n"
+    for match in re.finditer(rf"{_COMMENT}\n(?P<lines>(?:{definition})+)", source):
+        for one in re.findall(definition, match["lines"]):
+            name = re.search(r"\(\*(\w+)\)|(\w+)(?:\[\w+\])?;", one)
+            if name:
+                header.types[name[1] or name[2]] = undecorated(match["comment"])
 
 
 def _read_functions(source: str, header: Header) -> None:

@@ -4,11 +4,13 @@
     .. helpers::                       the module's own functions, and arrays
     .. records:: vswitch/lags.h        every record of headers, its bytes as a picture
     .. constants:: qexapi/links.h      the constants of headers, by family
+    .. types::                         the other names of C types
     .. overview:: calls                a table of all calls, or of all records
     .. record-picture:: VSMACLearning  a picture alone
 """
 
 import sys
+from functools import lru_cache
 from pathlib import Path
 from typing import Any, Dict, Iterable, List, Sequence, Tuple, Union, cast
 
@@ -24,13 +26,17 @@ from sphinx.application import Sphinx  # noqa: E402
 from sphinx.domains.python import PythonDomain  # noqa: E402
 from sphinx.util.docutils import SphinxDirective  # noqa: E402
 
-from catalogue import CLASSES, FLAT, Call, Catalogue  # noqa: E402
+from catalogue import CLASSES, FLAT, TYPES, Argument, Call, Catalogue  # noqa: E402
 from comments import Family, statuses_in  # noqa: E402
 from definitions import Field, Record  # noqa: E402
 from pictures import picture  # noqa: E402
 from words import Words, family_label  # noqa: E402
 
-_catalogues: Dict[Tuple[Path, Path], Tuple[Catalogue, Words]] = {}
+
+@lru_cache(maxsize=None)
+def _read(build_folder: str) -> Tuple[Catalogue, Words]:
+    catalogue = Catalogue(ROOT, Path(build_folder))
+    return catalogue, Words(catalogue)
 
 
 def _sentence(text: str) -> str:
@@ -44,19 +50,11 @@ class _Described(SphinxDirective):
 
     @property
     def catalogue(self) -> Catalogue:
-        return self._both[0]
+        return _read(self.config.build_folder)[0]
 
     @property
     def words(self) -> Words:
-        return self._both[1]
-
-    @property
-    def _both(self) -> Tuple[Catalogue, Words]:
-        places = ROOT, Path(self.config.build_folder)
-        if places not in _catalogues:
-            catalogue = Catalogue(*places)
-            _catalogues[places] = catalogue, Words(catalogue)
-        return _catalogues[places]
+        return _read(self.config.build_folder)[1]
 
     def note(self, name: str, kind: str, node_id: str) -> None:
         """Makes a name known to links and to the search."""
@@ -147,7 +145,7 @@ class _Functions(_Described):
             text = f"{call.name}({form})"
             yield self.labelled("Also as", [nodes.literal(text=text), nodes.Text(", a status.")])
         if call.prototype:
-            yield self.labelled("In C", [self.words.code(call.prototype.rstrip(";"))])
+            yield self.labelled("In C", [self.words.code(call.prototype.rstrip(";"), call.name)])
         if call.arguments:
             yield self._parameters(call)
         yield self.labelled("Answers", self._answer(call))
@@ -173,12 +171,13 @@ class _Functions(_Described):
                 said = nodes.Text("flat: "), self.words.code(flat)
                 types.append(nodes.inline("", "", *said, classes=["flat", "below"]))
             name = [nodes.literal(text=one.name)]
-            meaning = self.words.inline(one.meaning or self._meaning(call, one.name))
+            meaning = self.words.inline(one.meaning or self._meaning(call, one))
             rows.append(((name, types, [self.words.code(one.c_type)], meaning), ()))
         return table(("Parameter", "Python", "C", ""), rows, "parameters")
 
-    def _meaning(self, call: Call, name: str) -> str:
-        """What a name means wherever it stands, as the comments of the headers' files have it."""
+    def _meaning(self, call: Call, argument: Argument) -> str:
+        """What a name or a type means wherever it stands."""
+        name = argument.name
         switch = "alias of the switch"
         said = {
             "switchName": switch,
@@ -192,10 +191,12 @@ class _Functions(_Described):
             "sid": "identifier of the session, up to 31 bytes",
         }
         meaning = said.get(name, "")
-        record = next((one.types[0] for one in call.arguments if one.name == name), "")
-        if record.replace(" or None", "") in self.catalogue.known.records:
-            described = self.catalogue.known.records[record.replace(" or None", "")]
-            meaning = meaning or _sentence(described.doc).rstrip(".")
+        record = self.catalogue.known.records.get(argument.types[0].replace(" or None", ""))
+        if record is not None:
+            meaning = meaning or _sentence(record.doc).rstrip(".")
+        said_of_type = self.catalogue.types.get(argument.c_type, "")
+        if argument.c_type.startswith(("DVS", "NEB")):
+            meaning = meaning or _sentence(said_of_type).rstrip(".")
         if name == "port" and not any(one.c_type == "char *" for one in call.arguments[1:]):
             meaning = "number of the port" if "PortID" in call.prototype else meaning
         return meaning
@@ -228,12 +229,15 @@ class _Functions(_Described):
         """Statuses and when they are answered, as the comments of the call and its file say."""
         known = self.catalogue.statuses
         found = {"QEX_OK": "done"}
+        makes = any("of the new switch" in text for text in call.comment.parameters.values())
         texts = [("", call.comment.text)]
         texts += [(f"`{name}`: ", text) for name, text in call.comment.parameters.items()]
         if "const *" in call.prototype or "void *" in call.prototype:
             texts.append(("", self.catalogue.headers[call.header].text.text))
         for prefix, text in texts:
             for status, said in statuses_in(text).items():
+                if makes and status == "QEX_NOT_FOUND":
+                    continue  # it names nothing that is there
                 if status in known and status != "QEX_OK":
                     meanings = [found.get(status, ""), f"{prefix}{said}"]
                     found[status] = "; ".join(filter(None, meanings))
@@ -397,21 +401,21 @@ class Constants(_Described):
         standard.anonlabels[label] = self.env.docname, label
         section += nodes.title("", "", nodes.Text(title))
         section.extend(self.words.paragraphs(family.text))
+        meanings = [self._meaning(family, name) for name in family.names]
         rows = []
-        for name in family.names:
+        for name, meaning in zip(family.names, meanings):
             value = self.catalogue.layout.values[name]
             anchor = f"{FLAT}.{name}"
             self.note(anchor, "data", anchor)
-            cells = (
-                [nodes.literal(text=name)],
-                self._value(family, value),
-                self.words.inline(self._meaning(family, name)),
-            )
+            cells = [[nodes.literal(text=name)], self._value(value)]
+            if any(meanings):
+                cells.append(self.words.inline(meaning))
             rows.append((cells, (anchor,)))
-        section += table(("Constant", "Value", ""), rows, "constants")
+        headings = ("Constant", "Value", "") if any(meanings) else ("Constant", "Value")
+        section += table(headings, rows, "constants")
         return section
 
-    def _value(self, family: Family, value: Union[int, str]) -> List[nodes.Node]:
+    def _value(self, value: Union[int, str]) -> List[nodes.Node]:
         if isinstance(value, str):
             return [nodes.literal(text=f'"{value}"')]
         found: List[nodes.Node] = [nodes.literal(text=str(value))]
@@ -427,6 +431,25 @@ class Constants(_Described):
         if family.title == "QEX_ReturnStatus":
             return str(readable(name))
         return ""
+
+
+class Types(_Described):
+    def run(self) -> List[nodes.Node]:
+        rows = []
+        for name, text in self.catalogue.types.items():
+            anchor = f"{TYPES}.{name}"
+            self.note(anchor, "data", anchor)
+            behind = self.catalogue.known.typedefs.get(name)
+            spelled = behind.spelled() if behind else ""
+            if "f(" in "".join(behind.layers if behind else ()):
+                spelled = "a function"
+            cells = (
+                [nodes.literal(text=name)],
+                [self.words.code(spelled)],
+                self.words.inline(text.replace("\n", " ")),
+            )
+            rows.append((cells, (anchor,)))
+        return [table(("Type", "In C", ""), rows, "types")]
 
 
 class Overview(_Described):
@@ -457,12 +480,18 @@ class Overview(_Described):
         return table(("Call", ""), rows, "overview")
 
 
+def _link_literals(app: Sphinx, document: nodes.document) -> None:
+    _read(app.config.build_folder)[1].link_literals(document)
+
+
 def setup(app: Sphinx) -> Dict[str, bool]:
     app.add_config_value("build_folder", "", "env")
+    app.connect("doctree-read", _link_literals)
     app.add_directive("calls", Calls)
     app.add_directive("helpers", Helpers)
     app.add_directive("records", Records)
     app.add_directive("constants", Constants)
+    app.add_directive("types", Types)
     app.add_directive("overview", Overview)
     app.add_directive("record-picture", RecordPicture)
     return {"parallel_read_safe": True, "parallel_write_safe": True}

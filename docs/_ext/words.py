@@ -6,9 +6,10 @@ from typing import Dict, Iterable, List, Optional, Tuple
 from docutils import nodes
 from sphinx.addnodes import pending_xref
 
-from catalogue import CLASSES, FLAT, Catalogue
+from catalogue import CLASSES, FLAT, TYPES, Catalogue
 
-_WORDS = re.compile(r"`([^`]+)`|(?<![\w./])([A-Za-z_]\w*\w|[A-Z]\w*_)(\*?)(?!\w)")
+_NAME = r"[A-Za-z]\w+\.[A-Za-z]\w*|[A-Za-z_]\w*\w|[A-Z]\w*_"
+_WORDS = re.compile(rf"`([^`]+)`|(?<![\w./])({_NAME})(\*?)(?!\w)")
 
 
 class Words:
@@ -21,8 +22,13 @@ class Words:
                 self._targets[method.name] = ("py", "func", f"{FLAT}.{method.name}")
         for record in catalogue.known.records.values():
             self._targets[record.name] = ("py", "class", f"{CLASSES}.{record.name}")
+            for field in record.fields:
+                name = f"{record.name}.{field.name}"
+                self._targets[name] = ("py", "attr", f"{CLASSES}.{name}")
         for one in catalogue.known.constants:
             self._targets[one.name] = ("py", "data", f"{FLAT}.{one.name}")
+        for name in catalogue.types:
+            self._targets.setdefault(name, ("py", "data", f"{TYPES}.{name}"))
         for header in catalogue.headers.values():
             for family in header.families:
                 title = catalogue.title_of(family)
@@ -50,13 +56,21 @@ class Words:
         found.append(nodes.Text(text[last:]))
         return found
 
-    def code(self, text: str) -> nodes.literal:
-        """A C or Python type, its names being links."""
+    def code(self, text: str, but: str = "") -> nodes.literal:
+        """A C or Python type, its names being links; `but` is the one whose page this is."""
         inner: List[nodes.Node] = []
         for part in re.split(r"(\w+)", text):
-            link = self._link(part) if part else None
+            link = self._link(part) if part != but else None
             inner.append(link if link is not None else nodes.Text(part))
         return nodes.literal("", "", *_unquoted(inner))
+
+    def link_literals(self, document: nodes.document) -> None:
+        """Makes links of names that stand as code in running text."""
+        for literal in list(document.findall(nodes.literal)):
+            link = self._link(literal.astext()) if literal.parent.tagname != "title" else None
+            if link is not None and not list(literal.findall(pending_xref)):
+                if not isinstance(literal.parent, (nodes.reference, pending_xref)):
+                    literal.replace_self(link)
 
     def _link(self, name: str) -> Optional[nodes.Element]:
         target = self._targets.get(name)
