@@ -12,7 +12,7 @@ SEED = 20
 # How many inputs each tries; together they take some seconds.
 INPUTS = {
     "mirror": 20_000,
-    "properties": 3_000,
+    "properties": 1_500,
     "runtime_options": 20_000,
     "scenario": 8_000,
     "state_image": 12_000,

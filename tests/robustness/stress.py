@@ -1,73 +1,213 @@
 #!/usr/bin/env python3
-"""Runs the robustness programs for as long as it is told, and reports what they find.
+"""Runs everything that looks for crashes, hangs and leaks for as long as it is told, and reports.
 
     stress.py [--minutes N] [--seed N]
 
-First every batch of the sweep, then a million calls of every kind and a million panics in the same
-memory; what is left of the time goes to random pairs of values, a seed after the other.
+First what has an end: every batch of the sweep, then a million calls of every kind and giving up a
+million times in the same memory, fewer if there are less than twenty minutes. What has none shares
+the time that is left: fuzzers, sequences, killed processes and random pairs of values.
 """
 
 import argparse
+import subprocess
 import sys
 import tempfile
+import threading
 import time
+from functools import partial
 from pathlib import Path
-from typing import Iterator, List, Tuple
+from types import TracebackType
+from typing import Callable, Iterator, List, NamedTuple, Optional, Tuple, Type
 
+import fuzzing
 import processes
 import test_repeat
 import test_sweep
 
 MILLION = 1_000_000
-SLICE = 60.0
+WHOLE = 20
+"""Minutes in which a million calls of every kind are no large part."""
 
-Part = Tuple[str, int, List[str]]
-"""What ran, how many calls it made, and what was wrong."""
+ROUNDS = 20
+"""Of killed processes, before one looks at the time."""
+
+SHARES = {"fuzzing": 0.45, "sequences": 0.2, "kills": 0.1, "pairs": 0.25}
+"""Of the time that what has an end leaves."""
+
+Outcome = Tuple[int, List[str]]
+"""How much was done, and what was wrong."""
 
 
-def program(name: str, *arguments: str) -> Tuple[int, List[str]]:
-    """Run one of the programs that print what is wrong and, last, how often they called."""
-    done = processes.run(str(processes.HERE / name), *arguments)
-    *wrong, count = done.stdout.splitlines() or ["0"]
-    if done.returncode != 0:
+class Part(NamedTuple):
+    """Something that runs until it is done, or until its time is over."""
+
+    name: str
+    unit: str
+    run: Callable[[float], Outcome]
+    """With the seconds that it has; only what has no end asks for them."""
+    share: float = 0.0
+
+
+class Result(NamedTuple):
+    """What became of a part."""
+
+    part: Part
+    done: int
+    wrong: List[str]
+
+
+def program(name: str, *arguments: str) -> Outcome:
+    """Run one of the programs over the recording host."""
+    return printed(processes.run(str(processes.HERE / name), *arguments))
+
+
+def sequences(seed: int, seconds: float) -> Outcome:
+    """Run sequences on the simulated host."""
+    command = [sys.executable, str(processes.TESTS / "sequences" / "sequences.py")]
+    options = [f"--seed={seed}", f"--seconds={seconds}"]
+    return printed(
+        subprocess.run([*command, *options], capture_output=True, text=True, check=False)
+    )
+
+
+def printed(done: "subprocess.CompletedProcess[str]") -> Outcome:
+    """What a program says that prints what is wrong and, last, how much it did."""
+    lines = done.stdout.splitlines()
+    if done.returncode != 0 or not lines:
         return 0, [f"status {done.returncode}: {done.stdout[-500:]} {done.stderr[-2000:]}"]
-    return int(count), wrong
+    return int(lines[-1]), ["\n".join(lines[:-1])] if lines[:-1] else []
 
 
-def parts(seed: int, end: float, folder: Path) -> Iterator[Part]:
-    """Everything once, then pairs until the end."""
+def killed(seconds: float) -> Outcome:
+    """Kill processes that write a state file, and look for what they had completed."""
+    test = processes.BUILD / "tests" / "simhost" / "simhost_processes_test"
+    command = [str(test), "--gtest_filter=*AKilledOneLosesNothing*", f"--gtest_repeat={ROUNDS}"]
+    end, rounds = time.monotonic() + seconds, 0
+    while rounds == 0 or time.monotonic() < end:
+        done = subprocess.run(command, capture_output=True, text=True, check=False)
+        rounds += ROUNDS
+        if done.returncode != 0 or done.stdout.count("[  PASSED  ] 1 test.") != ROUNDS:
+            return rounds, [done.stdout[-2000:] + done.stderr[-500:]]
+    return rounds, []
+
+
+def fuzzed(name: str, seed: int, seconds: float) -> Outcome:
+    corpus = fuzzing.BUILD / "corpus" / name
+    inputs, wrong = fuzzing.run(name, corpus, seed, f"-max_total_time={max(1, int(seconds))}")
+    return inputs, wrong
+
+
+def whole(run: Callable[..., Outcome], *arguments: object) -> Callable[[float], Outcome]:
+    """Something that has an end."""
+    return lambda _: run(*arguments)
+
+
+def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
+    """All of them, what has an end first."""
     for batch in test_sweep.BATCHES:
         if batch != "pairs":
-            calls, wrong = processes.sweep(batch, folder)
-            yield f"sweep of {batch}", calls, wrong
+            yield Part(f"sweep, {batch}", "calls", whole(processes.sweep, batch, folder))
+    calls = str(int(MILLION * min(1.0, minutes / WHOLE)))
     for kind in test_repeat.KINDS:
-        calls, wrong = program("repeat.py", "memory", kind, str(MILLION))
-        yield f"memory of {kind}", calls, wrong
-    calls, wrong = program("panics.py", str(MILLION))
-    yield "panics", calls, wrong
-    while time.monotonic() < end:
-        seconds = min(SLICE, end - time.monotonic())
-        calls, wrong = processes.sweep("pairs", folder, seed, seconds)
-        yield f"pairs, seed {seed}", calls, wrong
-        seed += 1
+        repeat = whole(program, "repeat.py", "memory", kind, calls)
+        yield Part(f"memory, {kind}", "calls", repeat)
+    yield Part("giving up", "calls", whole(program, "panics.py", calls))
+    for name in fuzzing.NAMES:
+        share = SHARES["fuzzing"] / len(fuzzing.NAMES)
+        yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
+    yield Part("sequences of calls", "sequences", partial(sequences, seed), SHARES["sequences"])
+    yield Part("killed processes", "rounds", killed, SHARES["kills"])
+    yield Part(
+        "random pairs",
+        "calls",
+        lambda seconds: processes.sweep("pairs", folder, seed, seconds),
+        SHARES["pairs"],
+    )
+
+
+class Progress:
+    """Says what runs: in one line of a terminal, else in a line for each part."""
+
+    def __init__(self, minutes: float) -> None:
+        self._start = time.monotonic()
+        self._minutes = minutes
+        self._text = ""
+        self._over = threading.Event()
+        self._redraw = threading.Thread(target=self._draw_again, daemon=True)
+
+    def __enter__(self) -> "Progress":
+        if sys.stdout.isatty():
+            self._redraw.start()
+        return self
+
+    def __exit__(
+        self,
+        kind: Optional[Type[BaseException]],
+        error: Optional[BaseException],
+        traceback: Optional[TracebackType],
+    ) -> None:
+        self._over.set()
+        if self._redraw.is_alive():
+            self._redraw.join()
+            print("\r\033[K", end="", flush=True)
+
+    def show(self, text: str) -> None:
+        self._text = text
+        if not sys.stdout.isatty():
+            print(self._line(), flush=True)
+
+    def _line(self) -> str:
+        passed = int(time.monotonic() - self._start)
+        return f"{passed // 60:3}:{passed % 60:02} of {self._minutes:g}:00  {self._text}"
+
+    def _draw_again(self) -> None:
+        while not self._over.wait(0.5):
+            print(f"\r\033[K{self._line()}", end="", flush=True)
+
+
+def run_all(seed: int, minutes: float, progress: Progress) -> List[Result]:
+    results: List[Result] = []
+    end = time.monotonic() + minutes * 60
+    with tempfile.TemporaryDirectory() as folder:
+        left, shares = 0.0, 0.0
+        for part in parts(seed, minutes, Path(folder)):
+            wrong = sum(len(result.wrong) for result in results)
+            progress.show(part.name + (f" ({wrong} wrong so far)" if wrong else ""))
+            if part.share:
+                # What one takes too much or leaves, those behind it share.
+                left, shares = end - time.monotonic(), shares or 1.0
+                seconds = max(1.0, left * part.share / shares)
+                shares -= part.share
+            else:
+                seconds = 0.0
+            results.append(Result(part, *part.run(seconds)))
+    return results
+
+
+def report(results: List[Result]) -> str:
+    """A line for each part, and all that was wrong."""
+    lines = [f"{'':24}{'done':>26}  wrong"]
+    for part, done, wrong in results:
+        count = f"{done:,} {part.unit}"
+        lines.append(f"{part.name:24}{count:>26}  {len(wrong) or '-'}")
+    for part, _, wrong in results:
+        for text in wrong:
+            lines += ["", f"{part.name}:", *(f"  {line}" for line in text.splitlines())]
+    return "\n".join(lines)
 
 
 def main() -> int:
-    """Run all parts, a line for each."""
+    """Run all parts; the status is 1 if anything is wrong."""
     parser = argparse.ArgumentParser()
-    parser.add_argument("--minutes", type=float, default=20.0)
+    parser.add_argument("--minutes", type=float, default=float(WHOLE))
     parser.add_argument("--seed", type=int, default=int(time.time()))
     options = parser.parse_args()
     print(f"seed {options.seed}, {options.minutes:g} minutes", flush=True)
-    end = time.monotonic() + options.minutes * 60
-    total, problems = 0, 0
-    with tempfile.TemporaryDirectory() as folder:
-        for name, calls, wrong in parts(options.seed, end, Path(folder)):
-            total, problems = total + calls, problems + len(wrong)
-            print(f"{name:<24} {calls:>12,} calls  {len(wrong) or 'nothing'} wrong", flush=True)
-            for line in wrong:
-                print(f"  {line}", flush=True)
-    print(f"{total:,} calls, {problems} wrong")
+    with Progress(options.minutes) as progress:
+        results = run_all(options.seed, options.minutes, progress)
+    print(report(results))
+    problems = sum(len(result.wrong) for result in results)
+    print(f"\n{problems} wrong, seed {options.seed}")
     return 1 if problems else 0
 
 
