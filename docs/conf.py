@@ -12,7 +12,7 @@ author = "the authors of libvswitch"
 project_copyright = author
 html_title = "libvswitch for Python"
 
-extensions = ["myst_parser", "documents", "reference"]
+extensions = ["myst_parser", "documents", "reference", "sources"]
 build_folder = os.environ.get("BUILD_DIR", str(HERE.parent / "build"))
 exclude_patterns = ["_ext", "_static"]
 

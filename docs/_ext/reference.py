@@ -34,7 +34,7 @@ from words import Words, family_label  # noqa: E402
 
 
 @lru_cache(maxsize=None)
-def _read(build_folder: str) -> Tuple[Catalogue, Words]:
+def read_catalogue(build_folder: str) -> Tuple[Catalogue, Words]:
     catalogue = Catalogue(ROOT, Path(build_folder))
     return catalogue, Words(catalogue)
 
@@ -50,11 +50,11 @@ class _Described(SphinxDirective):
 
     @property
     def catalogue(self) -> Catalogue:
-        return _read(self.config.build_folder)[0]
+        return read_catalogue(self.config.build_folder)[0]
 
     @property
     def words(self) -> Words:
-        return _read(self.config.build_folder)[1]
+        return read_catalogue(self.config.build_folder)[1]
 
     def note(self, name: str, kind: str, node_id: str) -> None:
         """Makes a name known to links and to the search."""
@@ -481,7 +481,9 @@ class Overview(_Described):
 
 
 def _link_literals(app: Sphinx, document: nodes.document) -> None:
-    _read(app.config.build_folder)[1].link_literals(document)
+    # The reference's own pages have a link where they mean one.
+    if not app.env.docname.startswith("reference/"):
+        read_catalogue(app.config.build_folder)[1].link_literals(document)
 
 
 def setup(app: Sphinx) -> Dict[str, bool]:

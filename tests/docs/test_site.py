@@ -161,3 +161,20 @@ def search(site: Site, query: str) -> List[str]:
     assert done.returncode == 0, done.stderr
     found: Any = json.loads(done.stdout)
     return [str(page) for page in found]
+
+
+def test_what_is_written_by_hand(site: Site) -> None:
+    import libvswitch
+
+    for name in ("Cell", "Callback", "Pointer", "Array", "owned", "Record", "Table"):
+        page = site["reference/memory.html"]
+        assert f"libvswitch.{name}" in page.anchors
+        documented = getattr(libvswitch, name).__doc__.split(".")[0].splitlines()[0]
+        assert documented.split("`")[0] in page.text
+    import simhost
+
+    page = site["reference/testing.html"]
+    for host in (simhost.Host, simhost.SharedHost):
+        for base in host.__mro__[:-1]:
+            for member in (one for one in vars(base) if not one.startswith("_")):
+                assert f"simhost.{base.__name__}.{member}" in page.anchors
