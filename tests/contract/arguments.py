@@ -226,7 +226,7 @@ class ArrayKind(Kind):
     size: int
 
     def plain(self, position: int) -> Sample:
-        return self._of(f"array {position}")
+        return self._of(f"array {position}"[: self.size - 1])
 
     def samples(self) -> List[Sample]:
         longest = self.size - 1
