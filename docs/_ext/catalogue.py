@@ -103,6 +103,10 @@ class Catalogue:
     def header_of(self, record: Record) -> str:
         return "/".join(Path(record.header).parts[-2:])
 
+    def reads_as(self, one: Field) -> str:
+        """What an attribute of a class reads as."""
+        return self._plain(self.stubs[0].member(one))
+
     def shapes(self, record: Record) -> List[Shape]:
         return [self._shape(record, one) for one in record.fields]
 
@@ -191,9 +195,17 @@ class Catalogue:
             for parameter in one.inputs
         )
         names = tuple(parameter.name for parameter in one.inputs)
-        return Call(
-            name, record.name, "", comment, arguments, (names,), self._results(one), (), (), ""
-        )
+        results, owned = self._results(one), self._ownership_of_result(one)
+        return Call(name, record.name, "", comment, arguments, (names,), results, (), owned, "")
+
+    def _ownership_of_result(self, method: Function) -> Tuple[str, ...]:
+        """Whose is what a method, or a function like one, answers."""
+        type_ = self.known.resolve(method.result)
+        if method.owns_elements or (not type_.layers and type_.name in self.known.records):
+            return ("Python owns what is answered, and frees it.",)
+        if type_.is_pointer and type_.name in self.known.records:
+            return ("What is answered lies in the record, and nothing frees it.",)
+        return ("nothing changes hands.",)
 
     def _arguments(self, function: Function, comment: Comment) -> Iterable[Argument]:
         typed = [dict(self.stubs[0].arguments(function))]
@@ -258,6 +270,18 @@ class Catalogue:
         self, function: Function, prototype: str, header: str, comment: Comment
     ) -> Iterable[str]:
         """Who owns what a call takes and answers."""
+        changes = list(self._changes_of_hands(function, prototype, header, comment))
+        if changes:
+            return changes
+        if re.search(r"(?i)free(memory)?($|_)|^delete_", function.name):
+            return ["takes memory back; what the caller has of it is no longer to be used."]
+        if function.name == "alloc_dvmirror_session_table":
+            return ["the caller's, until free_dvmirror_session_table takes it back."]
+        return self._ownership_of_result(function)
+
+    def _changes_of_hands(
+        self, function: Function, prototype: str, header: str, comment: Comment
+    ) -> Iterable[str]:
         door = self.door(function.name, header, comment)
         for one in function.parameters:
             type_ = self.known.resolve(one.type)

@@ -255,7 +255,9 @@ class Calls(_Functions):
     required_arguments = 1
 
     def run(self) -> List[nodes.Node]:
-        header = self.catalogue.headers[self.arguments[0]]
+        header = self.catalogue.headers.get(self.arguments[0])
+        if header is None or not header.prototypes:
+            raise self.error(f"no header with calls: {self.arguments[0]}")
         # The first paragraph says what the page's own heading does.
         _, _, text = header.text.text.partition("\n\n")
         found = self.words.paragraphs(text)
@@ -321,7 +323,7 @@ class Records(_Functions):
             self.note(attribute, "attribute", attribute)
             cells = (
                 [nodes.literal(text=one.name)],
-                [self.words.code(one.type.spelled())],
+                self._type(one),
                 [nodes.Text(offset)],
                 [nodes.Text(size)],
                 self.words.inline(one.doc),
@@ -330,6 +332,15 @@ class Records(_Functions):
             rows.append((cells, (attribute, *self._accessor_names(record, one))))
         headings = ("Field", "Type", "Offset", "Bytes", "", "Flat functions")
         return table(headings, rows, "fields")
+
+    def _type(self, one: Field) -> List[nodes.Node]:
+        """The type in C, and what it reads as where that is no number."""
+        found: List[nodes.Node] = [self.words.code(one.type.spelled())]
+        reads_as = self.catalogue.reads_as(one)
+        if reads_as not in ("int", one.type.spelled()):
+            remark = nodes.Text("reads as "), self.words.code(reads_as)
+            found.append(nodes.inline("", "", *remark, classes=["flat", "below"]))
+        return found
 
     def _accessor_names(self, record: Record, one: Field) -> Sequence[str]:
         """The anchors of a field's reader and writer."""

@@ -18,16 +18,21 @@ import pages  # noqa: E402
 from catalogue import Catalogue  # noqa: E402
 
 
+def build(source: Path, folder: Path) -> "subprocess.CompletedProcess[str]":
+    """Builds pages as ./dev docs does, into `html` in a folder."""
+    command = [
+        "/usr/bin/python3",
+        *("-m", "sphinx", "-W", "--keep-going", "-n", "-q", "-c", str(ROOT / "docs")),
+        *("-d", str(folder / "doctrees"), str(source), str(folder / "html")),
+    ]
+    return subprocess.run(command, capture_output=True, text=True)
+
+
 @pytest.fixture(scope="session")
 def site(tmp_path_factory: pytest.TempPathFactory) -> Dict[str, pages.Page]:
     """The pages by their paths in the site; a build that warns is an error."""
     folder = tmp_path_factory.mktemp("docs")
-    command = [
-        "/usr/bin/python3",
-        *("-m", "sphinx", "-W", "--keep-going", "-n", "-q"),
-        *("-d", str(folder / "doctrees"), str(ROOT / "docs"), str(folder / "html")),
-    ]
-    done = subprocess.run(command, capture_output=True, text=True)
+    done = build(ROOT / "docs", folder)
     assert done.returncode == 0, done.stdout + done.stderr
     assert done.stderr == ""
     return pages.read(folder / "html")

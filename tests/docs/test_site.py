@@ -2,6 +2,7 @@
 finds."""
 
 import json
+import re
 import subprocess
 from pathlib import Path
 from typing import Any, Dict, List, Tuple
@@ -10,6 +11,7 @@ from urllib.parse import unquote, urlsplit
 import functions
 import pytest
 import records
+from conftest import build
 from pages import Page
 
 HERE = Path(__file__).parent
@@ -47,6 +49,7 @@ def test_every_call(site: Site) -> None:
         place_of(site, "calls", f"libvswitch.{name}")
         text = entry(site, "calls", name)
         assert "Answers" in text, name
+        assert "Ownership" in text, name
         assert "Simulated host" in text, name
         assert ("Statuses" in text) == ("status" in listed[name].result), name
         assert ("Parameter" in text) == bool(listed[name].arguments), name
@@ -83,13 +86,24 @@ def test_every_record(site: Site) -> None:
         for field in record.fields:
             assert f"libvswitch.{record.name}.{field.name}" in page.starts
             row = page.below(f"libvswitch.{record.name}.{field.name}", 2000)
-            words = row.split()
-            assert words[0] == field.name
-            assert str(field.offset) in words[1:8], (record.name, field.name)
+            assert row.split()[0] == field.name
+            place = f"\n{field.offset}\n{told_size(field)}\n"
+            assert place in re.sub(r"\n+", "\n", row), (record.name, field.name)
             accessors = row[: row.index("_get") + 1500].split()
             assert f"{record.name}_{field.name}_get" in accessors
             writer = f"_libvswitch.{record.name}_{field.name}_set"
             assert (writer in page.starts) == field.writable
+
+
+def told_size(field: records.Field) -> str:
+    if field.bit_count is not None:
+        assert field.first_bit is not None
+        last = field.first_bit + field.bit_count - 1
+        return f"bit {last}" if field.bit_count == 1 else f"bits {field.first_bit} to {last}"
+    if field.kind.startswith("flexible"):
+        return "behind"
+    # A whole byte of bits is a field of its own to the table.
+    return "bits 0 to 7" if field.name == "macAddrType" else f"{field.width:,}"
 
 
 def test_every_constant(site: Site) -> None:
@@ -123,6 +137,23 @@ def test_a_broken_link_would_be_found(site: Site) -> None:
     page = Page(next(iter(site.values())).path.with_name("planted.html"), links=["nowhere.html"])
     with pytest.raises(AssertionError, match="nowhere.html"):
         test_links({**site, "planted": page})
+
+
+@pytest.mark.parametrize(
+    "text, warning",
+    [
+        ("See :py:func:`libvswitch.VSDVS_NoSuchCall`.", "reference target not found"),
+        (".. calls:: vswitch/nothing.h", "vswitch/nothing.h"),
+        ("Another title\n=====", "Title underline too short"),
+    ],
+)
+def test_a_warning_would_be_an_error(tmp_path: Path, text: str, warning: str) -> None:
+    source = tmp_path / "source"
+    source.mkdir()
+    (source / "index.rst").write_text(f"Planted\n=======\n\n{text}\n")
+    done = build(source, tmp_path)
+    assert done.returncode != 0
+    assert warning in done.stderr
 
 
 def test_no_page_is_in_two_places(site: Site) -> None:
