@@ -14,6 +14,7 @@
 #include "core/giving_up.h"
 #include "core/host_settings.h"
 #include "core/known.h"
+#include "core/ports.h"
 #include "core/properties.h"
 #include "core/runtime_options.h"
 #include "core/switches.h"
@@ -22,6 +23,7 @@
 #include "dataplane/mac_tables.h"
 #include "dataplane/multicast.h"
 #include "dataplane/teaming.h"
+#include "qexapi/switch_properties.h"
 #include "store/store.h"
 #include "vswitch/properties.h"
 
@@ -111,7 +113,8 @@ bool is_described_by_name(std::string_view key) {
   return std::find(kKeys.begin(), kKeys.end(), key) != kKeys.end();
 }
 
-void describe_properties(Json &described, Transaction &work, PropertyOwner const &owner) {
+void describe_properties(Json &described, Transaction &work, PropertyOwner const &owner,
+                         char const *under = "properties") {
   Json list = Json::object();
   for (auto const &[name, property] : store::properties_of(work, owner)) {
     if (!is_described_by_name(name)) {
@@ -119,7 +122,7 @@ void describe_properties(Json &described, Transaction &work, PropertyOwner const
                     {"hex", hex_text(property.value)}};
     }
   }
-  described["properties"] = std::move(list);
+  described[under] = std::move(list);
 }
 
 Json described_counters(Transaction &work, CounterOwner const &owner) {
@@ -135,6 +138,9 @@ Json described_port(Transaction &work, store::Port const &port,
   auto const owner = PropertyOwner::port(port.switch_key, port.number);
   Place const place{.switch_key = port.switch_key, .port = port.number};
   Json described{{"id", port.identifier}};
+  if (auto const external = store::external_id_of(work, port.number); !external.empty()) {
+    described["external_id"] = external;
+  }
   describe_record<VSTeamPolicy>(described, "teaming", work, owner, VSPROP_PORT_TEAMING_POLICY);
   if (auto const bound = get_property(work, owner, VSPROP_PORT_TEAMING_OVERRIDE)) {
     described["uplink"] = text_of(bound->value);
@@ -160,6 +166,20 @@ Json described_port(Transaction &work, store::Port const &port,
   return described;
 }
 
+Json described_uplink_port(Transaction &work, store::Port const &port) {
+  Json described{{"id", port.identifier}};
+  if (auto const name = alias_of(work, port)) {
+    described["name"] = *name;
+  }
+  if (auto const uplink = store::uplink_at(work, port.number)) {
+    described["uplink"] = *uplink;
+  }
+  describe_properties(described, work, PropertyOwner::port(port.switch_key, port.number));
+  // It is the name.
+  described["properties"].erase(QEX_NEBPROP_PORT_ALIAS);
+  return described;
+}
+
 Json described_session_counters(Transaction &work, store::SwitchKey key) {
   Json sessions = Json::object();
   for (auto const &sid : dataplane::counting_sessions(work, key)) {
@@ -172,13 +192,15 @@ Json described_switch(Transaction &work, store::FoundSwitch const &known) {
   auto const &key = known.key;
   auto const &row = known.row;
   auto const owner = PropertyOwner::global(key);
-  Json described{{"alias", row.alias},
-                 {"id", row.identifier},
-                 {"portset", row.portset},
-                 {"max_ports", row.max_ports},
-                 {"persistent", row.persistent},
-                 {"version", row.version},
-                 {"mtu", mtu_of(work, row.alias)}};
+  Json described{{"alias", row.alias},           {"id", row.identifier},
+                 {"portset", row.portset},       {"max_ports", row.max_ports},
+                 {"persistent", row.persistent}, {"version", row.version},
+                 {"running", row.associated},    {"mtu", mtu_of(work, row.alias)}};
+  Json uplink_ports = Json::array();
+  for (auto const &port : store::uplink_ports_of(work, key)) {
+    uplink_ports.push_back(described_uplink_port(work, port));
+  }
+  described["uplink_ports"] = std::move(uplink_ports);
   Json uplinks = Json::array();
   for (auto const &uplink : store::uplinks_of(work, key)) {
     uplinks.push_back(uplink.name);
@@ -214,6 +236,7 @@ Json described_switch(Transaction &work, store::FoundSwitch const &known) {
   described["counters"] = described_counters(work, {.switch_key = key});
   described["mirror_counters"] = described_session_counters(work, key);
   describe_properties(described, work, owner);
+  describe_properties(described, work, PropertyOwner::host(key), "host_properties");
   return described;
 }
 

@@ -97,6 +97,26 @@ TEST_F(Scenario, WhatTheHostRefusesIsToldLikewise) {
             "faults[0]: the host refuses it: Not supported (QEX_NOT_SUPPORTED)");
 }
 
+TEST_F(Scenario, UplinkPortsHaveOneUplinkEach) {
+  EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u", "uplink": "nic0"}])"), "");
+  EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u", "uplink": "nic0"},
+                                                  {"id": "u", "uplink": "nic0"}])"),
+            "")
+      << "it has it already";
+  EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u", "uplink": "nic9"}])"),
+            "switches[0].uplink_ports[0].uplink: the host refuses it: Not found (QEX_NOT_FOUND)");
+  EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u", "uplink": "nic0"},
+                                                  {"id": "v", "uplink": "nic0"}])"),
+            "switches[0].uplink_ports[1].uplink: the host refuses it: Busy (QEX_BUSY)");
+  EXPECT_EQ(refusal(R"({"uplinks": [{"name": "nic0"}, {"name": "nic1"}],
+                        "switches": [{"alias": "s", "uplink_ports": [
+                          {"id": "u", "uplink": "nic0"}, {"id": "u", "uplink": "nic1"}]}]})"),
+            "switches[0].uplink_ports[1].uplink: the host refuses it: Busy (QEX_BUSY)");
+  EXPECT_EQ(refusal(R"({"switches": [{"alias": "s", "ports": [{"id": "p"}]},
+                                     {"alias": "s", "uplink_ports": [{"id": "p"}]}]})"),
+            "switches[1].uplink_ports[0].id: is a port that is no uplink port");
+}
+
 TEST_F(Scenario, TextsThatAreNoJson) {
   EXPECT_THAT(refusal("{"), testing::StartsWith("no JSON: "));
   EXPECT_THAT(refusal(""), testing::StartsWith("no JSON: "));
@@ -151,9 +171,15 @@ constexpr char const *kEverything = R"({
      "multicast": "mld", "counters": {"txErrors": 18446744073709551615},
      "mirror_counters": {"m": {"failedPkts": 3}},
      "addresses": [{"mac": "02:00:00:00:00:09", "vlan": 7, "age": 3}],
+     "running": false,
      "properties": {"com.example.note": {"type": "policy", "hex": "00ff"}},
+     "host_properties": {"com.example.here": {"type": "config", "hex": "07"}},
+     "uplink_ports": [{"id": "left", "name": "Left", "uplink": "nic0",
+                       "properties": {"com.quorix.common.port.block": {"type": "policy",
+                                                                       "hex": "01"}}},
+                      {"id": "vacant"}],
      "ports": [
-       {"id": "p", "uplink": "uplink2",
+       {"id": "p", "external_id": "theirs", "uplink": "uplink2",
         "teaming": {"balance": "port", "active": ["uplink1"]},
         "mac_learning": {"learning": true, "flooding": true, "limit": 3, "limit_policy": "drop",
                          "mac_change": true},

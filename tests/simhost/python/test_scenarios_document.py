@@ -12,7 +12,10 @@ from simulated_host import Host
 SIMHOST = Path(__file__).parents[3] / "simhost"
 TEXT = (SIMHOST / "SCENARIOS.md").read_text(encoding="utf-8")
 EXAMPLES = re.findall(r"^```json\n(.*?)^```", TEXT, re.MULTILINE | re.DOTALL)
-SOURCES = [SIMHOST / "control" / name for name in ("scenario.cpp", "policy_documents.cpp")]
+SOURCES = [
+    SIMHOST / "control" / name
+    for name in ("scenario.cpp", "scenario_switches.cpp", "policy_documents.cpp")
+]
 
 
 def keys_read() -> Iterator[str]:
@@ -39,6 +42,19 @@ def test_there_is_an_example_for_every_key() -> None:
     read = set(keys_read())
     assert {"alias", "received_by", "limit_policy", "nth"} <= read
     assert read - shown == {"observed"}
+
+
+def test_every_key_is_in_a_table() -> None:
+    rows = "\n".join(re.findall(r"^\|.*", TEXT, re.MULTILINE))
+    sections = set(re.findall(r"^##+ (\w+)", TEXT, re.MULTILINE))
+    in_tables = set(re.findall(r"`(\w+)`", rows))
+    assert set(keys_read()) - in_tables - sections == {"observed"}
+
+
+def test_every_runtime_option_is_in_a_table_with_its_first_value(host: Host) -> None:
+    for option, value in host.described()["runtime_options"].items():
+        (row,) = re.findall(rf"^\|[^|]*`{option}`.*$", TEXT, re.MULTILINE)
+        assert row.split("|")[-2].strip().strip("`") == str(value), option
 
 
 @pytest.mark.parametrize("example", EXAMPLES, ids=[f"example{n}" for n in range(len(EXAMPLES))])

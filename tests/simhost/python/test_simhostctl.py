@@ -1,9 +1,15 @@
 """simhostctl, beside processes that use the same host through the module."""
 
+import os
+import re
+import subprocess
 import time
 from pathlib import Path
+from typing import List
 
-from simulated_host import Host
+import pytest
+
+from simulated_host import SIMHOST, Host
 
 HINT = """
 number, name = vs.VSDVS_DvPortIDToPortID("vswitch0", "web-1")[1], vs.new_qex_Name()
@@ -188,18 +194,47 @@ def test_needs_to_know_which_host(host: Host, tmp_path: Path) -> None:
     assert host.ctl("--state", state, "show").startswith("host\n")
 
 
+COMMANDS = (
+    *("show", "apply", "link", "uplink", "learn", "counter", "clock", "restart", "reset", "fault"),
+    *("calls", "clock show", "clock stop", "clock run", "clock step", "clock set"),
+    *("fault add", "fault list", "fault clear"),
+)
+
+
+def commands_in(text: str) -> List[str]:
+    """The subcommands that a help lists."""
+    listed = text.partition("Subcommands:\n")[2].partition("\n\n")[0]
+    return re.findall(r"^  (\w+) ", listed, re.MULTILINE)
+
+
 def test_explains_itself(host: Host) -> None:
-    text = host.ctl("--help")
-    for command in (
-        "show",
-        "apply",
-        "link",
-        "learn",
-        "counter",
-        "clock",
-        "fault",
-        "restart",
-        "reset",
-    ):
-        assert f"  {command} " in text
-        assert host.ctl(command, "--help")
+    listed = commands_in(host.ctl("--help"))
+    below = [
+        f"{command} {inner}"
+        for command in listed
+        for inner in commands_in(host.ctl(command, "--help"))
+    ]
+    assert sorted(listed + below) == sorted(COMMANDS)
+
+
+@pytest.mark.parametrize("command", COMMANDS)
+def test_explains_every_command_and_every_word_of_it(host: Host, command: str) -> None:
+    lines = host.ctl(*command.split(), "--help").splitlines()
+    assert lines[0] and lines[1].startswith("Usage: simhostctl")
+    # What has no room beside its word stands below it.
+    sections = re.sub(r"\n {20,}", "  ", "\n".join(lines).partition("\n\n")[2])
+    for line in re.findall(r"^  (?:[a-z-]\S*).*$", sections, re.MULTILINE):
+        if "simhostctl " in line:
+            continue
+        word, *explained = re.split(r"\s{2,}", line.strip())
+        assert explained, f"{command} does not say what {word} is"
+
+
+@pytest.mark.parametrize("command", [command for command in COMMANDS if " " not in command])
+def test_the_examples_of_a_help_work(host: Host, command: str) -> None:
+    environment = {**host.environment, "PATH": f"{SIMHOST}:{os.environ['PATH']}"}
+    for example in re.findall(r"^  (.*simhostctl .*)$", host.ctl(command, "--help"), re.MULTILINE):
+        done = subprocess.run(
+            ["bash", "-c", example], env=environment, capture_output=True, text=True
+        )
+        assert (done.returncode, done.stderr) == (0, ""), example

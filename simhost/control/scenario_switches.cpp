@@ -1,0 +1,294 @@
+// From a document to the host: switches, their ports, and what is known of them.
+#include "control/scenario_switches.h"
+
+#include <algorithm>
+#include <cstring>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "control/policy_documents.h"
+#include "control/reading.h"
+#include "core/known.h"
+#include "core/ports.h"
+#include "core/properties.h"
+#include "core/switches.h"
+#include "dataplane/counters.h"
+#include "dataplane/links.h"
+#include "dataplane/mac_tables.h"
+#include "dataplane/multicast.h"
+#include "qexapi/switch_properties.h"
+#include "store/store.h"
+#include "vswitch/properties.h"
+
+namespace simhost::control {
+namespace {
+
+using store::PropertyOwner;
+using store::Transaction;
+
+Bytes bytes_from(Node const &node) {
+  auto const hex = node.find("hex");
+  auto const text = node.find("text");
+  if (hex.has_value() == text.has_value()) {
+    node.fail("must have one of the keys hex, text");
+  }
+  if (text) {
+    return bytes_of_text(text->text());
+  }
+  auto const bytes = bytes_from_hex(hex->text());
+  if (!bytes) {
+    hex->fail("must be hexadecimal digits, two for each byte");
+  }
+  return *bytes;
+}
+
+void apply_properties(Transaction &work, PropertyOwner const &owner, Node const &node,
+                      std::string_view under = "properties") {
+  if_there(node, under, [&](Node const &properties) {
+    for_each_member(properties, [&](std::string const &key, Node const &property) {
+      property.only({"type", "hex", "text"});
+      auto const type = property.at("type").choice(std::span(kPropertyTypes));
+      set_property(work, owner, key, bytes_from(property), type);
+    });
+  });
+}
+
+void set_counters(Transaction &work, CounterOwner const &owner, Node const &counters) {
+  for_each_member(counters, [&](std::string const &name, Node const &value) {
+    dataplane::set_counter(work, owner, name, value.counter());
+  });
+}
+
+void apply_counters(Transaction &work, CounterOwner const &owner, Node const &node) {
+  if_there(node, "counters", [&](Node const &counters) { set_counters(work, owner, counters); });
+}
+
+VSMACEntry address_entry_from(Node const &node) {
+  node.only({"mac", "vlan", "vni", "type", "ages", "age"});
+  VSMACEntry entry{};
+  auto const mac = mac_from(node.at("mac").text());
+  if (!mac) {
+    node.at("mac").fail("must be six bytes such as 02:00:00:00:00:01");
+  }
+  std::memcpy(entry.macAddress, mac->data(), mac->size());
+  auto const type = node.get("type", VS_MAC_ADDR_TYPE_LEARNED, [](Node const &given) {
+    return given.choice(std::span(kAddressTypes));
+  });
+  entry.macAddrType = type;
+  entry.vid =
+      node.get("vlan", qex_VlanID{0}, [](Node const &given) { return given.integer(0, 4094); });
+  entry.vni =
+      node.get("vni", qex_uint32{0}, [](Node const &given) { return given.integer(0, 0xFFFFFF); });
+  entry.aging =
+      node.get("ages", static_cast<qex_Bool>(type == VS_MAC_ADDR_TYPE_LEARNED), &Node::flag_of);
+  entry.elapsed = node.get("age", qex_uint32{0}, number_of_32_bits);
+  return entry;
+}
+
+void apply_addresses(Transaction &work, Place const &place, Node const &node) {
+  for_each_in(node, "addresses", [&](Node const &item) {
+    dataplane::describe_address(work, place, address_entry_from(item));
+  });
+}
+
+McastGroup group_from(Node const &node) {
+  node.only({"address", "version", "sources", "source_mode", "vni", "observed"});
+  auto const address = [](Node const &given) {
+    auto const bytes = address_from(given.text());
+    if (!bytes) {
+      given.fail("must be an address of Ethernet, IPv4 or IPv6");
+    }
+    return *bytes;
+  };
+  McastGroup group{.address = address(node.at("address")),
+                   .version = node.get("version", 0U, number_of_32_bits),
+                   .source_mode = node.get(
+                       "source_mode", 0U,
+                       [](Node const &given) { return given.choice(std::span(kSourceModes)); }),
+                   .vni = node.get("vni", 0U, number_of_32_bits),
+                   .updated = {},
+                   .sources = {}};
+  if (auto const sources = node.find("sources")) {
+    for (auto const &source : sources->items()) {
+      group.sources.push_back(address(source));
+    }
+  }
+  return group;
+}
+
+void apply_mirror_sessions(Transaction &work, store::Port const &port, Node const &node) {
+  set_property(work, PropertyOwner::port(port.switch_key, port.number), VSPROP_PORT_MIRROR_SESSIONS,
+               mirror_sessions_from(node));
+}
+
+void apply_port(Transaction &work, store::SwitchKey key, Node const &node) {
+  node.only({"id", "external_id", "teaming", "uplink", "mac_learning", "addresses", "groups",
+             "mirror_sessions", "counters", "properties", "observed"});
+  auto const identifier = node.at("id").text();
+  auto const found = store::find_port(work, key, identifier);
+  auto const port = found ? *found : add_client_port(work, key, identifier);
+  auto const owner = PropertyOwner::port(key, port.number);
+  if_there(node, "external_id",
+           [&](Node const &external) { set_external_id(work, port, external.text()); });
+  apply_properties(work, owner, node);
+  if_there(node, "teaming", [&](Node const &teaming) {
+    set_property(work, owner, VSPROP_PORT_TEAMING_POLICY, bytes_of(teaming_from(teaming)));
+  });
+  if_there(node, "uplink", [&](Node const &uplink) {
+    set_property(work, owner, VSPROP_PORT_TEAMING_OVERRIDE, bytes_of_text(uplink.text()));
+  });
+  if_there(node, "mac_learning", [&](Node const &learning) {
+    set_property(work, owner, VSPROP_PORT_MAC_MANAGEMENT, bytes_of(port_learning_from(learning)));
+  });
+  if_there(node, "mirror_sessions",
+           [&](Node const &sessions) { apply_mirror_sessions(work, port, sessions); });
+  apply_addresses(work, {.switch_key = key, .port = port.number}, node);
+  for_each_in(node, "groups",
+              [&](Node const &item) { dataplane::join(work, port.number, group_from(item)); });
+  apply_counters(work, {.switch_key = key, .port = port.number}, node);
+}
+
+// The keys with which a switch is made, and which cannot change later.
+store::SwitchKey made_switch(Transaction &work, std::string const &alias, Node const &node) {
+  auto const identifier = node.get("id", std::string(), text_of_node);
+  auto const portset = node.get("portset", std::string(), text_of_node);
+  SwitchSpec const spec{
+      .alias = alias,
+      .identifier = identifier,
+      .portset = portset,
+      .max_ports =
+          node.get("max_ports", 0U, [](Node const &given) { return given.integer(1, 65535); }),
+      .persistent = node.get("persistent", true, &Node::flag_of),
+      .version = node.get("version", 0U, number_of_32_bits)};
+  create_switch(work, spec);
+  return known_switch(work, alias).key;
+}
+
+store::SwitchKey changed_switch(store::FoundSwitch const &known, Node const &node) {
+  auto const keep = [&](std::string_view key, auto const &value, auto const &read) {
+    if (auto const given = node.find(key); given && read(*given) != value) {
+      given->fail("cannot change while the switch exists");
+    }
+  };
+  keep("id", known.row.identifier, text_of_node);
+  keep("portset", known.row.portset, text_of_node);
+  keep("max_ports", known.row.max_ports, number_of_32_bits);
+  keep("persistent", known.row.persistent, &Node::flag_of);
+  keep("version", known.row.version, number_of_32_bits);
+  return known.key;
+}
+
+// The port is to have the uplink, and no other one.
+void attach_to(Transaction &work, store::Port const &port, std::string const &uplink) {
+  auto const known = known_uplink(work, uplink);
+  auto const present = store::uplink_at(work, port.number);
+  if (present == uplink) {
+    return;
+  }
+  if (known.port || present) {
+    throw Refused(QEX_BUSY);
+  }
+  store::attach_uplink(work, uplink, port.number);
+}
+
+void apply_uplink_port(Transaction &work, store::SwitchKey key, Node const &node) {
+  node.only({"id", "name", "uplink", "properties"});
+  auto const identifier = node.at("id").text();
+  auto const found = store::find_port(work, key, identifier);
+  auto const port = found ? *found : add_vacant_uplink_port(work, key, identifier);
+  if (port.kind != store::PortKind::uplink) {
+    node.at("id").fail("is a port that is no uplink port");
+  }
+  auto const owner = PropertyOwner::port(key, port.number);
+  apply_properties(work, owner, node);
+  if_there(node, "name", [&](Node const &name) {
+    set_property(work, owner, QEX_NEBPROP_PORT_ALIAS, bytes_of_text(name.text()));
+  });
+  if_there(node, "uplink", [&](Node const &uplink) { attach_to(work, port, uplink.text()); });
+}
+
+void attach_uplinks(Transaction &work, store::SwitchKey key, Node const &node) {
+  for_each_in(node, "uplinks", [&](Node const &item) {
+    auto const name = item.text();
+    auto const attached = store::uplinks_of(work, key);
+    bool const here = std::any_of(attached.begin(), attached.end(),
+                                  [&](auto const &uplink) { return uplink.name == name; });
+    if (!here) {
+      add_uplink_port(work, key, name);
+    }
+  });
+}
+
+void apply_lag(Transaction &work, store::SwitchKey key, Node const &node) {
+  node.only({"name", "uplinks", "observed"});
+  std::vector<std::string> uplinks;
+  for (auto const &uplink : node.at("uplinks").items()) {
+    uplinks.push_back(uplink.text());
+  }
+  dataplane::put_lag(work, key, node.at("name").text(), uplinks);
+}
+
+void apply_session_counters(Transaction &work, store::SwitchKey key, Node const &node) {
+  if_there(node, "mirror_counters", [&](Node const &sessions) {
+    for_each_member(sessions, [&](std::string const &sid, Node const &counters) {
+      set_counters(work, {.switch_key = key, .session = sid}, counters);
+    });
+  });
+}
+
+}  // namespace
+
+void apply_switch(Transaction &work, Node const &node) {
+  node.only({"alias",
+             "id",
+             "portset",
+             "max_ports",
+             "persistent",
+             "version",
+             "running",
+             "mtu",
+             "uplink_ports",
+             "uplinks",
+             "lags",
+             "teaming",
+             "mac_learning",
+             "multicast",
+             "addresses",
+             "counters",
+             "mirror_counters",
+             "properties",
+             "host_properties",
+             "ports",
+             "observed"});
+  auto const alias = node.at("alias").text();
+  auto const known = store::find_switch(work, store::SwitchName::alias, alias);
+  auto const key = known ? changed_switch(*known, node) : made_switch(work, alias, node);
+  auto const owner = PropertyOwner::global(key);
+  apply_properties(work, owner, node);
+  if_there(node, "mtu", [&](Node const &mtu) {
+    set_mtu(work, alias, static_cast<std::uint32_t>(mtu.integer(1280, 9190)));
+  });
+  apply_properties(work, PropertyOwner::host(key), node, "host_properties");
+  for_each_in(node, "uplink_ports", [&](Node const &item) { apply_uplink_port(work, key, item); });
+  attach_uplinks(work, key, node);
+  for_each_in(node, "lags", [&](Node const &item) { apply_lag(work, key, item); });
+  if_there(node, "teaming", [&](Node const &teaming) {
+    set_property(work, owner, VSPROP_SWITCH_TEAMING, bytes_of(teaming_from(teaming)));
+  });
+  if_there(node, "mac_learning", [&](Node const &learning) {
+    set_property(work, owner, VSPROP_SWITCH_MAC_LEARNING, bytes_of(switch_learning_from(learning)));
+  });
+  if_there(node, "multicast", [&](Node const &mode) {
+    set_property(work, owner, VSPROP_MULTICAST_FILTER,
+                 bytes_of(mode.choice(std::span(kFilterModes))));
+  });
+  for_each_in(node, "ports", [&](Node const &item) { apply_port(work, key, item); });
+  apply_addresses(work, {.switch_key = key, .port = std::nullopt}, node);
+  apply_counters(work, {.switch_key = key}, node);
+  apply_session_counters(work, key, node);
+  if_there(node, "running",
+           [&](Node const &running) { change_running(work, key, running.flag()); });
+}
+
+}  // namespace simhost::control
