@@ -19,6 +19,8 @@ PAGES = {
     "simhost/README.md": "/more/simulated_host.md",
     "simhost/SCENARIOS.md": "/more/scenarios.md",
     "bench/README.md": "/more/bench.md",
+    "packaging/README.md": "/more/packages.md",
+    "tests/README.md": "/more/tests.md",
 }
 _LINK = re.compile(r"\[([^\]]+)\]\((?!https?:|#)([^)#]+)\)")
 
