@@ -10,11 +10,11 @@ import pytest
 
 ROOT = Path(__file__).resolve().parents[2]
 BUILD = Path(os.environ["BUILD_DIR"])
-sys.path[:0] = [str(ROOT / "docs/_ext"), str(ROOT / "tests/surface")]
+sys.path[:0] = [str(ROOT / "docs"), str(ROOT / "docs/_ext"), str(ROOT / "tests/surface")]
 # At the end, for the package of the classes that lies there is not built.
 sys.path.append(str(ROOT / "python"))
 
-import pages  # noqa: E402
+import check_links  # noqa: E402
 from catalogue import Catalogue  # noqa: E402
 
 
@@ -29,13 +29,13 @@ def build(source: Path, folder: Path) -> "subprocess.CompletedProcess[str]":
 
 
 @pytest.fixture(scope="session")
-def site(tmp_path_factory: pytest.TempPathFactory) -> Dict[str, pages.Page]:
+def site(tmp_path_factory: pytest.TempPathFactory) -> Dict[str, check_links.Page]:
     """The pages by their paths in the site; a build that warns is an error."""
     folder = tmp_path_factory.mktemp("docs")
     done = build(ROOT / "docs", folder)
     assert done.returncode == 0, done.stdout + done.stderr
     assert done.stderr == ""
-    return pages.read(folder / "html")
+    return check_links.read(folder / "html")
 
 
 @pytest.fixture(scope="session")

@@ -1,9 +1,14 @@
-"""Pages of the site as tests look at them: anchors, links, and the text below an anchor."""
+"""Follows the links of a built site that stay in it: check_links.py FOLDER
 
+Prints those that lead nowhere, be it to no file or to no place in one; then the status is 1.
+"""
+
+import sys
 from dataclasses import dataclass, field
 from html.parser import HTMLParser
 from pathlib import Path
 from typing import Dict, List, Optional, Tuple
+from urllib.parse import unquote, urlsplit
 
 
 @dataclass
@@ -56,3 +61,30 @@ def read(folder: Path) -> Dict[str, Page]:
         found[str(path.relative_to(folder))] = page
     assert found
     return found
+
+
+def broken(site: Dict[str, Page]) -> List[str]:
+    known = {page.path.resolve(): set(page.anchors) for page in site.values()}
+    found = []
+    for page in site.values():
+        for link in page.links:
+            parts = urlsplit(link)
+            if parts.scheme or parts.netloc:
+                continue
+            path = (page.path.parent / unquote(parts.path)).resolve()
+            target = path if parts.path else page.path.resolve()
+            anchor = unquote(parts.fragment)
+            if not target.exists() or (anchor and anchor not in known.get(target, {anchor})):
+                found.append(f"{page.path.name}: {link}")
+    return found
+
+
+def main() -> int:
+    found = broken(read(Path(sys.argv[1])))
+    for line in found:
+        print(f"a link that leads nowhere: {line}", file=sys.stderr)
+    return 1 if found else 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())
