@@ -1,7 +1,7 @@
 // Starts the interpreter once for all tests of this program.
 //
-// With "lose-a-block" it loses one first, which LeakSanitizer must find here too, beside all that the
-// interpreter keeps.
+// With "lose-a-block" it loses one first, which LeakSanitizer must find here too, beside all that
+// the interpreter keeps.
 
 #include <Python.h>
 #include <gtest/gtest.h>
