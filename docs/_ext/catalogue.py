@@ -9,14 +9,15 @@ from typing import Dict, Iterable, List, Optional, Tuple
 import comments
 import definitions
 import layout
+import ownership
 from comments import Comment, Family, Header
 from definitions import Field, Function, Parameter, Record, Type
 from make_stubs import Stubs, method_arguments, overloads
 from pictures import Shape
+from types_in_words import in_words
 
 CLASSES, FLAT = "libvswitch", "_libvswitch"
 TYPES = "C"  # where the names of C types have their places
-_VIEW = "a view of what stays the library's; nothing frees it"
 
 # Methods and helpers with no text of their own anywhere else.
 _ARRAYS = {
@@ -80,7 +81,6 @@ class Catalogue:
             name for family in self.headers["qexapi/status.h"].families for name in family.names
         }
         self.stubs = (Stubs(self.known, "_flat."), Stubs(self.known))
-        self._pointers: Dict[str, str] = {}
         self.calls: Dict[str, Call] = {}
         self.methods: Dict[str, List[Call]] = {}
         for name, forms in overloads(self.known).items():
@@ -103,9 +103,13 @@ class Catalogue:
     def header_of(self, record: Record) -> str:
         return "/".join(Path(record.header).parts[-2:])
 
+    def door(self, call: Call) -> Optional[str]:
+        """The call that takes back what this one hands out."""
+        return ownership.door(call.name, self.headers.get(call.header), call.comment)
+
     def reads_as(self, one: Field) -> str:
         """What an attribute of a class reads as."""
-        return self._plain(self.stubs[0].member(one))
+        return self._in_words(self.stubs[0].member(one))
 
     def shapes(self, record: Record) -> List[Shape]:
         return [self._shape(record, one) for one in record.fields]
@@ -156,7 +160,9 @@ class Catalogue:
             tuple(self._names(one) for one in forms),
             self._results(forms[0]),
             _shape_of_result(forms[0]),
-            tuple(self._ownership(longest, prototype, header, comment)),
+            tuple(
+                ownership.of_call(self.known, longest, prototype, self.headers.get(header), comment)
+            ),
             header,
         )
 
@@ -189,29 +195,23 @@ class Catalogue:
             Argument(
                 parameter.name,
                 parameter.type.spelled(),
-                (self._plain(typed[0][parameter.name]), self._plain(typed[1][parameter.name])),
+                (
+                    self._in_words(typed[0][parameter.name]),
+                    self._in_words(typed[1][parameter.name]),
+                ),
                 comment.parameters.get(parameter.name, ""),
             )
             for parameter in one.inputs
         )
         names = tuple(parameter.name for parameter in one.inputs)
-        results, owned = self._results(one), self._ownership_of_result(one)
+        results, owned = self._results(one), (ownership.of_result(self.known, one),)
         return Call(name, record.name, "", comment, arguments, (names,), results, (), owned, "")
-
-    def _ownership_of_result(self, method: Function) -> Tuple[str, ...]:
-        """Whose is what a method, or a function like one, answers."""
-        type_ = self.known.resolve(method.result)
-        if method.owns_elements or (not type_.layers and type_.name in self.known.records):
-            return ("Python owns what is answered, and frees it.",)
-        if type_.is_pointer and type_.name in self.known.records:
-            return ("What is answered lies in the record, and nothing frees it.",)
-        return ("nothing changes hands.",)
 
     def _arguments(self, function: Function, comment: Comment) -> Iterable[Argument]:
         typed = [dict(self.stubs[0].arguments(function))]
         typed.append({one.name: self.stubs[1].argument(one) for one in function.inputs})
         for one in function.inputs:
-            forms = self._plain(typed[0][one.name]), self._plain(typed[1][one.name])
+            forms = self._in_words(typed[0][one.name]), self._in_words(typed[1][one.name])
             meaning = comment.parameters.get(one.name, "")
             if self._is_cell(one):
                 forms = f'Cell("{one.type.target.spelled()}").pointer', forms[1]
@@ -226,91 +226,15 @@ class Catalogue:
         return type_.layers == ("p",) and is_number and not one.is_bytes
 
     def _results(self, function: Function) -> Tuple[str, str]:
-        plain = self._plain(self.stubs[0].result(function))
-        if re.fullmatch(r"unsigned int \* pointer", plain):
+        plain = self._in_words(self.stubs[0].result(function))
+        if plain == "unsigned int * pointer":
             plain = "int"  # the classes read it
         if function.outputs:
             plain = f"({plain[1:-1]})"  # a tuple; the flat answer is a list
-        return plain, self._plain(self.stubs[1].result(function))
+        return plain, self._in_words(self.stubs[1].result(function))
 
-    def _plain(self, hint: str) -> str:
-        """A type of the stubs in words: `str or None`, `VSInfo`, `unsigned int * pointer`."""
-        hint = re.sub(r",(?=\S)", ", ", hint.replace("_flat.", ""))
-        hint = hint.replace("Union[str, _CharPointer]", "str").replace("str, _CharPointer", "str")
-        hint = re.sub(r"Callable\[\[Any, Any\], Any\]", "function", hint)
-        hint = re.sub(r"_Pointer\b(?!\w)", "any pointer", hint)
-        hint = re.sub(r"\b_(\w+)", lambda match: self._pointer(match[1]), hint)
-        before = ""
-        while before != hint:
-            before = hint
-            hint = re.sub(r"Union\[([^\[\]]*), Any\]", r"\1", hint)
-            hint = re.sub(r"Optional\[([^\[\]]*)\]", r"\1 or None", hint)
-            hint = re.sub(
-                r"Union\[([^\[\]]*)\]", lambda match: match[1].replace(", ", " or "), hint
-            )
-            hint = re.sub(r"Tuple\[([^\[\]]*)\]", r"list(\1)", hint)
-            hint = hint.replace("Array[", "Array(") if "Array[" in hint else hint
-            hint = re.sub(r"Array\((\w+)\]", r"array of \1", hint)
-        return re.sub(r"list\((.*)\)$", r"[\1]", hint)
-
-    def _pointer(self, name: str) -> str:
-        """The C type behind the name of a class of pointers."""
-        if name in self.known.records:
-            return f"{name} * pointer"
-        if "Function" in name:
-            return "function pointer"
-        target, stars = name, 0
-        while target.endswith("Pointer"):
-            target, stars = target[: -len("Pointer")], stars + 1
-        words = re.sub(r"(?<=[a-z])(?=[A-Z])", " ", re.sub(r"Array\d+$", "", target))
-        spelled = target if target in self.known.records else words.lower()
-        return f"{spelled} {'*' * max(stars, 1)} pointer"
-
-    def _ownership(
-        self, function: Function, prototype: str, header: str, comment: Comment
-    ) -> Iterable[str]:
-        """Who owns what a call takes and answers."""
-        changes = list(self._changes_of_hands(function, prototype, header, comment))
-        if changes:
-            return changes
-        if re.search(r"(?i)free(memory)?($|_)|^delete_", function.name):
-            return ["takes memory back; what the caller has of it is no longer to be used."]
-        if function.name == "alloc_dvmirror_session_table":
-            return ["the caller's, until free_dvmirror_session_table takes it back."]
-        return self._ownership_of_result(function)
-
-    def _changes_of_hands(
-        self, function: Function, prototype: str, header: str, comment: Comment
-    ) -> Iterable[str]:
-        door = self.door(function.name, header, comment)
-        for one in function.parameters:
-            type_ = self.known.resolve(one.type)
-            if type_.layers == ("p", "p") and function.name != "DVSData_Data":
-                said = f"the library's memory, to be given back once with {door}"
-                yield f"`{one.name}`: {said if door else _VIEW}."
-            elif type_.layers == ("p", "p"):
-                yield f"`{one.name}`: {_VIEW}."
-            elif type_.layers == ("p",) and type_.name in self.known.records:
-                is_read = re.search(rf"\bconst \*{one.name}\b", prototype) or re.search(
-                    r"_(Set|Append|Clear)", function.name
-                )
-                said = "the caller's, only read" if is_read else "the caller's; the call fills it"
-                if header and not function.name.endswith(("Free", "FreeMemory")):
-                    yield f"`{one.name}`: {said}."
-
-    def door(self, name: str, header: str, comment: Comment) -> Optional[str]:
-        """The call that takes back what this one hands out, as its comment or its file's says."""
-        if name.endswith("PropList"):
-            return "DVSData_Free"
-        spoken = r"(?:goes back through|gives to|to be given back with) (\w+)"
-        texts = [comment.text, *comment.parameters.values()]
-        if header:
-            texts.append(self.headers[header].text.text)
-        for text in texts:
-            found = re.search(spoken, re.sub(r"\s+", " ", text))
-            if found:
-                return found[1]
-        return None
+    def _in_words(self, hint: str) -> str:
+        return in_words(hint, self.known.records)
 
 
 def _said(name: str) -> str:

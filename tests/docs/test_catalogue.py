@@ -4,6 +4,7 @@ from typing import Dict
 
 import comments
 import pytest
+import types_in_words
 from catalogue import Catalogue
 
 
@@ -18,7 +19,7 @@ def test_doors(catalogue: Catalogue) -> None:
     assert len(set(handing_out)) > 30
     for name in handing_out:
         call = catalogue.calls[name]
-        door = catalogue.door(name, call.header, call.comment)
+        door = catalogue.door(call)
         views = [one for one in call.ownership if "nothing frees it" in one]
         if views:
             assert _ownership.door_of(name) is None, name
@@ -51,6 +52,30 @@ def test_doors(catalogue: Catalogue) -> None:
 )
 def test_statuses_in_words(text: str, statuses: Dict[str, str]) -> None:
     assert comments.statuses_in(text) == statuses
+
+
+@pytest.mark.parametrize(
+    "hint, words",
+    [
+        ("int", "int"),
+        ("None", "None"),
+        ("Union[str, _flat._CharPointer, None]", "str or None"),
+        ("Optional[Union[str, _CharPointer]]", "str or None"),
+        ("Union[VSUplinks, Any]", "VSUplinks"),
+        ("Tuple[int, Union[_VSUplinks, Any]]", "[int, VSUplinks * pointer]"),
+        ("Optional[_flat._UnsignedIntPointer]", "unsigned int * pointer or None"),
+        ("Optional[_VSLAGTablePointerPointer]", "VSLAGTable ** pointer or None"),
+        ("_VoidPointerPointer", "void ** pointer"),
+        ("Array[VSMACEntry]", "array of VSMACEntry"),
+        (
+            "Union[Callable[[Any, Any], Any], _flat._CharFunction2Pointer]",
+            "function or function pointer",
+        ),
+        ("Optional[_flat._Pointer]", "any pointer or None"),
+    ],
+)
+def test_types_in_words(hint: str, words: str) -> None:
+    assert types_in_words.in_words(hint, {"VSUplinks", "VSLAGTable", "VSMACEntry"}) == words
 
 
 def test_a_comment_with_an_unknown_command() -> None:
