@@ -5,6 +5,7 @@ says how long it is. Bytes that hold bit fields, or different fields at a time, 
 below, larger: there the highest bit of a byte stands on the left, as in the documents of protocols.
 """
 
+import re
 from dataclasses import dataclass, field
 from html import escape
 from typing import Iterator, List, Sequence, Tuple
@@ -298,8 +299,11 @@ def _box(kind: str, x: float, y: float, width: float, height: float, told: str =
 
 
 def _label(x: float, y: float, width: float, height: float, name: str, said: str) -> str:
-    """A name, and below it what there is to say if there is room."""
+    """A name, and below it what there is to say if there is room; or a long name in two lines."""
     middle = x + width / 2
+    parts = re.fullmatch(r"([a-z]+)([A-Z][a-z]+)", name)
+    if parts and _fitting(name, width, 13) < 7:
+        name, said = parts[1], parts[2]
     size = _fitting(name, width, 13)
     said_size = _fitting(said, width, 11)
     has_room = said_size >= 7 and height >= 30

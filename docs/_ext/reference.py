@@ -166,7 +166,9 @@ class _Functions(_Described):
         rows = []
         for one in call.arguments:
             plain, flat = one.types
-            types: List[nodes.Node] = [self.words.code(plain)]
+            types: List[nodes.Element] = [self.words.code(plain)]
+            if plain.startswith("Cell"):
+                types[0]["classes"].append("whole")
             if flat != plain:
                 said = nodes.Text("flat: "), self.words.code(flat)
                 types.append(nodes.inline("", "", *said, classes=["flat", "below"]))
@@ -227,21 +229,18 @@ class _Functions(_Described):
 
     def _answered(self, call: Call) -> Dict[str, str]:
         """Statuses and when they are answered, as the comments of the call and its file say."""
-        known = self.catalogue.statuses
-        found = {"QEX_OK": "done"}
-        makes = any("of the new switch" in text for text in call.comment.parameters.values())
+        found = {"QEX_OK": ["done"]}
         texts = [("", call.comment.text)]
         texts += [(f"`{name}`: ", text) for name, text in call.comment.parameters.items()]
-        if "const *" in call.prototype or "void *" in call.prototype:
-            texts.append(("", self.catalogue.headers[call.header].text.text))
         for prefix, text in texts:
             for status, said in statuses_in(text).items():
-                if makes and status == "QEX_NOT_FOUND":
-                    continue  # it names nothing that is there
-                if status in known and status != "QEX_OK":
-                    meanings = [found.get(status, ""), f"{prefix}{said}"]
-                    found[status] = "; ".join(filter(None, meanings))
-        return found
+                found.setdefault(status, []).append(f"{prefix}{said}")
+        for status, said in statuses_in(self.catalogue.headers[call.header].text.text).items():
+            if _concerns(status, call):
+                found.setdefault(status, []).append(said)
+        known = self.catalogue.statuses
+        told = {status: "; ".join(said) for status, said in found.items() if status in known}
+        return {**told, "QEX_OK": found["QEX_OK"][0]}
 
     def _simulated(self, call: Call) -> Iterable[nodes.Node]:
         answer = self.catalogue.simulated.get(call.name)
@@ -249,6 +248,14 @@ class _Functions(_Described):
             yield nodes.Text("not built beside this site, which is of another host.")
         else:
             yield from self.words.inline(f"{answer}.")
+
+
+def _concerns(status: str, call: Call) -> bool:
+    """Whether a call can come to what the comment of its header says of all calls."""
+    if status == "QEX_NOT_FOUND":
+        makes = any("of the new switch" in text for text in call.comment.parameters.values())
+        return "char const *" in call.prototype and not makes
+    return "*" in call.prototype
 
 
 class Calls(_Functions):
