@@ -1,5 +1,5 @@
 /**
- * The common cases of conversions, inline in every wrapper: small integers, short ASCII texts.
+ * The common cases of conversions: small integers, short ASCII texts.
  *
  * Each reads what it can straight from the object and hands everything else to the function of
  * conversions.h that it stands before, so the two never disagree. What depends on how an
@@ -43,23 +43,27 @@ static inline bool is_small_integer(PyObject *object, int *value) {
 /**
  * The readings of conversions.h for an argument, the small integers first: whether it was read, and
  * if not, there is an error that names the method, the argument and its type.
+ *
+ * A call costs next to nothing here, and code in each of a thousand wrappers would be much to
+ * compile. The two are apart so that the first needs no frame.
  */
+#define OUT_OF_LINE __attribute__((noinline, unused)) static
 // NOLINTBEGIN(bugprone-macro-parentheses): types cannot have them
-#define DEFINE_READING(NAME, TYPE, FITS)                                                          \
-  __attribute__((noinline, unused)) static bool read_other_##NAME(                                \
-      PyObject *object, TYPE *value, char const *method, int position, char const *type) {        \
-    int const kind = NAME##_from_object(object, value);                                           \
-    if (kind != kConverted) report_argument(kind, method, position, type);                        \
-    return kind == kConverted;                                                                    \
-  }                                                                                               \
-  static inline bool read_##NAME(PyObject *object, TYPE *value, char const *method, int position, \
-                                 char const *type) {                                              \
-    int small = 0;                                                                                \
-    if (is_small_integer(object, &small) && (FITS)) {                                             \
-      *value = (TYPE)small;                                                                       \
-      return true;                                                                                \
-    }                                                                                             \
-    return read_other_##NAME(object, value, method, position, type);                              \
+#define DEFINE_READING(NAME, TYPE, FITS)                                                        \
+  OUT_OF_LINE bool read_other_##NAME(PyObject *object, TYPE *value, char const *method,         \
+                                     int position, char const *type) {                          \
+    int const kind = NAME##_from_object(object, value);                                         \
+    if (kind != kConverted) report_argument(kind, method, position, type);                      \
+    return kind == kConverted;                                                                  \
+  }                                                                                             \
+  OUT_OF_LINE bool read_##NAME(PyObject *object, TYPE *value, char const *method, int position, \
+                               char const *type) {                                              \
+    int small = 0;                                                                              \
+    if (!is_small_integer(object, &small) || !(FITS)) {                                         \
+      return read_other_##NAME(object, value, method, position, type);                          \
+    }                                                                                           \
+    *value = (TYPE)small;                                                                       \
+    return true;                                                                                \
   }
 
 DEFINE_READING(int, int, true)

@@ -35,8 +35,8 @@ SWIGINTERN bool read_array_text(PyObject *object, size_t capacity, ArrayText *te
 // An argument that is a text: a copy of its UTF-8 bytes, of an ASCII text that is not long in the
 // wrapper's frame, of any other on the heap.
 %wrapper %{
-SWIGINTERN char *read_text(PyObject *object, char frame[kFrameText], char **heap, char const *method,
-                           int position, char const *type) {
+OUT_OF_LINE char *read_other_text(PyObject *object, char frame[kFrameText], char **heap,
+                                  char const *method, int position, char const *type) {
   char const *ascii = NULL;
   char *text = NULL;
   size_t length = 0;
@@ -55,13 +55,16 @@ SWIGINTERN char *read_text(PyObject *object, char frame[kFrameText], char **heap
   report_argument(kind, method, position, type);
   return NO_POINTER;
 }
+
+OUT_OF_LINE char *read_text(PyObject *object, char frame[kFrameText], char **heap,
+                            char const *method, int position, char const *type) {
+  char *text = copy_short_text(object, frame);
+  return text ? text : read_other_text(object, frame, heap, method, position, type);
+}
 %}
 %typemap(in, noblock=1) char * (char frame[kFrameText], char *heap = NULL) {
-  $1 = copy_short_text($input, frame);
-  if (!$1) {
-    $1 = read_text($input, frame, &heap, "$symname", $argnum, "$type");
-    if ((void *)$1 == NO_POINTER) SWIG_fail;
-  }
+  $1 = read_text($input, frame, &heap, "$symname", $argnum, "$type");
+  if ((void *)$1 == NO_POINTER) SWIG_fail;
 }
 %typemap(freearg, noblock=1, match="in") char * {
   if (heap$argnum) free(heap$argnum);
