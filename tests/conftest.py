@@ -1,6 +1,7 @@
 """Puts beside the module, for every suite, what the build made for tests, and the tables."""
 
 import os
+import signal
 import sys
 from pathlib import Path
 
@@ -17,3 +18,6 @@ sys.path.extend(_BESIDE)
 # Child processes need them too.
 _PATH = [*filter(None, [os.environ.get("PYTHONPATH")]), *_BESIDE]
 os.environ["PYTHONPATH"] = os.pathsep.join(_PATH)
+
+# What a script starts in the background ignores interrupts, and so would the programs under test.
+signal.signal(signal.SIGINT, signal.default_int_handler)

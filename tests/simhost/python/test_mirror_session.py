@@ -50,7 +50,7 @@ def test_from_start_to_end(
     for counter, value in [("mirroredPkts", 1000), ("discardedPkts", 20), ("failedPkts", 3)]:
         shared_host.set_counter("vswitch0", counter, value, session="mirror_session")
     mirror.send_signal(end)
-    assert mirror.communicate() == (
+    assert mirror.communicate(timeout=60) == (
         "1000 packets mirrored, 20 discarded, 3 failed\nmirror_session is removed\n",
         "",
     )

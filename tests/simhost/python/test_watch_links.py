@@ -54,7 +54,7 @@ def test_says_each_change_and_nothing_else(
     assert change(watcher) == "nic0 gone\n"
 
     watcher.send_signal(signal.SIGINT)
-    assert watcher.communicate() == ("", "")
+    assert watcher.communicate(timeout=60) == ("", "")
     assert watcher.returncode == 0
 
 
