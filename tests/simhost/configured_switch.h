@@ -28,6 +28,15 @@ Bytes bytes_of(Record const &record) {
   return bytes;
 }
 
+/// The record that the bytes are.
+template <typename Record>
+Record as(Bytes const &bytes) {
+  Record record{};
+  EXPECT_EQ(bytes.size(), sizeof record);
+  std::memcpy(&record, bytes.data(), sizeof record);
+  return record;
+}
+
 inline Bytes bytes_of_text(std::string_view text) {
   Bytes bytes(text.begin(), text.end());
   bytes.push_back(0);

@@ -1,7 +1,6 @@
 // What runs at a port, through the raw door: the data plane's values and nothing that was stored.
 #include <gmock/gmock.h>
 
-#include <cstring>
 #include <string>
 
 #include "configured_switch.h"
@@ -19,13 +18,6 @@ namespace {
 struct RunningPorts : ConfiguredSwitch {
   ~RunningPorts() override { EXPECT_EQ(simhost_reset(), QEX_OK); }
 
-  template <typename Record>
-  static Record as(Bytes const &bytes) {
-    Record record{};
-    EXPECT_EQ(bytes.size(), sizeof record);
-    std::memcpy(&record, bytes.data(), sizeof record);
-    return record;
-  }
   static qex_uint32 link(char const *name) {
     return as<qex_uint32>(port(QEX_NEBPROP_PORT_LINK_STATUS, name).value());
   }
