@@ -13,6 +13,7 @@ import sys
 import sysconfig
 from pathlib import Path
 
+import setuptools
 from setuptools import Extension, setup
 from setuptools.command.build_ext import build_ext
 
@@ -41,10 +42,18 @@ def version() -> str:
     return found.group(1)
 
 
+def require_setuptools(major: int) -> None:
+    """Older ones pass over pyproject.toml, and pack a wheel without a name."""
+    if int(setuptools.__version__.split(".")[0]) < major:
+        raise SystemExit(f"setup.py: setuptools is {setuptools.__version__}, this takes {major}")
+
+
 class CMakeBuild(build_ext):
     """Makes the whole content of the wheel; to setuptools it is one extension module."""
 
     def run(self) -> None:
+        if self.inplace or getattr(self, "editable_mode", False):
+            raise SystemExit("setup.py: to edit in place, ./dev build and PYTHONPATH=build/python")
         objects = str(ROOT / WORK / "objects")
         target = Path(self.build_lib).resolve()
         settings = [f"-D{name}={value}" for name, value in CONFIGURATION.items()]
@@ -64,6 +73,7 @@ class CMakeBuild(build_ext):
         subprocess.run(["cmake", *arguments], check=True)
 
 
+require_setuptools(65)
 (ROOT / WORK).mkdir(parents=True, exist_ok=True)
 setup(
     version=version(),

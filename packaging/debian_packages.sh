@@ -17,9 +17,7 @@ rm -f "$folder"/*.deb "$folder"/*.changes "$folder"/*.buildinfo
 tar -c --exclude='./build*' --exclude='./.[!.]*' --exclude=__pycache__ . | tar -x -C "$source"
 mv "$source/packaging/debian" "$source/debian"
 
-# The date of what is packaged, so that the same source makes the same packages.
-SOURCE_DATE_EPOCH=${SOURCE_DATE_EPOCH:-$(git log -1 --format=%ct 2>/dev/null || date +%s)}
-export SOURCE_DATE_EPOCH
+export SOURCE_DATE_EPOCH="${SOURCE_DATE_EPOCH:-$(date +%s)}"
 maintainer=$(sed -n 's/^Maintainer: //p' "$source/debian/control")
 cat >"$source/debian/changelog" <<EOF
 libvswitch ($version) unstable; urgency=medium

@@ -54,6 +54,9 @@ def test_the_host_is_what_the_mark_says(host):
 def test_each_test_has_its_own(host):
     assert mtu("lab")[0] != 0
     assert mtu("vswitch0") == (0, 1500)
+
+def test_a_host_for_commands(shared_host):
+    shared_host.link("nic4").down()
 """
 
 
@@ -106,7 +109,7 @@ class Machine:
         # pytest keeps byte code of plug-ins under a name that pip does not know.
         command = [self.python, "-B", "-m", "pytest", "-q", "--strict-markers", "/tmp/suite"]
         said = self.root.run(*command, **environment)
-        assert "2 passed" in said
+        assert "3 passed" in said
 
     def type_checks(self, *options: str) -> None:
         self.root.write("/tmp/typed.py", TYPED)

@@ -8,7 +8,7 @@ import os
 import shutil
 import subprocess
 from pathlib import Path
-from typing import Optional, Set
+from typing import Set
 
 FOLDER = Path(os.environ["BUILD_DIR"], "packages")
 _BASE = FOLDER / "base.tar"
@@ -104,13 +104,12 @@ class Root:
 
 def _base() -> Path:
     if not _BASE.exists():
-        making: Optional[Path] = _BASE.with_suffix(".new.tar")
-        # apt in a root has lists to work with, and the name server of this machine.
+        making = _BASE.with_suffix(".new.tar")
+        # The lists of packages stay, so that apt can work in a root at once.
         subprocess.run(
             ["mmdebstrap", "--mode=root", "--variant=minbase", "--quiet"]
             + ["--skip=cleanup/apt/lists", "bookworm", str(making)],
             check=True,
         )
-        assert making
         making.rename(_BASE)
     return _BASE
