@@ -2,6 +2,7 @@
 
 import doctest
 import os
+import re
 import subprocess
 import sys
 from pathlib import Path
@@ -73,6 +74,14 @@ def test_each_example_that_is_shown_is_run() -> None:
     shown = {one.command for session in sessions(README) for one in session}
     run = {one.command for session in runnable(README) for one in session}
     assert {command for command in shown if "examples/" in command} == run
+
+
+def test_each_test_that_is_shown_is_one_of_the_guides() -> None:
+    guide = (ROOT / "docs" / "guides" / "test_uplinks.py").read_text(encoding="utf-8")
+    shown = re.findall(r"^```python\n(.*?)^```$", README, re.DOTALL | re.MULTILINE)
+    assert shown
+    for test in shown:
+        assert test in guide
 
 
 SAMPLE = """
