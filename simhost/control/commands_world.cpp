@@ -148,14 +148,20 @@ void add_counter(CLI::App &app) {
 }  // namespace
 
 std::string description() {
-  auto const size = simhost_describe(nullptr, 0);
-  if (size == 0) {
-    throw Failure(simhost_error());
+  // Room for most hosts: to ask for the size alone takes as long as to have the text.
+  std::string text(std::size_t{1} << 20, '\0');
+  while (true) {
+    auto const size = simhost_describe(text.data(), text.size());
+    if (size == 0) {
+      throw Failure(simhost_error());
+    }
+    if (size < text.size()) {
+      text.resize(size);
+      return text;
+    }
+    // Until it is asked again, another process may have made more of the host.
+    text.resize(size * 2);
   }
-  // Between the two calls another process may have changed the host.
-  std::string text(size * 2, '\0');
-  text.resize(std::min(simhost_describe(text.data(), text.size()), text.size() - 1));
-  return text;
 }
 
 void add_world_commands(CLI::App &app) {

@@ -1,5 +1,6 @@
 """simhostctl, beside processes that use the same host through the module."""
 
+import json
 import os
 import re
 import subprocess
@@ -35,6 +36,14 @@ def test_shows_the_host_as_a_tree(host: Host) -> None:
     assert "`-- switch vswitch0: 3 of 128 ports, MTU 1500" in lines
     ports = [line for line in lines if "port web-1" in line]
     assert len(ports) == 1 and ports[0].endswith(", sends over nic4")
+
+
+def test_shows_a_host_of_any_size(host: Host) -> None:
+    ports = [{"id": f"port-{number}"} for number in range(4_000)]
+    host.apply({"switches": [{"alias": "big", "max_ports": 4_000, "ports": ports}]})
+    text = host.ctl("show", "--json")
+    assert len(text) > 1 << 20, "more than the first guess at its size"
+    assert len(json.loads(text)["switches"][1]["ports"]) == 4_000
 
 
 def test_what_it_shows_it_applies(host: Host, tmp_path: Path) -> None:
