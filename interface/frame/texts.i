@@ -24,9 +24,18 @@ SWIGINTERN int array_text_from_object(PyObject *object, size_t capacity, ArrayTe
   return kind == kConverted ? array_text_from_chars(pointer, capacity, text) : kind;
 }
 
-SWIGINTERN bool read_array_text(PyObject *object, size_t capacity, ArrayText *text,
-                                char const *method, int position, char const *type) {
-  int const kind = array_text_from_object(object, capacity, text);
+/* The text of an argument; a short one is in `room`, with zeros behind it. */
+OUT_OF_LINE bool read_array_text(PyObject *object, size_t capacity, char room[2 * kShortText],
+                                 ArrayText *text, char const *method, int position,
+                                 char const *type) {
+  int kind = kConverted;
+  text->bytes = capacity < kShortText ? NULL : copy_short_text(object, room);
+  if (text->bytes) {
+    text->size = kShortText;
+    memset(room + kShortText, 0, kShortText);
+    return true;
+  }
+  kind = array_text_from_object(object, capacity, text);
   if (kind != kConverted) report_argument(kind, method, position, type);
   return kind == kConverted;
 }
@@ -73,15 +82,9 @@ OUT_OF_LINE char *read_text(PyObject *object, char frame[kFrameText], char **hea
 %typemap(freearg, match="in") char const * = char *;
 
 // A field that is an array of chars: the text goes straight into it, with zeros to the end; no text is
-// all zeros, and a null record keeps what it has not got. A short text brings zeros of its own.
+// all zeros, and a null record keeps what it has not got.
 %typemap(in, noblock=1) char [ANY] (ArrayText text, char room[2 * kShortText]) {
-  text.bytes = $1_dim0 < kShortText ? NULL : copy_short_text($input, room);
-  if (text.bytes) {
-    text.size = kShortText;
-    memset(room + kShortText, 0, kShortText);
-  } else if (!read_array_text($input, $1_dim0, &text, "$symname", $argnum, "$type")) {
-    SWIG_fail;
-  }
+  if (!read_array_text($input, $1_dim0, room, &text, "$symname", $argnum, "$type")) SWIG_fail;
   $1 = (char *)&text;
 }
 %typemap(memberin, noblock=1) char [ANY] {
@@ -92,8 +95,8 @@ OUT_OF_LINE char *read_text(PyObject *object, char frame[kFrameText], char **hea
 //
 //   %array_argument(char const sid[32])
 %define %array_argument(PARAMETER...)
-%typemap(in, noblock=1) PARAMETER (ArrayText text, char array[$1_dim0]) {
-  if (!read_array_text($input, $1_dim0, &text, "$symname", $argnum, "$type")) SWIG_fail;
+%typemap(in, noblock=1) PARAMETER (ArrayText text, char room[2 * kShortText], char array[$1_dim0]) {
+  if (!read_array_text($input, $1_dim0, room, &text, "$symname", $argnum, "$type")) SWIG_fail;
   store_array_text(array, sizeof(array), text);
   $1 = array;
 }
