@@ -20,7 +20,6 @@ SIMPLE: Dict[str, Type[Any]] = {
 SIMPLE["char"] = ctypes.c_ubyte
 
 RECORD_SIZES = _pointers.record_sizes()
-POINTER_SIZE = ctypes.sizeof(ctypes.c_void_p)
 
 
 def scalar(name: str) -> Type[Any]:

@@ -1,7 +1,7 @@
 """How an argument of each C type crosses: what Python gives, what the host sees, what is refused.
 
-Everything here is written from the requirement. A kind of argument knows a plain value for each
-position, so that arguments which changed places are noticed, samples that cover its range, and
+Everything here is written from what the module promises. A kind of argument knows a plain value for
+each position, so that arguments which changed places are noticed, samples that cover its range, and
 values that it refuses.
 """
 
