@@ -31,7 +31,7 @@ def test_no_value_crashes_hangs_or_leaves_an_error(batch: str, tmp_path: Path) -
 
 
 def test_what_is_planted_is_found(tmp_path: Path) -> None:
-    calls, problems = processes.sweep("planted", tmp_path, patience=2.0)
+    calls, problems = processes.sweep("planted", tmp_path, patience=10.0)
     ends = [problem.split("\n")[0] for problem in problems if "status" in problem]
     # A sanitizer reports a signal and ends the process itself.
     crashed = "faulty.crash(): status " + ("1" if processes.SANITIZED else "-11")
