@@ -161,10 +161,6 @@ void attach_uplink(Transaction &transaction, std::string_view name, PortNumber p
   update.with(std::int64_t(port)).with(name).run();
 }
 
-void detach_uplink(Transaction &transaction, std::string_view name) {
-  transaction.query("UPDATE uplink SET port = NULL WHERE name = ?").with(name).run();
-}
-
 std::vector<Port> uplink_ports_of(Transaction &transaction, SwitchKey switch_key) {
   auto select = transaction.query(
       "SELECT number, switch, identifier, is_uplink FROM port"

@@ -68,8 +68,6 @@ void add_uplink(Transaction &transaction, std::string_view name);
 std::vector<std::string> free_uplinks(Transaction &transaction);
 /// Puts an uplink at an uplink port.
 void attach_uplink(Transaction &transaction, std::string_view name, PortNumber port);
-/// Frees an uplink.
-void detach_uplink(Transaction &transaction, std::string_view name);
 /// The uplink ports of a switch in their order, with or without an uplink.
 std::vector<Port> uplink_ports_of(Transaction &transaction, SwitchKey switch_key);
 /// The uplink at a port.
