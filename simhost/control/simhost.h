@@ -80,8 +80,8 @@ int simhost_set_counter(char const *switchName, char const *port, char const *se
                         char const *name, uint64_t value);
 
 /* Faults: what is to happen to calls of a function. `nth` is the first call that is hit, 1 for the
- * next; `times` is how many are, 0 for all that follow. Panic and QEX_ReturnStatusToString cannot be
- * hit. */
+ * next; `times` is how many are, 0 for all that follow. Panic and QEX_ReturnStatusToString cannot
+ * be hit. */
 
 /** The calls do nothing and answer a status; QEX_NOT_SUPPORTED for a function that answers none. */
 int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int status);
