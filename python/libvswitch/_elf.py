@@ -41,8 +41,10 @@ def machine_of(path: Path) -> str:
         head = file.read(20)
     if len(head) < 20 or head[:4] != b"\x7fELF":
         raise NotElf(f"{path} is no ELF file")
+    if head[4] == 1:
+        return "32 bits"
     if head[4] != 2 or head[5] != 1:
-        return f"{8 << (head[4] + 1)} bits, {'little' if head[5] == 1 else 'big'}-endian"
+        raise NotElf(f"{path} is no little-endian ELF file")
     (number,) = struct.unpack_from("<H", head, 18)
     return _MACHINES.get(number, f"machine {number}")
 
@@ -72,7 +74,8 @@ def _parse(path: Path, machine: str, held: bytes) -> Elf:
             if tag == _NEEDED:
                 needed.append(_text(held, strings + value))
             elif tag in (_RPATH, _RUNPATH):
-                runpath += [one for one in _text(held, strings + value).split(":") if one]
+                folders = _text(held, strings + value)
+                runpath += folders.split(":") if folders else []
 
     defined: Set[str] = set()
     wanted: Set[str] = set()

@@ -10,6 +10,7 @@ import dataclasses
 import json
 import os
 import platform
+import re
 import signal
 import subprocess
 import sys
@@ -22,7 +23,7 @@ from libvswitch import _elf
 
 MODULE = "_libvswitch"
 HOST = ("libvswitch.so", "libnebPublic.so")
-OK, WARNING, ERROR = "ok", "warning", "error"
+OK, NOTE, WARNING, ERROR = "ok", "note", "warning", "error"
 _BUILD = "build one with ./dev build, or put its folder in PYTHONPATH"
 _TIMEOUT = 60
 
@@ -159,49 +160,60 @@ def _host(report: Report, module: _elf.Elf) -> List[_elf.Elf]:
         report.host[name] = None
         if name not in module.needed:
             report.add(WARNING, "host", f"the module does not ask for {name}", _BUILD)
-        for path in _candidates(name, module):
-            try:
-                machine = _elf.machine_of(path)
-                if machine != module.machine:
-                    raise _elf.NotElf(f"{path} is for {machine}, the module for {module.machine}")
-                found.append(_elf.read(path))
-            except (OSError, _elf.NotElf) as error:
-                report.add(
-                    ERROR,
-                    "host",
-                    f"{name}: {error}",
-                    "put this host's own library there, or take its folder out of LD_LIBRARY_PATH",
-                )
-                continue
-            report.host[name] = str(path)
-            report.add(OK, "host", f"{name}: {path}")
-            break
-        else:
-            report.add(
-                ERROR,
-                "host",
-                f"{name} is nowhere the loader looks",
-                "point LD_LIBRARY_PATH at the folder that holds it, or get the simulated host: the "
-                "package libvswitch-simhost, or ./dev build",
-            )
+        library = _library(report, name, module)
+        if library is not None:
+            report.host[name] = str(library.path)
+            report.add(OK, "host", f"{name}: {library.path}")
+            found.append(library)
     return found
 
 
+def _library(report: Report, name: str, module: _elf.Elf) -> Optional[_elf.Elf]:
+    """The file that the loader takes: it passes over those of other machines, and gives up at one
+    that is no library."""
+    for path in _candidates(name, module):
+        try:
+            machine = _elf.machine_of(path)
+            if machine == module.machine:
+                return _elf.read(path)
+        except (OSError, _elf.NotElf) as error:
+            what = f"{path} is a folder" if path.is_dir() else str(error)
+            report.add(
+                ERROR,
+                "host",
+                f"{name}: {what}",
+                "put this host's own library there, or take its folder out of LD_LIBRARY_PATH",
+            )
+            return None
+        text = f"{name}: {path} is for {machine}, the module for {module.machine}"
+        report.add(NOTE, "host", f"{text}: the loader passes over it")
+    report.add(
+        ERROR,
+        "host",
+        f"{name} is nowhere the loader looks",
+        "point LD_LIBRARY_PATH at the folder that holds it, or get the simulated host: the "
+        "package libvswitch-simhost, or ./dev build",
+    )
+    return None
+
+
 def _candidates(name: str, module: _elf.Elf) -> List[Path]:
-    """Files of that name in the order in which the loader tries them."""
-    folders = [one or "." for one in os.environ.get("LD_LIBRARY_PATH", "").split(":") if one]
+    """What has that name, in the order in which the loader tries it."""
+    given = os.environ.get("LD_LIBRARY_PATH", "")
+    folders = re.split("[:;]", given) if given else []
     origin = str(module.path.resolve().parent)
     for folder in module.runpath:
         folders.append(folder.replace("$ORIGIN", origin).replace("${ORIGIN}", origin))
+    # An empty folder among others is the current one, to the loader and to Path.
     files = [Path(folder, name) for folder in folders] + _cached(name)
     multiarch = str(sysconfig.get_config_var("MULTIARCH") or "")
     for folder in ("/lib", "/usr/lib", "/lib64", "/usr/lib64"):
         files += [Path(folder, multiarch, name), Path(folder, name)]
-    found: List[Path] = []
+    found: Dict[str, Path] = {}
     for file in files:
-        if file.is_file() and Path(os.path.abspath(file)) not in found:
-            found.append(Path(os.path.abspath(file)))
-    return found
+        if os.path.exists(file):
+            found.setdefault(os.path.realpath(file), Path(os.path.abspath(file)))
+    return list(found.values())
 
 
 def _cached(name: str) -> List[Path]:

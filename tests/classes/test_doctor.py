@@ -65,6 +65,26 @@ def library(folder: Path, name: str, source: str) -> None:
     )
 
 
+CLASS, DATA, MACHINE = 4, 5, 18
+
+
+def planted(folder: Path, at: int, value: int) -> str:
+    """A folder with the simulated host's libraries, one byte of each changed."""
+    folder.mkdir()
+    for name in HOST:
+        held = bytearray((SIMHOST / name).read_bytes())
+        held[at] = value
+        (folder / name).write_bytes(held)
+    return str(folder)
+
+
+def loads(python: Path, host: str) -> bool:
+    """What the loader itself makes of it."""
+    environment = {**os.environ, "PYTHONPATH": str(python), "LD_LIBRARY_PATH": host}
+    words = [sys.executable, "-c", "import _libvswitch"]
+    return subprocess.run(words, cwd="/", env=environment, capture_output=True).returncode == 0
+
+
 def test_a_good_build_is_well() -> None:
     done = run()
     assert done.returncode == 0, done.stdout
@@ -141,15 +161,95 @@ def test_a_real_host_is_none_that_simulates(elsewhere: Path, tmp_path: Path) -> 
 
 
 def test_a_host_for_another_machine(elsewhere: Path, tmp_path: Path) -> None:
-    host = tmp_path / "host"
-    host.mkdir()
-    for name in HOST:
-        held = bytearray((SIMHOST / name).read_bytes())
-        held[18] = 0xB7
-        (host / name).write_bytes(held)
-    found = report(run(elsewhere, str(host), "--json"))
-    assert "host" in errors(found)
+    host = planted(tmp_path / "host", MACHINE, 0xB7)
+    found = report(run(elsewhere, host, "--json"))
+    assert errors(found) == ["host", "host", "loading"]
     assert "is for aarch64, the module for x86_64" in text_of(found, "host")
+    assert "libvswitch.so is nowhere the loader looks" in text_of(found, "host")
+
+
+@pytest.mark.parametrize("at, value, machine", [(CLASS, 1, "32 bits"), (MACHINE, 0xB7, "aarch64")])
+def test_a_foreign_library_is_passed_over(
+    tmp_path: Path, at: int, value: int, machine: str
+) -> None:
+    foreign = planted(tmp_path / "foreign", at, value)
+    assert loads(FOLDER, foreign)
+    found = report(run(FOLDER, foreign, "--json"))
+    assert errors(found) == []
+    notes = [one["text"] for one in found["findings"] if one["level"] == "note"]
+    assert notes == [
+        f"{name}: {foreign}/{name} is for {machine}, the module for x86_64: "
+        "the loader passes over it"
+        for name in HOST
+    ]
+    for name in HOST:
+        assert os.path.samefile(found["host"][name], SIMHOST / name)
+
+
+def test_a_library_of_the_other_byte_order_is_not(tmp_path: Path) -> None:
+    wrong = planted(tmp_path / "wrong", DATA, 2)
+    assert not loads(FOLDER, wrong)
+    found = report(run(FOLDER, wrong, "--json"))
+    assert errors(found) == ["host", "host", "loading"]
+    assert found["host"] == {name: None for name in HOST}
+    assert f"{wrong}/libvswitch.so is no little-endian ELF file" in text_of(found, "host")
+
+
+def test_a_folder_of_that_name(tmp_path: Path) -> None:
+    (tmp_path / "libvswitch.so").mkdir()
+    assert not loads(FOLDER, str(tmp_path))
+    found = report(run(FOLDER, str(tmp_path), "--json"))
+    assert errors(found) == ["host", "loading"]
+    texts = {one["text"]: one["advice"] for one in found["findings"]}
+    advice = "put this host's own library there, or take its folder out of LD_LIBRARY_PATH"
+    assert texts[f"libvswitch.so: {tmp_path}/libvswitch.so is a folder"] == advice
+
+
+@pytest.mark.parametrize(
+    "path, expected",
+    [
+        ("", "beside"),
+        (":", "current"),
+        (":{first}", "current"),
+        ("{first}:", "first"),
+        ("{nothing}:", "current"),
+        ("{nothing};{first}", "first"),
+        (";{first}", "current"),
+    ],
+)
+def test_the_search_path_is_read_as_the_loader_reads_it(
+    tmp_path: Path, path: str, expected: str
+) -> None:
+    folders = {"beside": SIMHOST}
+    for folder in ("current", "first", "nothing"):
+        folders[folder] = tmp_path / folder
+        folders[folder].mkdir()
+    for library in SIMHOST.glob("lib*.so"):
+        for folder in ("current", "first"):
+            shutil.copy(library, folders[folder])
+    environment = {**os.environ, "PYTHONPATH": str(FOLDER)}
+    environment["LD_LIBRARY_PATH"] = path.format(**folders)
+    # Python itself must not take a library in the current folder for the package of that name.
+    program = (
+        "import sys; sys.path.remove('')\n"
+        "import json; from libvswitch import doctor\n"
+        "found = doctor.Report(); module = doctor._module(found); doctor._host(found, module)\n"
+        "import _libvswitch\n"
+        "loaded = {line.split()[-1] for line in open('/proc/self/maps') if '/' in line}\n"
+        "print(json.dumps([found.host, sorted(loaded)]))"
+    )
+    done = subprocess.run(
+        [sys.executable, "-c", program],
+        cwd=folders["current"],
+        env=environment,
+        capture_output=True,
+        text=True,
+    )
+    assert done.stderr == ""
+    host, loaded = json.loads(done.stdout)
+    for name in HOST:
+        assert os.path.samefile(host[name], folders[expected] / name)
+        assert os.path.realpath(host[name]) in loaded
 
 
 def test_a_host_that_crashes_as_it_loads(tmp_path: Path, elsewhere: Path) -> None:
