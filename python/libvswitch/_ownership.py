@@ -1,5 +1,6 @@
 """Memory of the library: through which door it goes back, once."""
 
+import contextlib
 import typing
 from typing import Any, Callable, Optional, TypeVar, Union
 
@@ -40,13 +41,32 @@ def hand_out(result: Any, door: Optional[str]) -> None:
 
 
 def release(given: Any, free: Callable[[Any], Any]) -> None:
-    """Gives memory back and makes the object null; ValueError if it is null already."""
+    """Gives memory back and makes the object null; what is refused stays as it is.
+
+    ValueError for what is null already, and where `free` is a door for memory of another kind.
+    """
     if not int(given):
-        raise ValueError(f"this {type(given).__name__} is gone: its memory was given back")
-    try:
-        free(given)
-    finally:
-        _records.end(given)
+        raise ValueError(f"this {_name(given)} is gone: its memory was given back")
+    _require_door(given, free)
+    free(given)
+    _records.end(given)
+
+
+def _require_door(given: Any, free: Callable[[Any], Any]) -> None:
+    """A library need not find out itself what was never its own, and may be damaged by it."""
+    asked, right = getattr(free, "__name__", ""), given.__dict__.get("_door")
+    if asked not in DOORS:
+        return
+    if given.__dict__.get("_owner") is not None:
+        raise ValueError(f"this {_name(given)} lies in memory of another object, which goes back")
+    if given.this.own():
+        raise ValueError(f"this {_name(given)} is the caller's own, and {asked} takes none of that")
+    if right is not None and asked != right:
+        raise ValueError(f"this {_name(given)} goes back through {right}, not {asked}")
+
+
+def _name(given: Any) -> str:
+    return type(given).__name__
 
 
 class owned(typing.Generic[T]):
@@ -63,15 +83,20 @@ class owned(typing.Generic[T]):
         self._door = door
         self._handed_out = list(_pointing(result))
         for one in self._handed_out:
-            self._free(one)
+            _require_door(one, self._free(one))
 
     def __enter__(self) -> T:
         return self._result
 
     def __exit__(self, *unused: Any) -> None:
-        for one in self._handed_out:
-            if int(one):
-                release(one, self._free(one))
+        # What one door refuses must not keep the others shut.
+        with contextlib.ExitStack() as doors:
+            for one in reversed(self._handed_out):
+                doors.callback(self._give_back, one)
+
+    def _give_back(self, one: Any) -> None:
+        if int(one):
+            release(one, self._free(one))
 
     def _free(self, one: Any) -> Callable[[Any], Any]:
         door = self._door if self._door is not None else one.__dict__.get("_door")

@@ -5,7 +5,7 @@ from typing import Any, Callable, List, Optional
 import _libvswitch
 import libvswitch as vs
 import pytest
-from libvswitch._ownership import door_of
+from libvswitch._ownership import DOORS, door_of
 
 
 def uses(uplinks: Any) -> List[Callable[[], Any]]:
@@ -125,3 +125,78 @@ def test_a_table_of_the_callers_own() -> None:
         assert len(table) == 1
     with pytest.raises(ValueError):
         len(table)
+
+
+def test_a_wrong_door_leaves_the_record_to_the_right_one(switch: str) -> None:
+    _, uplinks = vs.VSQEX_GetUplinks(switch)
+    names = list(uplinks)
+    wrong = [name for name in DOORS if name != "VSQEX_FreeMemory"]
+    assert len(wrong) == 4
+    for door in wrong:
+        text = f"this VSUplinks goes back through VSQEX_FreeMemory, not {door}"
+        with pytest.raises(ValueError, match=f"^{text}$"):
+            getattr(vs, door)(uplinks)
+        with pytest.raises(ValueError, match=f"^{text}$"):
+            vs.owned(uplinks, door)
+    assert list(uplinks) == names
+    vs.VSQEX_FreeMemory(uplinks)
+    assert repr(uplinks) == "<VSUplinks that is gone>"
+
+
+@pytest.mark.parametrize("door", DOORS)
+def test_no_door_takes_a_record_of_the_callers_own(door: str) -> None:
+    info = vs.VSInfo()
+    info.mtu = 9000
+    text = f"^this VSInfo is the caller's own, and {door} takes none of that$"
+    with pytest.raises(ValueError, match=text):
+        getattr(vs, door)(info)
+    assert info.mtu == 9000 and info.thisown
+
+
+def test_a_wrong_door_leaves_the_callers_table(switch: str) -> None:
+    table = vs.alloc_dvmirror_session_table(1, 1)
+    text = "goes back through free_dvmirror_session_table, not VSDVS_FreeMemory$"
+    with pytest.raises(ValueError, match=text):
+        vs.VSDVS_FreeMemory(table)
+    assert len(table) == 1
+    vs.free_dvmirror_session_table(table)
+    with pytest.raises(ValueError, match="is gone"):
+        vs.free_dvmirror_session_table(table)
+
+
+def test_what_lies_in_a_record_does_not_go_back_alone(switch: str) -> None:
+    """The first field lies where its record does: the host could not tell them apart."""
+    with vs.owned(vs.VSDVS_GetPortVLANPolicy(switch, "web")) as (_, policy, _priority):
+        for view in (policy.vidRanges, vs.Cell("int").pointer):
+            with pytest.raises(ValueError, match="lies in memory of another object"):
+                vs.VSDVS_FreeMemory(view)
+            assert int(view)
+
+
+def test_what_the_host_refuses_stays(switch: str) -> None:
+    _, uplinks = vs.VSQEX_GetUplinks(switch)
+    unknown = vs.Pointer(int(uplinks) + 8, "void *", None)
+    with pytest.raises(RuntimeError, match="never gave out"):
+        vs.VSQEX_FreeMemory(unknown)
+    assert int(unknown) == int(uplinks) + 8
+    vs.VSQEX_FreeMemory(uplinks)
+
+
+def test_one_refusal_does_not_keep_the_others(switch: str) -> None:
+    def closed(_: Any) -> None:
+        raise LookupError("closed")
+
+    _, first = vs.VSQEX_GetUplinks(switch)
+    _, second = vs.VSQEX_GetUplinks(switch)
+    refused = iter((closed, _libvswitch.VSQEX_FreeMemory))
+    with pytest.raises(LookupError, match="closed"):
+        with vs.owned((first, second), lambda memory: next(refused)(memory)):
+            pass
+    assert int(first) and not int(second)
+    vs.VSQEX_FreeMemory(first)
+
+
+def test_an_array_of_the_callers_goes_through_a_function() -> None:
+    with vs.owned(vs.new_vidrangeArray(2), vs.delete_vidrangeArray) as ranges:
+        assert len(ranges) == 2
+    assert repr(ranges) == "<array that is gone>"
