@@ -4,6 +4,8 @@
 #include <CLI/CLI.hpp>
 #include <cmath>
 #include <cstdint>
+#include <functional>
+#include <limits>
 #include <stdexcept>
 #include <string>
 
@@ -29,6 +31,10 @@ inline char const *or_null(std::string const &text) {
 inline std::int64_t milliseconds(double seconds) {
   return std::llround(seconds * 1000);
 }
+
+/// What is wrong with a text that has to be a whole number in digits; empty if nothing is.
+std::function<std::string(std::string const &)> whole_number(
+    std::uint64_t least = 0, std::uint64_t greatest = std::numeric_limits<std::uint64_t>::max());
 
 /// The whole host as a document.
 std::string description();

@@ -2,6 +2,7 @@
 #include <fmt/format.h>
 
 #include <iostream>
+#include <limits>
 #include <nlohmann/json.hpp>
 #include <string_view>
 
@@ -18,6 +19,7 @@ constexpr std::string_view kCallTable =
 FaultWords given_fault;
 
 void add_fault_options(CLI::App &add) {
+  constexpr auto kMost = std::numeric_limits<std::uint32_t>::max();
   auto &fault = given_fault;
   fault = {.function = "",
            .nth = 1,
@@ -28,8 +30,9 @@ void add_fault_options(CLI::App &add) {
            .delay = 0};
   add.add_option("function", fault.function, "such as VSDVS_SetMTU")->required();
   add.add_option("--nth", fault.nth, "the first call that is hit; 1, the next, unless given")
-      ->check(CLI::PositiveNumber);
-  add.add_option("--times", fault.times, "how many are hit; 0 for all that follow, 1 unless given");
+      ->check(whole_number(1, kMost));
+  add.add_option("--times", fault.times, "how many are hit; 0 for all that follow, 1 unless given")
+      ->check(whole_number(0, kMost));
   auto *const status = add.add_option("--status", fault.status, "answer this, such as QEX_BUSY");
   add.add_option("--exception", fault.exception, "spring the trap with this type, such as OSError")
       ->excludes(status);

@@ -2,6 +2,7 @@
 #include <fstream>
 #include <iostream>
 #include <iterator>
+#include <limits>
 #include <nlohmann/json.hpp>
 #include <string>
 #include <vector>
@@ -72,6 +73,15 @@ void add_up_or_down(CLI::App &command, std::string const &key, std::string const
       ->check(CLI::IsMember({"up", "down"}));
 }
 
+// The document has its own bounds.
+void add_number(CLI::App &command, std::string const &option, std::string const &key,
+                std::string const &what) {
+  command
+      .add_option_function<std::uint64_t>(
+          "--" + option, [key](std::uint64_t number) { given_uplink[key] = number; }, what)
+      ->check(whole_number());
+}
+
 void add_uplink(CLI::App &app) {
   auto *const uplink =
       app.add_subcommand("uplink", "Change what an uplink is like, or add one to the host");
@@ -84,14 +94,12 @@ void add_uplink(CLI::App &app) {
   add_up_or_down(*uplink, "admin", "the host's own switch");
   add_up_or_down(*uplink, "lacp", "whether the other end answers link aggregation");
   add_up_or_down(*uplink, "beacons", "whether the beacons of the other uplinks arrive");
-  uplink->add_option_function<std::int64_t>(
-      "--speed", [](std::int64_t speed) { given_uplink["speed"] = speed; }, "Mbit/s");
+  add_number(*uplink, "speed", "speed", "Mbit/s");
   uplink->add_option_function<std::string>(
       "--duplex", [](std::string const &duplex) { given_uplink["duplex"] = duplex; },
       "full or half");
-  uplink->add_option_function<std::int64_t>(
-      "--error-percent", [](std::int64_t errors) { given_uplink["error_percent"] = errors; },
-      "how many of its frames are damaged, of 100");
+  add_number(*uplink, "error-percent", "error_percent",
+             "how many of its frames are damaged, of 100");
   uplink->add_option_function<bool>(
       "--driver", [](bool loaded) { given_uplink["driver"] = loaded; },
       "whether the driver of the card is loaded: true or false");
@@ -113,8 +121,10 @@ void add_learn(CLI::App &app) {
   learn->add_option("switch", switch_name, "alias of the switch")->required();
   learn->add_option("mac", mac, "such as 02:00:00:00:00:01")->required();
   learn->add_option("--port", port, "where it arrives; the team of uplinks unless given");
-  learn->add_option("--vlan", vlan, "0 unless given");
-  learn->add_option("--vni", vni, "the virtual network; 0 unless given");
+  learn->add_option("--vlan", vlan, "0 unless given")
+      ->check(whole_number(0, std::numeric_limits<std::uint16_t>::max()));
+  learn->add_option("--vni", vni, "the virtual network; 0 unless given")
+      ->check(whole_number(0, std::numeric_limits<std::uint32_t>::max()));
   learn->footer(
       "A port learns while its policy says so, up to its limit:\n"
       "  simhostctl learn vswitch0 02:00:00:00:01:02 --port web-1 --vlan 10");
@@ -132,7 +142,9 @@ void add_counter(CLI::App &app) {
   counter->add_option("switch", switch_name, "alias of the switch")->required();
   counter->add_option("name", name, "the field in which callers see it, such as txErrors")
       ->required();
-  counter->add_option("value", value, "what it shows from now on")->required();
+  counter->add_option("value", value, "what it shows from now on")
+      ->required()
+      ->check(whole_number());
   auto *const of_port = counter->add_option("--port", port, "of this port");
   counter->add_option("--session", session, "of this mirror session")->excludes(of_port);
   counter->footer(

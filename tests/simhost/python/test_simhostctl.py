@@ -140,6 +140,46 @@ vs.delete_VSServicePortTeamingStats(stats)
     assert "QEX_NOT_FOUND" in host.refusal("counter", "vswitch0", "txMistakes", "1")
 
 
+MOST = 2**64 - 1
+ODD_NUMBERS = [
+    ("counter vswitch0 txErrors -- -1", "value: '-1' is no whole number, 0 or more"),
+    ("counter vswitch0 txErrors +1", "value: '+1' is no whole number, 0 or more"),
+    ("counter vswitch0 txErrors 010", "value: '010' is no whole number, 0 or more"),
+    ("counter vswitch0 txErrors 0x10", "value: '0x10' is no whole number, 0 or more"),
+    ("counter vswitch0 txErrors 1.5", "value: '1.5' is no whole number, 0 or more"),
+    (f"counter vswitch0 txErrors {MOST + 1}", f"value: {MOST + 1} is above {MOST}"),
+    (f"counter vswitch0 txErrors {'9' * 20}", f"value: {'9' * 20} is above {MOST}"),
+    ("fault add VSDVS_SetMTU --delay 1 --nth 0", "--nth: 0 is below 1"),
+    (f"fault add VSDVS_SetMTU --delay 1 --nth {2**32}", f"--nth: {2**32} is above {2**32 - 1}"),
+    ("fault add VSDVS_SetMTU --delay 1 --nth=-1", "--nth: '-1' is no whole number, 1 or more"),
+    (f"fault add VSDVS_SetMTU --delay 1 --times {2**32}", f"--times: {2**32} is above {2**32 - 1}"),
+    ("learn vswitch0 02:00:00:00:00:01 --vlan 65536", "--vlan: 65536 is above 65535"),
+    ("learn vswitch0 02:00:00:00:00:01 --vlan 010", "--vlan: '010' is no whole number, 0 or more"),
+    (f"learn vswitch0 02:00:00:00:00:01 --vni {2**32}", f"--vni: {2**32} is above {2**32 - 1}"),
+    ("uplink nic4 --speed=-1", "--speed: '-1' is no whole number, 0 or more"),
+    ("uplink nic4 --error-percent=1e1", "--error-percent: '1e1' is no whole number, 0 or more"),
+]
+
+
+@pytest.mark.parametrize("words, complaint", ODD_NUMBERS)
+def test_numbers_are_read_as_in_documents(host: Host, words: str, complaint: str) -> None:
+    host.ctl("clock", "stop")
+    before = host.described()
+    done = host.run(*words.split())
+    assert done.returncode != 0
+    assert complaint in done.stdout + done.stderr
+    assert host.described() == before
+
+
+def test_the_document_knows_the_bounds_of_an_uplink(host: Host) -> None:
+    assert host.refusal("uplink", "nic4", "--speed", "0") == (
+        "simhostctl: uplinks[0].speed: 0 is below 1\n"
+    )
+    assert host.refusal("uplink", "nic4", "--error-percent", str(MOST)) == (
+        f"simhostctl: uplinks[0].error_percent: {MOST} is above 100\n"
+    )
+
+
 def test_faults_hit_other_processes(host: Host) -> None:
     host.ctl("fault", "add", "VSDVS_SetMTU", "--nth", "2", "--status", "QEX_BUSY")
     host.ctl(
