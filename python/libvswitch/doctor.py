@@ -2,7 +2,8 @@
 
 Looks at the files first and loads the module in a child process only, so that nothing which is
 wrong with it or with the host's libraries can end the doctor. The status is 0 if all is well, 1 if
-something has to be done, 2 for a wrong command line.
+something has to be done, 2 for a wrong command line; and where nobody reads to the end, SIGPIPE
+ends the doctor as it does other commands, which the shell calls 141.
 """
 
 import argparse
@@ -17,7 +18,7 @@ import sys
 import sysconfig
 from importlib.machinery import EXTENSION_SUFFIXES, PathFinder
 from pathlib import Path
-from typing import Any, Dict, List, Optional, Set
+from typing import Any, Dict, List, Mapping, Optional, Set
 
 from libvswitch import _elf
 
@@ -26,6 +27,8 @@ HOST = ("libvswitch.so", "libnebPublic.so")
 OK, NOTE, WARNING, ERROR = "ok", "note", "warning", "error"
 _BUILD = "build one with ./dev build, or put its folder in PYTHONPATH"
 _TIMEOUT = 60
+_SHOWN_SYMBOLS = 5
+_STATE, _SCENARIO = "SIMHOST_STATE", "SIMHOST_SCENARIO"
 
 # Loads the module, and answers which files that brought in and how large records are: as the
 # classes know it, and as the room shows that the flat constructors make.
@@ -58,6 +61,14 @@ for name, size in _pointers.record_sizes().items():
 print(json.dumps(found), flush=True)
 """
 
+# Reads, so that a simulated host takes up its state.
+_CALL = """
+import json, sys
+sys.path[:] = json.loads(sys.argv[1])
+import _libvswitch
+_libvswitch.DVSState_SwitchFindByAlias("")
+"""
+
 
 @dataclasses.dataclass
 class Finding:
@@ -73,6 +84,7 @@ class Report:
     module: Optional[str] = None
     host: Dict[str, Optional[str]] = dataclasses.field(default_factory=dict)
     simulated: Optional[bool] = None
+    simulation: Dict[str, Optional[str]] = dataclasses.field(default_factory=dict)
     missing_symbols: List[str] = dataclasses.field(default_factory=list)
     findings: List[Finding] = dataclasses.field(default_factory=list)
 
@@ -93,6 +105,8 @@ def examine() -> Report:
     libraries = _host(report, module)
     _symbols(report, module, libraries)
     _load(report)
+    if report.simulated:
+        _simulation(report)
     return report
 
 
@@ -244,7 +258,7 @@ def _symbols(report: Report, module: _elf.Elf, libraries: List[_elf.Elf]) -> Non
             ERROR,
             "symbols",
             f"the host lacks {len(report.missing_symbols)} of {len(wanted)} calls: "
-            f"{', '.join(report.missing_symbols)}",
+            f"{_first(report.missing_symbols)}",
             "the host's libraries are older than this module: update the host, or build the module "
             "against them",
         )
@@ -252,15 +266,25 @@ def _symbols(report: Report, module: _elf.Elf, libraries: List[_elf.Elf]) -> Non
         report.add(OK, "symbols", f"the host has all {len(wanted)} calls")
 
 
+def _first(names: List[str]) -> str:
+    shown, more = ", ".join(names[:_SHOWN_SYMBOLS]), len(names) - _SHOWN_SYMBOLS
+    return f"{shown} and {more} more, all of which --json names" if more > 0 else shown
+
+
+def _child(program: str, environment: Mapping[str, str]) -> "subprocess.CompletedProcess[bytes]":
+    return subprocess.run(
+        [sys.executable, "-c", program, json.dumps(sys.path)],
+        env=environment,
+        stdout=subprocess.PIPE,
+        stderr=subprocess.PIPE,
+        timeout=_TIMEOUT,
+    )
+
+
 def _load(report: Report) -> None:
     """What a child finds that loads the module as a tool would."""
     try:
-        done = subprocess.run(
-            [sys.executable, "-c", _CHILD, json.dumps(sys.path)],
-            stdout=subprocess.PIPE,
-            stderr=subprocess.PIPE,
-            timeout=_TIMEOUT,
-        )
+        done = _child(_CHILD, os.environ)
     except (OSError, subprocess.SubprocessError) as error:
         report.add(ERROR, "loading", f"no child process could load the module: {error}")
         return
@@ -281,20 +305,26 @@ def _load(report: Report) -> None:
 def _not_loaded(report: Report, status: int, errors: str, found: Dict[str, Any]) -> None:
     what = f"{MODULE} loads, its classes do not" if found else f"{MODULE} does not load"
     if status < 0:
-        try:
-            ended = signal.Signals(-status).name
-        except ValueError:
-            ended = f"signal {-status}"
         report.add(
             ERROR,
             "loading",
-            f"{what}: the process ends with {ended}",
+            f"{what}: {_end(status, errors)}",
             "the host's libraries fail as they start: see what they log, or try the simulated host",
         )
         return
-    last = (errors.strip().splitlines() or ["no reason given"])[-1]
     advice = "" if any(one.level == ERROR for one in report.findings) else _BUILD
-    report.add(ERROR, "loading", f"{what}: {last}", advice or "see above")
+    report.add(ERROR, "loading", f"{what}: {_end(status, errors)}", advice or "see above")
+
+
+def _end(status: int, errors: str) -> str:
+    """Why a process did not succeed, in a line."""
+    if status >= 0:
+        return (errors.strip().splitlines() or ["no reason given"])[-1]
+    try:
+        ended = signal.Signals(-status).name
+    except ValueError:
+        ended = f"signal {-status}"
+    return f"the process ends with {ended}"
 
 
 def _loaded(report: Report, files: List[Path]) -> None:
@@ -330,6 +360,37 @@ def _sizes(report: Report, sizes: Dict[str, List[int]]) -> None:
         report.add(OK, "records", f"module and classes agree on the size of {len(sizes)} records")
 
 
+def _simulation(report: Report) -> None:
+    """What the simulated host is told by its variables, and whether it answers then."""
+    state, scenario = (os.environ.get(name) or None for name in (_STATE, _SCENARIO))
+    report.simulation = {_STATE: state, _SCENARIO: scenario}
+    kept = f"is {state}: the host is kept there" if state else "is not set: the host is in memory"
+    fresh = f"{scenario}, where it is described" if scenario else "not set: it is the usual one"
+    report.add(OK, "simulation", f"{_STATE} {kept}")
+    report.add(OK, "simulation", f"for a fresh host {_SCENARIO} is {fresh}")
+
+    environment = dict(os.environ)
+    if state and _can_be_made(Path(state)):
+        # A host that is examined in memory is not there afterwards.
+        del environment[_STATE]
+    try:
+        done = _child(_CALL, environment)
+        why = _end(done.returncode, done.stderr.decode("utf-8", "replace"))
+        answers = done.returncode == 0
+    except (OSError, subprocess.SubprocessError) as error:
+        why, answers = str(error), False
+    if answers:
+        report.add(OK, "simulation", "the host answers a call")
+        return
+    named = " and ".join(name for name, value in report.simulation.items() if value)
+    advice = f"correct what {named} tells the host, or unset it" if named else _BUILD
+    report.add(ERROR, "simulation", f"the host answers no call: {why}", advice)
+
+
+def _can_be_made(file: Path) -> bool:
+    return not file.exists() and os.access(str(file.parent), os.W_OK | os.X_OK)
+
+
 def show(report: Report) -> str:
     lines = []
     for finding in report.findings:
@@ -356,4 +417,5 @@ def main(arguments: Optional[List[str]] = None) -> int:
 
 
 if __name__ == "__main__":
+    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     sys.exit(main())

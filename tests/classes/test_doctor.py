@@ -3,10 +3,11 @@
 import json
 import os
 import shutil
+import signal
 import subprocess
 import sys
 from pathlib import Path
-from typing import Any, Dict, List
+from typing import Any, Dict, List, Tuple
 
 import pytest
 from libvswitch import _elf, doctor
@@ -149,6 +150,93 @@ def test_a_host_that_lacks_calls(elsewhere: Path, tmp_path: Path) -> None:
     assert errors(found) == ["symbols", "loading"]
     assert found["missing_symbols"] == sorted(lacking)
     assert "lacks 2 of 146 calls" in text_of(found, "symbols")
+
+
+def test_many_missing_calls_are_counted(elsewhere: Path, tmp_path: Path) -> None:
+    for name in HOST:
+        library(tmp_path / "host", name, "")
+    done = run(elsewhere, str(tmp_path / "host"))
+    assert done.returncode == 1
+    (line,) = [line for line in done.stdout.splitlines() if " symbols " in line]
+    assert "the host lacks 146 of 146 calls: DVPortExist, DVSAliasTo" in line
+    assert line.endswith(" and 141 more, all of which --json names")
+    assert len(line.split(", ")) == 6
+    assert len(report(run(elsewhere, str(tmp_path / "host"), "--json"))["missing_symbols"]) == 146
+
+
+SIMULATION = ("SIMHOST_STATE", "SIMHOST_SCENARIO")
+
+
+def test_a_simulated_host_without_variables(monkeypatch: pytest.MonkeyPatch) -> None:
+    for name in SIMULATION:
+        monkeypatch.delenv(name, raising=False)
+    found = report(run(FOLDER, "", "--json"))
+    assert found["simulation"] == {name: None for name in SIMULATION}
+    assert text_of(found, "simulation") == (
+        "SIMHOST_STATE is not set: the host is in memory "
+        "for a fresh host SIMHOST_SCENARIO is not set: it is the usual one "
+        "the host answers a call"
+    )
+
+
+def simulated_error() -> Tuple[str, str]:
+    """What the doctor says with these variables set, and what it advises."""
+    found = report(run(FOLDER, "", "--json"))
+    assert errors(found) == ["simulation"]
+    assert found["simulation"] == {name: os.environ.get(name) for name in SIMULATION}
+    (error,) = [one for one in found["findings"] if one["level"] == "error"]
+    return error["text"], error["advice"]
+
+
+def test_a_state_that_cannot_be_used(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    monkeypatch.delenv("SIMHOST_SCENARIO", raising=False)
+    for file in (tmp_path / "nowhere" / "host.db", tmp_path):
+        monkeypatch.setenv("SIMHOST_STATE", str(file))
+        text, advice = simulated_error()
+        assert text.startswith("the host answers no call: RuntimeError: ")
+        assert f"the state file {file} cannot be used: " in text
+        assert advice == "correct what SIMHOST_STATE tells the host, or unset it"
+
+
+def test_a_scenario_that_cannot_be_used(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    scenario = tmp_path / "scenario.json"
+    scenario.write_text('{"switches": [{"alias": "s", "mtu": 99}]}', encoding="ascii")
+    monkeypatch.delenv("SIMHOST_STATE", raising=False)
+    monkeypatch.setenv("SIMHOST_SCENARIO", str(scenario))
+    text, advice = simulated_error()
+    assert text.endswith(
+        f"the scenario {scenario} cannot be used: switches[0].mtu: 99 is below 1280"
+    )
+    assert advice == "correct what SIMHOST_SCENARIO tells the host, or unset it"
+
+    # The same where it would be the beginning of a host in a file, which the doctor does not make.
+    monkeypatch.setenv("SIMHOST_STATE", str(tmp_path / "host.db"))
+    assert simulated_error()[0] == text
+
+
+def test_the_doctor_makes_no_host(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    monkeypatch.delenv("SIMHOST_SCENARIO", raising=False)
+    monkeypatch.setenv("SIMHOST_STATE", str(tmp_path / "host.db"))
+    found = report(run(FOLDER, "", "--json"))
+    assert errors(found) == []
+    assert f"SIMHOST_STATE is {tmp_path}/host.db: the host is kept" in text_of(found, "simulation")
+    assert list(tmp_path.iterdir()) == []
+
+
+def test_a_reader_that_leaves_early() -> None:
+    environment = {**os.environ, "PYTHONPATH": str(FOLDER)}
+    done = subprocess.Popen(
+        [sys.executable, "-m", "libvswitch.doctor"],
+        cwd="/",
+        env=environment,
+        stdout=subprocess.PIPE,
+        stderr=subprocess.PIPE,
+    )
+    assert done.stdout is not None and done.stderr is not None
+    done.stdout.close()
+    assert done.stderr.read() == b""
+    done.stderr.close()
+    assert done.wait() == -signal.SIGPIPE
 
 
 def test_a_real_host_is_none_that_simulates(elsewhere: Path, tmp_path: Path) -> None:
