@@ -134,6 +134,12 @@ class Definitions:
             layers, name = layers + behind.layers, _bare(behind.name)
         return Type(layers, name)
 
+    def records_behind_pointers(self) -> List[str]:
+        """Records that calls hand out through a pointer to a pointer of the caller's."""
+        behind = (self.resolve(one.type) for call in self.functions for one in call.inputs)
+        names = {one.name for one in behind if one.layers == ("p", "p")}
+        return sorted(names & set(self.records))
+
 
 def read(path: Path) -> Definitions:
     found = Definitions()

@@ -11,7 +11,7 @@ import definitions
 from definitions import Definitions, Field, Function, Type
 
 SIZES = ("char", "short", "int", "long long")
-NUMBERS = [*SIZES, *(f"unsigned {size}" for size in SIZES), "signed char", "size_t"]
+NUMBERS = [*SIZES, *(f"unsigned {size}" for size in SIZES), "signed char"]
 
 
 def array(known: Definitions, field: Field) -> Optional[Tuple[str, int, Any]]:
@@ -102,6 +102,7 @@ def layout(known: Definitions) -> str:
             for resolved in [known.resolve(type_)]
             if not resolved.layers and resolved.name in NUMBERS and " " not in name
         },
+        "RECORDS_BEHIND_POINTERS": known.records_behind_pointers(),
         "POINTERS": sorted(
             name
             for name, type_ in known.typedefs.items()

@@ -101,7 +101,7 @@ class Cell(_Pointing, Generic[_Value, _Pointer]):
 
 _SIZES = ("short", "int", "long long")
 _INTEGERS = {*_SIZES, *(f"unsigned {size}" for size in _SIZES)}
-_INTEGERS |= {"unsigned char", "signed char", "size_t"}
+_INTEGERS |= {"unsigned char", "signed char"}
 _CALLBACK = Type(("p", "f(p.void,p.void)"), "char")
 
 
@@ -439,16 +439,9 @@ def cells(stubs: Stubs) -> str:
     ]
     any_pointer = "Optional[_flat._Pointer]"
     text += cell_form(f"Optional[_flat._VoidPointer], {handle}", ["void *", *handles], any_pointer)
-    used = {
-        known.resolve(one.type).name: one.type
-        for call in known.functions
-        for one in call.inputs
-        if known.resolve(one.type).layers == ("p", "p")
-    }
-    for name, type_ in used.items():
-        if name in known.records:
-            record = f"Optional[_classes.{name}]"
-            text += cell_form(f"{record}, {stubs.pointer(type_)}", [f"{name} *"], record)
+    for name in known.records_behind_pointers():
+        record, pointer = f"Optional[_classes.{name}]", stubs.pointer(Type(("p", "p"), name))
+        text += cell_form(f"{record}, {pointer}", [f"{name} *"], record)
     return _CELLS_HEAD.replace("{callback}", callback) + text
 
 

@@ -14,7 +14,6 @@ SIMPLE: Dict[str, Type[Any]] = {
     "unsigned int": ctypes.c_uint,
     "long long": ctypes.c_longlong,
     "unsigned long long": ctypes.c_ulonglong,
-    "size_t": ctypes.c_size_t,
 }
 # A char holds the bytes of a text or a truth; both are numbers here.
 SIMPLE["char"] = ctypes.c_ubyte

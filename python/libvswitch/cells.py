@@ -26,9 +26,10 @@ class Cell(_records._Pointing):
     >>> mtu.value
     9000
 
-    The type is a scalar, under any of its names; `void *` or a handle; or a pointer to a record,
-    such as `VSLAGTable *`. Scalars start as zero, pointers as null. `Cell(type, 7)` starts with a
-    value, `Cell(type, [1, 2, 3])` holds three, and bytes are as many of one byte each.
+    The type is an integer of up to 64 bits, under any of its names; `void *` or a handle; or a
+    pointer to a record that a call hands out so, such as `VSLAGTable *`. Integers start as zero,
+    pointers as null. `Cell(type, 7)` starts with a value, `Cell(type, [1, 2, 3])` holds three, and
+    bytes are as many of one byte each.
     """
 
     def __init__(
@@ -37,8 +38,7 @@ class Cell(_records._Pointing):
         self.type = type.strip()
         self.door: Optional[str] = None
         self._is_scalar = _memory.is_scalar(self.type)
-        if not self._is_scalar and not self._is_pointer():
-            raise TypeError(f"no cell can hold a {self.type!r}")
+        spelling = self._spelled_pointer()
         many = isinstance(value, Iterable) and not isinstance(value, _records._Pointing)
         values: List[Any] = list(value) if many else [value]  # type: ignore[arg-type]
         self._is_single = not many
@@ -46,7 +46,7 @@ class Cell(_records._Pointing):
         self._found: Dict[int, Any] = {}
         kind: Any = _memory.scalar(self.type) if self._is_scalar else ctypes.c_void_p
         self._memory = (kind * max(len(values), 1))()
-        self.pointer = Pointer(ctypes.addressof(self._memory), _spelled_pointer(self.type), self)
+        self.pointer = Pointer(ctypes.addressof(self._memory), spelling, self)
         # The runtime then takes a cell for its pointer.
         self.this = self.pointer.this
         for index, one in enumerate(values):
@@ -124,11 +124,18 @@ class Cell(_records._Pointing):
     def _target(self) -> str:
         return self.type[:-1].strip() if self.type.endswith("*") else ""
 
-    def _is_pointer(self) -> bool:
-        return (
-            self.type in _layout.POINTERS
-            or self._target() == "void"
-            or self._target() in _layout.RECORDS
+    def _spelled_pointer(self) -> str:
+        """How the runtime spells a pointer to this type: without the names that are one in C."""
+        if self._is_scalar:
+            return f"{_layout.SCALARS.get(self.type, self.type)} *"
+        if self.type in _layout.POINTERS or self._target() == "void":
+            return "void **"
+        if self._target() in _layout.RECORDS_BEHIND_POINTERS:
+            return f"{self._target()} **"
+        records = ", ".join(f"{name} *" for name in _layout.RECORDS_BEHIND_POINTERS)
+        raise TypeError(
+            f"no cell can hold a {self.type!r}; it holds an integer such as int or qex_uint32, "
+            f"void *, {', '.join(_layout.POINTERS)}, {records}"
         )
 
 
@@ -173,7 +180,3 @@ class Callback(_records._Pointing):
 
 def _handle(address: Optional[int]) -> Optional[Pointer]:
     return Pointer(address, "void *", None) if address else None
-
-
-def _spelled_pointer(type: str) -> str:
-    return f"{type}*" if type.endswith("*") else f"{type} *"

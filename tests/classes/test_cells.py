@@ -1,6 +1,10 @@
 """Cells make every call usable: those that fill or read what a pointer points to, and walks."""
 
 import ctypes
+import os
+import re
+import sys
+from pathlib import Path
 from typing import Any, List
 
 import libvswitch as vs
@@ -178,10 +182,57 @@ def test_bytes_are_numbers_of_one_byte() -> None:
     assert list(Cell("qex_uint8", b"\1\2")) == [1, 2]
 
 
-@pytest.mark.parametrize("type", ["", "nothing", "VSInfo", "nothing *", "float"])
+def types_of_the_stub() -> List[str]:
+    stub = Path(os.environ["BUILD_DIR"], "python", "libvswitch", "cells.pyi")
+    listed = re.findall(r"type: Literal\[(.*?)\]", stub.read_text(encoding="utf-8"))
+    return [name for names in listed for name in re.findall(r'"(.+?)"', names)]
+
+
+def test_the_stub_names_all_kinds() -> None:
+    found = types_of_the_stub()
+    assert len(found) == len(set(found)) > 60
+    assert {"char", "qex_Bool", "QEX_ReturnStatus", "void *", "DVSPortHandle"} < set(found)
+    # What the headers pass as a pointer to a pointer to a record.
+    assert {name for name in found if name.endswith(" *")} == {
+        "void *",
+        "DVPortList *",
+        "OpaqueDVPortData *",
+        "VSLAGTable *",
+    }
+
+
+@pytest.mark.parametrize("type", types_of_the_stub())
+def test_every_type_of_the_stub_makes_a_cell(type: Any) -> None:
+    is_pointer = type.endswith(("*", "Handle", "Item"))
+    cell = Cell(type)
+    assert cell.value == (None if is_pointer else 0)
+    assert int(cell) == int(cell.pointer) != 0
+    if is_pointer:
+        assert len(bytes(cell)) == ctypes.sizeof(ctypes.c_void_p)
+    else:
+        cell.value = 1
+        assert int.from_bytes(bytes(cell), sys.byteorder) == cell.value == 1
+
+
+def test_a_name_of_a_pointer_is_as_good_as_the_pointer(switch_id: str) -> None:
+    types: Any = ("void *", "DVSDataHandle", "DVSDataItem", "DVSPortHandle", "DVSwitchHandle")
+    for type in types:
+        item = Cell(type)
+        assert vs.DVSState_GlobalPropLookup(switch_id, vs.VSPROP_MTU, item.pointer) == vs.QEX_OK
+        assert vs.DVSData_Name(item.value) == vs.VSPROP_MTU
+
+
+@pytest.mark.parametrize(
+    "type", ["", "nothing", "VSInfo", "nothing *", "float", "size_t", "VSInfo *", "VSUplinks *"]
+)
 def test_what_no_cell_holds(type: Any) -> None:
-    with pytest.raises(TypeError):
+    with pytest.raises(TypeError) as raised:
         Cell(type)
+    assert str(raised.value) == (
+        f"no cell can hold a {type!r}; it holds an integer such as int or qex_uint32, void *, "
+        "DVSDataHandle, DVSDataItem, DVSPortHandle, DVSwitchHandle, "
+        "DVPortList *, OpaqueDVPortData *, VSLAGTable *"
+    )
 
 
 def test_a_cell_of_the_wrong_type_is_refused(switch: str) -> None:
