@@ -7,6 +7,7 @@ had is kept until the new one has been read back.
 
 import argparse
 import dataclasses
+import signal
 import sys
 from typing import Optional, Sequence, Tuple
 
@@ -109,6 +110,15 @@ def restore(switch: str, port: str, before: VlanPolicy, why: str) -> None:
         raise NotRestored(f"{why}; then the port was to get {before} back and has {found}")
 
 
+def name(text: str) -> str:
+    """The libraries take UTF-8, and what is typed in a shell may be any bytes."""
+    try:
+        text.encode()
+    except UnicodeEncodeError:
+        raise argparse.ArgumentTypeError(f"{text!r} is no UTF-8") from None
+    return text
+
+
 def vlan(text: str) -> int:
     number = int(text)
     if not 0 <= number <= 4094:
@@ -132,8 +142,8 @@ def parse(arguments: Optional[Sequence[str]]) -> argparse.Namespace:
         epilog="The status is 0, 1 if the port has the VLANs that it had, 2 for a wrong command"
         " line, 3 if somebody has to look at the port.",
     )
-    parser.add_argument("switch", help="alias of the switch")
-    parser.add_argument("port", help="identifier of the port")
+    parser.add_argument("switch", type=name, help="alias of the switch")
+    parser.add_argument("port", type=name, help="identifier of the port")
     parser.add_argument("vlan", type=vlan, help="VLAN of untagged frames; 0 is none")
     parser.add_argument(
         "--trunk",
@@ -161,6 +171,8 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
     except (*FAILURES, NotChanged, NotRestored) as error:
         print(f"change_vlan: {error}", file=sys.stderr)
         return 3 if isinstance(error, NotRestored) else 1
+    # Nothing is left to undo, so where nobody reads, this ends quietly: the shell calls it 141.
+    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     print(f"{port} of {switch}: {before} {'would become' if options.dry_run else '->'} {wanted}")
     return 0
 

@@ -4,6 +4,8 @@
 Runs on any host; without a real one, the simulated host answers. Prints what it does.
 """
 
+import argparse
+
 import _libvswitch as vs
 
 SWITCH = "demo-switch"
@@ -53,6 +55,9 @@ def list_uplinks() -> None:
 
 
 def main() -> None:
+    argparse.ArgumentParser(
+        description="Creates a virtual switch, configures it, asks about it and removes it again."
+    ).parse_args()
     create_switch()
     set_mtu(9000)
     read_back()

@@ -7,6 +7,7 @@ As a table for people, or as JSON for programs. Changes nothing.
 import argparse
 import dataclasses
 import json
+import signal
 import sys
 from typing import Any, List, Optional, Sequence, Tuple
 
@@ -122,12 +123,23 @@ def table(switches: Sequence[Switch]) -> str:
     return "\n".join(line.rstrip() for line in lines)
 
 
+def name(text: str) -> str:
+    """The libraries take UTF-8, and what is typed in a shell may be any bytes."""
+    try:
+        text.encode()
+    except UnicodeEncodeError:
+        raise argparse.ArgumentTypeError(f"{text!r} is no UTF-8") from None
+    return text
+
+
 def main(arguments: Optional[Sequence[str]] = None) -> int:
     parser = argparse.ArgumentParser(
         description="Lists the switches of this host, their ports, uplinks and links.",
         epilog="The status is 0, 1 if the host refuses a query, 2 for a wrong command line.",
     )
-    parser.add_argument("switch", nargs="*", help="alias of a switch; all of them unless given")
+    parser.add_argument(
+        "switch", nargs="*", type=name, help="alias of a switch; all of them unless given"
+    )
     parser.add_argument("--json", action="store_true", help="write JSON instead of a table")
     options = parser.parse_args(arguments)
     try:
@@ -147,4 +159,6 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
 
 
 if __name__ == "__main__":
+    # Where nobody reads to the end, as in | head, this ends quietly: the shell calls it 141.
+    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     sys.exit(main())

@@ -106,8 +106,17 @@ def snap_length(text: str) -> int:
     return number
 
 
+def name(text: str) -> str:
+    """The libraries take UTF-8, and what is typed in a shell may be any bytes."""
+    try:
+        text.encode()
+    except UnicodeEncodeError:
+        raise argparse.ArgumentTypeError(f"{text!r} is no UTF-8") from None
+    return text
+
+
 def identifier(text: str) -> str:
-    if not 0 < len(text.encode()) < 32:
+    if not 0 < len(name(text).encode()) < 32:
         raise argparse.ArgumentTypeError(f"{text!r} does not have 1 to 31 bytes")
     return text
 
@@ -117,9 +126,9 @@ def parse(arguments: Optional[Sequence[str]]) -> argparse.Namespace:
         description="Mirrors what a port receives and sends to another port until Ctrl-C.",
         epilog="The status is 0, 1 if the host refuses something, 2 for a wrong command line.",
     )
-    parser.add_argument("switch", help="alias of the switch")
-    parser.add_argument("port", help="identifier of the port to look at")
-    parser.add_argument("to", help="identifier of the port that gets the copies")
+    parser.add_argument("switch", type=name, help="alias of the switch")
+    parser.add_argument("port", type=name, help="identifier of the port to look at")
+    parser.add_argument("to", type=name, help="identifier of the port that gets the copies")
     parser.add_argument(
         "--id",
         type=identifier,

@@ -4,6 +4,7 @@
 Needs no switch: everything here happens in the tool's own memory. Prints what it builds.
 """
 
+import argparse
 import ctypes
 from typing import Any, Dict, Iterator, Tuple, Union
 
@@ -134,6 +135,9 @@ def show_vxlan_header() -> None:
 
 
 def main() -> None:
+    argparse.ArgumentParser(
+        description="Builds records in its own memory and prints them; touches no switch."
+    ).parse_args()
     show_mirror_table()
     show_options()
     show_vxlan_header()

@@ -5,7 +5,9 @@ Works with the classes of libvswitch on a host of its own, in a state file that 
 program. What comes to a host from outside, simhostctl does: pulling a cable, a frame, a restart.
 """
 
+import argparse
 import os
+import shutil
 import subprocess
 import tempfile
 from typing import Dict, Iterator, Sequence, TypeVar
@@ -246,6 +248,14 @@ def persist() -> None:
 
 
 def main() -> None:
+    argparse.ArgumentParser(
+        description="Shows a simulated host of its own: ports, policies, links, mirrors, a restart."
+    ).parse_args()
+    if shutil.which("simhostctl") is None:
+        raise SystemExit(
+            "tour: needs simhostctl of the simulated host: ./dev demo, or the package"
+            " libvswitch-simhost"
+        )
     with tempfile.TemporaryDirectory() as folder:
         # Read at the first call; simhostctl finds the same host through it.
         os.environ["SIMHOST_STATE"] = os.path.join(folder, "host.db")

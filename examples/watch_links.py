@@ -5,6 +5,7 @@ The library announces no changes, so this asks for them again and again.
 """
 
 import argparse
+import signal
 import sys
 import time
 from typing import Dict, Iterator, Optional, Sequence
@@ -68,6 +69,15 @@ def watch(switch: str, every: float, duration: Optional[float]) -> None:
         before = now
 
 
+def name(text: str) -> str:
+    """The libraries take UTF-8, and what is typed in a shell may be any bytes."""
+    try:
+        text.encode()
+    except UnicodeEncodeError:
+        raise argparse.ArgumentTypeError(f"{text!r} is no UTF-8") from None
+    return text
+
+
 def seconds(text: str) -> float:
     number = float(text)
     if not 0 <= number <= 1e9:
@@ -80,7 +90,7 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
         description="Says which links of a switch are up, then each change of one, until Ctrl-C.",
         epilog="The status is 0, 1 if the host refuses a query, 2 for a wrong command line.",
     )
-    parser.add_argument("switch", help="alias of the switch")
+    parser.add_argument("switch", type=name, help="alias of the switch")
     parser.add_argument(
         "--every",
         type=seconds,
@@ -101,4 +111,6 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
 
 
 if __name__ == "__main__":
+    # Where nobody reads to the end, as in | head, this ends quietly: the shell calls it 141.
+    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     sys.exit(main())

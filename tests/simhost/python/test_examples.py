@@ -1,6 +1,7 @@
 """The programs of examples/ run to their end, say what they do, and leave nothing behind."""
 
 import os
+import signal
 import subprocess
 import sys
 from pathlib import Path
@@ -31,18 +32,76 @@ def test_a_show_runs(shared_host: SharedHost, name: str) -> None:
     assert len(done.stdout.splitlines()) > 10
 
 
-@pytest.mark.parametrize("name", TOOLS)
-def test_a_tool_explains_itself(name: str) -> None:
-    words: List[str] = [sys.executable, str(EXAMPLES / f"{name}.py"), "--help"]
-    done = subprocess.run(words, stdout=subprocess.PIPE, stderr=subprocess.PIPE, encoding="utf-8")
+def start(name: str, *words: str) -> "subprocess.CompletedProcess[str]":
+    command: List[str] = [sys.executable, str(EXAMPLES / f"{name}.py"), *words]
+    return subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, encoding="utf-8")
+
+
+@pytest.mark.parametrize("name", SHOWS + TOOLS)
+def test_an_example_explains_itself(name: str) -> None:
+    done = start(name, "--help")
     assert (done.returncode, done.stderr) == (0, "")
-    assert done.stdout.startswith(f"usage: {name}.py [-h]")
-    assert "The status is 0, 1 if " in done.stdout
+    usage, description = done.stdout.split("\n\n")[:2]
+    assert usage.startswith(f"usage: {name}.py [-h]")
+    assert description.endswith(".")
+    assert name in SHOWS or "The status is 0, 1 if " in done.stdout
 
 
-@pytest.mark.parametrize("name", TOOLS)
-def test_a_tool_refuses_a_wrong_command_line(name: str) -> None:
-    words: List[str] = [sys.executable, str(EXAMPLES / f"{name}.py"), "--no-such-option"]
-    done = subprocess.run(words, stdout=subprocess.PIPE, stderr=subprocess.PIPE, encoding="utf-8")
+@pytest.mark.parametrize("name", SHOWS + TOOLS)
+def test_an_example_refuses_a_wrong_command_line(name: str) -> None:
+    done = start(name, "--no-such-option")
     assert (done.returncode, done.stdout) == (2, "")
     assert done.stderr.startswith(f"usage: {name}.py [-h]")
+
+
+@pytest.mark.parametrize(
+    "name, words, argument",
+    [
+        ("change_vlan", ["vswitch0", "web-\udcff", "100"], "port"),
+        ("change_vlan", ["v\udcff", "web-1", "100"], "switch"),
+        ("inventory", ["v\udcff"], "switch"),
+        ("mirror_session", ["v\udcff", "web-1", "web-2"], "switch"),
+        ("mirror_session", ["vswitch0", "web-\udcff", "web-2"], "port"),
+        ("mirror_session", ["vswitch0", "web-1", "web-\udcff"], "to"),
+        ("mirror_session", ["vswitch0", "web-1", "web-2", "--id", "\udcff"], "--id"),
+        ("watch_links", ["v\udcff"], "switch"),
+    ],
+)
+def test_a_name_that_is_no_utf_8(name: str, words: List[str], argument: str) -> None:
+    (word,) = [word for word in words if "\udcff" in word]
+    done = start(name, *words)
+    assert (done.returncode, done.stdout) == (2, "")
+    assert done.stderr.endswith(f"{name}.py: error: argument {argument}: {word!r} is no UTF-8\n")
+
+
+@pytest.mark.parametrize(
+    "name, words",
+    [
+        ("change_vlan", ["vswitch0", "web-1", "100"]),
+        ("inventory", []),
+        ("inventory", ["--json"]),
+        ("watch_links", ["vswitch0"]),
+    ],
+)
+def test_a_reader_that_leaves_early(shared_host: SharedHost, name: str, words: List[str]) -> None:
+    done = subprocess.Popen(
+        [sys.executable, str(EXAMPLES / f"{name}.py"), *words],
+        env=shared_host.environment,
+        stdout=subprocess.PIPE,
+        stderr=subprocess.PIPE,
+    )
+    assert done.stdout is not None and done.stderr is not None
+    done.stdout.close()
+    assert done.stderr.read() == b""
+    done.stderr.close()
+    assert done.wait() == -signal.SIGPIPE
+
+
+def test_a_tour_without_its_guide(shared_host: SharedHost, tmp_path: Path) -> None:
+    shared_host.environment["PATH"] = str(tmp_path)
+    done = shared_host.run([sys.executable, EXAMPLES / "tour.py"])
+    assert (done.returncode, done.stdout) == (1, "")
+    assert done.stderr == (
+        "tour: needs simhostctl of the simulated host: ./dev demo, or the package"
+        " libvswitch-simhost\n"
+    )
