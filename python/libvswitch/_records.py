@@ -95,12 +95,15 @@ class Record(_Pointing):
             cls.__iter__ = None  # type: ignore[attr-defined]
         CLASSES[cls.__name__] = cls
 
-    def __setattr__(self, name: str, value: Any) -> None:
-        if name in self._fields:
-            self._require()
-        elif name not in ("this", "thisown"):
-            raise AttributeError(f"{type(self).__name__} has no field {name!r}")
-        object.__setattr__(self, name, value)
+    # A type checker that saw this would let every name pass.
+    if not typing.TYPE_CHECKING:
+
+        def __setattr__(self, name: str, value: Any) -> None:
+            if name in self._fields:
+                self._require()
+            elif name not in ("this", "thisown"):
+                raise AttributeError(f"{type(self).__name__} has no field {name!r}")
+            object.__setattr__(self, name, value)
 
     def __repr__(self) -> str:
         if not int(self):
@@ -274,8 +277,10 @@ class Array(_Pointing, typing.Sequence[T]):
         shown = [_shown(value) for value in self[:_PRINTED]]
         return f"[{', '.join(shown)}{', ...' if self._count > _PRINTED else ''}]"
 
-    def __setattr__(self, name: str, value: Any) -> None:
-        raise AttributeError("an array's attributes cannot be set; its elements can")
+    if not typing.TYPE_CHECKING:
+
+        def __setattr__(self, name: str, value: Any) -> None:
+            raise AttributeError("an array's attributes cannot be set; its elements can")
 
     def _require(self) -> None:
         if not int(self):

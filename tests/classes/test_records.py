@@ -86,9 +86,12 @@ def entry_named(name: Any) -> Any:
 
 
 def test_a_misspelled_field_is_an_error() -> None:
-    info = vs.VSInfo()
+    info: Any = made(vs.VSInfo)
     with pytest.raises(AttributeError, match="VSInfo has no field 'mut'"):
         info.mut = 9000
+    bits: Any = vs.VSVLANBitmap().bits
+    with pytest.raises(AttributeError, match="an array's attributes cannot be set"):
+        bits.first_bit = 1
 
 
 def test_a_truth_is_a_bool_and_takes_one() -> None:

@@ -102,6 +102,10 @@ WRONG = [
     'a, b, c = flat.VSQEX_GetUplinks("a")',
     "vs.QEX_OK = 1",
     'vs.VSVLANBitmap().bits[0] = "1"',
+    "vs.VSMACEntry().nonsense = 3",
+    "vs.VSUplinks(1).nonsense = 3",
+    "vs.VSVLANBitmap().bits.nonsense = 3",
+    "vs.Cell('int').nonsense = 3",
 ]
 
 
