@@ -1,6 +1,7 @@
 """What comes to a host from outside, through both fixtures, as calls of the host see it."""
 
 import doctest
+import re
 import sys
 from pathlib import Path
 from typing import Any, Callable, Iterator, List
@@ -183,6 +184,72 @@ def test_what_the_host_refuses_raises_its_reason(
     with pytest.raises(HostRefused) as raised:
         ask(this)
     assert str(raised.value) == reason
+
+
+PANIC = "panic is an exception and its text, as in (OSError, 'gone'), not "
+MISTAKES = [
+    (lambda host: host.link(3), TypeError("uplink is a str, not 3")),
+    (lambda host: host.link(None), TypeError("uplink is a str, not None")),
+    (lambda host: host.learn(b"s", LEARNED), TypeError("switch is a str, not b's'")),
+    (lambda host: host.learn("s", b"02:"), TypeError("mac is a str, not b'02:'")),
+    (lambda host: host.learn("s", LEARNED, b"p"), TypeError("port is a str, not b'p'")),
+    (lambda host: host.set_counter(1, "n", 1), TypeError("switch is a str, not 1")),
+    (lambda host: host.set_counter("s", 2, 1), TypeError("name is a str, not 2")),
+    (lambda host: host.set_counter("s", "n", 1, port=3), TypeError("port is a str, not 3")),
+    (lambda host: host.set_counter("s", "n", 1, session=4), TypeError("session is a str, not 4")),
+    (lambda host: host.clear_faults(b"c"), TypeError("call is a str, not b'c'")),
+    (lambda host: host.fault(b"c", status="QEX_BUSY"), TypeError("call is a str, not b'c'")),
+    (
+        lambda host: host.fault("VSDVS_SetMTU", times=0),
+        ValueError("a fault of VSDVS_SetMTU takes a status, a panic or a delay"),
+    ),
+    (
+        lambda host: host.fault("VSDVS_SetMTU", panic=OSError),
+        TypeError(f"{PANIC}<class 'OSError'>"),
+    ),
+    (lambda host: host.fault("VSDVS_SetMTU", panic="no"), TypeError(f"{PANIC}'no'")),
+    (
+        lambda host: host.fault("VSDVS_SetMTU", panic=(OSError,)),
+        TypeError(f"{PANIC}(<class 'OSError'>,)"),
+    ),
+    (
+        lambda host: host.fault("VSDVS_SetMTU", panic=(int, "gone")),
+        TypeError(f"{PANIC}(<class 'int'>, 'gone')"),
+    ),
+    (
+        lambda host: host.fault("VSDVS_SetMTU", panic=("OSError", b"gone")),
+        TypeError(f"{PANIC}('OSError', b'gone')"),
+    ),
+]
+
+
+def raises(error: Exception) -> Any:
+    return pytest.raises(type(error), match=f"^{re.escape(str(error))}$")
+
+
+@both
+@pytest.mark.parametrize("ask, error", MISTAKES, ids=[str(error) for _, error in MISTAKES])
+def test_a_mistake_is_told_before_the_host_is_asked(
+    this: SimulatedHost, ask: Callable[[Any], None], error: Exception
+) -> None:
+    with raises(error):
+        ask(this)
+    assert this.describe()["faults"] == []
+
+
+@pytest.mark.parametrize(
+    "command, error",
+    [
+        ("false", TypeError("a command is a list of words, not 'false'")),
+        (b"false", TypeError("a command is a list of words, not b'false'")),
+        (Path("false"), TypeError("a command is a list of words, not PosixPath('false')")),
+        ([], ValueError("a command has at least one word")),
+        (["echo", b"1"], TypeError("a word of a command is a str, not b'1'")),
+    ],
+)
+def test_what_is_no_command(shared_host: SharedHost, command: Any, error: Exception) -> None:
+    with raises(error):
+        shared_host.run(command)
 
 
 @both

@@ -159,7 +159,7 @@ class SimulatedHost:
 
         >>> host.link("nic4").down()
         """
-        return Link(self._control, uplink)
+        return Link(self._control, _text("uplink", uplink))
 
     def learn(
         self, switch: str, mac: str, port: Optional[str] = None, *, vlan: int = 0, vni: int = 0
@@ -168,7 +168,8 @@ class SimulatedHost:
 
         >>> host.learn("vswitch0", "02:00:00:00:0a:01", "web-1", vlan=10)
         """
-        self._control.learn(switch, mac, port, vlan, vni)
+        place = _text("switch", switch), _text("mac", mac), _optional_text("port", port)
+        self._control.learn(*place, vlan, vni)
 
     def set_counter(
         self,
@@ -183,7 +184,8 @@ class SimulatedHost:
 
         >>> host.set_counter("vswitch0", "txErrors", 3)
         """
-        self._control.set_counter(switch, name, value, port, session)
+        optional = _optional_text("port", port), _optional_text("session", session)
+        self._control.set_counter(_text("switch", switch), _text("name", name), value, *optional)
 
     def fault(
         self,
@@ -204,12 +206,13 @@ class SimulatedHost:
         >>> host.fault("VSDVS_SetMTU", status="QEX_BUSY")
         >>> host.fault("VSDVS_SetMTU", nth=2, panic=(OSError, "the device is gone"))
         """
-        fault: Dict[str, Any] = {"call": call, "nth": nth, "times": times}
+        if status is None and panic is None and not delay:
+            raise ValueError(f"a fault of {call} takes a status, a panic or a delay")
+        fault: Dict[str, Any] = {"call": _text("call", call), "nth": nth, "times": times}
         if status is not None:
             fault["status"] = status if isinstance(status, str) else _status_name(status)
         if panic is not None:
-            kind, fault["message"] = panic
-            fault["exception"] = kind if isinstance(kind, str) else kind.__name__
+            fault["exception"], fault["message"] = _exception(panic)
         if delay:
             fault["delay"] = round(delay, 3)
         self.apply({"faults": [fault]})
@@ -220,7 +223,7 @@ class SimulatedHost:
         >>> host.fault("VSDVS_SetMTU", times=0, status="QEX_BUSY")
         >>> host.clear_faults("VSDVS_SetMTU")
         """
-        self._control.clear_faults(call)
+        self._control.clear_faults(_optional_text("call", call))
 
 
 class Host(SimulatedHost):
@@ -278,7 +281,7 @@ class SharedHost(SimulatedHost):
         """
         __tracebackhide__ = True  # pytest then shows the line of the test
         done = subprocess.run(
-            [os.fspath(word) for word in command],
+            _words(command),
             env={**self.environment, "SIMHOST_LEDGER": "1"},
             input=input,
             stdout=subprocess.PIPE,
@@ -289,6 +292,36 @@ class SharedHost(SimulatedHost):
         if left and not self._may_leave_memory:
             raise MemoryLeftOut(f"the command {' '.join(done.args)}", left)
         return done
+
+
+def _text(name: str, value: str) -> str:
+    if not isinstance(value, str):
+        raise TypeError(f"{name} is a str, not {value!r}")
+    return value
+
+
+def _optional_text(name: str, value: Optional[str]) -> Optional[str]:
+    return None if value is None else _text(name, value)
+
+
+def _exception(panic: Tuple[Union[str, Type[BaseException]], str]) -> Tuple[str, str]:
+    """The name of an exception and its text."""
+    if isinstance(panic, tuple) and len(panic) == 2:
+        kind, text = panic
+        if isinstance(kind, type) and issubclass(kind, BaseException):
+            kind = kind.__name__
+        if isinstance(kind, str) and isinstance(text, str):
+            return kind, text
+    raise TypeError(f"panic is an exception and its text, as in (OSError, 'gone'), not {panic!r}")
+
+
+def _words(command: Sequence[Union[str, "os.PathLike[str]"]]) -> List[str]:
+    if isinstance(command, (str, bytes, os.PathLike)):
+        raise TypeError(f"a command is a list of words, not {command!r}")
+    words = [_text("a word of a command", os.fspath(word)) for word in command]
+    if not words:
+        raise ValueError("a command has at least one word")
+    return words
 
 
 def _milliseconds(seconds: float) -> int:
