@@ -75,7 +75,9 @@ class owned(typing.Generic[T]):
     Takes the result of a call, or a record, an array, a cell or a pointer of one, and gives what
     the library allocated back at the end of the block, each once, whatever happens in the block.
     Using it afterwards raises ValueError. The door is that of the call which handed it out, unless
-    `door` names another or is a function. What the block gave back itself is left alone.
+    `door` names another or is a function. What the block gave back itself is left alone, and so is
+    None, which a call answers where it had nothing to hand out. Whatever cannot hold memory of the
+    library is a TypeError: a status alone, a pointer object that no class stands for.
     """
 
     def __init__(self, result: T, door: Optional[Door] = None) -> None:
@@ -111,9 +113,14 @@ class owned(typing.Generic[T]):
         return free
 
 
-def _pointing(result: Any) -> typing.Iterator[Any]:
+def _pointing(result: Any, is_output: bool = False) -> typing.Iterator[Any]:
     if isinstance(result, (tuple, list)):
         for one in result:
-            yield from _pointing(one)
+            yield from _pointing(one, is_output=True)
     elif isinstance(result, _records._Pointing):
         yield from result._handed_out()
+    elif result is not None and not (is_output and isinstance(result, (int, str))):
+        raise TypeError(
+            "owned takes what a call answered, a record, an array, a cell or a pointer, "
+            f"not {_name(result)}"
+        )

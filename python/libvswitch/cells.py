@@ -104,8 +104,7 @@ class Cell(_records._Pointing):
 
     def read(self, length: int) -> bytes:
         """So many bytes of what a pointer in this cell points to."""
-        if self._is_scalar:
-            raise TypeError(f"a {self.type} points to nothing")
+        self._require_pointers()
         held = self._memory[0]
         if not held:
             raise ValueError("the pointer is null")
@@ -118,8 +117,12 @@ class Cell(_records._Pointing):
         return f"Cell({self.type!r}, {held!r})"
 
     def _handed_out(self) -> List[_records._Pointing]:
-        held = None if self._is_scalar else self.value
-        return [] if held is None else [held]
+        self._require_pointers()
+        return [held for held in self if held is not None]
+
+    def _require_pointers(self) -> None:
+        if self._is_scalar:
+            raise TypeError(f"a {self.type} points to nothing")
 
     def _target(self) -> str:
         return self.type[:-1].strip() if self.type.endswith("*") else ""

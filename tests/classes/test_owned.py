@@ -200,3 +200,38 @@ def test_an_array_of_the_callers_goes_through_a_function() -> None:
     with vs.owned(vs.new_vidrangeArray(2), vs.delete_vidrangeArray) as ranges:
         assert len(ranges) == 2
     assert repr(ranges) == "<array that is gone>"
+
+
+@pytest.mark.parametrize("given", [5, 0, True, "tour", b"", 1.5, {}, object, (0, 1.5), [{}]])
+def test_what_can_hold_no_memory_is_no_result(given: Any) -> None:
+    odd = given[-1] if isinstance(given, (tuple, list)) else given
+    with pytest.raises(TypeError) as raised:
+        vs.owned(given)
+    assert str(raised.value) == (
+        "owned takes what a call answered, a record, an array, a cell or a pointer, "
+        f"not {type(odd).__name__}"
+    )
+
+
+def test_a_pointer_object_without_a_class_is_no_result(switch: str) -> None:
+    handle = vs.DVSState_SwitchFindByAlias(switch)
+    assert handle is not None
+    with pytest.raises(TypeError, match="not SwigPyObject$"):
+        vs.owned(handle, "DVSQEX_DataFree")
+
+
+def test_a_cell_of_numbers_holds_no_memory() -> None:
+    doors: List[Callable[[Any], Any]] = [vs.owned, vs.VSQEX_FreeMemory]
+    for take in doors:
+        with pytest.raises(TypeError, match="^a int points to nothing$"):
+            take(vs.Cell("int", 5))
+
+
+def test_null_is_nothing_to_give_back(switch: str) -> None:
+    with vs.owned(None) as nothing:
+        assert nothing is None
+    with vs.owned(vs.Cell("VSLAGTable *")) as cell:
+        assert cell.value is None
+    # Numbers and texts beside memory are outputs.
+    with vs.owned(vs.VSDVS_GetMcastFilterMode(switch)) as (status, mode):
+        assert (status, mode) == (vs.QEX_OK, vs.VS_MCAST_FILTER_MODE_LEGACY)
