@@ -437,12 +437,18 @@ def cells(stubs: Stubs) -> str:
     handles = [
         name for name in known.typedefs if known.resolve(Type((), name)) == Type(("p",), "void")
     ]
-    any_pointer = "Optional[_flat._Pointer]"
+    any_pointer = one_or_several("_flat._Pointer")
     text += cell_form(f"Optional[_flat._VoidPointer], {handle}", ["void *", *handles], any_pointer)
     for name in known.records_behind_pointers():
-        record, pointer = f"Optional[_classes.{name}]", stubs.pointer(Type(("p", "p"), name))
-        text += cell_form(f"{record}, {pointer}", [f"{name} *"], record)
+        record, pointer = f"_classes.{name}", stubs.pointer(Type(("p", "p"), name))
+        held = f"Optional[{record}], {pointer}"
+        text += cell_form(held, [f"{name} *"], one_or_several(record))
     return _CELLS_HEAD.replace("{callback}", callback) + text
+
+
+def one_or_several(pointer: str) -> str:
+    """What a cell of pointers starts with."""
+    return f"Union[None, {pointer}, Iterable[Optional[{pointer}]]]"
 
 
 def cell_form(parameters: str, spellings: List[str], value: str) -> str:

@@ -7,7 +7,7 @@ from typing import Any, ClassVar, Dict, List, Optional, Tuple, Type, TypeVar, ov
 
 from libvswitch import _layout, _memory, _pointers
 
-__all__ = ["Array", "CLASSES", "Record", "Table", "end", "place_in", "record_at", "wrap"]
+__all__ = ["Array", "CLASSES", "Record", "Table", "end", "place_in", "record_at", "wanted", "wrap"]
 
 T = TypeVar("T")
 
@@ -57,9 +57,8 @@ def end(pointing: Any) -> None:
     for view in list(pointing.__dict__.get("_views", {}).values()):
         if view() is not None:
             end(view())
-    cell = pointing.__dict__.get("_cell")
-    if cell is not None:
-        cell.value = None
+    for cell in list(pointing.__dict__.get("_cells", ())):
+        cell._forget(pointing)
     _pointers.clear(pointing)
 
 
@@ -244,10 +243,7 @@ class Array(_Pointing, typing.Sequence[T]):
                 raise ValueError(f"{self._inner} bytes are wanted, not {len(value)}")
             ctypes.memmove(address, bytes(value), self._inner)
         elif self._element in CLASSES:
-            if not isinstance(value, CLASSES[self._element]):
-                raise TypeError(f"a {self._element} is wanted, not {type(value).__name__}")
-            value._require()
-            ctypes.memmove(address, int(value), self.size)
+            ctypes.memmove(address, int(wanted(self._element, value)), self.size)
         else:
             number = _memory.checked(self._element, value)
             _memory.scalar(self._element).from_address(address).value = number
@@ -302,6 +298,14 @@ def wrap(name: str, pointer: Any) -> Record:
     made = CLASSES[name].__new__(CLASSES[name])
     made.__dict__["this"] = pointer
     return made
+
+
+def wanted(name: str, value: Any) -> Record:
+    """The value, which must be a record of this name and not be gone."""
+    if not isinstance(value, CLASSES[name]):
+        raise TypeError(f"a {name} is wanted, not {type(value).__name__}")
+    value._require()
+    return value
 
 
 def _shown(value: Any) -> str:

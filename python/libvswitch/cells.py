@@ -1,6 +1,7 @@
 """Cells: memory of one C type for calls that read or fill it, and functions that C may call."""
 
 import ctypes
+import weakref
 from typing import Any, Callable, Dict, Iterable, List, Optional, Union
 
 from libvswitch import _layout, _memory, _ownership, _pointers, _records
@@ -42,8 +43,9 @@ class Cell(_records._Pointing):
         many = isinstance(value, Iterable) and not isinstance(value, _records._Pointing)
         values: List[Any] = list(value) if many else [value]  # type: ignore[arg-type]
         self._is_single = not many
-        # What pointers here read as: the same object as long as they stay the same.
-        self._found: Dict[int, Any] = {}
+        # What pointers here read as: the same object as long as they stay the same. It is kept
+        # alive, and where it was put in, what it points to.
+        self._seen: Dict[int, Any] = {}
         kind: Any = _memory.scalar(self.type) if self._is_scalar else ctypes.c_void_p
         self._memory = (kind * max(len(values), 1))()
         self.pointer = Pointer(ctypes.addressof(self._memory), spelling, self)
@@ -75,22 +77,29 @@ class Cell(_records._Pointing):
             return held
         if not held:
             return None
-        found = self._found.get(index)
-        if found is None or int(found) != held:
-            if self._target() in _records.CLASSES:
-                found = _records.record_at(self._target(), held)
-            else:
-                found = Pointer(held, "void *", None)
-            found.__dict__["_cell"] = self
-            self._found[index] = found
-        _ownership.hand_out(found, self.door)
-        return found
+        if index not in self._seen or int(self._seen[index]) != held:
+            target = self._target()
+            found = _records.record_at(target, held) if target != "void" else _plain(held)
+            _ownership.hand_out(found, self.door)
+            self._see(index, found)
+        return self._seen[index]
 
     def __setitem__(self, index: int, value: Any) -> None:
         if self._is_scalar:
             self._memory[index] = _memory.checked(self.type, value)
+        elif value is None:
+            self._memory[index] = None
+            self._seen.pop(index, None)
         else:
-            self._memory[index] = None if value is None else _pointers.address_of(value)
+            pointing = self._pointing(value)
+            self._memory[index] = int(pointing)
+            self._see(index, pointing)
+
+    def _forget(self, gone: _records._Pointing) -> None:
+        """Makes the pointers null that read as an object whose memory goes back."""
+        for index in [index for index, seen in self._seen.items() if seen is gone]:
+            if self._memory[index] == int(gone):
+                self[index] = None
 
     def __len__(self) -> int:
         return self._length
@@ -124,16 +133,33 @@ class Cell(_records._Pointing):
         if self._is_scalar:
             raise TypeError(f"a {self.type} points to nothing")
 
+    def _pointing(self, value: Any) -> _records._Pointing:
+        """What a pointer reads as that is set to this value."""
+        if self._target() != "void":
+            return _records.wanted(self._target(), value)
+        if isinstance(value, (_records.Record, _records.Array)):
+            value._require()
+        if isinstance(value, Pointer):
+            return value
+        view: _records._Pointing = _records.place_in(
+            value, _plain(_pointers.address_of(value), value)
+        )
+        return view
+
+    def _see(self, index: int, pointing: _records._Pointing) -> None:
+        pointing.__dict__.setdefault("_cells", weakref.WeakSet()).add(self)
+        self._seen[index] = pointing
+
     def _target(self) -> str:
-        return self.type[:-1].strip() if self.type.endswith("*") else ""
+        """What pointers here point to: a record, or nothing that C knows."""
+        is_named = self.type in _layout.POINTERS
+        return "void" if is_named else self.type.rpartition("*")[0].strip()
 
     def _spelled_pointer(self) -> str:
         """How the runtime spells a pointer to this type: without the names that are one in C."""
         if self._is_scalar:
             return f"{_layout.SCALARS.get(self.type, self.type)} *"
-        if self.type in _layout.POINTERS or self._target() == "void":
-            return "void **"
-        if self._target() in _layout.RECORDS_BEHIND_POINTERS:
+        if self._target() in ("void", *_layout.RECORDS_BEHIND_POINTERS):
             return f"{self._target()} **"
         records = ", ".join(f"{name} *" for name in _layout.RECORDS_BEHIND_POINTERS)
         raise TypeError(
@@ -169,7 +195,7 @@ class Callback(_records._Pointing):
 
     def _call(self, item: Optional[int], context: Optional[int]) -> int:
         try:
-            answer = self._function(_handle(item), _handle(context))
+            answer = self._function(*(_plain(one) if one else None for one in (item, context)))
         except BaseException as raised:  # nothing may leave through the library's frames
             self._raised = raised
             return 0
@@ -181,5 +207,5 @@ class Callback(_records._Pointing):
             raise raised
 
 
-def _handle(address: Optional[int]) -> Optional[Pointer]:
-    return Pointer(address, "void *", None) if address else None
+def _plain(address: int, owner: object = None) -> Pointer:
+    return Pointer(address, "void *", owner)

@@ -1,15 +1,17 @@
 """Cells make every call usable: those that fill or read what a pointer points to, and walks."""
 
 import ctypes
+import gc
 import os
 import re
 import sys
 from pathlib import Path
 from typing import Any, List
 
+import _libvswitch
 import libvswitch as vs
 import pytest
-from libvswitch import Cell
+from libvswitch import Cell, _pointers
 
 
 def test_a_number_that_a_call_fills(switch: str) -> None:
@@ -245,3 +247,86 @@ def test_a_pointer_keeps_its_cell_alive(switch: str) -> None:
     cells = [Cell("qex_uint32", 0) for _ in range(500)]
     values = [int.from_bytes(ctypes.string_at(int(one), 4), "little") for one in pointers]
     assert values == list(range(500)) and len(cells) == 500
+
+
+def test_a_pointer_to_a_record_takes_no_other_record() -> None:
+    wrong: List[Any] = [vs.VSInfo(), vs.VSUplinks(1), Cell("int"), 5, "text"]
+    for value in wrong:
+        text = f"^a VSLAGTable is wanted, not {type(value).__name__}$"
+        with pytest.raises(TypeError, match=text):
+            Cell("VSLAGTable *", value)
+        cell: Any = Cell("VSLAGTable *")
+        with pytest.raises(TypeError, match=text):
+            cell.value = value
+        assert cell.value is None and bytes(cell) == bytes(8)
+
+
+def test_a_plain_pointer_takes_what_has_a_place() -> None:
+    wrong: List[Any] = [5, "text", 1.5, object()]
+    for value in wrong:
+        cell: Any = Cell("void *")
+        with pytest.raises(TypeError, match="^neither a pointer object nor a record$"):
+            cell.value = value
+        assert cell.value is None
+    info, numbers = vs.VSInfo(), Cell("int", [1, 2])
+    bits: Any = vs.VSVLANBitmap().bits
+    for value in (info, numbers, numbers.pointer, bits, _libvswitch.new_VSStats()):
+        cell = Cell("void *", value)
+        assert int(cell.value) == int(value)
+        assert int.from_bytes(bytes(cell), sys.byteorder) == int(value)
+
+
+def test_what_was_put_in_stays_alive() -> None:
+    def stats(number: int) -> Any:
+        info = vs.VSPortInfo()
+        info.stats.pktsTx = number
+        return info
+
+    def table(number: int) -> Any:
+        lags = vs.VSLAGTable()
+        lags.numLAGs = number
+        return lags
+
+    untyped: List[Any] = [Cell("void *", stats(number)) for number in range(200)]
+    typed = [Cell("VSLAGTable *", table(number)) for number in range(200)]
+    # And what was read from a cell stays when that is gone.
+    kept = [cell.value for cell in untyped[:100]]
+    del untyped[:100]
+    gc.collect()
+    rubbish = [(vs.VSPortInfo(), vs.VSLAGTable()) for _ in range(400)]
+    offset = int(rubbish[0][0].stats) - int(rubbish[0][0])
+    pointers = [*kept, *(cell.value for cell in untyped)]
+    sent = [_libvswitch.VSStats_pktsTx_get(at(int(one) + offset)) for one in pointers]
+    assert sent == list(range(200))
+    assert [cell.value.numLAGs for cell in typed if cell.value] == list(range(200))
+
+
+def at(address: int) -> Any:
+    return _pointers.pointer_object(address, "VSStats *")
+
+
+def test_what_was_put_in_reads_back_and_ends_with_its_memory(switch: str) -> None:
+    lags: Any = vs.VSLAGTable()
+    cell = Cell("VSLAGTable *", lags)
+    assert cell.value is lags
+    # It is the caller's own, whatever call the cell went through.
+    with pytest.raises(ValueError, match="name the door"):
+        vs.owned(cell)
+
+    _, uplinks = vs.VSQEX_GetUplinks(switch)
+    plain: Any = Cell("void *", [None, uplinks])
+    with pytest.raises(ValueError, match="lies in memory of another object"):
+        vs.VSQEX_FreeMemory(plain)
+    vs.VSQEX_FreeMemory(uplinks)
+    assert [*plain] == [None, None] and bytes(plain) == bytes(16)
+    with pytest.raises(ValueError, match="^this VSUplinks is gone: its memory was given back$"):
+        plain.value = uplinks
+
+
+def test_a_pointer_that_a_call_changes_is_another(switch: str) -> None:
+    mine = vs.VSLAGTable()
+    cell = Cell("VSLAGTable *", mine)
+    assert vs.VSQEX_GetLAGTable(switch, cell.pointer) == vs.QEX_OK
+    with vs.owned(cell) as given:
+        assert given.value is not None and given.value is not mine
+    assert cell.value is None and mine.numLAGs == 0

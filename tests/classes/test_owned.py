@@ -235,3 +235,18 @@ def test_null_is_nothing_to_give_back(switch: str) -> None:
     # Numbers and texts beside memory are outputs.
     with vs.owned(vs.VSDVS_GetMcastFilterMode(switch)) as (status, mode):
         assert (status, mode) == (vs.QEX_OK, vs.VS_MCAST_FILTER_MODE_LEGACY)
+
+
+def test_all_pointers_of_a_cell_go_back(switch: str) -> None:
+    lags = vs.Cell("VSLAGTable *", [None, None])
+    # A call fills the first of them.
+    for index in (1, 0):
+        assert vs.VSQEX_GetLAGTable(switch, lags.pointer) == vs.QEX_OK
+        if index:
+            lags[index] = lags.value
+            lags.value = None
+    with vs.owned(lags):
+        tables = [*lags]
+        assert len({int(table) for table in tables if table is not None}) == 2
+    assert [*lags] == [None, None]
+    assert [repr(table) for table in tables] == ["<VSLAGTable that is gone>"] * 2

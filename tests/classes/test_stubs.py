@@ -72,6 +72,8 @@ value: int = mtu.value
 ok: int = vs.VSDVS_GetMTU("a", mtu.pointer)
 lags = vs.Cell("VSLAGTable *")
 table: Optional[vs.VSLAGTable] = lags.value
+several = vs.Cell("VSLAGTable *", [vs.VSLAGTable(), None])
+one: Optional[vs.VSLAGTable] = several[0]
 bits: List[int] = vs.VSVLANBitmap().bits[0:3]
 truth: bool = vs.VSMACEntry().aging
 with vs.owned(vs.VSQEX_GetUplinks("a")) as (_, found):
@@ -102,6 +104,8 @@ WRONG = [
     'a, b, c = flat.VSQEX_GetUplinks("a")',
     "vs.QEX_OK = 1",
     'vs.VSVLANBitmap().bits[0] = "1"',
+    'vs.Cell("VSLAGTable *", vs.VSInfo())',
+    'vs.Cell("VSLAGTable *", [vs.VSInfo()])',
     "vs.VSMACEntry().nonsense = 3",
     "vs.VSUplinks(1).nonsense = 3",
     "vs.VSVLANBitmap().bits.nonsense = 3",
