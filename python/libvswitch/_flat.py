@@ -94,10 +94,7 @@ def _bounded(access: _Function, length: Callable[[Any], int]) -> _Function:
     """An access by index that raises, and takes negative indexes, as sequences do."""
 
     def at(record: Any, index: int, *value: Any) -> Any:
-        count = length(record)
-        if not -count <= index < count:
-            raise IndexError(f"index {index} is not within {count} elements")
-        return access(record, index % count, *value)
+        return access(record, _memory.position(index, length(record)), *value)
 
     return at
 
@@ -106,8 +103,7 @@ def _zeroed(make: _Function, write_count: _Function, header: int, element: int) 
     """A constructor of a list with room for all its elements, empty texts at first."""
 
     def new(size: int) -> Any:
-        if size < 0:
-            raise ValueError("a list has no negative length")
+        size = _memory.length(size)
         needed = header + size * element
         # The flat constructor makes room for 32 bytes an entry at the least.
         made = make(max(size, -(-needed // 32)))

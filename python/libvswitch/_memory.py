@@ -1,6 +1,7 @@
 """Memory behind pointer objects: its addresses, and the values of C types in it."""
 
 import ctypes
+import operator
 from typing import Any, Dict, Type
 
 from libvswitch import _layout, _pointers
@@ -35,10 +36,33 @@ def checked(name: str, value: Any) -> int:
     if isinstance(value, bytes) and len(value) == 1:
         value = value[0]
     if not isinstance(value, int):
-        raise TypeError(f"a {name} is an int, not {type(value).__name__}")
+        raise TypeError(f"{name} takes an int, not {type(value).__name__}")
     if scalar(name)(value).value != value:
         raise OverflowError(f"{value} does not fit into a {name}")
     return value
+
+
+def position(index: Any, count: int) -> int:
+    """Which of so many elements an index means; a negative one counts from the end."""
+    at = _whole(index, "indices must be integers")
+    if not -count <= at < count:
+        raise IndexError(f"index {at} is not within {count} elements")
+    return at % count
+
+
+def length(given: Any) -> int:
+    """A number of elements that a caller names."""
+    count = _whole(given, "a length must be an integer")
+    if count < 0:
+        raise ValueError("a length is not negative")
+    return count
+
+
+def _whole(given: Any, rule: str) -> int:
+    try:
+        return operator.index(given)
+    except TypeError:
+        raise TypeError(f"{rule}, not {type(given).__name__}") from None
 
 
 def text_at(address: int, size: int) -> str:
@@ -47,9 +71,21 @@ def text_at(address: int, size: int) -> str:
     return held.split(b"\0", 1)[0].decode("utf-8", "surrogateescape")
 
 
-def put_text(address: int, size: int, text: str) -> None:
+def put_text(address: int, size: int, text: Any) -> None:
     """Text, NUL and zeros to the end of an array of chars; ValueError if it does not fit."""
+    if not isinstance(text, str):
+        raise TypeError(f"a text is a str, not {type(text).__name__}")
     held = text.encode("utf-8", "surrogateescape")
     if len(held) >= size:
         raise ValueError(f"{text!r} takes more than {size - 1} bytes")
     ctypes.memmove(address, held.ljust(size, b"\0"), size)
+
+
+def put_bytes(address: int, size: int, given: Any) -> None:
+    """As many bytes as there is room for."""
+    if not isinstance(given, (bytes, bytearray, memoryview)):
+        raise TypeError(f"bytes are wanted, not {type(given).__name__}")
+    held = bytes(given)
+    if len(held) != size:
+        raise ValueError(f"{size} bytes are wanted, not {len(held)}")
+    ctypes.memmove(address, held, size)

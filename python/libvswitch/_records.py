@@ -181,10 +181,9 @@ class Array(_Pointing, typing.Sequence[T]):
 
     def first(self, count: int) -> "Array[T]":
         """The same array with a length that the caller knows."""
-        if count < 0:
-            raise ValueError("a length is not negative")
         self._require()
-        shorter: Array[T] = Array(self.this, self._element, count, self._inner, self._address)
+        known = _memory.length(count)
+        shorter: Array[T] = Array(self.this, self._element, known, self._inner, self._address)
         place_in(self, shorter)
         return shorter
 
@@ -239,9 +238,7 @@ class Array(_Pointing, typing.Sequence[T]):
         if self._inner and self._element == "char":
             _memory.put_text(address, self._inner, value)
         elif self._inner:
-            if len(value) != self._inner:
-                raise ValueError(f"{self._inner} bytes are wanted, not {len(value)}")
-            ctypes.memmove(address, bytes(value), self._inner)
+            _memory.put_bytes(address, self._inner, value)
         elif self._element in CLASSES:
             ctypes.memmove(address, int(wanted(self._element, value)), self.size)
         else:
@@ -283,10 +280,7 @@ class Array(_Pointing, typing.Sequence[T]):
             raise ValueError("this array is gone: its memory was given back")
 
     def _address_of(self, index: int) -> int:
-        count = len(self)
-        if not -count <= index < count:
-            raise IndexError(f"index {index} is not within {count} elements")
-        return self._address + (index % count) * self.size
+        return self._address + _memory.position(index, len(self)) * self.size
 
 
 def record_at(name: str, address: int) -> Record:

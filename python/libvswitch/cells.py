@@ -36,6 +36,8 @@ class Cell(_records._Pointing):
     def __init__(
         self, type: str, value: Union[None, int, bytes, Iterable[int], _records.Record, Any] = None
     ) -> None:
+        if not isinstance(type, str):
+            raise TypeError(f"a cell's type is a str, not {type.__class__.__name__}")
         self.type = type.strip()
         self.door: Optional[str] = None
         self._is_scalar = _memory.is_scalar(self.type)
@@ -47,14 +49,13 @@ class Cell(_records._Pointing):
         # alive, and where it was put in, what it points to.
         self._seen: Dict[int, Any] = {}
         kind: Any = _memory.scalar(self.type) if self._is_scalar else ctypes.c_void_p
-        self._memory = (kind * max(len(values), 1))()
+        self._memory = (kind * len(values))()
         self.pointer = Pointer(ctypes.addressof(self._memory), spelling, self)
         # The runtime then takes a cell for its pointer.
         self.this = self.pointer.this
         for index, one in enumerate(values):
             if one is not None:
                 self[index] = one
-        self._length = len(values)
 
     @property
     def value(self) -> Any:
@@ -70,8 +71,7 @@ class Cell(_records._Pointing):
         self[0] = value
 
     def __getitem__(self, index: int) -> Any:
-        if not 0 <= index < len(self._memory):
-            raise IndexError(f"index {index} is not within {len(self._memory)} values")
+        index = _memory.position(index, len(self))
         held = self._memory[index]
         if self._is_scalar:
             return held
@@ -85,6 +85,7 @@ class Cell(_records._Pointing):
         return self._seen[index]
 
     def __setitem__(self, index: int, value: Any) -> None:
+        index = _memory.position(index, len(self))
         if self._is_scalar:
             self._memory[index] = _memory.checked(self.type, value)
         elif value is None:
@@ -102,7 +103,7 @@ class Cell(_records._Pointing):
                 self[index] = None
 
     def __len__(self) -> int:
-        return self._length
+        return len(self._memory)
 
     def __iter__(self) -> Any:
         return (self[index] for index in range(len(self)))
@@ -114,12 +115,11 @@ class Cell(_records._Pointing):
     def read(self, length: int) -> bytes:
         """So many bytes of what a pointer in this cell points to."""
         self._require_pointers()
-        held = self._memory[0]
+        count = _memory.length(length)
+        held = self._memory[_memory.position(0, len(self))]
         if not held:
             raise ValueError("the pointer is null")
-        if length < 0:
-            raise ValueError("a length is not negative")
-        return ctypes.string_at(held, length)
+        return ctypes.string_at(held, count)
 
     def __repr__(self) -> str:
         held = self.value if self._is_single else list(self)
@@ -186,6 +186,8 @@ class Callback(_records._Pointing):
     _TYPE = ctypes.CFUNCTYPE(ctypes.c_byte, ctypes.c_void_p, ctypes.c_void_p)
 
     def __init__(self, function: Callable[[Any, Any], Any]) -> None:
+        if not callable(function):
+            raise TypeError(f"a callback is a function, not {type(function).__name__}")
         self._function = function
         self._raised: Optional[BaseException] = None
         self._thunk = self._TYPE(self._call)

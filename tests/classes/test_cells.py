@@ -330,3 +330,55 @@ def test_a_pointer_that_a_call_changes_is_another(switch: str) -> None:
     with vs.owned(cell) as given:
         assert given.value is not None and given.value is not mine
     assert cell.value is None and mine.numLAGs == 0
+
+
+def test_indexes_count_from_the_end_too() -> None:
+    numbers = Cell("int", [1, 2, 3])
+    numbers[-1] = 9
+    numbers[-3] = 7
+    assert [*numbers] == [7, 2, 9] == [numbers[-3], numbers[-2], numbers[-1]]
+    for index in (3, -4, 2**40):
+        with pytest.raises(IndexError, match=f"^index {index} is not within 3 elements$"):
+            numbers[index]
+        with pytest.raises(IndexError, match=f"^index {index} is not within 3 elements$"):
+            numbers[index] = 1
+    tables = Cell("VSLAGTable *", [None, None])
+    tables[-1] = vs.VSLAGTable()
+    assert tables[1] is tables[-1] is not None and tables[0] is None
+
+
+def test_a_cell_of_nothing_has_nothing() -> None:
+    cells: List[Any] = [Cell("int", []), Cell("char", b""), Cell("void *", [])]
+    for cell in cells:
+        assert len(cell) == 0 and [*cell] == [] and bytes(cell) == b""
+        assert int(cell.pointer)
+        with pytest.raises(IndexError, match="^index 0 is not within 0 elements$"):
+            cell.value
+        with pytest.raises(IndexError, match="^index 0 is not within 0 elements$"):
+            cell.value = None
+    assert repr(cells[0]) == "Cell('int', [])"
+    with pytest.raises(IndexError, match="^index 0 is not within 0 elements$"):
+        cells[2].read(1)
+
+
+@pytest.mark.parametrize("type", [None, 5, b"int", int])
+def test_a_type_is_named_by_a_text(type: Any) -> None:
+    with pytest.raises(TypeError) as raised:
+        Cell(type)
+    assert str(raised.value) == f"a cell's type is a str, not {type.__class__.__name__}"
+
+
+@pytest.mark.parametrize("function", [None, 3, "see"])
+def test_a_callback_is_a_function(function: Any) -> None:
+    with pytest.raises(TypeError) as raised:
+        vs.Callback(function)
+    assert str(raised.value) == f"a callback is a function, not {type(function).__name__}"
+
+
+def test_a_length_is_a_number() -> None:
+    data: Any = Cell("void *", Cell("int", 5))
+    assert data.read(4) == (5).to_bytes(4, sys.byteorder) and data.read(0) == b""
+    with pytest.raises(TypeError, match="^a length must be an integer, not str$"):
+        data.read("4")
+    with pytest.raises(ValueError, match="^a length is not negative$"):
+        data.read(-1)

@@ -85,6 +85,63 @@ def entry_named(name: Any) -> Any:
     return entry
 
 
+@pytest.mark.parametrize(
+    "make",
+    [
+        lambda: vs.VSUplinks(1),
+        vs.VSTeamPolicy,
+        lambda: vs.VSUplinks(1).entries,
+        lambda: vs.VSVLANBitmap().bits,
+        lambda: vs.VSTeamPolicy().uplinkPortName,
+        lambda: vs.new_vidrangeArray(1),
+        lambda: vs.Cell("int", [1]),
+        lambda: vs.Cell("void *"),
+        vs.VSMACEntry,
+    ],
+)
+def test_an_index_is_an_integer(make: Callable[[], Any]) -> None:
+    elements = make()
+    for index in ("a", 1.0, None, (0,)):
+        text = f"^indices must be integers, not {type(index).__name__}$"
+        with pytest.raises(TypeError, match=text):
+            elements[index]
+        if hasattr(type(elements), "__setitem__"):
+            with pytest.raises(TypeError, match=text):
+                elements[index] = elements[0]
+    if not isinstance(elements, vs.Array):
+        with pytest.raises(TypeError, match="^indices must be integers, not slice$"):
+            elements[0:1]
+    # As with lists, a truth is one.
+    elements[False]
+
+
+def test_a_length_is_an_integer() -> None:
+    makers: List[Any] = [vs.VSUplinks, vs.VSUplinkPorts, vs.VSUplinkPortIds]
+    makers.append(vs.VSVLANBitmap().bits.first)
+    for make in makers:
+        for length in ("a", 1.0, None):
+            text = f"^a length must be an integer, not {type(length).__name__}$"
+            with pytest.raises(TypeError, match=text):
+                make(length)
+        with pytest.raises(ValueError, match="^a length is not negative$"):
+            make(-1)
+
+
+def test_elements_take_their_type_only() -> None:
+    names: Any = vs.VSTeamPolicy().uplinkPortName
+    addresses: Any = vs.VSExtraEthFilter().multicastAddrs
+    with pytest.raises(TypeError, match="^a text is a str, not int$"):
+        names[0] = 5
+    wrong: List[Any] = [5, "text", [0] * 6]
+    for value in wrong:
+        with pytest.raises(TypeError, match=f"^bytes are wanted, not {type(value).__name__}$"):
+            addresses[0] = value
+    with pytest.raises(ValueError, match="^6 bytes are wanted, not 5$"):
+        addresses[0] = bytes(5)
+    addresses[0] = bytearray(b"123456")
+    assert addresses[0] == b"123456"
+
+
 def test_a_misspelled_field_is_an_error() -> None:
     info: Any = made(vs.VSInfo)
     with pytest.raises(AttributeError, match="VSInfo has no field 'mut'"):
