@@ -1,0 +1,31 @@
+# shellcheck shell=sh
+# The comparison with other ways to bind the same calls.
+
+#@ bench  Compare the module's cost with other ways to bind the same calls
+#
+# Usage: ./dev bench [--quick]
+#
+#   --quick   a short run, to see that all works: its figures are rough, and it leaves out what is
+#             measured of whole modules
+#
+# Prints tables of ratios, and what the simulated host does in a second; leaves results.json, calls.svg,
+# host.json and host_curve.svg in build/bench/. bench/README.md says how it measures and how to read
+# it. On a machine with other work to do it takes longer, and ratios stay ratios.
+cmd_bench() {
+  quick='' full=surfaces
+  case ${1-} in
+  --quick)
+    quick=--quick full=
+    shift
+    ;;
+  esac
+  [ $# -eq 0 ] || die "bench: unknown option '$1'; see ./dev bench --help"
+  # shellcheck disable=SC2086 # lists of words
+  need $build_packages $bench_packages
+  asked_python='' benching=yes
+  build_peers ${full:+"$full"}
+  step "Measuring the module and its peers"
+  "$python" bench/run.py ${quick:+"$quick"} "$folder"
+  step "Measuring the simulated host"
+  "$python" bench/host_curve.py ${quick:+"$quick"} "$folder"
+}

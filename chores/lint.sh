@@ -1,0 +1,94 @@
+# shellcheck shell=sh
+# The checks of sources.
+
+#@ lint   Check format and style of all sources; a warning is an error
+#
+# Usage: ./dev lint
+#
+# clang-format, clang-tidy, shellcheck, black, flake8 and mypy --strict. clang-tidy leaves out files
+# that were clean before and have not changed since, nor any header.
+# To put the format right: clang-format -i FILE..., black FILE...
+cmd_lint() {
+  [ $# -eq 0 ] || die "lint takes no options"
+  passed=0 failed=0 summary=
+  # shellcheck disable=SC2086 # lists of words
+  need $build_packages $test_packages $lint_packages $bench_packages
+  testing=yes benching=yes
+  # Some sources include what the build generates.
+  build
+  configure_fuzzers
+  lint
+  report
+}
+
+lint() {
+  step "Lint"
+  check clang-format check_format
+  check clang-tidy check_tidy
+  check shellcheck check_shell
+  check black check_black
+  check flake8 check_flake8
+  check mypy check_mypy
+}
+
+check() {
+  if "$2"; then
+    say "$1: clean"
+    tally "$1" 1 0
+  else
+    say "$1: FAILED"
+    tally "$1" 0 1
+  fi
+}
+
+# sources PATTERN...: our own files with such names, a line each.
+sources() {
+  for pattern; do
+    find . -path './build*' -prune -o -path './.*/*' -prune -o -type f -name "$pattern" -print
+  done
+}
+
+check_format() { sources '*.h' '*.c' '*.cpp' | xargs clang-format --dry-run -Werror; }
+
+check_shell() {
+  # The chores are checked where dev takes them in.
+  # shellcheck disable=SC2046 # none of our file names has a space
+  shellcheck -x dev .ci/run $(sources '*.sh' | grep -v '^\./chores/')
+}
+
+check_black() { sources '*.py' | xargs black --check --quiet --diff; }
+
+check_flake8() { sources '*.py' | xargs flake8; }
+
+# A folder at a time: several folders have a conftest, which as modules are one name.
+check_mypy() {
+  status=0
+  for directory in $(sources '*.py' | xargs -n 1 dirname | sort -u); do
+    MYPYPATH=$directory mypy --no-error-summary --cache-dir build/mypy "$directory"/*.py || status=1
+  done
+  return "$status"
+}
+
+# What clang-tidy says of a file depends on the file, its flags, all headers and the configuration;
+# the hash of these names a stamp that is left when it had nothing to say.
+check_tidy() {
+  export folder ours="^$root/(include|helpers|simhost|tests|bench)/"
+  stamps=$folder/tidy
+  mkdir -p "$stamps"
+  common=$({ sources '*.h' | sort | xargs cat; cat .clang-tidy "$folder/compile_commands.json" \
+    "${FUZZERS_DIR-$folder}/compile_commands.json"; } | sha256sum)
+  # shellcheck disable=SC2016 # the inner shell expands it
+  sources '*.c' '*.cpp' | grep -v "${untidied:-^$}" | while read -r file; do
+    stamp=$stamps/$({ say "$common"; cat "$file"; } | sha256sum | cut -c 1-40)
+    [ -e "$stamp" ] || say "$file $stamp"
+  done | nice xargs -r -n 2 -P "$jobs" sh -c '
+    echo "clang-tidy $1"
+    case $1 in ./tests/fuzz/*) folder=$FUZZERS_DIR ;; esac
+    if ! grep -qF "\"file\": \"$PWD/${1#./}\"" "$folder/compile_commands.json"; then
+      echo "$1: no target builds it, so nothing checks it"
+      exit 1
+    fi
+    findings=$(clang-tidy --quiet -p "$folder" --header-filter "$ours" "$1" 2>&1) && : >"$2" && exit
+    printf "%s\n" "$findings" | grep -v " generated\.$" | head -n 40
+    exit 1' sh
+}

@@ -1,0 +1,56 @@
+# shellcheck shell=sh
+# How a suite is run, and what is counted of it.
+
+# pytest TITLE XML HOST ARGUMENTS...: HOST is the folder of the host's libraries, empty for the
+# simulated one.
+pytest() {
+  title=$1 xml=$2 host=$3
+  shift 3
+  set -- "$python" -m pytest -q ${expression:+-k "$expression"} --junitxml "$folder/$xml" "$@"
+  [ -z "$host" ] || set -- "LD_LIBRARY_PATH=$host" "$@"
+  if [ -n "$sanitizers" ]; then
+    # The interpreter is not instrumented, so the runtime must come first, and with it the C++
+    # library whose throw it intercepts. Every leak has a frame of the interpreter in its stack, so
+    # its own could not be told from ours.
+    set -- "LD_PRELOAD=$(g++ -print-file-name=libasan.so) $(g++ -print-file-name=libstdc++.so)" \
+      ASAN_OPTIONS=detect_leaks=0:allocator_may_return_null=1 PYTHONMALLOC=malloc "$@" \
+      --capture=sys
+  fi
+  junit "$title" "$xml" env "$@"
+}
+
+# junit TITLE XML COMMAND...: runs a suite and counts its tests in the report that it leaves. A suite
+# that fails without saying in which test, or leaves no report, is one failure.
+junit() {
+  title=$1 xml=$folder/$2
+  shift 2
+  step "$title"
+  rm -f "$xml"
+  status=0
+  "$@" || status=$?
+  counts='0 1'
+  if [ -e "$xml" ]; then
+    counts=$(/usr/bin/python3 tests/count_junit.py "$xml") || counts='0 1'
+  else
+    say "$title: ended without a report, status $status"
+  fi
+  # With -k one of pytest's runs may well match nothing, which it reports as status 5.
+  [ -z "$expression" ] || [ "$status" -ne 5 ] || status=0
+  if [ "$status" -ne 0 ] && [ "${counts#* }" -eq 0 ]; then counts="${counts% *} 1"; fi
+  # shellcheck disable=SC2086 # two words
+  tally "$title" $counts
+}
+
+tally() {
+  passed=$((passed + $2)) failed=$((failed + $3))
+  summary="$summary$(printf '%-16s %5d passed %5d failed' "$1" "$2" "$3")
+"
+}
+
+report() {
+  step "Summary"
+  printf '%s' "$summary"
+  say "$passed passed, $failed failed"
+  [ "$failed" -eq 0 ] && [ "$passed" -gt 0 ]
+  exit
+}

@@ -1,0 +1,199 @@
+# shellcheck shell=sh
+# Which suites there are, and which of them are for which build.
+
+#@ test   Check everything: build, lint, and every test
+#
+# Usage: ./dev test [--python PATH] [--debug-python] [--sanitize] [--no-fast-paths] [-k EXPRESSION]
+#                   [-- ARGUMENTS]
+#        ./dev test --all-pythons [-k EXPRESSION] [-- ARGUMENTS]
+#        ./dev test --packages [ARGUMENTS]
+#
+#   --all-pythons   with each CPython from 3.8 to 3.13 that is in PATH or was put there by pyenv, the
+#                   newest of each version, one after the other in build folders of their own
+#   --packages      instead of all else what ./dev package makes, installed into empty systems and
+#                   removed again; it takes root's rights. ARGUMENTS are pytest's
+#   -k EXPRESSION   only the Python tests that match: no lint, C++ tests, fuzzers or peers
+#   -- ARGUMENTS    given to each run of pytest as they are
+#
+# The other options are those of ./dev build; with them lint, which they do not change, is left out.
+# Without them clang-tidy passes over the tests' own C++, which takes long; ./dev lint does not.
+# The summary names each test that is not for this build, and its last line sums all suites; a skipped
+# test counts as failed, for what was not checked is not known to work.
+#
+# The Python tests find the module, and those that exist for the tests alone, through PYTHONPATH,
+# and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
+# where LD_LIBRARY_PATH puts the recording host in place of the simulated one; so do those of
+# tests/classes, for once the classes are loaded the flat functions answer instances of them. By hand:
+#   export BUILD_DIR=$PWD/build PYTHONPATH=$PWD/build/python:$PWD/build/tests/python
+#   /usr/bin/python3 -m pytest tests --ignore=tests/contract --ignore=tests/classes \
+#     --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages
+#   /usr/bin/python3 -m pytest tests/classes
+#   /usr/bin/python3 -m pytest tests/docs
+#   LD_LIBRARY_PATH=$BUILD_DIR/tests/recording_host /usr/bin/python3 -m pytest tests/contract
+cmd_test() {
+  if [ "${1-}" = --all-pythons ]; then
+    shift
+    test_all_pythons "$@"
+  fi
+  expression=
+  if [ "${1-}" = --packages ]; then
+    shift
+    test_packages "$@"
+  fi
+  while [ $# -gt 0 ]; do
+    if build_option "$@"; then
+      shift "$taken"
+      continue
+    fi
+    case $1 in
+    -k)
+      [ $# -ge 2 ] || die "-k: which tests?"
+      expression=$2
+      shift
+      ;;
+    --)
+      shift
+      break
+      ;;
+    *) die "test: unknown option '$1'; see ./dev test --help" ;;
+    esac
+    shift
+  done
+
+  # A host or a state that the caller's shell points at is not the one under test.
+  unset LD_LIBRARY_PATH SIMHOST_STATE SIMHOST_SCENARIO PYTHONHOME
+  testing=yes benching=yes
+  # shellcheck disable=SC2086 # lists of words
+  need $build_packages $test_packages $lint_packages $bench_packages
+  passed=0 failed=0 summary='' deselected=''
+  if ! build; then
+    tally build 0 1
+    report
+  fi
+  # The tests' own sources are half of all, and the slower half: clang-tidy reads them in ./dev lint.
+  untidied='^\./tests/'
+  [ -n "$expression" ] || [ "$folder" != build ] || lint
+  export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
+  "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
+
+  [ -n "$expression" ] ||
+    junit "C++ tests" ctest.xml ctest --test-dir "$folder" --output-on-failure --no-tests=error \
+      -j "$jobs" --output-junit "$root/$folder/ctest.xml"
+  pytest "Python tests" module.xml '' tests --ignore=tests/contract --ignore=tests/classes \
+    --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages "$@"
+  class_tests "$@"
+  pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" tests/contract "$@"
+  # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are the
+  # same whatever the module is built for.
+  if [ "$folder" = build ]; then
+    test_no_fast_paths "$@"
+    pytest "Docs tests" docs.xml '' tests/docs "$@"
+    [ -n "$expression" ] || {
+      test_fuzzers "$@"
+      test_peers "$@"
+    }
+  fi
+  report
+}
+
+# Some of these are not for every build, which the summary says.
+class_tests() {
+  if [ -n "$sanitizers" ]; then
+    # The doctor counts what a module lacks, and one canary looks for a lost block in the allocator:
+    # both see what the sanitizers bring instead.
+    leave_out tests/classes/test_doctor.py::test_a_good_build_is_well
+    leave_out tests/classes/test_doctor.py::test_a_host_that_lacks_calls
+    leave_out tests/classes/test_records.py::test_a_record_that_is_never_freed_would_be_noticed
+  fi
+  if [ -n "$lent" ]; then
+    # The checker of stubs is for Debian's interpreter.
+    leave_out tests/classes/test_stubs.py::test_stubs_and_modules_have_no_difference
+    leave_out tests/classes/test_stubs.py::test_a_difference_would_be_found
+  fi
+  # shellcheck disable=SC2086 # a list of words
+  pytest "Class tests" classes.xml '' tests/classes $deselected "$@"
+}
+
+leave_out() {
+  deselected="$deselected --deselect $1"
+  summary="${summary}Not for this build: $1
+"
+}
+
+# The module's rules once more, for the module that reads nothing by itself.
+test_no_fast_paths() {
+  with_fast_paths=$PYTHONPATH
+  PYTHONPATH=$root/$folder/tests/no_fast_paths:$PYTHONPATH
+  pytest "No fast paths" no-fast-paths.xml '' tests/module \
+    --ignore=tests/module/test_host_libraries.py "$@"
+  PYTHONPATH=$with_fast_paths
+}
+
+test_fuzzers() {
+  if build_fuzzers; then
+    pytest "Fuzzers" fuzz.xml '' tests/fuzz "$@"
+  else
+    tally "Fuzzers" 0 1
+  fi
+}
+
+# The peers of the comparison, without its figures.
+test_peers() {
+  if build_peers; then
+    pytest "Bench tests" bench.xml '' bench "$@"
+  else
+    tally "Bench tests" 0 1
+  fi
+}
+
+# Interpreters from elsewhere have no pytest: Debian's, which is plain Python, serves them all. Only
+# what it needs is lent; the rest of Debian's modules are for its own interpreter.
+lend_pytest() {
+  need python3-exceptiongroup python3-sortedcontainers python3-tomli
+  lent=$root/$folder/pytest
+  mkdir -p "$lent"
+  for module in pytest _pytest pluggy iniconfig packaging attr attrs py py.py exceptiongroup tomli \
+    hypothesis sortedcontainers; do
+    ln -sfn "/usr/lib/python3/dist-packages/$module" "$lent/$module"
+  done
+  for metadata in /usr/lib/python3/dist-packages/pytest-*; do ln -sfn "$metadata" "$lent/"; done
+  export PYTHONPATH="$PYTHONPATH:$lent" PYTHONDONTWRITEBYTECODE=1
+  "$python" -m pytest --version >/dev/null 2>&1 || die "$python has no pytest"
+}
+
+# The newest interpreter of each version; pyenv has folders, and in PATH mere pointers to them.
+all_pythons() {
+  for minor in 8 9 10 11 12 13; do
+    for candidate in "$HOME/.pyenv/versions/3.$minor."*/bin/python "$(command -v "python3.$minor")"; do
+      "$candidate" -c "import sys; sys.exit(sys.version_info[:2] != (3, $minor))" 2>/dev/null &&
+        say "$candidate"
+    done | sort -V | tail -n 1
+  done
+}
+
+test_all_pythons() {
+  summary='' failed=0
+  for candidate in $(all_pythons); do
+    step "$candidate"
+    verdict=passed
+    "$root/dev" test --python "$candidate" "$@" || verdict=FAILED failed=1
+    summary="$summary$verdict  $candidate
+"
+  done
+  [ -n "$summary" ] || die "test: no CPython from 3.8 to 3.13 found"
+  step "All interpreters"
+  printf '%s' "$summary"
+  exit "$failed"
+}
+
+test_packages() {
+  [ "$(id -u)" -eq 0 ] || die "test: --packages takes root's rights"
+  # shellcheck disable=SC2086 # lists of words
+  need $build_packages $package_packages $package_test_packages
+  unset LD_LIBRARY_PATH SIMHOST_STATE SIMHOST_SCENARIO PYTHONHOME PYTHONPATH
+  passed=0 failed=0 summary=
+  make_packages
+  export BUILD_DIR="$root/$folder"
+  pytest "Package tests" packages.xml '' tests/packages "$@"
+  report
+}
