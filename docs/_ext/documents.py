@@ -17,6 +17,7 @@ from sphinx.util.docutils import SphinxDirective
 ROOT = Path(__file__).resolve().parents[2]
 PAGES = {
     "simhost/README.md": "/more/simulated_host.md",
+    "simhost/python/README.md": "/more/plugin.md",
     "simhost/SCENARIOS.md": "/more/scenarios.md",
     "bench/README.md": "/more/bench.md",
     "packaging/README.md": "/more/packages.md",
