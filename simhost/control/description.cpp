@@ -160,7 +160,7 @@ Json described_port(Transaction &work, store::Port const &port,
     observed["uplink"] = carriers.required_of(port);
   } catch (Refused const &refused) {
     observed["uplink"] = nullptr;
-    observed["why"] = status_text(refused.status());
+    observed["why"] = refusal_text(refused);
   }
   described["observed"] = std::move(observed);
   return described;

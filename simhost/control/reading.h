@@ -33,7 +33,7 @@ auto do_at(Node const &node, Work const &work) {
   try {
     return work();
   } catch (Refused const &refused) {
-    node.fail("the host refuses it: " + status_text(refused.status()));
+    node.fail("the host refuses it: " + refusal_text(refused));
   }
 }
 

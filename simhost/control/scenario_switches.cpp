@@ -186,8 +186,11 @@ void attach_to(Transaction &work, store::Port const &port, std::string const &up
   if (present == uplink) {
     return;
   }
-  if (known.port || present) {
-    throw Refused(QEX_BUSY);
+  if (present) {
+    throw Refused(QEX_BUSY, "the port has the uplink '" + *present + "'");
+  }
+  if (known.port) {
+    throw Refused(QEX_BUSY, "the uplink '" + uplink + "' is at another port");
   }
   store::attach_uplink(work, uplink, port.number);
 }

@@ -40,7 +40,7 @@ int failure() noexcept {
   try {
     throw;
   } catch (Refused const &refused) {
-    return failed(refused.status(), simhost::control::status_text(refused.status()));
+    return failed(refused.status(), simhost::control::refusal_text(refused));
   } catch (simhost::control::DocumentError const &error) {
     return failed(QEX_BAD_PARAM, error.what());
   } catch (simhost::store::UnusableState const &error) {
@@ -68,7 +68,7 @@ int on_state(Access access, Work const &work) noexcept {
 
 std::string given(char const *text) {
   if (text == nullptr) {
-    throw Refused(QEX_BAD_PARAM);
+    throw Refused(QEX_BAD_PARAM, "a text is null");
   }
   return text;
 }
@@ -94,12 +94,12 @@ void refuse_unlearned(simhost::dataplane::Sighting sighting) {
   using simhost::dataplane::Sighting;
   switch (sighting) {
     case Sighting::learning_off:
-      throw Refused(QEX_IS_DISABLED);
+      throw Refused(QEX_IS_DISABLED, "the port does not learn");
     case Sighting::let_through:
     case Sighting::dropped:
-      throw Refused(QEX_LIMIT_EXCEEDED);
+      throw Refused(QEX_LIMIT_EXCEEDED, "there is no room for another address");
     case Sighting::kept_elsewhere:
-      throw Refused(QEX_EXISTS);
+      throw Refused(QEX_EXISTS, "the address is fixed elsewhere");
     case Sighting::learned:
     case Sighting::refreshed:
     case Sighting::moved:
@@ -110,7 +110,7 @@ void refuse_unlearned(simhost::dataplane::Sighting sighting) {
 VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
   auto const bytes = simhost::control::mac_from(mac);
   if (!bytes) {
-    throw Refused(QEX_INVALID_ADDRESS);
+    throw Refused(QEX_INVALID_ADDRESS, "'" + mac + "' is no address such as 02:00:00:00:00:01");
   }
   VSMACEntry source{};
   std::memcpy(source.macAddress, bytes->data(), bytes->size());
@@ -225,7 +225,7 @@ SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, ch
                                     char const *name, uint64_t value) {
   return on_state(Access::write, [&](Transaction &work) {
     if (port != nullptr && session != nullptr) {
-      throw Refused(QEX_BAD_PARAM);
+      throw Refused(QEX_BAD_PARAM, "a counter is of a port or of a session, not of both");
     }
     auto const place = place_of(work, switchName, port);
     simhost::CounterOwner const owner{.switch_key = place.switch_key,

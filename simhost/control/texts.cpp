@@ -127,9 +127,13 @@ std::string status_name(QEX_ReturnStatus status) {
                           : fmt::format("0x{:08x}", static_cast<unsigned>(status));
 }
 
-std::string status_text(QEX_ReturnStatus status) {
-  auto const *const found = find_status(status);
-  return found != nullptr ? fmt::format("{} ({})", found->text, found->name) : status_name(status);
+std::string refusal_text(Refused const &refused) {
+  auto const *const found = find_status(refused.status());
+  if (found == nullptr && !refused.has_reason()) {
+    return status_name(refused.status());
+  }
+  return fmt::format("{} ({})", refused.has_reason() ? refused.what() : found->text,
+                     status_name(refused.status()));
 }
 
 }  // namespace simhost::control

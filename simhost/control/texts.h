@@ -9,6 +9,7 @@
 #include <string_view>
 #include <vector>
 
+#include "core/giving_up.h"
 #include "qexapi/status.h"
 
 namespace simhost::control {
@@ -29,7 +30,7 @@ std::string hex_text(std::span<std::byte const> bytes);
 std::optional<QEX_ReturnStatus> status_named(std::string_view name);
 /// The name of a status; its number for one without.
 std::string status_name(QEX_ReturnStatus status);
-/// What a status means, and its name.
-std::string status_text(QEX_ReturnStatus status);
+/// Why the host refuses something: the reason, or else what the status means, and its name.
+std::string refusal_text(Refused const &refused);
 
 }  // namespace simhost::control

@@ -1,6 +1,8 @@
 // Faults in SQL, and striking.
 #include "core/faults.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <array>
 #include <mutex>
@@ -25,24 +27,45 @@ constexpr std::array kCalls{
 #undef CALL
 };
 
-void check(Fault const &fault) {
-  auto const call = std::find_if(kCalls.begin(), kCalls.end(), [&](HostCall const &known) {
-    return known.name == fault.function;
-  });
+HostCall known_call(std::string_view function) {
+  auto const call = std::find_if(kCalls.begin(), kCalls.end(),
+                                 [&](HostCall const &known) { return known.name == function; });
   if (call == kCalls.end()) {
-    throw Refused(QEX_NOT_FOUND);
+    throw Refused(QEX_NOT_FOUND, fmt::format("there is no call '{}'", function));
   }
+  // These two keep no state, and the first must return whatever happens.
+  if (function == "Panic" || function == "QEX_ReturnStatusToString") {
+    throw Refused(QEX_NOT_SUPPORTED, fmt::format("no fault can hit {}", function));
+  }
+  return *call;
+}
+
+void check_effect(Fault const &fault) {
   bool const status = fault.status != QEX_OK;
   bool const exception = !fault.exception.empty();
-  // These two keep no state, and the first must return whatever happens.
-  if (fault.function == "Panic" || fault.function == "QEX_ReturnStatusToString" ||
-      (status && !call->answers_status)) {
-    throw Refused(QEX_NOT_SUPPORTED);
+  if (status && !known_call(fault.function).answers_status) {
+    throw Refused(QEX_NOT_SUPPORTED, fmt::format("{} answers no status", fault.function));
   }
-  if ((status && exception) || (!status && !exception && fault.delay.count() == 0) ||
-      fault.delay.count() < 0 || fault.first < 1 || fault.last < fault.first ||
-      (exception && !find_panic_kind(fault.exception))) {
-    throw Refused(QEX_BAD_PARAM);
+  if (status && exception) {
+    throw Refused(QEX_BAD_PARAM, "a call has a status or an exception, not both");
+  }
+  if (fault.delay.count() < 0) {
+    throw Refused(QEX_BAD_PARAM, "a delay is not negative");
+  }
+  if (!status && !exception && fault.delay.count() == 0) {
+    throw Refused(QEX_BAD_PARAM, "a fault needs a status, an exception or a delay");
+  }
+  if (exception && !find_panic_kind(fault.exception)) {
+    throw Refused(QEX_BAD_PARAM, fmt::format("'{}' is none of the exception types {}",
+                                             fault.exception, panic_types()));
+  }
+}
+
+void check(Fault const &fault) {
+  known_call(fault.function);
+  check_effect(fault);
+  if (fault.first < 1 || fault.last < fault.first) {
+    throw Refused(QEX_BAD_PARAM, "the first call that is hit is 1 or later");
   }
 }
 

@@ -13,6 +13,14 @@ std::optional<PanicKind> find_panic_kind(std::string_view type) {
   return std::nullopt;
 }
 
+std::string panic_types() {
+  std::string types;
+#define SIMHOST_KIND(kind, name) types += types.empty() ? #name : ", " #name;
+  SIMHOST_PANIC_KINDS(SIMHOST_KIND)
+#undef SIMHOST_KIND
+  return types;
+}
+
 void refuse(QEX_ReturnStatus status) {
   throw Refused(status);
 }

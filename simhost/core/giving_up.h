@@ -1,7 +1,6 @@
 // The two ways in which the core ends a call early.
 #pragma once
 
-#include <exception>
 #include <optional>
 #include <stdexcept>
 #include <string>
@@ -13,14 +12,20 @@
 namespace simhost {
 
 /// The host refuses the call: the caller gets `status`.
-class Refused : public std::exception {
+class Refused : public std::runtime_error {
  public:
-  explicit Refused(QEX_ReturnStatus status) : status_(status) {}
+  explicit Refused(QEX_ReturnStatus status)
+      : std::runtime_error("the host refuses the call"), status_(status) {}
+  /// With the reason in words, for people who change the host from outside.
+  Refused(QEX_ReturnStatus status, std::string const &reason)
+      : std::runtime_error(reason), status_(status), has_reason_(true) {}
   [[nodiscard]] QEX_ReturnStatus status() const { return status_; }
-  [[nodiscard]] char const *what() const noexcept override { return "the host refuses the call"; }
+  /// Whether what() is a reason of its own.
+  [[nodiscard]] bool has_reason() const { return has_reason_; }
 
  private:
   QEX_ReturnStatus status_;
+  bool has_reason_ = false;
 };
 
 // The interpreter's exception types: what a panic kind is called here, and there.
@@ -47,6 +52,8 @@ enum class PanicKind {
 
 /// The kind of a type that the interpreter calls `type`, such as "OSError".
 std::optional<PanicKind> find_panic_kind(std::string_view type);
+/// All types, with commas between them.
+std::string panic_types();
 
 /// Whether the trap's text begins with the name of the call.
 enum class PanicText { after_call, verbatim };

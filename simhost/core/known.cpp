@@ -1,7 +1,11 @@
 // Looking up, and refusing.
 #include "core/known.h"
 
+#include <fmt/format.h>
+
+#include <cstdint>
 #include <optional>
+#include <string>
 #include <utility>
 
 #include "core/giving_up.h"
@@ -10,25 +14,38 @@
 namespace simhost {
 namespace {
 
+// `what` and `name` tell what is not there: "there is no uplink 'nic9'".
 template <typename Found>
-Found known(std::optional<Found> found) {
+Found known(std::optional<Found> found, std::string_view what, std::string_view name) {
   if (!found) {
-    throw Refused(QEX_NOT_FOUND);
+    throw Refused(QEX_NOT_FOUND, fmt::format("there is no {} '{}'", what, name));
   }
   return *std::move(found);
+}
+
+std::string_view kind_of_name(store::SwitchName kind) {
+  switch (kind) {
+    case store::SwitchName::alias:
+      break;
+    case store::SwitchName::identifier:
+      return "switch identified as";
+    case store::SwitchName::portset:
+      return "switch with the portset";
+  }
+  return "switch";
 }
 
 }  // namespace
 
 store::FoundSwitch known_switch(store::Transaction &transaction, std::string_view name,
                                 store::SwitchName kind) {
-  return known(store::find_switch(transaction, kind, name));
+  return known(store::find_switch(transaction, kind, name), kind_of_name(kind), name);
 }
 
 store::FoundSwitch running_switch(store::Transaction &transaction, std::string_view alias) {
   auto found = known_switch(transaction, alias);
   if (!found.row.associated) {
-    throw Refused(QEX_NOT_FOUND);
+    throw Refused(QEX_NOT_FOUND, fmt::format("the switch '{}' does not run", alias));
   }
   return found;
 }
@@ -40,11 +57,12 @@ store::Port known_port(store::Transaction &transaction, store::SwitchName kind,
 
 store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_key,
                        std::string_view identifier) {
-  return known(store::find_port(transaction, switch_key, identifier));
+  return known(store::find_port(transaction, switch_key, identifier), "port", identifier);
 }
 
 store::Port known_port(store::Transaction &transaction, store::PortNumber number) {
-  return known(store::find_port(transaction, number));
+  return known(store::find_port(transaction, number), "port with the number",
+               std::to_string(std::int64_t(number)));
 }
 
 store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_key,
@@ -57,14 +75,14 @@ store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_
 }
 
 store::Uplink known_uplink(store::Transaction &transaction, std::string_view name) {
-  return known(store::find_uplink(transaction, name));
+  return known(store::find_uplink(transaction, name), "uplink", name);
 }
 
 store::Uplink known_uplink(store::Transaction &transaction, store::SwitchKey switch_key,
                            std::string_view name) {
   auto uplink = known_uplink(transaction, name);
   if (!uplink.port) {
-    throw Refused(QEX_NOT_FOUND);
+    throw Refused(QEX_NOT_FOUND, fmt::format("the uplink '{}' is at no switch", name));
   }
   known_port(transaction, switch_key, *uplink.port);
   return uplink;

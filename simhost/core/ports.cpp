@@ -1,6 +1,8 @@
 // Ports over the store: bounds, what they are called, which uplink is where.
 #include "core/ports.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <set>
 
@@ -235,13 +237,12 @@ void set_uplink_ports(store::Transaction &transaction, store::SwitchKey switch_k
 
 void add_uplink_port(store::Transaction &transaction, store::SwitchKey switch_key,
                      std::string_view uplink) {
-  auto const found = store::find_uplink(transaction, uplink);
-  if (!found) {
-    throw Refused(QEX_NOT_FOUND);
-  }
-  if (found->port) {
-    auto const port = store::find_port(transaction, *found->port).value();
-    throw Refused(port.switch_key == switch_key ? QEX_EXISTS : QEX_BUSY);
+  auto const found = known_uplink(transaction, uplink);
+  if (found.port) {
+    bool const here = known_port(transaction, *found.port).switch_key == switch_key;
+    throw Refused(here ? QEX_EXISTS : QEX_BUSY,
+                  fmt::format("the uplink '{}' is at {}", uplink,
+                              here ? "this switch already" : "another switch"));
   }
   store::attach_uplink(transaction, uplink, vacant_uplink_port(transaction, switch_key).number);
 }

@@ -1,6 +1,8 @@
 // Counters in SQL.
 #include "dataplane/counters.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <array>
 #include <limits>
@@ -58,12 +60,20 @@ std::int64_t port_or_none(CounterOwner const &owner) {
   return owner.port ? std::int64_t(*owner.port) : 0;
 }
 
+std::string_view kind_of(CounterOwner const &owner) {
+  if (!owner.session.empty()) {
+    return "mirror session";
+  }
+  return owner.port ? "port" : "switch";
+}
+
 CounterName known_name(CounterOwner const &owner, std::string_view name) {
   auto const names = counter_names(owner);
   auto const found = std::find_if(names.begin(), names.end(),
                                   [&](auto const &known) { return known.name == name; });
   if (found == names.end()) {
-    throw Refused(QEX_NOT_FOUND);
+    throw Refused(QEX_NOT_FOUND,
+                  fmt::format("there is no counter '{}' of a {}", name, kind_of(owner)));
   }
   return *found;
 }
@@ -91,8 +101,8 @@ Counters counters_of(store::Transaction &transaction, CounterOwner const &owner)
 
 void set_counter(store::Transaction &transaction, CounterOwner const &owner, std::string_view name,
                  std::uint64_t value) {
-  if (value > known_name(owner, name).greatest) {
-    throw Refused(QEX_BAD_PARAM);
+  if (auto const greatest = known_name(owner, name).greatest; value > greatest) {
+    throw Refused(QEX_BAD_PARAM, fmt::format("{} is above {}", value, greatest));
   }
   auto upsert = transaction.query(
       "INSERT INTO counter (switch, port, session, name, value) VALUES (?, nullif(?, 0), ?, ?, ?)"

@@ -102,7 +102,8 @@ class Machine:
         self.program("import libvswitch as vs; vs.VSDVS_SetMTU('vswitch0', 9000)", **state)
         assert "MTU 9000" in self.root.run(self.simhostctl, "show", **state)
         done = self.root.try_run(self.simhostctl, "link", "nic9", "down", **state)
-        assert (done.returncode, done.stderr) == (1, "simhostctl: Not found (QEX_NOT_FOUND)\n")
+        why = "there is no uplink 'nic9' (QEX_NOT_FOUND)"
+        assert (done.returncode, done.stderr) == (1, f"simhostctl: {why}\n")
 
     def runs_tests_with_the_plugin(self, **environment: str) -> None:
         self.root.write("/tmp/suite/test_plugin.py", PLUGIN_TEST)

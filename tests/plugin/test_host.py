@@ -162,12 +162,30 @@ def test_faults_are_cleared(this: SimulatedHost) -> None:
 
 
 REFUSED = [
-    (lambda host: host.link("nic9").down(), "Not found (QEX_NOT_FOUND)"),
-    (lambda host: host.learn("vswitch0", LEARNED, "no"), "Not found (QEX_NOT_FOUND)"),
-    (lambda host: host.set_counter("vswitch0", "txMistakes", 1), "Not found (QEX_NOT_FOUND)"),
+    (lambda host: host.link("nic9").down(), "there is no uplink 'nic9' (QEX_NOT_FOUND)"),
+    (
+        lambda host: host.learn("vswitch0", LEARNED, "no"),
+        "there is no port 'no' (QEX_NOT_FOUND)",
+    ),
+    (
+        lambda host: host.learn("nowhere", LEARNED),
+        "there is no switch 'nowhere' (QEX_NOT_FOUND)",
+    ),
+    (
+        lambda host: host.learn("vswitch0", "2"),
+        "'2' is no address such as 02:00:00:00:00:01 (QEX_INVALID_ADDRESS)",
+    ),
+    (
+        lambda host: host.set_counter("vswitch0", "txMistakes", 1),
+        "there is no counter 'txMistakes' of a switch (QEX_NOT_FOUND)",
+    ),
     (
         lambda host: host.fault("Panic", status="QEX_BUSY"),
-        "faults[0]: the host refuses it: Not supported (QEX_NOT_SUPPORTED)",
+        "faults[0]: the host refuses it: no fault can hit Panic (QEX_NOT_SUPPORTED)",
+    ),
+    (
+        lambda host: host.fault("Nope", status="QEX_BUSY"),
+        "faults[0]: the host refuses it: there is no call 'Nope' (QEX_NOT_FOUND)",
     ),
     (
         lambda host: host.apply({"switches": [{"alias": "s", "mtu": 99}]}),

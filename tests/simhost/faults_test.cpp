@@ -57,16 +57,31 @@ TEST_F(Faults, Delay) {
 
 TEST_F(Faults, AreChecked) {
   EXPECT_EQ(simhost_fail_call("VSDVS_Nothing", 1, 1, QEX_BUSY), QEX_NOT_FOUND);
+  EXPECT_STREQ(simhost_error(), "there is no call 'VSDVS_Nothing' (QEX_NOT_FOUND)");
   EXPECT_EQ(simhost_fail_call("Panic", 1, 1, QEX_BUSY), QEX_NOT_SUPPORTED);
   EXPECT_EQ(simhost_panic_call("Panic", 1, 1, "OSError", ""), QEX_NOT_SUPPORTED);
   EXPECT_EQ(simhost_delay_call("Panic", 1, 1, 1), QEX_NOT_SUPPORTED);
+  EXPECT_STREQ(simhost_error(), "no fault can hit Panic (QEX_NOT_SUPPORTED)");
   EXPECT_EQ(simhost_fail_call("VSQEX_FreeMemory", 1, 1, QEX_BUSY), QEX_NOT_SUPPORTED)
       << "it has no status";
+  EXPECT_STREQ(simhost_error(), "VSQEX_FreeMemory answers no status (QEX_NOT_SUPPORTED)");
   EXPECT_EQ(simhost_fail_call("VSDVS_SetMTU", 0, 1, QEX_BUSY), QEX_BAD_PARAM);
+  EXPECT_STREQ(simhost_error(), "the first call that is hit is 1 or later (QEX_BAD_PARAM)");
   EXPECT_EQ(simhost_fail_call("VSDVS_SetMTU", 1, 1, QEX_OK), QEX_BAD_PARAM);
+  EXPECT_STREQ(simhost_error(), "a fault needs a status, an exception or a delay (QEX_BAD_PARAM)");
   EXPECT_EQ(simhost_panic_call("VSDVS_SetMTU", 1, 1, "NoError", ""), QEX_BAD_PARAM);
-  EXPECT_STREQ(simhost_error(), "Bad parameter (QEX_BAD_PARAM)");
+  EXPECT_STREQ(simhost_error(),
+               "'NoError' is none of the exception types RuntimeError, OSError, ConnectionError, "
+               "IndexError, KeyError, MemoryError, NotImplementedError, PermissionError, "
+               "SystemError, TimeoutError, TypeError, ValueError (QEX_BAD_PARAM)");
   EXPECT_EQ(simhost_fail_call(nullptr, 1, 1, QEX_BUSY), QEX_BAD_PARAM);
+  EXPECT_STREQ(simhost_error(), "a text is null (QEX_BAD_PARAM)");
+  EXPECT_EQ(simhost_apply(R"({"faults": [{"call": "VSDVS_SetMTU", "status": "QEX_BUSY",
+                                          "exception": "OSError"}]})"),
+            QEX_BAD_PARAM);
+  EXPECT_STREQ(simhost_error(),
+               "faults[0]: the host refuses it: a call has a status or an exception, not both "
+               "(QEX_BAD_PARAM)");
 }
 
 TEST_F(Faults, TheLedgerSumsUpByCallAndSize) {

@@ -83,18 +83,19 @@ TEST_F(Scenario, ErrorsHaveThePathOfTheKey) {
 
 TEST_F(Scenario, WhatTheHostRefusesIsToldLikewise) {
   EXPECT_EQ(refusal_in_switch(R"("uplinks": ["nic0", "nic9"])"),
-            "switches[0].uplinks[1]: the host refuses it: Not found (QEX_NOT_FOUND)");
+            "switches[0].uplinks[1]: the host refuses it: there is no uplink 'nic9' "
+            "(QEX_NOT_FOUND)");
   EXPECT_EQ(refusal_in_port(R"("addresses": [{"mac": "01:00:00:00:00:01"}])"),
             "switches[0].ports[0].addresses[0]: the host refuses it: Invalid address "
             "(QEX_INVALID_ADDRESS)");
   EXPECT_EQ(refusal_in_port(R"("counters": {"txErrors": 1})"),
-            "switches[0].ports[0].counters.txErrors: the host refuses it: Not found "
-            "(QEX_NOT_FOUND)");
+            "switches[0].ports[0].counters.txErrors: the host refuses it: there is no counter "
+            "'txErrors' of a port (QEX_NOT_FOUND)");
   EXPECT_EQ(refusal(R"({"runtime_options": {"IGMPRouterIP": "::"}})"),
             "runtime_options.IGMPRouterIP: the host refuses it: Invalid address "
             "(QEX_INVALID_ADDRESS)");
   EXPECT_EQ(refusal(R"({"faults": [{"call": "Panic", "delay": 1}]})"),
-            "faults[0]: the host refuses it: Not supported (QEX_NOT_SUPPORTED)");
+            "faults[0]: the host refuses it: no fault can hit Panic (QEX_NOT_SUPPORTED)");
 }
 
 TEST_F(Scenario, UplinkPortsHaveOneUplinkEach) {
@@ -104,14 +105,17 @@ TEST_F(Scenario, UplinkPortsHaveOneUplinkEach) {
             "")
       << "it has it already";
   EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u", "uplink": "nic9"}])"),
-            "switches[0].uplink_ports[0].uplink: the host refuses it: Not found (QEX_NOT_FOUND)");
+            "switches[0].uplink_ports[0].uplink: the host refuses it: there is no uplink 'nic9' "
+            "(QEX_NOT_FOUND)");
   EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u", "uplink": "nic0"},
                                                   {"id": "v", "uplink": "nic0"}])"),
-            "switches[0].uplink_ports[1].uplink: the host refuses it: Busy (QEX_BUSY)");
+            "switches[0].uplink_ports[1].uplink: the host refuses it: the uplink 'nic0' is at "
+            "another port (QEX_BUSY)");
   EXPECT_EQ(refusal(R"({"uplinks": [{"name": "nic0"}, {"name": "nic1"}],
                         "switches": [{"alias": "s", "uplink_ports": [
                           {"id": "u", "uplink": "nic0"}, {"id": "u", "uplink": "nic1"}]}]})"),
-            "switches[0].uplink_ports[1].uplink: the host refuses it: Busy (QEX_BUSY)");
+            "switches[0].uplink_ports[1].uplink: the host refuses it: the port has the uplink "
+            "'nic0' (QEX_BUSY)");
   EXPECT_EQ(refusal(R"({"switches": [{"alias": "s", "ports": [{"id": "p"}]},
                                      {"alias": "s", "uplink_ports": [{"id": "p"}]}]})"),
             "switches[1].uplink_ports[0].id: is a port that is no uplink port");

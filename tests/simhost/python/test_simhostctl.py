@@ -99,7 +99,8 @@ def test_a_link_that_fails_moves_the_hint(host: Host) -> None:
     assert host.lines(HINT) == ["nic5"]
     host.ctl("link", "nic4", "up")
     assert host.lines(HINT) == ["nic4"]
-    assert host.refusal("link", "nic9", "down") == "simhostctl: Not found (QEX_NOT_FOUND)\n"
+    why = "there is no uplink 'nic9' (QEX_NOT_FOUND)"
+    assert host.refusal("link", "nic9", "down") == f"simhostctl: {why}\n"
 
 
 def test_learned_addresses_age_by_the_clock(host: Host) -> None:
@@ -110,6 +111,25 @@ def test_learned_addresses_age_by_the_clock(host: Host) -> None:
     assert host.lines(ADDRESSES) == ["02:00:00:00:0a:01 299"]
     host.ctl("clock", "step", "0.001")
     assert host.lines(ADDRESSES) == []
+
+
+def test_an_address_that_is_not_learned_is_told_why(host: Host) -> None:
+    fixed = "02:00:00:00:00:01"
+    ports = [
+        {"id": "deaf"},
+        {"id": "full", "mac_learning": {"learning": True, "limit": 0}},
+        {"id": "owner", "addresses": [{"mac": fixed, "type": "static"}]},
+    ]
+    host.apply({"switches": [{"alias": "lab", "ports": ports}]})
+    other = "02:00:00:00:00:02"
+    for port, mac, why in (
+        ("deaf", other, "the port does not learn (QEX_IS_DISABLED)"),
+        ("full", other, "there is no room for another address (QEX_LIMIT_EXCEEDED)"),
+        ("", fixed, "the address is fixed elsewhere (QEX_EXISTS)"),
+        ("", fixed[:-1], f"'{fixed[:-1]}' is no address such as {fixed} (QEX_INVALID_ADDRESS)"),
+    ):
+        options = [f"--port={port}"] if port else []
+        assert host.refusal("learn", "lab", mac, *options) == f"simhostctl: {why}\n"
 
 
 def test_the_clock_stands_and_runs(host: Host) -> None:
@@ -137,7 +157,15 @@ vs.delete_VSServicePortTeamingStats(stats)
         )
         == ["0", str(2**64 - 1)]
     )
-    assert "QEX_NOT_FOUND" in host.refusal("counter", "vswitch0", "txMistakes", "1")
+    assert host.refusal("counter", "vswitch0", "txMistakes", "1") == (
+        "simhostctl: there is no counter 'txMistakes' of a switch (QEX_NOT_FOUND)\n"
+    )
+    assert host.refusal("counter", "vswitch0", "txErrors", "1", "--port", "web-9") == (
+        "simhostctl: there is no port 'web-9' (QEX_NOT_FOUND)\n"
+    )
+    assert host.refusal("counter", "vswitch0", "rarpPktsSent", str(2**32)) == (
+        f"simhostctl: {2**32} is above {2**32 - 1} (QEX_BAD_PARAM)\n"
+    )
 
 
 MOST = 2**64 - 1
