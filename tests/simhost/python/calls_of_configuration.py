@@ -188,13 +188,13 @@ def sessions() -> None:
     entity.set_entity("opaque")
 
     def look() -> None:
-        for name, given in (
-            ("VSDVS_GetDVMirrorSessions", (LAB, PORT)),
-            ("VSQEX_GetDVMirrorSessionIDs", (LAB,)),
-            ("VSQEX_GetPromiscSessionActiveDsts", (LAB,)),
+        for name, given, free in (
+            ("VSDVS_GetDVMirrorSessions", (LAB, PORT), vs.VSDVS_FreeMemory),
+            ("VSQEX_GetDVMirrorSessionIDs", (LAB,), vs.VSQEX_FreeMemory),
+            ("VSQEX_GetPromiscSessionActiveDsts", (LAB,), vs.VSQEX_FreeMemory),
         ):
             status, found = call(name, *given)
-            vs.VSQEX_FreeMemory(found)
+            free(found)
 
     look()
     call("VSDVS_AppendDVMirrorSessions", LAB, PORT, table)
