@@ -38,6 +38,7 @@ from libvswitch._records import Record, Table
 %table(VSUplinkPorts, nUplinkPorts)
 %table(VSUplinkPortIds, nUplinkPorts)
 %table(VSTeamPolicy, 32)
+%table(VSMACTable, numEntries)
 %table(VSDVMirrorSessionIDs, numEntries)
 %table(VSPromiscSessionActiveDsts, numEntries)
 %table(DVMirrorSessionTable, numSessions)

@@ -88,6 +88,12 @@ def layout(known: Definitions) -> str:
         "METHODS_WITH_VIEWS": inner["views"],
         "METHODS_WITH_NUMBERS": inner["numbers"],
         "TABLES": {one.name: one.count for one in known.records.values() if one.count},
+        "ELEMENTS": {
+            one.name: field.name
+            for one in known.records.values()
+            for field in one.fields
+            if one.count and field.count == one.count
+        },
         "CALLS_WITH_OUTPUTS": sorted({call.name for call in calls if call.outputs}),
         "CALLS_WITH_CELLS": {one.name: cells(known, one) for one in calls if cells(known, one)},
         "CALLS_WITH_CALLBACKS": {

@@ -386,9 +386,11 @@ def package(known: Definitions) -> str:
 
 
 def class_of(stubs: Stubs, record: Record) -> str:
-    element = next(
-        (stubs.result(one) for one in record.methods if one.name == "__getitem__"), "object"
-    )
+    elements = [stubs.result(one) for one in record.methods if one.name == "__getitem__"]
+    elements += [
+        one.type.name for one in record.fields if record.count and one.count == record.count
+    ]
+    element = elements[0] if elements else "object"
     element = "int" if "UnsignedIntPointer" in element else element
     element = element[9:-1] if element.startswith("Optional[") else element
     base = f"Table[{element}]" if record.count else "Record"

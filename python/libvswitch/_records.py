@@ -139,7 +139,9 @@ class Table(Record, typing.Generic[T]):
         return int(count) if count.isdigit() else int(getattr(self, count))
 
     def __getitem__(self, index: int) -> T:
-        raise NotImplementedError
+        """An element of the array that is counted, where the record has no method for it."""
+        elements: Array[T] = getattr(self, _layout.ELEMENTS[type(self).__name__])
+        return elements[_memory.position(index, len(self))]
 
 
 class Array(_Pointing, typing.Sequence[T]):

@@ -29,6 +29,7 @@ def test_a_list_is_a_sequence(switch: str) -> None:
         (lambda: vs.alloc_dvmirror_session_table(2, 3), 2),
         (vs.VSDVMirrorSessionIDs, 0),
         (vs.VSPromiscSessionActiveDsts, 0),
+        (vs.VSMACTable, 0),
     ],
 )
 def test_an_index_out_of_range_raises(
@@ -43,6 +44,26 @@ def test_an_index_out_of_range_raises(
             with pytest.raises(IndexError):
                 table[index] = table[0] if length else 1
     assert capfd.readouterr() == ("", "")
+
+
+def test_a_mac_table_is_a_sequence_of_its_entries(switch: str) -> None:
+    mine: Any = vs.VSMACEntry()
+    mine.macAddress = "02:00:00:00:00:07"
+    mine.macAddrType = vs.VS_MAC_ADDR_TYPE_USER
+    assert vs.VSQEX_SetPortMACTable(switch, "web", mine) == vs.QEX_OK
+    with vs.owned(vs.VSQEX_GetPortMACTable(switch, "web", vs.VS_MAC_ADDR_TYPE_ALL)) as result:
+        status, table = result
+        assert (status, len(table)) == (vs.QEX_OK, table.numEntries)
+        assert [*table] == [table[index] for index in range(len(table))] == [*table.macEntries]
+        assert "02:00:00:00:00:07" in [entry.macAddress for entry in table]
+        assert table[-1] == table.macEntries[-1] and table[0] in table
+        with pytest.raises(IndexError, match=f"^index {len(table)} is not within"):
+            table[len(table)]
+        entry = table[0]
+    uses: List[Callable[[], Any]] = [lambda: entry.macAddress, lambda: table[0], lambda: [*table]]
+    for use in uses:
+        with pytest.raises(ValueError):
+            use()
 
 
 @pytest.mark.parametrize("make", [vs.VSUplinks, vs.VSUplinkPorts, vs.VSUplinkPortIds])

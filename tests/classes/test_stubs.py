@@ -72,6 +72,7 @@ value: int = mtu.value
 ok: int = vs.VSDVS_GetMTU("a", mtu.pointer)
 lags = vs.Cell("VSLAGTable *")
 table: Optional[vs.VSLAGTable] = lags.value
+entries: List[str] = [one.macAddress for one in vs.VSQEX_GetTeamMACTable("a", 3)[1]]
 several = vs.Cell("VSLAGTable *", [vs.VSLAGTable(), None])
 one: Optional[vs.VSLAGTable] = several[0]
 bits: List[int] = vs.VSVLANBitmap().bits[0:3]
