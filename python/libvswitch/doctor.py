@@ -18,7 +18,7 @@ import sys
 import sysconfig
 from importlib.machinery import EXTENSION_SUFFIXES, PathFinder
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, Optional, Set
+from typing import Any, Dict, List, Optional, Set
 
 from libvswitch import _elf
 
@@ -271,7 +271,7 @@ def _first(names: List[str]) -> str:
     return f"{shown} and {more} more, all of which --json names" if more > 0 else shown
 
 
-def _child(program: str, environment: Mapping[str, str]) -> "subprocess.CompletedProcess[bytes]":
+def _child(program: str, environment: Dict[str, str]) -> "subprocess.CompletedProcess[bytes]":
     return subprocess.run(
         [sys.executable, "-c", program, json.dumps(sys.path)],
         env=environment,
@@ -284,7 +284,7 @@ def _child(program: str, environment: Mapping[str, str]) -> "subprocess.Complete
 def _load(report: Report) -> None:
     """What a child finds that loads the module as a tool would."""
     try:
-        done = _child(_CHILD, os.environ)
+        done = _child(_CHILD, dict(os.environ))
     except (OSError, subprocess.SubprocessError) as error:
         report.add(ERROR, "loading", f"no child process could load the module: {error}")
         return
