@@ -45,6 +45,19 @@ def readers(known: Definitions) -> Tuple[Dict[str, Any], List[str], List[str], L
     return arrays, views, booleans, addresses
 
 
+def is_whole(known: Definitions, given: Type) -> bool:
+    """Whether the bytes of a value are all of it: no pointer among them, and nothing after them."""
+    type_ = known.resolve(given)
+    if type_.is_array:
+        return type_.count is not None and is_whole(known, type_.target)
+    record = known.records.get(type_.name)
+    if type_.layers or record is None:
+        return not type_.layers
+    if record.constructor:  # it takes the size
+        return False
+    return all(is_whole(known, one.type) and not one.count for one in record.fields)
+
+
 def methods(known: Definitions) -> Dict[str, List[str]]:
     """Methods that answer a place in their record, and those that answer a pointer to a number."""
     found: Dict[str, List[str]] = {"views": [], "numbers": []}
@@ -81,6 +94,11 @@ def layout(known: Definitions) -> str:
     calls = [call for call in known.functions if call.name.startswith(("VS", "DVS", "DVP"))]
     tables: Dict[str, Any] = {
         "RECORDS": [one.name for one in known.records.values() if not one.is_inner],
+        "WHOLE_RECORDS": [
+            one.name
+            for one in known.records.values()
+            if not one.is_inner and is_whole(known, Type((), one.name))
+        ],
         "ARRAYS": arrays,
         "VIEWS": views,
         "BOOLEANS": booleans,

@@ -3,6 +3,7 @@
 from typing import Dict, List, Tuple, Union
 
 RECORDS: List[str]
+WHOLE_RECORDS: List[str]
 ARRAYS: Dict[str, Tuple[str, int, Union[None, int, str]]]
 VIEWS: List[str]
 BOOLEANS: List[str]

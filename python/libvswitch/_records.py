@@ -37,6 +37,20 @@ class _Pointing:
     def __hash__(self) -> int:
         return hash(int(self))
 
+    def __copy__(self) -> Any:
+        raise TypeError(
+            f"{type(self).__name__} objects cannot be copied; "
+            "records are if their bytes are all of them"
+        )
+
+    def __deepcopy__(self, memo: Dict[int, Any]) -> Any:
+        return self.__copy__()
+
+    def __reduce_ex__(self, protocol: Any) -> typing.NoReturn:
+        raise TypeError(
+            f"{type(self).__name__} objects cannot be pickled; they are memory of this process"
+        )
+
     def _handed_out(self) -> List["_Pointing"]:
         """What a call of the library has handed out through this object."""
         return [self]
@@ -109,6 +123,16 @@ class Record(_Pointing):
             return f"<{type(self).__name__} that is gone>"
         shown = [f"{name}={_shown(getattr(self, name))}" for name in self._fields]
         return f"{type(self).__name__}({', '.join(shown)})"
+
+    def __copy__(self) -> "Record":
+        """The same bytes in a record of the caller's own, where these are all of the record."""
+        name = type(self).__name__
+        if name not in _layout.WHOLE_RECORDS:
+            super().__copy__()
+        self._require()
+        made = CLASSES[name]()
+        ctypes.memmove(int(made), int(self), _memory.RECORD_SIZES[name])
+        return made
 
     def own(self, owned: Optional[bool] = None) -> bool:
         """Whether Python owned the record; with an argument, makes it so."""

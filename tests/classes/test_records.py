@@ -1,6 +1,8 @@
 """Records as objects: sequences, arrays, printing, and memory that stays while it is seen."""
 
+import copy
 import os
+import pickle
 import subprocess
 import sys
 from typing import Any, Callable, List
@@ -311,3 +313,65 @@ def test_a_record_that_is_never_freed_would_be_noticed() -> None:
         "print(peak() - before < 50_000)"
     )
     assert (done.returncode, done.stdout) == (0, "False\n")
+
+
+@pytest.mark.parametrize("copied", [copy.copy, copy.deepcopy])
+def test_a_copy_is_a_record_of_its_own(copied: Callable[[Any], Any], switch: str) -> None:
+    info = vs.VSPortInfo()
+    info.stats.pktsTx, info.dvPortId[0] = 7, 8
+    other = copied(info)
+    assert type(other) is vs.VSPortInfo and other != info and other.thisown
+    info.stats.pktsTx = info.dvPortId[0] = 0
+    assert (other.stats.pktsTx, other.dvPortId[0]) == (7, 8)
+    stats = copied(other.stats)
+    del other
+    assert stats.pktsTx == 7 and stats.thisown
+
+    with vs.owned(vs.VSQEX_GetUplinks(switch)) as (_, uplinks):
+        names = list(uplinks)
+        entries = [copied(entry) for entry in uplinks.entries]
+    assert [entry.name.string for entry in entries] == names
+    with pytest.raises(ValueError, match="^this VSUplinks_entries is gone"):
+        with vs.owned(vs.VSQEX_GetUplinks(switch)) as (_, uplinks):
+            entry = uplinks.entries[0]
+        copied(entry)
+
+
+def beyond_their_bytes() -> List[Any]:
+    """What has more to it than the bytes of its record, as the headers declare it."""
+    return [
+        vs.VSUplinks(1),
+        vs.VSRuntimeOptions(64),
+        vs.VSMACTable(),
+        vs.DVPortList(),
+        vs.VSPortVlanPolicy(),
+        vs.qex_ListLinks(),
+        vs.VSVLANBitmap().bits,
+        vs.new_vidrangeArray(1),
+        vs.Cell("int", 5),
+        vs.Cell("int").pointer,
+        vs.Callback(print),
+    ]
+
+
+@pytest.mark.parametrize("given", beyond_their_bytes(), ids=lambda one: type(one).__name__)
+@pytest.mark.parametrize("copied", [copy.copy, copy.deepcopy])
+def test_what_is_more_than_its_bytes_is_not_copied(
+    copied: Callable[[Any], Any], given: Any
+) -> None:
+    with pytest.raises(TypeError) as raised:
+        copied(given)
+    assert str(raised.value) == (
+        f"{type(given).__name__} objects cannot be copied; "
+        "records are if their bytes are all of them"
+    )
+
+
+@pytest.mark.parametrize("protocol", range(pickle.HIGHEST_PROTOCOL + 1))
+def test_memory_is_not_pickled(protocol: int) -> None:
+    for given in (vs.VSInfo(), *beyond_their_bytes()):
+        with pytest.raises(TypeError) as raised:
+            pickle.dumps(given, protocol)
+        assert str(raised.value) == (
+            f"{type(given).__name__} objects cannot be pickled; they are memory of this process"
+        )
