@@ -183,13 +183,16 @@ def _host(report: Report, module: _elf.Elf) -> List[_elf.Elf]:
 
 
 def _library(report: Report, name: str, module: _elf.Elf) -> Optional[_elf.Elf]:
-    """The file that the loader takes: it passes over those of other machines, and gives up at one
-    that is no library."""
+    """The file that the loader takes: it passes over those that are for other machines or not to
+    be read, and gives up at one that is no library."""
     for path in _candidates(name, module):
         try:
             machine = _elf.machine_of(path)
             if machine == module.machine:
                 return _elf.read(path)
+            why = f"is for {machine}, the module for {module.machine}"
+        except PermissionError:
+            why = "may not be read"
         except (OSError, _elf.NotElf) as error:
             what = f"{path} is a folder" if path.is_dir() else str(error)
             report.add(
@@ -199,8 +202,7 @@ def _library(report: Report, name: str, module: _elf.Elf) -> Optional[_elf.Elf]:
                 "put this host's own library there, or take its folder out of LD_LIBRARY_PATH",
             )
             return None
-        text = f"{name}: {path} is for {machine}, the module for {module.machine}"
-        report.add(NOTE, "host", f"{text}: the loader passes over it")
+        report.add(NOTE, "host", f"{name}: {path} {why}: the loader passes over it")
     report.add(
         ERROR,
         "host",

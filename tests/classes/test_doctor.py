@@ -274,6 +274,28 @@ def test_a_foreign_library_is_passed_over(
         assert os.path.samefile(found["host"][name], SIMHOST / name)
 
 
+def test_a_library_that_may_not_be_read_is_passed_over(
+    tmp_path: Path, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    machine_of, locked = _elf.machine_of, tmp_path / "libvswitch.so"
+    locked.touch()
+
+    def refuse(path: Path) -> str:  # as the system does, though not to root
+        if path == locked:
+            raise PermissionError(f"[Errno 13] Permission denied: '{path}'")
+        return machine_of(path)
+
+    monkeypatch.setattr(_elf, "machine_of", refuse)
+    monkeypatch.setenv("LD_LIBRARY_PATH", str(tmp_path))
+    found = doctor.Report()
+    module = doctor._module(found)
+    assert module is not None
+    library = doctor._library(found, "libvswitch.so", module)
+    assert library is not None and os.path.samefile(library.path, SIMHOST / "libvswitch.so")
+    (note,) = [one.text for one in found.findings if one.level == "note"]
+    assert note == f"libvswitch.so: {locked} may not be read: the loader passes over it"
+
+
 def test_a_library_of_the_other_byte_order_is_not(tmp_path: Path) -> None:
     wrong = planted(tmp_path / "wrong", DATA, 2)
     assert not loads(FOLDER, wrong)
