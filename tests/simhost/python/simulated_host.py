@@ -50,6 +50,15 @@ class Host:
         assert done.returncode == 1 and done.stdout == "", words
         return done.stderr
 
+    def complaint(self, *words: str) -> str:
+        """What simhostctl finds wrong with the words themselves; it must find something."""
+        done = self.run(*words)
+        assert (done.returncode, done.stdout) == (2, ""), words
+        found, more = done.stderr.splitlines()
+        assert more == "Run with --help for more information."
+        assert found.startswith("simhostctl: ")
+        return found[len("simhostctl: ") :]
+
     def apply(self, document: Dict[str, Any]) -> None:
         self.ctl("apply", "-", given=json.dumps(document))
 

@@ -193,9 +193,7 @@ ODD_NUMBERS = [
 def test_numbers_are_read_as_in_documents(host: Host, words: str, complaint: str) -> None:
     host.ctl("clock", "stop")
     before = host.described()
-    done = host.run(*words.split())
-    assert done.returncode != 0
-    assert complaint in done.stdout + done.stderr
+    assert host.complaint(*words.split()) == complaint
     assert host.described() == before
 
 
@@ -269,6 +267,43 @@ def test_needs_to_know_which_host(host: Host, tmp_path: Path) -> None:
     state = host.environment.pop("SIMHOST_STATE")
     assert "--state FILE or SIMHOST_STATE" in host.refusal("show")
     assert host.ctl("--state", state, "show").startswith("host\n")
+
+
+WRONG_WORDS = [
+    ("", "a command is missing"),
+    ("clock", "a command is missing"),
+    ("lnk nic0 down", "there is no command 'lnk'"),
+    ("clock stp", "there is no command 'stp'"),
+    ("--speed 5 show", "there is no option '--speed'"),
+    ("show --jsn", "there is no option '--jsn'"),
+    ("link nic0 down now", "there is no use for 'now'"),
+    ("link nic0 --foo", "there is no option '--foo'"),
+    ("link nic0", "state is required"),
+    ("link nic0 sideways", "state: sideways not in {up,down}"),
+    (
+        "fault add VSDVS_SetMTU --delay soon",
+        "--delay: Value soon not in range 0.000000 to 1000000.000000",
+    ),
+]
+
+
+@pytest.mark.parametrize("words, complaint", WRONG_WORDS)
+def test_wrong_words_are_named(host: Host, words: str, complaint: str) -> None:
+    assert host.complaint(*words.split()) == complaint
+    del host.environment["SIMHOST_STATE"]
+    assert host.complaint(*words.split()) == complaint
+
+
+def test_tells_its_version_without_a_host(host: Host) -> None:
+    del host.environment["SIMHOST_STATE"]
+    of_the_library = host.python(
+        """
+simhost.simhost_version.restype = ctypes.c_char_p
+print("simhostctl", simhost.simhost_version().decode())
+"""
+    )
+    assert host.ctl("--version") == of_the_library
+    assert re.fullmatch(r"simhostctl \d+\.\d+\.\d+\n", of_the_library)
 
 
 COMMANDS = (
