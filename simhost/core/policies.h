@@ -1,4 +1,5 @@
-// What the host accepts as a policy. Each function refuses a record that it does not.
+// What the host does without a policy, and what it accepts as one. Each function refuses a record
+// that it does not.
 #pragma once
 
 #include "vswitch/mac_learning.h"
@@ -7,6 +8,19 @@
 #include "vswitch/teaming.h"
 
 namespace simhost {
+
+/// The teaming of a switch that has none set: all uplinks, chosen by the port that sends.
+inline constexpr VSTeamPolicy kDefaultTeaming{
+    .loadBalance = TEAM_FRP_TYPE_LB_SRCID,
+    .linkCriteria = TEAM_FRP_CRIT_LINK_STATE,
+    .percentError = 0,
+    .fullDuplex = 0,
+    .speed = 0,
+    .flags = TEAM_FRP_FLAG_ALL_AVAILABLE | TEAM_FRP_FLAG_NOTIFY_SWITCH,
+    .numActive = 0,
+    .numStandby = 0,
+    .uplinkPortName = {},
+};
 
 /// Refuses unknown values and bits, no or the same name twice (QEX_BAD_PARAM), more than
 /// QEX_TEAM_MAX_UPLINKS names (QEX_LIMIT_EXCEEDED) and a name that does not end

@@ -6,6 +6,7 @@
 
 #include "core/bytes.h"
 #include "core/known.h"
+#include "core/policies.h"
 #include "core/ports.h"
 #include "core/runtime_options.h"
 #include "dataplane/policies.h"
@@ -15,18 +16,6 @@
 
 namespace simhost::dataplane {
 namespace {
-
-constexpr VSTeamPolicy kDefaultPolicy{
-    .loadBalance = TEAM_FRP_TYPE_LB_SRCID,
-    .linkCriteria = TEAM_FRP_CRIT_LINK_STATE,
-    .percentError = 0,
-    .fullDuplex = 0,
-    .speed = 0,
-    .flags = TEAM_FRP_FLAG_ALL_AVAILABLE | TEAM_FRP_FLAG_NOTIFY_SWITCH,
-    .numActive = 0,
-    .numStandby = 0,
-    .uplinkPortName = {},
-};
 
 bool is_settled(Team const &team, Link const &link) {
   return team.up_delay == ClockTime::zero() || link.up_since == ClockTime::zero() ||
@@ -123,7 +112,7 @@ Team team_of(store::Transaction &transaction, store::SwitchKey key) {
             .lags = lags_of(transaction, key),
             .policy = policy<VSTeamPolicy>(transaction, store::PropertyOwner::global(key),
                                            VSPROP_SWITCH_TEAMING)
-                          .value_or(kDefaultPolicy),
+                          .value_or(kDefaultTeaming),
             .now = clock_now(transaction),
             .up_delay = ClockTime(runtime_number(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY))};
   for (auto const &[name, number] : store::uplinks_of(transaction, key)) {

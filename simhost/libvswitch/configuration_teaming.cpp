@@ -2,6 +2,7 @@
 #include <algorithm>
 #include <string>
 
+#include "core/policies.h"
 #include "core/targets.h"
 #include "vswitch/configuration.h"
 #include "vswitch/properties.h"
@@ -17,18 +18,8 @@ using simhost::switch_identified;
 
 namespace {
 
-// All uplinks, chosen by the port that sends.
-constexpr RecordProperty<VSTeamPolicy> kSwitchTeaming{
-    .key = VSPROP_SWITCH_TEAMING,
-    .unset = {.loadBalance = TEAM_FRP_TYPE_LB_SRCID,
-              .linkCriteria = TEAM_FRP_CRIT_LINK_STATE,
-              .percentError = 0,
-              .fullDuplex = 0,
-              .speed = 0,
-              .flags = TEAM_FRP_FLAG_ALL_AVAILABLE | TEAM_FRP_FLAG_NOTIFY_SWITCH,
-              .numActive = 0,
-              .numStandby = 0,
-              .uplinkPortName = {}}};
+constexpr RecordProperty<VSTeamPolicy> kSwitchTeaming{.key = VSPROP_SWITCH_TEAMING,
+                                                      .unset = simhost::kDefaultTeaming};
 constexpr RecordProperty<qex_Bool> kTxUplink{.key = VSPROP_PORT_TX_UPLINK, .unset = 0};
 
 // What a port uses: its own policy, or else its switch's.

@@ -10,12 +10,26 @@ PortNumber number_at(Query const &query, int column) {
   return PortNumber(static_cast<std::uint32_t>(query.integer(column)));
 }
 
-// Of a row of number, switch, identifier, is_uplink.
+// What port_at() reads; a macro, so that a statement is one literal.
+#define SELECT_PORT "SELECT number, switch, identifier, is_uplink FROM port"
+
 Port port_at(Query const &query) {
   return {.number = number_at(query, 0),
           .switch_key = SwitchKey{query.integer(1)},
           .identifier = query.text(2),
           .kind = query.integer(3) != 0 ? PortKind::uplink : PortKind::client};
+}
+
+std::optional<Port> port_from(Query &select) {
+  return select.next() ? std::optional(port_at(select)) : std::nullopt;
+}
+
+std::vector<Port> ports_from(Query &select) {
+  std::vector<Port> ports;
+  while (select.next()) {
+    ports.push_back(port_at(select));
+  }
+  return ports;
 }
 
 // Of a row of name, port; numbers of ports begin at 1.
@@ -44,43 +58,25 @@ std::optional<PortNumber> add_port(Transaction &transaction, SwitchKey switch_ke
 
 std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
                               std::string_view identifier) {
-  auto select = transaction.query(
-      "SELECT number, switch, identifier, is_uplink FROM port"
-      " WHERE switch = ? AND identifier = ?");
-  if (!select.with(std::int64_t(switch_key)).with(identifier).next()) {
-    return std::nullopt;
-  }
-  return port_at(select);
+  auto select = transaction.query(SELECT_PORT " WHERE switch = ? AND identifier = ?");
+  return port_from(select.with(std::int64_t(switch_key)).with(identifier));
 }
 
 std::optional<Port> find_port(Transaction &transaction, PortNumber number) {
-  auto select =
-      transaction.query("SELECT number, switch, identifier, is_uplink FROM port WHERE number = ?");
-  if (!select.with(std::int64_t(number)).next()) {
-    return std::nullopt;
-  }
-  return port_at(select);
+  auto select = transaction.query(SELECT_PORT " WHERE number = ?");
+  return port_from(select.with(std::int64_t(number)));
 }
 
 std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey switch_key,
                                              std::string_view external_id) {
-  auto select = transaction.query(
-      "SELECT number, switch, identifier, is_uplink FROM port"
-      " WHERE switch = ? AND external_id = ?");
-  if (!select.with(std::int64_t(switch_key)).with(external_id).next()) {
-    return std::nullopt;
-  }
-  return port_at(select);
+  auto select = transaction.query(SELECT_PORT " WHERE switch = ? AND external_id = ?");
+  return port_from(select.with(std::int64_t(switch_key)).with(external_id));
 }
 
 std::optional<Port> next_port(Transaction &transaction, SwitchKey switch_key, PortNumber number) {
-  auto select = transaction.query(
-      "SELECT number, switch, identifier, is_uplink FROM port"
-      " WHERE switch = ? AND number > ? ORDER BY number LIMIT 1");
-  if (!select.with(std::int64_t(switch_key)).with(std::int64_t(number)).next()) {
-    return std::nullopt;
-  }
-  return port_at(select);
+  auto select =
+      transaction.query(SELECT_PORT " WHERE switch = ? AND number > ? ORDER BY number LIMIT 1");
+  return port_from(select.with(std::int64_t(switch_key)).with(std::int64_t(number)));
 }
 
 std::string external_id_of(Transaction &transaction, PortNumber number) {
@@ -98,14 +94,8 @@ void remove_port(Transaction &transaction, PortNumber number) {
 }
 
 std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key) {
-  auto select = transaction.query(
-      "SELECT number, switch, identifier, is_uplink FROM port WHERE switch = ? ORDER BY number");
-  select.with(std::int64_t(switch_key));
-  std::vector<Port> ports;
-  while (select.next()) {
-    ports.push_back(port_at(select));
-  }
-  return ports;
+  auto select = transaction.query(SELECT_PORT " WHERE switch = ? ORDER BY number");
+  return ports_from(select.with(std::int64_t(switch_key)));
 }
 
 std::vector<PortNumber> client_numbers(Transaction &transaction, SwitchKey switch_key) {
@@ -162,15 +152,8 @@ void attach_uplink(Transaction &transaction, std::string_view name, PortNumber p
 }
 
 std::vector<Port> uplink_ports_of(Transaction &transaction, SwitchKey switch_key) {
-  auto select = transaction.query(
-      "SELECT number, switch, identifier, is_uplink FROM port"
-      " WHERE switch = ? AND is_uplink ORDER BY number");
-  select.with(std::int64_t(switch_key));
-  std::vector<Port> ports;
-  while (select.next()) {
-    ports.push_back(port_at(select));
-  }
-  return ports;
+  auto select = transaction.query(SELECT_PORT " WHERE switch = ? AND is_uplink ORDER BY number");
+  return ports_from(select.with(std::int64_t(switch_key)));
 }
 
 std::optional<std::string> uplink_at(Transaction &transaction, PortNumber number) {
