@@ -131,7 +131,7 @@ class Cell(_records._Pointing):
 
     def _require_pointers(self) -> None:
         if self._is_scalar:
-            raise TypeError(f"a {self.type} points to nothing")
+            raise TypeError(f"a cell of {self.type} points to nothing")
 
     def _pointing(self, value: Any) -> _records._Pointing:
         """What a pointer reads as that is set to this value."""

@@ -223,7 +223,7 @@ def test_a_pointer_object_without_a_class_is_no_result(switch: str) -> None:
 def test_a_cell_of_numbers_holds_no_memory() -> None:
     doors: List[Callable[[Any], Any]] = [vs.owned, vs.VSQEX_FreeMemory]
     for take in doors:
-        with pytest.raises(TypeError, match="^a int points to nothing$"):
+        with pytest.raises(TypeError, match="^a cell of int points to nothing$"):
             take(vs.Cell("int", 5))
 
 
