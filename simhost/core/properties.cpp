@@ -126,7 +126,6 @@ std::optional<store::NamedProperty> next_property(store::Transaction &transactio
 
 void clear_property(store::Transaction &transaction, store::PropertyOwner const &owner,
                     std::string_view key) {
-  check_key(owner, key);
   auto const *const known = key_of(owner, key);
   if (known != nullptr && known->read != nullptr) {
     throw Refused(QEX_READ_ONLY);

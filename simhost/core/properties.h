@@ -36,8 +36,8 @@ SIMHOST_API std::optional<store::NamedProperty> next_property(store::Transaction
                                                               store::PropertyOwner const &owner,
                                                               std::string_view name);
 
-/// Clears a property. Refuses one that is not set (QEX_NOT_FOUND) and one that the host keeps
-/// elsewhere (QEX_READ_ONLY).
+/// Clears a property. Refuses one that is not set, which whatever cannot be set never is
+/// (QEX_NOT_FOUND), and one that the host keeps elsewhere (QEX_READ_ONLY).
 SIMHOST_API void clear_property(store::Transaction &transaction, store::PropertyOwner const &owner,
                                 std::string_view key);
 /// Likewise, but it need not be set.

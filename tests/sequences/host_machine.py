@@ -303,7 +303,7 @@ class HostMachine(RuleBasedStateMachine):
         port, key = setting
         refusals, held = self._owner(alias, port)
         name, names = self._raw("Get", alias, port)
-        refusals = refusals | held.refusals_to_get(key)
+        refusals = refusals | held.refusals_to_find(key)
         answer = self.call(name, refusals, doors.block_of, getattr(vs, name), *names, key)
         if answer is not None:
             assert answer[0].data == held.all[key][0]
@@ -314,7 +314,7 @@ class HostMachine(RuleBasedStateMachine):
         port, key = setting
         refusals, held = self._owner(alias, port)
         name, names = self._raw("Clear", alias, port)
-        refusals = refusals | held.refusals_to_clear(key)
+        refusals = refusals | held.refusals_to_find(key)
         if self.call(name, refusals, getattr(vs, name), *names, key) is not None:
             del held.all[key]
 

@@ -77,12 +77,9 @@ class Properties:
         fits = key == NOTE or (known is not None and known.allows(data))
         return set() if fits else {"QEX_BAD_PARAM"}
 
-    def refusals_to_get(self, key: str) -> Refusals:
+    def refusals_to_find(self, key: str) -> Refusals:
+        """To read it or to clear it: what cannot be set is not set."""
         return set() if key in self.all else {"QEX_NOT_FOUND"}
-
-    def refusals_to_clear(self, key: str) -> Refusals:
-        foreign = key != NOTE and key not in self._known
-        return self.refusals_to_get(key) | ({"QEX_BAD_PARAM"} if foreign else set())
 
     def value(self, known: Property) -> int:
         """What a typed call reads."""

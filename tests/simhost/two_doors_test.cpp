@@ -344,6 +344,38 @@ TEST_F(TwoDoors, AClearedPropertyReadsAsItsDefault) {
   }
 }
 
+TEST_F(TwoDoors, AKeyThatCannotBeSetIsNotThere) {
+  auto const too_long = std::string(256, 'k');
+  struct {
+    bool of_port;
+    char const *key;
+    QEX_ReturnStatus set;
+  } const cases[] = {{true, VSPROP_MTU, QEX_BAD_PARAM},
+                     {false, VSPROP_PORT_SECURITY, QEX_BAD_PARAM},
+                     {true, "", QEX_BAD_PARAM},
+                     {false, "", QEX_BAD_PARAM},
+                     {true, too_long.c_str(), QEX_NAME_TOO_LONG},
+                     {false, too_long.c_str(), QEX_NAME_TOO_LONG}};
+  ASSERT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK);
+  for (auto const &[of_port, key, status] : cases) {
+    auto const value = bytes_of(qex_uint32{1500});
+    EXPECT_EQ(of_port ? set_port(key, value) : set_global(key, value), status) << key;
+    void *data = nullptr;
+    int length = 0;
+    EXPECT_EQ(of_port ? DVSQEX_PortDataGet("s-id", "p", key, &data, &length)
+                      : DVSQEX_GlobalPropGet("s-id", key, &data, &length),
+              QEX_NOT_FOUND)
+        << key;
+    EXPECT_EQ(
+        of_port ? DVSQEX_PortDataClear("s-id", "p", key) : DVSQEX_GlobalPropClear("s-id", key),
+        QEX_NOT_FOUND)
+        << key;
+  }
+  qex_uint32 mtu = 0;
+  EXPECT_EQ(VSDVS_GetMTU("s", &mtu), QEX_OK);
+  EXPECT_EQ(mtu, 9000U) << "of the switch itself";
+}
+
 TEST_F(TwoDoors, TypedClearsAreRawClears) {
   struct {
     char const *key;
