@@ -75,6 +75,8 @@ void end_without_status(Ending &ending, char const *call) noexcept {
     throw;
   } catch (HostPanic const &panic) {
     give_up(ending, panic, call);
+  } catch (store::UnusableState const &error) {
+    give_up(ending, PanicKind::os_error, call, error.what());
   } catch (std::exception const &error) {
     give_up(ending, PanicKind::runtime_error, call, error.what());
   } catch (...) {

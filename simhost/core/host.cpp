@@ -6,6 +6,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <string_view>
+#include <system_error>
 
 #include "core/fresh_host.h"
 
@@ -22,6 +23,16 @@ void before_fork() {
 
 void after_fork() {
   this_host().lock().unlock();
+}
+
+// Absolute, because it may be opened again after the process has changed its directory.
+std::filesystem::path absolute(std::filesystem::path const &named) {
+  std::error_code error;
+  auto file = std::filesystem::absolute(named, error);
+  if (error) {
+    store::refuse_file(named, "the current folder: " + error.message());
+  }
+  return file;
 }
 
 // Asked for by a test that wants to know what it forgot to give back.
@@ -53,8 +64,7 @@ store::Store &Host::state() {
   if (!configured_) {
     if (char const *const named = std::getenv("SIMHOST_STATE");
         named != nullptr && *named != '\0') {
-      // Absolute, because it may be opened again after the process has changed its directory.
-      state_file_ = std::filesystem::absolute(named);
+      state_file_ = absolute(named);
     }
     configured_ = true;
   }

@@ -32,10 +32,6 @@ auto patiently(Work const &work) {
   }
 }
 
-std::string reason(std::filesystem::path const &file, std::string_view why) {
-  return "the state file " + file.string() + " cannot be used: " + std::string(why);
-}
-
 std::int64_t integer_of(SQLite::Database &database, char const *sql) {
   return database.execAndGet(sql).getInt64();
 }
@@ -59,6 +55,10 @@ bool is_blank(SQLite::Database &database) {
 }
 
 }  // namespace
+
+void refuse_file(std::filesystem::path const &file, std::string const &why) {
+  throw UnusableState("the state file " + file.string() + " cannot be used: " + why);
+}
 
 Query::~Query() {
   statement_.tryReset();
@@ -120,12 +120,12 @@ Store::Store(std::optional<std::filesystem::path> const &file, Furnish const &fu
     prepare_file(furnish);
   }
 } catch (UnusableState const &error) {
-  throw UnusableState(reason(file.value_or(":memory:"), error.what()));
+  refuse_file(file.value_or(":memory:"), error.what());
 } catch (SQLite::Exception const &error) {
   if (error.getErrorCode() == SQLITE_BUSY) {
     throw;
   }
-  throw UnusableState(reason(file.value_or(":memory:"), error.what()));
+  refuse_file(file.value_or(":memory:"), error.what());
 }
 
 void Store::prepare_file(Furnish const &furnish) {

@@ -23,6 +23,9 @@ class UnusableState : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
+/// Throws UnusableState.
+[[noreturn]] void refuse_file(std::filesystem::path const &file, std::string const &why);
+
 /// One run of a prepared statement. It resets the statement when it goes, because a statement left
 /// in the middle of its rows would keep its transaction from ending.
 class Query {

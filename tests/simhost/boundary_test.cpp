@@ -1,6 +1,7 @@
 // The host through its two libraries, in a process that has a call trap.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <array>
 #include <cstdio>
@@ -14,6 +15,7 @@
 #include "nebpublic/data.h"
 #include "nebpublic/kernel_state.h"
 #include "nebpublic/names.h"
+#include "nebpublic/state.h"
 #include "trap_globals.h"
 #include "vswitch/configuration.h"
 #include "vswitch/queries.h"
@@ -248,6 +250,39 @@ TEST(StateFile, ThatCannotBeOpenedSpringsTheTrap) {
       testing::ExitedWithCode(0),
       "^OSError: VSDVS_DestroyVSwitch: the state file /nowhere/host.db cannot be used: unable to "
       "open database file\\.$");
+}
+
+TEST(StateFile, ThatCannotBeOpenedSpringsTheTrapOfACallWithoutStatus) {
+  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  EXPECT_EXIT(
+      {
+        setenv("SIMHOST_STATE", "/nowhere/host.db", 1);
+        auto const raised = raised_by([] { DVSState_SwitchFindByAlias("s"); });
+        std::fprintf(stderr, "%s: %s.", raised.value().type.c_str(), raised->message.c_str());
+        std::exit(0);
+      },
+      testing::ExitedWithCode(0),
+      "^OSError: DVSState_SwitchFindByAlias: the state file /nowhere/host.db cannot be used: "
+      "unable to open database file\\.$");
+}
+
+TEST(StateFile, InAFolderThatIsGoneSpringsTheTrap) {
+  GTEST_FLAG_SET(death_test_style, "threadsafe");
+  EXPECT_EXIT(
+      {
+        auto folder = testing::TempDir() + "gone-XXXXXX";
+        if (mkdtemp(folder.data()) == nullptr || chdir(folder.c_str()) != 0 ||
+            rmdir(folder.c_str()) != 0) {
+          std::exit(1);
+        }
+        setenv("SIMHOST_STATE", "host.db", 1);
+        auto const raised = raised_by([] { VSDVS_DestroyVSwitch("s"); });
+        std::fprintf(stderr, "%s: %s.", raised.value().type.c_str(), raised->message.c_str());
+        std::exit(0);
+      },
+      testing::ExitedWithCode(0),
+      "^OSError: VSDVS_DestroyVSwitch: the state file host.db cannot be used: the current folder: "
+      "No such file or directory\\.$");
 }
 
 TEST(StateFile, AnEmptyNameMeansMemory) {
