@@ -347,17 +347,17 @@ TEST_F(TwoDoors, AClearedPropertyReadsAsItsDefault) {
 TEST_F(TwoDoors, AKeyThatCannotBeSetIsNotThere) {
   auto const too_long = std::string(256, 'k');
   struct {
-    bool of_port;
     char const *key;
     QEX_ReturnStatus set;
-  } const cases[] = {{true, VSPROP_MTU, QEX_BAD_PARAM},
-                     {false, VSPROP_PORT_SECURITY, QEX_BAD_PARAM},
-                     {true, "", QEX_BAD_PARAM},
-                     {false, "", QEX_BAD_PARAM},
-                     {true, too_long.c_str(), QEX_NAME_TOO_LONG},
-                     {false, too_long.c_str(), QEX_NAME_TOO_LONG}};
+    bool of_port;
+  } const cases[] = {{VSPROP_MTU, QEX_BAD_PARAM, true},
+                     {VSPROP_PORT_SECURITY, QEX_BAD_PARAM, false},
+                     {"", QEX_BAD_PARAM, true},
+                     {"", QEX_BAD_PARAM, false},
+                     {too_long.c_str(), QEX_NAME_TOO_LONG, true},
+                     {too_long.c_str(), QEX_NAME_TOO_LONG, false}};
   ASSERT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK);
-  for (auto const &[of_port, key, status] : cases) {
+  for (auto const &[key, status, of_port] : cases) {
     auto const value = bytes_of(qex_uint32{1500});
     EXPECT_EQ(of_port ? set_port(key, value) : set_global(key, value), status) << key;
     void *data = nullptr;
