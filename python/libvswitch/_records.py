@@ -86,6 +86,7 @@ class Record(_Pointing):
     thisown: bool
     __swig_destroy__: ClassVar[Any]
     _fields: ClassVar[Tuple[str, ...]] = ()
+    _views: ClassVar[Tuple[str, ...]] = ()
 
     def __init_subclass__(cls) -> None:
         members = vars(cls)
@@ -102,6 +103,12 @@ class Record(_Pointing):
             name
             for name, member in vars(cls).items()
             if isinstance(member, property) and name != "thisown" and not name.startswith(hidden)
+        )
+        counts = [_layout.ARRAYS.get(f"{cls.__name__}_{name}", (None,))[-1] for name in cls._fields]
+        cls._views = tuple(
+            name
+            for name, count in zip(cls._fields, counts)
+            if isinstance(count, str) and counts.count(count) > 1
         )
         # An access by index alone would let Python iterate without an end.
         if "__getitem__" in vars(cls) and not issubclass(cls, Table):
@@ -121,8 +128,12 @@ class Record(_Pointing):
     def __repr__(self) -> str:
         if not int(self):
             return f"<{type(self).__name__} that is gone>"
-        shown = [f"{name}={_shown(getattr(self, name))}" for name in self._fields]
+        shown = [f"{name}={self._shown(name)}" for name in self._fields]
         return f"{type(self).__name__}({', '.join(shown)})"
+
+    def _shown(self, name: str) -> str:
+        # One of the views of the same entries is as long as they are; the record knows not which.
+        return "..." if name in self._views else _shown(getattr(self, name))
 
     def __copy__(self) -> "Record":
         """The same bytes in a record of the caller's own, where these are all of the record."""

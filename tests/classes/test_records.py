@@ -102,6 +102,16 @@ def test_printing_shows_type_and_fields() -> None:
     assert "name=uplink 1" in repr(entry_named(name))
 
 
+def test_printing_reads_no_view_that_may_be_longer_than_the_record() -> None:
+    filters = vs.VSMcastFilters()
+    filters.numEntries = 1
+    views = "macEntries=..., ipv4Entries=..., ipv6Entries=..."
+    assert repr(filters) == f"VSMcastFilters(totalEntries=0, numEntries=1, {views})"
+    stats = vs.VSMcastFilterStats()
+    stats.numEntries = 1
+    assert repr(stats).endswith("numEntries=1, ipv4Entries=..., ipv6Entries=...)")
+
+
 def entry_named(name: Any) -> Any:
     entry = vs.VSUplinks_entries()
     entry.name = name
