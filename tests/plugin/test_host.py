@@ -211,6 +211,14 @@ MISTAKES = [
     (lambda host: host.learn(b"s", LEARNED), TypeError("switch is a str, not b's'")),
     (lambda host: host.learn("s", b"02:"), TypeError("mac is a str, not b'02:'")),
     (lambda host: host.learn("s", LEARNED, b"p"), TypeError("port is a str, not b'p'")),
+    (
+        lambda host: host.set_counter("s", "n", -1),
+        ValueError("a counter has 64 bits and no sign, which -1 does not fit"),
+    ),
+    (
+        lambda host: host.set_counter("s", "n", 2**64),
+        ValueError(f"a counter has 64 bits and no sign, which {2**64} does not fit"),
+    ),
     (lambda host: host.set_counter(1, "n", 1), TypeError("switch is a str, not 1")),
     (lambda host: host.set_counter("s", 2, 1), TypeError("name is a str, not 2")),
     (lambda host: host.set_counter("s", "n", 1, port=3), TypeError("port is a str, not 3")),

@@ -27,8 +27,8 @@ class Clock:
     def now(self) -> float:
         """Seconds since the beginning of 1970.
 
-        >>> host.clock.set(1000.5)
         >>> host.clock.stop()
+        >>> host.clock.set(1000.5)
         >>> host.clock.now
         1000.5
         """
@@ -184,6 +184,8 @@ class SimulatedHost:
 
         >>> host.set_counter("vswitch0", "txErrors", 3)
         """
+        if not 0 <= value < 2**64:
+            raise ValueError(f"a counter has 64 bits and no sign, which {value} does not fit")
         optional = _optional_text("port", port), _optional_text("session", session)
         self._control.set_counter(_text("switch", switch), _text("name", name), value, *optional)
 
