@@ -24,6 +24,8 @@ from typing import Any, Counter, Dict, Optional
 CHURN = Path(__file__).with_name("churn.py")
 # A new host now and then: what is compared with is made from the beginning each time.
 ROUNDS_OF_A_HOST = 12
+# What a host is before that is another thing in every run.
+CHANGES_UNTIL_THE_CLOCK_STANDS = 2
 
 
 def churn(state: Optional[Path], *words: str) -> "subprocess.Popen[str]":
@@ -53,7 +55,7 @@ def killed_run(state: Path, seed: str, first: int, chance: random.Random) -> int
     process = churn(state, "run", seed, str(first))
     assert process.stdout
     done = first
-    if process.stdout.readline():
+    while done < max(first + 1, CHANGES_UNTIL_THE_CLOCK_STANDS) and process.stdout.readline():
         done += 1
     # By time and not by number, so that the kill comes at any moment of a call.
     time.sleep(chance.random() * 0.25)
