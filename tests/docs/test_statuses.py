@@ -114,10 +114,12 @@ def options(kind: int, value: Any) -> Any:
 
 
 def answered(call: Callable[..., Any], *arguments: Any) -> int:
-    """The status of a call with outputs; what it hands out goes back."""
+    """The status of a call; what it hands out goes back."""
     result = call(*arguments)
-    with vs.owned(result):
-        return int(result[0] if isinstance(result, tuple) else result)
+    if not isinstance(result, tuple):
+        return int(result)
+    with vs.owned(result) as (status, *_):
+        return int(status)
 
 
 def fill(host: Host, act: Callable[[str], int]) -> int:

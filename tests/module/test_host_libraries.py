@@ -111,7 +111,8 @@ def test_a_build_against_no_host_says_what_is_missing(tmp_path: Path, missing: s
     (tmp_path / "host").mkdir()
     (tmp_path / "host" / other).touch()
     done = subprocess.run(
-        ["cmake", f"-S{ROOT}", f"-B{tmp_path}/build", f"-DHOST_LIBRARY_DIR={tmp_path}/host"],
+        ["cmake", "-GNinja", f"-S{ROOT}", f"-B{tmp_path}/build"]
+        + [f"-DHOST_LIBRARY_DIR={tmp_path}/host"],
         capture_output=True,
         text=True,
     )
