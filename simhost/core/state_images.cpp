@@ -13,6 +13,7 @@
 #include "core/switches.h"
 #include "store/store.h"
 #include "store/switches.h"
+#include "vswitch/properties.h"
 
 namespace simhost {
 namespace {
@@ -112,6 +113,8 @@ void read_switch(Reader &reader, store::Transaction &transaction) {
                                                .persistent = persistent,
                                                .version = version,
                                                .associated = associated});
+  // A new switch has an MTU, and one that was written may not.
+  reset_property(transaction, PropertyOwner::global(key), VSPROP_MTU);
   read_properties(reader, transaction, PropertyOwner::global(key));
   read_properties(reader, transaction, PropertyOwner::host(key));
   for (auto left = reader.number(); left != 0; --left) {

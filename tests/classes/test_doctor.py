@@ -193,7 +193,7 @@ def test_a_state_that_cannot_be_used(tmp_path: Path, monkeypatch: pytest.MonkeyP
     for file in (tmp_path / "nowhere" / "host.db", tmp_path):
         monkeypatch.setenv("SIMHOST_STATE", str(file))
         text, advice = simulated_error()
-        assert text.startswith("the host answers no call: RuntimeError: ")
+        assert text.startswith("the host answers no call: OSError: ")
         assert f"the state file {file} cannot be used: " in text
         assert advice == "correct what SIMHOST_STATE tells the host, or unset it"
 

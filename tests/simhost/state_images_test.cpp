@@ -43,6 +43,15 @@ TEST_F(StateImages, TheConfigurationComesBackFromItsImage) {
   EXPECT_EQ(image(DVSQEX_PersistentStateGet), persistent);
 }
 
+TEST_F(StateImages, WhatWasNotSetIsNotSetAfterwards) {
+  auto const clear = [] { return DVSQEX_GlobalPropClear("s-id", VSPROP_MTU); };
+  ASSERT_EQ(clear(), QEX_OK);
+  auto const persistent = image(DVSQEX_PersistentStateGet);
+  ASSERT_EQ(deserialize(persistent), QEX_OK);
+  EXPECT_EQ(clear(), QEX_NOT_FOUND);
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), persistent);
+}
+
 TEST_F(StateImages, TheWholeStateComesBackFromItsImage) {
   ASSERT_EQ(set_port("com.example.soon", {1}, "p", RUNTIME_PROP_TYPE), QEX_OK);
   ASSERT_EQ(VSDVS_CreateVSwitch("fleeting", nullptr, nullptr, 0, 0, 0, 0, 0), QEX_OK);
