@@ -93,9 +93,16 @@ def block(position: int) -> int:
     return ctypes.addressof(_ARENA) + ROOM * position + ROOM // 2
 
 
+POOL = 8
+"""The position, behind those of all arguments, of what takes an argument's place."""
+
+
 def refresh(positions: int) -> None:
-    """Fill the memory of the first positions anew."""
-    for position in range(positions):
+    """Fill anew the memory of the first positions, and of what takes an argument's place.
+
+    A count that another call wrote there would lead out of the memory that there is.
+    """
+    for position in (*range(positions), POOL):
         ctypes.memmove(block(position) - USED, _PATTERN, len(_PATTERN))
 
 

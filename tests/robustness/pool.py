@@ -156,7 +156,7 @@ def _impostors() -> Iterator[Value]:
     yield Value("deep proxy", deep)
     gone = weakref.proxy(type("Gone", (), {})())
     yield Value("dead weak proxy", gone)
-    kept = Proxy(every.pointer("VSInfo *", 8))
+    kept = Proxy(every.pointer("VSInfo *", every.POOL))
     _ALIVE.append(kept)
     spellings = frozenset(spellings_of("VSInfo *"))
     yield Value("weak proxy", weakref.proxy(kept), spellings)
@@ -165,16 +165,16 @@ def _impostors() -> Iterator[Value]:
 def _pointers() -> Iterator[Value]:
     for spellings in pointer_types.read():
         spelling = min(spellings)
-        made = every.pointer(spelling, 8)
+        made = every.pointer(spelling, every.POOL)
         yield Value(f"pointer {spelling}", made, spellings)
     for spelling in ("VSInfo *", "char *", "void *", "qex_uint32 *"):
         spellings = frozenset(spellings_of(spelling))
-        made = every.pointer(spelling, 8)
+        made = every.pointer(spelling, every.POOL)
         yield Value(f"proxy {spelling}", Proxy(made), spellings)
         yield Value(f"proxy of proxy {spelling}", Proxy(Proxy(made)), spellings)
         yield Value(f"temporary {spelling}", _temporary(int(made), spelling), spellings)
-    chained = every.pointer("VSInfo *", 8)
-    chained.append(every.pointer("VSStats *", 8))
+    chained = every.pointer("VSInfo *", every.POOL)
+    chained.append(every.pointer("VSStats *", every.POOL))
     both = {*spellings_of("VSInfo *"), *spellings_of("VSStats *")}
     yield Value("chained pointers", chained, frozenset(both))
 
