@@ -41,9 +41,10 @@
 %integer_out(PARAMETER)
 %enddef
 
-// The buffer is handed over as it is, and what comes back is cut whatever the library wrote.
+// The buffer is handed over as it is, and what comes back is cut whatever the library wrote: behind
+// the bytes that it is promised there is room for as many again, for a text that is too long.
 %define %text_out(PARAMETER, LENGTH)
-%typemap(in, numinputs=0, noblock=1) PARAMETER (char text[LENGTH + 1]) {
+%typemap(in, numinputs=0, noblock=1) PARAMETER (char text[2 * (LENGTH + 1)]) {
   $1 = text;
 }
 %typemap(argout, noblock=1, fragment="SWIG_FromCharPtr") PARAMETER {

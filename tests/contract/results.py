@@ -87,7 +87,10 @@ class TextResult:
 
 @dataclass(frozen=True)
 class BufferResult:
-    """A text that the library writes into a buffer, which has room for one more byte."""
+    """A text that the library writes into a buffer, which has room for one more byte.
+
+    One that is up to twice as long harms nothing, which a build with sanitizers would notice.
+    """
 
     limit: int
 
@@ -98,6 +101,7 @@ class BufferResult:
             Answer(b"seen\0unseen", "seen"),
             Answer(b"x" * limit + b"\0", "x" * limit),
             Answer(b"x" * (limit + 1), "x" * limit),
+            Answer(b"x" * (2 * limit + 1) + b"\0", "x" * limit),
             Answer(b"x" * (limit - 1) + "é".encode(), "x" * (limit - 1) + "\udcc3"),
             Answer(b"\xff" * (limit + 1), "\udcff" * limit),
         ]
