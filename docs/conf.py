@@ -5,7 +5,9 @@ import sys
 from pathlib import Path
 
 HERE = Path(__file__).resolve().parent
-sys.path.insert(0, str(HERE / "_ext"))
+# The extensions, and what reads the definitions and the statuses' texts for them.
+sys.path[:0] = [str(HERE / "_ext"), str(HERE.parent / "python")]
+sys.path.append(str(HERE.parent / "simhost/libvswitch"))
 
 project = "libvswitch"
 author = "the authors of libvswitch"

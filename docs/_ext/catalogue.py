@@ -4,13 +4,14 @@ import json
 import re
 from dataclasses import dataclass
 from pathlib import Path
-from typing import Dict, Iterable, List, Optional, Tuple
+from typing import Dict, Iterable, List, Optional, Sequence, Tuple
 
 import comments
 import definitions
 import layout
 import ownership
-from comments import Comment, Family, Header
+import statuses
+from comments import Comment, Family, Header, first_sentence
 from definitions import Field, Function, Parameter, Record, Type
 from make_stubs import Stubs, method_arguments, overloads
 from pictures import Shape
@@ -27,6 +28,7 @@ _ARRAYS = {
     "_getitem": "A copy of an element, which Python owns. The index is not checked.",
     "_setitem": "Copies a value into an element. The index is not checked.",
 }
+_INDEX = "from 0 on"
 
 
 @dataclass(frozen=True)
@@ -49,6 +51,7 @@ class Call:
     forms: Tuple[Tuple[str, ...], ...]  # the names of the arguments; mostly one form
     results: Tuple[str, str]
     shape: Tuple[str, ...]  # the names of what a list holds; empty for a single result
+    statuses: Dict[str, str]  # when each is answered; empty where there is none
     ownership: Tuple[str, ...]
     header: str
 
@@ -77,9 +80,12 @@ class Catalogue:
             for header in _headers(root / "helpers").values()
             for name, text in header.prototypes.items()
         }
-        self.statuses = {
+        known_statuses = {
             name for family in self.headers["qexapi/status.h"].families for name in family.names
         }
+        refused = statuses.refused(self.headers.values(), known_statuses)
+        if refused:
+            raise ValueError("\n".join(["include/README.md asks for other comments", *refused]))
         self.stubs = (Stubs(self.known, "_flat."), Stubs(self.known))
         self.calls: Dict[str, Call] = {}
         self.methods: Dict[str, List[Call]] = {}
@@ -148,74 +154,94 @@ class Catalogue:
         return "bits" if one.is_bit_field else "number"
 
     def _call(self, name: str, forms: List[Function]) -> Call:
-        header, prototype, text = self._said_of(name)
+        header = self._header_of_call(name)
+        prototype, comment = self._said_of(name, header)
         longest = max(forms, key=lambda one: len(one.inputs))
-        comment = comments.parted(text)
         return Call(
             name,
             "",
             prototype,
             comment,
-            tuple(self._arguments(longest, comment)),
+            tuple(self._arguments(longest, comment, header)),
             tuple(self._names(one) for one in forms),
             self._results(forms[0]),
             _shape_of_result(forms[0]),
-            tuple(
-                ownership.of_call(self.known, longest, prototype, self.headers.get(header), comment)
-            ),
-            header,
+            statuses.of_call(name, header) if header else {},
+            tuple(ownership.of_call(self.known, longest, prototype, header, comment)),
+            header.name if header else "",
         )
 
     def _names(self, form: Function) -> Tuple[str, ...]:
         names = tuple(_said(one.name) for one in form.inputs)
         return names + (("*more",) if form.takes_more else ())
 
-    def _said_of(self, name: str) -> Tuple[str, str, str]:
-        for header in self.headers.values():
-            if name in header.prototypes:
-                return header.name, header.prototypes[name], header.comments[name]
+    def _header_of_call(self, name: str) -> Optional[Header]:
+        """The host's header that declares a call; none does one of the module's own."""
+        return next((one for one in self.headers.values() if name in one.prototypes), None)
+
+    def _said_of(self, name: str, header: Optional[Header]) -> Tuple[str, Comment]:
+        """The prototype of a call, if it has one, and what is said of it."""
+        if header is not None:
+            return header.prototypes[name], header.comments[name]
         if name in self.helpers:
-            return "", self.helper_prototypes[name], self.helpers[name]
+            return self.helper_prototypes[name], self.helpers[name]
         for part, text in _ARRAYS.items():
             if part in name:
-                return "", "", text.format(array=name[len(part) :])
+                return "", comments.parted(text.format(array=name[len(part) :]))
         raise KeyError(f"no header says anything of {name}")
 
     def _method(self, record: Record, one: Function) -> Call:
         called = re.search(r"(\w+)\(\$self", one.body)
-        text = self.helpers.get(called[1], "") if called else ""
         if one.name == "__len__":
-            text = "How many entries the record says it has."
-        if not text:
+            comment = comments.parted("How many entries the record says it has.")
+        elif called and called[1] in self.helpers:
+            comment = self.helpers[called[1]]
+        else:
             raise KeyError(f"no header says anything of {record.name}.{one.name}")
-        comment = comments.parted(text)
         name = f"{record.name}_{one.name}"
         typed = [dict(method_arguments(stubs, one)) for stubs in self.stubs]
         arguments = tuple(
-            Argument(
-                parameter.name,
-                parameter.type.spelled(),
-                (
-                    self._in_words(typed[0][parameter.name]),
-                    self._in_words(typed[1][parameter.name]),
-                ),
-                comment.parameters.get(parameter.name, ""),
-            )
-            for parameter in one.inputs
+            self._argument(parameter, typed, comment, None) for parameter in one.inputs
         )
         names = tuple(parameter.name for parameter in one.inputs)
         results, owned = self._results(one), (ownership.of_result(self.known, one),)
-        return Call(name, record.name, "", comment, arguments, (names,), results, (), owned, "")
+        return Call(name, record.name, "", comment, arguments, (names,), results, (), {}, owned, "")
 
-    def _arguments(self, function: Function, comment: Comment) -> Iterable[Argument]:
+    def _arguments(
+        self, function: Function, comment: Comment, header: Optional[Header]
+    ) -> Iterable[Argument]:
         typed = [dict(self.stubs[0].arguments(function))]
         typed.append({one.name: self.stubs[1].argument(one) for one in function.inputs})
         for one in function.inputs:
-            forms = self._in_words(typed[0][one.name]), self._in_words(typed[1][one.name])
-            meaning = comment.parameters.get(one.name, "")
-            if self._is_cell(one):
-                forms = f'Cell("{one.type.target.spelled()}").pointer', forms[1]
-            yield Argument(_said(one.name), one.type.spelled(), forms, meaning)
+            yield self._argument(one, typed, comment, header)
+
+    def _argument(
+        self,
+        one: Parameter,
+        typed: Sequence[Dict[str, str]],
+        comment: Comment,
+        header: Optional[Header],
+    ) -> Argument:
+        plain, flat = (self._in_words(types[one.name]) for types in typed)
+        meaning = self._meaning(one, plain, comment, header)
+        if header is not None and self._is_cell(one):
+            plain = f'Cell("{one.type.target.spelled()}").pointer'
+        return Argument(_said(one.name), one.type.spelled(), (plain, flat), meaning)
+
+    def _meaning(
+        self, one: Parameter, plain: str, comment: Comment, header: Optional[Header]
+    ) -> str:
+        """What a parameter is: as its call says, or its header, or its type."""
+        if one.name in comment.parameters:
+            return comment.parameters[one.name]
+        if header is not None and one.name in header.text.parameters:
+            return header.text.parameters[one.name]
+        if one.name == "index":
+            return _INDEX
+        record = self.known.records.get(plain.replace(" or None", ""))
+        handles = self.headers["nebpublic/handles.h"].types
+        text = record.doc if record else handles.get(one.type.spelled(), "")
+        return first_sentence(text).rstrip(".")
 
     def _is_cell(self, one: Parameter) -> bool:
         """Whether a call fills or reads a number or a pointer behind this one."""

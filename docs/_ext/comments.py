@@ -1,4 +1,7 @@
-"""What the headers say in words: of files, functions, families of constants."""
+"""What the headers say in words: of files, functions, families of constants.
+
+How a comment has to be written for that, include/README.md says.
+"""
 
 import re
 from dataclasses import dataclass, field
@@ -10,9 +13,10 @@ from definitions import undecorated
 
 @dataclass(frozen=True)
 class Comment:
-    """A comment, parted at its commands."""
+    """A comment, parted at its commands and at the list of statuses."""
 
     text: str
+    statuses: Dict[str, str]
     parameters: Dict[str, str]
     returns: str
 
@@ -33,7 +37,7 @@ class Header:
     text: Comment
     families: List[Family] = field(default_factory=list)
     prototypes: Dict[str, str] = field(default_factory=dict)
-    comments: Dict[str, str] = field(default_factory=dict)  # of functions
+    comments: Dict[str, Comment] = field(default_factory=dict)  # of functions
     types: Dict[str, str] = field(default_factory=dict)  # what is said of each
 
 
@@ -44,6 +48,7 @@ _ITEM = re.compile(
     r"(?:/\*\*<(?P<behind>(?:[^*]|\*(?!/))*)\*/)?",
     re.MULTILINE,
 )
+_LISTED = re.compile(r"^- (?P<status>\w*) ?(?P<when>.*(?:\n(?!- ).+)*)\n?", re.MULTILINE)
 
 
 def parted(comment: str) -> Comment:
@@ -63,24 +68,21 @@ def parted(comment: str) -> Comment:
             returns = rest
         else:
             raise ValueError(f"unknown command @{kind} in a comment")
-    return Comment(text, parameters, returns)
+    return Comment(_LISTED.sub("", text).strip(), _listed(text), parameters, returns)
 
 
-def statuses_in(text: str) -> Dict[str, str]:
-    """The statuses that a text names, each with what it says of it.
+def first_sentence(text: str) -> str:
+    head, dot, _ = text.replace("\n", " ").partition(". ")
+    return head + "." if dot else head
 
-    Any way round: `QEX_EXISTS if it is taken`, `a name the host does not know is QEX_NOT_FOUND`,
-    `1,280 to 9,190 bytes, else QEX_BAD_PARAM`.
-    """
+
+def _listed(text: str) -> Dict[str, str]:
+    """The statuses of a list, each with when it is answered."""
     found: Dict[str, str] = {}
-    status = r"QEX_[A-Z][A-Z_0-9]+"
-    when = rf"{status} (?:if|for|when|while|past|unless)\b"
-    for sentence in re.split(r"(?<=[.;:])\s+", re.sub(r"\s+", " ", text)):
-        for part in re.split(rf",? (?:and )?(?={when})|(?<=[A-Z]), ", sentence):
-            part = re.sub(rf"^(.*), else ({status})", r"\2 if not \1", part.rstrip(".;:, "))
-            for name in re.findall(rf"\b{status}\b", part):
-                said = re.sub(rf"^{name} (?=\w)|(?: is)? {name}$", "", part)
-                found[name] = "; ".join(filter(None, [found.get(name, ""), said]))
+    for item in _LISTED.finditer(text):
+        if item["status"] in found:
+            raise ValueError(f"{item['status']} is listed twice in a comment")
+        found[item["status"]] = re.sub(r"\s*\n\s*", " ", item["when"])
     return found
 
 
@@ -151,4 +153,4 @@ def _read_functions(source: str, header: Header) -> None:
             name = re.search(r"(\w+)\(", prototype)
             if name and not prototype.startswith("typedef"):
                 header.prototypes[name[1]] = prototype
-                header.comments[name[1]] = undecorated(match["comment"])
+                header.comments[name[1]] = parted(undecorated(match["comment"]))

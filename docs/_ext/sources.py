@@ -19,7 +19,7 @@ from sphinx.addnodes import desc_content
 from sphinx.application import Sphinx
 from sphinx.util.docutils import SphinxDirective
 
-from reference import ROOT, read_catalogue
+from described import ROOT, read_catalogue
 
 
 class ClassesOf(SphinxDirective):

@@ -5,8 +5,9 @@
  * @file
  * Switches, ports and data items behind their handles: DVS_* and DVSData_*.
  *
- * Texts that a call returns belong to the library and live as long as what the handle designates. A
- * null where nothing allows it is QEX_BAD_PARAM.
+ * Texts that a call returns belong to the library and live as long as what the handle designates.
+ *
+ * - QEX_BAD_PARAM for a null where nothing allows it
  */
 
 #include "nebpublic/handles.h"
@@ -56,10 +57,13 @@ void DVSData_Free(DVSDataHandle list);
  *
  * The module passes every argument through unchanged.
  *
+ * - QEX_BAD_PARAM for another `propertyType`
+ *
+ * @param name name of the item
  * @param data `length` bytes; null with a length of 0
  * @param length bytes of data
  * @param propertyType one of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
- *                     POLICY_PROP_TYPE; QEX_BAD_PARAM for another
+ *                     POLICY_PROP_TYPE
  */
 QEX_ReturnStatus DVSData_Update(DVSDataHandle list, char const *name, void *data, qex_uint32 length,
                                 qex_uint32 propertyType);

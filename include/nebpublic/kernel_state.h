@@ -5,14 +5,23 @@
  * @file
  * The kernel's switches, ports and their properties: DVSQEX_*.
  *
- * Every call returns a status; a null where nothing allows it is QEX_BAD_PARAM. The arguments are
- * the caller's; they are read during the call and not kept. Texts are NUL-terminated UTF-8. A
- * switch is named by its identifier, a port by its own; a name the host does not know is
- * QEX_NOT_FOUND. Lengths are bytes. The module passes every argument through unchanged.
+ * Every call returns a status. The arguments are the caller's; they are read during the call and
+ * not kept. Texts are NUL-terminated UTF-8. The module passes every argument through unchanged. An
+ * output is meaningful only with QEX_OK. What an output pointer refers to was allocated by the
+ * library and goes back through DVSQEX_DataFree.
  *
- * An output is meaningful only with QEX_OK. What an output pointer refers to was allocated by the
- * library and goes back through DVSQEX_DataFree. `propertyType` is one of CONFIG_PROP_TYPE,
- * RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and POLICY_PROP_TYPE; `propertyTypes` is a mask of them.
+ * - QEX_NOT_FOUND for a name the host does not know (`switchId`, `port`, `externalId`)
+ * - QEX_BAD_PARAM for a null where nothing allows it
+ *
+ * @param switchId identifier of the switch
+ * @param port identifier of the port
+ * @param externalId the other system's name for the port
+ * @param key key of the property
+ * @param length bytes
+ * @param propertyType one of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
+ *                     POLICY_PROP_TYPE
+ * @param propertyTypes a mask of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
+ *                      POLICY_PROP_TYPE
  */
 
 #include "nebpublic/handles.h"
@@ -27,9 +36,12 @@ extern "C" {
 /**
  * Gives the kernel a state that DVSQEX_StateGet read; null with a length of 0 is an empty one.
  *
- * A state that cannot be read changes nothing. QEX_INVALID_METADATA for one that is cut short,
- * QEX_CHECKSUM_MISMATCH for one that is damaged, QEX_VERSION_MISMATCH_MAJOR for one of another
- * format, QEX_BAD_PARAM for one of another kind.
+ * A state that cannot be read changes nothing.
+ *
+ * - QEX_INVALID_METADATA for a state that is cut short
+ * - QEX_CHECKSUM_MISMATCH for one that is damaged
+ * - QEX_VERSION_MISMATCH_MAJOR for one of another format
+ * - QEX_BAD_PARAM for one of another kind
  */
 QEX_ReturnStatus DVSQEX_StateInit(void *state, int length);
 
@@ -59,8 +71,10 @@ void DVSQEX_DataFree(void *data);
  * Adds a switch, which survives a restart and does not run on this host before
  * DVSQEX_SwitchAssociate.
  *
- * @param switchId identifier of the new switch; QEX_EXISTS if it is taken
- * @param alias its name; QEX_EXISTS if it is taken
+ * - QEX_EXISTS if one of the two names is taken
+ *
+ * @param switchId identifier of the new switch
+ * @param alias its name
  * @param maxPorts room for ports
  */
 QEX_ReturnStatus DVSQEX_SwitchAdd(char const *switchId, char const *alias, qex_uint32 maxPorts,
@@ -78,15 +92,20 @@ QEX_ReturnStatus DVSQEX_SwitchDissociate(char const *switchId);
 /** Sets the version of a switch. */
 QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion version);
 
-/** Sets how many ports a switch has room for; QEX_LIMIT_EXCEEDED if it has more. */
+/**
+ * Sets how many ports a switch has room for.
+ *
+ * - QEX_LIMIT_EXCEEDED if it has more
+ */
 QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts);
 
 /** Hands out the ports of one type, uplink ports among them. */
 QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type);
 
 /**
- * Has a switch carry out a command of its own kind; QEX_NOT_SUPPORTED for one that it does not
- * have.
+ * Has a switch carry out a command of its own kind.
+ *
+ * - QEX_NOT_SUPPORTED for a command that it does not have
  *
  * @param command name of the command
  * @param input what the command takes, `inputLength` bytes; null with a length of 0
@@ -96,7 +115,11 @@ QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports,
 QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command, void *input,
                                 int inputLength, void **output, int *outputLength);
 
-/** Hands out the value of a global property of a switch; QEX_NOT_FOUND if it is not set. */
+/**
+ * Hands out the value of a global property of a switch.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSQEX_GlobalPropGet(char const *switchId, char const *key, void **data,
                                       int *length);
 
@@ -104,39 +127,53 @@ QEX_ReturnStatus DVSQEX_GlobalPropGet(char const *switchId, char const *key, voi
  * Sets a global property of a switch; the type may change from one set to the next.
  *
  * Here and in the sets below, the bytes are what the typed call of that property carries.
- * QEX_BAD_PARAM for other bytes and for a key of something else, QEX_NAME_TOO_LONG for a key of
- * more than 255 bytes.
+ *
+ * - QEX_BAD_PARAM for other bytes and for a key of something else
+ * - QEX_NAME_TOO_LONG for a key of more than 255 bytes
  */
 QEX_ReturnStatus DVSQEX_GlobalPropSet(char const *switchId, char const *key, void *data, int length,
                                       qex_uint32 propertyType);
 
-/** Clears a global property of a switch; QEX_NOT_FOUND if it is not set. */
+/**
+ * Clears a global property of a switch.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSQEX_GlobalPropClear(char const *switchId, char const *key);
 
-/** Hands out the value of a host property of a switch; QEX_NOT_FOUND if it is not set. */
+/**
+ * Hands out the value of a host property of a switch.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSQEX_HostPropGet(char const *switchId, char const *key, void **data,
                                     int *length);
 
 /**
  * Sets a host property of a switch; the type may change from one set to the next.
  *
- * QEX_BAD_PARAM for bytes that are not the property's and for a key of something else,
- * QEX_READ_ONLY for a property that is only read, QEX_NAME_TOO_LONG for a key of more than 255
- * bytes.
+ * - QEX_BAD_PARAM for bytes that are not the property's and for a key of something else
+ * - QEX_READ_ONLY for a property that is only read
+ * - QEX_NAME_TOO_LONG for a key of more than 255 bytes
  */
 QEX_ReturnStatus DVSQEX_HostPropSet(char const *switchId, char const *key, void *data, int length,
                                     qex_uint32 propertyType);
 
-/** Clears a host property of a switch; QEX_NOT_FOUND if it is not set. */
+/**
+ * Clears a host property of a switch.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSQEX_HostPropClear(char const *switchId, char const *key);
 
 /**
  * Adds a port to a switch.
  *
- * QEX_LIMIT_EXCEEDED if the switch has no room for another.
+ * - QEX_EXISTS if `port` is taken
+ * - QEX_NAME_TOO_LONG if `port` is longer than it may be
+ * - QEX_LIMIT_EXCEEDED if the switch has no room for another
  *
- * @param port identifier of the new port, 1 to 47 bytes; QEX_EXISTS if it is taken,
- *             QEX_NAME_TOO_LONG if it is longer
+ * @param port identifier of the new port, 1 to 47 bytes
  * @param state a state that DVSQEX_PortStateGet or DVSQEX_PersistentPortStateGet gave, for the
  *              port to start with; null with a length of 0 for none
  */
@@ -146,28 +183,45 @@ QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *st
 /** Removes a port with its properties. */
 QEX_ReturnStatus DVSQEX_PortRemove(char const *switchId, char const *port);
 
-/** Whether the switch has the port: QEX_OK if so, QEX_NOT_FOUND if not. */
+/**
+ * Whether the switch has the port.
+ *
+ * - QEX_OK if it has
+ * - QEX_NOT_FOUND if it has not
+ */
 QEX_ReturnStatus DVSQEX_PortFind(char const *switchId, char const *port);
 
-/** Hands out the port that another system knows as `externalId`. */
+/**
+ * Hands out a port that another system manages.
+ *
+ * @param port receives the port
+ */
 QEX_ReturnStatus DVSQEX_PortGetByExternalId(char const *switchId, char const *externalId,
                                             OpaqueDVPortData **port);
 
-/** Hands out the value of a property of a port; QEX_NOT_FOUND if it is not set. */
+/**
+ * Hands out the value of a property of a port.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSQEX_PortDataGet(char const *switchId, char const *port, char const *key,
                                     void **data, int *length);
 
 /**
  * Sets a property of a port; the type may change from one set to the next.
  *
- * QEX_BAD_PARAM for bytes that are not the property's and for a key of something else,
- * QEX_READ_ONLY for a property that is only read, QEX_NAME_TOO_LONG for a key of more than 255
- * bytes.
+ * - QEX_BAD_PARAM for bytes that are not the property's and for a key of something else
+ * - QEX_READ_ONLY for a property that is only read
+ * - QEX_NAME_TOO_LONG for a key of more than 255 bytes
  */
 QEX_ReturnStatus DVSQEX_PortDataSet(char const *switchId, char const *port, char const *key,
                                     void *data, int length, qex_uint32 propertyType);
 
-/** Clears a property of a port; QEX_NOT_FOUND if it is not set. */
+/**
+ * Clears a property of a port.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSQEX_PortDataClear(char const *switchId, char const *port, char const *key);
 
 /** Hands out all properties of a port. */
@@ -179,18 +233,24 @@ QEX_ReturnStatus DVSQEX_PersistentPortStateGet(char const *switchId, char const 
                                                NEBVersion version, void **state, int *length);
 
 /**
- * Hands out the value of a property of the uplink port with the number `portID`; QEX_NOT_FOUND if
- * it is not set.
+ * Hands out the value of a property of an uplink port.
+ *
+ * - QEX_NOT_FOUND if it is not set, or no uplink port of the switch has the number
+ *
+ * @param portID number of the uplink port
  */
 QEX_ReturnStatus DVSQEX_UplinkDataGet(char const *switchId, char const *key, qex_uint32 portID,
                                       void **data, int *length);
 
 /**
- * Sets a property of the uplink port with the number `portID`.
+ * Sets a property of an uplink port.
  *
- * QEX_BAD_PARAM for bytes that are not the property's and for a key of something else,
- * QEX_READ_ONLY for a property that is only read, QEX_NAME_TOO_LONG for a key of more than 255
- * bytes.
+ * - QEX_NOT_FOUND if no uplink port of the switch has the number
+ * - QEX_BAD_PARAM for bytes that are not the property's and for a key of something else
+ * - QEX_READ_ONLY for a property that is only read
+ * - QEX_NAME_TOO_LONG for a key of more than 255 bytes
+ *
+ * @param portID number of the uplink port
  */
 QEX_ReturnStatus DVSQEX_UplinkDataSet(char const *switchId, char const *key, qex_uint32 portID,
                                       void *data, int length, qex_uint32 propertyType);

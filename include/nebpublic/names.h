@@ -5,9 +5,16 @@
  * @file
  * From one name of a switch to another, and whether a port exists.
  *
- * Texts are NUL-terminated UTF-8. A name the host does not know is QEX_NOT_FOUND, a null
- * QEX_BAD_PARAM. Outputs are the caller's memory, of the size their type says,
- * NUL included, and are written only with QEX_OK.
+ * Texts are NUL-terminated UTF-8. Outputs are the caller's memory, of the size their type says, NUL
+ * included, and are written only with QEX_OK.
+ *
+ * - QEX_NOT_FOUND for a name the host does not know (`alias`, `portsetName`)
+ * - QEX_BAD_PARAM for a null
+ *
+ * @param alias alias of the switch
+ * @param switchId identifier of the switch
+ * @param portsetName name of the set of ports
+ * @param port identifier of the port
  */
 
 #include "qexapi/status.h"

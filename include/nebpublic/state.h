@@ -7,8 +7,15 @@
  *
  * Handles that a call gives point into the state; nothing frees them, a reset ends them. Texts are
  * NUL-terminated UTF-8 and are only read. A walk over a null handle, or with a null callback, does
- * nothing. A callback may call the host and may change what is walked over. A null where nothing
- * allows it is QEX_BAD_PARAM.
+ * nothing. A callback may call the host and may change what is walked over.
+ *
+ * - QEX_NOT_FOUND for a name the host does not know (`switchId`)
+ * - QEX_BAD_PARAM for a null where nothing allows it
+ *
+ * @param alias alias of the switch
+ * @param switchId identifier of the switch
+ * @param port identifier of the port
+ * @param key key of the property
  */
 
 #include "nebpublic/handles.h"
@@ -21,8 +28,10 @@ extern "C" {
 /**
  * Replaces the configuration; a state that cannot be read changes nothing.
  *
- * QEX_INVALID_METADATA for one that is cut short, QEX_CHECKSUM_MISMATCH for one that is damaged,
- * QEX_VERSION_MISMATCH_MAJOR for one of another format, QEX_BAD_PARAM for one of another kind.
+ * - QEX_INVALID_METADATA for a state that is cut short
+ * - QEX_CHECKSUM_MISMATCH for one that is damaged
+ * - QEX_VERSION_MISMATCH_MAJOR for one of another format
+ * - QEX_BAD_PARAM for one of another kind
  *
  * @param state what DVSQEX_PersistentStateGet gave; only read
  * @param length its bytes; passed through unchanged
@@ -53,11 +62,19 @@ void DVSState_HostPropForEach(DVSwitchHandle handle, DVSPortDataCallback callbac
 /** Calls `callback` with each property of a port, as a DVSDataItem, and with `context`. */
 void DVSState_PortDataForEach(DVSPortHandle handle, DVSPortDataCallback callback, void *context);
 
-/** Puts the global property `key` of a switch into `item`; QEX_NOT_FOUND if it is not set. */
+/**
+ * Puts a global property of a switch into `item`.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSState_GlobalPropLookup(char const *switchId, char const *key,
                                            DVSDataItem *item);
 
-/** Puts the host property `key` of a switch into `item`; QEX_NOT_FOUND if it is not set. */
+/**
+ * Puts a host property of a switch into `item`.
+ *
+ * - QEX_NOT_FOUND if it is not set
+ */
 QEX_ReturnStatus DVSState_HostPropLookup(char const *switchId, char const *key, DVSDataItem *item);
 
 #ifdef __cplusplus

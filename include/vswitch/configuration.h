@@ -7,10 +7,18 @@
  *
  * Every call returns a status and reads or writes one property, whose key its group names. The
  * arguments are the caller's; they are read during the call and not kept. Texts are NUL-terminated
- * UTF-8. A switch is named by its alias and a port by its identifier, unless a parameter says
- * otherwise; a name the host does not know is QEX_NOT_FOUND, a null where nothing allows it
- * QEX_BAD_PARAM. An output is meaningful only with QEX_OK. What an output pointer refers to was
- * allocated by the library and goes back through VSDVS_FreeMemory.
+ * UTF-8. An output is meaningful only with QEX_OK. What an output pointer refers to was allocated
+ * by the library and goes back through VSDVS_FreeMemory.
+ *
+ * - QEX_NOT_FOUND for a name the host does not know (`switchName`, `switchId`, `port`, `uplink`,
+ *   `portsetName`)
+ * - QEX_BAD_PARAM for a null where nothing allows it
+ *
+ * @param switchName alias of the switch
+ * @param switchId identifier of the switch
+ * @param port identifier of the port
+ * @param uplink name of the uplink
+ * @param portsetName name of the set of ports
  */
 
 #include "qexapi/names.h"
@@ -33,8 +41,12 @@ extern "C" {
 /**
  * Creates a distributed switch on this host.
  *
- * The module passes every argument through unchanged. QEX_EXISTS if one of the three names is
- * taken, QEX_NAME_TOO_LONG if one is too long, QEX_BAD_PARAM for a number out of its bounds.
+ * The module passes every argument through unchanged.
+ *
+ * - QEX_EXISTS if one of the three names is taken
+ * - QEX_NAME_TOO_LONG if one is too long
+ * - QEX_BAD_PARAM for a number out of its bounds
+ * - QEX_NO_RESOURCES if there are not `uplinkCount` free uplinks
  *
  * @param alias name of the new switch, 1 to 127 bytes
  * @param switchId identifier of the distributed switch, up to 63 bytes; null or empty lets the host
@@ -44,8 +56,7 @@ extern "C" {
  * @param persistent whether the switch survives a restart of the host
  * @param version version of the distributed switch; 0 is VS_YKT_NEB_VERSION_20
  * @param mtu 1,280 to 9,190 bytes; 0 is the default of 1,500
- * @param uplinkCount free uplinks of the host to attach to uplink ports `uplink1`, `uplink2`, ...;
- *                    QEX_NO_RESOURCES if there are not so many
+ * @param uplinkCount free uplinks of the host to attach to uplink ports `uplink1`, `uplink2`, ...
  */
 QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
                                      char const *portsetName, qex_uint32 maxPorts,
@@ -56,27 +67,35 @@ QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
 QEX_ReturnStatus VSDVS_DestroyVSwitch(char const *switchName);
 
 /**
- * Adds a port to a switch; QEX_LIMIT_EXCEEDED if the switch has no room for another.
+ * Adds a port to a switch.
  *
- * @param port identifier of the new port, 1 to 47 bytes; QEX_EXISTS if it is taken,
- *             QEX_NAME_TOO_LONG if it is longer
+ * - QEX_EXISTS if `port` is taken
+ * - QEX_NAME_TOO_LONG if `port` is longer than it may be
+ * - QEX_LIMIT_EXCEEDED if the switch has no room for another
+ *
+ * @param port identifier of the new port, 1 to 47 bytes
  * @param connectId number that the port's client must show to connect; passed through unchanged
  */
 QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_uint32 connectId);
 
 /**
- * Adds a port that another system manages; QEX_LIMIT_EXCEEDED if the switch has no room for
- * another.
+ * Adds a port that another system manages.
  *
- * Both names are 1 to 47 bytes; QEX_EXISTS if one is taken, QEX_NAME_TOO_LONG if one is longer.
+ * - QEX_EXISTS if one of the two names is taken
+ * - QEX_NAME_TOO_LONG if one is longer than it may be
+ * - QEX_LIMIT_EXCEEDED if the switch has no room for another
  *
- * @param port identifier of the new port
- * @param externalId the other system's name for it; passed through unchanged
+ * @param port identifier of the new port, 1 to 47 bytes
+ * @param externalId the other system's name for it, 1 to 47 bytes; passed through unchanged
  */
 QEX_ReturnStatus VSDVS_AddOpaqueDVPort(char const *switchName, char const *port,
                                        char const *externalId);
 
-/** Removes a port with its properties; QEX_BUSY for an uplink port with its uplink. */
+/**
+ * Removes a port with its properties.
+ *
+ * - QEX_BUSY for an uplink port with its uplink
+ */
 QEX_ReturnStatus VSDVS_RemoveDVPort(char const *switchName, char const *port);
 
 /** Puts the number that the running switch gave a port into `portID`. */
@@ -97,8 +116,10 @@ QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPort
  * Makes the uplink ports of a switch those with `ids`; both lists hold as many entries.
  *
  * A port that the switch has keeps its uplink and gets its new name, a new one has no uplink, and
- * what is left out is removed. QEX_EXISTS for a name or an identifier twice, QEX_LIMIT_EXCEEDED for
- * more than 32 ports.
+ * what is left out is removed.
+ *
+ * - QEX_EXISTS for a name or an identifier twice
+ * - QEX_LIMIT_EXCEEDED for more than 32 ports
  */
 QEX_ReturnStatus VSDVS_SetSwitchUplinkPorts(char const *switchName, VSUplinkPorts const *names,
                                             VSUplinkPortIds const *ids);
@@ -106,9 +127,9 @@ QEX_ReturnStatus VSDVS_SetSwitchUplinkPorts(char const *switchName, VSUplinkPort
 /**
  * Attaches an uplink of the host to an uplink port of a switch that has none, or to a new one.
  *
- * QEX_LIMIT_EXCEEDED if the switch has 32 uplink ports, none of them free.
- *
- * @param uplink its name; QEX_EXISTS if the switch has it, QEX_BUSY if another does
+ * - QEX_EXISTS if the switch has the uplink
+ * - QEX_BUSY if another switch has it
+ * - QEX_LIMIT_EXCEEDED if the switch has 32 uplink ports, none of them free
  */
 QEX_ReturnStatus VSDVS_AddSwitchUplinkPort(char const *switchName, char const *uplink);
 
@@ -121,17 +142,24 @@ QEX_ReturnStatus VSDVS_ClearSwitchUplinkPorts(char const *switchName);
 /** Reads the MTU of a switch, in bytes; VSPROP_MTU. */
 QEX_ReturnStatus VSDVS_GetMTU(char const *switchName, qex_uint32 *mtu);
 
-/** Sets the MTU of a switch: 1,280 to 9,190 bytes, else QEX_BAD_PARAM. */
+/**
+ * Sets the MTU of a switch.
+ *
+ * - QEX_BAD_PARAM for an MTU out of its bounds
+ *
+ * @param mtu 1,280 to 9,190 bytes
+ */
 QEX_ReturnStatus VSDVS_SetMTU(char const *switchName, qex_uint32 mtu);
 
 /** Fills `policy` with the teaming of a switch; VSPROP_SWITCH_TEAMING. */
 QEX_ReturnStatus VSDVS_GetTeamingPolicy(char const *switchName, VSTeamPolicy *policy);
 
 /**
- * Sets the teaming of a switch.
+ * Sets the teaming of a switch; the names need not exist yet.
  *
- * QEX_LIMIT_EXCEEDED for more names than there are slots, QEX_NAME_TOO_LONG for a name that fills
- * its slot without a NUL, QEX_BAD_PARAM for an unknown value or bit. Names need not exist yet.
+ * - QEX_LIMIT_EXCEEDED for more names than there are slots
+ * - QEX_NAME_TOO_LONG for a name that fills its slot without a NUL
+ * - QEX_BAD_PARAM for an unknown value or bit
  */
 QEX_ReturnStatus VSDVS_SetTeamingPolicy(char const *switchName, VSTeamPolicy const *policy);
 
@@ -151,8 +179,9 @@ QEX_ReturnStatus VSDVS_GetPortTeamingPolicy(char const *switchName, char const *
 /**
  * Sets the teaming of a port.
  *
- * QEX_LIMIT_EXCEEDED for more names than there are slots, QEX_NAME_TOO_LONG for a name that fills
- * its slot without a NUL, QEX_BAD_PARAM for an unknown value or bit.
+ * - QEX_LIMIT_EXCEEDED for more names than there are slots
+ * - QEX_NAME_TOO_LONG for a name that fills its slot without a NUL
+ * - QEX_BAD_PARAM for an unknown value or bit
  */
 QEX_ReturnStatus VSDVS_SetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy const *policy);
@@ -170,8 +199,11 @@ QEX_ReturnStatus VSDVS_GetPortTeamingOverride(char const *switchName, char const
                                               char *overrideBuffer);
 
 /**
- * Binds a port to an uplink port whatever its teaming says; QEX_NAME_TOO_LONG for a name of more
- * than 81 bytes.
+ * Binds a port to an uplink port whatever its teaming says.
+ *
+ * - QEX_NAME_TOO_LONG for a name of more than 81 bytes
+ *
+ * @param overrideName name of the uplink port
  */
 QEX_ReturnStatus VSDVS_SetPortTeamingOverride(char const *switchName, char const *port,
                                               char const *overrideName);
@@ -190,7 +222,11 @@ QEX_ReturnStatus VSDVS_SetTxUplinkAlways(char const *switchName, char const *por
 /** Fills `learning` with the MAC learning of a switch; VSPROP_SWITCH_MAC_LEARNING. */
 QEX_ReturnStatus VSDVS_GetMACLearning(char const *switchName, VSMACLearning *learning);
 
-/** Sets the MAC learning of a switch; QEX_BAD_PARAM for an ageing time out of its bounds. */
+/**
+ * Sets the MAC learning of a switch.
+ *
+ * - QEX_BAD_PARAM for an ageing time out of its bounds
+ */
 QEX_ReturnStatus VSDVS_SetMACLearning(char const *switchName, VSMACLearning const *learning);
 
 /** Returns the MAC learning of a switch to the default. */
@@ -201,8 +237,10 @@ QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *po
                                           VSPMACLearning *learning);
 
 /**
- * Sets the MAC learning of a port; QEX_LIMIT_EXCEEDED for more than
- * VSPORT_MAC_LEARNING_LIMIT_ENTRIES_MAX addresses, QEX_BAD_PARAM for an unknown value.
+ * Sets the MAC learning of a port.
+ *
+ * - QEX_LIMIT_EXCEEDED for more than VSPORT_MAC_LEARNING_LIMIT_ENTRIES_MAX addresses
+ * - QEX_BAD_PARAM for an unknown value
  */
 QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *port,
                                           VSPMACLearning const *learning);
@@ -211,7 +249,11 @@ QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *po
 QEX_ReturnStatus VSDVS_GetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity *security);
 
-/** Sets the security policy of a port; QEX_BAD_PARAM for an unknown bit. */
+/**
+ * Sets the security policy of a port.
+ *
+ * - QEX_BAD_PARAM for an unknown bit
+ */
 QEX_ReturnStatus VSDVS_SetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity const *security);
 
@@ -220,8 +262,10 @@ QEX_ReturnStatus VSDVS_GetExtraEthFilter(char const *switchName, char const *por
                                          VSExtraEthFilter *filter);
 
 /**
- * Sets the extra frames a port accepts; QEX_LIMIT_EXCEEDED for more addresses than there are
- * places, QEX_BAD_PARAM for an unknown bit.
+ * Sets the extra frames a port accepts.
+ *
+ * - QEX_LIMIT_EXCEEDED for more addresses than there are places
+ * - QEX_BAD_PARAM for an unknown bit
  */
 QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter const *filter);
@@ -243,7 +287,11 @@ QEX_ReturnStatus VSDVS_ConfigureSinkPort(char const *switchName, char const *por
 /** Puts the VSMcastFilterMode of a switch into `mode`; VSPROP_MULTICAST_FILTER. */
 QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode);
 
-/** Sets how a switch filters multicast; QEX_BAD_PARAM for an unknown mode. */
+/**
+ * Sets how a switch filters multicast.
+ *
+ * - QEX_BAD_PARAM for an unknown mode
+ */
 QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode);
 
 /**
@@ -256,14 +304,15 @@ QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *por
 /**
  * Sets the VLANs of a port.
  *
- * The module passes every argument through unchanged. QEX_BAD_VLANID for a VLAN past 4094,
- * QEX_BAD_PARAM for ranges that share a VLAN or do not rise, and for another priority.
+ * The module passes every argument through unchanged.
+ *
+ * - QEX_BAD_VLANID for a VLAN past 4094, and with `privateVlan` for one that is no secondary VLAN
+ * - QEX_BAD_PARAM for ranges that share a VLAN or do not rise, and for another priority
  *
  * @param vlanID VLAN of untagged frames; 0 is none
  * @param priority priority of the port's frames, 0 to 7; -1 leaves it to the frames
  * @param guestTagging whether the client tags its frames itself, with VLANs of the ranges
- * @param privateVlan whether `vlanID` is a secondary VLAN of the switch's private-VLAN map;
- *                    QEX_BAD_VLANID if it is not
+ * @param privateVlan whether `vlanID` is a secondary VLAN of the switch's private-VLAN map
  * @param ranges the VLANs of a trunk in rising order, none with `privateVlan`; null with none
  * @param numRanges how many ranges
  */
@@ -293,8 +342,9 @@ QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
 /**
  * Replaces the private-VLAN map of a switch; null with a count of 0 empties it.
  *
- * QEX_BAD_VLANID for a VLAN of 0 or past 4094, QEX_BAD_PARAM for a map that contradicts itself: a
- * VLAN that is secondary twice, or secondary and primary, two isolated VLANs of one primary.
+ * - QEX_BAD_VLANID for a VLAN of 0 or past 4094
+ * - QEX_BAD_PARAM for a map that contradicts itself: a VLAN that is secondary twice, or secondary
+ *   and primary, two isolated VLANs of one primary
  */
 QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry const *entries,
                                          int count);
@@ -304,15 +354,23 @@ QEX_ReturnStatus VSDVS_GetDVMirrorSessions(char const *switchName, char const *p
                                            DVMirrorSessionTable **table);
 
 /**
- * Adds the sessions of `table` to those of a port; QEX_EXISTS if an identifier is taken.
+ * Adds the sessions of `table` to those of a port.
  *
- * QEX_VERSION_MISMATCH_MAJOR for a table of an unknown version, QEX_BAD_PARAM for one that does not
- * hold what it counts, QEX_LIMIT_EXCEEDED for more than 1,024 sessions of a port.
+ * - QEX_EXISTS if an identifier is taken
+ * - QEX_VERSION_MISMATCH_MAJOR for a table of an unknown version
+ * - QEX_BAD_PARAM for a table that does not hold what it counts
+ * - QEX_LIMIT_EXCEEDED for more than 1,024 sessions of a port
  */
 QEX_ReturnStatus VSDVS_AppendDVMirrorSessions(char const *switchName, char const *port,
                                               DVMirrorSessionTable *table);
 
-/** Removes the session with the identifier `sid` from a port; QEX_NOT_FOUND if there is none. */
+/**
+ * Removes a session from a port.
+ *
+ * - QEX_NOT_FOUND if the port has no such session
+ *
+ * @param sid identifier of the session, up to 31 bytes
+ */
 QEX_ReturnStatus VSDVS_RemoveDVMirrorSession(char const *switchName, char const *port,
                                              char const sid[32]);
 

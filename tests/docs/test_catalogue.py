@@ -1,8 +1,5 @@
-"""What the reference says of ownership and statuses, against the code that knows it."""
+"""What the reference says of ownership, types and constants, against the code that knows it."""
 
-from typing import Dict
-
-import comments
 import pytest
 import types_in_words
 from catalogue import Catalogue
@@ -28,33 +25,6 @@ def test_doors(catalogue: Catalogue) -> None:
 
 
 @pytest.mark.parametrize(
-    "text, statuses",
-    [
-        (
-            "Adds a port; QEX_LIMIT_EXCEEDED if there is no room.",
-            {"QEX_LIMIT_EXCEEDED": "if there is no room"},
-        ),
-        (
-            "its name; QEX_EXISTS if the switch has it, QEX_BUSY if another does",
-            {"QEX_EXISTS": "if the switch has it", "QEX_BUSY": "if another does"},
-        ),
-        (
-            "a name the host does not know is QEX_NOT_FOUND, a null where nothing allows\n"
-            "it QEX_BAD_PARAM.",
-            {
-                "QEX_NOT_FOUND": "a name the host does not know",
-                "QEX_BAD_PARAM": "a null where nothing allows it",
-            },
-        ),
-        ("Sets it: 0 to 7, else QEX_BAD_PARAM.", {"QEX_BAD_PARAM": "if not 0 to 7"}),
-        ("Nothing at all.", {}),
-    ],
-)
-def test_statuses_in_words(text: str, statuses: Dict[str, str]) -> None:
-    assert comments.statuses_in(text) == statuses
-
-
-@pytest.mark.parametrize(
     "hint, words",
     [
         ("int", "int"),
@@ -76,11 +46,6 @@ def test_statuses_in_words(text: str, statuses: Dict[str, str]) -> None:
 )
 def test_types_in_words(hint: str, words: str) -> None:
     assert types_in_words.in_words(hint, {"VSUplinks", "VSLAGTable", "VSMACEntry"}) == words
-
-
-def test_a_comment_with_an_unknown_command() -> None:
-    with pytest.raises(ValueError, match="unknown command @retur"):
-        comments.parted("Something.\n\n@retur nothing")
 
 
 def test_families_hold_every_constant_once(catalogue: Catalogue) -> None:

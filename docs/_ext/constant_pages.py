@@ -1,0 +1,66 @@
+"""The pages of constants: families with their values, and what is said of single ones."""
+
+from typing import Any, List, Union
+
+from docutils import nodes
+from make_status_texts import readable
+
+from catalogue import FLAT
+from comments import Family
+from described import Described, table
+from words import family_label
+
+
+class Constants(Described):
+    required_arguments = 1
+    optional_arguments = 30
+
+    def run(self) -> List[nodes.Node]:
+        found: List[nodes.Node] = []
+        for name in self.arguments:
+            header = self.catalogue.headers.get(name)
+            if header is None or not header.families:
+                raise self.error(f"no header with constants: {name}")
+            for family in header.families:
+                found.append(self._family(name, family))
+        return found
+
+    def _family(self, header: str, family: Family) -> nodes.section:
+        title = self.catalogue.title_of(family)
+        label = family_label(title)
+        section = nodes.section(ids=[label], names=[label])
+        self.state.document.note_explicit_target(section)
+        standard: Any = self.env.get_domain("std")
+        standard.anonlabels[label] = self.env.docname, label
+        section += nodes.title("", "", nodes.Text(title))
+        section.extend(self.words.paragraphs(family.text))
+        meanings = [self._meaning(family, name) for name in family.names]
+        rows = []
+        for name, meaning in zip(family.names, meanings):
+            value = self.catalogue.layout.values[name]
+            anchor = f"{FLAT}.{name}"
+            self.note(anchor, "data", anchor)
+            cells = [[nodes.literal(text=name)], self._value(value)]
+            if any(meanings):
+                cells.append(self.words.inline(meaning))
+            rows.append((cells, (anchor,)))
+        headings = ("Constant", "Value", "") if any(meanings) else ("Constant", "Value")
+        section += table(headings, rows, "constants")
+        return section
+
+    def _value(self, value: Union[int, str]) -> List[nodes.Node]:
+        if isinstance(value, str):
+            return [nodes.literal(text=f'"{value}"')]
+        found: List[nodes.Node] = [nodes.literal(text=str(value))]
+        if abs(value) > 9:
+            # What is negative here was unsigned in the header.
+            bits = value if value >= 0 else value + 2**32
+            found += [nodes.Text(" "), nodes.inline(text=f"{bits:#x}", classes=["remark"])]
+        return found
+
+    def _meaning(self, family: Family, name: str) -> str:
+        if name in family.remarks:
+            return family.remarks[name]
+        if family.title == "QEX_ReturnStatus":
+            return str(readable(name))
+        return ""

@@ -1,0 +1,115 @@
+"""Which statuses a call answers and when, as the comments of the call and of its header list them.
+
+Nothing is read out of running text. What is not written as include/README.md asks for is refused.
+"""
+
+import re
+from typing import Collection, Dict, Iterator, List, Tuple
+
+from comments import Comment, Header
+
+_CONCERNED = re.compile(r" \((`\w+`(?:, `\w+`)*)\)$")
+
+
+def of_call(name: str, header: Header) -> Dict[str, str]:
+    """The statuses of a call; none if it answers something else."""
+    if not _answers_status(header.prototypes[name]):
+        return {}
+    found = {"QEX_OK": "done", **header.comments[name].statuses}
+    for status, text in header.text.statuses.items():
+        said = _said_of(name, text, header)
+        if said:
+            found[status] = f"{found[status]}; {said}" if status in found else said
+    return found
+
+
+def concerned(name: str, header: Header) -> Dict[str, List[str]]:
+    """The parameters of a call that the statuses of its header are about."""
+    return {
+        status: _taken(name, parameters, header)
+        for status, text in header.text.statuses.items()
+        for _, parameters in [_parted(text)]
+    }
+
+
+def refused(headers: Collection[Header], statuses: Collection[str]) -> List[str]:
+    """What is not written as it should be, each with where it stands."""
+    return [one for header in headers for one in _refused(header, statuses)]
+
+
+def texts(prototype: str) -> List[str]:
+    """The parameters that are texts for the call to read."""
+    return re.findall(r"(?<!unsigned )\bchar const \*?(\w+)(?=[,)\[])", prototype)
+
+
+def _said_of(name: str, text: str, header: Header) -> str:
+    """What a header's status says of one call; nothing if it does not concern it."""
+    when, parameters = _parted(text)
+    if not parameters:
+        return when if "*" in header.prototypes[name] else ""
+    taken = _taken(name, parameters, header)
+    return f"{when} ({', '.join(f'`{one}`' for one in taken)})" if taken else ""
+
+
+def _parted(text: str) -> Tuple[str, List[str]]:
+    """When a header's status is answered, and the parameters that it is about."""
+    listed = _CONCERNED.search(text)
+    if listed is None:
+        return text, []
+    return text[: listed.start()], re.findall(r"\w+", listed[1])
+
+
+def _taken(name: str, parameters: Collection[str], header: Header) -> List[str]:
+    """Those of parameters that a call takes as what the header says they are."""
+    own = header.comments[name].parameters
+    return [one for one in texts(header.prototypes[name]) if one in parameters and one not in own]
+
+
+def _refused(header: Header, statuses: Collection[str]) -> Iterator[str]:
+    where = header.name
+    yield from _misplaced(where, header.text, statuses)
+    listed = {one for text in header.text.statuses.values() for one in _parted(text)[1]}
+    taken = {one for prototype in header.prototypes.values() for one in texts(prototype)}
+    for parameter in sorted(listed - taken):
+        yield f"{where}: no call takes a text {parameter}"
+    for parameter in sorted(listed - set(header.text.parameters)):
+        yield f"{where}: nothing says what {parameter} is"
+    for parameter in header.text.parameters:
+        if not any(_has(one, parameter) for one in header.prototypes.values()):
+            yield f"{where}: no call has a parameter {parameter}"
+    for name, comment in header.comments.items():
+        yield from _refused_of_call(name, comment, header, statuses)
+
+
+def _refused_of_call(
+    name: str, comment: Comment, header: Header, statuses: Collection[str]
+) -> Iterator[str]:
+    prototype = header.prototypes[name]
+    yield from _misplaced(name, comment, statuses)
+    if comment.statuses and not _answers_status(prototype):
+        yield f"{name}: lists statuses, but answers none"
+    for parameter in comment.parameters:
+        if not _has(prototype, parameter):
+            yield f"{name}: has no parameter {parameter}"
+    for parameter in texts(prototype):
+        if parameter not in {**header.text.parameters, **comment.parameters}:
+            yield f"{name}: nothing says what {parameter} is"
+
+
+def _misplaced(where: str, comment: Comment, statuses: Collection[str]) -> Iterator[str]:
+    for status in comment.statuses:
+        if status not in statuses:
+            yield f"{where}: {status or 'what a list names'} is no status"
+    # Success may be spoken of: an output has a meaning with it only.
+    for text in (comment.text, comment.returns, *comment.parameters.values()):
+        for word in re.findall(r"\w+", text):
+            if word in statuses and word != "QEX_OK":
+                yield f"{where}: {word} belongs in the list of statuses"
+
+
+def _answers_status(prototype: str) -> bool:
+    return prototype.startswith("QEX_ReturnStatus ")
+
+
+def _has(prototype: str, parameter: str) -> bool:
+    return re.search(rf"\b{parameter}\b(?:\[\w+\])?[,)]", prototype) is not None
