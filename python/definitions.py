@@ -12,6 +12,10 @@ from typing import Dict, Iterator, List, Optional, Tuple
 
 _Attributes = Dict[str, str]
 
+_SIZES = ("char", "short", "int", "long long")
+# What numbers are behind their other names.
+NUMBERS = [*_SIZES, *(f"unsigned {size}" for size in _SIZES), "signed char"]
+
 
 @dataclass(frozen=True)
 class Type:
@@ -133,6 +137,13 @@ class Definitions:
             behind = self.typedefs[name]
             layers, name = layers + behind.layers, _bare(behind.name)
         return Type(layers, name)
+
+    def forms(self) -> Dict[str, List[Function]]:
+        """The functions by name; those of two forms are two."""
+        found: Dict[str, List[Function]] = {}
+        for one in self.functions:
+            found.setdefault(one.name, []).append(one)
+        return found
 
     def records_behind_pointers(self) -> List[str]:
         """Records that calls hand out through a pointer to a pointer of the caller's."""

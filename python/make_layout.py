@@ -8,10 +8,7 @@ from pprint import pformat
 from typing import Any, Dict, List, Optional, Tuple
 
 import definitions
-from definitions import Definitions, Field, Function, Type
-
-SIZES = ("char", "short", "int", "long long")
-NUMBERS = [*SIZES, *(f"unsigned {size}" for size in SIZES), "signed char"]
+from definitions import NUMBERS, Definitions, Field, Function, Type
 
 
 def array(known: Definitions, field: Field) -> Optional[Tuple[str, int, Any]]:

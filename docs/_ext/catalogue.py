@@ -13,8 +13,8 @@ import ownership
 import statuses
 from comments import Comment, Family, Header, first_sentence
 from definitions import Field, Function, Parameter, Record, Type
-from make_stubs import Stubs, method_arguments, overloads
 from pictures import Shape
+from python_types import PythonTypes
 from types_in_words import in_words
 
 CLASSES, FLAT = "libvswitch", "_libvswitch"
@@ -86,10 +86,10 @@ class Catalogue:
         refused = statuses.refused(self.headers.values(), known_statuses)
         if refused:
             raise ValueError("\n".join(["include/README.md asks for other comments", *refused]))
-        self.stubs = (Stubs(self.known, "_flat."), Stubs(self.known))
+        self.python_types = (PythonTypes(self.known, "_flat."), PythonTypes(self.known))
         self.calls: Dict[str, Call] = {}
         self.methods: Dict[str, List[Call]] = {}
-        for name, forms in overloads(self.known).items():
+        for name, forms in self.known.forms().items():
             self.calls[name] = self._call(name, forms)
         for record in self.known.records.values():
             self.methods[record.name] = [self._method(record, one) for one in record.methods]
@@ -115,7 +115,7 @@ class Catalogue:
 
     def reads_as(self, one: Field) -> str:
         """What an attribute of a class reads as."""
-        return self._in_words(self.stubs[0].member(one))
+        return self._in_words(self.python_types[0].member(one))
 
     def shapes(self, record: Record) -> List[Shape]:
         return [self._shape(record, one) for one in record.fields]
@@ -199,7 +199,7 @@ class Catalogue:
         else:
             raise KeyError(f"no header says anything of {record.name}.{one.name}")
         name = f"{record.name}_{one.name}"
-        typed = [dict(method_arguments(stubs, one)) for stubs in self.stubs]
+        typed = [dict(types.method_arguments(one)) for types in self.python_types]
         arguments = tuple(
             self._argument(parameter, typed, comment, None) for parameter in one.inputs
         )
@@ -210,8 +210,8 @@ class Catalogue:
     def _arguments(
         self, function: Function, comment: Comment, header: Optional[Header]
     ) -> Iterable[Argument]:
-        typed = [dict(self.stubs[0].arguments(function))]
-        typed.append({one.name: self.stubs[1].argument(one) for one in function.inputs})
+        typed = [dict(self.python_types[0].arguments(function))]
+        typed.append({one.name: self.python_types[1].argument(one) for one in function.inputs})
         for one in function.inputs:
             yield self._argument(one, typed, comment, header)
 
@@ -252,12 +252,12 @@ class Catalogue:
         return type_.layers == ("p",) and is_number and not one.is_bytes
 
     def _results(self, function: Function) -> Tuple[str, str]:
-        plain = self._in_words(self.stubs[0].result(function))
+        plain = self._in_words(self.python_types[0].result(function))
         if plain == "unsigned int * pointer":
             plain = "int"  # the classes read it
         if function.outputs:
             plain = f"({plain[1:-1]})"  # a tuple; the flat answer is a list
-        return plain, self._in_words(self.stubs[1].result(function))
+        return plain, self._in_words(self.python_types[1].result(function))
 
     def _in_words(self, hint: str) -> str:
         return in_words(hint, self.known.records)
