@@ -7,7 +7,7 @@ had is kept until the new one has been read back.
 
 import argparse
 import dataclasses
-import signal
+import os
 import sys
 from typing import Optional, Sequence, Tuple
 
@@ -140,7 +140,7 @@ def parse(arguments: Optional[Sequence[str]]) -> argparse.Namespace:
         description="Changes the VLANs of a port and reads them back; if they are not what they"
         " were to be, the port gets back those that it had.",
         epilog="The status is 0, 1 if the port has the VLANs that it had, 2 for a wrong command"
-        " line, 3 if somebody has to look at the port.",
+        " line, 3 if somebody has to look at the port, 4 if what was done cannot be written.",
     )
     parser.add_argument("switch", type=name, help="alias of the switch")
     parser.add_argument("port", type=name, help="identifier of the port")
@@ -171,11 +171,18 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
     except (*FAILURES, NotChanged, NotRestored) as error:
         print(f"change_vlan: {error}", file=sys.stderr)
         return 3 if isinstance(error, NotRestored) else 1
-    # Nothing is left to undo, so where nobody reads, this ends quietly: the shell calls it 141.
-    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     print(f"{port} of {switch}: {before} {'would become' if options.dry_run else '->'} {wanted}")
     return 0
 
 
 if __name__ == "__main__":
-    sys.exit(main())
+    try:
+        try:
+            sys.exit(main())
+        finally:
+            print(end="", flush=True)
+    except OSError as error:  # nobody reads to the end, as in | head, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        if not isinstance(error, BrokenPipeError):
+            print(f"change_vlan: {error}", file=sys.stderr)
+        sys.exit(4)

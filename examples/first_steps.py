@@ -5,6 +5,8 @@ Runs on any host; without a real one, the simulated host answers. Prints what it
 """
 
 import argparse
+import os
+import sys
 
 import _libvswitch as vs
 
@@ -68,4 +70,11 @@ def main() -> None:
 
 
 if __name__ == "__main__":
-    main()
+    try:
+        try:
+            main()
+        finally:
+            print(end="", flush=True)
+    except OSError as error:  # nobody reads to the end, as in | head, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        sys.exit(1 if isinstance(error, BrokenPipeError) else f"first_steps: {error}")

@@ -7,7 +7,7 @@ As a table for people, or as JSON for programs. Changes nothing.
 import argparse
 import dataclasses
 import json
-import signal
+import os
 import sys
 from typing import Any, List, Optional, Sequence, Tuple
 
@@ -135,7 +135,8 @@ def name(text: str) -> str:
 def main(arguments: Optional[Sequence[str]] = None) -> int:
     parser = argparse.ArgumentParser(
         description="Lists the switches of this host, their ports, uplinks and links.",
-        epilog="The status is 0, 1 if the host refuses a query, 2 for a wrong command line.",
+        epilog="The status is 0, 1 if the host refuses a query or nothing can be written, 2 for a"
+        " wrong command line.",
     )
     parser.add_argument(
         "switch", nargs="*", type=name, help="alias of a switch; all of them unless given"
@@ -159,6 +160,11 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
 
 
 if __name__ == "__main__":
-    # Where nobody reads to the end, as in | head, this ends quietly: the shell calls it 141.
-    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
-    sys.exit(main())
+    try:
+        try:
+            sys.exit(main())
+        finally:
+            print(end="", flush=True)
+    except OSError as error:  # nobody reads to the end, as in | head, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        sys.exit(1 if isinstance(error, BrokenPipeError) else f"inventory: {error}")

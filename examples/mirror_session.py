@@ -7,6 +7,7 @@ there. However that ends, Ctrl-C included, the session does not stay behind.
 
 import argparse
 import contextlib
+import os
 import signal
 import sys
 import time
@@ -124,7 +125,8 @@ def identifier(text: str) -> str:
 def parse(arguments: Optional[Sequence[str]]) -> argparse.Namespace:
     parser = argparse.ArgumentParser(
         description="Mirrors what a port receives and sends to another port until Ctrl-C.",
-        epilog="The status is 0, 1 if the host refuses something, 2 for a wrong command line.",
+        epilog="The status is 0, 1 if the host refuses something or nothing can be written, 2 for a"
+        " wrong command line.",
     )
     parser.add_argument("switch", type=name, help="alias of the switch")
     parser.add_argument("port", type=name, help="identifier of the port to look at")
@@ -160,11 +162,18 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
             wait(options.duration)
             print(counted(switch, session_id))
         print(f"{session_id} is removed")
-    except (HostError, RuntimeError, OSError) as error:  # the last two when the host gives up
+    except (HostError, RuntimeError) as error:  # the last when the host gives up
         print(f"mirror_session: {error}", file=sys.stderr)
         return 1
     return 0
 
 
 if __name__ == "__main__":
-    sys.exit(main())
+    try:
+        try:
+            sys.exit(main())
+        finally:
+            print(end="", flush=True)
+    except OSError as error:  # the host gives up, nobody reads to the end, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        sys.exit(1 if isinstance(error, BrokenPipeError) else f"mirror_session: {error}")

@@ -6,6 +6,8 @@ Needs no switch: everything here happens in the tool's own memory. Prints what i
 
 import argparse
 import ctypes
+import os
+import sys
 from typing import Any, Dict, Iterator, Tuple, Union
 
 import _libvswitch as vs
@@ -144,4 +146,11 @@ def main() -> None:
 
 
 if __name__ == "__main__":
-    main()
+    try:
+        try:
+            main()
+        finally:
+            print(end="", flush=True)
+    except OSError as error:  # nobody reads to the end, as in | head, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        sys.exit(1 if isinstance(error, BrokenPipeError) else f"records: {error}")

@@ -9,6 +9,7 @@ import argparse
 import os
 import shutil
 import subprocess
+import sys
 import tempfile
 from typing import Dict, Iterator, Sequence, TypeVar
 
@@ -269,4 +270,11 @@ def main() -> None:
 
 
 if __name__ == "__main__":
-    main()
+    try:
+        try:
+            main()
+        finally:
+            print(end="", flush=True)
+    except OSError as error:  # nobody reads to the end, as in | head, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        sys.exit(1 if isinstance(error, BrokenPipeError) else f"tour: {error}")

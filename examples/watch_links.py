@@ -5,7 +5,7 @@ The library announces no changes, so this asks for them again and again.
 """
 
 import argparse
-import signal
+import os
 import sys
 import time
 from typing import Dict, Iterator, Optional, Sequence
@@ -88,7 +88,8 @@ def seconds(text: str) -> float:
 def main(arguments: Optional[Sequence[str]] = None) -> int:
     parser = argparse.ArgumentParser(
         description="Says which links of a switch are up, then each change of one, until Ctrl-C.",
-        epilog="The status is 0, 1 if the host refuses a query, 2 for a wrong command line.",
+        epilog="The status is 0, 1 if the host refuses a query or nothing can be written, 2 for a"
+        " wrong command line.",
     )
     parser.add_argument("switch", type=name, help="alias of the switch")
     parser.add_argument(
@@ -104,13 +105,18 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
         watch(options.switch, options.every, options.duration)
     except KeyboardInterrupt:
         pass
-    except (HostError, RuntimeError, OSError) as error:  # the last two when the host gives up
+    except (HostError, RuntimeError) as error:  # the last when the host gives up
         print(f"watch_links: {error}", file=sys.stderr)
         return 1
     return 0
 
 
 if __name__ == "__main__":
-    # Where nobody reads to the end, as in | head, this ends quietly: the shell calls it 141.
-    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
-    sys.exit(main())
+    try:
+        try:
+            sys.exit(main())
+        finally:
+            print(end="", flush=True)
+    except OSError as error:  # the host gives up, nobody reads to the end, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        sys.exit(1 if isinstance(error, BrokenPipeError) else f"watch_links: {error}")

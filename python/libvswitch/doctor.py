@@ -2,8 +2,7 @@
 
 Looks at the files first and loads the module in a child process only, so that nothing which is
 wrong with it or with the host's libraries can end the doctor. The status is 0 if all is well, 1 if
-something has to be done, 2 for a wrong command line; and where nobody reads to the end, SIGPIPE
-ends the doctor as it does other commands, which the shell calls 141.
+something has to be done or the report cannot be written, 2 for a wrong command line.
 """
 
 import argparse
@@ -419,5 +418,11 @@ def main(arguments: Optional[List[str]] = None) -> int:
 
 
 if __name__ == "__main__":
-    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
-    sys.exit(main())
+    try:
+        try:
+            sys.exit(main())
+        finally:
+            print(end="", flush=True)
+    except OSError as failure:  # nobody reads to the end, as in | head, or the disk is full
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
+        sys.exit(1 if isinstance(failure, BrokenPipeError) else f"doctor: {failure}")

@@ -3,7 +3,6 @@
 import json
 import os
 import shutil
-import signal
 import subprocess
 import sys
 from pathlib import Path
@@ -236,7 +235,19 @@ def test_a_reader_that_leaves_early() -> None:
     done.stdout.close()
     assert done.stderr.read() == b""
     done.stderr.close()
-    assert done.wait() == -signal.SIGPIPE
+    assert done.wait() == 1
+
+
+@pytest.mark.parametrize("words", [[], ["--json"], ["--help"]])
+@pytest.mark.parametrize("unbuffered", ["", "1"])
+def test_a_full_disk(words: List[str], unbuffered: str) -> None:
+    environment = {**os.environ, "PYTHONPATH": str(FOLDER), "PYTHONUNBUFFERED": unbuffered}
+    command = [sys.executable, "-m", "libvswitch.doctor", *words]
+    with open("/dev/full", "w", encoding="ascii") as full:
+        done = subprocess.run(
+            command, cwd="/", env=environment, stdout=full, stderr=subprocess.PIPE, text=True
+        )
+    assert (done.returncode, done.stderr) == (1, "doctor: [Errno 28] No space left on device\n")
 
 
 def test_a_real_host_is_none_that_simulates(elsewhere: Path, tmp_path: Path) -> None:

@@ -1,11 +1,10 @@
 """The programs of examples/ run to their end, say what they do, and leave nothing behind."""
 
 import os
-import signal
 import subprocess
 import sys
 from pathlib import Path
-from typing import List
+from typing import Dict, List
 
 import pytest
 from programs import EXAMPLES
@@ -74,19 +73,38 @@ def test_a_name_that_is_no_utf_8(name: str, words: List[str], argument: str) -> 
     assert done.stderr.endswith(f"{name}.py: error: argument {argument}: {word!r} is no UTF-8\n")
 
 
-@pytest.mark.parametrize(
-    "name, words",
-    [
-        ("change_vlan", ["vswitch0", "web-1", "100"]),
-        ("inventory", []),
-        ("inventory", ["--json"]),
-        ("watch_links", ["vswitch0"]),
-    ],
-)
-def test_a_reader_that_leaves_early(shared_host: SharedHost, name: str, words: List[str]) -> None:
+WRITING = [
+    ("change_vlan", ["vswitch0", "web-1", "100"]),
+    ("change_vlan", ["--help"]),
+    ("first_steps", []),
+    ("inventory", []),
+    ("inventory", ["--json"]),
+    ("mirror_session", ["vswitch0", "web-1", "web-2", "--for", "0"]),
+    ("records", []),
+    ("tour", []),
+    ("watch_links", ["vswitch0", "--for", "0"]),
+]
+# Of a change that is made, but not told of.
+NOT_TOLD = {"change_vlan": 4}
+
+
+def test_all_examples_write() -> None:
+    assert {name for name, _ in WRITING} == {*SHOWS, *TOOLS}
+
+
+@pytest.fixture(params=["", "1"], ids=["at once", "line by line"])
+def writer(shared_host: SharedHost, request: pytest.FixtureRequest) -> Dict[str, str]:
+    """The environment of a program, which writes what it prints at the end or as it prints."""
+    simhost = os.path.join(os.environ["BUILD_DIR"], "simhost")
+    path = f"{simhost}{os.pathsep}{os.environ['PATH']}"
+    return {**shared_host.environment, "PATH": path, "PYTHONUNBUFFERED": request.param}
+
+
+@pytest.mark.parametrize("name, words", WRITING)
+def test_a_reader_that_leaves_early(writer: Dict[str, str], name: str, words: List[str]) -> None:
     done = subprocess.Popen(
         [sys.executable, str(EXAMPLES / f"{name}.py"), *words],
-        env=shared_host.environment,
+        env=writer,
         stdout=subprocess.PIPE,
         stderr=subprocess.PIPE,
     )
@@ -94,7 +112,18 @@ def test_a_reader_that_leaves_early(shared_host: SharedHost, name: str, words: L
     done.stdout.close()
     assert done.stderr.read() == b""
     done.stderr.close()
-    assert done.wait() == -signal.SIGPIPE
+    assert done.wait() == NOT_TOLD.get(name, 1)
+
+
+@pytest.mark.parametrize("name, words", WRITING)
+def test_a_full_disk(writer: Dict[str, str], name: str, words: List[str]) -> None:
+    command = [sys.executable, str(EXAMPLES / f"{name}.py"), *words]
+    with open("/dev/full", "w", encoding="ascii") as full:
+        done = subprocess.run(
+            command, env=writer, stdout=full, stderr=subprocess.PIPE, encoding="utf-8"
+        )
+    assert done.stderr == f"{name}: [Errno 28] No space left on device\n"
+    assert done.returncode == NOT_TOLD.get(name, 1)
 
 
 def test_a_tour_without_its_guide(shared_host: SharedHost, tmp_path: Path) -> None:

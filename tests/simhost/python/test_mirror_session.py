@@ -141,3 +141,14 @@ def test_a_wrong_option(example: Callable[..., Any], option: str, why: str) -> N
     status, lines, errors = example("mirror_session", *PORTS, option)
     assert (status, lines) == (2, [])
     assert errors.splitlines()[-1] == f"mirror_session.py: error: {why}"
+
+
+def test_nothing_can_be_written(shared_host: SharedHost) -> None:
+    command = [sys.executable, str(EXAMPLES / "mirror_session.py"), *PORTS]
+    with open("/dev/full", "w", encoding="ascii") as full:
+        done = subprocess.run(
+            command, env=shared_host.environment, stdout=full, stderr=subprocess.PIPE, text=True
+        )
+    errors = "mirror_session: [Errno 28] No space left on device\n"
+    assert (done.returncode, done.stderr) == (1, errors)
+    assert sessions(shared_host) == []
