@@ -94,4 +94,12 @@ std::optional<store::Port> find_port(store::Transaction &transaction, store::Swi
   return owner ? store::find_port(transaction, owner->key, identifier) : std::nullopt;
 }
 
+bool is_there(store::Transaction &transaction, store::PropertyOwner const &owner) {
+  if (!owner.port_number) {
+    return store::find_switch(transaction, owner.switch_key).has_value();
+  }
+  auto const port = store::find_port(transaction, *owner.port_number);
+  return port && port->switch_key == owner.switch_key;
+}
+
 }  // namespace simhost

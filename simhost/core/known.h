@@ -37,6 +37,9 @@ SIMHOST_API std::optional<store::Port> find_port(store::Transaction &transaction
                                                  std::string_view switch_name,
                                                  std::string_view identifier);
 
+/// Whether the switch or the port that owns properties is there.
+SIMHOST_API bool is_there(store::Transaction &transaction, store::PropertyOwner const &owner);
+
 /// A port as an owner of properties.
 inline store::PropertyOwner owner_of(store::Port const &port) {
   return store::PropertyOwner::port(port.switch_key, port.number);

@@ -1,4 +1,5 @@
-// The one place that jumps. Its own frames hold no object with a destructor.
+// The one place that jumps, and that keeps what a jump needs. Its own frames hold no object with a
+// destructor.
 #include "core/trap.h"
 
 #include <algorithm>
@@ -120,6 +121,19 @@ void spring_trap(PanicReport const &report) noexcept {
   exceptionType = type;
   exceptionMsg = last_report.text.data();
   longjmp(exception_buffer, 1);
+}
+
+char call_back(char (*callback)(void *, void *), void *reached, void *context) {
+  jmp_buf armed;
+  bool const is_armed = trap_is_there();
+  if (is_armed) {
+    std::memcpy(&armed, &exception_buffer, sizeof armed);
+  }
+  char const answer = callback(reached, context);
+  if (is_armed) {
+    std::memcpy(&exception_buffer, &armed, sizeof armed);
+  }
+  return answer;
 }
 
 }  // namespace simhost

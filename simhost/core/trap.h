@@ -26,4 +26,8 @@ void describe(PanicReport &report, PanicKind kind, std::string_view call,
 /// destroying.
 [[noreturn]] SIMHOST_API void spring_trap(PanicReport const &report) noexcept;
 
+/// What a function of the caller's answers. It may call the host, for which the trap is armed anew:
+/// afterwards the trap leads again to where it led before.
+SIMHOST_API char call_back(char (*callback)(void *, void *), void *reached, void *context);
+
 }  // namespace simhost

@@ -26,9 +26,13 @@ using simhost::store::Transaction;
 
 namespace {
 
-// The item of the property of `owner` that comes after `last`, or of the first one.
+// The item of the property of `owner` that comes after `last`, or of the first one; null after the
+// last one, and when the owner is gone.
 void *item_after(Call &call, Transaction &transaction, PropertyOwner const &owner,
                  void const *last) {
+  if (!simhost::is_there(transaction, owner)) {
+    return nullptr;
+  }
   auto const name = last == nullptr
                         ? std::string_view()
                         : std::string_view(call.handles().item_behind(last).content.name);
@@ -36,7 +40,8 @@ void *item_after(Call &call, Transaction &transaction, PropertyOwner const &owne
   return next ? call.handles().of_property(owner, *std::move(next)) : nullptr;
 }
 
-// Whether a switch or a port is there is asked once, before the walk: a callback may remove it.
+// The host gives up on the handle of what is gone before the walk only: a callback may remove what
+// it walks over, which ends the walk.
 template <typename OwnerOf>
 void walk_properties(char const *name, void const *handle, DVSPortDataCallback callback,
                      void *context, OwnerOf const &owner_of) {
@@ -48,7 +53,7 @@ void walk_properties(char const *name, void const *handle, DVSPortDataCallback c
     auto &transaction = call.reading();
     item = item_after(call, transaction, owner_of(call, transaction, handle), nullptr);
   });
-  while (item != nullptr && callback(item, context) != 0) {
+  while (item != nullptr && simhost::call_back(callback, item, context) != 0) {
     simhost::run(
         name,
         [&](Call &call) {
@@ -120,7 +125,7 @@ void DVSState_SwitchForEach(DVSwitchCallback callback, void *context) {
   void *handle = nullptr;
   auto const step = [&](Call &call) { handle = simhost::handle_after(call, last); };
   simhost::run(__func__, step);
-  while (handle != nullptr && callback(handle, context) != 0) {
+  while (handle != nullptr && simhost::call_back(callback, handle, context) != 0) {
     simhost::run(__func__, step, Call::Resumed{});
   }
 }
@@ -137,7 +142,7 @@ void DVSState_PortForEach(DVSwitchHandle handle, DVSPortCallback callback, void 
   auto const step = [&](Call &call) { port = simhost::handle_after(call, key, last); };
   do {
     simhost::run(__func__, step, Call::Resumed{});
-  } while (port != nullptr && callback(port, context) != 0);
+  } while (port != nullptr && simhost::call_back(callback, port, context) != 0);
 }
 
 void DVSState_GlobalPropForEach(DVSwitchHandle handle, DVSPortDataCallback callback,

@@ -6,6 +6,7 @@
 #include <array>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <string>
 #include <vector>
 
@@ -184,6 +185,61 @@ TEST_F(StateLibrary, ACallbackMayChangeWhatItWalksOver) {
   DVSState_PortForEach(DVSState_SwitchFindByAlias("s"), remove_port, &removed);
   EXPECT_EQ(removed, 2) << "the uplink ports stay";
   EXPECT_EQ(DVPortExist("s-id", "p"), 0);
+}
+
+char destroy_switch(void * /*reached*/, void *context) {
+  ++*static_cast<int *>(context);
+  VSDVS_DestroyVSwitch("s");
+  return 1;
+}
+
+char remove_named_port(void * /*item*/, void *context) {
+  ++*static_cast<int *>(context);
+  VSDVS_RemoveDVPort("s", "p");
+  return 1;
+}
+
+TEST_F(StateLibrary, AWalkEndsWithWhatItWalksOver) {
+  int reached = 0;
+  auto *const context = &reached;
+  auto *const port = DVSState_PortFind("s-id", "p");
+  EXPECT_EQ(raised_by([=] { DVSState_PortDataForEach(port, remove_named_port, context); }),
+            std::nullopt);
+  EXPECT_EQ(reached, 1);
+  auto *const handle = DVSState_SwitchFindByAlias("s");
+  EXPECT_EQ(raised_by([=] { DVSState_GlobalPropForEach(handle, destroy_switch, context); }),
+            std::nullopt);
+  EXPECT_EQ(reached, 2);
+  ASSERT_EQ(VSDVS_CreateVSwitch("s", nullptr, nullptr, 0, 1, 0, 0, 0), QEX_OK);
+  auto *const again = DVSState_SwitchFindByAlias("s");
+  EXPECT_EQ(raised_by([=] { DVSState_HostPropForEach(again, destroy_switch, context); }),
+            std::nullopt);
+  EXPECT_EQ(reached, 3);
+}
+
+// What a callback does that calls the host through the module: the buffer then leads into a frame
+// that is gone when the walk goes on.
+char arm_the_trap(void * /*reached*/, void * /*context*/) {
+  std::memset(&exception_buffer, 0xA5, sizeof exception_buffer);
+  return 1;
+}
+
+std::array<unsigned char, sizeof(jmp_buf)> buffer_of_the_trap() {
+  std::array<unsigned char, sizeof(jmp_buf)> bytes{};
+  std::memcpy(bytes.data(), &exception_buffer, bytes.size());
+  return bytes;
+}
+
+TEST_F(StateLibrary, AfterACallbackTheTrapIsTheWalksAgain) {
+  std::memset(&exception_buffer, 0x5A, sizeof exception_buffer);
+  auto const armed = buffer_of_the_trap();
+  auto *const handle = DVSState_SwitchFindByAlias("s");
+  DVSState_SwitchForEach(arm_the_trap, nullptr);
+  EXPECT_EQ(buffer_of_the_trap(), armed);
+  DVSState_PortForEach(handle, arm_the_trap, nullptr);
+  EXPECT_EQ(buffer_of_the_trap(), armed);
+  DVSState_GlobalPropForEach(handle, arm_the_trap, nullptr);
+  EXPECT_EQ(buffer_of_the_trap(), armed);
 }
 
 char give_back_rubbish(void * /*handle*/, void *context) {
