@@ -417,12 +417,16 @@ def main(arguments: Optional[List[str]] = None) -> int:
     return 0 if report.is_well else 1
 
 
-if __name__ == "__main__":
+def _run() -> None:
     try:
         try:
             sys.exit(main())
         finally:
             print(end="", flush=True)
-    except OSError as failure:  # nobody reads to the end, as in | head, or the disk is full
+    except OSError as error:  # nobody reads to the end, as in | head, or the disk is full
         os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
-        sys.exit(1 if isinstance(failure, BrokenPipeError) else f"doctor: {failure}")
+        sys.exit(1 if isinstance(error, BrokenPipeError) else f"doctor: {error}")
+
+
+if __name__ == "__main__":
+    _run()
