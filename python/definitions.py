@@ -202,7 +202,9 @@ def _collect(node: ET.Element, found: Definitions, header: str, family: str) -> 
         elif child.tag == "constant":
             is_text = seen["type"] == "p.char" or seen["type"].endswith("char")
             name, type_ = seen["sym_name"], _type(seen["type"])
-            found.constants.append(Constant(name, is_text, _text(seen), "", header, type_))
+            # The comment of a row of definitions stands before what the first says of itself.
+            doc = re.sub(r"\.\s{2,}(?=\S)", ": ", _text(seen))
+            found.constants.append(Constant(name, is_text, doc, "", header, type_))
         elif child.tag in ("include", "extern", "module"):
             _collect(child, found, seen.get("name", ""), family)
 

@@ -96,9 +96,7 @@ class Calls(Functions):
         header = self.catalogue.headers.get(self.arguments[0])
         if header is None or not header.prototypes:
             raise self.error(f"no header with calls: {self.arguments[0]}")
-        # The first paragraph says what the page's own heading does.
-        _, _, text = header.text.text.partition("\n\n")
-        found = self.words.paragraphs(text)
+        found = self.more_of(header.name)
         for call in self.catalogue.calls.values():
             if call.header == header.name:
                 found += self.function(call)

@@ -93,6 +93,25 @@ class Catalogue:
             self.calls[name] = self._call(name, forms)
         for record in self.known.records.values():
             self.methods[record.name] = [self._method(record, one) for one in record.methods]
+        self._places: Dict[str, List[str]] = {}
+        for place, text in self._commented():
+            for word in dict.fromkeys(re.findall(r"\w+", text)):
+                self._places.setdefault(word, []).append(place)
+
+    def _commented(self) -> Iterable[Tuple[str, str]]:
+        """Calls, records and fields, each with what is said of it."""
+        for call in self.calls.values():
+            comment = call.comment
+            said = [comment.text, *comment.statuses.values(), *comment.parameters.values()]
+            yield call.name, " ".join(said)
+        for record in self.known.records.values():
+            yield record.name, record.doc
+            for one in record.fields:
+                yield f"{record.name}.{one.name}", one.doc
+
+    def places_of(self, constant: str) -> List[str]:
+        """The calls, records and fields of which the comments name a constant."""
+        return self._places.get(constant, [])
 
     def title_of(self, family: Family) -> str:
         """What a family is called: its name, if no other has the same, or its comment."""

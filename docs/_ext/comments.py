@@ -103,6 +103,7 @@ def _read_families(source: str, header: Header) -> None:
         rf"{_COMMENT}\s*(?:typedef )?enum\s*\w*\s*\{{(?P<items>[^}}]*)\}}\s*(?P<title>\w*);"
     )
     definitions = rf"{_COMMENT}\n(?P<lines>(?:#define \w+ .*\n)+)"
+    remark = r"^#define (\w+) .*?/\*\*<(.*?)\*/$"
     found = []
     for match in re.finditer(enumeration, source):
         items = list(_ITEM.finditer(match["items"]))
@@ -117,8 +118,12 @@ def _read_families(source: str, header: Header) -> None:
         found.append((match.start(), Family(title, text, names, remarks)))
     for match in re.finditer(definitions, source):
         names = tuple(re.findall(r"#define (\w+)", match["lines"]))
+        remarks = {
+            name: undecorated(said)
+            for name, said in re.findall(remark, match["lines"], re.MULTILINE)
+        }
         text = undecorated(match["comment"])
-        found.append((match.start(), Family(common_start(names), text, names, {})))
+        found.append((match.start(), Family(common_start(names), text, names, remarks)))
     header.families = [family for _, family in sorted(found, key=lambda one: one[0])]
 
 

@@ -21,6 +21,8 @@ class Constants(Described):
             header = self.catalogue.headers.get(name)
             if header is None or not header.families:
                 raise self.error(f"no header with constants: {name}")
+            if name not in map(self.catalogue.header_of, self.catalogue.known.records.values()):
+                found += self.more_of(name)
             for family in header.families:
                 found.append(self._family(name, family))
         return found
@@ -59,8 +61,8 @@ class Constants(Described):
         return found
 
     def _meaning(self, family: Family, name: str) -> str:
-        if name in family.remarks:
-            return family.remarks[name]
+        remark = family.remarks.get(name, "")
         if family.title == "QEX_ReturnStatus":
-            return str(readable(name))
-        return ""
+            return remark or str(readable(name[len("QEX_") :]))
+        places = ", ".join(f"`{place}`" for place in self.catalogue.places_of(name))
+        return "; ".join(filter(None, [remark, places and f"see {places}"]))

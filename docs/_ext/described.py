@@ -2,7 +2,7 @@
 
 from functools import lru_cache
 from pathlib import Path
-from typing import Iterable, Sequence, Tuple, cast
+from typing import Iterable, List, Sequence, Tuple, cast
 
 from docutils import nodes
 from docutils.statemachine import StringList
@@ -68,6 +68,10 @@ class Described(SphinxDirective):
             entries["entries"] = [
                 tuple(name if part == given else part for part in one) for one in entries["entries"]
             ]
+
+    def more_of(self, header: str) -> List[nodes.Node]:
+        """What a header says of itself, but for its first paragraph: that is the page's heading."""
+        return self.words.paragraphs(self.catalogue.headers[header].text.text.partition("\n\n")[2])
 
     def labelled(self, label: str, children: Iterable[nodes.Node]) -> nodes.Element:
         """A paragraph that opens with what it is about."""

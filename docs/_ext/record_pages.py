@@ -20,6 +20,8 @@ class Records(Functions):
         for header in self.arguments:
             if header not in self.catalogue.headers:
                 raise self.error(f"no such header: {header}")
+            said = [one.astext() for one in found]
+            found += [one for one in self.more_of(header) if one.astext() not in said]
             for record in self.catalogue.known.records.values():
                 if self.catalogue.header_of(record) == header:
                     found.append(self._record(record))

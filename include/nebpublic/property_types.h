@@ -12,7 +12,7 @@ enum {
   RUNTIME_PROP_TYPE = 32,
   VOLATILE_PROP_TYPE = 4,
   POLICY_PROP_TYPE = 8,
-  ALL_PROP_TYPE = 60,
+  ALL_PROP_TYPE = 60, /**< the four of them */
 };
 
 #endif  // NEBPUBLIC_PROPERTY_TYPES_H

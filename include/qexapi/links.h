@@ -16,7 +16,7 @@ typedef enum qex_LinkState {
 
 /** Values of a qex_LinkSpeed. */
 enum {
-  QEX_LINK_SPEED_AUTO = 0,
+  QEX_LINK_SPEED_AUTO = 0, /**< left to negotiation */
   QEX_LINK_SPEED_10_MBPS = 10,
   QEX_LINK_SPEED_100_MBPS = 100,
   QEX_LINK_SPEED_1000_MBPS = 1000,
@@ -33,7 +33,7 @@ enum {
 
 /** The duplex mode of a link. */
 typedef enum qex_LinkDuplex {
-  QEX_LINK_DUPLEX_AUTO = -1,
+  QEX_LINK_DUPLEX_AUTO = -1, /**< left to negotiation */
   QEX_LINK_DUPLEX_HALF = 1,
   QEX_LINK_DUPLEX_FULL = 2,
 } qex_LinkDuplex;

@@ -10,24 +10,24 @@
 #include "qexapi/types.h"
 
 /** Limits of a management interface. */
-#define QEX_MGMT_MAX_CALLBACK_PARMS 4
+#define QEX_MGMT_MAX_CALLBACK_PARMS 4 /**< parameters of a callback */
 #define QEX_MGMT_RESERVED_CALLBACKS 15
 
 /** How the keys of an instance are told apart. */
 enum {
-  QEX_MGMT_KEY_TYPE_LONG = 1,
-  QEX_MGMT_KEY_TYPE_STRING = 2,
+  QEX_MGMT_KEY_TYPE_LONG = 1,   /**< by numbers */
+  QEX_MGMT_KEY_TYPE_STRING = 2, /**< by texts */
 };
 
 /** Limits of keys and instances. */
-#define QEX_MGMT_KEY_STRING_MAXLEN 4096
-#define QEX_MGMT_MAX_KEYS_PER_INSTANCE 32
-#define QEX_MGMT_MAX_INSTANCES 32
+#define QEX_MGMT_KEY_STRING_MAXLEN 4096   /**< bytes of a key that is a text */
+#define QEX_MGMT_MAX_KEYS_PER_INSTANCE 32 /**< keys of an instance */
+#define QEX_MGMT_MAX_INSTANCES 32         /**< instances of an interface */
 
 /** Where a callback runs. */
 typedef enum qex_MgmtCallbackLocation {
-  QEX_MGMT_CALLBACK_KERNEL = 1,
-  QEX_MGMT_CALLBACK_USER = 2,
+  QEX_MGMT_CALLBACK_KERNEL = 1, /**< in the kernel */
+  QEX_MGMT_CALLBACK_USER = 2,   /**< in a program */
 } qex_MgmtCallbackLocation;
 
 /** Which way a parameter of a callback goes, and whether it is a vector. */

@@ -8,7 +8,7 @@
 
 /** Why a packet was dropped. */
 typedef enum qex_PktCapDropReason {
-  QEX_PKTCAP_NO_DROP = 0,
+  QEX_PKTCAP_NO_DROP = 0, /**< it was not */
   QEX_PKTCAP_ENQUEUE_FAIL_DROP = 1,
   QEX_PKTCAP_DEV_STOPPED_DROP = 2,
   QEX_PKTCAP_DEV_TX_DROP = 3,
@@ -26,7 +26,7 @@ typedef enum qex_PktCapDropReason {
   QEX_PKTCAP_DEFAULT_DROP = 15,
   QEX_PKTCAP_TCPIP_DROP = 16,
   QEX_PKTCAP_OVERLAY_DROP = 17,
-  QEX_PKTCAP_DROP_REASON_MAX = 18,
+  QEX_PKTCAP_DROP_REASON_MAX = 18, /**< how many there are */
 } qex_PktCapDropReason;
 
 /** Where in the packet's way it was captured. */
@@ -59,7 +59,7 @@ typedef enum qex_PktCapPoint {
   QEX_PKTCAP_POINT_POST_OVERLAY_INPUT = 25,
   QEX_PKTCAP_POINT_PRE_OVERLAY_OUTPUT = 26,
   QEX_PKTCAP_POINT_POST_OVERLAY_OUTPUT = 27,
-  QEX_PKTCAP_POINT_MAX = 28,
+  QEX_PKTCAP_POINT_MAX = 28, /**< how many there are */
 } qex_PktCapPoint;
 
 #endif  // QEXAPI_PACKET_CAPTURE_H

@@ -9,7 +9,7 @@
 #include "qexapi/types.h"
 
 /** Values that stand for no limit and for the host's defaults. */
-#define QEX_PORTSET_RESPOOL_LIMIT_INFINITE (-1)
+#define QEX_PORTSET_RESPOOL_LIMIT_INFINITE (-1) /**< no limit */
 #define QEX_PORTSET_RESPOOL_DEFAULT_QUEUE_DEPTH (-1)
 #define QEX_PORTSET_RESPOOL_DEFAULT_PRIORITY_TAG 0
 #define QEX_PORTSET_RESPOOL_MAX_SHARES 100

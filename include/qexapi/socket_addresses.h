@@ -9,13 +9,13 @@
 #include "qexapi/types.h"
 
 /** Bytes of an address as text, its terminating NUL included. */
-#define QEX_SOCKET_AF_INET_STRLEN 16
-#define QEX_SOCKET_AF_INET6_STRLEN 46
+#define QEX_SOCKET_AF_INET_STRLEN 16  /**< IPv4 */
+#define QEX_SOCKET_AF_INET6_STRLEN 46 /**< IPv6 */
 
 /** Address families and socket types. */
 enum {
-  QEX_SOCKET_AF_INET = 2,
-  QEX_SOCKET_AF_INET6 = 28,
+  QEX_SOCKET_AF_INET = 2,   /**< IPv4 */
+  QEX_SOCKET_AF_INET6 = 28, /**< IPv6 */
   QEX_SOCKET_SOCK_STREAM = 1,
   QEX_SOCKET_SOCK_DGRAM = 2,
   QEX_SOCKET_SOCK_RAW = 3,

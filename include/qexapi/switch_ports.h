@@ -15,12 +15,12 @@ enum {
 };
 
 /** Bytes of identifiers and names, their terminating NULs included. */
-#define QEX_NEB_ID_MAX_LEN 64
-#define QEX_NEB_NAME_MAX_LEN 81
-#define QEX_NEB_CLASS_NAME_MAX_LEN 128
-#define QEX_NEB_PORT_ID_MAX_LEN 48
+#define QEX_NEB_ID_MAX_LEN 64          /**< identifier of a switch */
+#define QEX_NEB_NAME_MAX_LEN 81        /**< display name */
+#define QEX_NEB_CLASS_NAME_MAX_LEN 128 /**< class of a set of ports */
+#define QEX_NEB_PORT_ID_MAX_LEN 48     /**< identifier of a port */
 #define QEX_NEB_PORT_ID_LEGACY_MAX_LEN 16
-#define QEX_NEB_PORT_ALIAS_MAX_LEN 81
+#define QEX_NEB_PORT_ALIAS_MAX_LEN 81 /**< alias of a port */
 
 /** The display name of a port. */
 typedef char qex_NEBPortName[QEX_NEB_NAME_MAX_LEN];
@@ -33,7 +33,7 @@ enum {
   QEX_NEBPORT_STATUS_INUSE = 1,
   QEX_NEBPORT_STATUS_LINKUP = 2,
   QEX_NEBPORT_STATUS_BLOCKED = 4,
-  QEX_NEBPORT_STATUS_PASSTHRU = 8,
+  QEX_NEBPORT_STATUS_PASSTHRU = 8, /**< the port is reached past the kernel */
 };
 
 /** The health of a switch on a host. */

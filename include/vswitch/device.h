@@ -16,8 +16,8 @@
 
 /** Which statistics a query asks for. */
 enum {
-  VS_STATS_FLAG_RARP = 1,
-  VS_STATS_FLAG_SERVICE_PORT = 2,
+  VS_STATS_FLAG_RARP = 1,         /**< VSRARPStats */
+  VS_STATS_FLAG_SERVICE_PORT = 2, /**< VSServicePortTeamingStats */
 };
 
 /** Multicast addresses a port accepts one by one. */

@@ -10,11 +10,11 @@
 
 /** Ageing times in seconds, and the defaults of a switch and of its uplink team. */
 enum {
-  VS_MAC_LEARNING_AGING_TIME_DEFAULT = 300,
-  VS_MAC_LEARNING_AGING_TIME_MAX = 1000000,
-  TEAM_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT = 16384,
-  VS_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT = 65536,
-  VS_MAC_LEARNING_LEARN_STATIC_DEFAULT = 0,
+  VS_MAC_LEARNING_AGING_TIME_DEFAULT = 300,        /**< seconds */
+  VS_MAC_LEARNING_AGING_TIME_MAX = 1000000,        /**< seconds */
+  TEAM_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT = 16384, /**< addresses, of a team of uplinks */
+  VS_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT = 65536,   /**< VSMACLearning.macLimit */
+  VS_MAC_LEARNING_LEARN_STATIC_DEFAULT = 0,        /**< VSMACLearning.learnStatic */
 };
 
 #pragma pack(push, 1)

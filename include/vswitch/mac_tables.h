@@ -14,7 +14,7 @@ typedef enum VSMACAddrType {
   VS_MAC_ADDR_TYPE_STATIC = 0,
   VS_MAC_ADDR_TYPE_USER = 1,
   VS_MAC_ADDR_TYPE_LEARNED = 2,
-  VS_MAC_ADDR_TYPE_ALL = 3,
+  VS_MAC_ADDR_TYPE_ALL = 3, /**< all kinds, to ask for or to clear */
 } VSMACAddrType;
 
 #pragma pack(push, 1)

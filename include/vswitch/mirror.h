@@ -68,11 +68,11 @@ typedef enum DVMirrorSessionType {
 
 /** What an entity names. */
 typedef enum DVMirrorEntityType {
-  MIRROR_ENTTYPE_DVPORT = 0,
-  MIRROR_ENTTYPE_UPLINK = 1,
-  MIRROR_ENTTYPE_VLAN = 2,
-  MIRROR_ENTTYPE_IP = 3,
-  MIRROR_ENTTYPE_PORT = 4,
+  MIRROR_ENTTYPE_DVPORT = 0, /**< a port, by its identifier: `dvPortId` */
+  MIRROR_ENTTYPE_UPLINK = 1, /**< an uplink, by its name: `uplink` */
+  MIRROR_ENTTYPE_VLAN = 2,   /**< a VLAN: `vlan` */
+  MIRROR_ENTTYPE_IP = 3,     /**< an address: `ip` */
+  MIRROR_ENTTYPE_PORT = 4,   /**< a port, by its number: `portId` */
 } DVMirrorEntityType;
 
 /** Which traffic of an uplink is mirrored. */
@@ -83,15 +83,15 @@ typedef enum DVMirrorFilterType {
   MIRROR_UPLINK_FILTER_VXLAN = 3,
   MIRROR_UPLINK_FILTER_GENEVE = 4,
   MIRROR_UPLINK_FILTER_ALL_ENCAP = 5,
-  MIRROR_UPLINK_FILTER_TYPE_MAX = 6,
+  MIRROR_UPLINK_FILTER_TYPE_MAX = 6, /**< how many there are */
 } DVMirrorFilterType;
 
 /** How mirrored frames are wrapped. */
 typedef enum DVMirrorEncapType {
   DVMIRROR_ENCAP_GRE = 0,
-  DVMIRROR_ENCAP_ERSPAN2 = 1,
-  DVMIRROR_ENCAP_ERSPAN3 = 2,
-  DVMIRROR_ENCAP_TYPE_MAX = 3,
+  DVMIRROR_ENCAP_ERSPAN2 = 1,  /**< ERSPAN type II */
+  DVMIRROR_ENCAP_ERSPAN3 = 2,  /**< ERSPAN type III */
+  DVMIRROR_ENCAP_TYPE_MAX = 3, /**< how many there are */
 } DVMirrorEncapType;
 
 /** The identifier of a session. */

@@ -18,7 +18,7 @@ typedef enum VS_PortClientType {
   VS_PORT_CLIENT_TCPIP = 1,
   VS_PORT_CLIENT_VNIC = 2,
   VS_PORT_CLIENT_UPLINK = 3,
-  VS_PORT_CLIENT_LAG = 4,
+  VS_PORT_CLIENT_LAG = 4, /**< a link-aggregation group */
 } VS_PortClientType;
 
 /** What a port does with VLAN tags: a set of bits. */

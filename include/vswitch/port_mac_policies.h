@@ -14,8 +14,8 @@
 
 /** What becomes of frames from an address that no longer fits. */
 typedef enum VSPortMACLearningLimitPolicy {
-  VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW = 0,
-  VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP = 1,
+  VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW = 0, /**< they are let through */
+  VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP = 1,  /**< they are dropped */
 } VSPortMACLearningLimitPolicy;
 
 #pragma pack(push, 1)

@@ -12,16 +12,16 @@
 
 /** Bits of VSPortVlanPolicy.flags. */
 enum {
-  VSPORT_VLAN_GUEST_TAGGING = 1,
-  VSPORT_VLAN_PVLAN_ENABLED = 2,
+  VSPORT_VLAN_GUEST_TAGGING = 1, /**< the client tags its frames itself */
+  VSPORT_VLAN_PVLAN_ENABLED = 2, /**< `vlanID` is a VLAN of the private-VLAN map */
   VSPORT_VLAN_SET_PRIORITY = 4,
 };
 
 /** Bits of VSPropSecurity.flags. */
 enum {
-  VSPORT_SECURITY_DISALLOW_PROMISC = 1,
-  VSPORT_SECURITY_DISALLOW_MAC_CHANGE = 2,
-  VSPORT_SECURITY_DISALLOW_FORGED_SRC = 4,
+  VSPORT_SECURITY_DISALLOW_PROMISC = 1,    /**< receive in promiscuous mode */
+  VSPORT_SECURITY_DISALLOW_MAC_CHANGE = 2, /**< change its MAC address */
+  VSPORT_SECURITY_DISALLOW_FORGED_SRC = 4, /**< send from a forged address */
 };
 
 /** Multicast addresses of a VSExtraEthFilter. */
@@ -35,7 +35,7 @@ enum {
   QEX_ETH_FILTER_BROADCAST = 0x8,
   QEX_ETH_FILTER_PROMISC = 0x10,
   QEX_ETH_FILTER_USE_LADRF = 0x20,
-  QEX_ETH_FILTER_SINK = 0x10000,
+  QEX_ETH_FILTER_SINK = 0x10000, /**< those that no other port takes */
 };
 
 #pragma pack(push, 1)

@@ -6,7 +6,7 @@
  * The runtime options that hold integers, as a query asks for them.
  */
 
-/** Options to ask VSQEX_GetRuntimeOptions for. */
+/** Options to ask VSQEX_GetRuntimeOptions for; VSRuntimeOptionType has them by other names. */
 enum {
   GET_RUNTIME_OPTIONS_IGMP_QUERY_INTERVAL = 0,
   GET_RUNTIME_OPTIONS_IGMP_V3_MAX_SRC_IP_NUM = 1,
@@ -21,7 +21,7 @@ enum {
   GET_RUNTIME_OPTIONS_ALLOW_FAST_PATH = 10,
   GET_RUNTIME_OPTIONS_TEAM_POLICY_UP_DELAY = 11,
   GET_RUNTIME_OPTIONS_ALLOW_MIRROR_STATS = 12,
-  NUM_RUNTIME_INT_OPTIONS = 13,
+  NUM_RUNTIME_INT_OPTIONS = 13, /**< how many there are */
 };
 
 #endif  // VSWITCH_RUNTIME_OPTION_QUERIES_H

@@ -13,22 +13,22 @@
 
 /** Options. The last two are texts, the others integers. */
 typedef enum VSRuntimeOptionType {
-  VS_RT_OPT_IGMP_QUERY_INTERVAL = 0,
-  VS_RT_OPT_IGMP_V3_MAX_SRC_IP_NUM = 1,
-  VS_RT_OPT_IGMP_QUERIES = 2,
-  VS_RT_OPT_IGMP_VERSION = 3,
-  VS_RT_OPT_MLD_VERSION = 4,
-  VS_RT_OPT_MLD_V2_MAX_SRC_IP_NUM = 5,
-  VS_RT_OPT_MAX_RARPS_PER_INTERVAL = 6,
-  VS_RT_OPT_RARP_ADVERTISEMENT_DURATION = 7,
-  VS_RT_OPT_REVERSE_PATH_FWD_CHECK = 8,
-  VS_RT_OPT_REVERSE_PATH_FWD_CHECK_PROMISC = 9,
-  VS_RT_OPT_ALLOW_FAST_PATH = 10,
-  VS_RT_OPT_TEAM_POLICY_UP_DELAY = 11,
-  VS_RT_OPT_ALLOW_MIRROR_STATS = 12,
-  VS_RT_OPT_IGMP_ROUTER_IP = 13,
-  VS_RT_OPT_MLD_ROUTER_IP = 14,
-  VS_NUM_RT_OPT = 15,
+  VS_RT_OPT_IGMP_QUERY_INTERVAL = 0,            /**< IGMPQueryInterval */
+  VS_RT_OPT_IGMP_V3_MAX_SRC_IP_NUM = 1,         /**< IGMPV3MaxSrcIPNum */
+  VS_RT_OPT_IGMP_QUERIES = 2,                   /**< IGMPQueries */
+  VS_RT_OPT_IGMP_VERSION = 3,                   /**< IGMPVersion */
+  VS_RT_OPT_MLD_VERSION = 4,                    /**< MLDVersion */
+  VS_RT_OPT_MLD_V2_MAX_SRC_IP_NUM = 5,          /**< MLDV2MaxSrcIPNum */
+  VS_RT_OPT_MAX_RARPS_PER_INTERVAL = 6,         /**< MaxRARPsPerInterval */
+  VS_RT_OPT_RARP_ADVERTISEMENT_DURATION = 7,    /**< RARPAdvertisementDuration */
+  VS_RT_OPT_REVERSE_PATH_FWD_CHECK = 8,         /**< ReversePathFwdCheck */
+  VS_RT_OPT_REVERSE_PATH_FWD_CHECK_PROMISC = 9, /**< ReversePathFwdCheckPromisc */
+  VS_RT_OPT_ALLOW_FAST_PATH = 10,               /**< AllowFastPath */
+  VS_RT_OPT_TEAM_POLICY_UP_DELAY = 11,          /**< TeamPolicyUpDelay */
+  VS_RT_OPT_ALLOW_MIRROR_STATS = 12,            /**< AllowMirrorStats */
+  VS_RT_OPT_IGMP_ROUTER_IP = 13,                /**< IGMPRouterIP */
+  VS_RT_OPT_MLD_ROUTER_IP = 14,                 /**< MLDRouterIP */
+  VS_NUM_RT_OPT = 15,                           /**< how many there are */
 } VSRuntimeOptionType;
 
 /** Bytes of a whole list and of a text, the text's terminating NUL included. */

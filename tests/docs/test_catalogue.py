@@ -56,3 +56,13 @@ def test_families_hold_every_constant_once(catalogue: Catalogue) -> None:
         for name in family.names
     ]
     assert sorted(listed) == sorted(one.name for one in catalogue.known.constants)
+
+
+def test_places_of_constants(catalogue: Catalogue) -> None:
+    assert catalogue.places_of("VSPROP_MTU") == ["VSDVS_GetMTU"]
+    assert catalogue.places_of("QEX_SOCKET_AF_INET") == ["qex_SocketIPAddress.sin_family"]
+    assert catalogue.places_of("VSPROP_PORT_MAC_MANAGEMENT") == [
+        "VSDVS_GetPortMACLearning",
+        "VSPMACManagement",
+    ]
+    assert catalogue.places_of("VS_DVMIRROR_WILDCARD_TEST") == []

@@ -101,6 +101,35 @@ def test_a_list_is_no_running_text(tmp_path: Path) -> None:
     assert comment.parameters == {"port": "identifier of the new port"}
 
 
+def test_what_is_said_of_single_constants(tmp_path: Path) -> None:
+    text = """
+/** Limits. */
+#define MAX_PORTS 8 /**< ports of a switch */
+#define MAX_NAME "x" /**< bytes of a name */
+#define MAX_REST (-1)
+
+/** Kinds of ports. */
+typedef enum Kind {
+  KIND_ANY = 0,
+  KIND_UP = 1,   /**< an uplink */
+  KIND_LONG = 2, /**< what takes
+                      two lines */
+  /** said before it */
+  KIND_LAST,
+} Kind;
+"""
+    limits, kinds = header(FILE + text, tmp_path).families
+    assert (limits.title, limits.names) == ("MAX_*", ("MAX_PORTS", "MAX_NAME", "MAX_REST"))
+    assert limits.remarks == {"MAX_PORTS": "ports of a switch", "MAX_NAME": "bytes of a name"}
+    assert (kinds.title, kinds.text) == ("Kind", "Kinds of ports.")
+    assert kinds.names == ("KIND_ANY", "KIND_UP", "KIND_LONG", "KIND_LAST")
+    assert kinds.remarks == {
+        "KIND_UP": "an uplink",
+        "KIND_LONG": "what takes\ntwo lines",
+        "KIND_LAST": "said before it",
+    }
+
+
 @pytest.mark.parametrize(
     "right, wrong, refused",
     [

@@ -9,8 +9,10 @@ from typing import Any, Dict, List, Tuple
 
 import check_links
 import functions
+import libvswitch as vs
 import pytest
 import records
+from catalogue import Catalogue
 from conftest import BUILD, build
 from check_links import Page
 
@@ -115,6 +117,47 @@ def test_every_constant(site: Site) -> None:
         words = text.split(None, 2)
         assert words[0] == name
         assert text[text.index(name) + len(name) :].strip().startswith(value), name
+
+
+@pytest.mark.parametrize(
+    "name, meaning",
+    [
+        ("MIRROR_ENTTYPE_IP", "3 an address: ip"),
+        ("QEX_ETH_FILTER_SINK", "no other port takes; see VSDVS_IsSinkPortEnabled"),
+        ("QEX_GENERIC_LINUX_ERROR", "Outside the run:"),
+        ("QEX_MGMT_MAX_CALLBACK_PARMS", "4 parameters of a callback"),
+        ("QEX_NOT_FOUND", "0xbad0003 Not found"),
+        ("VSPROP_MTU", "see VSDVS_GetMTU"),
+    ],
+)
+def test_what_a_constant_means(site: Site, name: str, meaning: str) -> None:
+    _, text = place_of(site, "constants", f"_libvswitch.{name}")
+    assert meaning in " ".join(text[:300].split())
+
+
+def test_statuses_have_the_texts_of_the_host(site: Site, catalogue: Catalogue) -> None:
+    (family,) = (
+        one
+        for one in catalogue.headers["qexapi/status.h"].families
+        if one.title == "QEX_ReturnStatus"
+    )
+    names = [name for name in family.names if name not in family.remarks]
+    assert len(names) > 350
+    for name in names:
+        _, text = place_of(site, "constants", f"_libvswitch.{name}")
+        told = re.split(r"\n\s*\n", text)[0].splitlines()[-1]
+        assert told == vs.QEX_ReturnStatusToString(getattr(vs, name)), name
+
+
+def test_what_headers_say_beyond_their_headings(site: Site) -> None:
+    text = " ".join(site["reference/records/tunnels.html"].text.split())
+    assert text.count("The 24-bit fields read low byte first") == 1
+    frames = " ".join(site["reference/records/frames.html"].text.split())
+    assert frames.count("The records lie over the bytes of a frame") == 1
+    protocols = " ".join(site["reference/constants/protocols.html"].text.split())
+    assert "Names that end in _NBO hold the value as it reads from a frame" in protocols
+    mirror = site["reference/constants/mirror.html"].text
+    assert "A table is one block of memory" not in mirror
 
 
 def test_links(site: Site) -> None:
