@@ -1,6 +1,7 @@
 // Scenario documents: what they make of a host, what is refused and how it is told.
 #include "control/scenario.h"
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -236,12 +237,12 @@ TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {
     if (said.is_object() && !said.contains("text")) {
       for (auto const &[key, value] : said.items()) {
         ASSERT_TRUE(shown.contains(key)) << path << "." << key;
-        compare(value, shown[key], path + "." + key);
+        compare(value, shown[key], fmt::format("{}.{}", path, key));
       }
     } else if (said.is_array() && path.find("groups") == std::string::npos) {
       ASSERT_EQ(said.size(), shown.size()) << path;
       for (std::size_t at = 0; at < said.size(); ++at) {
-        compare(said[at], shown[at], path + "[" + std::to_string(at) + "]");
+        compare(said[at], shown[at], fmt::format("{}[{}]", path, at));
       }
     } else if (!said.is_array() && !said.is_object()) {
       EXPECT_EQ(said, shown) << path;
