@@ -22,6 +22,9 @@ void empty_host(store::Transaction &transaction) {
     store::remove_switch(transaction, known.key);
   }
   transaction.query("DELETE FROM uplink").run();
+  // What is numbered begins anew. But keys of switches, which nobody sees, tell a handle from
+  // before.
+  transaction.query("DELETE FROM sqlite_sequence WHERE name <> 'switch'").run();
   forget_host_settings(transaction);
   clear_faults(transaction, "");
   reset_clock(transaction);

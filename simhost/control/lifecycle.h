@@ -12,7 +12,7 @@ namespace simhost::control {
 /// learning. Cabling, the clock and faults are not the host's and stay.
 void restart_host(store::Transaction &transaction);
 
-/// Empties the host: no switches, no uplinks, a real clock, no faults.
+/// Empties the host: no switches, no uplinks, a real clock, no faults, and numbers from 1 on.
 void empty_host(store::Transaction &transaction);
 
 }  // namespace simhost::control

@@ -21,8 +21,8 @@ void *Handles::of_switch(store::SwitchKey key) {
   return switches_.handle_of(key);
 }
 
-void *Handles::of_port(store::PortNumber number) {
-  return ports_.handle_of(number);
+void *Handles::of_port(store::Port const &port) {
+  return ports_.handle_of({port.switch_key, port.number});
 }
 
 Item *Handles::of_property(store::PropertyOwner const &owner, store::NamedProperty content) {
@@ -51,12 +51,12 @@ store::SwitchKey Handles::switch_behind(void const *handle) const {
   return *key;
 }
 
-store::PortNumber Handles::port_behind(void const *handle) const {
-  auto const *const number = ports_.key_behind(handle);
-  if (number == nullptr) {
+PortKey Handles::port_behind(void const *handle) const {
+  auto const *const key = ports_.key_behind(handle);
+  if (key == nullptr) {
     give_up("port handle", handle);
   }
-  return *number;
+  return *key;
 }
 
 Item &Handles::item_behind(void const *item) const {

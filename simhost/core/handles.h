@@ -11,6 +11,7 @@
 #include <string_view>
 #include <tuple>
 #include <unordered_map>
+#include <utility>
 
 #include "core/api.h"
 #include "store/properties.h"
@@ -22,6 +23,10 @@ struct Item {
   store::PropertyOwner owner;
   store::NamedProperty content;
 };
+
+/// A port by which a stale handle is known: no two switches ever have a key in common, but ports of
+/// two switches may have had one number, before a reset of the host and after it.
+using PortKey = std::pair<store::SwitchKey, store::PortNumber>;
 
 /// Handles of one kind, one for each key.
 template <typename Key>
@@ -51,12 +56,12 @@ class HandleTable {
 class Handles {
  public:
   SIMHOST_API void *of_switch(store::SwitchKey key);
-  SIMHOST_API void *of_port(store::PortNumber number);
+  SIMHOST_API void *of_port(store::Port const &port);
   /// The one item of that property, with the content that it has now.
   SIMHOST_API Item *of_property(store::PropertyOwner const &owner, store::NamedProperty content);
 
   [[nodiscard]] SIMHOST_API store::SwitchKey switch_behind(void const *handle) const;
-  [[nodiscard]] SIMHOST_API store::PortNumber port_behind(void const *handle) const;
+  [[nodiscard]] SIMHOST_API PortKey port_behind(void const *handle) const;
   [[nodiscard]] SIMHOST_API Item &item_behind(void const *item) const;
 
   /// The same text at an address that stays.
@@ -67,7 +72,7 @@ class Handles {
       std::tuple<store::SwitchKey, store::PropertyScope, store::PortNumber, std::string>;
 
   HandleTable<store::SwitchKey> switches_;
-  HandleTable<store::PortNumber> ports_;
+  HandleTable<PortKey> ports_;
   std::map<PropertyId, std::unique_ptr<Item>> items_;
   std::unordered_map<void const *, Item *> items_by_address_;
   std::set<std::string, std::less<>> texts_;

@@ -23,6 +23,12 @@ Found known(std::optional<Found> found, std::string_view what, std::string_view 
   return *std::move(found);
 }
 
+constexpr std::string_view kNumbered = "port with the number";
+
+std::string text_of(store::PortNumber number) {
+  return std::to_string(std::int64_t(number));
+}
+
 std::string_view kind_of_name(store::SwitchName kind) {
   switch (kind) {
     case store::SwitchName::alias:
@@ -61,17 +67,12 @@ store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_
 }
 
 store::Port known_port(store::Transaction &transaction, store::PortNumber number) {
-  return known(store::find_port(transaction, number), "port with the number",
-               std::to_string(std::int64_t(number)));
+  return known(store::find_port(transaction, number), kNumbered, text_of(number));
 }
 
 store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_key,
                        store::PortNumber number) {
-  auto port = known_port(transaction, number);
-  if (port.switch_key != switch_key) {
-    throw Refused(QEX_NOT_FOUND);
-  }
-  return port;
+  return known(store::find_port(transaction, switch_key, number), kNumbered, text_of(number));
 }
 
 store::Uplink known_uplink(store::Transaction &transaction, std::string_view name) {
@@ -95,11 +96,9 @@ std::optional<store::Port> find_port(store::Transaction &transaction, store::Swi
 }
 
 bool is_there(store::Transaction &transaction, store::PropertyOwner const &owner) {
-  if (!owner.port_number) {
-    return store::find_switch(transaction, owner.switch_key).has_value();
-  }
-  auto const port = store::find_port(transaction, *owner.port_number);
-  return port && port->switch_key == owner.switch_key;
+  return owner.port_number
+             ? store::find_port(transaction, owner.switch_key, *owner.port_number).has_value()
+             : store::find_switch(transaction, owner.switch_key).has_value();
 }
 
 }  // namespace simhost

@@ -30,8 +30,8 @@ store::FoundSwitch live_switch(Call &call, store::Transaction &transaction, void
 }
 
 store::Port live_port(Call &call, store::Transaction &transaction, void const *handle) {
-  auto const number = call.handles().port_behind(handle);
-  return alive(store::find_port(transaction, number), "port", handle);
+  auto const [switch_key, number] = call.handles().port_behind(handle);
+  return alive(store::find_port(transaction, switch_key, number), "port", handle);
 }
 
 void *handle_of_switch(Call &call, std::string_view alias) {
@@ -42,7 +42,7 @@ void *handle_of_switch(Call &call, std::string_view alias) {
 void *handle_of_port(Call &call, std::string_view switch_identifier, std::string_view identifier) {
   auto const found =
       find_port(call.reading(), store::SwitchName::identifier, switch_identifier, identifier);
-  return found ? call.handles().of_port(found->number) : nullptr;
+  return found ? call.handles().of_port(*found) : nullptr;
 }
 
 void *handle_after(Call &call, store::SwitchKey &last) {
@@ -60,7 +60,7 @@ void *handle_after(Call &call, store::SwitchKey switch_key, store::PortNumber &l
     return nullptr;
   }
   last = next->number;
-  return call.handles().of_port(last);
+  return call.handles().of_port(*next);
 }
 
 }  // namespace simhost

@@ -1,6 +1,8 @@
 // Port and uplink rows in SQL.
 #include "store/ports.h"
 
+#include <utility>
+
 #include "store/store.h"
 
 namespace simhost::store {
@@ -65,6 +67,11 @@ std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
 std::optional<Port> find_port(Transaction &transaction, PortNumber number) {
   auto select = transaction.query(SELECT_PORT " WHERE number = ?");
   return port_from(select.with(std::int64_t(number)));
+}
+
+std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key, PortNumber number) {
+  auto port = find_port(transaction, number);
+  return port && port->switch_key == switch_key ? std::move(port) : std::nullopt;
 }
 
 std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey switch_key,

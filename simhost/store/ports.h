@@ -11,7 +11,8 @@
 
 namespace simhost::store {
 
-/// The numeric id of a port: never 0, unique on the host, never given to a second port.
+/// The numeric id of a port: never 0, unique on the host, never given to a second port before a
+/// reset of the host.
 enum class PortNumber : std::uint32_t {};
 
 enum class PortKind { client, uplink };
@@ -31,6 +32,8 @@ std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
                               std::string_view identifier);
 /// The port that has a number, whichever its switch is.
 std::optional<Port> find_port(Transaction &transaction, PortNumber number);
+/// Likewise, of one switch only.
+std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key, PortNumber number);
 /// The port of a switch that another system knows by `external_id`.
 std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey switch_key,
                                              std::string_view external_id);

@@ -17,7 +17,8 @@ char const *const kSchema = R"sql(
     clients     INTEGER NOT NULL DEFAULT 0
   ) STRICT;
 
-  -- The number is what callers see as a numeric port id: never used twice, and 32 bits wide.
+  -- The number is what callers see as a numeric port id: never used twice, except that a reset of
+  -- the host begins anew, and 32 bits wide.
   CREATE TABLE port (
     number      INTEGER PRIMARY KEY AUTOINCREMENT CHECK (number <= 4294967295),
     switch      INTEGER NOT NULL REFERENCES switch ON DELETE CASCADE,

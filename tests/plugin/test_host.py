@@ -42,6 +42,10 @@ try:
 except Exception as error:
     print(repr(error))
 """
+NUMBER = """
+import _libvswitch as vs
+print(vs.VSDVS_DvPortIDToPortID("vswitch0", "web-1"))
+"""
 CLASSES = (simhost.SimulatedHost, simhost.Host, simhost.SharedHost, simhost.Clock, simhost.Link)
 
 Run = Callable[[str], List[str]]
@@ -125,6 +129,16 @@ def test_a_document_changes_the_host(this: SimulatedHost) -> None:
     assert switches == {"vswitch0": 1500, "lab": 9000}
     this.reset()
     assert [switch["alias"] for switch in this.describe()["switches"]] == ["vswitch0"]
+
+
+@both
+@pytest.mark.parametrize("turn", [1, 2])
+def test_ports_have_the_same_numbers_each_time(this: SimulatedHost, run: Run, turn: int) -> None:
+    behind_two_uplink_ports = ["[0, 3]"]
+    assert run(NUMBER) == behind_two_uplink_ports
+    this.apply({"switches": [{"alias": "lab", "ports": [{"id": "desk"}]}]})
+    this.reset()
+    assert run(NUMBER) == behind_two_uplink_ports
 
 
 @both

@@ -109,6 +109,21 @@ TEST_F(StateLibrary, AHandleOfWhatIsGoneSpringsTheTrap) {
             runtime_error("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
 }
 
+TEST_F(StateLibrary, AHandleFromBeforeAResetIsOfNoPortWithItsNumber) {
+  char const *const id = "5f0c7a1e-27c4-4b61-9d0e-6a5b8f3d2c10";
+  ASSERT_EQ(simhost_reset(), QEX_OK);
+  auto *const port = DVSState_PortFind(id, "web-1");
+  int number = 0;
+  ASSERT_EQ(VSDVS_DvPortIDToPortIDFromDVSID(id, "web-1", &number), QEX_OK);
+  ASSERT_EQ(simhost_reset(), QEX_OK);
+  int again = 0;
+  ASSERT_EQ(VSDVS_DvPortIDToPortIDFromDVSID(id, "web-1", &again), QEX_OK);
+  EXPECT_EQ(again, number);
+  EXPECT_EQ(raised_by([=] { DVS_PortId(port); }),
+            runtime_error("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
+  EXPECT_STREQ(DVS_PortId(DVSState_PortFind(id, "web-1")), "web-1");
+}
+
 // Gathers what a walk reaches; ends it when there are `most` of them.
 struct Gathered {
   std::vector<std::string> names;

@@ -256,11 +256,7 @@ def test_a_reset_makes_the_host_fresh(host: Host) -> None:
     host.apply({"uplinks": [{"name": "extra"}], "switches": [{"alias": "more"}]})
     host.ctl("link", "nic0", "down")
     host.ctl("reset")
-    numbers = ("number",)
-    again = host.ctl("show").splitlines()[2:]
-    assert [line for line in again if not any(word in line for word in numbers)] == [
-        line for line in fresh if not any(word in line for word in numbers)
-    ]
+    assert host.ctl("show").splitlines()[2:] == fresh
 
 
 def test_needs_to_know_which_host(host: Host, tmp_path: Path) -> None:
