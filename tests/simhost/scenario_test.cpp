@@ -210,7 +210,8 @@ TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
   simhost::control::empty_host(work);
   EXPECT_TRUE(simhost::control::described_host(work)["switches"].empty());
   simhost::control::apply(work, first.dump());
-  EXPECT_EQ(simhost::control::described_host(work), first) << "with the numbers of ports and groups";
+  EXPECT_EQ(simhost::control::described_host(work), first)
+      << "with the numbers of ports and groups";
 }
 
 TEST_F(Scenario, NamesThatAreNoUtf8AreDescribedByAReplacement) {
