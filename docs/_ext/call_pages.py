@@ -5,7 +5,8 @@ from typing import Iterable, List, Sequence
 from docutils import nodes
 from sphinx.addnodes import desc_content
 
-from catalogue import CLASSES, FLAT, Call
+from call_entries import Call
+from catalogue import CLASSES, FLAT
 from described import Described, table
 
 

@@ -9,6 +9,7 @@ from typing import Iterator, List, Optional
 
 from comments import Comment, Header
 from definitions import Definitions, Function
+from prototypes import has_parameter
 
 _VIEW = "a view of what stays the library's; nothing frees it"
 _KEPT = "nothing changes hands."
@@ -34,15 +35,16 @@ def of_result(known: Definitions, method: Function) -> str:
     return _KEPT
 
 
-def door(call: str, header: Optional[Header], comment: Comment) -> Optional[str]:
-    """The call that takes back what this one hands out, as its comment or its header's says."""
-    if call.endswith("PropList"):
-        return "DVSData_Free"
+def door(prototype: str, header: Optional[Header], comment: Comment) -> Optional[str]:
+    """The call through which what this one hands out goes back, as its comment or its header's
+    says: in these words."""
     texts = [comment.text, *comment.parameters.values()]
     if header is not None:
+        shared = header.text.parameters.items()
+        texts += [text for name, text in shared if has_parameter(prototype, name)]
         texts.append(header.text.text)
     for text in texts:
-        found = re.search(r"(?:goes back through|gives to) (\w+)", re.sub(r"\s+", " ", text))
+        found = re.search(r"goes back through (\w+)", re.sub(r"\s+", " ", text))
         if found:
             return found[1]
     return None
@@ -54,7 +56,7 @@ def _of_parameters(
     for one in call.parameters:
         type_ = known.resolve(one.type)
         if type_.layers == ("p", "p"):
-            takes_back = door(call.name, header, comment) if call.name != "DVSData_Data" else None
+            takes_back = door(prototype, header, comment)
             said = f"the library's memory, to be given back once with {takes_back}"
             yield f"`{one.name}`: {said if takes_back else _VIEW}."
         elif type_.layers == ("p",) and type_.name in known.records and header is not None:

@@ -7,13 +7,14 @@ import re
 from typing import Collection, Dict, Iterator, List, Tuple
 
 from comments import Comment, Header
+from prototypes import answers_status, has_parameter, texts
 
 _CONCERNED = re.compile(r" \((`\w+`(?:, `\w+`)*)\)$")
 
 
 def of_call(name: str, header: Header) -> Dict[str, str]:
     """The statuses of a call; none if it answers something else."""
-    if not _answers_status(header.prototypes[name]):
+    if not answers_status(header.prototypes[name]):
         return {}
     found = {"QEX_OK": "done", **header.comments[name].statuses}
     for status, text in header.text.statuses.items():
@@ -35,11 +36,6 @@ def concerned(name: str, header: Header) -> Dict[str, List[str]]:
 def refused(headers: Collection[Header], statuses: Collection[str]) -> List[str]:
     """What is not written as it should be, each with where it stands."""
     return [one for header in headers for one in _refused(header, statuses)]
-
-
-def texts(prototype: str) -> List[str]:
-    """The parameters that are texts for the call to read."""
-    return re.findall(r"(?<!unsigned )\bchar const \*?(\w+)(?=[,)\[])", prototype)
 
 
 def _said_of(name: str, text: str, header: Header) -> str:
@@ -75,7 +71,7 @@ def _refused(header: Header, statuses: Collection[str]) -> Iterator[str]:
     for parameter in sorted(listed - set(header.text.parameters)):
         yield f"{where}: nothing says what {parameter} is"
     for parameter in header.text.parameters:
-        if not any(_has(one, parameter) for one in header.prototypes.values()):
+        if not any(has_parameter(one, parameter) for one in header.prototypes.values()):
             yield f"{where}: no call has a parameter {parameter}"
     for name, comment in header.comments.items():
         yield from _refused_of_call(name, comment, header, statuses)
@@ -86,10 +82,10 @@ def _refused_of_call(
 ) -> Iterator[str]:
     prototype = header.prototypes[name]
     yield from _misplaced(name, comment, statuses)
-    if comment.statuses and not _answers_status(prototype):
+    if comment.statuses and not answers_status(prototype):
         yield f"{name}: lists statuses, but answers none"
     for parameter in comment.parameters:
-        if not _has(prototype, parameter):
+        if not has_parameter(prototype, parameter):
             yield f"{name}: has no parameter {parameter}"
     for parameter in texts(prototype):
         if parameter not in {**header.text.parameters, **comment.parameters}:
@@ -105,11 +101,3 @@ def _misplaced(where: str, comment: Comment, statuses: Collection[str]) -> Itera
         for word in re.findall(r"\w+", text):
             if word in statuses and word != "QEX_OK":
                 yield f"{where}: {word} belongs in the list of statuses"
-
-
-def _answers_status(prototype: str) -> bool:
-    return prototype.startswith("QEX_ReturnStatus ")
-
-
-def _has(prototype: str, parameter: str) -> bool:
-    return re.search(rf"\b{parameter}\b(?:\[\w+\])?[,)]", prototype) is not None

@@ -42,7 +42,7 @@ char const *DVS_PortAlias(DVSPortHandle handle);
 /**
  * Makes an empty list of items.
  *
- * @param list receives the list, which the caller gives to DVSData_Free
+ * @param list receives the list, which goes back through DVSData_Free
  * @param alloc how the list allocates; null, like `release`, for the library's own way
  * @param release how it frees
  */

@@ -18,6 +18,7 @@
  * @param externalId the other system's name for the port
  * @param key key of the property
  * @param length bytes
+ * @param list receives a list in the library's own memory, which goes back through DVSData_Free
  * @param propertyType one of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
  *                     POLICY_PROP_TYPE
  * @param propertyTypes a mask of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
@@ -255,12 +256,7 @@ QEX_ReturnStatus DVSQEX_UplinkDataGet(char const *switchId, char const *key, qex
 QEX_ReturnStatus DVSQEX_UplinkDataSet(char const *switchId, char const *key, qex_uint32 portID,
                                       void *data, int length, qex_uint32 propertyType);
 
-/**
- * Puts the global properties that this kind of switch adds into a new list at `list`.
- *
- * Here and in the calls below, the library makes the list in its own memory and the caller gives it
- * to DVSData_Free.
- */
+/** Puts the global properties that this kind of switch adds into `list`. */
 QEX_ReturnStatus DVSQEX_VendorGlobalPropList(char const *switchId, DVSDataHandle *list,
                                              qex_uint32 propertyTypes);
 

@@ -8,13 +8,15 @@ A text of which it is not said to be known need not be.
 from typing import Any, Dict, Iterator, List, Tuple
 
 import libvswitch as vs
+import prototypes
 import provoked_configuration
 import provoked_queries
 import provoked_state
 import pytest
 import statuses
 from asking import ID, KEY, PORT, SWITCH, answered, made, number
-from catalogue import Call, Catalogue
+from call_entries import Call
+from catalogue import Catalogue
 from conftest import BUILD, ROOT
 from simhost import Host
 
@@ -107,7 +109,7 @@ def other_texts() -> Iterator[Tuple[str, str]]:
     known = set(names())
     for call in CALLS:
         if "QEX_NOT_FOUND" not in call.comment.statuses:
-            for name in statuses.texts(call.prototype):
+            for name in prototypes.texts(call.prototype):
                 if (call.name, name) not in known:
                     yield call.name, name
 
