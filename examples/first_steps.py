@@ -1,7 +1,8 @@
 #!/usr/bin/env python3
 """First steps with a virtual switch: create one, configure it, ask the running switch about it.
 
-Runs on any host; without a real one, the simulated host answers. Prints what it does.
+Runs on any host; without a real one, the simulated host answers. Prints what it does. However it
+ends, the switch does not stay behind.
 """
 
 import argparse
@@ -22,11 +23,12 @@ def show(call: str, status: int) -> None:
     print(f"{call:<58} {status_text(status)}")
 
 
-def create_switch() -> None:
+def create_switch() -> int:
     # Alias; identifier and portset name, which the host chooses; ports, persistence, version, MTU;
     # and how many of the host's uplinks to attach.
     status = vs.VSDVS_CreateVSwitch(SWITCH, None, None, 64, 1, 0, 0, 2)
     show(f"VSDVS_CreateVSwitch({SWITCH!r}, ...)", status)
+    return int(status)
 
 
 def set_mtu(mtu: int) -> None:
@@ -60,12 +62,15 @@ def main() -> None:
     argparse.ArgumentParser(
         description="Creates a virtual switch, configures it, asks about it and removes it again."
     ).parse_args()
-    create_switch()
-    set_mtu(9000)
-    read_back()
-    set_mtu(1)
-    list_uplinks()
-    show(f"VSDVS_DestroyVSwitch({SWITCH!r})", vs.VSDVS_DestroyVSwitch(SWITCH))
+    if create_switch() != vs.QEX_OK:
+        sys.exit(1)  # such a switch would be somebody else's
+    try:
+        set_mtu(9000)
+        read_back()
+        set_mtu(1)
+        list_uplinks()
+    finally:
+        show(f"VSDVS_DestroyVSwitch({SWITCH!r})", vs.VSDVS_DestroyVSwitch(SWITCH))
     show(f"VSDVS_DestroyVSwitch({SWITCH!r}) once more", vs.VSDVS_DestroyVSwitch(SWITCH))
 
 

@@ -126,6 +126,23 @@ def test_a_full_disk(writer: Dict[str, str], name: str, words: List[str]) -> Non
     assert done.returncode == NOT_TOLD.get(name, 1)
 
 
+def test_the_first_steps_leave_no_switch(shared_host: SharedHost, writer: Dict[str, str]) -> None:
+    before = shared_host.describe()["switches"]
+    with open("/dev/full", "w", encoding="ascii") as full:
+        command = [sys.executable, str(EXAMPLES / "first_steps.py")]
+        subprocess.run(command, env=writer, stdout=full, stderr=subprocess.DEVNULL)
+    assert shared_host.describe()["switches"] == before
+
+
+def test_the_first_steps_touch_no_other_switch(shared_host: SharedHost) -> None:
+    shared_host.apply({"switches": [{"alias": "demo-switch", "mtu": 4000}]})
+    before = shared_host.describe()["switches"]
+    done = shared_host.run([sys.executable, EXAMPLES / "first_steps.py"])
+    assert (done.returncode, done.stderr) == (1, "")
+    assert done.stdout.split() == ["VSDVS_CreateVSwitch('demo-switch',", "...)", "Exists"]
+    assert shared_host.describe()["switches"] == before
+
+
 def test_a_tour_without_its_guide(shared_host: SharedHost, tmp_path: Path) -> None:
     shared_host.environment["PATH"] = str(tmp_path)
     done = shared_host.run([sys.executable, EXAMPLES / "tour.py"])
