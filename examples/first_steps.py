@@ -26,9 +26,7 @@ def show(call: str, status: int) -> None:
 def create_switch() -> int:
     # Alias; identifier and portset name, which the host chooses; ports, persistence, version, MTU;
     # and how many of the host's uplinks to attach.
-    status = vs.VSDVS_CreateVSwitch(SWITCH, None, None, 64, 1, 0, 0, 2)
-    show(f"VSDVS_CreateVSwitch({SWITCH!r}, ...)", status)
-    return int(status)
+    return int(vs.VSDVS_CreateVSwitch(SWITCH, None, None, 64, 1, 0, 0, 2))
 
 
 def set_mtu(mtu: int) -> None:
@@ -62,9 +60,11 @@ def main() -> None:
     argparse.ArgumentParser(
         description="Creates a virtual switch, configures it, asks about it and removes it again."
     ).parse_args()
-    if create_switch() != vs.QEX_OK:
-        sys.exit(1)  # such a switch would be somebody else's
+    status = create_switch()
+    if status != vs.QEX_OK:  # a switch of that name would be somebody else's
+        sys.exit(f"first_steps: no switch {SWITCH!r} could be made: {status_text(status)}")
     try:
+        show(f"VSDVS_CreateVSwitch({SWITCH!r}, ...)", status)
         set_mtu(9000)
         read_back()
         set_mtu(1)
