@@ -10,6 +10,9 @@ from targets import NOISE, met
 Medians = Mapping[str, Mapping[str, float]]
 """For each figure and peer, what was measured."""
 
+Ratios = Mapping[str, Mapping[str, float]]
+"""For each figure and peer, our value to the peer's, as it is or as it should be."""
+
 SHORT = {"handwritten": "by hand", "fastcall": "floor", "stock": "SWIG", "cython": "Cython"}
 
 
@@ -18,18 +21,19 @@ def table(
     unit: str,
     titles: Mapping[str, str],
     medians: Medians,
-    targets: Mapping[str, Mapping[str, float]],
+    ratios: Ratios,
+    targets: Ratios,
 ) -> Iterator[str]:
     """The lines of a table: for each figure our value, and its ratio to that of each peer."""
-    measured = {peer for row in medians.values() for peer in row}
-    peers = [peer for peer in PEERS if peer != "ours" and peer in measured]
+    measured = {peer for row in ratios.values() for peer in row}
+    peers = [peer for peer in PEERS if peer in measured]
     width = max(len(titles[figure]) for figure in medians)
     yield f"{title:{width}}  {unit:>9}  " + "".join(
         f"{SHORT.get(peer, peer):>13}" for peer in peers
     )
     for figure, row in medians.items():
         cells = "".join(
-            f"{_cell(row['ours'], row.get(peer), targets.get(figure, {}).get(peer)):>13}"
+            f"{_cell(ratios[figure].get(peer), targets.get(figure, {}).get(peer)):>13}"
             for peer in peers
         )
         yield f"{titles[figure]:{width}}  {_number(row['ours']):>9}  {cells}"
@@ -39,10 +43,9 @@ def _number(value: float) -> str:
     return f"{value:.1f}" if value < 1000 else f"{value:,.0f}"
 
 
-def _cell(ours: float, theirs: Optional[float], target: Optional[float]) -> str:
-    if theirs is None:
+def _cell(ratio: Optional[float], target: Optional[float]) -> str:
+    if ratio is None:
         return ""
-    ratio = ours / theirs
     if target is None:
         return f"{ratio:.2f}       "
     return f"{ratio:.2f} {target:.2f} {'+' if met(ratio, target) else 'X'}"

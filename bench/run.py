@@ -7,6 +7,7 @@ results.json and calls.svg to bench/ in the build folder. README.md says what th
 
 import argparse
 import json
+import operator
 import os
 import platform
 import shutil
@@ -85,22 +86,29 @@ def middle_of(rows: Mapping[str, Mapping[str, List[float]]]) -> Dict[str, Dict[s
     }
 
 
-def medians(times: calls.Times) -> Dict[str, Dict[str, Dict[str, float]]]:
-    """The median across processes of each form, figure and peer."""
-    return {form: middle_of(rows) for form, rows in times.items()}
+def ratios_to(rows: Mapping[str, Mapping[str, List[float]]]) -> Dict[str, Dict[str, float]]:
+    """Our value to that of each peer: the median of the ratios of what was measured side by side."""
+    return {
+        figure: {
+            peer: statistics.median(map(operator.truediv, row["ours"], values))
+            for peer, values in row.items()
+            if peer != "ours"
+        }
+        for figure, row in rows.items()
+    }
 
 
 def verdicts(
-    rows: Mapping[str, Mapping[str, float]], goals: Mapping[str, Mapping[str, float]]
+    ratios: Mapping[str, Mapping[str, float]], goals: Mapping[str, Mapping[str, float]]
 ) -> List[Dict[str, Any]]:
     """How each target fares."""
     return [
         {
             "figure": figure,
             "peer": peer,
-            "ratio": rows[figure]["ours"] / rows[figure][peer],
+            "ratio": ratios[figure][peer],
             "target": target,
-            "met": targets.met(rows[figure]["ours"] / rows[figure][peer], target),
+            "met": targets.met(ratios[figure][peer], target),
         }
         for figure, peers in goals.items()
         for peer, target in peers.items()
@@ -140,32 +148,34 @@ def main() -> None:
         sys.exit("bench: these peers answer something else:\n" + "\n".join(mistakes))
     progress = Progress()
     times = calls.measure(build, core, **settings, progress=progress)
-    middle = medians(times)
-    judged = verdicts(middle["functions"], targets.CALLS)
+    middle = {form: middle_of(rows) for form, rows in times.items()}
+    ratios = {form: ratios_to(rows) for form, rows in times.items()}
+    judged = verdicts(ratios["functions"], targets.CALLS)
     whole: modules.Values = {}
     if not arguments.quick:
-        whole = modules.measure(build, processes=21, compilations=3, progress=progress)
-        judged += verdicts(middle_of(whole), targets.MODULES)
+        whole = modules.measure(build, processes=21, compilations=5, progress=progress)
+        judged += verdicts(ratios_to(whole), targets.MODULES)
     progress.clear()
 
     print("\n".join(report.legend()), end="\n\n")
     for form, title in (("functions", "As functions"), ("own", "In the peer's own form")):
         goals = targets.CALLS if form == "functions" else {}
-        print("\n".join(report.table(title, "ns", FIGURES, middle[form], goals)), end="\n\n")
+        lines = report.table(title, "ns", FIGURES, middle[form], ratios[form], goals)
+        print("\n".join(lines), end="\n\n")
     if whole:
         titles, goals = modules.TITLES, targets.MODULES
-        print(
-            "\n".join(report.table("Whole modules", "", titles, middle_of(whole), goals)),
-            end="\n\n",
+        lines = report.table(
+            "Whole modules", "", titles, middle_of(whole), ratios_to(whole), goals
         )
+        print("\n".join(lines), end="\n\n")
     missed = [verdict for verdict in judged if not verdict["met"]]
     print(f"{len(judged) - len(missed)} of {len(judged)} targets met")
 
     results = {
         "machine": machine(),
         "settings": {**settings, "core": core, "quick": arguments.quick},
-        "calls": {"answers": answers, "times": times, "medians": middle},
-        "modules": {"values": whole, "medians": middle_of(whole)},
+        "calls": {"answers": answers, "times": times, "medians": middle, "ratios": ratios},
+        "modules": {"values": whole, "medians": middle_of(whole), "ratios": ratios_to(whole)},
         "targets": judged,
     }
     (build / "bench" / "results.json").write_text(json.dumps(results, indent=1), encoding="utf-8")
