@@ -14,6 +14,7 @@
 %include "frame/records.i"
 %include "frame/arrays.i"
 %include "frame/results.i"
+%include "frame/constants.i"
 
 // The host kernel interface: scalars, names, management, packets, links, ports.
 %include "records/types.i"
