@@ -63,7 +63,7 @@ bool accepts_null_record(char const *method) {
          name == "qex_Name___repr__";
 }
 
-void report_argument_count(PyObject *args, char const *method, int expected) {
+PyObject *report_argument_count(PyObject *args, char const *method, int expected) {
   // "OO...:method"; the longest name has some fifty characters.
   std::array<char, 128> format;
   assert(static_cast<size_t>(expected) + std::strlen(method) + 2 <= format.size());
@@ -73,6 +73,7 @@ void report_argument_count(PyObject *args, char const *method, int expected) {
   // The interpreter counts before it stores, so no targets are needed for a tuple of another size.
   [[maybe_unused]] int const counted = PyArg_ParseTuple(args, format.data());
   assert(counted == 0);
+  return nullptr;
 }
 
 }  // extern "C"

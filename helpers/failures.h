@@ -34,11 +34,11 @@ void report_null_argument(char const *method, int position, char const *type) CO
 void report_null_variable(char const *name, char const *type) COLD;
 
 /**
- * Raises the interpreter's own error for a wrong number of arguments.
+ * Raises the interpreter's own error for a wrong number of arguments; null, as a call answers then.
  *
  * `args` is the argument tuple, `expected` the number of arguments that `method` takes.
  */
-void report_argument_count(PyObject *args, char const *method, int expected) COLD;
+PyObject *report_argument_count(PyObject *args, char const *method, int expected) COLD;
 
 /**
  * Whether `method` accepts a null record: writers then store nothing, destructors have nothing to

@@ -21,9 +21,14 @@
 #define TAKE_8(args, a, b, c, d, e, f, g, h) \
   TAKE_7(args, a, b, c, d, e, f, g), *(h) = PyTuple_GET_ITEM(args, 7)
 
-#define PyArg_UnpackTuple(args, method, least, most, ...)                   \
-  (PyTuple_GET_SIZE(args) == (most) ? (TAKE_##most(args, ##__VA_ARGS__), 1) \
-                                    : (report_argument_count(args, method, most), 0))
+/* A wrapper counts before it does anything else, so on another count it is done: a call in its place
+   needs no frame, nor does the shortest way through it then. */
+#define PyArg_UnpackTuple(args, method, least, most, ...)                                   \
+  ({                                                                                        \
+    if (PyTuple_GET_SIZE(args) != (most)) return report_argument_count(args, method, most); \
+    TAKE_##most(args, ##__VA_ARGS__);                                                       \
+    1;                                                                                      \
+  })
 %}
 
 // A module that cannot be created must leave the interpreter's error standing; the stock start-up
