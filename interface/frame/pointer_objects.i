@@ -131,12 +131,8 @@ static PyObject *show_pointer_by_name(PyObject *self, PyObject *SWIGUNUSEDPARM(n
   return show_pointer(self);
 }
 
-static void drop_pointer(PyObject *self) {
+OUT_OF_LINE void drop_owner_or_chain(PyObject *self) {
   PyObject *link = ((SwigPyObject *)self)->next;
-  if (!link && ((SwigPyObject *)self)->own != SWIG_POINTER_OWN) {
-    PyObject_DEL(self);
-    return;
-  }
   ((SwigPyObject *)self)->next = NULL;
   SwigPyObject_dealloc(self);
   while (link && Py_REFCNT(link) == 1) {
@@ -146,6 +142,15 @@ static void drop_pointer(PyObject *self) {
     link = behind;
   }
   Py_XDECREF(link);
+}
+
+static void drop_pointer(PyObject *self) {
+  SwigPyObject *pointer = (SwigPyObject *)self;
+  if (pointer->next || pointer->own == SWIG_POINTER_OWN) {
+    drop_owner_or_chain(self);
+  } else {
+    keep_or_free_pointer(self);
+  }
 }
 
 /* The object with the variables reports failures by 1, which not every caller takes for one. */

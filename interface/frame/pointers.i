@@ -12,9 +12,9 @@
 #define KEPT_OBJECTS 32
 static struct {
   PyTypeObject *type; /* of the kept objects: the raw pointer objects of this module */
-  int count;
+  PyObject **end;
   PyObject *objects[KEPT_OBJECTS];
-} kept;
+} kept = {NULL, kept.objects, {NULL}};
 
 /* A kept object still has its type; what it lost is its only reference. */
 static inline PyObject *revived(PyObject *object) {
@@ -26,14 +26,23 @@ static inline PyObject *revived(PyObject *object) {
 #endif
 }
 
+static inline bool is_any_kept(void) { return kept.end != kept.objects; }
+
 static inline PyObject *kept_or_new(PyTypeObject *type) {
-  return type == kept.type && kept.count > 0 ? revived(kept.objects[--kept.count])
-                                             : _PyObject_New(type);
+  return type == kept.type && is_any_kept() ? revived(*--kept.end) : _PyObject_New(type);
+}
+
+static inline void keep_or_free_pointer(PyObject *pointer) {
+  if (kept.end != kept.objects + KEPT_OBJECTS) {
+    *kept.end++ = pointer;
+  } else {
+    PyObject_Free(pointer);
+  }
 }
 
 static inline void keep_or_free(PyObject *object) {
-  if (Py_TYPE(object) == kept.type && kept.count < KEPT_OBJECTS) {
-    kept.objects[kept.count++] = object;
+  if (Py_TYPE(object) == kept.type) {
+    keep_or_free_pointer(object);
   } else {
     PyObject_Free(object);
   }
@@ -43,6 +52,8 @@ static inline void keep_or_free(PyObject *object) {
 #define PyObject_NEW(record, type) ((record *)kept_or_new(type))
 #undef PyObject_DEL
 #define PyObject_DEL(object) keep_or_free((PyObject *)(object))
+#else
+#define keep_or_free_pointer PyObject_Free
 #endif
 %}
 
@@ -83,22 +94,33 @@ static void *read_record(PyObject *object, swig_type_info *type, int flags, char
 }
 
 #if FAST_PATHS
-/* A raw pointer object for a type without a class. */
+static inline PyObject *kept_pointer(void *pointer, swig_type_info *type, int own) {
+  SwigPyObject *raw = (SwigPyObject *)revived(*--kept.end);
+  raw->ptr = pointer;
+  raw->ty = type;
+  raw->own = own;
+  raw->next = NULL;
+  return (PyObject *)raw;
+}
+
+/* A pointer object; the short way is that of types without a class. */
 static PyObject *new_pointer(void *pointer, swig_type_info *type, int flags) {
-  if (pointer && (!type->clientdata || (flags & SWIG_POINTER_NOSHADOW))) {
-    SwigPyObject *raw = (SwigPyObject *)kept_or_new(kept.type);
-    if (!raw) return NULL;
-    raw->ptr = pointer;
-    raw->ty = type;
-    raw->own = flags & SWIG_POINTER_OWN;
-    raw->next = NULL;
-    return (PyObject *)raw;
+  if (pointer && is_any_kept() && (!type->clientdata || (flags & SWIG_POINTER_NOSHADOW))) {
+    return kept_pointer(pointer, type, flags & SWIG_POINTER_OWN);
   }
   return SWIG_Python_NewPointerObj(NULL, pointer, type, flags);
 }
 #undef SWIG_NewPointerObj
 #define SWIG_NewPointerObj(pointer, type, flags) new_pointer(pointer, type, flags)
 #endif
+
+/* The raw pointer object of a constructor; it owns the record. */
+static inline PyObject *new_record(void *record, swig_type_info *type) {
+#if FAST_PATHS
+  if (record && is_any_kept()) return kept_pointer(record, type, SWIG_POINTER_OWN);
+#endif
+  return SWIG_NewPointerObj(record, type, SWIG_POINTER_NEW);
+}
 
 /* Zero-filled memory for a record. The allocator keeps small blocks at hand, but not for calloc; the
  * compiler, which would make the two calls that one again, is kept from seeing that they belong

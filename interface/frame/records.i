@@ -30,7 +30,7 @@
 // Constructors answer the raw pointer object, whatever class is registered: the class wraps it.
 %define %raw_result_of_constructor(NAME, TYPE)
 %typemap(out, noblock=1) TYPE *NAME {
-  %set_output(SWIG_NewPointerObj(%as_voidptr($1), $descriptor, SWIG_POINTER_NEW));
+  %set_output(new_record($1, $descriptor));
 }
 %enddef
 
