@@ -87,7 +87,7 @@ def middle_of(rows: Mapping[str, Mapping[str, List[float]]]) -> Dict[str, Dict[s
 
 
 def ratios_to(rows: Mapping[str, Mapping[str, List[float]]]) -> Dict[str, Dict[str, float]]:
-    """Our value to that of each peer: the median of the ratios of what was measured side by side."""
+    """Our value to that of each peer: the median of the ratios of what stood side by side."""
     return {
         figure: {
             peer: statistics.median(map(operator.truediv, row["ours"], values))
