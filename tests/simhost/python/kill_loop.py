@@ -24,8 +24,6 @@ from typing import Any, Counter, Dict, Optional
 CHURN = Path(__file__).with_name("churn.py")
 # A new host now and then: what is compared with is made from the beginning each time.
 ROUNDS_OF_A_HOST = 12
-# What a host is before that is another thing in every run.
-CHANGES_UNTIL_THE_CLOCK_STANDS = 2
 
 
 def churn(state: Optional[Path], *words: str) -> "subprocess.Popen[str]":
@@ -52,18 +50,15 @@ def replayed(seed: str, before: int, after: int) -> Any:
 
 def killed_run(state: Path, seed: str, first: int, chance: random.Random) -> int:
     """Lets changes be made for a while, and kills; the number of the first not known to be made."""
-    process = churn(state, "run", seed, str(first))
-    assert process.stdout
-    done = first
-    while done < max(first + 1, CHANGES_UNTIL_THE_CLOCK_STANDS) and process.stdout.readline():
-        done += 1
-    # By time and not by number, so that the kill comes at any moment of a call.
-    time.sleep(chance.random() * 0.25)
-    process.send_signal(signal.SIGKILL)
-    rest = process.stdout.read()
-    process.wait()
+    with churn(state, "run", seed, str(first)) as process:
+        assert process.stdout
+        told = process.stdout.readline()
+        # By time and not by number, so that the kill comes at any moment of a call.
+        time.sleep(chance.random() * 0.25)
+        process.send_signal(signal.SIGKILL)
+        told += process.stdout.read()
     assert process.returncode == -signal.SIGKILL, "it ended before it was killed"
-    return done + rest.count("\n")
+    return first + told.count("\n")
 
 
 class Hosts:
