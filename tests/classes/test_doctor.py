@@ -352,11 +352,12 @@ def test_the_search_path_is_read_as_the_loader_reads_it(
     environment["LD_LIBRARY_PATH"] = path.format(**folders)
     # Python itself must not take a library in the current folder for the package of that name.
     program = (
-        "import sys; sys.path.remove('')\n"
+        "import pathlib, sys; sys.path.remove('')\n"
         "import json; from libvswitch import doctor\n"
         "found = doctor.Report(); module = doctor._module(found); doctor._host(found, module)\n"
         "import _libvswitch\n"
-        "loaded = {line.split()[-1] for line in open('/proc/self/maps') if '/' in line}\n"
+        "lines = pathlib.Path('/proc/self/maps').read_text().splitlines()\n"
+        "loaded = {line.split()[-1] for line in lines if '/' in line}\n"
         "print(json.dumps([found.host, sorted(loaded)]))"
     )
     done = subprocess.run(
@@ -396,10 +397,10 @@ def test_classes_of_another_build() -> None:
 def test_the_doctor_does_not_load_what_it_examines() -> None:
     """In its own process neither the module nor the host's libraries appear."""
     program = (
-        "import runpy, sys; sys.argv = ['-m']\n"
+        "import pathlib, sys; sys.argv = ['-m']\n"
         "from libvswitch import doctor\n"
         "doctor.examine()\n"
-        "loaded = open('/proc/self/maps').read()\n"
+        "loaded = pathlib.Path('/proc/self/maps').read_text()\n"
         "print('_libvswitch' in sys.modules, 'libvswitch.so' in loaded)"
     )
     done = subprocess.run([sys.executable, "-c", program], capture_output=True, text=True)

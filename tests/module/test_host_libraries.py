@@ -31,8 +31,9 @@ def dynamic_section(library: Path) -> Dict[str, Set[str]]:
 def imported_from(folder: Path, **environment: str) -> "subprocess.CompletedProcess[str]":
     """What a process prints that imports the module in a folder and shows the host it found."""
     program = (
+        "import pathlib\n"
         "import _libvswitch\n"
-        "lines = open('/proc/self/maps').read().split()\n"
+        "lines = pathlib.Path('/proc/self/maps').read_text().split()\n"
         "print(*sorted({word for word in lines if word.endswith(('vswitch.so', 'Public.so'))}))"
     )
     clean = {name: os.environ[name] for name in os.environ if name != "LD_LIBRARY_PATH"}
