@@ -17,8 +17,8 @@
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
 # Without them clang-tidy passes over the tests' own C++, which takes long; ./dev lint does not.
-# The summary names each test that is not for this build, and its last line sums all suites; a skipped
-# test counts as failed, for what was not checked is not known to work.
+# The summary names what is not for this build, and its last line sums all suites; a skipped test
+# counts as failed, for what was not checked is not known to work.
 #
 # The Python tests find the module, and those that exist for the tests alone, through PYTHONPATH,
 # and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
@@ -85,7 +85,9 @@ cmd_test() {
   pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" tests/contract "$@"
   # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are the
   # same whatever the module is built for.
-  if [ "$folder" = build ]; then
+  if [ "$folder" != build ]; then
+    not_for_this_build "lint, no fast paths, docs, fuzzers, bench"
+  else
     test_no_fast_paths "$@"
     pytest "Docs tests" docs.xml '' tests/docs "$@"
     [ -n "$expression" ] || {
@@ -99,6 +101,8 @@ cmd_test() {
 # Some of these are not for every build, which the summary says.
 class_tests() {
   if [ -n "$sanitizers" ]; then
+    # Valgrind and AddressSanitizer cannot both watch over memory.
+    not_for_this_build "valgrind.helpers, valgrind.finds_what_is_planted"
     # The doctor counts what a module lacks, and one canary looks for a lost block in the allocator:
     # both see what the sanitizers bring instead.
     leave_out tests/classes/test_doctor.py::test_a_good_build_is_well
@@ -116,6 +120,10 @@ class_tests() {
 
 leave_out() {
   deselected="$deselected --deselect $1"
+  not_for_this_build "$1"
+}
+
+not_for_this_build() {
   summary="${summary}Not for this build: $1
 "
 }
