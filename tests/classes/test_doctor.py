@@ -9,7 +9,7 @@ from pathlib import Path
 from typing import Any, Dict, List, Tuple
 
 import pytest
-from libvswitch import _elf, doctor
+from libvswitch import _elf, _examination
 
 FOLDER = Path(os.environ["BUILD_DIR"], "python")
 SIMHOST = Path(os.environ["BUILD_DIR"], "simhost")
@@ -298,10 +298,10 @@ def test_a_library_that_may_not_be_read_is_passed_over(
 
     monkeypatch.setattr(_elf, "machine_of", refuse)
     monkeypatch.setenv("LD_LIBRARY_PATH", str(tmp_path))
-    found = doctor.Report()
-    module = doctor._module(found)
+    found = _examination.Report()
+    module = _examination._module(found)
     assert module is not None
-    library = doctor._library(found, "libvswitch.so", module)
+    library = _examination._library(found, "libvswitch.so", module)
     assert library is not None and os.path.samefile(library.path, SIMHOST / "libvswitch.so")
     (note,) = [one.text for one in found.findings if one.level == "note"]
     assert note == f"libvswitch.so: {locked} may not be read: the loader passes over it"
@@ -353,7 +353,7 @@ def test_the_search_path_is_read_as_the_loader_reads_it(
     # Python itself must not take a library in the current folder for the package of that name.
     program = (
         "import pathlib, sys; sys.path.remove('')\n"
-        "import json; from libvswitch import doctor\n"
+        "import json; from libvswitch import _examination as doctor\n"
         "found = doctor.Report(); module = doctor._module(found); doctor._host(found, module)\n"
         "import _libvswitch\n"
         "lines = pathlib.Path('/proc/self/maps').read_text().splitlines()\n"
@@ -387,8 +387,8 @@ def test_a_host_that_crashes_as_it_loads(tmp_path: Path, elsewhere: Path) -> Non
 
 
 def test_classes_of_another_build() -> None:
-    found = doctor.Report()
-    doctor._sizes(found, {"VSInfo": [232, 232], "VSStats": [120, 136]})
+    found = _examination.Report()
+    _examination._sizes(found, {"VSInfo": [232, 232], "VSStats": [120, 136]})
     (finding,) = found.findings
     assert (finding.level, finding.about) == ("error", "records")
     assert "VSStats" in finding.text and "VSInfo" not in finding.text

@@ -16,6 +16,8 @@ EXAMPLES = {
     ("tour.py",): "The host restarts",
     ("inventory.py",): "nic4 up, nic5 up",
     ("change_vlan.py", "vswitch0", "web-1", "100"): "VLAN 0 -> VLAN 100",
+    ("mirror_session.py", "vswitch0", "web-1", "web-2", "--for", "0"): "mirror_session is removed",
+    ("watch_links.py", "vswitch0", "--for", "0"): "nic4 up, nic5 up",
 }
 
 CALL = "import _libvswitch as vs; print(vs.VSDVS_SetMTU('no such switch', 9000))"
@@ -91,6 +93,8 @@ class Machine:
         assert "the host is simulated" in said
 
     def runs_the_examples(self, folder: str) -> None:
+        installed = self.root.run("ls", folder).split()
+        assert {name for name, *_ in EXAMPLES} == {one for one in installed if one.endswith(".py")}
         path = f"{Path(self.simhostctl).parent}:/usr/bin:/bin"
         for (name, *arguments), expected in EXAMPLES.items():
             said = self.root.run(self.python, f"{folder}/{name}", *arguments, PATH=path)
