@@ -58,13 +58,16 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char cons
     auto &output = required(stats);
     auto &work = call.reading();
     auto const key = simhost::running_switch(work, alias).key;
-    auto const sessions = simhost::mirrors_of(work, key);
-    auto const found = std::find_if(sessions.begin(), sessions.end(),
-                                    [&](auto const &session) { return session.sid() == wanted; });
-    if (found == sessions.end()) {
+    auto sessions = simhost::mirrors_of(work, key);
+    std::erase_if(sessions, [&](auto const &session) { return session.sid() != wanted; });
+    if (sessions.empty()) {
       simhost::refuse(QEX_NOT_FOUND);
     }
-    if (!found->runs() || simhost::runtime_number(work, VS_RT_OPT_ALLOW_MIRROR_STATS) == 0) {
+    // Two ports may have a session of that name, one of them a disabled one.
+    auto const found = std::find_if(sessions.begin(), sessions.end(),
+                                    [](auto const &session) { return session.runs(); });
+    if (found == sessions.end() ||
+        simhost::runtime_number(work, VS_RT_OPT_ALLOW_MIRROR_STATS) == 0) {
       simhost::refuse(QEX_IS_DISABLED);
     }
     auto counters = data_plane().counters(work, {.switch_key = key, .session = wanted});

@@ -234,6 +234,10 @@ TEST_F(Queries, MirrorSessionsAsTheyRun) {
   EXPECT_EQ(qex_uint64{stats.discardedPkts}, 0U);
   EXPECT_STREQ(stats.name, "the audit");
   EXPECT_EQ(VSQEX_GetDVMirrorSessionStats("s", "off", &stats), QEX_IS_DISABLED);
+  apply(R"({"switches": [{"alias": "s", "ports": [
+     {"id": "p2", "mirror_sessions": [{"sid": "off", "name": "on at this port"}]}]}]})");
+  EXPECT_EQ(VSQEX_GetDVMirrorSessionStats("s", "off", &stats), QEX_OK);
+  EXPECT_STREQ(stats.name, "on at this port");
   EXPECT_EQ(VSQEX_GetDVMirrorSessionStats("s", "none", &stats), QEX_NOT_FOUND);
   apply(R"({"runtime_options": {"AllowMirrorStats": 0}})");
   EXPECT_EQ(VSQEX_GetDVMirrorSessionStats("s", "audit", &stats), QEX_IS_DISABLED);
