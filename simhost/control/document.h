@@ -61,7 +61,6 @@ class Node {
   /// The value must be an array.
   [[nodiscard]] std::vector<Node> items() const;
 
-  [[nodiscard]] bool is_text() const { return value_->is_string(); }
   [[nodiscard]] bool flag() const;
   static bool flag_of(Node const &node) { return node.flag(); }
   [[nodiscard]] std::string text() const;

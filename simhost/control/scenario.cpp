@@ -67,11 +67,11 @@ void apply_runtime_option(Transaction &work, std::string const &name, Node const
     node.fail("unknown option");
   }
   auto const type = static_cast<unsigned>(found - options.begin());
-  if (node.is_text()) {
-    set_runtime_option(work, type, node.text());
-  } else {
+  if (found->is_number()) {
     auto const number = node.integer(found->least, found->greatest);
     set_runtime_option(work, type, static_cast<std::int32_t>(number));
+  } else {
+    set_runtime_option(work, type, node.text());
   }
 }
 

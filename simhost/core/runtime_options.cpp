@@ -38,10 +38,6 @@ RuntimeOption const &known_option(unsigned type) {
   return kOptions[type];
 }
 
-bool is_number(RuntimeOption const &option) {
-  return std::holds_alternative<std::int32_t>(option.initial);
-}
-
 void check_number(RuntimeOption const &option, std::int32_t number) {
   if (number < option.least || number > option.greatest) {
     throw Refused(QEX_BAD_PARAM);
@@ -71,7 +67,7 @@ std::span<std::byte const> take(std::span<std::byte const> &rest, std::size_t si
 }
 
 RuntimeValue value_in(unsigned type, std::span<std::byte const> data) {
-  if (is_number(known_option(type))) {
+  if (known_option(type).is_number()) {
     std::int32_t number = 0;
     if (data.size() != sizeof number) {
       refuse_list();
@@ -112,7 +108,7 @@ std::span<RuntimeOption const, VS_NUM_RT_OPT> runtime_options() {
 
 RuntimeValue runtime_option(store::Transaction &transaction, unsigned type) {
   auto const &option = known_option(type);
-  if (is_number(option)) {
+  if (option.is_number()) {
     return static_cast<std::int32_t>(
         host_number(transaction, option.name).value_or(std::get<std::int32_t>(option.initial)));
   }

@@ -27,6 +27,8 @@ struct RuntimeOption {
   std::variant<std::int32_t, std::string_view> initial;
   std::int32_t least = 0;     ///< of a number
   std::int32_t greatest = 0;  ///< of a number
+
+  [[nodiscard]] bool is_number() const { return std::holds_alternative<std::int32_t>(initial); }
 };
 
 /// All options, by their types.

@@ -76,6 +76,10 @@ TEST_F(Scenario, ErrorsHaveThePathOfTheKey) {
   EXPECT_EQ(refusal(R"({"clock": {"now": "noon"}})"), "clock.now: must be a number of seconds");
   EXPECT_EQ(refusal(R"({"runtime_options": {"IGMPVersion": 4}})"),
             "runtime_options.IGMPVersion: 4 is above 3");
+  EXPECT_EQ(refusal(R"({"runtime_options": {"IGMPVersion": "3"}})"),
+            "runtime_options.IGMPVersion: must be a whole number");
+  EXPECT_EQ(refusal(R"({"runtime_options": {"IGMPRouterIP": 5}})"),
+            "runtime_options.IGMPRouterIP: must be a text");
   EXPECT_EQ(refusal(R"({"runtime_options": {"Speed": 4}})"),
             "runtime_options.Speed: unknown option");
   EXPECT_EQ(refusal(R"({"faults": [{"call": "VSDVS_SetMTU", "status": "QEX_ODD"}]})"),
