@@ -94,7 +94,7 @@ int simhost_panic_call(char const *function, uint32_t nth, uint32_t times, char 
 /** The calls wait so many milliseconds of real time, then do what they do. */
 int simhost_delay_call(char const *function, uint32_t nth, uint32_t times, uint32_t milliseconds);
 
-/** Removes the faults of a function, or all for null. */
+/** Removes the faults of a function, or all for null; QEX_NOT_FOUND for no function of the host. */
 int simhost_clear_faults(char const *function);
 
 /* The ledger: memory and lists that the host gave out in this process. With SIMHOST_LEDGER=1 in the

@@ -148,6 +148,9 @@ std::vector<WaitingFault> waiting_faults(store::Transaction &transaction) {
 }
 
 void clear_faults(store::Transaction &transaction, std::string_view function) {
+  if (!function.empty()) {
+    known_call(function);
+  }
   transaction.query("DELETE FROM fault WHERE ? IN ('', function)").with(function).run();
 }
 

@@ -42,7 +42,8 @@ struct WaitingFault {
 /// effect at all, calls that are none, and a negative delay (QEX_BAD_PARAM).
 void add_fault(store::Transaction &transaction, Fault const &fault);
 std::vector<WaitingFault> waiting_faults(store::Transaction &transaction);
-/// Removes the faults of a function, or all if it is empty.
+/// Removes the faults of a function, or all if it is empty. Refuses a function that no fault can
+/// hit, as add_fault does.
 void clear_faults(store::Transaction &transaction, std::string_view function);
 
 /// Counts a call of a function and does to it what the faults say: sleeps, throws Refused or

@@ -58,6 +58,8 @@ TEST_F(Faults, Delay) {
 TEST_F(Faults, AreChecked) {
   EXPECT_EQ(simhost_fail_call("VSDVS_Nothing", 1, 1, QEX_BUSY), QEX_NOT_FOUND);
   EXPECT_STREQ(simhost_error(), "there is no call 'VSDVS_Nothing' (QEX_NOT_FOUND)");
+  EXPECT_EQ(simhost_clear_faults("VSDVS_Nothing"), QEX_NOT_FOUND);
+  EXPECT_STREQ(simhost_error(), "there is no call 'VSDVS_Nothing' (QEX_NOT_FOUND)");
   EXPECT_EQ(simhost_fail_call("Panic", 1, 1, QEX_BUSY), QEX_NOT_SUPPORTED);
   EXPECT_EQ(simhost_panic_call("Panic", 1, 1, "OSError", ""), QEX_NOT_SUPPORTED);
   EXPECT_EQ(simhost_delay_call("Panic", 1, 1, 1), QEX_NOT_SUPPORTED);
