@@ -53,6 +53,17 @@ def test_rules_hold_for_the_nth_call_or_for_every_other(host: RecordingHost) -> 
     assert host.calls() == [("VSDVS_SetMTU", (b"a", 5))]
 
 
+def test_calls_without_notes_are_answered_and_counted(host: RecordingHost) -> None:
+    host.answer("VSDVS_SetMTU", 20, nth=2)
+    host.take_no_notes()
+    assert [vs.VSDVS_SetMTU("a", 1), vs.VSDVS_SetMTU("a", 2)] == [0, 20]
+    assert host.calls() == []
+
+    host.reset()
+    vs.VSDVS_SetMTU("a", 3)
+    assert len(host.calls()) == 1
+
+
 def test_captured_memory_is_what_the_call_found(host: RecordingHost) -> None:
     data = ctypes.create_string_buffer(b"before\0behind", 16)
     host.capture("VSDVS_FreeMemory", 1, 16)

@@ -1,6 +1,7 @@
 """Lets the host give up on one call after another, and reports what goes wrong or grows.
 
-    panics.py PANICS
+    panics.py in-turns PANICS   all calls take turns, and each is made again when it was given up
+    panics.py in-a-row PANICS   of each call so many, one right after the other
 
 Prints a line for each thing that is wrong, and at the end how many times the host gave up.
 """
@@ -113,7 +114,55 @@ def all_of_them() -> Iterator[Tuple[Target, Panic, bool]]:
     return itertools.product(list(targets()), PANICS, (False, True))
 
 
-def main(count: int) -> None:
+def in_a_row(host: RecordingHost, target: Target, chosen: Panic, count: int) -> Iterator[str]:
+    """Give up so many times, before and after the outputs; what is wrong."""
+    call, leaks = target.call, os.environ.get("PLANTED")
+    for after_outputs in (False, True):
+        host.reset()
+        host.take_no_notes()
+        host.answer(call.name, outputs=dict(target.outputs))
+        host.spring(call.name, chosen.type, chosen.text, after_outputs=after_outputs)
+        for _ in range(count):
+            try:
+                call(*target.given)
+            except chosen.raised:
+                pass
+            except BaseException as error:
+                yield f"{call}: {chosen.type.__name__} raised {error!r}"
+            else:
+                yield f"{call}: {chosen.type.__name__} was not raised"
+            if leaks:
+                faulty.leak_memory()
+
+
+def each_in_a_row(count: int) -> None:
+    """Give up so many times on each call; the last nine tenths must not need more memory."""
+    host = RecordingHost()
+    each = max(10, count // len(PANICS) // 2)
+    done = 0
+    for target in targets():
+        sizes = []
+        for share in (each - each * 9 // 10, each * 9 // 10):
+            for chosen in PANICS:
+                for wrong in in_a_row(host, target, chosen, share):
+                    say(wrong)
+                done += 2 * share
+            host.reset()
+            gc.collect()
+            sizes.append((heap(), sys.getallocatedblocks()))
+        say_what_grows(sizes, f"{target.call}: ")
+    say(str(done))
+
+
+def say_what_grows(sizes: List[Tuple[int, int]], where: str = "") -> None:
+    """Look at the heap and at the objects that there were, from one time to the next."""
+    for index, (what, noise) in enumerate([("bytes of the heap", 8192), ("objects", 300)]):
+        grown = [after[index] - before[index] for before, after in zip(sizes, sizes[1:])]
+        if min(grown) > noise:
+            say(f"{where}grows: {grown} {what}")
+
+
+def all_in_turns(count: int) -> None:
     """Give up so many times, in three parts that must end with the same memory."""
     host = RecordingHost()
     found = list(all_of_them())
@@ -131,12 +180,9 @@ def main(count: int) -> None:
         host.reset()
         gc.collect()
         sizes.append((heap(), sys.getallocatedblocks()))
-    for index, (what, noise) in enumerate([("bytes of the heap", 8192), ("objects", 300)]):
-        grown = [after[index] - before[index] for before, after in zip(sizes, sizes[1:])]
-        if min(grown) > noise:
-            say(f"grows: {grown} {what}")
+    say_what_grows(sizes)
     say(str(3 * rounds * len(found)))
 
 
 if __name__ == "__main__":
-    main(int(sys.argv[1]))
+    {"in-turns": all_in_turns, "in-a-row": each_in_a_row}[sys.argv[1]](int(sys.argv[2]))

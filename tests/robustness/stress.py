@@ -4,8 +4,8 @@
     stress.py [--minutes N] [--seed N]
 
 First what has an end: every batch of the sweep, then a million calls of every kind and giving up a
-million times in the same memory, fewer if there are less than twenty minutes. What has none shares
-the time that is left: fuzzers, sequences, killed processes and random pairs of values.
+million times on each call, fewer in less than twenty minutes. What has none shares the time
+that is left: fuzzers, sequences, killed processes and random pairs of values.
 """
 
 import argparse
@@ -111,7 +111,8 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
     for kind in test_repeat.KINDS:
         repeat = whole(program, "repeat.py", "memory", kind, calls)
         yield Part(f"memory, {kind}", "calls", repeat)
-    yield Part("giving up", "calls", whole(program, "panics.py", calls))
+    yield Part("giving up, in turns", "calls", whole(program, "panics.py", "in-turns", calls))
+    yield Part("giving up, in a row", "calls", whole(program, "panics.py", "in-a-row", calls))
     for name in fuzzing.NAMES:
         share = SHARES["fuzzing"] / len(fuzzing.NAMES)
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)

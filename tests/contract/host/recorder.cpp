@@ -50,7 +50,8 @@ struct Function {
 struct State {
   std::map<std::string_view, Function> functions;
   std::string calls; /**< the items of a JSON list */
-  Trap sprung{};     /**< owns the message that exceptionMsg refers to */
+  bool takes_notes = true;
+  Trap sprung{}; /**< owns the message that exceptionMsg refers to */
 };
 
 // Not destroyed: the libraries may be called until the very end of the process.
@@ -164,8 +165,10 @@ void declare(std::string_view function, std::string_view result,
 
 Answer record(std::string_view name, std::span<Argument const> arguments) noexcept {
   Function &function = state().functions.at(name);
-  std::string &calls = state().calls;
-  calls += (calls.empty() ? "" : ",") + described(name, function, arguments);
+  if (state().takes_notes) {
+    std::string &calls = state().calls;
+    calls += (calls.empty() ? "" : ",") + described(name, function, arguments);
+  }
 
   Rule const rule = rule_for(function, ++function.calls);
   std::this_thread::sleep_for(rule.delay);
@@ -198,6 +201,7 @@ using recording::with_rule;
 
 void recorder_reset() {
   state().calls.clear();
+  state().takes_notes = true;
   for (auto &[name, function] : state().functions) {
     function.calls = 0;
     function.rules.clear();
@@ -224,6 +228,10 @@ char const *recorder_calls() {
   static std::string text;
   text = "[" + state().calls + "]";
   return text.c_str();
+}
+
+void recorder_take_no_notes() {
+  state().takes_notes = false;
 }
 
 int recorder_answer(char const *function, unsigned nth, std::uint64_t bits) {

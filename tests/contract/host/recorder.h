@@ -65,6 +65,9 @@ char const *recorder_functions(void);
 /** The calls since the last reset, in order, as a JSON list. */
 char const *recorder_calls(void);
 
+/** Notes no more calls until the next reset; they are counted and answered as before. */
+void recorder_take_no_notes(void);
+
 /** Sets the result: a sign-extended integer or an address. Without a rule it is 0 or null. */
 int recorder_answer(char const *function, unsigned nth, std::uint64_t bits);
 
