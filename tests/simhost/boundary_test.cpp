@@ -4,13 +4,13 @@
 #include <unistd.h>
 
 #include <array>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <string>
 #include <thread>
 #include <vector>
 
+#include "address_text.h"
 #include "control/simhost.h"
 #include "nebpublic/data.h"
 #include "nebpublic/kernel_state.h"
@@ -25,12 +25,6 @@ namespace {
 
 QEX_ReturnStatus create(char const *alias, qex_uint32 uplinks = 0) {
   return VSDVS_CreateVSwitch(alias, nullptr, nullptr, 0, 1, 0, 0, uplinks);
-}
-
-std::string text_of(void const *address) {
-  std::array<char, 32> text{};
-  std::snprintf(text.data(), text.size(), "%p", address);
-  return text.data();
 }
 
 // A switch "s" with two uplinks, in memory.
@@ -170,10 +164,9 @@ TEST_F(Boundary, MemoryGivenBackTwiceSpringsTheTrap) {
   auto *const list = uplinks();
   VSQEX_FreeMemory(list);
   EXPECT_EQ(raised_by([=] { VSQEX_FreeMemory(list); }),
-            (Raised{.type = "RuntimeError",
-                    .message = "VSQEX_FreeMemory: the memory at " + text_of(list) +
-                               " is given back twice: VSQEX_GetUplinks gave it out, "
-                               "VSQEX_FreeMemory took it back"}));
+            gave_up_with("VSQEX_FreeMemory: the memory at " + text_of(list) +
+                         " is given back twice: VSQEX_GetUplinks gave it out, "
+                         "VSQEX_FreeMemory took it back"));
   EXPECT_EQ(exception_status, 1);
 }
 
@@ -181,10 +174,9 @@ TEST_F(Boundary, TheOtherDoorKnowsItToo) {
   auto *const list = uplinks();
   VSQEX_FreeMemory(list);
   EXPECT_EQ(raised_by([=] { VSDVS_FreeMemory(list); }),
-            (Raised{.type = "RuntimeError",
-                    .message = "VSDVS_FreeMemory: the memory at " + text_of(list) +
-                               " is given back twice: VSQEX_GetUplinks gave it out, "
-                               "VSQEX_FreeMemory took it back"}));
+            gave_up_with("VSDVS_FreeMemory: the memory at " + text_of(list) +
+                         " is given back twice: VSQEX_GetUplinks gave it out, "
+                         "VSQEX_FreeMemory took it back"));
 }
 
 TEST_F(Boundary, TheThirdDoorTakesMemoryBackToo) {
@@ -192,18 +184,16 @@ TEST_F(Boundary, TheThirdDoorTakesMemoryBackToo) {
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }), std::nullopt);
   EXPECT_EQ(simhost_ledger_count(), 0U);
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }),
-            (Raised{.type = "RuntimeError",
-                    .message = "DVSQEX_DataFree: the memory at " + text_of(list) +
-                               " is given back twice: VSQEX_GetUplinks gave it out, "
-                               "DVSQEX_DataFree took it back"}));
+            gave_up_with("DVSQEX_DataFree: the memory at " + text_of(list) +
+                         " is given back twice: VSQEX_GetUplinks gave it out, "
+                         "DVSQEX_DataFree took it back"));
 }
 
 TEST_F(Boundary, MemoryOfTheCallerSpringsTheTrap) {
   VSInfo info{};
-  EXPECT_EQ(raised_by([&] { VSQEX_FreeMemory(&info); }),
-            (Raised{.type = "RuntimeError",
-                    .message = "VSQEX_FreeMemory: the host never gave out the memory at " +
-                               text_of(&info)}));
+  EXPECT_EQ(
+      raised_by([&] { VSQEX_FreeMemory(&info); }),
+      gave_up_with("VSQEX_FreeMemory: the host never gave out the memory at " + text_of(&info)));
 }
 
 TEST_F(Boundary, AfterTheTrapTheHostGoesOn) {

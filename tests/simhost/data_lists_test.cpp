@@ -5,11 +5,11 @@
 #include <gmock/gmock.h>
 
 #include <array>
-#include <cstdio>
 #include <cstdlib>
 #include <string>
 #include <vector>
 
+#include "address_text.h"
 #include "configured_switch.h"
 #include "qexapi/switch_properties.h"
 #include "trap_globals.h"
@@ -18,16 +18,6 @@
 namespace {
 
 using DataLists = ConfiguredSwitch;
-
-std::string text_of(void const *address) {
-  std::array<char, 32> text{};
-  std::snprintf(text.data(), text.size(), "%p", address);
-  return text.data();
-}
-
-Raised runtime_error(std::string const &message) {
-  return {.type = "RuntimeError", .message = message};
-}
 
 // An allocator that counts what is out and can run dry.
 int blocks_out = 0;
@@ -65,7 +55,7 @@ TEST_F(DataLists, UseTheCallersAllocator) {
   EXPECT_EQ(raised_by([=] { DVSData_Free(list); }), std::nullopt);
   EXPECT_EQ(blocks_out, 0);
   EXPECT_EQ(raised_by([=] { DVSData_Free(list); }),
-            runtime_error("DVSData_Free: the list " + text_of(list) + " is freed already"));
+            gave_up_with("DVSData_Free: the list " + text_of(list) + " is freed already"));
 }
 
 TEST_F(DataLists, AnAllocatorMayRunDry) {
@@ -228,14 +218,14 @@ TEST_F(DataLists, GoBackThroughTheirOwnDoorOnly) {
   DVSDataHandle list = nullptr;
   ASSERT_EQ(DVSData_Alloc(&list, nullptr, nullptr), QEX_OK);
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }),
-            runtime_error("DVSQEX_DataFree: DVSData_Alloc gave out what is at " + text_of(list) +
-                          ", and DVSData_Free takes it back"));
+            gave_up_with("DVSQEX_DataFree: DVSData_Alloc gave out what is at " + text_of(list) +
+                         ", and DVSData_Free takes it back"));
   EXPECT_EQ(simhost_ledger_count(), 1U);
   void *bytes = nullptr;
   qex_uint32 length = 0;
   ASSERT_EQ(DVSData_Serialize(list, &bytes, &length, 200), QEX_OK);
   EXPECT_EQ(raised_by([=] { DVSData_Free(bytes); }),
-            runtime_error("DVSData_Free: the host never gave out the list " + text_of(bytes)));
+            gave_up_with("DVSData_Free: the host never gave out the list " + text_of(bytes)));
   DVSQEX_DataFree(bytes);
   DVSData_Free(list);
 }

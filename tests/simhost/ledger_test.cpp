@@ -5,12 +5,11 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <array>
-#include <cstdio>
 #include <set>
 #include <string>
 #include <vector>
 
+#include "address_text.h"
 #include "core/giving_up.h"
 
 namespace {
@@ -18,12 +17,6 @@ namespace {
 using simhost::HostPanic;
 using simhost::Ledger;
 using simhost::PanicKind;
-
-std::string text_of(void const *address) {
-  std::array<char, 32> text{};
-  std::snprintf(text.data(), text.size(), "%p", address);
-  return text.data();
-}
 
 std::string panic_of(Ledger &ledger, void *memory) {
   try {

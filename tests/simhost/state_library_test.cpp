@@ -4,12 +4,12 @@
 #include <gmock/gmock.h>
 
 #include <array>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <string>
 #include <vector>
 
+#include "address_text.h"
 #include "configured_switch.h"
 #include "nebpublic/data.h"
 #include "nebpublic/names.h"
@@ -20,16 +20,6 @@
 namespace {
 
 using StateLibrary = ConfiguredSwitch;
-
-std::string text_of(void const *address) {
-  std::array<char, 32> text{};
-  std::snprintf(text.data(), text.size(), "%p", address);
-  return text.data();
-}
-
-Raised runtime_error(std::string const &message) {
-  return {.type = "RuntimeError", .message = message};
-}
 
 TEST_F(StateLibrary, AHandleOfASwitchReadsIt) {
   auto *const handle = DVSState_SwitchFindByAlias("s");
@@ -82,19 +72,18 @@ TEST_F(StateLibrary, AHandleOfNothingSpringsTheTrap) {
   static int mine = 0;
   auto const address = text_of(&mine);
   EXPECT_EQ(raised_by([] { DVS_SwitchId(&mine); }),
-            runtime_error("DVS_SwitchId: the host never gave out the switch handle " + address));
+            gave_up_with("DVS_SwitchId: the host never gave out the switch handle " + address));
   EXPECT_EQ(raised_by([] { DVS_PortAlias(&mine); }),
-            runtime_error("DVS_PortAlias: the host never gave out the port handle " + address));
+            gave_up_with("DVS_PortAlias: the host never gave out the port handle " + address));
   EXPECT_EQ(raised_by([] { DVSData_Name(&mine); }),
-            runtime_error("DVSData_Name: the host never gave out the item " + address));
+            gave_up_with("DVSData_Name: the host never gave out the item " + address));
   EXPECT_EQ(raised_by([] { DVSData_Free(&mine); }),
-            runtime_error("DVSData_Free: the host never gave out the list " + address));
+            gave_up_with("DVSData_Free: the host never gave out the list " + address));
   EXPECT_EQ(raised_by([] { DVSData_Update(&mine, "n", nullptr, 0, CONFIG_PROP_TYPE); }),
-            runtime_error("DVSData_Update: the host never gave out the list " + address));
+            gave_up_with("DVSData_Update: the host never gave out the list " + address));
   auto *const port = DVSState_PortFind("s-id", "p");
-  EXPECT_EQ(
-      raised_by([=] { DVS_Version(port); }),
-      runtime_error("DVS_Version: the host never gave out the switch handle " + text_of(port)))
+  EXPECT_EQ(raised_by([=] { DVS_Version(port); }),
+            gave_up_with("DVS_Version: the host never gave out the switch handle " + text_of(port)))
       << "a port is no switch";
 }
 
@@ -102,11 +91,11 @@ TEST_F(StateLibrary, AHandleOfWhatIsGoneSpringsTheTrap) {
   auto *const handle = DVSState_SwitchFindByAlias("s");
   auto *const port = DVSState_PortFind("s-id", "p");
   ASSERT_EQ(DVSQEX_StateCleanup(), QEX_OK);
-  EXPECT_EQ(raised_by([=] { DVS_SwitchName(handle); }),
-            runtime_error("DVS_SwitchName: the switch behind the handle " + text_of(handle) +
-                          " is gone"));
+  EXPECT_EQ(
+      raised_by([=] { DVS_SwitchName(handle); }),
+      gave_up_with("DVS_SwitchName: the switch behind the handle " + text_of(handle) + " is gone"));
   EXPECT_EQ(raised_by([=] { DVS_PortId(port); }),
-            runtime_error("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
+            gave_up_with("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
 }
 
 TEST_F(StateLibrary, AHandleFromBeforeAResetIsOfNoPortWithItsNumber) {
@@ -120,7 +109,7 @@ TEST_F(StateLibrary, AHandleFromBeforeAResetIsOfNoPortWithItsNumber) {
   ASSERT_EQ(VSDVS_DvPortIDToPortIDFromDVSID(id, "web-1", &again), QEX_OK);
   EXPECT_EQ(again, number);
   EXPECT_EQ(raised_by([=] { DVS_PortId(port); }),
-            runtime_error("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
+            gave_up_with("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
   EXPECT_STREQ(DVS_PortId(DVSState_PortFind(id, "web-1")), "web-1");
 }
 

@@ -22,6 +22,11 @@ struct Raised {
   }
 };
 
+/// What the host raises when it gives up on what it was handed.
+inline Raised gave_up_with(std::string const &message) {
+  return {.type = "RuntimeError", .message = message};
+}
+
 /// What the trap raises while `call` runs; nothing if it does not spring.
 template <typename Call>
 std::optional<Raised> raised_by(Call const &call) {
