@@ -75,6 +75,14 @@ store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_
   return known(store::find_port(transaction, switch_key, number), kNumbered, text_of(number));
 }
 
+store::Port running_port(store::Transaction &transaction, store::PortNumber number) {
+  auto port = store::find_port(transaction, number);
+  if (port && !store::find_switch(transaction, port->switch_key).value().row.associated) {
+    port.reset();
+  }
+  return known(std::move(port), kNumbered, text_of(number));
+}
+
 store::Uplink known_uplink(store::Transaction &transaction, std::string_view name) {
   return known(store::find_uplink(transaction, name), "uplink", name);
 }

@@ -26,6 +26,8 @@ SIMHOST_API store::Port known_port(store::Transaction &transaction, store::PortN
 /// Likewise, of one switch only.
 SIMHOST_API store::Port known_port(store::Transaction &transaction, store::SwitchKey switch_key,
                                    store::PortNumber number);
+/// Likewise, of any switch that runs on this host; the others' ports have no number.
+SIMHOST_API store::Port running_port(store::Transaction &transaction, store::PortNumber number);
 SIMHOST_API store::Uplink known_uplink(store::Transaction &transaction, std::string_view name);
 /// Likewise, at a port of one switch only.
 SIMHOST_API store::Uplink known_uplink(store::Transaction &transaction, store::SwitchKey switch_key,

@@ -114,7 +114,7 @@ QEX_ReturnStatus VSQEX_PortGetTeamUplinkHint(qex_SwitchPortID port, qex_Name *na
   return answer(__func__, [&](Call &call) {
     auto &output = required(name);
     auto &work = call.reading();
-    auto const known = simhost::known_port(work, simhost::store::PortNumber{port});
+    auto const known = simhost::running_port(work, simhost::store::PortNumber{port});
     output = simhost::name_of(data_plane().team_uplink(work, known));
   });
 }

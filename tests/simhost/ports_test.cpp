@@ -101,9 +101,12 @@ TEST_F(Ports, HaveNumbersThatAreNeverUsedAgain) {
 }
 
 TEST_F(Ports, OfASwitchThatDoesNotRunHaveNoNumber) {
+  auto const before = static_cast<qex_SwitchPortID>(number_of("p"));
   ASSERT_EQ(DVSQEX_SwitchDissociate("s-id"), QEX_OK);
   int number = 0;
   EXPECT_EQ(VSDVS_DvPortIDToPortID("s", "p", &number), QEX_NOT_FOUND);
+  qex_Name hint{};
+  EXPECT_EQ(VSQEX_PortGetTeamUplinkHint(before, &hint), QEX_NOT_FOUND);
   VSInfo info{};
   EXPECT_EQ(VSQEX_GetVSInfo("s", &info), QEX_NOT_FOUND);
   VSUplinks *list = nullptr;
@@ -113,6 +116,7 @@ TEST_F(Ports, OfASwitchThatDoesNotRunHaveNoNumber) {
   EXPECT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK) << "it can still be configured";
   ASSERT_EQ(DVSQEX_SwitchAssociate("s-id"), QEX_OK);
   EXPECT_EQ(VSDVS_DvPortIDToPortID("s", "p", &number), QEX_OK);
+  EXPECT_EQ(VSQEX_PortGetTeamUplinkHint(before, &hint), QEX_OK);
   EXPECT_EQ(VSQEX_GetVSInfo("s", &info), QEX_OK);
 }
 
