@@ -7,7 +7,7 @@ from typing import Collection, Dict, Iterable, List, Optional, Sequence, Tuple
 import comments
 import ownership
 import statuses
-from comments import Comment, Header, first_sentence
+from comments import Comment, Header
 from definitions import Definitions, Field, Function, Parameter, Record
 from python_types import PythonTypes
 from types_in_words import in_words
@@ -62,6 +62,10 @@ class Entries:
         self._known = known
         self._headers = headers
         self._helpers = helpers
+        self._said_of_types = {
+            **headers["nebpublic/handles.h"].types,
+            **{one.title: one.text for header in headers.values() for one in header.families},
+        }
         self._python_types = (PythonTypes(known, "_flat."), PythonTypes(known))
 
     def reads_as(self, one: Field) -> str:
@@ -158,9 +162,8 @@ class Entries:
         if one.name == "index":
             return _INDEX
         record = self._known.records.get(plain.replace(" or None", ""))
-        handles = self._headers["nebpublic/handles.h"].types
-        text = record.doc if record else handles.get(one.type.spelled(), "")
-        return first_sentence(text).rstrip(".")
+        text = record.doc if record else self._said_of_types.get(one.type.spelled(), "")
+        return re.split(r"[.;](?:\s|$)", text, maxsplit=1)[0].replace("\n", " ")
 
     def _is_cell(self, one: Parameter) -> bool:
         """Whether a call fills or reads a number or a pointer behind this one."""

@@ -64,6 +64,9 @@ def _taken(name: str, parameters: Collection[str], header: Header) -> List[str]:
 def _refused(header: Header, statuses: Collection[str]) -> Iterator[str]:
     where = header.name
     yield from _misplaced(where, header.text, statuses)
+    for status, text in header.text.statuses.items():
+        if text.endswith(")") and not _parted(text)[1]:
+            yield f"{where}: {status} has no list of `parameters` in parentheses"
     listed = {one for text in header.text.statuses.values() for one in _parted(text)[1]}
     taken = {one for prototype in header.prototypes.values() for one in texts(prototype)}
     for parameter in sorted(listed - taken):

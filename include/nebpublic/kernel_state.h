@@ -17,6 +17,8 @@
  * @param port identifier of the port
  * @param externalId the other system's name for the port
  * @param key key of the property
+ * @param data the bytes of the property
+ * @param state the bytes of the state
  * @param length bytes
  * @param list receives a list in the library's own memory, which goes back through DVSData_Free
  * @param propertyType one of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
@@ -97,6 +99,8 @@ QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion versio
  * Sets how many ports a switch has room for.
  *
  * - QEX_LIMIT_EXCEEDED if it has more
+ *
+ * @param maxPorts room for ports
  */
 QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts);
 
@@ -110,6 +114,7 @@ QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports,
  *
  * @param command name of the command
  * @param input what the command takes, `inputLength` bytes; null with a length of 0
+ * @param inputLength bytes of `input`
  * @param output receives what the command gives
  * @param outputLength receives its length
  */
@@ -177,6 +182,7 @@ QEX_ReturnStatus DVSQEX_HostPropClear(char const *switchId, char const *key);
  * @param port identifier of the new port, 1 to 47 bytes
  * @param state a state that DVSQEX_PortStateGet or DVSQEX_PersistentPortStateGet gave, for the
  *              port to start with; null with a length of 0 for none
+ * @param stateLength bytes of `state`
  */
 QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *state,
                                 int stateLength);

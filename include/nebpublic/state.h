@@ -16,6 +16,8 @@
  * @param switchId identifier of the switch
  * @param port identifier of the port
  * @param key key of the property
+ * @param item receives the item
+ * @param context anything, which the callback gets as its second argument
  */
 
 #include "nebpublic/handles.h"

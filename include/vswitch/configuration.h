@@ -19,6 +19,7 @@
  * @param port identifier of the port
  * @param uplink name of the uplink
  * @param portsetName name of the set of ports
+ * @param enabled 1 or 0
  */
 
 #include "qexapi/names.h"
@@ -345,6 +346,9 @@ QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
  * - QEX_BAD_VLANID for a VLAN of 0 or past 4094
  * - QEX_BAD_PARAM for a map that contradicts itself: a VLAN that is secondary twice, or secondary
  *   and primary, two isolated VLANs of one primary
+ *
+ * @param entries the whole map
+ * @param count how many entries
  */
 QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry const *entries,
                                          int count);

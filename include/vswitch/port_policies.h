@@ -17,7 +17,7 @@ enum {
   VSPORT_VLAN_SET_PRIORITY = 4,
 };
 
-/** Bits of VSPropSecurity.flags. */
+/** Bits of VSPropSecurity.flags: what the client of a port may not do. */
 enum {
   VSPORT_SECURITY_DISALLOW_PROMISC = 1,    /**< receive in promiscuous mode */
   VSPORT_SECURITY_DISALLOW_MAC_CHANGE = 2, /**< change its MAC address */
@@ -27,7 +27,7 @@ enum {
 /** Multicast addresses of a VSExtraEthFilter. */
 #define VSWITCH_ETH_MAX_EXACT_MULTICAST_ADDRS 32
 
-/** Bits of VSExtraEthFilter.flags. */
+/** Bits of VSExtraEthFilter.flags: frames that a port accepts. */
 enum {
   QEX_ETH_FILTER_UNICAST = 0x1,
   QEX_ETH_FILTER_MULTICAST = 0x2,

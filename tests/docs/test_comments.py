@@ -143,6 +143,11 @@ typedef enum Kind {
         ("Switches.", "A null is QEX_BAD_PARAM.", ["switches.h: QEX_BAD_PARAM belongs"]),
         ("(`switchName`,", "(`switchname`,", ["switches.h: no call takes a text switchname"]),
         (
+            "(`switchName`,\n *   `port`)",
+            "(switchName, port)",
+            ["switches.h: QEX_NOT_FOUND has no list of `parameters` in parentheses"],
+        ),
+        (
             " * @param switchName alias of the switch\n",
             "",
             ["switches.h: nothing says what switchName is", "Add: nothing says what switchName is"],
