@@ -13,7 +13,7 @@ import statuses
 from call_entries import Call, Entries
 from comments import Family, Header
 from definitions import Field, Record
-from pictures import Shape
+from segments import Shape
 from shapes import Shapes
 
 CLASSES, FLAT = "libvswitch", "_libvswitch"

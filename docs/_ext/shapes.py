@@ -5,7 +5,7 @@ from typing import List
 
 from definitions import Definitions, Field, Record, Type
 from layout import Layout
-from pictures import Shape
+from segments import Shape
 
 
 class Shapes:

@@ -8,6 +8,7 @@ import pytest
 import records
 from catalogue import Catalogue
 from records import Field, Record
+from segments import segments
 
 RECORDS = records.read()
 
@@ -29,7 +30,7 @@ def test_the_layout_is_the_tables(catalogue: Catalogue, name: str) -> None:
 @pytest.mark.parametrize("name", RECORDS)
 def test_the_bytes_are_covered_once(catalogue: Catalogue, name: str) -> None:
     shapes = catalogue.shapes(catalogue.known.records[name])
-    found = pictures.segments(shapes, RECORDS[name].size)
+    found = segments(shapes, RECORDS[name].size)
     assert [one.start for one in found] == [0, *[one.end for one in found[:-1]]]
     assert found[-1].end == RECORDS[name].size
     inside = [shape.name for one in found for shape in one.shapes]
