@@ -35,7 +35,9 @@ class Constants(Described):
         standard: Any = self.env.get_domain("std")
         standard.anonlabels[label] = self.env.docname, label
         section += nodes.title("", "", nodes.Text(title))
-        section.extend(self.words.paragraphs(family.text))
+        # A comment of one sentence may be the title of what it says.
+        if family.text.rstrip(".").replace("\n", " ") != title:
+            section.extend(self.words.paragraphs(family.text))
         meanings = [self._meaning(family, name) for name in family.names]
         rows = []
         for name, meaning in zip(family.names, meanings):

@@ -204,6 +204,7 @@ class Callback(_records._Pointing):
         return 1 if answer is None or answer else 0
 
     def reraise(self) -> None:
+        """Raises what the function raised in the last walk, once; nothing if it did not."""
         raised, self._raised = self._raised, None
         if raised is not None:
             raise raised

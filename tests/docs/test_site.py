@@ -135,6 +135,15 @@ def test_what_a_constant_means(site: Site, name: str, meaning: str) -> None:
     assert meaning in " ".join(text[:300].split())
 
 
+def test_no_comment_is_said_twice(site: Site) -> None:
+    device = " ".join(site["reference/constants/device.html"].text.split())
+    title = (
+        "Bytes of the name of a set of ports and of a port's identifier, terminating NULs included"
+    )
+    # In the list of the page's parts, and where it stands.
+    assert device.count(title) == 2
+
+
 def test_statuses_have_the_texts_of_the_host(site: Site, catalogue: Catalogue) -> None:
     (family,) = (
         one
