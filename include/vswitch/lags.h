@@ -10,10 +10,10 @@
 #include "qexapi/names.h"
 #include "qexapi/types.h"
 
-/** Bytes of a group's name, its terminating NUL included, and limits of groups. */
-#define VS_LACP_LAG_NAME_LENGTH 68
-#define VS_MAX_LAGS 32
-#define VS_MAX_UPLINKS_IN_LAG 32
+/** Limits of groups. */
+#define VS_LACP_LAG_NAME_LENGTH 68 /**< bytes of a name, its terminating NUL included */
+#define VS_MAX_LAGS 32             /**< groups of a switch */
+#define VS_MAX_UPLINKS_IN_LAG 32   /**< uplinks of a group */
 
 #pragma pack(push, 1)
 

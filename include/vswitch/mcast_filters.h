@@ -12,8 +12,8 @@
 /** Whether a group takes or refuses the sources that are listed with it. */
 typedef enum VSMcastSrcIPFilterMode {
   VS_MCAST_SRC_IP_FILTER_MODE_NONE = 0,
-  VS_MCAST_SRC_IP_FILTER_MODE_INCLUDE = 1,
-  VS_MCAST_SRC_IP_FILTER_MODE_EXCLUDE = 2,
+  VS_MCAST_SRC_IP_FILTER_MODE_INCLUDE = 1, /**< it takes them */
+  VS_MCAST_SRC_IP_FILTER_MODE_EXCLUDE = 2, /**< it refuses them */
 } VSMcastSrcIPFilterMode;
 
 #pragma pack(push, 1)
