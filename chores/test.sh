@@ -103,10 +103,7 @@ class_tests() {
   if [ -n "$sanitizers" ]; then
     # Valgrind and AddressSanitizer cannot both watch over memory.
     not_for_this_build "valgrind.helpers, valgrind.finds_what_is_planted"
-    # The doctor counts what a module lacks, and one canary looks for a lost block in the allocator:
-    # both see what the sanitizers bring instead.
-    leave_out tests/classes/test_doctor.py::test_a_good_build_is_well
-    leave_out tests/classes/test_doctor.py::test_a_host_that_lacks_calls
+    # The canary looks for a lost block in the allocator, which is the sanitizers' own here.
     leave_out tests/classes/test_records.py::test_a_record_that_is_never_freed_would_be_noticed
   fi
   if [ -n "$lent" ]; then

@@ -172,7 +172,8 @@ def _symbols(report: Report, module: _elf.Elf, libraries: List[_elf.Elf]) -> Non
     """Whether the host has every call that the module makes."""
     if len(libraries) < len(HOST):
         return
-    wanted = {name for name in module.wanted if not name.startswith(("Py", "_Py"))}
+    others = _offered_by_others(module)
+    wanted = {name for name in module.wanted - others if not name.startswith(("Py", "_Py"))}
     offered: Set[str] = set()
     for library in libraries:
         offered |= library.defined
@@ -188,6 +189,21 @@ def _symbols(report: Report, module: _elf.Elf, libraries: List[_elf.Elf]) -> Non
         )
     else:
         report.add(OK, "symbols", f"the host has all {len(wanted)} calls")
+
+
+def _offered_by_others(module: _elf.Elf) -> Set[str]:
+    """What the libraries define that the module asks for beside the host's: sanitizers, for one."""
+    names: Set[str] = set()
+    for needed in set(module.needed) - set(HOST):
+        for path in _loader.candidates(needed, module):
+            try:
+                library = _elf.read(path)
+            except (OSError, _elf.NotElf):
+                continue
+            if library.machine == module.machine:
+                names |= library.defined
+                break
+    return names
 
 
 def _first(names: List[str]) -> str:

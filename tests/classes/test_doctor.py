@@ -6,8 +6,9 @@ import shutil
 import subprocess
 import sys
 from pathlib import Path
-from typing import Any, Dict, List, Tuple
+from typing import Any, Dict, List, Set, Tuple
 
+import functions
 import pytest
 from libvswitch import _elf, _examination
 
@@ -55,14 +56,20 @@ def elsewhere(tmp_path: Path) -> Path:
     return tmp_path / "one" / "python"
 
 
-def library(folder: Path, name: str, source: str) -> None:
+def library(folder: Path, name: str, source: str, *words: str) -> None:
     folder.mkdir(exist_ok=True)
     (folder / "library.c").write_text(source, encoding="ascii")
     subprocess.run(
-        ["cc", "-shared", "-fPIC", f"-Wl,-soname,{name}", "-o", name, "library.c"],
+        ["cc", "-shared", "-fPIC", f"-Wl,-soname,{name}", "-o", name, "library.c", *words],
         cwd=folder,
         check=True,
     )
+
+
+def every_call_but(lacking: Set[str]) -> str:
+    """The source of a library that has the host's calls, which do nothing."""
+    calls = {function.name for function in functions.read() if function.kind == "call"}
+    return "".join(f"void {name}(void) {{}}\n" for name in sorted(calls - lacking))
 
 
 CLASS, DATA, MACHINE = 4, 5, 18
@@ -138,12 +145,8 @@ def test_no_host(elsewhere: Path) -> None:
 
 
 def test_a_host_that_lacks_calls(elsewhere: Path, tmp_path: Path) -> None:
-    every = _elf.read(next(elsewhere.glob("_libvswitch*.so"))).wanted
-    calls = sorted(name for name in every if not name.startswith(("Py", "_Py")))
-    assert len(calls) == 146
     lacking = {"VSDVS_GetMTU", "DVSData_Free"}
-    source = "".join(f"void {name}(void) {{}}\n" for name in calls if name not in lacking)
-    library(tmp_path / "host", "libvswitch.so", source)
+    library(tmp_path / "host", "libvswitch.so", every_call_but(lacking))
     library(tmp_path / "host", "libnebPublic.so", "")
     found = report(run(elsewhere, str(tmp_path / "host"), "--json"))
     assert errors(found) == ["symbols", "loading"]
@@ -161,6 +164,22 @@ def test_many_missing_calls_are_counted(elsewhere: Path, tmp_path: Path) -> None
     assert line.endswith(" and 141 more, all of which --json names")
     assert len(line.split(", ")) == 6
     assert len(report(run(elsewhere, str(tmp_path / "host"), "--json"))["missing_symbols"]) == 146
+
+
+def test_what_another_library_has_is_no_call(
+    tmp_path: Path, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    for name in HOST:
+        library(tmp_path, name, "")
+    library(tmp_path, "libother.so", "void helps(void) {}\n")
+    source = "void helps(void), DVPortExist(void); void go(void) { helps(); DVPortExist(); }\n"
+    library(tmp_path, "module.so", source, "-Wl,--no-as-needed", "./libother.so")
+    monkeypatch.setenv("LD_LIBRARY_PATH", str(tmp_path))
+    found = _examination.Report()
+    host = [_elf.read(tmp_path / name) for name in HOST]
+    _examination._symbols(found, _elf.read(tmp_path / "module.so"), host)
+    (finding,) = found.findings
+    assert finding.text == "the host lacks 1 of 1 calls: DVPortExist"
 
 
 SIMULATION = ("SIMHOST_STATE", "SIMHOST_SCENARIO")
@@ -251,9 +270,7 @@ def test_a_full_disk(words: List[str], unbuffered: str) -> None:
 
 
 def test_a_real_host_is_none_that_simulates(elsewhere: Path, tmp_path: Path) -> None:
-    every = _elf.read(next(elsewhere.glob("_libvswitch*.so"))).wanted
-    calls = sorted(name for name in every if not name.startswith(("Py", "_Py")))
-    library(tmp_path / "host", "libvswitch.so", "".join(f"void {n}(void) {{}}\n" for n in calls))
+    library(tmp_path / "host", "libvswitch.so", every_call_but(set()))
     library(tmp_path / "host", "libnebPublic.so", "")
     found = report(run(elsewhere, str(tmp_path / "host"), "--json"))
     assert (errors(found), found["simulated"]) == ([], False)
@@ -375,9 +392,7 @@ def test_the_search_path_is_read_as_the_loader_reads_it(
 
 
 def test_a_host_that_crashes_as_it_loads(tmp_path: Path, elsewhere: Path) -> None:
-    every = _elf.read(next(elsewhere.glob("_libvswitch*.so"))).wanted
-    calls = sorted(name for name in every if not name.startswith(("Py", "_Py")))
-    source = "".join(f"void {name}(void) {{}}\n" for name in calls)
+    source = every_call_but(set())
     source += "__attribute__((constructor)) static void start(void) { __builtin_trap(); }\n"
     library(tmp_path / "host", "libvswitch.so", source)
     library(tmp_path / "host", "libnebPublic.so", "")
