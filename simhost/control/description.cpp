@@ -1,11 +1,8 @@
 // From the host to a document.
-#include <algorithm>
-#include <array>
 #include <string>
-#include <string_view>
 #include <utility>
 
-#include "control/policy_documents.h"
+#include "control/named_properties.h"
 #include "control/scenario.h"
 #include "control/texts.h"
 #include "control/vocabulary.h"
@@ -14,8 +11,6 @@
 #include "core/giving_up.h"
 #include "core/host_settings.h"
 #include "core/known.h"
-#include "core/ports.h"
-#include "core/properties.h"
 #include "core/runtime_options.h"
 #include "core/switches.h"
 #include "dataplane/counters.h"
@@ -23,9 +18,7 @@
 #include "dataplane/mac_tables.h"
 #include "dataplane/multicast.h"
 #include "dataplane/teaming.h"
-#include "qexapi/switch_properties.h"
 #include "store/store.h"
-#include "vswitch/properties.h"
 
 namespace simhost::control {
 namespace {
@@ -90,34 +83,13 @@ Json described_groups(Transaction &work, store::PortNumber port) {
   return list;
 }
 
-// The keys of a description that have a meaning of their own are not repeated as raw bytes.
-template <typename Record>
-void describe_record(Json &described, std::string_view name, Transaction &work,
-                     PropertyOwner const &owner, char const *key) {
-  if (auto const property = get_property(work, owner, key)) {
-    described[std::string(name)] = control::described(record_of<Record>(property->value));
-  }
-}
-
-bool is_described_by_name(std::string_view key) {
-  constexpr std::array<std::string_view, 8> kKeys{
-      VSPROP_MTU,
-      VSPROP_SWITCH_TEAMING,
-      VSPROP_SWITCH_MAC_LEARNING,
-      VSPROP_MULTICAST_FILTER,
-      VSPROP_PORT_TEAMING_POLICY,
-      VSPROP_PORT_TEAMING_OVERRIDE,
-      VSPROP_PORT_MAC_MANAGEMENT,
-      VSPROP_PORT_MIRROR_SESSIONS,
-  };
-  return std::find(kKeys.begin(), kKeys.end(), key) != kKeys.end();
-}
-
+// Bytes of what a member says whole are not repeated.
 void describe_properties(Json &described, Transaction &work, PropertyOwner const &owner,
-                         char const *under = "properties") {
+                         NamedProperties named, char const *under = "properties") {
   Json list = Json::object();
   for (auto const &[name, property] : store::properties_of(work, owner)) {
-    if (!is_described_by_name(name)) {
+    auto const *const member = find_named(named, name);
+    if (member == nullptr || !is_said_whole(described, *member, property)) {
       list[name] = {{"type", described_choice(property.type, kPropertyTypes)},
                     {"hex", hex_text(property.value)}};
     }
@@ -141,20 +113,12 @@ Json described_port(Transaction &work, store::Port const &port,
   if (auto const external = store::external_id_of(work, port.number); !external.empty()) {
     described["external_id"] = external;
   }
-  describe_record<VSTeamPolicy>(described, "teaming", work, owner, VSPROP_PORT_TEAMING_POLICY);
-  if (auto const bound = get_property(work, owner, VSPROP_PORT_TEAMING_OVERRIDE)) {
-    described["uplink"] = text_of(bound->value);
-  }
-  describe_record<VSPMACManagement>(described, "mac_learning", work, owner,
-                                    VSPROP_PORT_MAC_MANAGEMENT);
-  if (auto const table = get_property(work, owner, VSPROP_PORT_MIRROR_SESSIONS)) {
-    described["mirror_sessions"] = described_mirror_sessions(table->value);
-  }
+  describe_members(described, work, owner, named_of_port());
   described["addresses"] = described_addresses(work, place);
   described["groups"] = described_groups(work, port.number);
   described["counters"] =
       described_counters(work, {.switch_key = port.switch_key, .port = port.number});
-  describe_properties(described, work, owner);
+  describe_properties(described, work, owner, named_of_port());
   Json observed{{"number", static_cast<std::uint32_t>(port.number)}};
   try {
     observed["uplink"] = carriers.required_of(port);
@@ -167,16 +131,13 @@ Json described_port(Transaction &work, store::Port const &port,
 }
 
 Json described_uplink_port(Transaction &work, store::Port const &port) {
+  auto const owner = owner_of(port);
   Json described{{"id", port.identifier}};
-  if (auto const name = alias_of(work, port)) {
-    described["name"] = *name;
-  }
+  describe_members(described, work, owner, named_of_uplink_port());
   if (auto const uplink = store::uplink_at(work, port.number)) {
     described["uplink"] = *uplink;
   }
-  describe_properties(described, work, PropertyOwner::port(port.switch_key, port.number));
-  // It is the name.
-  described["properties"].erase(QEX_NEBPROP_PORT_ALIAS);
+  describe_properties(described, work, owner, named_of_uplink_port());
   return described;
 }
 
@@ -217,12 +178,7 @@ Json described_switch(Transaction &work, store::FoundSwitch const &known) {
                     {"observed", {{"id", lag.id}, {"up", lag.up()}}}});
   }
   described["lags"] = std::move(lags);
-  describe_record<VSTeamPolicy>(described, "teaming", work, owner, VSPROP_SWITCH_TEAMING);
-  describe_record<VSMACLearning>(described, "mac_learning", work, owner,
-                                 VSPROP_SWITCH_MAC_LEARNING);
-  if (auto const mode = get_property(work, owner, VSPROP_MULTICAST_FILTER)) {
-    described["multicast"] = described_choice(record_of<std::uint32_t>(mode->value), kFilterModes);
-  }
+  describe_members(described, work, owner, named_of_switch());
   Json ports = Json::array();
   auto const own = dataplane::own_teamings(work, key);
   dataplane::Carriers const carriers(dataplane::team_of(work, key), own);
@@ -235,8 +191,8 @@ Json described_switch(Transaction &work, store::FoundSwitch const &known) {
   described["addresses"] = described_addresses(work, {.switch_key = key, .port = std::nullopt});
   described["counters"] = described_counters(work, {.switch_key = key});
   described["mirror_counters"] = described_session_counters(work, key);
-  describe_properties(described, work, owner);
-  describe_properties(described, work, PropertyOwner::host(key), "host_properties");
+  describe_properties(described, work, owner, named_of_switch());
+  describe_properties(described, work, PropertyOwner::host(key), {}, "host_properties");
   return described;
 }
 

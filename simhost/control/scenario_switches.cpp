@@ -7,7 +7,7 @@
 #include <string_view>
 #include <vector>
 
-#include "control/policy_documents.h"
+#include "control/named_properties.h"
 #include "control/reading.h"
 #include "core/known.h"
 #include "core/ports.h"
@@ -17,9 +17,7 @@
 #include "dataplane/links.h"
 #include "dataplane/mac_tables.h"
 #include "dataplane/multicast.h"
-#include "qexapi/switch_properties.h"
 #include "store/store.h"
-#include "vswitch/properties.h"
 
 namespace simhost::control {
 namespace {
@@ -43,15 +41,40 @@ Bytes bytes_from(Node const &node) {
   return *bytes;
 }
 
-void apply_properties(Transaction &work, PropertyOwner const &owner, Node const &node,
-                      std::string_view under = "properties") {
+template <typename IsWanted>
+void apply_raw(Transaction &work, PropertyOwner const &owner, Node const &node,
+               std::string_view under, IsWanted const &is_wanted) {
   if_there(node, under, [&](Node const &properties) {
     for_each_member(properties, [&](std::string const &key, Node const &property) {
+      if (!is_wanted(key)) {
+        return;
+      }
       property.only({"type", "hex", "text"});
       auto const type = property.at("type").choice(std::span(kPropertyTypes));
       set_property(work, owner, key, bytes_from(property), type);
     });
   });
+}
+
+// Those without a member of their own.
+void apply_others(Transaction &work, PropertyOwner const &owner, NamedProperties named,
+                  Node const &node, std::string_view under = "properties") {
+  apply_raw(work, owner, node, under,
+            [&](std::string_view key) { return find_named(named, key) == nullptr; });
+}
+
+// Bytes win over the member, which may not be able to say them.
+void apply_named(Transaction &work, PropertyOwner const &owner, NamedProperties named,
+                 Node const &node) {
+  apply_members(work, owner, named, node);
+  apply_raw(work, owner, node, "properties",
+            [&](std::string_view key) { return find_named(named, key) != nullptr; });
+}
+
+void apply_properties(Transaction &work, PropertyOwner const &owner, NamedProperties named,
+                      Node const &node) {
+  apply_others(work, owner, named, node);
+  apply_named(work, owner, named, node);
 }
 
 void set_counters(Transaction &work, CounterOwner const &owner, Node const &counters) {
@@ -117,11 +140,6 @@ McastGroup group_from(Node const &node) {
   return group;
 }
 
-void apply_mirror_sessions(Transaction &work, store::Port const &port, Node const &node) {
-  set_property(work, PropertyOwner::port(port.switch_key, port.number), VSPROP_PORT_MIRROR_SESSIONS,
-               mirror_sessions_from(node));
-}
-
 void apply_port(Transaction &work, store::SwitchKey key, Node const &node) {
   node.only({"id", "external_id", "teaming", "uplink", "mac_learning", "addresses", "groups",
              "mirror_sessions", "counters", "properties", "observed"});
@@ -131,18 +149,7 @@ void apply_port(Transaction &work, store::SwitchKey key, Node const &node) {
   auto const owner = PropertyOwner::port(key, port.number);
   if_there(node, "external_id",
            [&](Node const &external) { set_external_id(work, port, external.text()); });
-  apply_properties(work, owner, node);
-  if_there(node, "teaming", [&](Node const &teaming) {
-    set_property(work, owner, VSPROP_PORT_TEAMING_POLICY, bytes_of(teaming_from(teaming)));
-  });
-  if_there(node, "uplink", [&](Node const &uplink) {
-    set_property(work, owner, VSPROP_PORT_TEAMING_OVERRIDE, bytes_of_text(uplink.text()));
-  });
-  if_there(node, "mac_learning", [&](Node const &learning) {
-    set_property(work, owner, VSPROP_PORT_MAC_MANAGEMENT, bytes_of(port_learning_from(learning)));
-  });
-  if_there(node, "mirror_sessions",
-           [&](Node const &sessions) { apply_mirror_sessions(work, port, sessions); });
+  apply_properties(work, owner, named_of_port(), node);
   apply_addresses(work, {.switch_key = key, .port = port.number}, node);
   for_each_in(node, "groups",
               [&](Node const &item) { dataplane::join(work, port.number, group_from(item)); });
@@ -204,10 +211,7 @@ void apply_uplink_port(Transaction &work, store::SwitchKey key, Node const &node
     node.at("id").fail("is a port that is no uplink port");
   }
   auto const owner = PropertyOwner::port(key, port.number);
-  apply_properties(work, owner, node);
-  if_there(node, "name", [&](Node const &name) {
-    set_property(work, owner, QEX_NEBPROP_PORT_ALIAS, bytes_of_text(name.text()));
-  });
+  apply_properties(work, owner, named_of_uplink_port(), node);
   if_there(node, "uplink", [&](Node const &uplink) { attach_to(work, port, uplink.text()); });
 }
 
@@ -268,24 +272,12 @@ void apply_switch(Transaction &work, Node const &node) {
   auto const known = store::find_switch(work, store::SwitchName::alias, alias);
   auto const key = known ? changed_switch(*known, node) : made_switch(work, alias, node);
   auto const owner = PropertyOwner::global(key);
-  apply_properties(work, owner, node);
-  if_there(node, "mtu", [&](Node const &mtu) {
-    set_mtu(work, alias, static_cast<std::uint32_t>(mtu.integer(1280, 9190)));
-  });
-  apply_properties(work, PropertyOwner::host(key), node, "host_properties");
+  apply_others(work, owner, named_of_switch(), node);
+  apply_others(work, PropertyOwner::host(key), {}, node, "host_properties");
   for_each_in(node, "uplink_ports", [&](Node const &item) { apply_uplink_port(work, key, item); });
   attach_uplinks(work, key, node);
   for_each_in(node, "lags", [&](Node const &item) { apply_lag(work, key, item); });
-  if_there(node, "teaming", [&](Node const &teaming) {
-    set_property(work, owner, VSPROP_SWITCH_TEAMING, bytes_of(teaming_from(teaming)));
-  });
-  if_there(node, "mac_learning", [&](Node const &learning) {
-    set_property(work, owner, VSPROP_SWITCH_MAC_LEARNING, bytes_of(switch_learning_from(learning)));
-  });
-  if_there(node, "multicast", [&](Node const &mode) {
-    set_property(work, owner, VSPROP_MULTICAST_FILTER,
-                 bytes_of(mode.choice(std::span(kFilterModes))));
-  });
+  apply_named(work, owner, named_of_switch(), node);
   for_each_in(node, "ports", [&](Node const &item) { apply_port(work, key, item); });
   apply_addresses(work, {.switch_key = key, .port = std::nullopt}, node);
   apply_counters(work, {.switch_key = key}, node);

@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstddef>
 #include <cstdlib>
 #include <fstream>
 #include <functional>
@@ -13,9 +14,12 @@
 #include "control/lifecycle.h"
 #include "core/fresh_host.h"
 #include "core/known.h"
+#include "core/properties.h"
 #include "core/switches.h"
 #include "store/store.h"
 #include "temporary_folder.h"
+#include "vswitch/mirror.h"
+#include "vswitch/properties.h"
 
 namespace {
 
@@ -216,6 +220,44 @@ TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
   simhost::control::apply(work, first.dump());
   EXPECT_EQ(simhost::control::described_host(work), first)
       << "with the numbers of ports and groups";
+}
+
+TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
+  Transaction work(store, Access::write);
+  simhost::control::apply(work, R"({"switches": [{"alias": "s", "teaming": {"speed": 5},
+      "ports": [{"id": "p", "teaming": {"speed": 6}, "mac_learning": {"limit": 3},
+                 "mirror_sessions": [{"sid": "m"}]}]}]})");
+  auto const owner_of_p = [&] {
+    return simhost::owner_of(simhost::known_port(work, simhost::known_switch(work, "s").key, "p"));
+  };
+  auto const property = [&](char const *key) {
+    return simhost::get_property(work, owner_of_p(), key).value();
+  };
+  auto table = property(VSPROP_PORT_MIRROR_SESSIONS).value;
+  // A VLAN to encapsulate in, for which documents have no word.
+  table.at(sizeof(DVMirrorSessionTable) + offsetof(DVMirrorSession, encapVlan)) = std::byte{7};
+  simhost::set_property(work, owner_of_p(), VSPROP_PORT_MIRROR_SESSIONS, table);
+  simhost::set_property(work, owner_of_p(), VSPROP_PORT_TEAMING_POLICY,
+                        property(VSPROP_PORT_TEAMING_POLICY).value,
+                        simhost::store::PropertyType::runtime);
+  auto const no_utf8 = simhost::bytes_of_text("\xFF");
+  simhost::set_property(work, owner_of_p(), VSPROP_PORT_TEAMING_OVERRIDE, no_utf8);
+
+  auto const described = simhost::control::described_host(work)["switches"][0];
+  EXPECT_TRUE(described["properties"].empty()) << "its teaming and MTU are said whole";
+  auto const &port = described["ports"][0];
+  EXPECT_EQ(port["mirror_sessions"][0]["sid"], "m");
+  EXPECT_EQ(port["teaming"]["speed"], 6);
+  EXPECT_EQ(port["properties"][VSPROP_PORT_TEAMING_POLICY]["type"], "runtime");
+  EXPECT_EQ(port["properties"][VSPROP_PORT_TEAMING_OVERRIDE]["hex"], "ff00");
+  EXPECT_EQ(port["properties"].size(), 3U) << "not the MAC learning";
+
+  auto const document = simhost::control::description(work);
+  simhost::control::empty_host(work);
+  simhost::control::apply(work, document);
+  EXPECT_EQ(property(VSPROP_PORT_MIRROR_SESSIONS).value, table);
+  EXPECT_EQ(property(VSPROP_PORT_TEAMING_POLICY).type, simhost::store::PropertyType::runtime);
+  EXPECT_EQ(property(VSPROP_PORT_TEAMING_OVERRIDE).value, no_utf8);
 }
 
 TEST_F(Scenario, NamesThatAreNoUtf8AreDescribedByAReplacement) {
