@@ -41,6 +41,10 @@ TEST_F(StateImages, TheConfigurationComesBackFromItsImage) {
   DVSQEX_DataFree(opaque);
   EXPECT_EQ(VSDVS_AddSwitchUplinkPort("s", "nic0"), QEX_EXISTS) << "the uplinks are back";
   EXPECT_EQ(image(DVSQEX_PersistentStateGet), persistent);
+  ASSERT_EQ(DVSQEX_StateCleanup(), QEX_OK);
+  auto read = persistent;
+  EXPECT_EQ(DVSQEX_StateInit(read.data(), static_cast<int>(read.size())), QEX_OK);
+  EXPECT_EQ(image(DVSQEX_PersistentStateGet), persistent);
 }
 
 TEST_F(StateImages, WhatWasNotSetIsNotSetAfterwards) {
