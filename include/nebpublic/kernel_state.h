@@ -37,8 +37,8 @@ extern "C" {
 #endif
 
 /**
- * Gives the kernel a state that DVSQEX_StateGet or DVSQEX_PersistentStateGet read; null with a length
- * of 0 is an empty one.
+ * Gives the kernel a state that DVSQEX_StateGet or DVSQEX_PersistentStateGet read; null with a
+ * length of 0 is an empty one.
  *
  * A state that cannot be read changes nothing.
  *
