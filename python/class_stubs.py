@@ -12,7 +12,8 @@ from typing import Any, Callable, Final, Optional, Tuple, Union, overload
 
 import _libvswitch as _flat
 from _libvswitch import cvar as cvar
-from libvswitch._records import Array, Record as Record, Table as Table
+from libvswitch._arrays import Array
+from libvswitch._records import Record as Record, Table as Table
 
 # As it was when the classes were loaded; cvar has it as it is.
 qex_ModuleCurrentID: int
@@ -21,8 +22,8 @@ qex_ModuleCurrentID: int
 
 _PACKAGE_HEAD = '''"""Virtual switches of this host, as classes and functions."""
 
+from libvswitch._arrays import Array as Array
 from libvswitch._ownership import owned as owned
-from libvswitch._records import Array as Array
 from libvswitch.cells import Callback as Callback, Cell as Cell, Pointer as Pointer
 '''
 

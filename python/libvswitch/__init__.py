@@ -18,7 +18,7 @@ from typing import List as _List
 
 _MODULES = ("cells", "doctor")
 _BESIDE = {
-    "_records": ("Array",),
+    "_arrays": ("Array",),
     "_ownership": ("owned",),
     "cells": ("Callback", "Cell", "Pointer"),
 }

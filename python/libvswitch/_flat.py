@@ -10,7 +10,7 @@ from functools import wraps
 from typing import Any, Callable, Dict, List, Optional
 
 import _libvswitch
-from libvswitch import _layout, _memory, _records
+from libvswitch import _arrays, _layout, _memory, _records
 from libvswitch._ownership import DOORS, door_of, hand_out, release
 from libvswitch.cells import Callback, Cell, cell_behind
 
@@ -52,9 +52,9 @@ def _truth(reader: _Function) -> _Function:
 def _array(record: str, reader: _Function, element: str, inner: int, count: Any) -> _Function:
     length: Optional[Callable[[Any], int]] = None if count is None else _length(record, count)
 
-    def read(owner: Any) -> "_records.Array[Any]":
+    def read(owner: Any) -> "_arrays.Array[Any]":
         pointer = reader(owner)
-        array: _records.Array[Any] = _records.Array(
+        array: _arrays.Array[Any] = _arrays.Array(
             pointer, element, length(owner) if length else None, inner
         )
         _records.place_in(owner, array)
@@ -67,7 +67,7 @@ def _fill_array(read: _Function, write: _Function) -> _Function:
     """A writer that takes the elements as well as a pointer to them."""
 
     def fill(owner: Any, value: Any) -> None:
-        if isinstance(value, (list, tuple, bytes, _records.Array)):
+        if isinstance(value, (list, tuple, bytes, _arrays.Array)):
             read(owner)[:] = value
         else:
             write(owner, value)
@@ -188,11 +188,11 @@ def _allocating(make: _Function, door: str) -> _Function:
 def _new_array(make: _Function, element: str) -> _Function:
     """Elements of the caller's own: an array that knows its length and frees itself."""
 
-    def new(length: int) -> "_records.Array[Any]":
+    def new(length: int) -> "_arrays.Array[Any]":
         made = make(length)
         if made is None:
             raise MemoryError(f"no memory for {length} elements")
-        return _records.Array(made.this, element, length)
+        return _arrays.Array(made.this, element, length)
 
     return new
 
@@ -213,7 +213,7 @@ def _private_vlan_map(call: _Function) -> _Function:
         status, entries, count = call(*arguments)
         if entries is not None:
             place = _records.record_at("VSPvlanMapEntry", int(entries))
-            array: _records.Array[Any] = _records.Array(place.this, "VSPvlanMapEntry", count)
+            array: _arrays.Array[Any] = _arrays.Array(place.this, "VSPvlanMapEntry", count)
             hand_out(array, door_of("VSDVS_GetPrivateVLANMap"))
             entries = array
         return status, entries, count

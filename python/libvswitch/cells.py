@@ -4,7 +4,7 @@ import ctypes
 import weakref
 from typing import Any, Callable, Dict, Iterable, List, Optional, Union
 
-from libvswitch import _layout, _memory, _ownership, _pointers, _records
+from libvswitch import _arrays, _layout, _memory, _ownership, _pointers, _records
 
 
 class Pointer(_records._Pointing):
@@ -137,7 +137,7 @@ class Cell(_records._Pointing):
         """What a pointer reads as that is set to this value."""
         if self._target() != "void":
             return _records.wanted(self._target(), value)
-        if isinstance(value, (_records.Record, _records.Array)):
+        if isinstance(value, (_records.Record, _arrays.Array)):
             value._require()
         if isinstance(value, Pointer):
             return value
