@@ -20,6 +20,7 @@ PAGES = {
     "simhost/python/README.md": "/more/plugin.md",
     "simhost/SCENARIOS.md": "/more/scenarios.md",
     "bench/README.md": "/more/bench.md",
+    "include/README.md": "/more/headers.md",
     "packaging/README.md": "/more/packages.md",
     "tests/README.md": "/more/tests.md",
 }

@@ -86,7 +86,7 @@ def test_the_session_of_what_is_installed(shared_host: SharedHost) -> None:
 
 def test_each_document_is_a_page(site: Dict[str, Page]) -> None:
     # The front page and the short text for what is installed are said in the site's own words.
-    folders = ("bench", "packaging", "simhost", "tests")
+    folders = ("bench", "include", "packaging", "simhost", "tests")
     found = {
         str(file.relative_to(ROOT))
         for folder in folders
