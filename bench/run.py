@@ -164,9 +164,7 @@ def main() -> None:
         print("\n".join(lines), end="\n\n")
     if whole:
         titles, goals = modules.TITLES, targets.MODULES
-        lines = report.table(
-            "Whole modules", "", titles, middle_of(whole), ratios_to(whole), goals
-        )
+        lines = report.table("Whole modules", "", titles, middle_of(whole), ratios_to(whole), goals)
         print("\n".join(lines), end="\n\n")
     missed = [verdict for verdict in judged if not verdict["met"]]
     print(f"{len(judged) - len(missed)} of {len(judged)} targets met")
