@@ -120,6 +120,9 @@ void put_lag(store::Transaction &transaction, store::SwitchKey switch_key, std::
   }
   auto lag = find_lag(transaction, switch_key, name);
   if (!lag) {
+    if (lags_of(transaction, switch_key).size() >= VS_MAX_LAGS) {
+      throw Refused(QEX_LIMIT_EXCEEDED);
+    }
     lag = add_lag(transaction, switch_key, name);
   }
   transaction.query("DELETE FROM lag_uplink WHERE lag = ?").with(*lag).run();

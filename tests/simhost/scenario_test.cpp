@@ -18,6 +18,7 @@
 #include "core/switches.h"
 #include "store/store.h"
 #include "temporary_folder.h"
+#include "vswitch/lags.h"
 #include "vswitch/mirror.h"
 #include "vswitch/properties.h"
 
@@ -97,6 +98,13 @@ TEST_F(Scenario, WhatTheHostRefusesIsToldLikewise) {
   EXPECT_EQ(refusal_in_port(R"("addresses": [{"mac": "01:00:00:00:00:01"}])"),
             "switches[0].ports[0].addresses[0]: the host refuses it: Invalid address "
             "(QEX_INVALID_ADDRESS)");
+  std::string groups;
+  for (int number = 0; number < VS_MAX_LAGS; ++number) {
+    groups += fmt::format(R"({{"name": "{}", "uplinks": []}}, )", number);
+  }
+  EXPECT_EQ(refusal_in_switch(R"("lags": [)" + groups + R"({"name": "0", "uplinks": []}])"), "");
+  EXPECT_EQ(refusal_in_switch(R"("lags": [)" + groups + R"({"name": "more", "uplinks": []}])"),
+            "switches[0].lags[32]: the host refuses it: Limit exceeded (QEX_LIMIT_EXCEEDED)");
   EXPECT_EQ(refusal_in_port(R"("counters": {"txErrors": 1})"),
             "switches[0].ports[0].counters.txErrors: the host refuses it: there is no counter "
             "'txErrors' of a port (QEX_NOT_FOUND)");
