@@ -206,6 +206,7 @@ SIMHOST_API int simhost_learn(char const *switchName, char const *port, char con
                               uint16_t vlan, uint32_t vni) {
   auto sighting = simhost::dataplane::Sighting::learned;
   auto const status = on_state(Access::write, [&](Transaction &work) {
+    simhost::running_switch(work, given(switchName));
     sighting = simhost::dataplane::learn(work, place_of(work, switchName, port),
                                          source_of(given(mac), vlan, vni));
   });

@@ -58,8 +58,9 @@ int simhost_set_link(char const *uplink, int up);
 /**
  * A frame from an address arrives.
  *
- * QEX_IS_DISABLED if the port does not learn, QEX_LIMIT_EXCEEDED if there is no room, which is
- * counted, and QEX_EXISTS if the address is fixed elsewhere.
+ * QEX_NOT_FOUND if the switch does not run, QEX_IS_DISABLED if the port does not learn,
+ * QEX_LIMIT_EXCEEDED if there is no room, which is counted, and QEX_EXISTS if the address is fixed
+ * elsewhere.
  *
  * @param switchName alias of the switch
  * @param port identifier of the port; null for the team of uplinks

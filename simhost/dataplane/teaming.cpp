@@ -2,6 +2,7 @@
 #include "dataplane/teaming.h"
 
 #include <algorithm>
+#include <optional>
 #include <utility>
 
 #include "core/bytes.h"
@@ -21,6 +22,17 @@ OwnTeaming own_teaming(store::Transaction &transaction, store::Port const &port)
   auto const bound = store::find_property(transaction, owner, VSPROP_PORT_TEAMING_OVERRIDE);
   return {.policy = policy<VSTeamPolicy>(transaction, owner, VSPROP_PORT_TEAMING_POLICY),
           .uplink = bound ? std::optional(text_of(bound->value)) : std::nullopt};
+}
+
+// The switch whose ports a change of an uplink's link may move, if it is at one and that one runs.
+std::optional<store::SwitchKey> switch_running_over(store::Transaction &transaction,
+                                                    std::string_view uplink) {
+  auto const at = store::find_uplink(transaction, uplink);
+  if (!at || !at->port) {
+    return std::nullopt;
+  }
+  auto const key = store::find_port(transaction, *at->port)->switch_key;
+  return store::find_switch(transaction, key)->row.associated ? std::optional(key) : std::nullopt;
 }
 
 void announce(store::Transaction &transaction, store::SwitchKey key, std::uint64_t moves) {
@@ -96,12 +108,12 @@ std::string team_uplink(store::Transaction &transaction, store::Port const &port
 }
 
 void change_link(store::Transaction &transaction, std::string_view uplink, Link const &link) {
-  auto const at = store::find_uplink(transaction, uplink);
-  if (!at || !at->port) {
+  auto const running = switch_running_over(transaction, uplink);
+  if (!running) {
     put_link(transaction, uplink, link);
     return;
   }
-  auto const key = store::find_port(transaction, *at->port)->switch_key;
+  auto const key = *running;
   auto const own = own_teamings(transaction, key);
   Carriers const before(team_of(transaction, key), own);
   put_link(transaction, uplink, link);

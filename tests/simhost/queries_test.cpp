@@ -106,6 +106,14 @@ TEST_F(Queries, LinksAndWhoSwitchesThem) {
             QEX_BAD_PARAM);
 }
 
+TEST_F(Queries, ASwitchThatDoesNotRunLearnsNothing) {
+  apply(R"({"switches": [{"alias": "s", "running": false}]})");
+  EXPECT_EQ(simhost_learn("s", nullptr, "02:00:00:00:00:03", 0, 0), QEX_NOT_FOUND);
+  EXPECT_STREQ(simhost_error(), "the switch 's' does not run (QEX_NOT_FOUND)");
+  apply(R"({"switches": [{"alias": "s", "running": true}]})");
+  EXPECT_EQ(simhost_learn("s", nullptr, "02:00:00:00:00:03", 0, 0), QEX_OK);
+}
+
 TEST_F(Queries, ThePortOfAnUplink) {
   std::array<char, 49> buffer{};
   ASSERT_EQ(VSQEX_GetUplinkDVPortID("nic1", buffer.data()), QEX_OK);

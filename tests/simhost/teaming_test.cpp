@@ -238,6 +238,16 @@ TEST_F(Teaming, MovesAreAnnounced) {
   EXPECT_EQ(counted("rarpPktsSent"), 2U);
 }
 
+TEST_F(Teaming, ASwitchThatDoesNotRunAnnouncesNothing) {
+  auto notifying = policy({"uplink1"}, {"uplink2"});
+  notifying.flags = TEAM_FRP_FLAG_NOTIFY_SWITCH;
+  set_policy(of_switch(), VSPROP_SWITCH_TEAMING, notifying);
+  simhost::change_running(work, key, false);
+  down("nic0");
+  EXPECT_EQ(counted("rarpPktsSent"), 0U);
+  EXPECT_EQ(hint(p1), "nic1");
+}
+
 struct Lags : Teaming {
   std::vector<simhost::Lag> lags() { return simhost::data_plane().lags(work, key); }
   QEX_ReturnStatus put(std::string const &name, std::vector<std::string> const &uplinks) {
