@@ -17,10 +17,14 @@ namespace {
 
 constexpr RecordProperty<qex_Bool> kNestedTag{.key = VSPROP_PORT_VLAN_NESTEDTAG, .unset = 0};
 
-// An array of the caller; refuses null with a count and a negative count (QEX_BAD_PARAM).
+// No list has more entries than there are VLANs.
+constexpr int kMostEntries = 4096;
+
+// An array of the caller; refuses null with a count, and a count that nothing can have, before that
+// much is read (QEX_BAD_PARAM).
 template <typename Entry>
 std::span<Entry const> array(Entry const *first, int count) {
-  if (count < 0 || (first == nullptr && count != 0)) {
+  if (count < 0 || count > kMostEntries || (first == nullptr && count != 0)) {
     simhost::refuse(QEX_BAD_PARAM);
   }
   return {first, static_cast<std::size_t>(count)};

@@ -87,6 +87,8 @@ TEST_F(Validation, PrivateVlanMapsThatContradict) {
   EXPECT_EQ(VSDVS_SetPrivateVLANMap("s", nullptr, 1), QEX_BAD_PARAM);
   auto const good = entry(10, 10, kPromiscuous);
   EXPECT_EQ(VSDVS_SetPrivateVLANMap("s", &good, -1), QEX_BAD_PARAM);
+  EXPECT_EQ(VSDVS_SetPrivateVLANMap("s", &good, std::numeric_limits<int>::max()), QEX_BAD_PARAM)
+      << "nothing is read";
   EXPECT_EQ(global(VSPROP_PVLAN_MAP), std::nullopt) << "refused calls change nothing";
 }
 
