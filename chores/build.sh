@@ -20,7 +20,7 @@ cmd_build() {
 build_option() {
   case ${1-} in
   --python)
-    [ $# -ge 2 ] || die "--python: which one?"
+    [ -n "${2-}" ] || die "--python: which one?"
     asked_python=$2 taken=2
     ;;
   --debug-python)
@@ -43,6 +43,7 @@ only_build_options() {
 # Each other interpreter gets a build folder of its own, named after its binary interface.
 choose_python() {
   [ -n "$asked_python" ] && [ "$asked_python" != "$python" ] || return 0
+  command -v "$asked_python" >/dev/null || die "there is no interpreter '$asked_python'"
   python=$asked_python
   interface=$("$python" -c 'import sysconfig; print(sysconfig.get_config_var("SOABI"))') ||
     die "cannot run the interpreter '$python'"

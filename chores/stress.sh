@@ -18,7 +18,11 @@ cmd_stress() {
   while [ $# -gt 0 ]; do
     case $1 in
     --minutes | --seed)
-      [ $# -ge 2 ] || die "stress: $1: how many?"
+      [ $# -ge 2 ] || die "stress: $1: which number?"
+      case $2 in
+      '' | *[!0-9]*) die "stress: $1: '$2' is no whole number" ;;
+      esac
+      [ "$1 $2" != "--minutes 0" ] || die "stress: --minutes: 0 is no time at all"
       options="$options $1 $2"
       shift 2
       ;;

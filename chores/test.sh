@@ -55,6 +55,7 @@ cmd_test() {
       shift
       break
       ;;
+    --all-pythons | --packages) die "test: $1 goes before all other options" ;;
     *) die "test: unknown option '$1'; see ./dev test --help" ;;
     esac
     shift
@@ -177,6 +178,12 @@ all_pythons() {
 }
 
 test_all_pythons() {
+  for option; do
+    case $option in
+    --) break ;;
+    --python | --debug-python) die "test: $option names one interpreter, --all-pythons all" ;;
+    esac
+  done
   summary='' failed=0
   for candidate in $(all_pythons); do
     step "$candidate"
