@@ -130,7 +130,7 @@ class Array(_records._Pointing, typing.Sequence[T]):
             return list(self) == list(other)
         return NotImplemented
 
-    __hash__ = None  # type: ignore[assignment]
+    __hash__ = None  # type: ignore[assignment]  # lists have none either
 
     def __repr__(self) -> str:
         if not int(self):

@@ -109,7 +109,7 @@ class Record(_Pointing):
         )
         # An access by index alone would let Python iterate without an end.
         if "__getitem__" in vars(cls) and not issubclass(cls, Table):
-            cls.__iter__ = None  # type: ignore[attr-defined]
+            cls.__iter__ = None  # type: ignore[attr-defined]  # so Python is told
         CLASSES[cls.__name__] = cls
 
     # A type checker that saw this would let every name pass.

@@ -43,6 +43,7 @@ class Cell(_records._Pointing):
         self._is_scalar = _memory.is_scalar(self.type)
         spelling = self._spelled_pointer()
         many = isinstance(value, Iterable) and not isinstance(value, _records._Pointing)
+        # What `many` says of the value, a type checker does not see.
         values: List[Any] = list(value) if many else [value]  # type: ignore[arg-type]
         self._is_single = not many
         # What pointers here read as: the same object as long as they stay the same. It is kept

@@ -14,8 +14,8 @@ sys.path[:0] = [str(ROOT / "docs"), str(ROOT / "docs/_ext"), str(ROOT / "tests/s
 # At the end, for the package of the classes that lies there is not built.
 sys.path.append(str(ROOT / "python"))
 
-import check_links  # noqa: E402
-from catalogue import Catalogue  # noqa: E402
+import check_links  # noqa: E402  (after the path is set)
+from catalogue import Catalogue  # noqa: E402  (likewise)
 
 
 def build(source: Path, folder: Path) -> "subprocess.CompletedProcess[str]":

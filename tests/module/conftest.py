@@ -11,7 +11,7 @@ for _variable in ("SIMHOST_STATE", "SIMHOST_SCENARIO"):
 
 import _libvswitch as vs  # noqa: E402  (after the environment is clean)
 
-import native  # noqa: E402
+import native  # noqa: E402  (it imports the module)
 
 
 @pytest.fixture

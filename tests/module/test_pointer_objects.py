@@ -175,7 +175,7 @@ class Hidden:
 class Pretender:
     """Claims to be a class."""
 
-    __class__ = type  # type: ignore[assignment]
+    __class__ = type  # type: ignore[assignment]  # it is what it is for
 
     def __getattr__(self, name: str) -> Any:
         raise AttributeError(name)

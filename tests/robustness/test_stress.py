@@ -9,7 +9,7 @@ import pytest
 
 sys.path.append(str(processes.TESTS / "fuzz"))
 
-import stress  # noqa: E402
+import stress  # noqa: E402  (it imports what lies there)
 
 
 def _found(*wrong: str) -> "stress.Part":

@@ -35,6 +35,7 @@ def options(sequences: int, shrink: bool) -> settings:
 def counting(machine: Type[RuleBasedStateMachine]) -> Any:
     """The machine, with a count of how many have been made of it."""
 
+    # A base that is only known at run time.
     class Counting(machine):  # type: ignore[misc, valid-type]
         made = 0
 
@@ -52,6 +53,7 @@ def run(
     """Run so many sequences, which the number chooses; how many there were, and what is wrong."""
     counted = seed(number)(counting(machine))
     try:
+        # Hypothesis has no types for this one.
         run_state_machine_as_test(  # type: ignore[no-untyped-call]
             counted, settings=options(sequences, shrink)
         )

@@ -2,7 +2,7 @@
 
 from typing import Any, List, Optional, Tuple
 
-from cffi_peer import ffi, lib  # type: ignore[import]
+from cffi_peer import ffi, lib  # type: ignore[import]  # a compiled module
 
 _new, _string = ffi.new, ffi.string
 # A type that is parsed beforehand spares each allocation a look-up of its text.

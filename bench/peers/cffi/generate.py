@@ -3,7 +3,7 @@
 
 import sys
 
-import cffi  # type: ignore[import]
+import cffi  # type: ignore[import]  # it has no types
 
 DECLARATIONS = """
 typedef unsigned int qex_uint32;
