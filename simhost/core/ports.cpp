@@ -21,6 +21,8 @@ namespace {
 
 constexpr std::size_t kLongestIdentifier = QEX_NEB_PORT_ID_MAX_LEN - 1;
 constexpr std::size_t kLongestName = QEX_NEB_NAME_MAX_LEN - 1;
+static_assert(QEX_NEB_PORT_ALIAS_MAX_LEN == QEX_NEB_NAME_MAX_LEN,
+              "an uplink port's alias is its name");
 
 void check_name(std::string_view name, std::size_t longest) {
   if (name.empty()) {
@@ -76,11 +78,17 @@ store::Port uplink_port(store::Transaction &transaction, store::SwitchKey switch
   return *found;
 }
 
+bool is_name_of(std::vector<UplinkPort> const &ports, std::string_view name) {
+  return std::any_of(ports.begin(), ports.end(),
+                     [&](UplinkPort const &port) { return port.name == name; });
+}
+
 // "uplink1", "uplink2", ...: the first that no port of the switch is called.
 std::string fresh_uplink_identifier(store::Transaction &transaction, store::SwitchKey switch_key) {
+  auto const ports = named_uplink_ports(transaction, switch_key);
   for (unsigned number = 1;; ++number) {
     auto identifier = "uplink" + std::to_string(number);
-    if (!store::find_port(transaction, switch_key, identifier)) {
+    if (!store::find_port(transaction, switch_key, identifier) && !is_name_of(ports, identifier)) {
       return identifier;
     }
   }
@@ -218,6 +226,25 @@ std::vector<UplinkPort> named_uplink_ports(store::Transaction &transaction,
   return ports;
 }
 
+void check_port_alias(Setting const &setting) {
+  auto const alias = text_of(setting.value);
+  if (alias.size() > kLongestName) {
+    throw Refused(QEX_NAME_TOO_LONG);
+  }
+  auto const port =
+      store::find_port(setting.transaction, setting.owner.port_number.value()).value();
+  if (port.kind != store::PortKind::uplink) {
+    return;
+  }
+  check_name(alias, kLongestName);
+  auto others = named_uplink_ports(setting.transaction, port.switch_key);
+  std::erase_if(others,
+                [&](UplinkPort const &other) { return other.identifier == port.identifier; });
+  if (is_name_of(others, alias)) {
+    throw Refused(QEX_EXISTS);
+  }
+}
+
 void set_uplink_ports(store::Transaction &transaction, store::SwitchKey switch_key,
                       std::vector<UplinkPort> const &ports) {
   check_uplink_ports(ports);
@@ -230,7 +257,9 @@ void set_uplink_ports(store::Transaction &transaction, store::SwitchKey switch_k
   for (auto const &[name, identifier] : ports) {
     auto const port = uplink_port(transaction, switch_key, identifier);
     if (name_of(transaction, port) != name) {
-      set_property(transaction, owner_of(port), QEX_NEBPROP_PORT_ALIAS, bytes_of_text(name));
+      // They are right together, if not one after the other: two may exchange their names.
+      store::put_property(transaction, owner_of(port), QEX_NEBPROP_PORT_ALIAS, bytes_of_text(name),
+                          store::PropertyType::config);
     }
   }
 }

@@ -59,6 +59,10 @@ struct UplinkPort {
 /// of a port without one.
 SIMHOST_API std::vector<UplinkPort> named_uplink_ports(store::Transaction &transaction,
                                                        store::SwitchKey switch_key);
+/// The rules of QEX_NEBPROP_PORT_ALIAS: refuses a text that is too long (QEX_NAME_TOO_LONG), and
+/// for an uplink port no name (QEX_BAD_PARAM) and the name of another one of its switch
+/// (QEX_EXISTS).
+void check_port_alias(Setting const &setting);
 /// Makes the uplink ports of a switch those, known by their identifiers: new ones are added without
 /// an uplink, those left out are removed and their uplinks set free, the others keep theirs.
 /// Refuses empty names (QEX_BAD_PARAM), long ones (QEX_NAME_TOO_LONG), a name or an identifier

@@ -24,7 +24,6 @@ namespace {
 using store::PropertyScope;
 using store::PropertyType;
 
-constexpr std::size_t kLongestPortAlias = QEX_NEB_PORT_ALIAS_MAX_LEN - 1;
 // One more than the name of an uplink port has: what callers have room for.
 constexpr std::size_t kLongestOverride = 81;
 
@@ -111,7 +110,7 @@ constexpr std::array kKeys{
     PropertyKey{QEX_NEBPROP_PORT_PTALLOWEDRT, kPort, kCommon, kRuntime, boolean},
     PropertyKey{QEX_NEBPROP_PORT_STATISTICS, kPort, kCommon, kRuntime, anything,
                 read_port_statistics},
-    PropertyKey{QEX_NEBPROP_PORT_ALIAS, kPort, kCommon, kConfig, text<kLongestPortAlias>},
+    PropertyKey{QEX_NEBPROP_PORT_ALIAS, kPort, kCommon, kConfig, check_port_alias},
     PropertyKey{QEX_NEBPROP_PORT_CONNECTID, kPort, kCommon, kConfig, any_record<qex_uint32>},
     PropertyKey{QEX_NEBPROP_PORT_QEXNIC_VLANID, kPort, kCommon, kConfig, vlan_number},
     PropertyKey{QEX_NEBPROP_PORT_VNIC_CONNECTEE, kPort, kCommon, kRuntime, anything},

@@ -214,6 +214,24 @@ TEST_F(Ports, UplinkPortsThatContradict) {
   EXPECT_EQ(VSDVS_SetSwitchUplinkPorts("s", nullptr, &ids), QEX_BAD_PARAM);
 }
 
+TEST_F(Ports, TheAliasOfAnUplinkPortIsItsNameAlone) {
+  auto const rename = [](char const *port, char const *alias) {
+    return set_port(QEX_NEBPROP_PORT_ALIAS, bytes_of_text(alias), port);
+  };
+  EXPECT_EQ(rename("uplink1", "uplink2"), QEX_EXISTS);
+  EXPECT_EQ(rename("uplink1", ""), QEX_BAD_PARAM);
+  EXPECT_EQ(rename("uplink1", "uplink3"), QEX_OK);
+  EXPECT_EQ(rename("uplink1", "uplink3"), QEX_OK) << "its own name";
+  EXPECT_EQ(rename("uplink2", "uplink1"), QEX_OK);
+  EXPECT_EQ(rename("p", "uplink1"), QEX_OK) << "a client's port has no such name";
+  EXPECT_EQ(rename("p", ""), QEX_OK);
+  EXPECT_EQ(set_uplink_ports({{"uplink1", "uplink1"}, {"uplink2", "uplink3"}}), QEX_OK)
+      << "two exchange their names";
+  EXPECT_EQ(VSDVS_AddSwitchUplinkPort("s", "nic2"), QEX_OK);
+  EXPECT_THAT(uplink_ports(),
+              testing::ElementsAre("uplink1=uplink1", "uplink2=uplink3", "uplink4=uplink4"));
+}
+
 TEST_F(Ports, NamesOfPortsets) {
   std::array<char, 129> alias{};
   EXPECT_EQ(VSDVS_GetAliasFromPortset("s-ports", alias.data()), QEX_OK);
