@@ -1,6 +1,6 @@
 """Sequences of calls on the simulated host, and the faults that they must find."""
 
-from typing import Any, Type
+from typing import Any, List, Type
 
 import doors
 import pytest
@@ -28,15 +28,18 @@ class UnexpectedStatus(HostMachine):
 
 
 class LostMemory(HostMachine):
-    """With a tool that forgets what it was given."""
+    """With a tool that forgets what it was given until it ends."""
+
+    def __init__(self) -> None:
+        super().__init__()
+        self.forgotten: List[int] = []
 
     def _hold(self, block: doors.HandedOut, keep: bool) -> None:
-        self.forgotten = block
+        self.forgotten.append(block.address)
 
     def teardown(self) -> None:
-        forgotten = getattr(self, "forgotten", None)
-        if forgotten is not None:
-            doors.give_back(forgotten.address)
+        for address in self.forgotten:
+            doors.give_back(address)
         super().teardown()
 
 
