@@ -160,7 +160,7 @@ QEX_ReturnStatus VSDVS_GetTeamingPolicy(char const *switchName, VSTeamPolicy *po
  *
  * - QEX_LIMIT_EXCEEDED for more names than there are slots
  * - QEX_NAME_TOO_LONG for a name that fills its slot without a NUL
- * - QEX_BAD_PARAM for an unknown value or bit
+ * - QEX_BAD_PARAM for an unknown value or bit, and for an empty name or one that is there twice
  */
 QEX_ReturnStatus VSDVS_SetTeamingPolicy(char const *switchName, VSTeamPolicy const *policy);
 
@@ -182,7 +182,7 @@ QEX_ReturnStatus VSDVS_GetPortTeamingPolicy(char const *switchName, char const *
  *
  * - QEX_LIMIT_EXCEEDED for more names than there are slots
  * - QEX_NAME_TOO_LONG for a name that fills its slot without a NUL
- * - QEX_BAD_PARAM for an unknown value or bit
+ * - QEX_BAD_PARAM for an unknown value or bit, and for an empty name or one that is there twice
  */
 QEX_ReturnStatus VSDVS_SetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy const *policy);
@@ -266,7 +266,7 @@ QEX_ReturnStatus VSDVS_GetExtraEthFilter(char const *switchName, char const *por
  * Sets the extra frames a port accepts.
  *
  * - QEX_LIMIT_EXCEEDED for more addresses than there are places
- * - QEX_BAD_PARAM for an unknown bit
+ * - QEX_BAD_PARAM for an unknown bit and for an address that is not multicast
  */
 QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter const *filter);
