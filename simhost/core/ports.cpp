@@ -241,7 +241,7 @@ void check_port_alias(Setting const &setting) {
   std::erase_if(others,
                 [&](UplinkPort const &other) { return other.identifier == port.identifier; });
   if (is_name_of(others, alias)) {
-    throw Refused(QEX_EXISTS);
+    throw Refused(QEX_EXISTS, fmt::format("another uplink port is called '{}'", alias));
   }
 }
 

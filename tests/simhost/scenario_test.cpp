@@ -121,6 +121,9 @@ TEST_F(Scenario, UplinkPortsHaveOneUplinkEach) {
                                                   {"id": "u", "uplink": "nic0"}])"),
             "")
       << "it has it already";
+  EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u"}, {"id": "v", "name": "u"}])"),
+            "switches[0].uplink_ports[1].name: the host refuses it: another uplink port is called "
+            "'u' (QEX_EXISTS)");
   EXPECT_EQ(refusal_in_switch(R"("uplink_ports": [{"id": "u", "uplink": "nic9"}])"),
             "switches[0].uplink_ports[0].uplink: the host refuses it: there is no uplink 'nic9' "
             "(QEX_NOT_FOUND)");
