@@ -36,9 +36,9 @@ def test_stubs_and_modules_have_no_difference(module: str, tmp_path: Path) -> No
 
 
 def test_a_difference_would_be_found(tmp_path: Path) -> None:
-    for name in ("_libvswitch.pyi",):
-        text = (FOLDER / name).read_text(encoding="utf-8")
-        (tmp_path / name).write_text(f"{text}\ndef not_there() -> int: ...\n", encoding="utf-8")
+    name = "_libvswitch.pyi"
+    text = (FOLDER / name).read_text(encoding="utf-8")
+    (tmp_path / name).write_text(f"{text}\ndef not_there() -> int: ...\n", encoding="utf-8")
     environment = {**os.environ, "MYPYPATH": str(tmp_path), "PYTHONPATH": str(FOLDER)}
     done = subprocess.run(
         [sys.executable, "-m", "mypy.stubtest", "_libvswitch"],
