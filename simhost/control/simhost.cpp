@@ -127,8 +127,14 @@ simhost::Fault fault_on(char const *function, uint32_t nth, uint32_t times) {
   return fault;
 }
 
-int add_fault(simhost::Fault const &fault) {
-  return on_state(Access::write, [&](Transaction &work) { simhost::add_fault(work, fault); });
+// What the calls that are hit do, `outcome` puts into the fault.
+template <typename Outcome>
+int add_fault(char const *function, uint32_t nth, uint32_t times, Outcome const &outcome) noexcept {
+  return on_state(Access::write, [&](Transaction &work) {
+    auto fault = fault_on(function, nth, times);
+    outcome(fault);
+    simhost::add_fault(work, fault);
+  });
 }
 
 }  // namespace
@@ -237,36 +243,24 @@ SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, ch
 }
 
 SIMHOST_API int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int status) {
-  try {
-    auto fault = fault_on(function, nth, times);
+  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
     fault.status = static_cast<QEX_ReturnStatus>(status);
-    return add_fault(fault);
-  } catch (...) {
-    return failure();
-  }
+  });
 }
 
 SIMHOST_API int simhost_panic_call(char const *function, uint32_t nth, uint32_t times,
                                    char const *exception, char const *message) {
-  try {
-    auto fault = fault_on(function, nth, times);
+  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
     fault.exception = given(exception);
     fault.message = given(message);
-    return add_fault(fault);
-  } catch (...) {
-    return failure();
-  }
+  });
 }
 
 SIMHOST_API int simhost_delay_call(char const *function, uint32_t nth, uint32_t times,
                                    uint32_t milliseconds) {
-  try {
-    auto fault = fault_on(function, nth, times);
+  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
     fault.delay = std::chrono::milliseconds(milliseconds);
-    return add_fault(fault);
-  } catch (...) {
-    return failure();
-  }
+  });
 }
 
 SIMHOST_API int simhost_clear_faults(char const *function) {
