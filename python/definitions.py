@@ -48,8 +48,8 @@ class Type:
 
     def spelled(self) -> str:
         """In C, for a pointer, an array of arrays' pointer or a name."""
-        text, rest = "", list(self.layers)
-        for layer in rest:
+        text = ""
+        for layer in self.layers:
             if layer == "p":
                 text = f"*{text}"
             elif layer.startswith("a("):
@@ -178,15 +178,7 @@ def _children(node: ET.Element) -> Iterator[Tuple[ET.Element, _Attributes]]:
 def _collect(node: ET.Element, found: Definitions, header: str, family: str) -> None:
     for child, seen in _children(node):
         if child.tag == "class":
-            record = Record(
-                seen["name"],
-                _text(seen),
-                is_inner=not any(member.tag == "destructor" for member in child),
-                header=header,
-                count=seen.get("feature_count", ""),
-            )
-            _collect_members(child, record)
-            found.records[record.name] = record
+            found.records[seen["name"]] = _record(child, seen, header)
         elif child.tag == "cdecl" and seen.get("kind") == "typedef":
             found.typedefs[seen["name"]] = _type(seen["decl"] + seen["type"])
         elif child.tag == "cdecl" and seen.get("kind") == "function":
@@ -200,13 +192,28 @@ def _collect(node: ET.Element, found: Definitions, header: str, family: str) -> 
             name, number = seen["sym_name"], Type((), "int")
             found.constants.append(Constant(name, False, _text(seen), family, header, number))
         elif child.tag == "constant":
-            is_text = seen["type"] == "p.char" or seen["type"].endswith("char")
-            name, type_ = seen["sym_name"], _type(seen["type"])
-            # The comment of a row of definitions stands before what the first says of itself.
-            doc = re.sub(r"\.\s{2,}(?=\S)", ": ", _text(seen))
-            found.constants.append(Constant(name, is_text, doc, "", header, type_))
+            found.constants.append(_constant(seen, header))
         elif child.tag in ("include", "extern", "module"):
             _collect(child, found, seen.get("name", ""), family)
+
+
+def _constant(seen: _Attributes, header: str) -> Constant:
+    is_text = seen["type"].endswith("char")
+    # The comment of a row of definitions stands before what the first says of itself.
+    doc = re.sub(r"\.\s{2,}(?=\S)", ": ", _text(seen))
+    return Constant(seen["sym_name"], is_text, doc, "", header, _type(seen["type"]))
+
+
+def _record(node: ET.Element, seen: _Attributes, header: str) -> Record:
+    record = Record(
+        seen["name"],
+        _text(seen),
+        is_inner=not any(member.tag == "destructor" for member in node),
+        header=header,
+        count=seen.get("feature_count", ""),
+    )
+    _collect_members(node, record)
+    return record
 
 
 def _collect_members(node: ET.Element, record: Record) -> None:
