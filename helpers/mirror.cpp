@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <span>
 
 #include "helpers/exported.h"
 #include "helpers/slots.h"
@@ -30,6 +31,11 @@ int type_of(DVMirrorEntity const *entity) {
   int type = 0;
   std::memcpy(&type, &entity->type, sizeof type);
   return type;
+}
+
+/// A slot may be full, and then has no terminator.
+void copy_text(std::span<char const> slot, std::span<char> text) {
+  std::memcpy(text.data(), slot.data(), strnlen(slot.data(), slot.size()));
 }
 
 void print_address(DVMirrorIP const &ip, std::span<char> text) {
@@ -103,10 +109,10 @@ MirrorEntityText mirror_entity_text(DVMirrorEntity const *entity) {
   std::span<char> const text = result.text;
   switch (type_of(entity)) {
     case MIRROR_ENTTYPE_DVPORT:
-      std::memcpy(text.data(), entity->dvPortId, strnlen(entity->dvPortId, 48));
+      copy_text(entity->dvPortId, text);
       break;
     case MIRROR_ENTTYPE_UPLINK:
-      std::memcpy(text.data(), entity->uplink.string, strnlen(entity->uplink.string, 32));
+      copy_text(entity->uplink.string, text);
       break;
     case MIRROR_ENTTYPE_VLAN:
       std::snprintf(text.data(), text.size(), "%d", static_cast<int>(entity->vlan));
