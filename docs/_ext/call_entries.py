@@ -80,17 +80,17 @@ class Entries:
         prototype, comment = self._said_of(name, header)
         longest = max(forms, key=lambda one: len(one.inputs))
         return Call(
-            name,
-            "",
-            prototype,
-            comment,
-            tuple(self._arguments(longest, comment, header)),
-            tuple(self._names(one) for one in forms),
-            self._results(forms[0]),
-            _shape_of_result(forms[0]),
-            statuses.of_call(name, header) if header else {},
-            tuple(ownership.of_call(self._known, longest, prototype, header, comment)),
-            header.name if header else "",
+            name=name,
+            method_of="",
+            prototype=prototype,
+            comment=comment,
+            arguments=tuple(self._arguments(longest, comment, header)),
+            forms=tuple(self._names(one) for one in forms),
+            results=self._results(forms[0]),
+            shape=_shape_of_result(forms[0]),
+            statuses=statuses.of_call(name, header) if header else {},
+            ownership=tuple(ownership.of_call(self._known, longest, prototype, header, comment)),
+            header=header.name if header else "",
         )
 
     def _names(self, form: Function) -> Tuple[str, ...]:
@@ -121,14 +121,22 @@ class Entries:
             comment = comments.parted("How many entries the record says it has.")
         else:
             raise KeyError(f"no header says anything of {record.name}.{one.name}")
-        name = f"{record.name}_{one.name}"
         typed = [dict(types.method_arguments(one)) for types in self._python_types]
-        arguments = tuple(
-            self._argument(parameter, typed, comment, None) for parameter in one.inputs
+        return Call(
+            name=f"{record.name}_{one.name}",
+            method_of=record.name,
+            prototype="",
+            comment=comment,
+            arguments=tuple(
+                self._argument(parameter, typed, comment, None) for parameter in one.inputs
+            ),
+            forms=(tuple(parameter.name for parameter in one.inputs),),
+            results=self._results(one),
+            shape=(),
+            statuses={},
+            ownership=(ownership.of_result(self._known, one),),
+            header="",
         )
-        names = tuple(parameter.name for parameter in one.inputs)
-        results, owned = self._results(one), (ownership.of_result(self._known, one),)
-        return Call(name, record.name, "", comment, arguments, (names,), results, (), {}, owned, "")
 
     def _arguments(
         self, function: Function, comment: Comment, header: Optional[Header]

@@ -8,7 +8,7 @@ below, larger: there the highest bit of a byte stands on the left, as in the doc
 import re
 from dataclasses import dataclass
 from html import escape
-from typing import Iterator, List, Sequence
+from typing import Iterator, List, Optional, Sequence
 
 from segments import Segment, Shape, segments
 
@@ -99,11 +99,11 @@ def _row(pieces: Sequence[_Piece], top: float) -> Iterator[str]:
             yield _label(x, top, width, ROW, piece.segment.name, piece.segment.type)
 
 
-def _labelled(segment: Segment) -> _Piece:
+def _labelled(segment: Segment) -> Optional[_Piece]:
     """The piece of a segment that bears its name: the longest one, or none if a cut row does."""
     first, last = segment.start // BYTES, (segment.end - 1) // BYTES
     if last - first >= _LONGEST:
-        return _Piece(segment, -1, -1)
+        return None
     pieces = [
         _Piece(segment, max(segment.start, row * BYTES), min(segment.end, (row + 1) * BYTES))
         for row in range(first, last + 1)
@@ -162,9 +162,9 @@ def _lane_box(segment: Segment, shape: Shape, y: float, width: float) -> Iterato
         said = f"{shape.place.bits} {'bits' if shape.place.bits > 1 else 'bit'}"
     left, wide = GUTTER + x * width, (end - first) * width
     yield _box(shape.kind, left, y, wide, LANE - 4, f"{shape.name}: {shape.type}")
-    if wide >= 7 * len(shape.name) or wide > 300:
-        yield _label(left, y, wide, LANE - 4, shape.name, said)
-    elif left + wide + 8 * (len(shape.name) + len(said)) < WIDTH and not shape.place.bits:
+    is_narrow = wide < 7 * len(shape.name) and wide <= 300
+    has_room_beside = left + wide + 8 * (len(shape.name) + len(said)) < WIDTH
+    if is_narrow and has_room_beside and not shape.place.bits:
         yield (
             f'<text class="name" x="{left + wide + 8:g}" y="{y + LANE / 2 + 2:g}" '
             f'font-size="12">{escape(shape.name)}<tspan class="type" dx="8" font-size="11">'
