@@ -26,6 +26,15 @@ namespace {
 using store::PropertyOwner;
 using store::Transaction;
 
+template <typename Range, typename Describe>
+Json described_each(Range const &range, Describe const &describe) {
+  Json list = Json::array();
+  for (auto const &item : range) {
+    list.push_back(describe(item));
+  }
+  return list;
+}
+
 double seconds(ClockTime time) {
   return static_cast<double>(time.count()) / 1000;
 }
@@ -49,18 +58,18 @@ Json described_uplink(Transaction &work, store::Uplink const &uplink) {
   return described;
 }
 
+Json described_address(VSMACEntry const &entry) {
+  VSMACAddrType const type = entry.macAddrType;
+  return {{"mac", mac_text(std::as_bytes(std::span(entry.macAddress)))},
+          {"vlan", qex_VlanID{entry.vid}},
+          {"vni", qex_uint32{entry.vni}},
+          {"type", described_choice(type, kAddressTypes)},
+          {"ages", entry.aging != 0},
+          {"age", qex_uint32{entry.elapsed}}};
+}
+
 Json described_addresses(Transaction &work, Place const &place) {
-  Json list = Json::array();
-  for (auto const &entry : dataplane::addresses(work, place, VS_MAC_ADDR_TYPE_ALL)) {
-    VSMACAddrType const type = entry.macAddrType;
-    list.push_back({{"mac", mac_text(std::as_bytes(std::span(entry.macAddress)))},
-                    {"vlan", qex_VlanID{entry.vid}},
-                    {"vni", qex_uint32{entry.vni}},
-                    {"type", described_choice(type, kAddressTypes)},
-                    {"ages", entry.aging != 0},
-                    {"age", qex_uint32{entry.elapsed}}});
-  }
-  return list;
+  return described_each(dataplane::addresses(work, place, VS_MAC_ADDR_TYPE_ALL), described_address);
 }
 
 Json described_groups(Transaction &work, store::PortNumber port) {
@@ -68,14 +77,10 @@ Json described_groups(Transaction &work, store::PortNumber port) {
   for (auto const length : {6, 4, 16}) {
     for (auto const &address : dataplane::groups(work, port, static_cast<std::size_t>(length))) {
       auto const group = *dataplane::group(work, port, address);
-      Json sources = Json::array();
-      for (auto const &source : group.sources) {
-        sources.push_back(address_text(source));
-      }
       list.push_back({{"address", address_text(address)},
                       {"version", group.version},
                       {"source_mode", described_choice(group.source_mode, kSourceModes)},
-                      {"sources", sources},
+                      {"sources", described_each(group.sources, address_text)},
                       {"vni", group.vni},
                       {"observed", {{"updated", seconds(group.updated)}}}});
     }
@@ -141,6 +146,30 @@ Json described_uplink_port(Transaction &work, store::Port const &port) {
   return described;
 }
 
+Json described_uplink_ports(Transaction &work, store::SwitchKey key) {
+  return described_each(store::uplink_ports_of(work, key),
+                        [&](store::Port const &port) { return described_uplink_port(work, port); });
+}
+
+Json described_lag(Lag const &lag) {
+  return {
+      {"name", lag.name},
+      {"uplinks", described_each(lag.members, [](auto const &member) { return member.uplink; })},
+      {"observed", {{"id", lag.id}, {"up", lag.up()}}}};
+}
+
+Json described_ports(Transaction &work, store::SwitchKey key) {
+  auto const own = dataplane::own_teamings(work, key);
+  dataplane::Carriers const carriers(dataplane::team_of(work, key), own);
+  Json list = Json::array();
+  for (auto const &port : store::ports_of(work, key)) {
+    if (port.kind == store::PortKind::client) {
+      list.push_back(described_port(work, port, carriers));
+    }
+  }
+  return list;
+}
+
 Json described_session_counters(Transaction &work, store::SwitchKey key) {
   Json sessions = Json::object();
   for (auto const &sid : dataplane::counting_sessions(work, key)) {
@@ -157,37 +186,12 @@ Json described_switch(Transaction &work, store::FoundSwitch const &known) {
                  {"portset", row.portset},       {"max_ports", row.max_ports},
                  {"persistent", row.persistent}, {"version", row.version},
                  {"running", row.associated},    {"mtu", mtu_of(work, row.alias)}};
-  Json uplink_ports = Json::array();
-  for (auto const &port : store::uplink_ports_of(work, key)) {
-    uplink_ports.push_back(described_uplink_port(work, port));
-  }
-  described["uplink_ports"] = std::move(uplink_ports);
-  Json uplinks = Json::array();
-  for (auto const &uplink : store::uplinks_of(work, key)) {
-    uplinks.push_back(uplink.name);
-  }
-  described["uplinks"] = std::move(uplinks);
-  Json lags = Json::array();
-  for (auto const &lag : dataplane::lags_of(work, key)) {
-    Json members = Json::array();
-    for (auto const &member : lag.members) {
-      members.push_back(member.uplink);
-    }
-    lags.push_back({{"name", lag.name},
-                    {"uplinks", members},
-                    {"observed", {{"id", lag.id}, {"up", lag.up()}}}});
-  }
-  described["lags"] = std::move(lags);
+  described["uplink_ports"] = described_uplink_ports(work, key);
+  described["uplinks"] =
+      described_each(store::uplinks_of(work, key), [](auto const &uplink) { return uplink.name; });
+  described["lags"] = described_each(dataplane::lags_of(work, key), described_lag);
   describe_members(described, work, owner, named_of_switch());
-  Json ports = Json::array();
-  auto const own = dataplane::own_teamings(work, key);
-  dataplane::Carriers const carriers(dataplane::team_of(work, key), own);
-  for (auto const &port : store::ports_of(work, key)) {
-    if (port.kind == store::PortKind::client) {
-      ports.push_back(described_port(work, port, carriers));
-    }
-  }
-  described["ports"] = std::move(ports);
+  described["ports"] = described_ports(work, key);
   described["addresses"] = described_addresses(work, {.switch_key = key, .port = std::nullopt});
   described["counters"] = described_counters(work, {.switch_key = key});
   described["mirror_counters"] = described_session_counters(work, key);
@@ -231,26 +235,18 @@ Json described_host(Transaction &transaction) {
   Json host{
       {"clock",
        {{"stopped", clock_is_stopped(transaction)}, {"now", seconds(clock_now(transaction))}}}};
-  Json uplinks = Json::array();
-  for (auto const &uplink : store::all_uplinks(transaction)) {
-    uplinks.push_back(described_uplink(transaction, uplink));
-  }
-  host["uplinks"] = std::move(uplinks);
+  host["uplinks"] = described_each(
+      store::all_uplinks(transaction),
+      [&](store::Uplink const &uplink) { return described_uplink(transaction, uplink); });
   host["runtime_options"] = described_runtime_options(transaction);
   auto const learning = global_mac_learning(transaction);
   host["mac_learning"] = {{"aging_time", qex_uint32{learning.agingTime}},
                           {"limit", qex_uint32{learning.macLimit}},
                           {"learn_static", learning.learnStatic != 0}};
-  Json switches = Json::array();
-  for (auto const &known : store::all_switches(transaction)) {
-    switches.push_back(described_switch(transaction, known));
-  }
-  host["switches"] = std::move(switches);
-  Json faults = Json::array();
-  for (auto const &waiting : waiting_faults(transaction)) {
-    faults.push_back(described_fault(waiting));
-  }
-  host["faults"] = std::move(faults);
+  host["switches"] = described_each(
+      store::all_switches(transaction),
+      [&](store::FoundSwitch const &known) { return described_switch(transaction, known); });
+  host["faults"] = described_each(waiting_faults(transaction), described_fault);
   return host;
 }
 

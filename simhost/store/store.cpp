@@ -109,15 +109,14 @@ std::vector<std::byte> Query::bytes(int column) const {
 }
 
 Store::Store(std::optional<std::filesystem::path> const &file, Furnish const &furnish) try
-    : in_memory_(!file.has_value()),
-      database_(file ? file->string() : std::string(":memory:"),
+    : database_(file ? file->string() : std::string(":memory:"),
                 SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE,
                 static_cast<int>(std::chrono::milliseconds(kPatience).count())) {
   database_.exec("PRAGMA foreign_keys = ON");
-  if (in_memory_) {
-    create_if_blank(furnish);
-  } else {
+  if (file) {
     prepare_file(furnish);
+  } else {
+    create_if_blank(furnish);
   }
 } catch (UnusableState const &error) {
   refuse_file(file.value_or(":memory:"), error.what());

@@ -67,8 +67,6 @@ class Store {
   /// locked.
   Store(std::optional<std::filesystem::path> const &file, Furnish const &furnish);
 
-  [[nodiscard]] bool in_memory() const { return in_memory_; }
-
  private:
   friend class Transaction;
 
@@ -76,7 +74,6 @@ class Store {
   void create_if_blank(Furnish const &furnish);
   SQLite::Statement &prepared(std::string_view sql);
 
-  bool in_memory_;
   SQLite::Database database_;
   std::map<std::string_view, SQLite::Statement> statements_;
 };
