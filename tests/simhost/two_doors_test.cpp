@@ -107,35 +107,44 @@ std::function<Bytes()> handed_out(Get get, SizeOf size_of) {
   };
 }
 
-std::vector<Doors> all_doors() {
-  using std::placeholders::_1;
-  auto const s = [](auto call) { return [call](auto... more) { return call("s", more...); }; };
-  auto const p = [](auto call) { return [call](auto... more) { return call("s", "p", more...); }; };
-  auto const by_address = [](auto call) {
-    return [call](auto const &record) { return call(&record); };
-  };
+template <typename Call>
+auto on_switch(Call call) {
+  return [call](auto... more) { return call("s", more...); };
+}
+
+template <typename Call>
+auto on_port(Call call) {
+  return [call](auto... more) { return call("s", "p", more...); };
+}
+
+template <typename Call>
+auto by_address(Call call) {
+  return [call](auto const &record) { return call(&record); };
+}
+
+Doors learning_doors() {
   VSMACLearning learning{};
   learning.agingTime = 60;
   learning.macLimit = 10;
-  VSMACLearning other_learning = learning;
-  other_learning.learnStatic = 1;
-  VSPMACManagement management{};
-  management.portMACLearning.learning = 1;
-  management.portMACLearning.macLimit = 8;
-  VSPMACManagement other_management = management;
-  other_management.portMACLearning.macLimitPolicy = VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP;
+  VSMACLearning other = learning;
+  other.learnStatic = 1;
+  return {VSPROP_SWITCH_MAC_LEARNING,
+          false,
+          {bytes_of(learning), bytes_of(other)},
+          setter<VSMACLearning>(by_address(on_switch(VSDVS_SetMACLearning))),
+          getter<VSMACLearning>(on_switch(VSDVS_GetMACLearning))};
+}
+
+Doors private_vlan_doors() {
   VSPvlanMapEntry const promiscuous{
       .primaryVID = 10, .secondaryVID = 10, .pvlanType = VSPORT_PVLAN_TYPE_PROMISC, .pad = {}};
   VSPvlanMapEntry const isolated{
       .primaryVID = 10, .secondaryVID = 11, .pvlanType = VSPORT_PVLAN_TYPE_ISOLATED, .pad = {}};
-  VSPropSecurity const security{.flags = VSPORT_SECURITY_DISALLOW_PROMISC};
-  VSPropSecurity const other_security{.flags = VSPORT_SECURITY_DISALLOW_FORGED_SRC};
-
-  auto const map_set = [](Bytes const &bytes) {
+  auto const set = [](Bytes const &bytes) {
     return VSDVS_SetPrivateVLANMap("s", reinterpret_cast<VSPvlanMapEntry const *>(bytes.data()),
                                    static_cast<int>(bytes.size() / sizeof(VSPvlanMapEntry)));
   };
-  auto const map_get = [] {
+  auto const get = [] {
     VSPvlanMapEntry *entries = nullptr;
     int count = 0;
     EXPECT_EQ(VSDVS_GetPrivateVLANMap("s", &entries, &count), QEX_OK);
@@ -144,15 +153,41 @@ std::vector<Doors> all_doors() {
     VSDVS_FreeMemory(entries);
     return bytes;
   };
-  auto const override_set = [](Bytes const &bytes) {
+  return {VSPROP_PVLAN_MAP,
+          false,
+          {bytes_of(promiscuous) + bytes_of(isolated), bytes_of(promiscuous)},
+          set,
+          get};
+}
+
+Doors security_doors() {
+  VSPropSecurity const security{.flags = VSPORT_SECURITY_DISALLOW_PROMISC};
+  VSPropSecurity const other{.flags = VSPORT_SECURITY_DISALLOW_FORGED_SRC};
+  return {VSPROP_PORT_SECURITY,
+          true,
+          {bytes_of(security), bytes_of(other)},
+          setter<VSPropSecurity>(by_address(on_port(VSDVS_SetPortSecurity))),
+          getter<VSPropSecurity>(on_port(VSDVS_GetPortSecurity))};
+}
+
+Doors override_doors() {
+  auto const set = [](Bytes const &bytes) {
     return VSDVS_SetPortTeamingOverride("s", "p", reinterpret_cast<char const *>(bytes.data()));
   };
-  auto const override_get = [] {
+  auto const get = [] {
     std::array<char, 82> text{};
     EXPECT_EQ(VSDVS_GetPortTeamingOverride("s", "p", text.data()), QEX_OK);
     return bytes_of_text(text.data());
   };
-  auto const vlan_set = [](Bytes const &bytes) {
+  return {VSPROP_PORT_TEAMING_OVERRIDE,
+          true,
+          {bytes_of_text("uplink1"), bytes_of_text("uplink2")},
+          set,
+          get};
+}
+
+Doors vlan_doors() {
+  auto const set = [](Bytes const &bytes) {
     Bytes copy = bytes;
     auto *const policy = reinterpret_cast<VSPortVlanPolicy *>(copy.data());
     auto const has = [&](unsigned flag) {
@@ -162,7 +197,7 @@ std::vector<Doors> all_doors() {
                                    has(VSPORT_VLAN_PVLAN_ENABLED), policy->vidRanges,
                                    policy->numRanges);
   };
-  auto const vlan_get = handed_out<VSPortVlanPolicy>(
+  auto const get = handed_out<VSPortVlanPolicy>(
       [](VSPortVlanPolicy **policy) {
         int priority = 0;
         return VSDVS_GetPortVLANPolicy("s", "p", policy, &priority);
@@ -170,119 +205,127 @@ std::vector<Doors> all_doors() {
       [](VSPortVlanPolicy const &policy) {
         return sizeof policy + (policy.numRanges * sizeof(qex_NEBPortVIDRange));
       });
-  auto const priority_set = [](Bytes const &bytes) {
+  return {VSPROP_PORT_VLAN,
+          true,
+          {vlan_policy(VSPORT_VLAN_GUEST_TAGGING, 0, {{1, 9}, {20, 20}}), vlan_policy(0, 4094, {})},
+          set,
+          get};
+}
+
+Doors priority_doors() {
+  auto const set = [](Bytes const &bytes) {
     return VSDVS_SetPortVLANPolicy("s", "p", 3, as<int>(bytes), 0, 0, nullptr, 0);
   };
-  auto const priority_get = [] {
+  auto const get = [] {
     VSPortVlanPolicy *policy = nullptr;
     int priority = 0;
     EXPECT_EQ(VSDVS_GetPortVLANPolicy("s", "p", &policy, &priority), QEX_OK);
     VSDVS_FreeMemory(policy);
     return bytes_of(priority);
   };
-  auto const mirror_set = [](Bytes const &bytes) {
+  return {VSPROP_PORT_PRIORITY, true, {bytes_of(7), bytes_of(0)}, set, get};
+}
+
+Doors mirror_doors() {
+  auto const set = [](Bytes const &bytes) {
     Bytes copy = bytes;
     EXPECT_EQ(VSDVS_ClearDVMirrorSessions("s", "p"), QEX_OK);
     return VSDVS_AppendDVMirrorSessions("s", "p",
                                         reinterpret_cast<DVMirrorSessionTable *>(copy.data()));
   };
-  auto const mirror_get = handed_out<DVMirrorSessionTable>(
-      p(VSDVS_GetDVMirrorSessions), [](DVMirrorSessionTable const &table) {
+  auto const get = handed_out<DVMirrorSessionTable>(
+      on_port(VSDVS_GetDVMirrorSessions), [](DVMirrorSessionTable const &table) {
         return sizeof table + (table.numSessions * sizeof(DVMirrorSession)) +
                (table.numEntities * sizeof(DVMirrorEntity));
       });
-  auto const port_learning_set = [](Bytes const &bytes) {
-    auto const record = as<VSPMACManagement>(bytes);
-    auto const learning_part = record.portMACLearning;
-    return VSDVS_SetPortMACLearning("s", "p", &learning_part);
+  return {VSPROP_PORT_MIRROR_SESSIONS, true, {mirror_table("one"), mirror_table("two")}, set, get};
+}
+
+Doors port_learning_doors() {
+  VSPMACManagement management{};
+  management.portMACLearning.learning = 1;
+  management.portMACLearning.macLimit = 8;
+  VSPMACManagement other = management;
+  other.portMACLearning.macLimitPolicy = VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP;
+  auto const set = [](Bytes const &bytes) {
+    auto const learning = as<VSPMACManagement>(bytes).portMACLearning;
+    return VSDVS_SetPortMACLearning("s", "p", &learning);
   };
-  auto const port_learning_get = [] {
+  auto const get = [] {
     VSPMACManagement record{};
-    VSPMACLearning learning_part{};
-    EXPECT_EQ(VSDVS_GetPortMACLearning("s", "p", &learning_part), QEX_OK);
-    record.portMACLearning = learning_part;
+    VSPMACLearning learning{};
+    EXPECT_EQ(VSDVS_GetPortMACLearning("s", "p", &learning), QEX_OK);
+    record.portMACLearning = learning;
     return bytes_of(record);
   };
+  return {VSPROP_PORT_MAC_MANAGEMENT, true, {bytes_of(management), bytes_of(other)}, set, get};
+}
 
+std::vector<Doors> doors_of_switch() {
   return {
       {VSPROP_MTU,
        false,
        {bytes_of(qex_uint32{9000}), bytes_of(qex_uint32{1600})},
-       setter<qex_uint32>(s(VSDVS_SetMTU)),
-       getter<qex_uint32>(s(VSDVS_GetMTU))},
+       setter<qex_uint32>(on_switch(VSDVS_SetMTU)),
+       getter<qex_uint32>(on_switch(VSDVS_GetMTU))},
       {VSPROP_SWITCH_TEAMING,
        false,
        {bytes_of(teaming(1)), bytes_of(teaming(4))},
-       setter<VSTeamPolicy>(by_address(s(VSDVS_SetTeamingPolicy))),
-       getter<VSTeamPolicy>(s(VSDVS_GetTeamingPolicy))},
+       setter<VSTeamPolicy>(by_address(on_switch(VSDVS_SetTeamingPolicy))),
+       getter<VSTeamPolicy>(on_switch(VSDVS_GetTeamingPolicy))},
       {VSPROP_SWITCH_TEAMING,
        false,
        {bytes_of(teaming(2)), bytes_of(teaming(3))},
-       setter<VSTeamPolicy>(by_address(s(VSDVS_SetTeamingPolicy))),
+       setter<VSTeamPolicy>(by_address(on_switch(VSDVS_SetTeamingPolicy))),
        getter<VSTeamPolicy>(
            [](VSTeamPolicy *policy) { return VSDVS_GetTeamingPolicyFromDVSID("s-id", policy); })},
-      {VSPROP_SWITCH_MAC_LEARNING,
-       false,
-       {bytes_of(learning), bytes_of(other_learning)},
-       setter<VSMACLearning>(by_address(s(VSDVS_SetMACLearning))),
-       getter<VSMACLearning>(s(VSDVS_GetMACLearning))},
-      {VSPROP_PVLAN_MAP,
-       false,
-       {bytes_of(promiscuous) + bytes_of(isolated), bytes_of(promiscuous)},
-       map_set,
-       map_get},
+      learning_doors(),
+      private_vlan_doors(),
       {VSPROP_MULTICAST_FILTER,
        false,
        {bytes_of(1), bytes_of(2)},
-       setter<VSMcastFilterMode>(s(VSDVS_SetMcastFilterMode)),
-       getter<int>(s(VSDVS_GetMcastFilterMode))},
-      {VSPROP_PORT_SECURITY,
-       true,
-       {bytes_of(security), bytes_of(other_security)},
-       setter<VSPropSecurity>(by_address(p(VSDVS_SetPortSecurity))),
-       getter<VSPropSecurity>(p(VSDVS_GetPortSecurity))},
+       setter<VSMcastFilterMode>(on_switch(VSDVS_SetMcastFilterMode)),
+       getter<int>(on_switch(VSDVS_GetMcastFilterMode))},
+  };
+}
+
+std::vector<Doors> doors_of_port() {
+  return {
+      security_doors(),
       {VSPROP_PORT_TEAMING_POLICY,
        true,
        {bytes_of(teaming(1)), bytes_of(teaming(4))},
-       setter<VSTeamPolicy>(by_address(p(VSDVS_SetPortTeamingPolicy))),
-       getter<VSTeamPolicy>(p(VSDVS_GetPortTeamingPolicy))},
-      {VSPROP_PORT_TEAMING_OVERRIDE,
-       true,
-       {bytes_of_text("uplink1"), bytes_of_text("uplink2")},
-       override_set,
-       override_get},
-      {VSPROP_PORT_VLAN,
-       true,
-       {vlan_policy(VSPORT_VLAN_GUEST_TAGGING, 0, {{1, 9}, {20, 20}}), vlan_policy(0, 4094, {})},
-       vlan_set,
-       vlan_get},
-      {VSPROP_PORT_PRIORITY, true, {bytes_of(7), bytes_of(0)}, priority_set, priority_get},
+       setter<VSTeamPolicy>(by_address(on_port(VSDVS_SetPortTeamingPolicy))),
+       getter<VSTeamPolicy>(on_port(VSDVS_GetPortTeamingPolicy))},
+      override_doors(),
+      vlan_doors(),
+      priority_doors(),
       {VSPROP_PORT_TX_UPLINK,
        true,
        {bytes_of(qex_Bool{1}), bytes_of(qex_Bool{0})},
-       setter<qex_Bool>(p(VSDVS_SetTxUplinkAlways)),
-       getter<qex_Bool>(p(VSDVS_GetTxUplinkAlways))},
+       setter<qex_Bool>(on_port(VSDVS_SetTxUplinkAlways)),
+       getter<qex_Bool>(on_port(VSDVS_GetTxUplinkAlways))},
       {VSPROP_PORT_VLAN_NESTEDTAG,
        true,
        {bytes_of(qex_Bool{1}), bytes_of(qex_Bool{0})},
-       setter<qex_Bool>(p(VSDVS_SetPortNestedVLANTagging)),
-       getter<qex_Bool>(p(VSDVS_GetPortNestedVLANTagging))},
+       setter<qex_Bool>(on_port(VSDVS_SetPortNestedVLANTagging)),
+       getter<qex_Bool>(on_port(VSDVS_GetPortNestedVLANTagging))},
       {VSPROP_PORT_EXTRA_ETH_FRP,
        true,
        {bytes_of(filter(QEX_ETH_FILTER_ALLMULTI)), bytes_of(filter(QEX_ETH_FILTER_SINK))},
-       setter<VSExtraEthFilter>(by_address(p(VSDVS_SetExtraEthFilter))),
-       getter<VSExtraEthFilter>(p(VSDVS_GetExtraEthFilter))},
-      {VSPROP_PORT_MIRROR_SESSIONS,
-       true,
-       {mirror_table("one"), mirror_table("two")},
-       mirror_set,
-       mirror_get},
-      {VSPROP_PORT_MAC_MANAGEMENT,
-       true,
-       {bytes_of(management), bytes_of(other_management)},
-       port_learning_set,
-       port_learning_get},
+       setter<VSExtraEthFilter>(by_address(on_port(VSDVS_SetExtraEthFilter))),
+       getter<VSExtraEthFilter>(on_port(VSDVS_GetExtraEthFilter))},
+      mirror_doors(),
+      port_learning_doors(),
   };
+}
+
+std::vector<Doors> all_doors() {
+  auto all = doors_of_switch();
+  for (auto const &doors : doors_of_port()) {
+    all.push_back(doors);
+  }
+  return all;
 }
 
 using TwoDoors = ConfiguredSwitch;
