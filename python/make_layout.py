@@ -85,11 +85,10 @@ def callbacks(known: Definitions, call: Function) -> List[int]:
     ]
 
 
-def layout(known: Definitions) -> str:
+def of_records(known: Definitions) -> Dict[str, Any]:
     arrays, views, booleans, addresses = readers(known)
     inner = methods(known)
-    calls = [call for call in known.functions if call.name.startswith(("VS", "DVS", "DVP"))]
-    tables: Dict[str, Any] = {
+    return {
         "RECORDS": [one.name for one in known.records.values() if not one.is_inner],
         "WHOLE_RECORDS": [
             one.name
@@ -109,6 +108,12 @@ def layout(known: Definitions) -> str:
             for field in one.fields
             if one.count and field.count == one.count
         },
+    }
+
+
+def of_calls(known: Definitions) -> Dict[str, Any]:
+    calls = [call for call in known.functions if call.name.startswith(("VS", "DVS", "DVP"))]
+    return {
         "CALLS_WITH_OUTPUTS": sorted({call.name for call in calls if call.outputs}),
         "CALLS_WITH_CELLS": {one.name: cells(known, one) for one in calls if cells(known, one)},
         "CALLS_WITH_CALLBACKS": {
@@ -117,6 +122,11 @@ def layout(known: Definitions) -> str:
         "CALLS_WITH_TRUTHS": [
             one.name for one in calls if not one.result.layers and one.result.name == "char"
         ],
+    }
+
+
+def of_types(known: Definitions) -> Dict[str, Any]:
+    return {
         "SCALARS": {
             name: resolved.name
             for name, type_ in known.typedefs.items()
@@ -130,6 +140,10 @@ def layout(known: Definitions) -> str:
             if known.resolve(type_).layers == ("p",) and known.resolve(type_).name == "void"
         ),
     }
+
+
+def layout(known: Definitions) -> str:
+    tables = {**of_records(known), **of_calls(known), **of_types(known)}
     text = '"""Made from the binding definitions."""\n'
     for name, value in tables.items():
         text += f"\n{name} = {pformat(value, width=98)}\n"

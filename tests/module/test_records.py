@@ -182,7 +182,7 @@ def test_what_is_no_integer_is_refused(case: Case, made: Any) -> None:
 @each(case for case in of_kind("plain") if scalars.BOUNDS[case.field.type] == scalars.SIGNED_32)
 def test_beyond_64_bits_minus_one_is_stored_and_the_error_follows(case: Case, made: Any) -> None:
     if DEBUG_INTERPRETER:
-        pytest_child_aborts(case)
+        expect_that_a_child_aborts(case)
         return
     with pytest.raises(SystemError) as caught:
         case.set(made, 2**63)
@@ -190,7 +190,7 @@ def test_beyond_64_bits_minus_one_is_stored_and_the_error_follows(case: Case, ma
     assert case.get(made) == -1
 
 
-def pytest_child_aborts(case: Case) -> None:
+def expect_that_a_child_aborts(case: Case) -> None:
     """To a debug interpreter a result with an error pending is fatal."""
     program = f"import _libvswitch as vs; vs.{case.writer}(vs.new_{case.record.name}(), 2**63)"
     done = subprocess.run([sys.executable, "-c", program], capture_output=True, text=True)
