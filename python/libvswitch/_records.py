@@ -83,7 +83,8 @@ class Record(_Pointing):
     thisown: bool
     __swig_destroy__: ClassVar[Any]
     _fields: ClassVar[Tuple[str, ...]] = ()
-    _views: ClassVar[Tuple[str, ...]] = ()
+    _alternatives: ClassVar[Tuple[str, ...]] = ()
+    """Fields that show the same entries, of which only one at a time holds."""
 
     def __init_subclass__(cls) -> None:
         members = vars(cls)
@@ -102,7 +103,7 @@ class Record(_Pointing):
             if isinstance(member, property) and name != "thisown" and not name.startswith(hidden)
         )
         counts = [_layout.ARRAYS.get(f"{cls.__name__}_{name}", (None,))[-1] for name in cls._fields]
-        cls._views = tuple(
+        cls._alternatives = tuple(
             name
             for name, count in zip(cls._fields, counts)
             if isinstance(count, str) and counts.count(count) > 1
@@ -129,8 +130,8 @@ class Record(_Pointing):
         return f"{type(self).__name__}({', '.join(parts)})"
 
     def _shown(self, name: str) -> str:
-        # One of the views of the same entries is as long as they are; the record knows not which.
-        return "..." if name in self._views else shown(getattr(self, name))
+        # Only one is as long as the entries are, and the record knows not which.
+        return "..." if name in self._alternatives else shown(getattr(self, name))
 
     def __copy__(self) -> "Record":
         """The same bytes in a record of the caller's own, where these are all of the record."""
