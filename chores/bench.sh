@@ -8,9 +8,9 @@
 #   --quick   a short run, to see that all works: its figures are rough, and it leaves out what is
 #             measured of whole modules
 #
-# Prints tables of ratios, and what the simulated host does in a second; leaves results.json, calls.svg,
-# host.json and host_curve.svg in build/bench/. bench/README.md says how it measures and how to read
-# it. On a machine with other work to do it takes longer, and ratios stay ratios.
+# Prints tables of ratios, and what the simulated host does in a second; leaves results.json,
+# calls.svg, host.json and host_curve.svg in build/bench/. bench/README.md says how it measures and
+# how to read it. On a machine with other work to do it takes longer, and ratios stay ratios.
 cmd_bench() {
   quick='' full=surfaces
   case ${1-} in

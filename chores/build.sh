@@ -100,5 +100,6 @@ build_fuzzers() {
 build_peers() {
   configure || return
   step "Building the module and its peers in $folder/"
-  flock "$folder/.lock" nice cmake --build "$folder" --target _libvswitch vswitch nebPublic peers "$@"
+  flock "$folder/.lock" nice cmake --build "$folder" \
+    --target _libvswitch vswitch nebPublic peers "$@"
 }

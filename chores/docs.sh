@@ -5,8 +5,9 @@
 #
 # Usage: ./dev docs
 #
-# The reference is made from the headers' comments and the binding definitions, the layout of records
-# from what the compiler makes of them. A warning is an error, and so is a link that leads nowhere.
+# The reference is made from the headers' comments and the binding definitions, the layout of
+# records from what the compiler makes of them. A warning is an error, and so is a link that leads
+# nowhere.
 cmd_docs() {
   [ $# -eq 0 ] || die "docs takes no options"
   # shellcheck disable=SC2086 # a list of words

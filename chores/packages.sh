@@ -4,7 +4,8 @@
 build_packages='cmake ninja-build g++ swig python3-dev libsqlitecpp-dev libsqlite3-dev libfmt-dev
   nlohmann-json3-dev libcli11-dev'
 docs_packages='python3-sphinx python3-myst-parser furo'
-test_packages="libgtest-dev libgmock-dev python3-pytest python3-hypothesis valgrind nodejs $docs_packages"
+test_packages="libgtest-dev libgmock-dev python3-pytest python3-hypothesis valgrind nodejs
+  $docs_packages"
 fuzz_packages='clang libclang-rt-14-dev'
 lint_packages='clang-format clang-tidy shellcheck black flake8 mypy'
 bench_packages='pybind11-dev python3-cffi cython3'

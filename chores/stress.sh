@@ -6,13 +6,13 @@
 # Usage: ./dev stress [--minutes N] [--seed N] [--python PATH] [--debug-python] [--no-fast-paths]
 #
 #   --minutes N   how long; 20 by default. The sweep of wrong values runs once, with a million calls
-#                 of every kind in the same memory, or fewer if there is less time; fuzzers, sequences
-#                 of calls, killed processes and random pairs of values share what is left
+#                 of every kind in the same memory, or fewer if there is less time; fuzzers,
+#                 sequences of calls, killed processes and random pairs of values share what is left
 #   --seed N      what chance chose in an earlier run, which printed its seed
 #
-# A line for each part says how much it did and what was wrong; the status is 1 if anything was. What
-# a fuzzer learns stays in build-fuzzers/corpus, and the next run goes on from there. tests/README.md
-# says how to run a part by itself.
+# A line for each part says how much it did and what was wrong; the status is 1 if anything was.
+# What a fuzzer learns stays in build-fuzzers/corpus, and the next run goes on from there.
+# tests/README.md says how to run a part by itself.
 cmd_stress() {
   options=
   while [ $# -gt 0 ]; do

@@ -19,8 +19,8 @@ pytest() {
   junit "$title" "$xml" env "$@"
 }
 
-# junit TITLE XML COMMAND...: runs a suite and counts its tests in the report that it leaves. A suite
-# that fails without saying in which test, or leaves no report, is one failure.
+# junit TITLE XML COMMAND...: runs a suite and counts its tests in the report that it leaves. A
+# suite that fails without saying in which test, or leaves no report, is one failure.
 junit() {
   title=$1 xml=$folder/$2
   shift 2

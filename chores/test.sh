@@ -8,8 +8,8 @@
 #        ./dev test --all-pythons [-k EXPRESSION] [-- ARGUMENTS]
 #        ./dev test --packages [ARGUMENTS]
 #
-#   --all-pythons   with each CPython from 3.8 to 3.13 that is in PATH or was put there by pyenv, the
-#                   newest of each version, one after the other in build folders of their own
+#   --all-pythons   with each CPython from 3.8 to 3.13 that is in PATH or was put there by pyenv,
+#                   the newest of each version, one after the other in build folders of their own
 #   --packages      instead of all else what ./dev package makes, installed into empty systems and
 #                   removed again; it takes root's rights. ARGUMENTS are pytest's
 #   -k EXPRESSION   only the Python tests that match: no lint, C++ tests, fuzzers or peers
@@ -23,7 +23,8 @@
 # The Python tests find the module, and those that exist for the tests alone, through PYTHONPATH,
 # and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
 # where LD_LIBRARY_PATH puts the recording host in place of the simulated one; so do those of
-# tests/classes, for once the classes are loaded the flat functions answer instances of them. By hand:
+# tests/classes, for once the classes are loaded the flat functions answer instances of them.
+# By hand:
 #   export BUILD_DIR=$PWD/build PYTHONPATH=$PWD/build/python:$PWD/build/tests/python
 #   /usr/bin/python3 -m pytest tests --ignore=tests/contract --ignore=tests/classes \
 #     --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages
@@ -71,7 +72,7 @@ cmd_test() {
     tally build 0 1
     report
   fi
-  # The tests' own sources are half of all, and the slower half: clang-tidy reads them in ./dev lint.
+  # The tests' own sources are half of all, and the slower half: ./dev lint has clang-tidy read them.
   untidied='^\./tests/'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
@@ -84,8 +85,8 @@ cmd_test() {
     --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages "$@"
   class_tests "$@"
   pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" tests/contract "$@"
-  # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are the
-  # same whatever the module is built for.
+  # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are
+  # the same whatever the module is built for.
   if [ "$folder" != build ]; then
     not_for_this_build "lint, no fast paths, docs, fuzzers, bench"
   else
@@ -170,7 +171,8 @@ lend_pytest() {
 # The newest interpreter of each version; pyenv has folders, and in PATH mere pointers to them.
 all_pythons() {
   for minor in 8 9 10 11 12 13; do
-    for candidate in "$HOME/.pyenv/versions/3.$minor."*/bin/python "$(command -v "python3.$minor")"; do
+    for candidate in "$HOME/.pyenv/versions/3.$minor."*/bin/python \
+      "$(command -v "python3.$minor")"; do
       "$candidate" -c "import sys; sys.exit(sys.version_info[:2] != (3, $minor))" 2>/dev/null &&
         say "$candidate"
     done | sort -V | tail -n 1
