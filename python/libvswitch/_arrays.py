@@ -98,24 +98,16 @@ class Array(_records._Pointing, typing.Sequence[T]):
         ...
 
     def __setitem__(self, index: Any, value: Any) -> None:
-        if isinstance(index, slice):
-            places = range(*index.indices(len(self)))
-            values = list(value)
-            if len(values) != len(places):
-                raise ValueError(f"{len(places)} elements are wanted, not {len(values)}")
-            for at, one in zip(places, values):
-                self[at] = one
+        if not isinstance(index, slice):
+            ctypes.memmove(self._address_of(index), self._bytes_for(value), self.size)
             return
-        address = self._address_of(index)
-        if self._inner and self._element == "char":
-            _memory.put_text(address, self._inner, value)
-        elif self._inner:
-            _memory.put_bytes(address, self._inner, value)
-        elif self._element in _records.CLASSES:
-            ctypes.memmove(address, int(_records.wanted(self._element, value)), self.size)
-        else:
-            number = _memory.checked(self._element, value)
-            _memory.scalar(self._element).from_address(address).value = number
+        places = range(*index.indices(len(self)))
+        # Read before the first is written: a value may be a view of an element here.
+        values = [self._bytes_for(one) for one in value]
+        if len(values) != len(places):
+            raise ValueError(f"{len(places)} elements are wanted, not {len(values)}")
+        for at, held in zip(places, values):
+            ctypes.memmove(self._address_of(at), held, self.size)
 
     def __bytes__(self) -> bytes:
         """The memory of all elements."""
@@ -150,6 +142,16 @@ class Array(_records._Pointing, typing.Sequence[T]):
     def _require(self) -> None:
         if not int(self):
             raise ValueError("this array is gone: its memory was given back")
+
+    def _bytes_for(self, value: Any) -> bytes:
+        """What memory of an element holds for a value."""
+        if self._inner and self._element == "char":
+            return _memory.text_bytes(self._inner, value)
+        if self._inner:
+            return _memory.exact_bytes(self._inner, value)
+        if self._element in _records.CLASSES:
+            return ctypes.string_at(int(_records.wanted(self._element, value)), self.size)
+        return _memory.scalar_bytes(self._element, value)
 
     def _address_of(self, index: int) -> int:
         return self._address + _memory.position(index, len(self)) * self.size

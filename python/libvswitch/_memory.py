@@ -71,21 +71,26 @@ def text_at(address: int, size: int) -> str:
     return held.split(b"\0", 1)[0].decode("utf-8", "surrogateescape")
 
 
-def put_text(address: int, size: int, text: Any) -> None:
+def scalar_bytes(name: str, value: Any) -> bytes:
+    """What memory of a scalar holds for a value."""
+    return bytes(scalar(name)(checked(name, value)))
+
+
+def text_bytes(size: int, text: Any) -> bytes:
     """Text, NUL and zeros to the end of an array of chars; ValueError if it does not fit."""
     if not isinstance(text, str):
         raise TypeError(f"a text is a str, not {type(text).__name__}")
     held = text.encode("utf-8", "surrogateescape")
     if len(held) >= size:
         raise ValueError(f"{text!r} takes more than {size - 1} bytes")
-    ctypes.memmove(address, held.ljust(size, b"\0"), size)
+    return held.ljust(size, b"\0")
 
 
-def put_bytes(address: int, size: int, given: Any) -> None:
+def exact_bytes(size: int, given: Any) -> bytes:
     """As many bytes as there is room for."""
     if not isinstance(given, (bytes, bytearray, memoryview)):
         raise TypeError(f"bytes are wanted, not {type(given).__name__}")
     held = bytes(given)
     if len(held) != size:
         raise ValueError(f"{size} bytes are wanted, not {len(held)}")
-    ctypes.memmove(address, held, size)
+    return held

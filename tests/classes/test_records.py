@@ -242,6 +242,27 @@ def test_arrays_of_texts_bytes_and_records() -> None:
         instances.instanceNames[0] = vs.VSInfo()
 
 
+def test_elements_of_an_array_move_within_it() -> None:
+    ranges = vs.new_vidrangeArray(4)
+    for number, one in enumerate(ranges):
+        one.minVID = number
+    ranges[1:] = ranges[:3]
+    assert [one.minVID for one in ranges] == [0, 0, 1, 2]
+    ranges[::-1] = ranges
+    assert [one.minVID for one in ranges] == [2, 1, 0, 0]
+
+
+def test_of_several_elements_all_are_written_or_none() -> None:
+    ranges = vs.new_vidrangeArray(2)
+    ranges[0].minVID, ranges[1].minVID = 1, 2
+    wrong: Any = [ranges[1], 5]
+    with pytest.raises(TypeError, match="^a qex_NEBPortVIDRange is wanted, not int$"):
+        ranges[:] = wrong
+    with pytest.raises(ValueError, match="^2 elements are wanted, not 1$"):
+        ranges[:] = [ranges[1]]
+    assert [one.minVID for one in ranges] == [1, 2]
+
+
 def test_an_array_without_a_length_gets_one_from_the_caller() -> None:
     options = vs.VSRuntimeOptions(64)
     option = options.get_first_option()
