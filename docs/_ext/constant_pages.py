@@ -24,10 +24,10 @@ class Constants(Described):
             if name not in map(self.catalogue.header_of, self.catalogue.known.records.values()):
                 found += self.more_of(name)
             for family in header.families:
-                found.append(self._family(name, family))
+                found.append(self._family(family))
         return found
 
-    def _family(self, header: str, family: Family) -> nodes.section:
+    def _family(self, family: Family) -> nodes.section:
         title = self.catalogue.title_of(family)
         label = family_label(title)
         section = nodes.section(ids=[label], names=[label])
