@@ -1,7 +1,6 @@
 // One pair of functions per policy; what one of a pair writes, the other reads.
 #include "control/policy_documents.h"
 
-#include <algorithm>
 #include <array>
 #include <cstring>
 

@@ -4,7 +4,6 @@
 // data_plane().
 #pragma once
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <map>

@@ -6,7 +6,6 @@
 #include <algorithm>
 #include <array>
 #include <mutex>
-#include <optional>
 #include <thread>
 
 #include "core/giving_up.h"

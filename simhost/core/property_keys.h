@@ -2,7 +2,6 @@
 // them.
 #pragma once
 
-#include <optional>
 #include <span>
 #include <string_view>
 

@@ -1,7 +1,6 @@
 // Images hold what callers set; what the host derives from it is derived again.
 #include "core/state_images.h"
 
-#include <algorithm>
 #include <string>
 #include <vector>
 

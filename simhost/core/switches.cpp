@@ -5,7 +5,6 @@
 #include <array>
 #include <cstdio>
 #include <random>
-#include <span>
 #include <string>
 
 #include "core/giving_up.h"

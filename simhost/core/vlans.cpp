@@ -3,7 +3,6 @@
 
 #include <algorithm>
 #include <limits>
-#include <map>
 #include <set>
 
 #include "core/giving_up.h"

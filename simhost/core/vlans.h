@@ -2,8 +2,6 @@
 #pragma once
 
 #include <span>
-#include <string_view>
-#include <vector>
 
 #include "core/api.h"
 #include "core/bytes.h"

@@ -1,9 +1,7 @@
 // DVS_*: what handles of switches and ports designate.
-#include <optional>
-#include <string>
 
-#include "core/boundary.h"
 #include "core/handles.h"
+#include "core/boundary.h"
 #include "core/live_handles.h"
 #include "core/ports.h"
 #include "nebpublic/data.h"

@@ -1,7 +1,6 @@
 // DVSQEX_*: properties by their keys, one by one and as lists.
 #include <array>
 #include <memory>
-#include <string_view>
 
 #include "core/boundary.h"
 #include "core/data_lists.h"

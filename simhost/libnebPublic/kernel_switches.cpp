@@ -1,6 +1,5 @@
 // DVSQEX_*: the kernel's switches.
 #include <algorithm>
-#include <vector>
 
 #include "core/boundary.h"
 #include "core/ledger.h"

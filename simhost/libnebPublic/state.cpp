@@ -3,7 +3,6 @@
 // may call the host, change what is walked over, or jump.
 #include "nebpublic/state.h"
 
-#include <optional>
 #include <string_view>
 
 #include "core/boundary.h"

@@ -1,5 +1,4 @@
 // VSDVS_*: the uplink ports of switches.
-#include <vector>
 
 #include "core/ports.h"
 #include "core/targets.h"

@@ -1,6 +1,4 @@
 // VSQEX_*: multicast filters.
-#include <algorithm>
-#include <cstring>
 #include <vector>
 
 #include "core/data_plane.h"

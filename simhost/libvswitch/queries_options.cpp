@@ -1,5 +1,4 @@
 // VSQEX_*: the runtime options of the host.
-#include <array>
 #include <cstring>
 #include <numeric>
 #include <vector>

@@ -6,7 +6,6 @@
 
 #include <chrono>
 #include <thread>
-#include <utility>
 
 #include "store/schema.h"
 

@@ -11,9 +11,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
-#include <span>
 #include <string>
-#include <vector>
 
 /// Where inputs come from: numbers from the end, bytes from the front.
 using Input = FuzzedDataProvider;

@@ -1,7 +1,6 @@
 // Properties through the raw door: each is set as it is or refused, and the host still describes
 // itself, writes its state, and answers for its ports.
 
-#include <array>
 #include <string>
 
 #include "core/known.h"

@@ -1,7 +1,7 @@
 // Images of the state and of a port: read back whole or refused, whatever their bytes are, and read
 // back the same when the host wrote them.
 
-#include <array>
+#include <span>
 #include <string>
 #include <vector>
 

@@ -7,7 +7,6 @@
 #include <cstdlib>
 #include <cstring>
 #include <optional>
-#include <string>
 #include <string_view>
 #include <type_traits>
 #include <vector>

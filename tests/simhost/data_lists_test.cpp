@@ -7,7 +7,6 @@
 #include <array>
 #include <cstdlib>
 #include <string>
-#include <vector>
 
 #include "address_text.h"
 #include "configured_switch.h"

@@ -3,9 +3,7 @@
 
 #include <gmock/gmock.h>
 
-#include <array>
 #include <cstring>
-#include <string>
 #include <vector>
 
 #include "core/host_settings.h"

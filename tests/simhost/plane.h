@@ -2,10 +2,7 @@
 // 1000 seconds.
 #pragma once
 
-#include <array>
 #include <chrono>
-#include <string>
-#include <vector>
 
 #include "core/clock.h"
 #include "core/data_plane.h"

@@ -2,7 +2,6 @@
 #include "core/properties.h"
 
 #include <cstdint>
-#include <cstring>
 #include <vector>
 
 #include "core/switches.h"

@@ -5,11 +5,8 @@
 #include <gtest/gtest.h>
 
 #include <array>
-#include <chrono>
 #include <cstddef>
-#include <cstdlib>
 #include <cstring>
-#include <string>
 #include <vector>
 
 #include "queried_host.h"

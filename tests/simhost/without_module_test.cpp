@@ -1,7 +1,6 @@
 // The host in a process without the module: nothing can be raised, so giving up ends the process.
 #include <gtest/gtest.h>
 
-#include <array>
 #include <csignal>
 #include <cstdlib>
 
