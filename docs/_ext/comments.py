@@ -53,19 +53,18 @@ _LISTED = re.compile(r"^- (?P<status>\w*) ?(?P<when>.*(?:\n(?!- ).+)*)\n?", re.M
 
 def parted(comment: str) -> Comment:
     """Takes an undecorated comment apart."""
-    first, *commands = re.split(r"^@(?=\w)", comment, flags=re.MULTILINE)
+    first, *commands = re.split(r"^@(\w+)\s*", comment, flags=re.MULTILINE)
     parameters: Dict[str, str] = {}
     text, returns = first.strip(), ""
-    for command in commands:
-        kind, _, rest = command.partition(" ")
-        rest = re.sub(r"\s*\n\s*", " ", rest.strip()) if kind != "file" else command[4:].strip()
-        name, _, meaning = rest.partition(" ")
-        if kind.strip().startswith("file"):
-            text = f"{text}\n\n{command[4:].strip()}".strip()
+    for kind, rest in zip(commands[::2], commands[1::2]):
+        line = re.sub(r"\s*\n\s*", " ", rest.strip())
+        if kind == "file":
+            text = f"{text}\n\n{rest.strip()}".strip()
         elif kind == "param":
+            name, _, meaning = line.partition(" ")
             parameters[name] = meaning
-        elif kind in ("return", "returns"):
-            returns = rest
+        elif kind == "return":
+            returns = line
         else:
             raise ValueError(f"unknown command @{kind} in a comment")
     return Comment(_LISTED.sub("", text).strip(), _listed(text), parameters, returns)
