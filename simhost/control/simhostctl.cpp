@@ -65,13 +65,22 @@ int run(CLI::App &app, int count, char **words) {
   }
 }
 
+// A command whose answer was lost, on a full disk say, has not done what it was asked for.
+void write_out() {
+  if (std::fflush(stdout) != 0 || std::ferror(stdout) != 0) {
+    throw simhost::control::Failure("the output cannot be written");
+  }
+}
+
 }  // namespace
 
 int main(int count, char **words) try {
   CLI::App app("Looks at a simulated host and changes it, while other processes use it.",
                "simhostctl");
   add_commands(app);
-  return run(app, count, words);
+  int const status = run(app, count, words);
+  write_out();
+  return status;
 } catch (std::exception const &error) {
   std::fprintf(stderr, "simhostctl: %s\n", error.what());
   return 1;

@@ -302,6 +302,20 @@ print("simhostctl", simhost.simhost_version().decode())
     assert re.fullmatch(r"simhostctl \d+\.\d+\.\d+\n", of_the_library)
 
 
+@pytest.mark.parametrize("words", ["show", "calls", "clock show", "--help", "--version"])
+def test_says_that_an_answer_cannot_be_written(host: Host, words: str) -> None:
+    with open("/dev/full", "wb") as full:
+        done = subprocess.run(
+            [SIMHOST / "simhostctl", *words.split()],
+            env=host.environment,
+            stdout=full,
+            stderr=subprocess.PIPE,
+            text=True,
+        )
+    assert done.returncode == 1
+    assert done.stderr == "simhostctl: the output cannot be written\n"
+
+
 COMMANDS = (
     *("show", "apply", "link", "uplink", "learn", "counter", "clock", "restart", "reset", "fault"),
     *("calls", "clock show", "clock stop", "clock run", "clock step", "clock set"),
