@@ -4,8 +4,8 @@
     stress.py [--minutes N] [--seed N]
 
 First what has an end: every batch of the sweep, then a million calls of every kind and giving up a
-million times on each call, fewer in less than twenty minutes. What has none shares the time
-that is left: fuzzers, sequences, killed processes and random pairs of values.
+million times on each call, fewer in less than twenty minutes. What has none shares the time that
+is left: fuzzers, sequences, killed processes and random pairs of values.
 """
 
 import argparse
@@ -126,6 +126,11 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
     )
 
 
+def _clock(seconds: float) -> str:
+    """Minutes and seconds."""
+    return f"{int(seconds) // 60}:{int(seconds) % 60:02}"
+
+
 class Progress:
     """Says what runs: in one line of a terminal, else in a line for each part."""
 
@@ -158,8 +163,8 @@ class Progress:
             print(self._line(), flush=True)
 
     def _line(self) -> str:
-        passed = int(time.monotonic() - self._start)
-        return f"{passed // 60:3}:{passed % 60:02} of {self._minutes:g}:00  {self._text}"
+        passed = _clock(time.monotonic() - self._start)
+        return f"{passed:>6} of {_clock(self._minutes * 60)}  {self._text}"
 
     def _draw_again(self) -> None:
         while not self._over.wait(0.5):
@@ -170,14 +175,14 @@ def run_all(seed: int, minutes: float, progress: Progress) -> List[Result]:
     results: List[Result] = []
     end = time.monotonic() + minutes * 60
     with tempfile.TemporaryDirectory() as folder:
-        left, shares = 0.0, 0.0
+        shares = 0.0
         for part in parts(seed, minutes, Path(folder)):
             wrong = sum(len(result.wrong) for result in results)
             progress.show(part.name + (f" ({wrong} wrong so far)" if wrong else ""))
             if part.share:
                 # What one takes too much or leaves, those behind it share.
-                left, shares = end - time.monotonic(), shares or 1.0
-                seconds = max(1.0, left * part.share / shares)
+                shares = shares or 1.0
+                seconds = max(1.0, (end - time.monotonic()) * part.share / shares)
                 shares -= part.share
             else:
                 seconds = 0.0

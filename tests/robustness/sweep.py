@@ -201,7 +201,7 @@ def pointer_objects(values: List[Value]) -> Iterator[Optional[Trial]]:
     yield Trial("pointer: class changed", lambda: setattr(made(), "__class__", object))
 
 
-def chains(values: List[Value]) -> Iterator[Optional[Trial]]:
+def chains() -> Iterator[Optional[Trial]]:
     """Pointer objects appended to each other, used and dropped."""
     name, address = _views()
 
@@ -284,7 +284,7 @@ def trials(batch: str, seed: int, seconds: float) -> Iterator[Optional[Trial]]:
     if batch == "registration":
         return registrations(values + pool.classes())
     if batch == "pointers":
-        return itertools.chain(pointer_objects(values), chains(values), variables(values))
+        return itertools.chain(pointer_objects(values), chains(), variables(values))
     if batch == "counts":
         return each_count(every.ALL)
     if batch == "planted":
