@@ -109,10 +109,12 @@ enum { kShortText = 32 };
  * is longer than that.
  */
 static inline char *copy_short_text(PyObject *object, char frame[kShortText]) {
+  // NOLINTBEGIN(modernize-use-nullptr): to C, NULL is the only null
   char const *text = NULL;
   size_t length = 0;
   bool const has_head = FAST_PATHS && sizeof(PyASCIIObject) >= kShortText;
   if (!has_head || !is_ascii_text(object, &text, &length) || length >= kShortText) return NULL;
+  // NOLINTEND(modernize-use-nullptr)
   memcpy(frame, text + length + 1 - kShortText, kShortText);
   return frame + kShortText - 1 - length;
 }
