@@ -243,18 +243,16 @@ def test_the_doctor_makes_no_host(tmp_path: Path, monkeypatch: pytest.MonkeyPatc
 
 def test_a_reader_that_leaves_early() -> None:
     environment = {**os.environ, "PYTHONPATH": str(FOLDER)}
-    done = subprocess.Popen(
-        [sys.executable, "-m", "libvswitch.doctor"],
-        cwd="/",
-        env=environment,
-        stdout=subprocess.PIPE,
-        stderr=subprocess.PIPE,
-    )
-    assert done.stdout is not None and done.stderr is not None
-    done.stdout.close()
-    assert done.stderr.read() == b""
-    done.stderr.close()
-    assert done.wait() == 1
+    command = [sys.executable, "-m", "libvswitch.doctor"]
+    reader, pipe = os.pipe()
+    os.close(reader)
+    try:
+        done = subprocess.run(
+            command, cwd="/", env=environment, stdout=pipe, stderr=subprocess.PIPE
+        )
+    finally:
+        os.close(pipe)
+    assert (done.returncode, done.stderr) == (1, b"")
 
 
 @pytest.mark.parametrize("words", [[], ["--json"], ["--help"]])
