@@ -4,17 +4,24 @@
 
 %module _libvswitch
 
-// The frame: how calls are made and how values cross. Each file states what must stand before it.
-%include "frame/runtime.i"
-%include "frame/pointer_objects.i"
-%include "frame/pointers.i"
-%include "frame/call_trap.i"
-%include "frame/scalars.i"
-%include "frame/texts.i"
-%include "frame/records.i"
-%include "frame/arrays.i"
-%include "frame/results.i"
-%include "frame/constants.i"
+// The frame: what of the generator's runtime is mended and what is made faster, then how values cross.
+// Each file states what must stand before it.
+%include "frame/fixes/startup.i"
+%include "frame/fixes/overloads.i"
+%include "frame/fixes/pointer_objects.i"
+%include "frame/speed/argument_counts.i"
+%include "frame/speed/pointer_objects.i"
+%include "frame/speed/memory.i"
+%include "frame/speed/results.i"
+%include "frame/typemaps/failures.i"
+%include "frame/typemaps/call_trap.i"
+%include "frame/typemaps/pointers.i"
+%include "frame/typemaps/scalars.i"
+%include "frame/typemaps/texts.i"
+%include "frame/typemaps/records.i"
+%include "frame/typemaps/arrays.i"
+%include "frame/typemaps/results.i"
+%include "frame/typemaps/constants.i"
 
 // The host kernel interface: scalars, names, management, packets, links, ports.
 %include "records/types.i"

@@ -1,7 +1,7 @@
 // Pointer objects and the classes that shadow them, where the runtime trusts what a program may hand
 // it: it looks behind every `this` without end, and takes any object for a pointer object, any
 // attribute for a destructor, any chain of pointers for a short one.
-// Stands before pointers.i, which converts through this.
+// Stands before the typemaps, which convert through this.
 
 // Before the runtime, which calls these; they are defined behind it.
 %begin %{

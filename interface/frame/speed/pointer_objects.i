@@ -1,6 +1,6 @@
-// Pointer objects and result lists, made and read the short way where the long one would do the same.
-// Stands before everything that generates a wrapper. The runtime's own functions stay behind each of
-// these: for classes, for casts between modules, and for interpreters without the fast paths.
+// Pointer objects, made and read the short way where the long one would do the same. The runtime's own
+// functions do the rest: classes, casts between modules, interpreters without the fast paths.
+// Stands before everything that generates a wrapper.
 
 // Pointer objects come and go with every record that a call answers, so a few are kept.
 %begin %{
@@ -71,28 +71,6 @@ static inline void *raw_pointer(PyObject *object, swig_type_info *type, int flag
   return NULL;
 }
 
-/* What an argument without a pointer answers, for null is one. */
-static char no_pointer;
-#define NO_POINTER ((void *)&no_pointer)
-
-/* The pointer in an argument, or NO_POINTER with an error. */
-static void *read_pointer(PyObject *object, swig_type_info *type, int flags, char const *method,
-                          int position, char const *spelling) {
-  void *pointer = NULL;
-  if (SWIG_IsOK(SWIG_ConvertPtr(object, &pointer, type, flags))) return pointer;
-  report_argument(kWrongType, method, position, spelling);
-  return NO_POINTER;
-}
-
-/* Likewise of a method's own record, which most need. */
-static void *read_record(PyObject *object, swig_type_info *type, int flags, char const *method,
-                         int position, char const *spelling) {
-  void *record = read_pointer(object, type, flags, method, position, spelling);
-  if (record || accepts_null_record(method)) return record;
-  report_null_argument(method, position, spelling);
-  return NO_POINTER;
-}
-
 #if FAST_PATHS
 static inline PyObject *kept_pointer(void *pointer, swig_type_info *type, int own) {
   SwigPyObject *raw = (SwigPyObject *)revived(*--kept.end);
@@ -121,38 +99,6 @@ static inline PyObject *new_record(void *record, swig_type_info *type) {
 #endif
   return SWIG_NewPointerObj(record, type, SWIG_POINTER_NEW);
 }
-
-/* Zero-filled memory for a record. The allocator keeps small blocks at hand, but not for calloc; the
- * compiler, which would make the two calls that one again, is kept from seeing that they belong
- * together. */
-static inline void *allocate_zeroed(size_t size) {
-  void *memory = malloc(size);
-  __asm__("" : "+r"(memory), "+r"(size));
-  return memory ? memset(memory, 0, size) : NULL;
-}
-#undef calloc
-#define calloc(one, size) allocate_zeroed((one) * (size))
-
-/* A status and its first output are a list from the start. */
-static PyObject *append_output(PyObject *result, PyObject *output) {
-  PyObject *list = NULL;
-  if (!output) {
-    Py_XDECREF(result);
-    return NULL;
-  }
-  if (result == Py_None || PyList_Check(result)) return SWIG_Python_AppendOutput(result, output);
-  list = PyList_New(2);
-  if (!list) {
-    Py_DECREF(result);
-    Py_DECREF(output);
-    return NULL;
-  }
-  PyList_SET_ITEM(list, 0, result);
-  PyList_SET_ITEM(list, 1, output);
-  return list;
-}
-#undef SWIG_AppendOutput
-#define SWIG_Python_AppendOutput append_output
 %}
 
 %init %{

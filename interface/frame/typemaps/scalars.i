@@ -1,6 +1,10 @@
 // Scalars: integers and bytes by the converters of helpers/conversions.h.
 // Stands before every function with a scalar argument.
 
+%{
+#include "helpers/fast_paths.h"
+%}
+
 %define %scalar(TYPE, READ)
 %typemap(in, noblock=1) TYPE (TYPE value) {
   if (!READ($input, &value, "$symname", $argnum, "$ltype")) SWIG_fail;

@@ -3,6 +3,8 @@
 
 // What is no str may be a `char *` object, which is handed on as it is; None is null.
 %{
+#include "helpers/fast_paths.h"
+
 SWIGINTERN int text_from_pointer(PyObject *object, char **text) {
   static swig_type_info *type = NULL;
   void *pointer = NULL;

@@ -10,23 +10,6 @@
 //
 // Stands before the headers; each line before the header of its record.
 
-// A pointer object of the right type, or None. A writer of a pointer takes over what the object owns.
-%define %pointer_argument(PARAMETER, READ)
-%typemap(in, noblock=1) PARAMETER {
-  $1 = ($ltype)raw_pointer($input, $descriptor, $disown);
-  if (!$1) {
-    $1 = ($ltype)READ($input, $descriptor, $disown, "$symname", $argnum, "$type");
-    if ((void *)$1 == NO_POINTER) SWIG_fail;
-  }
-}
-%enddef
-%pointer_argument(SWIGTYPE *, read_pointer)
-%pointer_argument(SWIGTYPE *self, read_record)
-%typemap(in) SWIGTYPE [] = SWIGTYPE *;
-%typemap(in, noblock=1) void * {
-  if (!SWIG_IsOK(SWIG_ConvertPtr($input, &$1, 0, $disown))) %bad_argument(kWrongType, "$type");
-}
-
 // Constructors answer the raw pointer object, whatever class is registered: the class wraps it.
 %define %raw_result_of_constructor(NAME, TYPE)
 %typemap(out, noblock=1) TYPE *NAME {
