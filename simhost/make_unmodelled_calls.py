@@ -47,7 +47,7 @@ def main() -> None:
     with open(output_path, "w", encoding="utf-8") as output:
         for header in headers:
             output.write(f'#include "{header}"\n')
-        output.write('\n#include "core/boundary.h"\n#include "core/unmodelled.h"\n\n')
+        output.write('\n#include "abi/boundary.h"\n#include "abi/unmodelled.h"\n\n')
         output.write('using simhost::Call;\n\nextern "C" {\n')
         for function in functions:
             output.write("\n" + definition(*function))

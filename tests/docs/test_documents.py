@@ -61,7 +61,7 @@ def test_a_link_out_of_a_package_would_be_found() -> None:
 
 
 def test_the_simulated_host_brings_its_documents() -> None:
-    expected = {"README.md", "SCENARIOS.md", "python/README.md", "control/default_host.json"}
+    expected = {"README.md", "SCENARIOS.md", "python/README.md", "scenario/default_host.json"}
     assert set(documents_of("libvswitch-simhost")) == expected
 
 

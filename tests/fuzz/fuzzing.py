@@ -38,7 +38,7 @@ def documents() -> List[str]:
     """The scenario documents that there are: the default host, and each example of a key."""
     simhost = ROOT / "simhost"
     examples = MARKDOWN_EXAMPLE.findall((simhost / "SCENARIOS.md").read_text(encoding="utf-8"))
-    return [(simhost / "control" / "default_host.json").read_text(encoding="utf-8"), *examples]
+    return [(simhost / "scenario" / "default_host.json").read_text(encoding="utf-8"), *examples]
 
 
 def vocabulary() -> List[str]:

@@ -2,15 +2,18 @@
 #ifndef TESTS_FUZZ_HOST_H
 #define TESTS_FUZZ_HOST_H
 
-#include "control/scenario.h"
-#include "core/clock.h"
-#include "core/giving_up.h"
-#include "store/store.h"
+#include "base/outcomes.h"
+#include "clock/clock.h"
+#include "planes/stored/stored_plane.h"
+#include "scenario/scenario.h"
+#include "storage/store.h"
 
 /// A switch "s" with two of three uplinks and the ports "p1" and "p2".
-inline simhost::store::Store &shared_host() {
-  static simhost::store::Store store(std::nullopt, [](simhost::store::Transaction &work) {
-    simhost::control::apply(work, R"({
+inline simhost::storage::Store &shared_host() {
+  static simhost::storage::Store store(std::nullopt,
+                                       [](simhost::storage::Transaction &transaction) {
+                                         simhost::run_on(simhost::stored::plane());
+                                         simhost::scenario::apply(transaction, R"({
       "clock": {"stopped": true, "now": 1000},
       "uplinks": [{"name": "nic0"}, {"name": "nic1"}, {"name": "nic2"}],
       "switches": [{
@@ -18,7 +21,7 @@ inline simhost::store::Store &shared_host() {
         "ports": [{"id": "p1"}, {"id": "p2"}]
       }]
     })");
-  });
+                                       });
   return store;
 }
 

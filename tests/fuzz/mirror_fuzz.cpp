@@ -3,9 +3,9 @@
 // Not tried, because nothing checks it: entities that are not in the table, a table whose counts
 // say more than there is.
 
-#include "core/known.h"
-#include "core/mirror_sessions.h"
 #include "helpers/mirror.h"
+#include "model/lookup.h"
+#include "model/mirror/sessions.h"
 #include "tests/fuzz/harness.h"
 #include "tests/fuzz/host.h"
 
@@ -89,19 +89,21 @@ simhost::BytesView bytes_of(Table const &table) {
 
 /// The host takes a table or refuses it; the sessions of one that it took are there, twice over.
 void offer(Table const &table) {
-  simhost::store::Transaction work(shared_host(), simhost::store::Access::write);
-  auto const key = simhost::known_switch(work, "s").key;
-  auto const port = simhost::known_port(work, key, "p1");
-  auto const taken = is_accepted(
-      [&] { simhost::append_mirror_sessions(work, port, simhost::mirror_table_bytes(*table)); });
-  require(!taken || table->numSessions == 0 ||
-              !is_accepted([&] { simhost::append_mirror_sessions(work, port, bytes_of(table)); }),
+  simhost::storage::Transaction transaction(shared_host(), simhost::storage::Access::write);
+  auto const key = simhost::get_switch(transaction, "s").key;
+  auto const port = simhost::get_port(transaction, key, "p1");
+  auto const taken = is_accepted([&] {
+    simhost::append_mirror_sessions(transaction, port, simhost::mirror_table_bytes(*table));
+  });
+  require(!taken || table->numSessions == 0 || !is_accepted([&] {
+    simhost::append_mirror_sessions(transaction, port, bytes_of(table));
+  }),
           "a session is not added twice");
-  auto const kept = Block::of(simhost::mirror_sessions_of(work, port));
+  auto const kept = Block::of(simhost::mirror_sessions_of(transaction, port));
   require(!taken || kept.as<DVMirrorSessionTable>()->numSessions == table->numSessions,
           "the host keeps the sessions that it takes");
   for (qex_uint32 index = 0; taken && index < table->numSessions; ++index) {
-    simhost::remove_mirror_session(work, port,
+    simhost::remove_mirror_session(transaction, port,
                                    mirror_session_at(table.get(), static_cast<int>(index))->sid);
   }
 }

@@ -5,8 +5,8 @@
 #include <array>
 #include <string>
 
-#include "core/bytes.h"
-#include "core/property_keys.h"
+#include "base/bytes.h"
+#include "model/properties/keys.h"
 #include "tests/fuzz/harness.h"
 #include "vswitch/mac_learning.h"
 #include "vswitch/mac_tables.h"

@@ -7,8 +7,8 @@
 #include <variant>
 #include <vector>
 
-#include "core/runtime_options.h"
 #include "helpers/runtime_options.h"
+#include "model/options/runtime_options.h"
 #include "tests/fuzz/host.h"
 #include "tests/fuzz/python.h"
 
@@ -79,13 +79,13 @@ void require_same(std::vector<Option> const &one, std::vector<Option> const &oth
 
 /// What the host is given or hands out: a list in memory of its own size.
 void offer(VSRuntimeOptions const &list) {
-  simhost::store::Transaction work(shared_host(), simhost::store::Access::write);
-  is_accepted([&] { simhost::set_runtime_options(work, list); });
+  simhost::storage::Transaction transaction(shared_host(), simhost::storage::Access::write);
+  is_accepted([&] { simhost::set_runtime_options(transaction, list); });
   std::vector<std::uint16_t> types(VS_NUM_RT_OPT);
   for (std::size_t type = 0; type < types.size(); ++type) {
     types[type] = static_cast<std::uint16_t>(type);
   }
-  auto const answer = Block::of(simhost::packed_runtime_options(work, types));
+  auto const answer = Block::of(simhost::packed_runtime_options(transaction, types));
   require(walked(answer.as<VSRuntimeOptions>()).size() == VS_NUM_RT_OPT,
           "a walk finds all options of the host");
 }

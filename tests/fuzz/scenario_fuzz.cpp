@@ -6,8 +6,8 @@
 #include <string_view>
 #include <vector>
 
-#include "control/lifecycle.h"
-#include "core/host_settings.h"
+#include "model/options/host_settings.h"
+#include "scenario/lifecycle.h"
 #include "tests/fuzz/harness.h"
 #include "tests/fuzz/host.h"
 
@@ -15,13 +15,13 @@ extern "C" std::size_t LLVMFuzzerMutate(std::uint8_t *data, std::size_t size, st
 
 namespace {
 
-using simhost::control::DocumentError;
-using simhost::control::Json;
-using simhost::store::Transaction;
+using simhost::scenario::DocumentError;
+using simhost::scenario::Json;
+using simhost::storage::Transaction;
 
-bool applies(Transaction &work, std::string_view document) {
+bool applies(Transaction &transaction, std::string_view document) {
   try {
-    simhost::control::apply(work, document);
+    simhost::scenario::apply(transaction, document);
     return true;
   } catch (DocumentError const &error) {
     require(std::string_view(error.what()).size() > 2, "what is wrong is said");
@@ -41,8 +41,8 @@ void remove_observed(Json &value) {
 }
 
 /// The host as callers would describe it: without what follows from the rest.
-Json description_of(Transaction &work) {
-  auto described = simhost::control::parsed(simhost::control::description(work));
+Json description_of(Transaction &transaction) {
+  auto described = simhost::scenario::parsed(simhost::scenario::description(transaction));
   remove_observed(described);
   return described;
 }
@@ -128,14 +128,14 @@ extern "C" std::size_t LLVMFuzzerCustomMutator(std::uint8_t *data, std::size_t s
 }
 
 extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size) {
-  Transaction work(shared_host(), simhost::store::Access::write);
-  if (!applies(work, {reinterpret_cast<char const *>(data), size})) {
+  Transaction transaction(shared_host(), simhost::storage::Access::write);
+  if (!applies(transaction, {reinterpret_cast<char const *>(data), size})) {
     return 0;
   }
-  simhost::stop_clock(work);
-  auto const described = description_of(work);
-  simhost::control::empty_host(work);
-  require(applies(work, described.dump()), "the host reads its own description");
-  require(description_of(work) == described, "a host of a description is described alike");
+  simhost::stop_clock(transaction);
+  auto const described = description_of(transaction);
+  simhost::scenario::empty_host(transaction);
+  require(applies(transaction, described.dump()), "the host reads its own description");
+  require(description_of(transaction) == described, "a host of a description is described alike");
   return 0;
 }

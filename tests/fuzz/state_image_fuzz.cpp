@@ -5,11 +5,11 @@
 #include <string>
 #include <vector>
 
-#include "core/codec.h"
-#include "core/data_lists.h"
-#include "core/known.h"
-#include "core/property_keys.h"
-#include "core/state_images.h"
+#include "abi/data_lists.h"
+#include "base/blocks.h"
+#include "model/lookup.h"
+#include "model/properties/keys.h"
+#include "model/state/images.h"
 #include "tests/fuzz/host.h"
 #include "tests/fuzz/properties.h"
 
@@ -20,7 +20,7 @@ using simhost::Bytes;
 using simhost::BytesView;
 using simhost::Extent;
 using simhost::Writer;
-using simhost::store::Transaction;
+using simhost::storage::Transaction;
 
 /// What the header of a block says behind its magic number, format, kind and version.
 constexpr std::size_t kLength = 16;
@@ -116,31 +116,32 @@ Bytes any_bytes(Input &input) {
   return {view.begin(), view.end()};
 }
 
-bool loads(Transaction &work, Block const &image) {
+bool loads(Transaction &transaction, Block const &image) {
   BytesView const view(image.as<std::byte>(), image.size());
-  return is_accepted([&] { simhost::load_state(work, view, Extent::whole); });
+  return is_accepted([&] { simhost::load_state(transaction, view, Extent::whole); });
 }
 
 /// What the host accepts it can describe, and write so that it reads the same again.
 void load(Bytes const &image) {
-  Transaction work(shared_host(), simhost::store::Access::write);
-  if (!loads(work, Block::of(image))) {
+  Transaction transaction(shared_host(), simhost::storage::Access::write);
+  if (!loads(transaction, Block::of(image))) {
     return;
   }
-  simhost::control::description(work);
-  auto const once = simhost::state_image(work, Extent::whole);
-  require(loads(work, Block::of(once)), "the host reads its own image");
-  require(simhost::state_image(work, Extent::whole) == once, "an image is read as it was written");
+  simhost::scenario::description(transaction);
+  auto const once = simhost::state_image(transaction, Extent::whole);
+  require(loads(transaction, Block::of(once)), "the host reads its own image");
+  require(simhost::state_image(transaction, Extent::whole) == once,
+          "an image is read as it was written");
 }
 
 void load_into_port(Bytes const &image) {
-  Transaction work(shared_host(), simhost::store::Access::write);
-  auto const port = simhost::known_port(work, simhost::known_switch(work, "s").key, "p1");
+  Transaction transaction(shared_host(), simhost::storage::Access::write);
+  auto const port = simhost::get_port(transaction, simhost::get_switch(transaction, "s").key, "p1");
   auto const block = Block::of(image);
   BytesView const view(block.as<std::byte>(), block.size());
-  if (is_accepted([&] { simhost::load_port(work, port, view); })) {
-    auto const once = simhost::port_image(work, port, Extent::whole, 200);
-    require(is_accepted([&] { simhost::load_port(work, port, once); }),
+  if (is_accepted([&] { simhost::load_port(transaction, port, view); })) {
+    auto const once = simhost::port_image(transaction, port, Extent::whole, 200);
+    require(is_accepted([&] { simhost::load_port(transaction, port, once); }),
             "the host reads its own image of a port");
   }
 }
@@ -152,7 +153,7 @@ void write_list(Input &input) {
   while (input.remaining_bytes() > 0) {
     auto const name = consume_key(input);
     auto const value = consume_value(input);
-    if (is_accepted([&] { list->update(name, value, simhost::store::PropertyType::runtime); })) {
+    if (is_accepted([&] { list->update(name, value, simhost::storage::PropertyType::runtime); })) {
       std::erase_if(items, [&](auto const &item) { return item.first == name; });
       items.emplace_back(name, value);
     }

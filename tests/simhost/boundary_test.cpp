@@ -10,8 +10,8 @@
 #include <thread>
 #include <vector>
 
+#include "abi/simhost_api/simhost.h"
 #include "address_text.h"
-#include "control/simhost.h"
 #include "nebpublic/data.h"
 #include "nebpublic/kernel_state.h"
 #include "nebpublic/names.h"

@@ -11,7 +11,7 @@
 #include <type_traits>
 #include <vector>
 
-#include "control/simhost.h"
+#include "abi/simhost_api/simhost.h"
 #include "nebpublic/kernel_state.h"
 #include "nebpublic/property_types.h"
 #include "nebpublic/state.h"

@@ -1,5 +1,5 @@
 // The ledger: what is out, what came back, and what should not have come.
-#include "core/ledger.h"
+#include "abi/ledger.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -10,20 +10,20 @@
 #include <vector>
 
 #include "address_text.h"
-#include "core/giving_up.h"
+#include "base/outcomes.h"
 
 namespace {
 
-using simhost::HostPanic;
 using simhost::Ledger;
-using simhost::PanicKind;
+using simhost::TrapKind;
+using simhost::Trapped;
 
 std::string panic_of(Ledger &ledger, void *memory) {
   try {
-    ledger.take_back(memory, "Taker");
+    ledger.release(memory, "Taker");
     return "";
-  } catch (HostPanic const &panic) {
-    EXPECT_EQ(panic.kind(), PanicKind::runtime_error);
+  } catch (Trapped const &panic) {
+    EXPECT_EQ(panic.kind(), TrapKind::runtime_error);
     return panic.what();
   }
 }
@@ -36,25 +36,25 @@ std::string report_of(Ledger const &ledger) {
 
 TEST(Ledger, GivesOutZeroedMemory) {
   Ledger ledger;
-  auto *const block = static_cast<unsigned char *>(ledger.give_out(4096, "Giver"));
+  auto *const block = static_cast<unsigned char *>(ledger.allocate(4096, "Giver"));
   EXPECT_TRUE(std::all_of(block, block + 4096, [](unsigned char byte) { return byte == 0; }));
 }
 
 TEST(Ledger, CountsWhatIsOut) {
   Ledger ledger;
-  auto *const first = ledger.give_out(1, "Giver");
-  auto *const second = ledger.give_out(1, "Giver");
+  auto *const first = ledger.allocate(1, "Giver");
+  auto *const second = ledger.allocate(1, "Giver");
   EXPECT_EQ(ledger.count(), 2U);
-  ledger.take_back(first, "Taker");
+  ledger.release(first, "Taker");
   EXPECT_EQ(ledger.count(), 1U);
-  ledger.take_back(second, "Taker");
+  ledger.release(second, "Taker");
   EXPECT_EQ(ledger.count(), 0U);
 }
 
 TEST(Ledger, TakesNullForNothing) {
   Ledger ledger;
-  ledger.give_out(1, "Giver");
-  ledger.take_back(nullptr, "Taker");
+  ledger.allocate(1, "Giver");
+  ledger.release(nullptr, "Taker");
   EXPECT_EQ(ledger.count(), 1U);
 }
 
@@ -66,15 +66,15 @@ TEST(Ledger, RefusesMemoryOfOthers) {
 
 TEST(Ledger, RefusesTheInsideOfABlock) {
   Ledger ledger;
-  auto *const inside = static_cast<char *>(ledger.give_out(8, "Giver")) + 4;
+  auto *const inside = static_cast<char *>(ledger.allocate(8, "Giver")) + 4;
   EXPECT_EQ(panic_of(ledger, inside), "the host never gave out the memory at " + text_of(inside));
   EXPECT_EQ(ledger.count(), 1U);
 }
 
 TEST(Ledger, NamesBothCallsWhenMemoryComesBackTwice) {
   Ledger ledger;
-  auto *const block = ledger.give_out(8, "Giver");
-  ledger.take_back(block, "FirstTaker");
+  auto *const block = ledger.allocate(8, "Giver");
+  ledger.release(block, "FirstTaker");
   EXPECT_EQ(panic_of(ledger, block), "the memory at " + text_of(block) +
                                          " is given back twice: Giver gave it out, FirstTaker "
                                          "took it back");
@@ -86,15 +86,15 @@ TEST(Ledger, NamesTheLastLifeOfAnAddressThatCameBackToLife) {
   Ledger ledger;
   std::set<void *> first_lives;
   for (int life = 0; life < 4; ++life) {
-    auto *const block = ledger.give_out(kSize, "FirstGiver");
+    auto *const block = ledger.allocate(kSize, "FirstGiver");
     first_lives.insert(block);
-    ledger.take_back(block, "FirstTaker");
+    ledger.release(block, "FirstTaker");
   }
   void *again = nullptr;
   for (int attempt = 0; !first_lives.contains(again); ++attempt) {
     ASSERT_LT(attempt, 1000) << "no address came back, so the case was not reached";
-    again = ledger.give_out(kSize, "SecondGiver");
-    ledger.take_back(again, "SecondTaker");
+    again = ledger.allocate(kSize, "SecondGiver");
+    ledger.release(again, "SecondTaker");
   }
   EXPECT_THAT(panic_of(ledger, again),
               testing::EndsWith("SecondGiver gave it out, SecondTaker took it back"));
@@ -102,10 +102,10 @@ TEST(Ledger, NamesTheLastLifeOfAnAddressThatCameBackToLife) {
 
 TEST(Ledger, ReportsOldestFirst) {
   Ledger ledger;
-  auto *const first = ledger.give_out(80, "VSQEX_GetUplinks");
-  auto *const gone = ledger.give_out(1, "VSQEX_GetUplinks");
-  auto *const last = ledger.give_out(3, "DVSQEX_StateGet");
-  ledger.take_back(gone, "VSQEX_FreeMemory");
+  auto *const first = ledger.allocate(80, "VSQEX_GetUplinks");
+  auto *const gone = ledger.allocate(1, "VSQEX_GetUplinks");
+  auto *const last = ledger.allocate(3, "DVSQEX_StateGet");
+  ledger.release(gone, "VSQEX_FreeMemory");
   EXPECT_EQ(report_of(ledger), text_of(first) + " 80 bytes from VSQEX_GetUplinks\n" +
                                    text_of(last) + " 3 bytes from DVSQEX_StateGet\n");
 }
@@ -134,8 +134,8 @@ TEST(Ledger, ReportsNothingWhenNothingIsOut) {
 
 TEST(Ledger, CutsTheReportAtTheCallersRoom) {
   Ledger ledger;
-  auto const line = text_of(ledger.give_out(7, "Giver")) + " 7 bytes from Giver\n";
-  ledger.give_out(7, "Giver");
+  auto const line = text_of(ledger.allocate(7, "Giver")) + " 7 bytes from Giver\n";
+  ledger.allocate(7, "Giver");
   std::array<char, 8> text{};
   EXPECT_EQ(ledger.report(std::span(text).first(6)), ledger.report({}));
   EXPECT_EQ(std::string(text.data()), line.substr(0, 5));

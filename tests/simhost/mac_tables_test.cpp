@@ -1,12 +1,12 @@
 // MAC tables: what is learned, what ages when, what has no room.
-#include "dataplane/mac_tables.h"
+#include "planes/stored/mac_tables.h"
 
 #include <gmock/gmock.h>
 
 #include <cstring>
 #include <vector>
 
-#include "core/host_settings.h"
+#include "model/options/host_settings.h"
 #include "plane.h"
 #include "vswitch/mac_learning.h"
 #include "vswitch/port_mac_policies.h"
@@ -15,8 +15,8 @@
 namespace {
 
 using simhost::Place;
-using simhost::dataplane::learn;
-using simhost::dataplane::Sighting;
+using simhost::stored::learn;
+using simhost::stored::Sighting;
 using std::chrono::milliseconds;
 using std::chrono::seconds;
 
@@ -39,7 +39,7 @@ struct MacTables : Plane {
     set_learning(p2, 4096, VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW);
   }
 
-  void set_learning(simhost::store::Port const &port, qex_uint32 limit,
+  void set_learning(simhost::storage::Port const &port, qex_uint32 limit,
                     VSPortMACLearningLimitPolicy limit_policy, bool on = true) {
     VSPMACManagement management{};
     management.portMACLearning.learning = static_cast<qex_Bool>(on);
@@ -58,16 +58,16 @@ struct MacTables : Plane {
   /// The last bytes of the addresses at a place.
   std::vector<int> at(Place const &place, VSMACAddrType type = VS_MAC_ADDR_TYPE_ALL) {
     std::vector<int> lasts;
-    for (auto const &found : simhost::dataplane::addresses(work, place, type)) {
+    for (auto const &found : simhost::stored::addresses(transaction, place, type)) {
       lasts.push_back(found.macAddress[5]);
     }
     return lasts;
   }
   QEX_ReturnStatus put(Place const &place, VSMACEntry const &wanted) {
-    return status_of([&] { simhost::dataplane::put_address(work, place, wanted); });
+    return status_of([&] { simhost::stored::put_address(transaction, place, wanted); });
   }
   QEX_ReturnStatus remove(Place const &place, VSMACEntry const &wanted) {
-    return status_of([&] { simhost::dataplane::remove_address(work, place, wanted); });
+    return status_of([&] { simhost::stored::remove_address(transaction, place, wanted); });
   }
 
   Place at1;
@@ -79,18 +79,18 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 
 TEST_F(MacTables, LearnWhereAnAddressIs) {
-  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::learned);
-  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::refreshed);
-  EXPECT_EQ(learn(work, team, entry(9)), Sighting::learned);
+  EXPECT_EQ(learn(transaction, at1, entry(1)), Sighting::learned);
+  EXPECT_EQ(learn(transaction, at1, entry(1)), Sighting::refreshed);
+  EXPECT_EQ(learn(transaction, team, entry(9)), Sighting::learned);
   EXPECT_THAT(at(at1), ElementsAre(1));
   EXPECT_THAT(at(at2), IsEmpty());
   EXPECT_THAT(at(team), ElementsAre(9));
 }
 
 TEST_F(MacTables, EntriesSayWhatIsKnown) {
-  learn(work, at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 42));
-  simhost::step_clock(work, milliseconds(2999));
-  auto const found = simhost::dataplane::addresses(work, at1, VS_MAC_ADDR_TYPE_ALL).at(0);
+  learn(transaction, at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 42));
+  simhost::step_clock(transaction, milliseconds(2999));
+  auto const found = simhost::stored::addresses(transaction, at1, VS_MAC_ADDR_TYPE_ALL).at(0);
   EXPECT_EQ(std::memcmp(found.macAddress, entry(1).macAddress, sizeof found.macAddress), 0);
   EXPECT_EQ(found.macAddrType, VS_MAC_ADDR_TYPE_LEARNED);
   EXPECT_EQ(found.aging, 1);
@@ -99,43 +99,45 @@ TEST_F(MacTables, EntriesSayWhatIsKnown) {
 }
 
 TEST_F(MacTables, VlansAndNetworksAreApart) {
-  learn(work, at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 1));
-  EXPECT_EQ(learn(work, at2, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 2)), Sighting::learned);
+  learn(transaction, at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 1));
+  EXPECT_EQ(learn(transaction, at2, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 2)), Sighting::learned);
   auto overlay = entry(1, VS_MAC_ADDR_TYPE_LEARNED, 1);
   overlay.vni = 7;
-  EXPECT_EQ(learn(work, at2, overlay), Sighting::learned);
+  EXPECT_EQ(learn(transaction, at2, overlay), Sighting::learned);
   EXPECT_THAT(at(at2), ElementsAre(1, 1));
 }
 
 TEST_F(MacTables, AgeToTheMillisecond) {
-  learn(work, at1, entry(1));
-  simhost::step_clock(work, seconds(300) - milliseconds(1));
+  learn(transaction, at1, entry(1));
+  simhost::step_clock(transaction, seconds(300) - milliseconds(1));
   EXPECT_THAT(at(at1), ElementsAre(1));
-  simhost::step_clock(work, milliseconds(1));
+  simhost::step_clock(transaction, milliseconds(1));
   EXPECT_THAT(at(at1), IsEmpty());
-  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at1).numMACsLearned),
-            0U);
-  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::learned) << "it is new again";
+  EXPECT_EQ(
+      static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at1).numMACsLearned),
+      0U);
+  EXPECT_EQ(learn(transaction, at1, entry(1)), Sighting::learned) << "it is new again";
 }
 
 TEST_F(MacTables, AFrameMakesAnAddressYoung) {
-  learn(work, at1, entry(1));
-  simhost::step_clock(work, seconds(299));
-  learn(work, at1, entry(1));
-  simhost::step_clock(work, seconds(299));
+  learn(transaction, at1, entry(1));
+  simhost::step_clock(transaction, seconds(299));
+  learn(transaction, at1, entry(1));
+  simhost::step_clock(transaction, seconds(299));
   EXPECT_THAT(at(at1), ElementsAre(1));
 }
 
 TEST_F(MacTables, AgeByTheSwitchsTimeBeforeTheHosts) {
-  learn(work, at1, entry(1));
-  simhost::set_global_mac_learning(work, {.agingTime = 20, .macLimit = 10, .learnStatic = 0});
-  simhost::step_clock(work, seconds(19));
+  learn(transaction, at1, entry(1));
+  simhost::set_global_mac_learning(transaction,
+                                   {.agingTime = 20, .macLimit = 10, .learnStatic = 0});
+  simhost::step_clock(transaction, seconds(19));
   EXPECT_THAT(at(at1), ElementsAre(1));
-  simhost::step_clock(work, seconds(1));
+  simhost::step_clock(transaction, seconds(1));
   EXPECT_THAT(at(at1), IsEmpty());
   set_switch_learning(21, 10);
   EXPECT_THAT(at(at1), ElementsAre(1)) << "nobody had looked";
-  simhost::step_clock(work, seconds(1));
+  simhost::step_clock(transaction, seconds(1));
   EXPECT_THAT(at(at1), IsEmpty());
 }
 
@@ -144,14 +146,14 @@ TEST_F(MacTables, WhatDoesNotAgeStays) {
   auto ageing = entry(2);
   ageing.aging = 1;
   ASSERT_EQ(put(at1, ageing), QEX_OK);
-  simhost::step_clock(work, seconds(300));
+  simhost::step_clock(transaction, seconds(300));
   EXPECT_THAT(at(at1), ElementsAre(1));
 }
 
 TEST_F(MacTables, AskForOneTypeOrAll) {
   put(at1, entry(1, VS_MAC_ADDR_TYPE_STATIC));
   put(at1, entry(2, VS_MAC_ADDR_TYPE_USER));
-  learn(work, at1, entry(3));
+  learn(transaction, at1, entry(3));
   EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_STATIC), ElementsAre(1));
   EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_USER), ElementsAre(2));
   EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_LEARNED), ElementsAre(3));
@@ -159,52 +161,52 @@ TEST_F(MacTables, AskForOneTypeOrAll) {
 }
 
 TEST_F(MacTables, MovesAreCountedWhereTheyGo) {
-  learn(work, at1, entry(1));
-  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
+  learn(transaction, at1, entry(1));
+  EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::moved);
   EXPECT_THAT(at(at1), IsEmpty());
   EXPECT_THAT(at(at2), ElementsAre(1));
-  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at1).numMACsMoved),
+  EXPECT_EQ(static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at1).numMACsMoved),
             0U);
-  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at2).numMACsMoved),
+  EXPECT_EQ(static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at2).numMACsMoved),
             1U);
-  EXPECT_EQ(learn(work, team, entry(1)), Sighting::moved);
-  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
-  EXPECT_EQ(static_cast<qex_uint64>(simhost::dataplane::learning_stats(work, at2).numMACsMoved),
+  EXPECT_EQ(learn(transaction, team, entry(1)), Sighting::moved);
+  EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::moved);
+  EXPECT_EQ(static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at2).numMACsMoved),
             2U);
 }
 
 TEST_F(MacTables, AUsersAddressDoesNotMove) {
   put(at1, entry(1, VS_MAC_ADDR_TYPE_USER));
-  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::kept_elsewhere);
-  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::refreshed);
+  EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::fixed_elsewhere);
+  EXPECT_EQ(learn(transaction, at1, entry(1)), Sighting::refreshed);
   EXPECT_THAT(at(at1, VS_MAC_ADDR_TYPE_USER), ElementsAre(1));
 }
 
 TEST_F(MacTables, AStaticAddressMovesIfTheSwitchLearnsStaticOnes) {
   put(at1, entry(1, VS_MAC_ADDR_TYPE_STATIC));
-  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::kept_elsewhere);
+  EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::fixed_elsewhere);
   set_switch_learning(300, 100, 1);
-  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved);
+  EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::moved);
   EXPECT_THAT(at(at2, VS_MAC_ADDR_TYPE_LEARNED), ElementsAre(1));
 }
 
 TEST_F(MacTables, APortThatDoesNotLearn) {
   set_learning(p1, 4096, VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW, false);
-  EXPECT_EQ(learn(work, at1, entry(1)), Sighting::learning_off);
+  EXPECT_EQ(learn(transaction, at1, entry(1)), Sighting::learning_off);
   EXPECT_THAT(at(at1), IsEmpty());
 }
 
 TEST_F(MacTables, AFullPortFollowsItsPolicy) {
   set_learning(p1, 2, VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW);
-  learn(work, at1, entry(1));
-  learn(work, at1, entry(2));
-  EXPECT_EQ(learn(work, at1, entry(3)), Sighting::let_through);
-  EXPECT_EQ(learn(work, at1, entry(2)), Sighting::refreshed);
+  learn(transaction, at1, entry(1));
+  learn(transaction, at1, entry(2));
+  EXPECT_EQ(learn(transaction, at1, entry(3)), Sighting::let_through);
+  EXPECT_EQ(learn(transaction, at1, entry(2)), Sighting::refreshed);
   set_learning(p1, 2, VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP);
-  EXPECT_EQ(learn(work, at1, entry(3)), Sighting::dropped);
-  EXPECT_EQ(learn(work, at1, entry(4)), Sighting::dropped);
+  EXPECT_EQ(learn(transaction, at1, entry(3)), Sighting::dropped);
+  EXPECT_EQ(learn(transaction, at1, entry(4)), Sighting::dropped);
   EXPECT_THAT(at(at1), ElementsAre(1, 2));
-  auto const stats = simhost::dataplane::learning_stats(work, at1);
+  auto const stats = simhost::stored::learning_stats(transaction, at1);
   EXPECT_EQ(stats.numMACsLearned, 2U);
   EXPECT_EQ(qex_uint64{stats.noLearningAllowedPkts}, 1U);
   EXPECT_EQ(qex_uint64{stats.noLearningDroppedPkts}, 2U);
@@ -212,29 +214,29 @@ TEST_F(MacTables, AFullPortFollowsItsPolicy) {
 
 TEST_F(MacTables, AgeingMakesRoom) {
   set_learning(p1, 1, VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP);
-  learn(work, at1, entry(1));
-  simhost::step_clock(work, seconds(300));
-  EXPECT_EQ(learn(work, at1, entry(2)), Sighting::learned);
+  learn(transaction, at1, entry(1));
+  simhost::step_clock(transaction, seconds(300));
+  EXPECT_EQ(learn(transaction, at1, entry(2)), Sighting::learned);
 }
 
 TEST_F(MacTables, TheSwitchHasALimitForAllItsPlaces) {
   set_switch_learning(300, 2);
-  learn(work, at1, entry(1));
-  learn(work, team, entry(2));
-  EXPECT_EQ(learn(work, at2, entry(3)), Sighting::let_through);
-  EXPECT_EQ(learn(work, team, entry(3)), Sighting::let_through);
-  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::moved) << "it takes no more room there";
+  learn(transaction, at1, entry(1));
+  learn(transaction, team, entry(2));
+  EXPECT_EQ(learn(transaction, at2, entry(3)), Sighting::let_through);
+  EXPECT_EQ(learn(transaction, team, entry(3)), Sighting::let_through);
+  EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::moved) << "it takes no more room there";
 }
 
 // The counts are kept beside the addresses, so every way in which one comes, goes or changes
 // counts.
 TEST_F(MacTables, CountsFollowEveryChange) {
   auto const counted = [&](Place const &place) {
-    return qex_uint32{simhost::dataplane::learning_stats(work, place).numMACsLearned};
+    return qex_uint32{simhost::stored::learning_stats(transaction, place).numMACsLearned};
   };
   auto const learned = [&](std::initializer_list<unsigned char> lasts, Place const &place) {
     for (auto const last : lasts) {
-      learn(work, place, entry(last));
+      learn(transaction, place, entry(last));
     }
   };
   learned({1, 2, 3}, at1);
@@ -250,26 +252,26 @@ TEST_F(MacTables, CountsFollowEveryChange) {
   EXPECT_EQ(counted(team), 0U) << "one gave way";
   remove(at1, entry(2, VS_MAC_ADDR_TYPE_LEARNED));
   EXPECT_EQ(counted(at1), 0U) << "one was removed";
-  simhost::step_clock(work, seconds(299));
+  simhost::step_clock(transaction, seconds(299));
   learned({5}, at2);
-  simhost::step_clock(work, seconds(1));
+  simhost::step_clock(transaction, seconds(1));
   EXPECT_EQ(counted(at2), 1U) << "one is too old and still in the table";
   learned({5}, at2);
   EXPECT_EQ(counted(at2), 1U) << "and then it is not";
   set_switch_learning(300, 1);
-  EXPECT_NE(learn(work, at2, entry(6)), Sighting::learned) << "the switch has its one";
-  simhost::remove_port(work, p2);
-  EXPECT_EQ(learn(work, at1, entry(6)), Sighting::learned) << "it went with its port";
-  simhost::data_plane().restart(work);
+  EXPECT_NE(learn(transaction, at2, entry(6)), Sighting::learned) << "the switch has its one";
+  simhost::remove_port(transaction, p2);
+  EXPECT_EQ(learn(transaction, at1, entry(6)), Sighting::learned) << "it went with its port";
+  simhost::running_plane().restart(transaction);
   EXPECT_EQ(counted(at1), 0U);
-  EXPECT_EQ(learn(work, at1, entry(7)), Sighting::learned);
+  EXPECT_EQ(learn(transaction, at1, entry(7)), Sighting::learned);
 }
 
 TEST_F(MacTables, AUserPutsAndTakesAddresses) {
   EXPECT_EQ(put(at1, entry(1)), QEX_OK);
   EXPECT_EQ(put(at1, entry(1)), QEX_OK);
   EXPECT_EQ(put(at2, entry(1)), QEX_EXISTS);
-  learn(work, at2, entry(2));
+  learn(transaction, at2, entry(2));
   EXPECT_EQ(put(at1, entry(2)), QEX_OK) << "a learned address gives way";
   EXPECT_THAT(at(at1), ElementsAre(1, 2));
   EXPECT_EQ(remove(at2, entry(1)), QEX_NOT_FOUND);
@@ -277,7 +279,7 @@ TEST_F(MacTables, AUserPutsAndTakesAddresses) {
   EXPECT_EQ(remove(at1, entry(1)), QEX_OK);
   EXPECT_EQ(remove(at1, entry(1)), QEX_NOT_FOUND);
   EXPECT_EQ(remove(at1, entry(2, VS_MAC_ADDR_TYPE_ALL)), QEX_OK);
-  learn(work, at1, entry(3));
+  learn(transaction, at1, entry(3));
   EXPECT_EQ(remove(at1, entry(3, VS_MAC_ADDR_TYPE_LEARNED)), QEX_OK);
 }
 
@@ -298,23 +300,23 @@ TEST_F(MacTables, AddressesAreChecked) {
 }
 
 TEST_F(MacTables, GoWithTheirPort) {
-  learn(work, at1, entry(1));
-  simhost::remove_port(work, p1);
-  EXPECT_EQ(learn(work, at2, entry(1)), Sighting::learned);
+  learn(transaction, at1, entry(1));
+  simhost::remove_port(transaction, p1);
+  EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::learned);
 }
 
 TEST_F(MacTables, GlobalPropertiesAreChecked) {
   EXPECT_EQ(status_of([&] {
-              simhost::set_global_mac_learning(work,
+              simhost::set_global_mac_learning(transaction,
                                                {.agingTime = 0, .macLimit = 1, .learnStatic = 0});
             }),
             QEX_BAD_PARAM);
   EXPECT_EQ(status_of([&] {
               simhost::set_global_mac_learning(
-                  work, {.agingTime = 1000001, .macLimit = 1, .learnStatic = 0});
+                  transaction, {.agingTime = 1000001, .macLimit = 1, .learnStatic = 0});
             }),
             QEX_BAD_PARAM);
-  auto const props = simhost::global_mac_learning(work);
+  auto const props = simhost::global_mac_learning(transaction);
   EXPECT_EQ(qex_uint32{props.agingTime}, 300U);
   EXPECT_EQ(qex_uint32{props.macLimit}, 65536U);
   EXPECT_EQ(props.learnStatic, 0);

@@ -5,18 +5,21 @@
 
 #include <optional>
 
-#include "core/giving_up.h"
-#include "store/ports.h"
-#include "store/store.h"
+#include "base/outcomes.h"
+#include "planes/stored/stored_plane.h"
+#include "storage/ports.h"
+#include "storage/store.h"
 
 struct MemoryState : testing::Test {
-  static void furnish(simhost::store::Transaction &transaction) {
+  MemoryState() { simhost::run_on(simhost::stored::plane()); }
+
+  static void populate(simhost::storage::Transaction &transaction) {
     for (auto const *uplink : {"nic0", "nic1", "nic2", "nic3"}) {
-      simhost::store::add_uplink(transaction, uplink);
+      simhost::storage::add_uplink(transaction, uplink);
     }
   }
 
-  simhost::store::Store store{std::nullopt, furnish};
+  simhost::storage::Store store{std::nullopt, populate};
 };
 
 /// The status with which `work` is refused; QEX_OK if it is not.

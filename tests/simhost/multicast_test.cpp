@@ -1,11 +1,11 @@
 // Multicast groups of ports.
-#include "dataplane/multicast.h"
+#include "planes/stored/multicast.h"
 
 #include <gmock/gmock.h>
 
 #include <initializer_list>
 
-#include "core/runtime_options.h"
+#include "model/options/runtime_options.h"
 #include "plane.h"
 #include "vswitch/mcast_filters.h"
 
@@ -27,10 +27,10 @@ AddressBytes const kIPv6 = bytes({0xFF, 2, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0
 
 struct Multicast : Plane {
   QEX_ReturnStatus join(McastGroup const &group) {
-    return status_of([&] { simhost::dataplane::join(work, p1.number, group); });
+    return status_of([&] { simhost::stored::join(transaction, p1.number, group); });
   }
-  std::vector<AddressBytes> groups(simhost::store::Port const &port, std::size_t length) {
-    return simhost::dataplane::groups(work, port.number, length);
+  std::vector<AddressBytes> groups(simhost::storage::Port const &port, std::size_t length) {
+    return simhost::stored::groups(transaction, port.number, length);
   }
 };
 
@@ -56,25 +56,26 @@ TEST_F(Multicast, AReportReplacesWhatWasKnown) {
   first.vni = 5;
   first.sources = {bytes({10, 0, 0, 2}), bytes({10, 0, 0, 1})};
   ASSERT_EQ(join(first), QEX_OK);
-  simhost::step_clock(work, std::chrono::seconds(5));
-  auto const known = simhost::dataplane::group(work, p1.number, kIPv4).value();
+  simhost::step_clock(transaction, std::chrono::seconds(5));
+  auto const known = simhost::stored::group(transaction, p1.number, kIPv4).value();
   EXPECT_EQ(known.version, 3U);
   EXPECT_EQ(known.source_mode, 1U);
   EXPECT_EQ(known.vni, 5U);
   EXPECT_EQ(known.updated, kStart);
   EXPECT_EQ(known.sources, first.sources) << "in the order of the report";
   ASSERT_EQ(join(group(kIPv4)), QEX_OK);
-  auto const replaced = simhost::dataplane::group(work, p1.number, kIPv4).value();
+  auto const replaced = simhost::stored::group(transaction, p1.number, kIPv4).value();
   EXPECT_EQ(replaced.updated, kStart + std::chrono::seconds(5));
   EXPECT_THAT(replaced.sources, IsEmpty());
 }
 
 TEST_F(Multicast, GroupsAreLeft) {
   ASSERT_EQ(join(group(kIPv4)), QEX_OK);
-  simhost::dataplane::leave(work, p1.number, kIPv4);
+  simhost::stored::leave(transaction, p1.number, kIPv4);
   EXPECT_THAT(groups(p1, 4), IsEmpty());
-  EXPECT_FALSE(simhost::dataplane::group(work, p1.number, kIPv4).has_value());
-  EXPECT_EQ(status_of([&] { simhost::dataplane::leave(work, p1.number, kIPv4); }), QEX_NOT_FOUND);
+  EXPECT_FALSE(simhost::stored::group(transaction, p1.number, kIPv4).has_value());
+  EXPECT_EQ(status_of([&] { simhost::stored::leave(transaction, p1.number, kIPv4); }),
+            QEX_NOT_FOUND);
 }
 
 TEST_F(Multicast, OnlyMulticastAddressesAreGroups) {
@@ -105,8 +106,8 @@ TEST_F(Multicast, ReportsAreChecked) {
 }
 
 TEST_F(Multicast, SourcesAreLimitedByTheRuntimeOptions) {
-  simhost::set_runtime_option(work, VS_RT_OPT_IGMP_V3_MAX_SRC_IP_NUM, 1);
-  simhost::set_runtime_option(work, VS_RT_OPT_MLD_V2_MAX_SRC_IP_NUM, 0);
+  simhost::set_runtime_option(transaction, VS_RT_OPT_IGMP_V3_MAX_SRC_IP_NUM, 1);
+  simhost::set_runtime_option(transaction, VS_RT_OPT_MLD_V2_MAX_SRC_IP_NUM, 0);
   auto full = group(kIPv4);
   full.sources = {bytes({10, 0, 0, 1})};
   EXPECT_EQ(join(full), QEX_OK);

@@ -4,40 +4,40 @@
 
 #include <chrono>
 
-#include "core/clock.h"
-#include "core/data_plane.h"
-#include "core/known.h"
-#include "core/ports.h"
-#include "core/properties.h"
-#include "core/switches.h"
+#include "clock/clock.h"
 #include "memory_state.h"
+#include "model/lookup.h"
+#include "model/plane.h"
+#include "model/ports/ports.h"
+#include "model/properties/properties.h"
+#include "model/switches/switches.h"
 
 struct Plane : MemoryState {
   static constexpr std::chrono::seconds kStart{1000};
 
   Plane() {
-    simhost::stop_clock(work);
-    simhost::set_clock(work, kStart);
-    simhost::create_switch(work, {.alias = "s", .uplink_count = 3});
-    key = simhost::known_switch(work, "s").key;
-    p1 = simhost::add_client_port(work, key, "p1");
-    p2 = simhost::add_client_port(work, key, "p2");
+    simhost::stop_clock(transaction);
+    simhost::set_clock(transaction, kStart);
+    simhost::create_switch(transaction, {.alias = "s", .uplink_count = 3});
+    key = simhost::get_switch(transaction, "s").key;
+    p1 = simhost::add_client_port(transaction, key, "p1");
+    p2 = simhost::add_client_port(transaction, key, "p2");
   }
 
   template <typename Record>
-  void set_policy(simhost::store::PropertyOwner const &owner, char const *name,
+  void set_policy(simhost::storage::PropertyOwner const &owner, char const *name,
                   Record const &record) {
-    simhost::set_property(work, owner, name, simhost::bytes_of(record));
+    simhost::set_property(transaction, owner, name, simhost::bytes_of(record));
   }
-  [[nodiscard]] simhost::store::PropertyOwner of_switch() const {
-    return simhost::store::PropertyOwner::global(key);
+  [[nodiscard]] simhost::storage::PropertyOwner of_switch() const {
+    return simhost::storage::PropertyOwner::global(key);
   }
-  [[nodiscard]] simhost::store::PropertyOwner of(simhost::store::Port const &port) const {
-    return simhost::store::PropertyOwner::port(key, port.number);
+  [[nodiscard]] simhost::storage::PropertyOwner of(simhost::storage::Port const &port) const {
+    return simhost::storage::PropertyOwner::port(key, port.number);
   }
 
-  simhost::store::Transaction work{store, simhost::store::Access::write};
-  simhost::store::SwitchKey key{};
-  simhost::store::Port p1;
-  simhost::store::Port p2;
+  simhost::storage::Transaction transaction{store, simhost::storage::Access::write};
+  simhost::storage::SwitchKey key{};
+  simhost::storage::Port p1;
+  simhost::storage::Port p2;
 };

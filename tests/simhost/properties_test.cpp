@@ -1,49 +1,51 @@
 // The property layer: one room with as many doors as there will be calls.
-#include "core/properties.h"
+#include "model/properties/properties.h"
 
 #include <cstdint>
 #include <vector>
 
-#include "core/switches.h"
 #include "memory_state.h"
-#include "store/switches.h"
+#include "model/switches/switches.h"
+#include "storage/switches.h"
 #include "vswitch/properties.h"
 
 namespace {
 
 using simhost::set_property;
-using simhost::store::Access;
-using simhost::store::PropertyOwner;
-using simhost::store::PropertyType;
-using simhost::store::SwitchKey;
-using simhost::store::Transaction;
+using simhost::storage::Access;
+using simhost::storage::PropertyOwner;
+using simhost::storage::PropertyType;
+using simhost::storage::SwitchKey;
+using simhost::storage::Transaction;
 
 struct Properties : MemoryState {
   Properties() {
-    simhost::create_switch(work, {.alias = "first"});
+    simhost::create_switch(transaction, {.alias = "first"});
     owner.switch_key =
-        simhost::store::find_switch(work, simhost::store::SwitchName::alias, "first")->key;
+        simhost::storage::find_switch(transaction, simhost::storage::SwitchName::alias, "first")
+            ->key;
   }
 
   QEX_ReturnStatus set(std::string_view key, std::vector<unsigned char> const &value) {
     return status_of([&] {
-      set_property(work, owner, key, std::as_bytes(std::span(value)), PropertyType::policy);
+      set_property(transaction, owner, key, std::as_bytes(std::span(value)), PropertyType::policy);
     });
   }
 
-  Transaction work{store, Access::write};
+  Transaction transaction{store, Access::write};
   PropertyOwner owner = PropertyOwner::global(SwitchKey{});
 };
 
 TEST_F(Properties, RawBytesAreWhatTheTypedCallReads) {
   std::uint32_t const mtu = 9000;
-  set_property(work, owner, VSPROP_MTU, std::as_bytes(std::span(&mtu, 1)), PropertyType::config);
-  EXPECT_EQ(simhost::mtu_of(work, "first"), 9000U);
+  set_property(transaction, owner, VSPROP_MTU, std::as_bytes(std::span(&mtu, 1)),
+               PropertyType::config);
+  EXPECT_EQ(simhost::mtu_of(transaction, "first"), 9000U);
 }
 
 TEST_F(Properties, TheTypedCallWritesTheRawBytes) {
-  simhost::set_mtu(work, "first", 0x1234);
-  auto const property = simhost::store::find_property(work, owner, VSPROP_MTU);
+  simhost::set_mtu(transaction, "first", 0x1234);
+  auto const property = simhost::storage::find_property(transaction, owner, VSPROP_MTU);
   EXPECT_EQ(property.value().value,
             (std::vector{std::byte{0x34}, std::byte{0x12}, std::byte{0}, std::byte{0}}));
   EXPECT_EQ(property->type, PropertyType::config);
@@ -66,28 +68,29 @@ TEST_F(Properties, MtuBoundsHoldForRawBytes) {
 TEST_F(Properties, AKeyWithoutRulesTakesAnyBytes) {
   EXPECT_EQ(set("com.example.note", {}), QEX_OK);
   EXPECT_EQ(set("com.example.note", {1, 0, 2}), QEX_OK);
-  auto const property = simhost::store::find_property(work, owner, "com.example.note");
+  auto const property = simhost::storage::find_property(transaction, owner, "com.example.note");
   EXPECT_EQ(property.value().value, (std::vector{std::byte{1}, std::byte{0}, std::byte{2}}));
 }
 
 TEST_F(Properties, ALaterSetChangesTheType) {
   EXPECT_EQ(set("com.example.note", {1}), QEX_OK);
-  set_property(work, owner, "com.example.note", {}, PropertyType::transient);
-  EXPECT_EQ(simhost::store::find_property(work, owner, "com.example.note")->type,
+  set_property(transaction, owner, "com.example.note", {}, PropertyType::transient);
+  EXPECT_EQ(simhost::storage::find_property(transaction, owner, "com.example.note")->type,
             PropertyType::transient);
 }
 
 TEST_F(Properties, OwnersAreApart) {
-  auto const port =
-      simhost::store::add_port(work, owner.switch_key, "p1", simhost::store::PortKind::client);
+  auto const port = simhost::storage::add_port(transaction, owner.switch_key, "p1",
+                                               simhost::storage::PortKind::client);
   std::vector const owners{owner, PropertyOwner::host(owner.switch_key),
                            PropertyOwner::port(owner.switch_key, port.value())};
   for (std::size_t at = 0; at < owners.size(); ++at) {
     auto const value = static_cast<std::byte>(at);
-    set_property(work, owners[at], "com.example.note", std::span(&value, 1), PropertyType::config);
+    set_property(transaction, owners[at], "com.example.note", std::span(&value, 1),
+                 PropertyType::config);
   }
   for (std::size_t at = 0; at < owners.size(); ++at) {
-    EXPECT_EQ(simhost::store::find_property(work, owners[at], "com.example.note")->value,
+    EXPECT_EQ(simhost::storage::find_property(transaction, owners[at], "com.example.note")->value,
               std::vector{static_cast<std::byte>(at)});
   }
 }

@@ -6,7 +6,7 @@
 #include <cstdlib>
 #include <string>
 
-#include "control/simhost.h"
+#include "abi/simhost_api/simhost.h"
 #include "vswitch/configuration.h"
 #include "vswitch/queries.h"
 

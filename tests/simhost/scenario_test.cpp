@@ -1,5 +1,6 @@
 // Scenario documents: what they make of a host, what is refused and how it is told.
-#include "control/scenario.h"
+#include "scenario/scenario.h"
+#include "planes/stored/stored_plane.h"
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
@@ -11,12 +12,12 @@
 #include <functional>
 #include <string>
 
-#include "control/lifecycle.h"
-#include "core/fresh_host.h"
-#include "core/known.h"
-#include "core/properties.h"
-#include "core/switches.h"
-#include "store/store.h"
+#include "abi/fresh_host.h"
+#include "model/lookup.h"
+#include "model/properties/properties.h"
+#include "model/switches/switches.h"
+#include "scenario/lifecycle.h"
+#include "storage/store.h"
 #include "temporary_folder.h"
 #include "vswitch/lags.h"
 #include "vswitch/mirror.h"
@@ -24,20 +25,22 @@
 
 namespace {
 
-using simhost::control::DocumentError;
-using simhost::store::Access;
-using simhost::store::Transaction;
+using simhost::scenario::DocumentError;
+using simhost::storage::Access;
+using simhost::storage::Transaction;
 
-void furnish_nothing(Transaction &) {}
+void populate_nothing(Transaction &) {}
 
 struct Scenario : testing::Test {
-  simhost::store::Store store{std::nullopt, furnish_nothing};
+  Scenario() { simhost::run_on(simhost::stored::plane()); }
+
+  simhost::storage::Store store{std::nullopt, populate_nothing};
 
   /// What is wrong with a document; empty if nothing is. Nothing of it lasts.
   std::string refusal(std::string const &document) {
-    Transaction work(store, Access::write);
+    Transaction transaction(store, Access::write);
     try {
-      simhost::control::apply(work, document);
+      simhost::scenario::apply(transaction, document);
       return "";
     } catch (DocumentError const &error) {
       return error.what();
@@ -151,13 +154,13 @@ TEST_F(Scenario, TextsThatAreNoJson) {
 }
 
 TEST_F(Scenario, WhatExistsIsChangedAndTheRestIsLeftAlone) {
-  Transaction work(store, Access::write);
-  simhost::control::apply(work, R"({"uplinks": [{"name": "nic0", "speed": 1000}],
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(transaction, R"({"uplinks": [{"name": "nic0", "speed": 1000}],
       "switches": [{"alias": "s", "mtu": 9000, "uplinks": ["nic0"], "ports": [{"id": "p"}]}]})");
-  auto const before = simhost::control::described_host(work);
-  simhost::control::apply(work, R"({"uplinks": [{"name": "nic0", "link": "down"}],
+  auto const before = simhost::scenario::host_to_json(transaction);
+  simhost::scenario::apply(transaction, R"({"uplinks": [{"name": "nic0", "link": "down"}],
       "switches": [{"alias": "s", "uplinks": ["nic0"], "ports": [{"id": "q"}]}]})");
-  auto const after = simhost::control::described_host(work);
+  auto const after = simhost::scenario::host_to_json(transaction);
   EXPECT_EQ(after["uplinks"][0]["link"], "down");
   EXPECT_EQ(after["uplinks"][0]["speed"], 1000);
   EXPECT_EQ(after["switches"].size(), 1U);
@@ -167,11 +170,11 @@ TEST_F(Scenario, WhatExistsIsChangedAndTheRestIsLeftAlone) {
 }
 
 TEST_F(Scenario, WhatASwitchWasMadeWithStays) {
-  Transaction work(store, Access::write);
-  simhost::control::apply(work, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
-  simhost::control::apply(work, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
+  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
   try {
-    simhost::control::apply(work, R"({"switches": [{"alias": "s", "max_ports": 6}]})");
+    simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "max_ports": 6}]})");
     FAIL() << "it changed";
   } catch (DocumentError const &error) {
     EXPECT_STREQ(error.what(), "switches[0].max_ports: cannot change while the switch exists");
@@ -223,38 +226,39 @@ constexpr char const *kEverything = R"({
 })";
 
 TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
-  Transaction work(store, Access::write);
-  simhost::control::apply(work, kEverything);
-  auto const first = simhost::control::described_host(work);
-  simhost::control::empty_host(work);
-  EXPECT_TRUE(simhost::control::described_host(work)["switches"].empty());
-  simhost::control::apply(work, first.dump());
-  EXPECT_EQ(simhost::control::described_host(work), first)
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(transaction, kEverything);
+  auto const first = simhost::scenario::host_to_json(transaction);
+  simhost::scenario::empty_host(transaction);
+  EXPECT_TRUE(simhost::scenario::host_to_json(transaction)["switches"].empty());
+  simhost::scenario::apply(transaction, first.dump());
+  EXPECT_EQ(simhost::scenario::host_to_json(transaction), first)
       << "with the numbers of ports and groups";
 }
 
 TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
-  Transaction work(store, Access::write);
-  simhost::control::apply(work, R"({"switches": [{"alias": "s", "teaming": {"speed": 5},
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "teaming": {"speed": 5},
       "ports": [{"id": "p", "teaming": {"speed": 6}, "mac_learning": {"limit": 3},
                  "mirror_sessions": [{"sid": "m"}]}]}]})");
   auto const owner_of_p = [&] {
-    return simhost::owner_of(simhost::known_port(work, simhost::known_switch(work, "s").key, "p"));
+    return simhost::owner_of(
+        simhost::get_port(transaction, simhost::get_switch(transaction, "s").key, "p"));
   };
   auto const property = [&](char const *key) {
-    return simhost::get_property(work, owner_of_p(), key).value();
+    return simhost::get_property(transaction, owner_of_p(), key).value();
   };
   auto table = property(VSPROP_PORT_MIRROR_SESSIONS).value;
   // A VLAN to encapsulate in, for which documents have no word.
   table.at(sizeof(DVMirrorSessionTable) + offsetof(DVMirrorSession, encapVlan)) = std::byte{7};
-  simhost::set_property(work, owner_of_p(), VSPROP_PORT_MIRROR_SESSIONS, table);
-  simhost::set_property(work, owner_of_p(), VSPROP_PORT_TEAMING_POLICY,
+  simhost::set_property(transaction, owner_of_p(), VSPROP_PORT_MIRROR_SESSIONS, table);
+  simhost::set_property(transaction, owner_of_p(), VSPROP_PORT_TEAMING_POLICY,
                         property(VSPROP_PORT_TEAMING_POLICY).value,
-                        simhost::store::PropertyType::runtime);
+                        simhost::storage::PropertyType::runtime);
   auto const no_utf8 = simhost::bytes_of_text("\xFF");
-  simhost::set_property(work, owner_of_p(), VSPROP_PORT_TEAMING_OVERRIDE, no_utf8);
+  simhost::set_property(transaction, owner_of_p(), VSPROP_PORT_TEAMING_OVERRIDE, no_utf8);
 
-  auto const described = simhost::control::described_host(work)["switches"][0];
+  auto const described = simhost::scenario::host_to_json(transaction)["switches"][0];
   EXPECT_TRUE(described["properties"].empty()) << "its teaming and MTU are said whole";
   auto const &port = described["ports"][0];
   EXPECT_EQ(port["mirror_sessions"][0]["sid"], "m");
@@ -263,26 +267,26 @@ TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
   EXPECT_EQ(port["properties"][VSPROP_PORT_TEAMING_OVERRIDE]["hex"], "ff00");
   EXPECT_EQ(port["properties"].size(), 3U) << "not the MAC learning";
 
-  auto const document = simhost::control::description(work);
-  simhost::control::empty_host(work);
-  simhost::control::apply(work, document);
+  auto const document = simhost::scenario::description(transaction);
+  simhost::scenario::empty_host(transaction);
+  simhost::scenario::apply(transaction, document);
   EXPECT_EQ(property(VSPROP_PORT_MIRROR_SESSIONS).value, table);
-  EXPECT_EQ(property(VSPROP_PORT_TEAMING_POLICY).type, simhost::store::PropertyType::runtime);
+  EXPECT_EQ(property(VSPROP_PORT_TEAMING_POLICY).type, simhost::storage::PropertyType::runtime);
   EXPECT_EQ(property(VSPROP_PORT_TEAMING_OVERRIDE).value, no_utf8);
 }
 
 TEST_F(Scenario, NamesThatAreNoUtf8AreDescribedByAReplacement) {
-  Transaction work(store, Access::write);
-  simhost::create_switch(work, {.alias = "dvs\xFF"});
-  EXPECT_THAT(simhost::control::description(work), testing::HasSubstr("\"dvs\uFFFD\""));
+  Transaction transaction(store, Access::write);
+  simhost::create_switch(transaction, {.alias = "dvs\xFF"});
+  EXPECT_THAT(simhost::scenario::description(transaction), testing::HasSubstr("\"dvs\uFFFD\""));
 }
 
 TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {
-  Transaction work(store, Access::write);
-  simhost::control::apply(work, kEverything);
-  auto const host = simhost::control::described_host(work);
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(transaction, kEverything);
+  auto const host = simhost::scenario::host_to_json(transaction);
   // Each key of the document, wherever it stands, is found with its value.
-  std::function<void(simhost::control::Json const &, simhost::control::Json const &,
+  std::function<void(simhost::scenario::Json const &, simhost::scenario::Json const &,
                      std::string const &)> const compare = [&](auto const &said, auto const &shown,
                                                                std::string const &path) {
     if (said.is_object() && !said.contains("text")) {
@@ -299,20 +303,20 @@ TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {
       EXPECT_EQ(said, shown) << path;
     }
   };
-  compare(simhost::control::parsed(kEverything), host, "");
+  compare(simhost::scenario::parsed(kEverything), host, "");
   EXPECT_EQ(host["switches"][0]["ports"][0]["properties"]["com.example.more"]["hex"],
             "68656c6c6f00");
   EXPECT_EQ(host["switches"][0]["ports"][0]["groups"].size(), 3U);
 }
 
 TEST_F(Scenario, ARestartedHostLosesWhatIsVolatile) {
-  Transaction work(store, Access::write);
-  simhost::control::apply(work, R"({"switches": [{"alias": "s", "properties": {
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "properties": {
       "com.example.keep": {"type": "policy", "text": "x"},
       "com.example.go": {"type": "volatile", "text": "x"},
       "com.example.gone": {"type": "runtime", "text": "x"}}}]})");
-  simhost::control::restart_host(work);
-  auto const host = simhost::control::described_host(work);
+  simhost::scenario::restart_host(transaction);
+  auto const host = simhost::scenario::host_to_json(transaction);
   auto const &properties = host["switches"][0]["properties"];
   EXPECT_TRUE(properties.contains("com.example.keep"));
   EXPECT_FALSE(properties.contains("com.example.go"));
@@ -328,10 +332,10 @@ struct FreshHost : Scenario {
 
 TEST_F(FreshHost, IsWorthPlayingWith) {
   unsetenv("SIMHOST_SCENARIO");
-  Transaction work(store, Access::write);
-  simhost::furnish_fresh_host(work);
-  auto const host = simhost::control::described_host(work);
-  EXPECT_GE(simhost::store::free_uplinks(work).size(), 2U);
+  Transaction transaction(store, Access::write);
+  simhost::populate_fresh_host(transaction);
+  auto const host = simhost::scenario::host_to_json(transaction);
+  EXPECT_GE(simhost::storage::free_uplinks(transaction).size(), 2U);
   ASSERT_EQ(host["switches"].size(), 1U);
   EXPECT_GE(host["switches"][0]["ports"].size(), 2U);
   EXPECT_FALSE(host["switches"][0]["addresses"].empty());
@@ -342,9 +346,9 @@ TEST_F(FreshHost, IsWhatADocumentSays) {
   auto const file = folder.file("host.json");
   std::ofstream(file) << "{}";
   setenv("SIMHOST_SCENARIO", file.c_str(), 1);
-  Transaction work(store, Access::write);
-  simhost::furnish_fresh_host(work);
-  auto const host = simhost::control::described_host(work);
+  Transaction transaction(store, Access::write);
+  simhost::populate_fresh_host(transaction);
+  auto const host = simhost::scenario::host_to_json(transaction);
   EXPECT_TRUE(host["switches"].empty());
   EXPECT_TRUE(host["uplinks"].empty());
 }
@@ -353,10 +357,10 @@ TEST_F(FreshHost, NamesTheDocumentThatCannotBeUsed) {
   TemporaryFolder const folder;
   auto const file = folder.file("host.json");
   setenv("SIMHOST_SCENARIO", file.c_str(), 1);
-  Transaction work(store, Access::write);
+  Transaction transaction(store, Access::write);
   auto const refused = [&]() -> std::string {
     try {
-      simhost::furnish_fresh_host(work);
+      simhost::populate_fresh_host(transaction);
       return "";
     } catch (DocumentError const &error) {
       return error.what();

@@ -1,5 +1,5 @@
 // The state file: what is kept, what is undone, what is refused.
-#include "store/store.h"
+#include "storage/store.h"
 
 #include <SQLiteCpp/Database.h>
 #include <SQLiteCpp/Exception.h>
@@ -9,21 +9,21 @@
 #include <fstream>
 #include <string>
 
-#include "store/ports.h"
-#include "store/schema.h"
-#include "store/switches.h"
+#include "storage/ports.h"
+#include "storage/schema.h"
+#include "storage/switches.h"
 #include "temporary_folder.h"
 
 namespace {
 
-using simhost::store::Access;
-using simhost::store::Store;
-using simhost::store::Switch;
-using simhost::store::SwitchName;
-using simhost::store::Transaction;
-using simhost::store::UnusableState;
+using simhost::storage::Access;
+using simhost::storage::Store;
+using simhost::storage::Switch;
+using simhost::storage::SwitchName;
+using simhost::storage::Transaction;
+using simhost::storage::UnusableState;
 
-void furnish_nothing(Transaction &) {}
+void populate_nothing(Transaction &) {}
 
 Switch named(std::string const &name) {
   return {.alias = name,
@@ -35,19 +35,19 @@ Switch named(std::string const &name) {
 }
 
 void add(Store &store, std::string const &name) {
-  Transaction work(store, Access::write);
-  ASSERT_TRUE(simhost::store::add_switch(work, named(name)).has_value());
-  work.commit();
+  Transaction transaction(store, Access::write);
+  ASSERT_TRUE(simhost::storage::add_switch(transaction, named(name)).has_value());
+  transaction.commit();
 }
 
 bool has(Store &store, std::string const &name) {
-  Transaction work(store, Access::read);
-  return simhost::store::find_switch(work, SwitchName::alias, name).has_value();
+  Transaction transaction(store, Access::read);
+  return simhost::storage::find_switch(transaction, SwitchName::alias, name).has_value();
 }
 
 std::string refusal_of(std::filesystem::path const &file) {
   try {
-    Store const store(file, furnish_nothing);
+    Store const store(file, populate_nothing);
     return "";
   } catch (UnusableState const &error) {
     return error.what();
@@ -62,42 +62,42 @@ std::string content(std::filesystem::path const &file) {
 TEST(Store, AFileOutlivesItsConnection) {
   TemporaryFolder const folder;
   {
-    Store store(folder.file("host.db"), furnish_nothing);
+    Store store(folder.file("host.db"), populate_nothing);
     add(store, "a");
   }
-  Store store(folder.file("host.db"), furnish_nothing);
+  Store store(folder.file("host.db"), populate_nothing);
   EXPECT_TRUE(has(store, "a"));
 }
 
 TEST(Store, AClosedFileIsTheWholeState) {
   TemporaryFolder const folder;
   {
-    Store store(folder.file("host.db"), furnish_nothing);
+    Store store(folder.file("host.db"), populate_nothing);
     add(store, "a");
   }
   std::filesystem::copy_file(folder.file("host.db"), folder.file("copy.db"));
-  Store copy(folder.file("copy.db"), furnish_nothing);
+  Store copy(folder.file("copy.db"), populate_nothing);
   EXPECT_TRUE(has(copy, "a"));
 }
 
 TEST(Store, OnlyANewStateIsFurnished) {
   TemporaryFolder const folder;
   int times = 0;
-  auto const furnish = [&](Transaction &work) {
+  auto const populate = [&](Transaction &transaction) {
     ++times;
-    simhost::store::add_uplink(work, "u");
+    simhost::storage::add_uplink(transaction, "u");
   };
-  { Store const first(folder.file("host.db"), furnish); }
-  Store second(folder.file("host.db"), furnish);
+  { Store const first(folder.file("host.db"), populate); }
+  Store second(folder.file("host.db"), populate);
   EXPECT_EQ(times, 1);
-  Transaction work(second, Access::read);
-  EXPECT_EQ(simhost::store::free_uplinks(work).size(), 1U);
+  Transaction transaction(second, Access::read);
+  EXPECT_EQ(simhost::storage::free_uplinks(transaction).size(), 1U);
 }
 
 TEST(Store, ConnectionsSeeEachOthersCommitsAtOnce) {
   TemporaryFolder const folder;
-  Store first(folder.file("host.db"), furnish_nothing);
-  Store second(folder.file("host.db"), furnish_nothing);
+  Store first(folder.file("host.db"), populate_nothing);
+  Store second(folder.file("host.db"), populate_nothing);
   add(first, "a");
   EXPECT_TRUE(has(second, "a"));
   add(second, "b");
@@ -106,56 +106,56 @@ TEST(Store, ConnectionsSeeEachOthersCommitsAtOnce) {
 
 TEST(Store, AReaderDoesNotWaitForAWriterAndSeesTheStateBefore) {
   TemporaryFolder const folder;
-  Store writer(folder.file("host.db"), furnish_nothing);
-  Store reader(folder.file("host.db"), furnish_nothing);
-  Transaction work(writer, Access::write);
-  simhost::store::add_switch(work, named("a"));
+  Store writer(folder.file("host.db"), populate_nothing);
+  Store reader(folder.file("host.db"), populate_nothing);
+  Transaction transaction(writer, Access::write);
+  simhost::storage::add_switch(transaction, named("a"));
   EXPECT_FALSE(has(reader, "a"));
-  work.commit();
+  transaction.commit();
   EXPECT_TRUE(has(reader, "a"));
 }
 
 TEST(Store, ATransactionSeesOneStateThroughout) {
   TemporaryFolder const folder;
-  Store writer(folder.file("host.db"), furnish_nothing);
-  Store reader(folder.file("host.db"), furnish_nothing);
-  Transaction work(reader, Access::read);
-  EXPECT_FALSE(simhost::store::find_switch(work, SwitchName::alias, "a"));
+  Store writer(folder.file("host.db"), populate_nothing);
+  Store reader(folder.file("host.db"), populate_nothing);
+  Transaction transaction(reader, Access::read);
+  EXPECT_FALSE(simhost::storage::find_switch(transaction, SwitchName::alias, "a"));
   add(writer, "a");
-  EXPECT_FALSE(simhost::store::find_switch(work, SwitchName::alias, "a"));
+  EXPECT_FALSE(simhost::storage::find_switch(transaction, SwitchName::alias, "a"));
 }
 
 TEST(Store, WithoutACommitNothingHappened) {
-  Store store(std::nullopt, furnish_nothing);
+  Store store(std::nullopt, populate_nothing);
   {
-    Transaction work(store, Access::write);
-    simhost::store::add_switch(work, named("a"));
+    Transaction transaction(store, Access::write);
+    simhost::storage::add_switch(transaction, named("a"));
   }
   EXPECT_FALSE(has(store, "a"));
   add(store, "a");
 }
 
 TEST(Store, EveryNameFindsItsSwitch) {
-  Store store(std::nullopt, furnish_nothing);
-  Transaction work(store, Access::write);
+  Store store(std::nullopt, populate_nothing);
+  Transaction transaction(store, Access::write);
   auto row = named("a");
   row.identifier = "i";
   row.portset = "p";
-  auto const key = simhost::store::add_switch(work, row);
+  auto const key = simhost::storage::add_switch(transaction, row);
   for (auto const &[kind, name] : {std::pair{SwitchName::alias, "a"},
                                    {SwitchName::identifier, "i"},
                                    {SwitchName::portset, "p"}}) {
-    auto const found = simhost::store::find_switch(work, kind, name);
+    auto const found = simhost::storage::find_switch(transaction, kind, name);
     ASSERT_TRUE(found.has_value()) << name;
     EXPECT_EQ(found->key, key);
     EXPECT_EQ(found->row.identifier, "i");
   }
-  EXPECT_FALSE(simhost::store::find_switch(work, SwitchName::identifier, "a"));
+  EXPECT_FALSE(simhost::storage::find_switch(transaction, SwitchName::identifier, "a"));
 }
 
 TEST(Store, LookUpsUseAnIndex) {
   TemporaryFolder const folder;
-  { Store const store(folder.file("host.db"), furnish_nothing); }
+  { Store const store(folder.file("host.db"), populate_nothing); }
   SQLite::Database database(folder.file("host.db").string());
   constexpr auto kProperty =
       "property WHERE switch = 1 AND scope = 0 AND ifnull(port, 0) = 0 AND name = ''";
@@ -180,27 +180,30 @@ TEST(Store, LookUpsUseAnIndex) {
 }
 
 TEST(Store, ARemovedSwitchTakesItsPortsAlongAndFreesItsUplinks) {
-  Store store(std::nullopt, furnish_nothing);
-  Transaction work(store, Access::write);
-  simhost::store::add_uplink(work, "u");
-  auto const key = simhost::store::add_switch(work, named("a")).value();
+  Store store(std::nullopt, populate_nothing);
+  Transaction transaction(store, Access::write);
+  simhost::storage::add_uplink(transaction, "u");
+  auto const key = simhost::storage::add_switch(transaction, named("a")).value();
   auto const port =
-      simhost::store::add_port(work, key, "uplink1", simhost::store::PortKind::uplink).value();
-  simhost::store::attach_uplink(work, "u", port);
-  EXPECT_TRUE(simhost::store::free_uplinks(work).empty());
-  simhost::store::remove_switch(work, key);
-  EXPECT_EQ(simhost::store::free_uplinks(work), std::vector<std::string>{"u"});
-  EXPECT_EQ(simhost::store::count_ports(work, key, simhost::store::PortKind::uplink), 0U);
+      simhost::storage::add_port(transaction, key, "uplink1", simhost::storage::PortKind::uplink)
+          .value();
+  simhost::storage::attach_uplink(transaction, "u", port);
+  EXPECT_TRUE(simhost::storage::free_uplinks(transaction).empty());
+  simhost::storage::remove_switch(transaction, key);
+  EXPECT_EQ(simhost::storage::free_uplinks(transaction), std::vector<std::string>{"u"});
+  EXPECT_EQ(simhost::storage::count_ports(transaction, key, simhost::storage::PortKind::uplink),
+            0U);
 }
 
 TEST(Store, APortNumberIsNeverUsedTwice) {
-  Store store(std::nullopt, furnish_nothing);
-  Transaction work(store, Access::write);
+  Store store(std::nullopt, populate_nothing);
+  Transaction transaction(store, Access::write);
   auto const add_switch_with_port = [&] {
-    auto const key = simhost::store::add_switch(work, named("a")).value();
+    auto const key = simhost::storage::add_switch(transaction, named("a")).value();
     auto const port =
-        simhost::store::add_port(work, key, "p", simhost::store::PortKind::client).value();
-    simhost::store::remove_switch(work, key);
+        simhost::storage::add_port(transaction, key, "p", simhost::storage::PortKind::client)
+            .value();
+    simhost::storage::remove_switch(transaction, key);
     return port;
   };
   auto const first = add_switch_with_port();
@@ -208,14 +211,14 @@ TEST(Store, APortNumberIsNeverUsedTwice) {
 }
 
 TEST(Store, APortIdentifierIsUniqueOnItsSwitch) {
-  Store store(std::nullopt, furnish_nothing);
-  Transaction work(store, Access::write);
-  auto const a = simhost::store::add_switch(work, named("a")).value();
-  auto const b = simhost::store::add_switch(work, named("b")).value();
-  using simhost::store::PortKind;
-  EXPECT_TRUE(simhost::store::add_port(work, a, "p", PortKind::client));
-  EXPECT_FALSE(simhost::store::add_port(work, a, "p", PortKind::client));
-  EXPECT_TRUE(simhost::store::add_port(work, b, "p", PortKind::client));
+  Store store(std::nullopt, populate_nothing);
+  Transaction transaction(store, Access::write);
+  auto const a = simhost::storage::add_switch(transaction, named("a")).value();
+  auto const b = simhost::storage::add_switch(transaction, named("b")).value();
+  using simhost::storage::PortKind;
+  EXPECT_TRUE(simhost::storage::add_port(transaction, a, "p", PortKind::client));
+  EXPECT_FALSE(simhost::storage::add_port(transaction, a, "p", PortKind::client));
+  EXPECT_TRUE(simhost::storage::add_port(transaction, b, "p", PortKind::client));
 }
 
 TEST(UnusableStateFile, ThatCannotBeOpened) {
@@ -250,11 +253,11 @@ TEST(UnusableStateFile, ThatIsAnotherProgramsDatabase) {
 TEST(UnusableStateFile, ThatHasAnotherSchema) {
   TemporaryFolder const folder;
   auto const file = folder.file("host.db");
-  { Store const store(file, furnish_nothing); }
+  { Store const store(file, populate_nothing); }
   SQLite::Database(file.string(), SQLite::OPEN_READWRITE).exec("PRAGMA user_version = 70");
   EXPECT_EQ(refusal_of(file), "the state file " + file.string() +
                                   " cannot be used: it has schema version 70, this host reads " +
-                                  std::to_string(simhost::store::kSchemaVersion));
+                                  std::to_string(simhost::storage::kSchemaVersion));
 }
 
 TEST(UnusableStateFile, AnEmptyFileIsANewState) {

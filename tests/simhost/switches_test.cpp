@@ -1,5 +1,5 @@
 // Switches: what is accepted and refused, at each bound and one past it.
-#include "core/switches.h"
+#include "model/switches/switches.h"
 
 #include <gmock/gmock.h>
 
@@ -8,57 +8,57 @@
 #include <vector>
 
 #include "memory_state.h"
-#include "store/switches.h"
+#include "storage/switches.h"
 #include "vswitch/mirror.h"
 
 namespace {
 
 using simhost::SwitchSpec;
-using simhost::store::Access;
-using simhost::store::SwitchName;
-using simhost::store::Transaction;
+using simhost::storage::Access;
+using simhost::storage::SwitchName;
+using simhost::storage::Transaction;
 
 struct Switches : MemoryState {
   QEX_ReturnStatus create(SwitchSpec const &spec) {
     return status_of([&] {
-      Transaction work(store, Access::write);
-      simhost::create_switch(work, spec);
-      work.commit();
+      Transaction transaction(store, Access::write);
+      simhost::create_switch(transaction, spec);
+      transaction.commit();
     });
   }
   QEX_ReturnStatus set_mtu(std::string_view alias, std::uint32_t mtu) {
     return status_of([&] {
-      Transaction work(store, Access::write);
-      simhost::set_mtu(work, alias, mtu);
-      work.commit();
+      Transaction transaction(store, Access::write);
+      simhost::set_mtu(transaction, alias, mtu);
+      transaction.commit();
     });
   }
   QEX_ReturnStatus destroy(std::string_view alias) {
     return status_of([&] {
-      Transaction work(store, Access::write);
-      simhost::destroy_switch(work, alias);
-      work.commit();
+      Transaction transaction(store, Access::write);
+      simhost::destroy_switch(transaction, alias);
+      transaction.commit();
     });
   }
   VSInfo info(std::string_view alias) {
-    Transaction work(store, Access::read);
-    return simhost::switch_info(work, alias);
+    Transaction transaction(store, Access::read);
+    return simhost::switch_info(transaction, alias);
   }
-  simhost::store::Switch row(std::string_view alias) {
-    Transaction work(store, Access::read);
-    return simhost::store::find_switch(work, SwitchName::alias, alias).value().row;
+  simhost::storage::Switch row(std::string_view alias) {
+    Transaction transaction(store, Access::read);
+    return simhost::storage::find_switch(transaction, SwitchName::alias, alias).value().row;
   }
   std::vector<std::string> uplinks(std::string_view alias) {
-    Transaction work(store, Access::read);
+    Transaction transaction(store, Access::read);
     std::vector<std::string> names;
-    for (auto const &uplink : simhost::uplinks_of(work, alias)) {
+    for (auto const &uplink : simhost::uplinks_of(transaction, alias)) {
       names.push_back(uplink.name);
     }
     return names;
   }
   std::size_t free_uplinks() {
-    Transaction work(store, Access::read);
-    return simhost::store::free_uplinks(work).size();
+    Transaction transaction(store, Access::read);
+    return simhost::storage::free_uplinks(transaction).size();
   }
 };
 
@@ -115,11 +115,11 @@ TEST_F(Switches, TellAboutThemselves) {
 TEST_F(Switches, CountTheirPorts) {
   ASSERT_EQ(create({.alias = "first"}), QEX_OK);
   {
-    Transaction work(store, Access::write);
-    auto const key = simhost::store::find_switch(work, SwitchName::alias, "first")->key;
-    simhost::store::add_port(work, key, "p1", simhost::store::PortKind::client);
-    simhost::store::add_port(work, key, "p2", simhost::store::PortKind::client);
-    work.commit();
+    Transaction transaction(store, Access::write);
+    auto const key = simhost::storage::find_switch(transaction, SwitchName::alias, "first")->key;
+    simhost::storage::add_port(transaction, key, "p1", simhost::storage::PortKind::client);
+    simhost::storage::add_port(transaction, key, "p2", simhost::storage::PortKind::client);
+    transaction.commit();
   }
   EXPECT_EQ(info("first").activePorts, 2U);
 }
@@ -205,10 +205,10 @@ TEST_F(Switches, MoreUplinksThanAreFreeLeaveNothingBehind) {
 TEST_F(Switches, UplinkPortsHaveNumbersOfTheirOwn) {
   ASSERT_EQ(create({.alias = "a", .uplink_count = 2}), QEX_OK);
   ASSERT_EQ(create({.alias = "b", .uplink_count = 2}), QEX_OK);
-  Transaction work(store, Access::read);
+  Transaction transaction(store, Access::read);
   std::vector<std::uint32_t> numbers{0};
   for (auto const *alias : {"a", "b"}) {
-    for (auto const &uplink : simhost::uplinks_of(work, alias)) {
+    for (auto const &uplink : simhost::uplinks_of(transaction, alias)) {
       numbers.push_back(static_cast<std::uint32_t>(uplink.port));
     }
   }
@@ -236,11 +236,11 @@ TEST_F(Switches, OtherKindsOfNameAreNoAlias) {
 
 TEST_F(Switches, NamesTranslate) {
   ASSERT_EQ(create({.alias = "a", .identifier = "i", .portset = "p"}), QEX_OK);
-  Transaction work(store, Access::read);
-  EXPECT_EQ(simhost::identifier_of(work, "a"), "i");
-  EXPECT_EQ(simhost::portset_of(work, "a"), "p");
-  EXPECT_EQ(simhost::alias_of_portset(work, "p"), "a");
-  EXPECT_EQ(status_of([&] { simhost::alias_of_portset(work, "a"); }), QEX_NOT_FOUND);
+  Transaction transaction(store, Access::read);
+  EXPECT_EQ(simhost::identifier_of(transaction, "a"), "i");
+  EXPECT_EQ(simhost::portset_of(transaction, "a"), "p");
+  EXPECT_EQ(simhost::alias_of_portset(transaction, "p"), "a");
+  EXPECT_EQ(status_of([&] { simhost::alias_of_portset(transaction, "a"); }), QEX_NOT_FOUND);
 }
 
 }  // namespace

@@ -1,5 +1,5 @@
 // Links, groups of links, and which of them a port uses.
-#include "dataplane/teaming.h"
+#include "planes/stored/teaming.h"
 
 #include <gmock/gmock.h>
 
@@ -9,9 +9,9 @@
 #include <string>
 #include <vector>
 
-#include "core/runtime_options.h"
-#include "dataplane/counters.h"
+#include "model/options/runtime_options.h"
 #include "plane.h"
+#include "planes/stored/counters.h"
 #include "qexapi/switch_properties.h"
 #include "vswitch/lags.h"
 #include "vswitch/properties.h"
@@ -19,17 +19,17 @@
 
 namespace {
 
-using simhost::dataplane::Link;
+using simhost::stored::Link;
 using testing::ElementsAre;
 
 struct Teaming : Plane {
-  std::string hint(simhost::store::Port const &port) {
-    return simhost::data_plane().team_uplink(work, port);
+  std::string hint(simhost::storage::Port const &port) {
+    return simhost::running_plane().team_uplink(transaction, port);
   }
   void change(char const *uplink, void (*how)(Link &)) {
-    auto link = simhost::dataplane::link_of(work, uplink);
+    auto link = simhost::stored::link_of(transaction, uplink);
     how(link);
-    simhost::dataplane::change_link(work, uplink, link);
+    simhost::stored::change_link(transaction, uplink, link);
   }
   void down(char const *uplink) {
     change(uplink, [](Link &link) { link.carrier = false; });
@@ -38,7 +38,7 @@ struct Teaming : Plane {
     change(uplink, [](Link &link) { link.carrier = true; });
   }
   std::uint64_t counted(char const *name) {
-    return simhost::dataplane::counters_of(work, {.switch_key = key})[name];
+    return simhost::stored::counters_of(transaction, {.switch_key = key})[name];
   }
 };
 
@@ -60,7 +60,7 @@ VSTeamPolicy policy(std::initializer_list<char const *> active,
 TEST_F(Teaming, WithoutAPolicyPortsSpreadOverAllUplinks) {
   std::set<std::string> used{hint(p1), hint(p2)};
   for (auto const *name : {"p3", "p4"}) {
-    used.insert(hint(simhost::add_client_port(work, key, name)));
+    used.insert(hint(simhost::add_client_port(transaction, key, name)));
   }
   EXPECT_THAT(used, ElementsAre("nic0", "nic1", "nic2"));
 }
@@ -94,10 +94,10 @@ TEST_F(Teaming, ARollingTeamStaysWhereItIs) {
   rolling.flags = TEAM_FRP_FLAG_ROLLING;
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, rolling);
   EXPECT_EQ(hint(p1), "nic0");
-  simhost::step_clock(work, std::chrono::seconds(1));
+  simhost::step_clock(transaction, std::chrono::seconds(1));
   down("nic0");
   EXPECT_EQ(hint(p1), "nic1");
-  simhost::step_clock(work, std::chrono::seconds(1));
+  simhost::step_clock(transaction, std::chrono::seconds(1));
   up("nic0");
   EXPECT_EQ(hint(p1), "nic1") << "nothing moves until it must";
   down("nic1");
@@ -106,22 +106,22 @@ TEST_F(Teaming, ARollingTeamStaysWhereItIs) {
 
 TEST_F(Teaming, TheAdminSwitchTakesALinkDown) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
-  simhost::data_plane().set_admin_state(work, "nic0", false);
-  EXPECT_FALSE(simhost::data_plane().link_is_up(work, "nic0"));
+  simhost::running_plane().set_admin_state(transaction, "nic0", false);
+  EXPECT_FALSE(simhost::running_plane().link_is_up(transaction, "nic0"));
   EXPECT_EQ(hint(p1), "nic1");
-  simhost::data_plane().set_admin_state(work, "nic0", true);
-  EXPECT_TRUE(simhost::data_plane().link_is_up(work, "nic0"));
+  simhost::running_plane().set_admin_state(transaction, "nic0", true);
+  EXPECT_TRUE(simhost::running_plane().link_is_up(transaction, "nic0"));
   EXPECT_EQ(hint(p1), "nic0");
 }
 
 TEST_F(Teaming, AnUplinkIsUsedOnlyAfterTheUpDelay) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
-  simhost::set_runtime_option(work, VS_RT_OPT_TEAM_POLICY_UP_DELAY, 500);
+  simhost::set_runtime_option(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY, 500);
   down("nic0");
   up("nic0");
-  simhost::step_clock(work, std::chrono::milliseconds(499));
+  simhost::step_clock(transaction, std::chrono::milliseconds(499));
   EXPECT_EQ(hint(p1), "nic1");
-  simhost::step_clock(work, std::chrono::milliseconds(1));
+  simhost::step_clock(transaction, std::chrono::milliseconds(1));
   EXPECT_EQ(hint(p1), "nic0");
 }
 
@@ -180,9 +180,10 @@ TEST_F(Teaming, AnUplinkFailsWithMoreErrorsThanThePolicyBears) {
 }
 
 TEST_F(Teaming, ABlockedUplinkPortIsNotUsedWhereItIsACriterion) {
-  auto const uplink_port = simhost::known_port(work, key, "uplink1");
+  auto const uplink_port = simhost::get_port(transaction, key, "uplink1");
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
-  simhost::set_property(work, of(uplink_port), QEX_NEBPROP_PORT_BLOCK, std::vector{std::byte{1}});
+  simhost::set_property(transaction, of(uplink_port), QEX_NEBPROP_PORT_BLOCK,
+                        std::vector{std::byte{1}});
   EXPECT_EQ(hint(p1), "nic0");
   auto careful = policy({"uplink1"}, {"uplink2"});
   careful.linkCriteria = TEAM_FRP_CRIT_PORT_BLOCKED;
@@ -191,8 +192,8 @@ TEST_F(Teaming, ABlockedUplinkPortIsNotUsedWhereItIsACriterion) {
 }
 
 TEST_F(Teaming, APolicyNamesUplinkPortsByTheirNames) {
-  auto const uplink_port = simhost::known_port(work, key, "uplink2");
-  simhost::set_property(work, of(uplink_port), QEX_NEBPROP_PORT_ALIAS,
+  auto const uplink_port = simhost::get_port(transaction, key, "uplink2");
+  simhost::set_property(transaction, of(uplink_port), QEX_NEBPROP_PORT_ALIAS,
                         simhost::bytes_of_text("right"));
   for (auto const *name : {"right", "uplink2", "nic1"}) {
     set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({name}));
@@ -202,7 +203,7 @@ TEST_F(Teaming, APolicyNamesUplinkPortsByTheirNames) {
 
 TEST_F(Teaming, AnOverrideBindsAPort) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}));
-  simhost::set_property(work, of(p1), VSPROP_PORT_TEAMING_OVERRIDE,
+  simhost::set_property(transaction, of(p1), VSPROP_PORT_TEAMING_OVERRIDE,
                         simhost::bytes_of_text("uplink3"));
   EXPECT_EQ(hint(p1), "nic2");
   EXPECT_EQ(hint(p2), "nic0");
@@ -215,10 +216,12 @@ TEST_F(Teaming, TheStatusSaysWhyThereIsNoUplink) {
     down(uplink);
   }
   EXPECT_EQ(status_of([&] { hint(p1); }), QEX_ENETDOWN);
-  simhost::create_switch(work, {.alias = "alone"});
-  auto const port = simhost::add_client_port(work, simhost::known_switch(work, "alone").key, "p");
+  simhost::create_switch(transaction, {.alias = "alone"});
+  auto const port =
+      simhost::add_client_port(transaction, simhost::get_switch(transaction, "alone").key, "p");
   EXPECT_EQ(status_of([&] { hint(port); }), QEX_ENETUNREACH);
-  EXPECT_EQ(status_of([&] { hint(simhost::known_port(work, key, "uplink1")); }), QEX_NOT_SUPPORTED);
+  EXPECT_EQ(status_of([&] { hint(simhost::get_port(transaction, key, "uplink1")); }),
+            QEX_NOT_SUPPORTED);
 }
 
 TEST_F(Teaming, MovesAreAnnounced) {
@@ -233,7 +236,7 @@ TEST_F(Teaming, MovesAreAnnounced) {
   EXPECT_EQ(counted("rarpPktsSent"), 1U) << "nothing moved";
   up("nic0");
   EXPECT_EQ(counted("rarpPktsSent"), 2U);
-  simhost::set_runtime_option(work, VS_RT_OPT_MAX_RARPS_PER_INTERVAL, 0);
+  simhost::set_runtime_option(transaction, VS_RT_OPT_MAX_RARPS_PER_INTERVAL, 0);
   down("nic0");
   EXPECT_EQ(counted("rarpPktsSent"), 2U);
 }
@@ -242,31 +245,31 @@ TEST_F(Teaming, ASwitchThatDoesNotRunAnnouncesNothing) {
   auto notifying = policy({"uplink1"}, {"uplink2"});
   notifying.flags = TEAM_FRP_FLAG_NOTIFY_SWITCH;
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, notifying);
-  simhost::change_running(work, key, false);
+  simhost::change_running(transaction, key, false);
   down("nic0");
   EXPECT_EQ(counted("rarpPktsSent"), 0U);
   EXPECT_EQ(hint(p1), "nic1");
 }
 
 struct Lags : Teaming {
-  std::vector<simhost::Lag> lags() { return simhost::data_plane().lags(work, key); }
+  std::vector<simhost::Lag> lags() { return simhost::running_plane().lags(transaction, key); }
   QEX_ReturnStatus put(std::string const &name, std::vector<std::string> const &uplinks) {
-    return status_of([&] { simhost::dataplane::put_lag(work, key, name, uplinks); });
+    return status_of([&] { simhost::stored::put_lag(transaction, key, name, uplinks); });
   }
 };
 
 TEST_F(Lags, AreUpWhileAnUplinkIs) {
   ASSERT_EQ(put("lag1", {"nic0", "nic1"}), QEX_OK);
-  EXPECT_TRUE(simhost::data_plane().lacp_is_up(work, "nic0"));
-  EXPECT_FALSE(simhost::data_plane().lacp_is_up(work, "nic2")) << "it is in no group";
+  EXPECT_TRUE(simhost::running_plane().lacp_is_up(transaction, "nic0"));
+  EXPECT_FALSE(simhost::running_plane().lacp_is_up(transaction, "nic2")) << "it is in no group";
   down("nic0");
   EXPECT_TRUE(lags().at(0).up());
   EXPECT_FALSE(lags().at(0).members.at(0).up);
   EXPECT_TRUE(lags().at(0).members.at(1).up);
   change("nic1", [](Link &link) { link.partner = false; });
   EXPECT_FALSE(lags().at(0).up());
-  EXPECT_TRUE(simhost::data_plane().link_is_up(work, "nic1"));
-  EXPECT_FALSE(simhost::data_plane().lacp_is_up(work, "nic1"));
+  EXPECT_TRUE(simhost::running_plane().link_is_up(transaction, "nic1"));
+  EXPECT_FALSE(simhost::running_plane().lacp_is_up(transaction, "nic1"));
 }
 
 TEST_F(Lags, MayBeInATeam) {
@@ -300,7 +303,7 @@ TEST_F(Lags, AreLimited) {
 
 TEST_F(Lags, LoseTheUplinksThatLeaveTheSwitch) {
   ASSERT_EQ(put("lag1", {"nic0", "nic1"}), QEX_OK);
-  simhost::remove_uplink_port(work, key, "nic0");
+  simhost::remove_uplink_port(transaction, key, "nic0");
   ASSERT_EQ(lags().at(0).members.size(), 1U);
   EXPECT_EQ(lags().at(0).members.at(0).uplink, "nic1");
 }

@@ -3,18 +3,18 @@
 
 #include <string>
 
-#include "core/trap.h"
+#include "abi/trap.h"
 
 namespace {
 
 std::string described(std::string_view message) {
-  simhost::PanicReport report;
-  simhost::describe(report, simhost::PanicKind::os_error, "Call", message);
-  EXPECT_EQ(report.kind, simhost::PanicKind::os_error);
+  simhost::TrapReport report;
+  simhost::describe(report, simhost::TrapKind::os_error, "Call", message);
+  EXPECT_EQ(report.kind, simhost::TrapKind::os_error);
   return report.text.data();
 }
 
-constexpr std::size_t kRoom = sizeof(simhost::PanicReport::text) - sizeof "Call: ";
+constexpr std::size_t kRoom = sizeof(simhost::TrapReport::text) - sizeof "Call: ";
 
 TEST(TrapText, NamesTheCall) {
   EXPECT_EQ(described("gone"), "Call: gone");

@@ -21,7 +21,7 @@ from typing import Any, Callable, Counter, Dict, List, Tuple
 import libvswitch as vs
 
 SIMHOST = ctypes.CDLL(str(Path(os.environ["BUILD_DIR"]) / "simhost" / "libsimhost.so"))
-DEFAULT_HOST = Path(__file__).parents[3] / "simhost" / "control" / "default_host.json"
+DEFAULT_HOST = Path(__file__).parents[3] / "simhost" / "scenario" / "default_host.json"
 Change = Callable[[random.Random], Any]
 CHANGES: Dict[str, Change] = {}
 

@@ -13,7 +13,7 @@ SIMHOST = Path(__file__).parents[3] / "simhost"
 TEXT = (SIMHOST / "SCENARIOS.md").read_text(encoding="utf-8")
 EXAMPLES = re.findall(r"^```json\n(.*?)^```", TEXT, re.MULTILINE | re.DOTALL)
 SOURCES = [
-    SIMHOST / "control" / name
+    SIMHOST / "scenario" / name
     for name in ("scenario.cpp", "scenario_switches.cpp", "policy_documents.cpp")
 ]
 
@@ -67,7 +67,7 @@ def test_every_example_is_a_document(host: Host, example: str) -> None:
 def test_the_default_host_is_a_document_like_any_other(host: Host, tmp_path: Path) -> None:
     other = Host(tmp_path / "other")
     (tmp_path / "other").mkdir()
-    other.environment["SIMHOST_SCENARIO"] = str(SIMHOST / "control" / "default_host.json")
+    other.environment["SIMHOST_SCENARIO"] = str(SIMHOST / "scenario" / "default_host.json")
     fresh, again = host.described(), other.described()
     assert fresh["uplinks"] == again["uplinks"]
     for shown in (fresh, again):

@@ -1,0 +1,14 @@
+// The host as it is when nobody has changed it yet.
+#pragma once
+
+namespace simhost::storage {
+class Transaction;
+}
+
+namespace simhost {
+
+/// Fills an empty state with what the document says that SIMHOST_SCENARIO names; without one, with
+/// the default host. Throws scenario::DocumentError for a document that cannot be used.
+void populate_fresh_host(storage::Transaction &transaction);
+
+}  // namespace simhost

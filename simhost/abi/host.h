@@ -1,0 +1,42 @@
+// The host of this process: both libraries and all threads share it.
+#pragma once
+
+#include <filesystem>
+#include <mutex>
+#include <optional>
+
+#include "abi/data_lists.h"
+#include "abi/handles.h"
+#include "abi/ledger.h"
+#include "storage/store.h"
+
+namespace simhost {
+
+/// Everything in it is used under its lock.
+class Host {
+ public:
+  /// The lock of all below. Not recursive: nothing of the caller's may run while it is held.
+  std::mutex &lock() { return lock_; }
+  Ledger &ledger() { return ledger_; }
+  Handles &handles() { return handles_; }
+  DataLists &lists() { return lists_; }
+  /// The state; opened on first use, from the file that SIMHOST_STATE names then, or in memory.
+  /// Throws storage::UnusableState.
+  storage::Store &state();
+  /// Closes a state file; state() opens it again. A state in memory stays.
+  void close_state_file();
+
+ private:
+  std::mutex lock_;
+  Ledger ledger_;
+  Handles handles_;
+  DataLists lists_{ledger_};
+  bool configured_ = false;
+  std::optional<std::filesystem::path> state_file_;
+  std::optional<storage::Store> state_;
+};
+
+/// Lives as long as the process.
+Host &this_host();
+
+}  // namespace simhost

@@ -1,0 +1,21 @@
+// The calls that model nothing: with sound arguments each answers one status, whatever the state.
+// The table of calls is made from this file and from the symbols of the libraries, so a call that
+// stands here stands there as fixed, with the status that it answers.
+#include "abi/boundary.h"
+#include "abi/targets.h"
+#include "nebpublic/kernel_state.h"
+
+using simhost::answer;
+using simhost::Call;
+
+// No switch here has commands of its own.
+extern "C" QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command,
+                                           void * /*input*/, int /*inputLength*/,
+                                           void ** /*output*/, int * /*outputLength*/) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = simhost::switch_identified(switchId);
+    simhost::require_text(command);
+    simhost::found(call.reading(), target);
+    simhost::refuse(QEX_NOT_SUPPORTED);
+  });
+}

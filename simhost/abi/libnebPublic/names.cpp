@@ -1,0 +1,63 @@
+// From one name of a switch to another.
+#include "nebpublic/names.h"
+
+#include <algorithm>
+#include <string>
+
+#include "abi/boundary.h"
+#include "model/lookup.h"
+#include "model/switches/switches.h"
+
+using simhost::answer;
+using simhost::Call;
+using simhost::require;
+using simhost::require_text;
+using simhost::storage::SwitchName;
+
+namespace {
+
+// Every name that the host accepts fits the field that the caller has for its kind.
+void copy_text(std::string const &text, char *output) {
+  *std::copy(text.begin(), text.end(), output) = '\0';
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus DVSAliasToSwitchId(char const *alias, char switchId[64]) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = require_text(alias);
+    auto *const output = &require(switchId);
+    copy_text(simhost::identifier_of(call.reading(), name), output);
+  });
+}
+
+QEX_ReturnStatus DVSPortsetNameToAlias(char const *portsetName, char alias[128]) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = require_text(portsetName);
+    auto *const output = &require(alias);
+    copy_text(simhost::alias_of_portset(call.reading(), name), output);
+  });
+}
+
+QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetBuffer) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = require_text(alias);
+    auto *const output = &require(portsetBuffer);
+    copy_text(simhost::portset_of(call.reading(), name), output);
+  });
+}
+
+char DVPortExist(char const *switchId, char const *port) {
+  char exists = 0;
+  simhost::run(__func__, [&](Call &call) {
+    if (switchId != nullptr && port != nullptr) {
+      exists = static_cast<char>(
+          simhost::find_port(call.reading(), SwitchName::identifier, switchId, port).has_value());
+    }
+  });
+  return exists;
+}
+
+}  // extern "C"

@@ -1,0 +1,116 @@
+// VSDVS_*: VLANs of ports and private VLANs of switches.
+#include <span>
+
+#include "abi/targets.h"
+#include "model/vlans/vlans.h"
+#include "vswitch/configuration.h"
+#include "vswitch/properties.h"
+
+using simhost::answer;
+using simhost::Call;
+using simhost::port_of;
+using simhost::RecordProperty;
+using simhost::require;
+using simhost::switch_called;
+
+namespace {
+
+constexpr RecordProperty<qex_Bool> kNestedTag{.key = VSPROP_PORT_VLAN_NESTEDTAG, .unset = 0};
+
+// No list has more entries than there are VLANs.
+constexpr int kMostEntries = 4096;
+
+// An array of the caller; refuses null with a count, and a count that nothing can have, before that
+// much is read (QEX_BAD_PARAM).
+template <typename Entry>
+std::span<Entry const> array(Entry const *first, int count) {
+  if (count < 0 || count > kMostEntries || (first == nullptr && count != 0)) {
+    simhost::refuse(QEX_BAD_PARAM);
+  }
+  return {first, static_cast<std::size_t>(count)};
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *port,
+                                         VSPortVlanPolicy **policy, int *priority) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = port_of(switch_called(switchName), port);
+    auto &policy_output = require(policy);
+    auto &priority_output = require(priority);
+    auto &transaction = call.reading();
+    auto const found = simhost::found(transaction, target);
+    auto const bytes = simhost::vlan_policy_of(transaction, found);
+    priority_output = simhost::priority_of(transaction, found);
+    policy_output = simhost::allocate<VSPortVlanPolicy>(call, bytes);
+  });
+}
+
+QEX_ReturnStatus VSDVS_SetPortVLANPolicy(char const *switchName, char const *port,
+                                         qex_uint16 vlanID, int priority, qex_Bool guestTagging,
+                                         qex_Bool privateVlan, qex_NEBPortVIDRange *ranges,
+                                         qex_uint16 numRanges) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = port_of(switch_called(switchName), port);
+    simhost::VlanSpec const spec{.vlan = vlanID,
+                                 .priority = priority,
+                                 .guest_tagging = guestTagging != 0,
+                                 .private_vlan = privateVlan != 0,
+                                 .ranges = array(ranges, numRanges)};
+    auto &transaction = call.changing();
+    simhost::set_vlans(transaction, simhost::found(transaction, target), spec);
+  });
+}
+
+QEX_ReturnStatus VSDVS_ClearPortVLANPolicy(char const *switchName, char const *port) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = port_of(switch_called(switchName), port);
+    auto &transaction = call.changing();
+    simhost::clear_vlans(transaction, simhost::found(transaction, target));
+  });
+}
+
+QEX_ReturnStatus VSDVS_GetPortNestedVLANTagging(char const *switchName, char const *port,
+                                                qex_Bool *enabled) {
+  return answer(__func__, [&](Call &call) {
+    require(enabled) = simhost::read(call, port_of(switch_called(switchName), port), kNestedTag);
+  });
+}
+
+QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char const *port,
+                                                qex_Bool enabled) {
+  return answer(__func__, [&](Call &call) {
+    auto const value = static_cast<qex_Bool>(enabled != 0);
+    simhost::write(call, port_of(switch_called(switchName), port), kNestedTag, value);
+  });
+}
+
+QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry **entries,
+                                         int *count) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = switch_called(switchName);
+    auto &entries_output = require(entries);
+    auto &count_output = require(count);
+    auto &transaction = call.reading();
+    auto const property = simhost::get_property(transaction, simhost::owner_of(transaction, target),
+                                                VSPROP_PVLAN_MAP);
+    auto const bytes = property ? simhost::BytesView(property->value) : simhost::BytesView();
+    count_output = static_cast<int>(bytes.size() / sizeof(VSPvlanMapEntry));
+    entries_output = bytes.empty() ? nullptr : simhost::allocate<VSPvlanMapEntry>(call, bytes);
+  });
+}
+
+QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry const *entries,
+                                         int count) {
+  return answer(__func__, [&](Call &call) {
+    auto const target = switch_called(switchName);
+    auto const map = array(entries, count);
+    auto &transaction = call.changing();
+    simhost::set_property(transaction, simhost::owner_of(transaction, target), VSPROP_PVLAN_MAP,
+                          std::as_bytes(map));
+  });
+}
+
+}  // extern "C"

@@ -1,0 +1,65 @@
+// VSQEX_*: asking the running switches about themselves, and giving back what they answered with.
+#include "vswitch/queries.h"
+
+#include <algorithm>
+#include <vector>
+
+#include "abi/libvswitch/results.h"
+#include "model/lookup.h"
+#include "model/switches/switches.h"
+
+using simhost::answer;
+using simhost::Call;
+using simhost::require;
+using simhost::require_text;
+
+namespace {
+
+VSUplinks_entries entry_of(simhost::storage::AttachedUplink const &uplink) {
+  VSUplinks_entries entry{};
+  entry.name = simhost::name_of(uplink.name);
+  entry.portID = static_cast<qex_SwitchPortID>(uplink.port);
+  return entry;
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus VSQEX_GetVSInfo(char const *switchName, VSInfo *info) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    require(info) = simhost::switch_info(call.reading(), alias);
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    auto &output = require(uplinks);
+    auto const attached = simhost::uplinks_of(call.reading(), alias);
+    std::vector<VSUplinks_entries> entries(attached.size());
+    std::transform(attached.begin(), attached.end(), entries.begin(), entry_of);
+    output = simhost::give_list<VSUplinks>(call, entries);
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer) {
+  return answer(__func__, [&](Call &call) {
+    auto const name = require_text(uplink);
+    auto *const output = &require(portBuffer);
+    auto &state = call.reading();
+    auto const found = simhost::get_uplink(state, name);
+    if (!found.port) {
+      simhost::refuse(QEX_IS_DISCONNECTED);
+    }
+    auto const identifier = simhost::get_port(state, *found.port).identifier;
+    output[identifier.copy(output, 48)] = '\0';
+  });
+}
+
+void VSQEX_FreeMemory(void *memory) {
+  simhost::run(__func__, [&](Call &call) { call.ledger().release(memory, call.name()); });
+}
+
+}  // extern "C"

@@ -1,0 +1,120 @@
+// VSQEX_*: MAC tables and MAC learning.
+#include "abi/libvswitch/results.h"
+#include "model/lookup.h"
+#include "model/options/host_settings.h"
+#include "model/plane.h"
+#include "vswitch/queries.h"
+
+using simhost::answer;
+using simhost::Call;
+using simhost::Place;
+using simhost::require;
+using simhost::require_text;
+using simhost::running_plane;
+using simhost::storage::Transaction;
+
+namespace {
+
+VSMACAddrType checked(VSMACAddrType type) {
+  if (static_cast<unsigned>(type) > VS_MAC_ADDR_TYPE_ALL) {
+    simhost::refuse(QEX_BAD_PARAM);
+  }
+  return type;
+}
+
+Place team(Transaction &transaction, std::string_view alias) {
+  return {.switch_key = simhost::get_running_switch(transaction, alias).key, .port = std::nullopt};
+}
+
+Place port_of(Transaction &transaction, std::string_view alias, std::string_view identifier) {
+  auto const key = simhost::get_running_switch(transaction, alias).key;
+  return {.switch_key = key, .port = simhost::get_port(transaction, key, identifier).number};
+}
+
+// Lets `change` work with an entry on the table of a port.
+template <typename Change>
+void change_table(Call &call, char const *switch_name, char const *port, VSMACEntry const *entry,
+                  Change const &change) {
+  auto const alias = require_text(switch_name);
+  auto const identifier = require_text(port);
+  auto const &wanted = require(entry);
+  auto &transaction = call.changing();
+  change(transaction, port_of(transaction, alias, identifier), wanted);
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus VSQEX_GetTeamMACTable(char const *switchName, VSMACAddrType type,
+                                       VSMACTable **table) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    auto &output = require(table);
+    auto const wanted = checked(type);
+    auto &transaction = call.reading();
+    auto const entries = running_plane().addresses(transaction, team(transaction, alias), wanted);
+    output = simhost::give_list<VSMACTable>(call, entries);
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetPortMACTable(char const *switchName, char const *port, VSMACAddrType type,
+                                       VSMACTable **table) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    auto const identifier = require_text(port);
+    auto &output = require(table);
+    auto const wanted = checked(type);
+    auto &transaction = call.reading();
+    auto const entries =
+        running_plane().addresses(transaction, port_of(transaction, alias, identifier), wanted);
+    output = simhost::give_list<VSMACTable>(call, entries);
+  });
+}
+
+QEX_ReturnStatus VSQEX_SetPortMACTable(char const *switchName, char const *port,
+                                       VSMACEntry const *entry) {
+  return answer(__func__, [&](Call &call) {
+    change_table(call, switchName, port, entry,
+                 [](Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
+                   running_plane().put_address(transaction, place, wanted);
+                 });
+  });
+}
+
+QEX_ReturnStatus VSQEX_ClearPortMACTable(char const *switchName, char const *port,
+                                         VSMACEntry const *entry) {
+  return answer(__func__, [&](Call &call) {
+    change_table(call, switchName, port, entry,
+                 [](Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
+                   running_plane().remove_address(transaction, place, wanted);
+                 });
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetPortMACLearningStats(char const *switchName, char const *port,
+                                               VSPMACLearningStats *stats) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    auto const identifier = require_text(port);
+    auto &output = require(stats);
+    auto &transaction = call.reading();
+    output = running_plane().learning_stats(transaction, port_of(transaction, alias, identifier));
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetGlobalMACLearningProps(VSMACLearningGlobalProps *props) {
+  return answer(__func__, [&](Call &call) {
+    auto &output = require(props);
+    output = simhost::global_mac_learning(call.reading());
+  });
+}
+
+QEX_ReturnStatus VSQEX_SetGlobalMACLearningProps(VSMACLearningGlobalProps *props) {
+  return answer(__func__, [&](Call &call) {
+    auto const &wanted = require(props);
+    simhost::set_global_mac_learning(call.changing(), wanted);
+  });
+}
+
+}  // extern "C"

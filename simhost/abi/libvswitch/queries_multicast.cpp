@@ -1,0 +1,102 @@
+// VSQEX_*: multicast filters.
+#include <vector>
+
+#include "abi/libvswitch/results.h"
+#include "model/lookup.h"
+#include "model/plane.h"
+#include "model/properties/properties.h"
+#include "vswitch/properties.h"
+#include "vswitch/queries.h"
+
+using simhost::AddressBytes;
+using simhost::answer;
+using simhost::Call;
+using simhost::require;
+using simhost::require_text;
+using simhost::running_plane;
+
+namespace {
+
+// The bytes of a group's address in the form of a mode. Snooping is not the form of one protocol.
+std::size_t address_length(VSMcastFilterMode mode) {
+  switch (mode) {
+    case VS_MCAST_FILTER_MODE_LEGACY:
+      return sizeof(qex_EthAddress);
+    case VS_MCAST_FILTER_MODE_IGMP:
+      return sizeof(qex_IPv4Address);
+    case VS_MCAST_FILTER_MODE_MLD:
+      return sizeof(qex_IPv6Address);
+    default:
+      simhost::refuse(QEX_BAD_PARAM);
+  }
+}
+
+simhost::storage::PortNumber port_of(simhost::storage::Transaction &transaction,
+                                     std::string_view alias, qex_SwitchPortID port) {
+  auto const key = simhost::get_running_switch(transaction, alias).key;
+  return simhost::get_port(transaction, key, simhost::storage::PortNumber{port}).number;
+}
+
+std::vector<std::byte> joined(std::vector<AddressBytes> const &addresses) {
+  std::vector<std::byte> all;
+  for (auto const &address : addresses) {
+    all.insert(all.end(), address.begin(), address.end());
+  }
+  return all;
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus VSQEX_GetMcastFilters(char const *switchName, qex_SwitchPortID port,
+                                       VSMcastFilterMode mode, VSMcastFilters **filters) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    auto &output = require(filters);
+    auto const length = address_length(mode);
+    auto &transaction = call.reading();
+    auto const groups =
+        running_plane().groups(transaction, port_of(transaction, alias, port), length);
+    output = simhost::give_counted<VSMcastFilters>(call, joined(groups), groups.size());
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetMcastFilterStats(char const *switchName, qex_SwitchPortID port,
+                                           VSMcastFilterMode mode, unsigned char const *group,
+                                           VSMcastFilterStats **stats) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    auto &output = require(stats);
+    auto const *const first = reinterpret_cast<std::byte const *>(&require(group));
+    AddressBytes const address(first, first + address_length(mode));
+    auto &transaction = call.reading();
+    auto const found =
+        running_plane().group(transaction, port_of(transaction, alias, port), address);
+    if (!found) {
+      simhost::refuse(QEX_NOT_FOUND);
+    }
+    auto *const record = simhost::give_counted<VSMcastFilterStats>(call, joined(found->sources),
+                                                                   found->sources.size());
+    record->version = found->version;
+    record->srcIPFilterMode = found->source_mode;
+    record->updateTime = static_cast<qex_uint64>(found->updated / std::chrono::seconds(1));
+    record->vni = found->vni;
+    output = record;
+  });
+}
+
+QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode) {
+  return answer(__func__, [&](Call &call) {
+    auto const alias = require_text(switchName);
+    auto &output = require(mode);
+    auto &transaction = call.reading();
+    auto const owner = simhost::storage::PropertyOwner::global(
+        simhost::get_running_switch(transaction, alias).key);
+    simhost::RecordProperty<int> const filter{.key = VSPROP_MULTICAST_FILTER,
+                                              .unset = VS_MCAST_FILTER_MODE_LEGACY};
+    output = simhost::read(transaction, owner, filter);
+  });
+}
+
+}  // extern "C"

@@ -1,0 +1,49 @@
+// VSQEX_*: the runtime options of the host.
+#include <cstring>
+#include <numeric>
+#include <vector>
+
+#include "abi/libvswitch/results.h"
+#include "model/options/runtime_options.h"
+#include "vswitch/queries.h"
+
+using simhost::answer;
+using simhost::Call;
+using simhost::require;
+
+namespace {
+
+std::vector<qex_uint16> wanted_types(qex_uint16 const *ids, qex_uint16 count) {
+  if (ids == nullptr && count == 0) {
+    std::vector<qex_uint16> all(VS_NUM_RT_OPT);
+    std::iota(all.begin(), all.end(), qex_uint16{0});
+    return all;
+  }
+  auto const *const first = &require(ids);
+  return {first, first + count};
+}
+
+}  // namespace
+
+extern "C" {
+
+QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count,
+                                         VSRuntimeOptions **options) {
+  return answer(__func__, [&](Call &call) {
+    auto &output = require(options);
+    auto const types = wanted_types(ids, count);
+    auto const list = simhost::packed_runtime_options(call.reading(), types);
+    auto *const memory = call.ledger().allocate(list.size(), call.name());
+    std::memcpy(memory, list.data(), list.size());
+    output = static_cast<VSRuntimeOptions *>(memory);
+  });
+}
+
+QEX_ReturnStatus VSQEX_SetRuntimeOptions(VSRuntimeOptions *options) {
+  return answer(__func__, [&](Call &call) {
+    auto const &list = require(options);
+    simhost::set_runtime_options(call.changing(), list);
+  });
+}
+
+}  // extern "C"

@@ -1,0 +1,294 @@
+// simhost_*: looking into the host of this process, and changing it from outside.
+#include "abi/simhost_api/simhost.h"
+
+#include <cstring>
+#include <mutex>
+#include <optional>
+#include <span>
+#include <string>
+
+#include "abi/fresh_host.h"
+#include "abi/host.h"
+#include "base/api.h"
+#include "base/outcomes.h"
+#include "clock/clock.h"
+#include "faults/faults.h"
+#include "model/lookup.h"
+#include "planes/stored/counters.h"
+#include "planes/stored/links.h"
+#include "planes/stored/mac_tables.h"
+#include "planes/stored/teaming.h"
+#include "scenario/lifecycle.h"
+#include "scenario/scenario.h"
+#include "scenario/texts.h"
+
+namespace {
+
+using simhost::Refused;
+using simhost::storage::Access;
+using simhost::storage::Transaction;
+
+thread_local std::string last_error;
+
+int failed(QEX_ReturnStatus status, std::string why) {
+  last_error = std::move(why);
+  return status;
+}
+
+// What the exception being handled makes of a function with a status.
+int failure() noexcept {
+  try {
+    throw;
+  } catch (Refused const &refused) {
+    return failed(refused.status(), simhost::scenario::refusal_text(refused));
+  } catch (simhost::scenario::DocumentError const &error) {
+    return failed(QEX_BAD_PARAM, error.what());
+  } catch (simhost::storage::UnusableState const &error) {
+    return failed(QEX_IO_ERROR, error.what());
+  } catch (std::exception const &error) {
+    return failed(QEX_FAILURE, error.what());
+  }
+}
+
+// Does `work` on the state, in one transaction.
+template <typename Work>
+int on_state(Access access, Work const &work) noexcept {
+  last_error.clear();
+  try {
+    auto &host = simhost::this_host();
+    std::scoped_lock const held(host.lock());
+    Transaction transaction(host.state(), access);
+    work(transaction);
+    transaction.commit();
+    return QEX_OK;
+  } catch (...) {
+    return failure();
+  }
+}
+
+std::string given(char const *text) {
+  if (text == nullptr) {
+    throw Refused(QEX_BAD_PARAM, "a text is null");
+  }
+  return text;
+}
+
+size_t copy_out(std::string const &all, char *text, size_t size) {
+  if (size > 0) {
+    auto const length = all.copy(text, size - 1);
+    text[length] = '\0';
+  }
+  return all.size();
+}
+
+simhost::Place place_of(Transaction &transaction, char const *switch_name, char const *port) {
+  auto const key = simhost::get_switch(transaction, given(switch_name)).key;
+  if (port == nullptr) {
+    return {.switch_key = key, .port = std::nullopt};
+  }
+  return {.switch_key = key, .port = simhost::get_port(transaction, key, port).number};
+}
+
+// What a frame's sender learns of what became of its address.
+void refuse_unlearned(simhost::stored::Sighting sighting) {
+  using simhost::stored::Sighting;
+  switch (sighting) {
+    case Sighting::learning_off:
+      throw Refused(QEX_IS_DISABLED, "the port does not learn");
+    case Sighting::let_through:
+    case Sighting::dropped:
+      throw Refused(QEX_LIMIT_EXCEEDED, "there is no room for another address");
+    case Sighting::fixed_elsewhere:
+      throw Refused(QEX_EXISTS, "the address is fixed elsewhere");
+    case Sighting::learned:
+    case Sighting::refreshed:
+    case Sighting::moved:
+      return;
+  }
+}
+
+VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
+  auto const bytes = simhost::scenario::mac_from(mac);
+  if (!bytes) {
+    throw Refused(QEX_INVALID_ADDRESS, "'" + mac + "' is no address such as 02:00:00:00:00:01");
+  }
+  VSMACEntry source{};
+  std::memcpy(source.macAddress, bytes->data(), bytes->size());
+  source.vid = vlan;
+  source.vni = vni;
+  return source;
+}
+
+simhost::Fault fault_on(char const *function, uint32_t nth, uint32_t times) {
+  simhost::Fault fault;
+  fault.function = given(function);
+  fault.first = nth;
+  fault.last = times == 0 ? simhost::Fault::kForever : std::int64_t{nth} + times - 1;
+  return fault;
+}
+
+// What the calls that are hit do, `outcome` puts into the fault.
+template <typename Outcome>
+int add_fault(char const *function, uint32_t nth, uint32_t times, Outcome const &outcome) noexcept {
+  return on_state(Access::write, [&](Transaction &transaction) {
+    auto fault = fault_on(function, nth, times);
+    outcome(fault);
+    simhost::add_fault(transaction, fault);
+  });
+}
+
+}  // namespace
+
+extern "C" {
+
+SIMHOST_API char const *simhost_version() {
+  return SIMHOST_VERSION;
+}
+
+SIMHOST_API char const *simhost_error() {
+  return last_error.c_str();
+}
+
+SIMHOST_API int simhost_apply(char const *document) {
+  return on_state(Access::write, [&](Transaction &transaction) {
+    simhost::scenario::apply(transaction, given(document));
+  });
+}
+
+SIMHOST_API size_t simhost_describe(char *text, size_t size) {
+  size_t length = 0;
+  on_state(Access::read, [&](Transaction &transaction) {
+    length = copy_out(simhost::scenario::description(transaction), text, size);
+  });
+  return length;
+}
+
+SIMHOST_API int simhost_restart() {
+  return on_state(Access::write,
+                  [](Transaction &transaction) { simhost::scenario::restart_host(transaction); });
+}
+
+SIMHOST_API int simhost_reset() {
+  return on_state(Access::write, [](Transaction &transaction) {
+    simhost::scenario::empty_host(transaction);
+    simhost::populate_fresh_host(transaction);
+  });
+}
+
+SIMHOST_API int64_t simhost_clock_now() {
+  int64_t now = -1;
+  on_state(Access::read,
+           [&](Transaction &transaction) { now = simhost::clock_now(transaction).count(); });
+  return now;
+}
+
+SIMHOST_API int simhost_clock_stop() {
+  return on_state(Access::write,
+                  [](Transaction &transaction) { simhost::stop_clock(transaction); });
+}
+
+SIMHOST_API int simhost_clock_run() {
+  return on_state(Access::write, [](Transaction &transaction) { simhost::run_clock(transaction); });
+}
+
+SIMHOST_API int simhost_clock_step(int64_t milliseconds) {
+  return on_state(Access::write, [&](Transaction &transaction) {
+    simhost::step_clock(transaction, simhost::ClockTime(milliseconds));
+  });
+}
+
+SIMHOST_API int simhost_clock_set(int64_t milliseconds) {
+  return on_state(Access::write, [&](Transaction &transaction) {
+    simhost::set_clock(transaction, simhost::ClockTime(milliseconds));
+  });
+}
+
+SIMHOST_API int simhost_set_link(char const *uplink, int up) {
+  return on_state(Access::write, [&](Transaction &transaction) {
+    auto const name = simhost::get_uplink(transaction, given(uplink)).name;
+    auto link = simhost::stored::link_of(transaction, name);
+    link.carrier = up != 0;
+    simhost::stored::change_link(transaction, name, link);
+  });
+}
+
+SIMHOST_API int simhost_learn(char const *switchName, char const *port, char const *mac,
+                              uint16_t vlan, uint32_t vni) {
+  auto sighting = simhost::stored::Sighting::learned;
+  auto const status = on_state(Access::write, [&](Transaction &transaction) {
+    simhost::get_running_switch(transaction, given(switchName));
+    sighting = simhost::stored::learn(transaction, place_of(transaction, switchName, port),
+                                      source_of(given(mac), vlan, vni));
+  });
+  if (status != QEX_OK) {
+    return status;
+  }
+  // Only now, because what was counted on the way has to last.
+  try {
+    refuse_unlearned(sighting);
+    return QEX_OK;
+  } catch (...) {
+    return failure();
+  }
+}
+
+SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, char const *session,
+                                    char const *name, uint64_t value) {
+  return on_state(Access::write, [&](Transaction &transaction) {
+    if (port != nullptr && session != nullptr) {
+      throw Refused(QEX_BAD_PARAM, "a counter is of a port or of a session, not of both");
+    }
+    auto const place = place_of(transaction, switchName, port);
+    simhost::CounterOwner const owner{.switch_key = place.switch_key,
+                                      .port = place.port,
+                                      .session = session == nullptr ? "" : session};
+    simhost::stored::set_counter(transaction, owner, given(name), value);
+  });
+}
+
+SIMHOST_API int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int status) {
+  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
+    fault.status = static_cast<QEX_ReturnStatus>(status);
+  });
+}
+
+SIMHOST_API int simhost_panic_call(char const *function, uint32_t nth, uint32_t times,
+                                   char const *exception, char const *message) {
+  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
+    fault.exception = given(exception);
+    fault.message = given(message);
+  });
+}
+
+SIMHOST_API int simhost_delay_call(char const *function, uint32_t nth, uint32_t times,
+                                   uint32_t milliseconds) {
+  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
+    fault.delay = std::chrono::milliseconds(milliseconds);
+  });
+}
+
+SIMHOST_API int simhost_clear_faults(char const *function) {
+  return on_state(Access::write, [&](Transaction &transaction) {
+    simhost::clear_faults(transaction, function == nullptr ? "" : function);
+  });
+}
+
+SIMHOST_API size_t simhost_ledger_count() {
+  auto &host = simhost::this_host();
+  std::scoped_lock const held(host.lock());
+  return host.ledger().count();
+}
+
+SIMHOST_API size_t simhost_ledger_report(char *text, size_t size) {
+  auto &host = simhost::this_host();
+  std::scoped_lock const held(host.lock());
+  return host.ledger().report(std::span(text, size));
+}
+
+SIMHOST_API size_t simhost_ledger_summary(char *text, size_t size) {
+  auto &host = simhost::this_host();
+  std::scoped_lock const held(host.lock());
+  return copy_out(host.ledger().summary(), text, size);
+}
+
+}  // extern "C"

@@ -1,0 +1,82 @@
+// Settings of a switch or a port that a caller names: what most calls of both libraries are.
+#pragma once
+
+#include <algorithm>
+#include <string_view>
+
+#include "abi/boundary.h"
+#include "abi/call.h"
+#include "abi/ledger.h"
+#include "base/bytes.h"
+#include "model/lookup.h"
+#include "model/properties/properties.h"
+#include "storage/properties.h"
+
+namespace simhost {
+
+/// A switch by one kind of its names.
+struct NamedSwitch {
+  std::string_view name;
+  storage::SwitchName kind;
+};
+
+/// A port of it by its identifier.
+struct NamedPort {
+  NamedSwitch owner;
+  std::string_view identifier;
+};
+
+/// These refuse null (QEX_BAD_PARAM).
+inline NamedSwitch switch_called(char const *alias) {
+  return {.name = require_text(alias), .kind = storage::SwitchName::alias};
+}
+inline NamedSwitch switch_identified(char const *identifier) {
+  return {.name = require_text(identifier), .kind = storage::SwitchName::identifier};
+}
+inline NamedPort port_of(NamedSwitch const &owner, char const *identifier) {
+  return {.owner = owner, .identifier = require_text(identifier)};
+}
+
+/// These refuse what is not there (QEX_NOT_FOUND).
+inline storage::SwitchKey found(storage::Transaction &transaction, NamedSwitch const &target) {
+  return get_switch(transaction, target.name, target.kind).key;
+}
+inline storage::Port found(storage::Transaction &transaction, NamedPort const &target) {
+  return get_port(transaction, found(transaction, target.owner), target.identifier);
+}
+inline storage::PropertyOwner owner_of(storage::Transaction &transaction,
+                                       NamedSwitch const &target) {
+  return storage::PropertyOwner::global(found(transaction, target));
+}
+inline storage::PropertyOwner owner_of(storage::Transaction &transaction, NamedPort const &target) {
+  return owner_of(found(transaction, target));
+}
+
+template <typename Target, typename Record>
+Record read(Call &call, Target const &target, RecordProperty<Record> const &property) {
+  auto &transaction = call.reading();
+  return read(transaction, owner_of(transaction, target), property);
+}
+
+template <typename Target, typename Record>
+void write(Call &call, Target const &target, RecordProperty<Record> const &property,
+           Record const &record) {
+  auto &transaction = call.changing();
+  write(transaction, owner_of(transaction, target), property, record);
+}
+
+template <typename Target>
+void reset(Call &call, Target const &target, std::string_view key) {
+  auto &transaction = call.changing();
+  reset_property(transaction, owner_of(transaction, target), key);
+}
+
+/// Memory for the caller with a copy of the bytes.
+template <typename Record>
+Record *allocate(Call &call, BytesView bytes) {
+  auto *const memory = call.ledger().allocate(bytes.size(), call.name());
+  std::copy(bytes.begin(), bytes.end(), static_cast<std::byte *>(memory));
+  return static_cast<Record *>(memory);
+}
+
+}  // namespace simhost

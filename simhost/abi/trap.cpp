@@ -1,0 +1,139 @@
+// The one place that jumps, and that keeps what a jump needs. Its own frames hold no object with a
+// destructor.
+#include "abi/trap.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <span>
+
+#include "vswitch/call_trap.h"
+
+// Weak: the module and the interpreter provide these when they are in the process. Without them a
+// plain C program can use the host as well.
+extern "C" {
+#pragma weak exception_buffer
+#pragma weak exceptionType
+#pragma weak exceptionMsg
+// NOLINTBEGIN(readability-identifier-naming): the interpreter's own names
+#define SIMHOST_KIND(kind, type) extern struct _object *PyExc_##type __attribute__((weak));
+SIMHOST_TRAP_KINDS(SIMHOST_KIND)
+#undef SIMHOST_KIND
+// NOLINTEND(readability-identifier-naming)
+}
+
+namespace simhost {
+namespace {
+
+// The caller reads the message after the jump, and may keep the pointer until the next one.
+constinit TrapReport last_report{};
+
+struct _object **exception_variable(TrapKind kind) {
+  switch (kind) {
+#define SIMHOST_KIND(kind, type) \
+  case TrapKind::kind:           \
+    return &PyExc_##type;
+    SIMHOST_TRAP_KINDS(SIMHOST_KIND)
+#undef SIMHOST_KIND
+  }
+  __builtin_unreachable();
+}
+
+struct _object *exception_type(TrapKind kind) {
+  struct _object **const type = exception_variable(kind);
+  return type == nullptr ? nullptr : *type;
+}
+
+bool trap_is_there() {
+  return &exception_buffer != nullptr && &exceptionType != nullptr && &exceptionMsg != nullptr;
+}
+
+// How many bytes the well-formed UTF-8 character at the start of `text` takes; 0 if there is none.
+std::size_t character_length(std::string_view text) {
+  auto const byte = [&](std::size_t at) { return static_cast<unsigned char>(text[at]); };
+  auto const lead = byte(0);
+  if (lead < 0x80) {
+    return 1;
+  }
+  std::size_t const length = lead < 0xC2   ? 0
+                             : lead < 0xE0 ? 2
+                             : lead < 0xF0 ? 3
+                             : lead < 0xF5 ? 4
+                                           : 0;
+  if (length == 0 || length > text.size()) {
+    return 0;
+  }
+  // The second byte is where overlong forms, surrogates and values past the last one differ.
+  unsigned const low = lead == 0xE0 ? 0xA0 : lead == 0xF0 ? 0x90 : 0x80;
+  unsigned const high = lead == 0xED ? 0x9F : lead == 0xF4 ? 0x8F : 0xBF;
+  if (byte(1) < low || byte(1) > high) {
+    return 0;
+  }
+  for (std::size_t at = 2; at < length; ++at) {
+    if ((byte(at) & 0xC0U) != 0x80U) {
+      return 0;
+    }
+  }
+  return length;
+}
+
+// Appends what fits of `text` to the `used` bytes of `target`; returns the bytes used then.
+std::size_t append(std::span<char> target, std::size_t used, std::string_view text) {
+  while (!text.empty()) {
+    auto const length = character_length(text);
+    auto const step = std::max<std::size_t>(length, 1);
+    if (used + step >= target.size()) {
+      break;
+    }
+    if (length == 0) {
+      target[used] = '?';
+    } else {
+      std::memcpy(&target[used], text.data(), length);
+    }
+    used += step;
+    text.remove_prefix(step);
+  }
+  return used;
+}
+
+}  // namespace
+
+void describe(TrapReport &report, TrapKind kind, std::string_view call,
+              std::string_view message) noexcept {
+  report.kind = kind;
+  std::size_t used = 0;
+  if (!call.empty()) {
+    used = append(report.text, used, call);
+    used = append(report.text, used, ": ");
+  }
+  used = append(report.text, used, message);
+  report.text.at(used) = '\0';
+}
+
+void spring_trap(TrapReport const &report) noexcept {
+  auto *const type = exception_type(report.kind);
+  if (!trap_is_there() || type == nullptr) {
+    std::fprintf(stderr, "simulated host: %s\n", report.text.data());
+    std::abort();
+  }
+  last_report = report;
+  exceptionType = type;
+  exceptionMsg = last_report.text.data();
+  longjmp(exception_buffer, 1);
+}
+
+char call_back(char (*callback)(void *, void *), void *reached, void *context) {
+  jmp_buf armed;
+  bool const is_armed = trap_is_there();
+  if (is_armed) {
+    std::memcpy(&armed, &exception_buffer, sizeof armed);
+  }
+  char const answer = callback(reached, context);
+  if (is_armed) {
+    std::memcpy(&exception_buffer, &armed, sizeof armed);
+  }
+  return answer;
+}
+
+}  // namespace simhost

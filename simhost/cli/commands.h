@@ -1,0 +1,49 @@
+// The commands of simhostctl. They do everything through the functions that any program has.
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <cmath>
+#include <cstdint>
+#include <functional>
+#include <limits>
+#include <stdexcept>
+#include <string>
+
+#include "abi/simhost_api/simhost.h"
+
+namespace simhost::cli {
+
+/// The host or the caller's input stands against what was asked for; what() says how.
+class Failure : public std::runtime_error {
+  using std::runtime_error::runtime_error;
+};
+
+inline void check(int status) {
+  if (status != 0) {
+    throw Failure(simhost_error());
+  }
+}
+
+inline char const *or_null(std::string const &text) {
+  return text.empty() ? nullptr : text.c_str();
+}
+
+inline std::int64_t milliseconds(double seconds) {
+  return std::llround(seconds * 1000);
+}
+
+/// What is wrong with a text that has to be a whole number in digits; empty if nothing is.
+std::function<std::string(std::string const &)> whole_number(
+    std::uint64_t least = 0, std::uint64_t greatest = std::numeric_limits<std::uint64_t>::max());
+
+/// The whole host as a document.
+std::string description();
+
+/// show, apply, link, uplink, learn, counter: the host and what comes to it from outside.
+void add_world_commands(CLI::App &app);
+/// clock, restart, reset.
+void add_time_commands(CLI::App &app);
+/// fault, calls: the functions that programs call.
+void add_call_commands(CLI::App &app);
+
+}  // namespace simhost::cli

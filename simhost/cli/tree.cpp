@@ -1,0 +1,241 @@
+// Lines and branches.
+#include "cli/tree.h"
+
+#include <fmt/format.h>
+
+#include <nlohmann/json.hpp>
+#include <utility>
+#include <vector>
+
+namespace simhost::cli {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+// A line and what hangs on it.
+struct Branch {
+  std::string line;
+  std::vector<Branch> branches = {};
+};
+
+void draw(std::string &text, std::vector<Branch> const &branches, std::string const &indent) {
+  for (std::size_t at = 0; at < branches.size(); ++at) {
+    bool const last = at + 1 == branches.size();
+    text += indent + (last ? "`-- " : "|-- ") + branches[at].line + "\n";
+    draw(text, branches[at].branches, indent + (last ? "    " : "|   "));
+  }
+}
+
+std::string joined(Json const &texts) {
+  std::string all;
+  for (auto const &text : texts) {
+    all += (all.empty() ? "" : ", ") + text.get<std::string>();
+  }
+  return all;
+}
+
+Branch uplink_branch(Json const &uplink) {
+  auto line = fmt::format("{:<10} link {}", uplink["name"].get<std::string>(),
+                          uplink["link"].get<std::string>());
+  if (uplink["admin"] == "down") {
+    line += ", switched off";
+  }
+  line += fmt::format(", {} Mbit/s {} duplex", uplink["speed"].get<std::uint32_t>(),
+                      uplink["duplex"].get<std::string>());
+  if (uplink.contains("observed")) {
+    line += fmt::format(", at {} of {}", uplink["observed"]["port"].get<std::string>(),
+                        uplink["observed"]["switch"].get<std::string>());
+  } else {
+    line += ", free";
+  }
+  return {line};
+}
+
+Branch address_branch(Json const &address) {
+  auto line =
+      fmt::format("{} {}", address["mac"].get<std::string>(), address["type"].get<std::string>());
+  if (address["vlan"] != 0) {
+    line += fmt::format(", VLAN {}", address["vlan"].get<unsigned>());
+  }
+  if (address["vni"] != 0) {
+    line += fmt::format(", network {}", address["vni"].get<unsigned>());
+  }
+  if (address["ages"].get<bool>()) {
+    line += fmt::format(", seen {} s ago", address["age"].get<unsigned>());
+  }
+  return {line};
+}
+
+Branch group_branch(Json const &group) {
+  auto line = "joined " + group["address"].get<std::string>();
+  if (!group["sources"].empty()) {
+    line +=
+        fmt::format(", {} {}", group["source_mode"].get<std::string>(), joined(group["sources"]));
+  }
+  return {line};
+}
+
+Branch session_branch(Json const &session) {
+  auto line = "mirror session " + session["sid"].get<std::string>();
+  if (session["disabled"].get<bool>()) {
+    line += ", disabled";
+  }
+  if (session["promiscuous"].get<bool>()) {
+    line += ", promiscuous";
+  }
+  return {line};
+}
+
+std::string teaming_line(Json const &teaming) {
+  auto line = "teaming " + teaming["balance"].get<std::string>();
+  if (!teaming["active"].empty()) {
+    line += ": active " + joined(teaming["active"]);
+  }
+  if (!teaming["standby"].empty()) {
+    line += ", standby " + joined(teaming["standby"]);
+  }
+  if (!teaming["flags"].empty()) {
+    line += " (" + joined(teaming["flags"]) + ")";
+  }
+  return line;
+}
+
+void add_counters(std::vector<Branch> &branches, std::string const &what, Json const &counters) {
+  for (auto const &[name, value] : counters.items()) {
+    branches.push_back({fmt::format("{}{} = {}", what, name, value.get<std::uint64_t>())});
+  }
+}
+
+Branch port_branch(Json const &port) {
+  auto const &observed = port["observed"];
+  Branch branch{fmt::format("port {:<8} number {}", port["id"].get<std::string>(),
+                            observed["number"].get<std::uint32_t>())};
+  branch.line += observed["uplink"].is_string()
+                     ? ", sends over " + observed["uplink"].get<std::string>()
+                     : ", sends nowhere: " + observed["why"].get<std::string>();
+  if (port.contains("teaming")) {
+    branch.branches.push_back({teaming_line(port["teaming"])});
+  }
+  if (port.contains("uplink")) {
+    branch.branches.push_back({"bound to " + port["uplink"].get<std::string>()});
+  }
+  for (auto const &address : port["addresses"]) {
+    branch.branches.push_back(address_branch(address));
+  }
+  for (auto const &group : port["groups"]) {
+    branch.branches.push_back(group_branch(group));
+  }
+  for (auto const &session : port.value("mirror_sessions", Json::array())) {
+    branch.branches.push_back(session_branch(session));
+  }
+  add_counters(branch.branches, "", port["counters"]);
+  return branch;
+}
+
+Branch switch_branch(Json const &host_switch) {
+  Branch branch{fmt::format("switch {}: {} of {} ports, MTU {}{}",
+                            host_switch["alias"].get<std::string>(), host_switch["ports"].size(),
+                            host_switch["max_ports"].get<std::uint32_t>(),
+                            host_switch["mtu"].get<std::uint32_t>(),
+                            host_switch["persistent"].get<bool>() ? "" : ", not persistent")};
+  auto &branches = branch.branches;
+  branches.push_back({"identifier " + host_switch["id"].get<std::string>()});
+  branches.push_back({"portset " + host_switch["portset"].get<std::string>()});
+  branches.push_back(
+      {"uplinks " +
+       (host_switch["uplinks"].empty() ? std::string("none") : joined(host_switch["uplinks"]))});
+  for (auto const &lag : host_switch["lags"]) {
+    branches.push_back(
+        {fmt::format("group {} {}: {}", lag["name"].get<std::string>(),
+                     lag["observed"]["up"].get<bool>() ? "up" : "down", joined(lag["uplinks"]))});
+  }
+  if (host_switch.contains("teaming")) {
+    branches.push_back({teaming_line(host_switch["teaming"])});
+  }
+  if (host_switch.contains("multicast")) {
+    branches.push_back({"multicast " + host_switch["multicast"].get<std::string>()});
+  }
+  for (auto const &port : host_switch["ports"]) {
+    branches.push_back(port_branch(port));
+  }
+  if (!host_switch["addresses"].empty()) {
+    Branch team{"beyond the uplinks"};
+    for (auto const &address : host_switch["addresses"]) {
+      team.branches.push_back(address_branch(address));
+    }
+    branches.push_back(std::move(team));
+  }
+  add_counters(branches, "", host_switch["counters"]);
+  for (auto const &[sid, counters] : host_switch["mirror_counters"].items()) {
+    add_counters(branches, "mirror session " + sid + ": ", counters);
+  }
+  return branch;
+}
+
+std::string fault_line(Json const &fault) {
+  auto const times = fault["times"].get<std::int64_t>();
+  auto line = fmt::format("{} from call {} on, {}", fault["call"].get<std::string>(),
+                          fault["nth"].get<std::int64_t>(),
+                          times == 0 ? std::string("for good") : fmt::format("{} x", times));
+  if (fault.contains("delay")) {
+    line += fmt::format(": waits {} s", fault["delay"].get<double>());
+  }
+  if (fault.contains("status")) {
+    line += ": answers " + fault["status"].get<std::string>();
+  }
+  if (fault.contains("exception")) {
+    line += fmt::format(": {}: {}", fault["exception"].get<std::string>(),
+                        fault["message"].get<std::string>());
+  }
+  return line + fmt::format("; {} made", fault["observed"]["calls"].get<std::int64_t>());
+}
+
+}  // namespace
+
+std::string tree(std::string_view document) {
+  auto const host = Json::parse(document);
+  std::vector<Branch> branches;
+  branches.push_back({fmt::format("clock {} at {:.3f} s",
+                                  host["clock"]["stopped"].get<bool>() ? "stopped" : "running",
+                                  host["clock"]["now"].get<double>())});
+  Branch uplinks{"uplinks"};
+  for (auto const &uplink : host["uplinks"]) {
+    uplinks.branches.push_back(uplink_branch(uplink));
+  }
+  branches.push_back(std::move(uplinks));
+  for (auto const &host_switch : host["switches"]) {
+    branches.push_back(switch_branch(host_switch));
+  }
+  for (auto const &fault : host["faults"]) {
+    branches.push_back({"fault " + fault_line(fault)});
+  }
+  std::string text = "host\n";
+  draw(text, branches, "");
+  return text;
+}
+
+std::string fault_document(FaultWords const &words) {
+  Json fault{{"call", words.function}, {"nth", words.nth}, {"times", words.times}};
+  if (!words.status.empty()) {
+    fault["status"] = words.status;
+  }
+  if (!words.exception.empty()) {
+    fault["exception"] = words.exception;
+    fault["message"] = words.message;
+  }
+  if (words.delay > 0) {
+    fault["delay"] = words.delay;
+  }
+  return Json{{"faults", Json::array({fault})}}.dump();
+}
+
+std::string fault_list(std::string_view document) {
+  auto const host = Json::parse(document);
+  std::string text;
+  for (auto const &fault : host["faults"]) {
+    text += fault_line(fault) + "\n";
+  }
+  return text;
+}
+
+}  // namespace simhost::cli

@@ -1,0 +1,29 @@
+// A host for reading, from the document that describes it.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+namespace simhost::cli {
+
+/// Switches, ports and uplinks with what is going on there, a line each.
+std::string tree(std::string_view document);
+
+/// A fault as the command line gives it; empty texts and 0 are no effect.
+struct FaultWords {
+  std::string function;
+  std::uint32_t nth;
+  std::uint32_t times;
+  std::string status;
+  std::string exception;
+  std::string message;
+  double delay;  ///< seconds
+};
+
+/// The scenario document that adds a fault.
+std::string fault_document(FaultWords const &words);
+/// The faults of a host, a line each.
+std::string fault_list(std::string_view document);
+
+}  // namespace simhost::cli

@@ -1,0 +1,69 @@
+// The one way to the properties, for typed calls and raw ones alike.
+#pragma once
+
+#include <optional>
+#include <string_view>
+#include <vector>
+
+#include "base/api.h"
+#include "base/bytes.h"
+#include "model/properties/keys.h"
+#include "storage/properties.h"
+
+namespace simhost {
+
+/// The type that a caller gives as a number; refuses anything but one of the four (QEX_BAD_PARAM).
+SIMHOST_API storage::PropertyType property_type(std::uint32_t number);
+
+/// Sets a property. Refuses no name, a known key of another scope, and bytes that the key does not
+/// allow (QEX_BAD_PARAM), a name of more than 255 bytes (QEX_NAME_TOO_LONG), and a key that callers
+/// may only read (QEX_READ_ONLY). A key without a meaning to the host takes any bytes.
+SIMHOST_API void set_property(storage::Transaction &transaction,
+                              storage::PropertyOwner const &owner, std::string_view key,
+                              BytesView value, storage::PropertyType type);
+/// Likewise for a key with a meaning, with the type that typed calls give it.
+SIMHOST_API void set_property(storage::Transaction &transaction,
+                              storage::PropertyOwner const &owner, std::string_view key,
+                              BytesView value);
+
+/// The property as callers read it; nothing if it is not set.
+SIMHOST_API std::optional<storage::Property> get_property(storage::Transaction &transaction,
+                                                          storage::PropertyOwner const &owner,
+                                                          std::string_view key);
+/// All of them, in the order of their names.
+SIMHOST_API std::vector<storage::NamedProperty> list_properties(
+    storage::Transaction &transaction, storage::PropertyOwner const &owner);
+/// The first property whose name comes after `name`.
+SIMHOST_API std::optional<storage::NamedProperty> next_property(storage::Transaction &transaction,
+                                                                storage::PropertyOwner const &owner,
+                                                                std::string_view name);
+
+/// Clears a property. Refuses one that is not set, which whatever cannot be set never is
+/// (QEX_NOT_FOUND), and one that the host keeps elsewhere (QEX_READ_ONLY).
+SIMHOST_API void clear_property(storage::Transaction &transaction,
+                                storage::PropertyOwner const &owner, std::string_view key);
+/// Likewise, but it need not be set.
+SIMHOST_API void reset_property(storage::Transaction &transaction,
+                                storage::PropertyOwner const &owner, std::string_view key);
+
+/// A property that is one record, and what stands for it while it is not set.
+template <typename Record>
+struct RecordProperty {
+  std::string_view key;
+  Record unset;
+};
+
+template <typename Record>
+Record read(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+            RecordProperty<Record> const &property) {
+  auto const found = get_property(transaction, owner, property.key);
+  return found ? record_of<Record>(found->value) : property.unset;
+}
+
+template <typename Record>
+void write(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+           RecordProperty<Record> const &property, Record const &record) {
+  set_property(transaction, owner, property.key, bytes_of(record));
+}
+
+}  // namespace simhost

@@ -1,0 +1,20 @@
+// Configuration and policy stay, the rest goes.
+#include "model/state/restart.h"
+
+#include "storage/properties.h"
+#include "storage/store.h"
+#include "storage/switches.h"
+
+namespace simhost {
+
+void restart_configuration(storage::Transaction &transaction) {
+  for (auto const &[key, row] : storage::all_switches(transaction)) {
+    if (!row.persistent) {
+      storage::remove_switch(transaction, key);
+    }
+  }
+  storage::remove_properties(transaction, storage::PropertyType::runtime);
+  storage::remove_properties(transaction, storage::PropertyType::transient);
+}
+
+}  // namespace simhost

@@ -1,0 +1,16 @@
+// What a restart of the host leaves of its configuration.
+#pragma once
+
+#include "base/api.h"
+
+namespace simhost::storage {
+class Transaction;
+}
+
+namespace simhost {
+
+/// Drops what does not outlast a restart: switches that are not persistent, and runtime and
+/// volatile properties. Ports keep their numbers.
+SIMHOST_API void restart_configuration(storage::Transaction &transaction);
+
+}  // namespace simhost

@@ -1,0 +1,168 @@
+// Which uplinks a policy can use, and which of them it does.
+#include "planes/stored/team.h"
+
+#include <algorithm>
+#include <span>
+
+#include "base/bytes.h"
+#include "model/lookup.h"
+#include "model/options/runtime_options.h"
+#include "model/policies.h"
+#include "model/ports/ports.h"
+#include "planes/stored/policies.h"
+#include "qexapi/switch_properties.h"
+#include "storage/store.h"
+#include "vswitch/properties.h"
+
+namespace simhost::stored {
+namespace {
+
+bool is_settled(Team const &team, Link const &link) {
+  return team.up_delay == ClockTime::zero() || link.up_since == ClockTime::zero() ||
+         team.now - link.up_since >= team.up_delay;
+}
+
+bool meets_criteria(TeamUplink const &uplink, VSTeamPolicy const &policy) {
+  auto const &link = uplink.link;
+  auto const fails = [&](std::uint32_t criterion, bool failing) {
+    return (policy.linkCriteria & criterion) != 0 && failing;
+  };
+  return !fails(TEAM_FRP_CRIT_LINK_SPEED, link.speed != policy.speed) &&
+         !fails(TEAM_FRP_CRIT_LINK_SPEED_GTE, link.speed < policy.speed) &&
+         !fails(TEAM_FRP_CRIT_LINK_DUPLEX, link.full_duplex != (policy.fullDuplex != 0)) &&
+         !fails(TEAM_FRP_CRIT_LACP_PORT_DOWN, uplink.aggregated && !link.partner) &&
+         !fails(TEAM_FRP_CRIT_BEACON_STATE, !link.beacons) &&
+         !fails(TEAM_FRP_CRIT_LINK_ERR, link.error_percent > policy.percentError) &&
+         !fails(TEAM_FRP_CRIT_PORT_BLOCKED, uplink.blocked) &&
+         !fails(TEAM_FRP_CRIT_DRV_PRESENT, !link.driver);
+}
+
+bool is_usable(Team const &team, TeamUplink const &uplink, VSTeamPolicy const &policy) {
+  return uplink.link.up() && is_settled(team, uplink.link) && meets_criteria(uplink, policy);
+}
+
+std::optional<std::size_t> place_of(Team const &team, std::string_view name) {
+  auto const found =
+      std::find_if(team.uplinks.begin(), team.uplinks.end(), [&](TeamUplink const &uplink) {
+        return uplink.port == name || uplink.identifier == name || uplink.name == name;
+      });
+  if (found == team.uplinks.end()) {
+    return std::nullopt;
+  }
+  return static_cast<std::size_t>(found - team.uplinks.begin());
+}
+
+// The uplinks of the group of that name that are up.
+std::vector<std::size_t> places_in_group(Team const &team, std::string_view name) {
+  std::vector<std::size_t> places;
+  auto const lag = std::find_if(team.lags.begin(), team.lags.end(),
+                                [&](Lag const &known) { return known.name == name; });
+  if (lag != team.lags.end()) {
+    for (auto const &member : lag->members) {
+      if (auto const place = place_of(team, member.uplink); member.up && place) {
+        places.push_back(*place);
+      }
+    }
+  }
+  return places;
+}
+
+// What a policy can use under a name of its own; nothing if nothing is usable.
+std::optional<Slot> slot_called(Team const &team, std::string_view name,
+                                VSTeamPolicy const &policy) {
+  auto const place = place_of(team, name);
+  Slot slot{.uplinks = place ? std::vector{*place} : places_in_group(team, name), .since = {}};
+  std::erase_if(slot.uplinks,
+                [&](std::size_t at) { return !is_usable(team, team.uplinks[at], policy); });
+  if (slot.uplinks.empty()) {
+    return std::nullopt;
+  }
+  slot.since = ClockTime::max();
+  for (auto const at : slot.uplinks) {
+    slot.since = std::min(slot.since, team.uplinks[at].link.up_since);
+  }
+  return slot;
+}
+
+// Whom a policy names, and how many of them it wants in use.
+struct Named {
+  std::vector<std::string_view> names;
+  std::size_t active;
+};
+
+Named named_by(Team const &team, VSTeamPolicy const &policy) {
+  Named named{.names = {}, .active = policy.numActive};
+  for (auto const &name :
+       std::span(policy.uplinkPortName).first(std::size_t{policy.numActive} + policy.numStandby)) {
+    named.names.push_back(text_in(name));
+  }
+  if (named.names.empty()) {
+    for (auto const &uplink : team.uplinks) {
+      named.names.push_back(uplink.name);
+    }
+    named.active = named.names.size();
+  }
+  return named;
+}
+
+}  // namespace
+
+Team team_of(storage::Transaction &transaction, storage::SwitchKey key) {
+  Team team{.uplinks = {},
+            .lags = lags_of(transaction, key),
+            .policy = policy<VSTeamPolicy>(transaction, storage::PropertyOwner::global(key),
+                                           VSPROP_SWITCH_TEAMING)
+                          .value_or(kDefaultTeaming),
+            .now = clock_now(transaction),
+            .up_delay = ClockTime(runtime_number(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY))};
+  for (auto const &[name, number] : storage::uplinks_of(transaction, key)) {
+    auto const port = get_port(transaction, number);
+    auto const blocked =
+        policy<qex_Bool>(transaction, owner_of(port), QEX_NEBPROP_PORT_BLOCK).value_or(0);
+    team.uplinks.push_back({.name = name,
+                            .port = alias_of(transaction, port).value_or(port.identifier),
+                            .identifier = port.identifier,
+                            .link = link_of(transaction, name),
+                            .aggregated = is_aggregated(transaction, name),
+                            .blocked = blocked != 0});
+  }
+  return team;
+}
+
+std::vector<Slot> slots_in_use(Team const &team, VSTeamPolicy const &policy) {
+  auto const named = named_by(team, policy);
+  std::vector<Slot> slots;
+  for (auto const name : named.names) {
+    if (auto slot = slot_called(team, name, policy)) {
+      slots.push_back(*std::move(slot));
+    }
+  }
+  if ((policy.flags & TEAM_FRP_FLAG_ROLLING) != 0) {
+    std::stable_sort(slots.begin(), slots.end(),
+                     [](Slot const &a, Slot const &b) { return a.since < b.since; });
+  }
+  // A policy that has standby uplinks only uses one of them.
+  slots.resize(std::min(slots.size(), std::max<std::size_t>(named.active, 1)));
+  return slots;
+}
+
+std::optional<std::size_t> uplink_for(std::vector<Slot> const &slots, VSTeamPolicy const &policy,
+                                      storage::PortNumber number) {
+  if (slots.empty()) {
+    return std::nullopt;
+  }
+  auto const spread = static_cast<std::uint32_t>(number);
+  bool const first =
+      policy.loadBalance == TEAM_FRP_TYPE_NONE || policy.loadBalance == TEAM_FRP_TYPE_FO_EXPLICIT;
+  auto const &slot = slots[first ? 0 : spread % slots.size()];
+  // A group spreads the ports over its uplinks, whatever the policy does with the slots.
+  return slot.uplinks[spread % slot.uplinks.size()];
+}
+
+std::optional<std::size_t> bound_uplink(Team const &team, std::string_view name) {
+  VSTeamPolicy const only_the_link{};
+  auto const place = place_of(team, name);
+  return place && is_usable(team, team.uplinks[*place], only_the_link) ? place : std::nullopt;
+}
+
+}  // namespace simhost::stored

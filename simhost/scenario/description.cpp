@@ -1,0 +1,260 @@
+// From the host to a document.
+#include <string>
+#include <utility>
+
+#include "base/outcomes.h"
+#include "clock/clock.h"
+#include "faults/faults.h"
+#include "model/lookup.h"
+#include "model/options/host_settings.h"
+#include "model/options/runtime_options.h"
+#include "model/switches/switches.h"
+#include "planes/stored/counters.h"
+#include "planes/stored/links.h"
+#include "planes/stored/mac_tables.h"
+#include "planes/stored/multicast.h"
+#include "planes/stored/teaming.h"
+#include "scenario/named_properties.h"
+#include "scenario/scenario.h"
+#include "scenario/texts.h"
+#include "scenario/vocabulary.h"
+#include "storage/store.h"
+
+namespace simhost::scenario {
+namespace {
+
+using storage::PropertyOwner;
+using storage::Transaction;
+
+template <typename Range, typename Describe>
+Json each_to_json(Range const &range, Describe const &describe) {
+  Json list = Json::array();
+  for (auto const &item : range) {
+    list.push_back(describe(item));
+  }
+  return list;
+}
+
+double seconds(ClockTime time) {
+  return static_cast<double>(time.count()) / 1000;
+}
+
+Json uplink_to_json(Transaction &transaction, storage::Uplink const &uplink) {
+  auto const link = stored::link_of(transaction, uplink.name);
+  Json described{{"name", uplink.name},
+                 {"link", choice_to_json(link.carrier, kUpDown)},
+                 {"admin", choice_to_json(link.admin, kUpDown)},
+                 {"lacp", choice_to_json(link.partner, kUpDown)},
+                 {"speed", link.speed},
+                 {"duplex", choice_to_json(link.full_duplex, kDuplex)},
+                 {"beacons", choice_to_json(link.beacons, kUpDown)},
+                 {"error_percent", link.error_percent},
+                 {"driver", link.driver}};
+  if (uplink.port) {
+    auto const port = get_port(transaction, *uplink.port);
+    described["observed"] = {
+        {"switch", storage::find_switch(transaction, port.switch_key)->row.alias},
+        {"port", port.identifier}};
+  }
+  return described;
+}
+
+Json address_to_json(VSMACEntry const &entry) {
+  VSMACAddrType const type = entry.macAddrType;
+  return {{"mac", mac_text(std::as_bytes(std::span(entry.macAddress)))},
+          {"vlan", qex_VlanID{entry.vid}},
+          {"vni", qex_uint32{entry.vni}},
+          {"type", choice_to_json(type, kAddressTypes)},
+          {"ages", entry.aging != 0},
+          {"age", qex_uint32{entry.elapsed}}};
+}
+
+Json addresses_to_json(Transaction &transaction, Place const &place) {
+  return each_to_json(stored::addresses(transaction, place, VS_MAC_ADDR_TYPE_ALL), address_to_json);
+}
+
+Json groups_to_json(Transaction &transaction, storage::PortNumber port) {
+  Json list = Json::array();
+  for (auto const length : {6, 4, 16}) {
+    for (auto const &address :
+         stored::groups(transaction, port, static_cast<std::size_t>(length))) {
+      auto const group = *stored::group(transaction, port, address);
+      list.push_back({{"address", address_text(address)},
+                      {"version", group.version},
+                      {"source_mode", choice_to_json(group.source_mode, kSourceModes)},
+                      {"sources", each_to_json(group.sources, address_text)},
+                      {"vni", group.vni},
+                      {"observed", {{"updated", seconds(group.updated)}}}});
+    }
+  }
+  return list;
+}
+
+// Bytes of what a member says whole are not repeated.
+void describe_properties(Json &described, Transaction &transaction, PropertyOwner const &owner,
+                         NamedProperties named, char const *under = "properties") {
+  Json list = Json::object();
+  for (auto const &[name, property] : storage::properties_of(transaction, owner)) {
+    auto const *const member = find_named(named, name);
+    if (member == nullptr || !round_trips(described, *member, property)) {
+      list[name] = {{"type", choice_to_json(property.type, kPropertyTypes)},
+                    {"hex", hex_text(property.value)}};
+    }
+  }
+  described[under] = std::move(list);
+}
+
+Json counters_to_json(Transaction &transaction, CounterOwner const &owner) {
+  Json list = Json::object();
+  for (auto const &[name, value] : stored::counters_of(transaction, owner)) {
+    list[name] = value;
+  }
+  return list;
+}
+
+Json port_to_json(Transaction &transaction, storage::Port const &port,
+                  stored::Carriers const &carriers) {
+  auto const owner = PropertyOwner::port(port.switch_key, port.number);
+  Place const place{.switch_key = port.switch_key, .port = port.number};
+  Json described{{"id", port.identifier}};
+  if (auto const external = storage::external_id_of(transaction, port.number); !external.empty()) {
+    described["external_id"] = external;
+  }
+  describe_members(described, transaction, owner, named_of_port());
+  described["addresses"] = addresses_to_json(transaction, place);
+  described["groups"] = groups_to_json(transaction, port.number);
+  described["counters"] =
+      counters_to_json(transaction, {.switch_key = port.switch_key, .port = port.number});
+  describe_properties(described, transaction, owner, named_of_port());
+  Json observed{{"number", static_cast<std::uint32_t>(port.number)}};
+  try {
+    observed["uplink"] = carriers.required_of(port);
+  } catch (Refused const &refused) {
+    observed["uplink"] = nullptr;
+    observed["why"] = refusal_text(refused);
+  }
+  described["observed"] = std::move(observed);
+  return described;
+}
+
+Json uplink_port_to_json(Transaction &transaction, storage::Port const &port) {
+  auto const owner = owner_of(port);
+  Json described{{"id", port.identifier}};
+  describe_members(described, transaction, owner, named_of_uplink_port());
+  if (auto const uplink = storage::uplink_at(transaction, port.number)) {
+    described["uplink"] = *uplink;
+  }
+  describe_properties(described, transaction, owner, named_of_uplink_port());
+  return described;
+}
+
+Json uplink_ports_to_json(Transaction &transaction, storage::SwitchKey key) {
+  return each_to_json(storage::uplink_ports_of(transaction, key), [&](storage::Port const &port) {
+    return uplink_port_to_json(transaction, port);
+  });
+}
+
+Json lag_to_json(Lag const &lag) {
+  return {{"name", lag.name},
+          {"uplinks", each_to_json(lag.members, [](auto const &member) { return member.uplink; })},
+          {"observed", {{"id", lag.id}, {"up", lag.up()}}}};
+}
+
+Json ports_to_json(Transaction &transaction, storage::SwitchKey key) {
+  auto const own = stored::own_teamings(transaction, key);
+  stored::Carriers const carriers(stored::team_of(transaction, key), own);
+  Json list = Json::array();
+  for (auto const &port : storage::ports_of(transaction, key)) {
+    if (port.kind == storage::PortKind::client) {
+      list.push_back(port_to_json(transaction, port, carriers));
+    }
+  }
+  return list;
+}
+
+Json session_counters_to_json(Transaction &transaction, storage::SwitchKey key) {
+  Json sessions = Json::object();
+  for (auto const &sid : stored::counting_sessions(transaction, key)) {
+    sessions[sid] = counters_to_json(transaction, {.switch_key = key, .session = sid});
+  }
+  return sessions;
+}
+
+Json switch_to_json(Transaction &transaction, storage::FoundSwitch const &known) {
+  auto const &key = known.key;
+  auto const &row = known.row;
+  auto const owner = PropertyOwner::global(key);
+  Json described{{"alias", row.alias},           {"id", row.identifier},
+                 {"portset", row.portset},       {"max_ports", row.max_ports},
+                 {"persistent", row.persistent}, {"version", row.version},
+                 {"running", row.associated},    {"mtu", mtu_of(transaction, row.alias)}};
+  described["uplink_ports"] = uplink_ports_to_json(transaction, key);
+  described["uplinks"] = each_to_json(storage::uplinks_of(transaction, key),
+                                      [](auto const &uplink) { return uplink.name; });
+  described["lags"] = each_to_json(stored::lags_of(transaction, key), lag_to_json);
+  describe_members(described, transaction, owner, named_of_switch());
+  described["ports"] = ports_to_json(transaction, key);
+  described["addresses"] =
+      addresses_to_json(transaction, {.switch_key = key, .port = std::nullopt});
+  described["counters"] = counters_to_json(transaction, {.switch_key = key});
+  described["mirror_counters"] = session_counters_to_json(transaction, key);
+  describe_properties(described, transaction, owner, named_of_switch());
+  describe_properties(described, transaction, PropertyOwner::host(key), {}, "host_properties");
+  return described;
+}
+
+Json fault_to_json(WaitingFault const &waiting) {
+  auto const &fault = waiting.fault;
+  Json described{{"call", fault.function},
+                 {"nth", fault.first},
+                 {"times", fault.last == Fault::kForever ? 0 : fault.last - fault.first + 1}};
+  if (fault.status != QEX_OK) {
+    described["status"] = status_name(fault.status);
+  }
+  if (!fault.exception.empty()) {
+    described["exception"] = fault.exception;
+    described["message"] = fault.message;
+  }
+  if (fault.delay.count() > 0) {
+    described["delay"] = seconds(fault.delay);
+  }
+  described["observed"] = {{"calls", waiting.seen}};
+  return described;
+}
+
+Json runtime_options_to_json(Transaction &transaction) {
+  Json list = Json::object();
+  auto const options = runtime_options();
+  for (unsigned type = 0; type < options.size(); ++type) {
+    std::visit([&](auto const &value) { list[std::string(options[type].name)] = value; },
+               runtime_option(transaction, type));
+  }
+  return list;
+}
+
+}  // namespace
+
+Json host_to_json(Transaction &transaction) {
+  Json host{
+      {"clock",
+       {{"stopped", clock_is_stopped(transaction)}, {"now", seconds(clock_now(transaction))}}}};
+  host["uplinks"] = each_to_json(
+      storage::all_uplinks(transaction),
+      [&](storage::Uplink const &uplink) { return uplink_to_json(transaction, uplink); });
+  host["runtime_options"] = runtime_options_to_json(transaction);
+  auto const learning = global_mac_learning(transaction);
+  host["mac_learning"] = {{"aging_time", qex_uint32{learning.agingTime}},
+                          {"limit", qex_uint32{learning.macLimit}},
+                          {"learn_static", learning.learnStatic != 0}};
+  host["switches"] = each_to_json(
+      storage::all_switches(transaction),
+      [&](storage::FoundSwitch const &known) { return switch_to_json(transaction, known); });
+  host["faults"] = each_to_json(waiting_faults(transaction), fault_to_json);
+  return host;
+}
+
+std::string description(Transaction &transaction) {
+  return host_to_json(transaction).dump(2, ' ', false, Json::error_handler_t::replace);
+}
+
+}  // namespace simhost::scenario

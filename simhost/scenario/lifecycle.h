@@ -1,0 +1,18 @@
+// What happens to the host as a whole.
+#pragma once
+
+namespace simhost::storage {
+class Transaction;
+}
+
+namespace simhost::scenario {
+
+/// The host restarts: switches that are not persistent go, and so do runtime and volatile
+/// properties, learned addresses, multicast groups, counters, runtime options and the global MAC
+/// learning. Cabling, the clock and faults are not the host's and stay.
+void restart_host(storage::Transaction &transaction);
+
+/// Empties the host: no switches, no uplinks, a real clock, no faults, and numbers from 1 on.
+void empty_host(storage::Transaction &transaction);
+
+}  // namespace simhost::scenario

@@ -1,0 +1,63 @@
+// Reading values of a document, with what the host refuses told by the path of the key.
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "base/outcomes.h"
+#include "scenario/document.h"
+#include "scenario/texts.h"
+#include "scenario/vocabulary.h"
+
+namespace simhost::scenario {
+
+inline constexpr std::int64_t k32Bits = 0xFFFFFFFF;
+
+inline bool up_or_down(Node const &node) {
+  return node.choice(std::span(kUpDown));
+}
+
+inline std::string text_of_node(Node const &node) {
+  return node.text();
+}
+
+inline std::uint32_t number_of_32_bits(Node const &node) {
+  return static_cast<std::uint32_t>(node.integer(0, k32Bits));
+}
+
+/// Does `work`; what the host refuses is told with the path of `node`.
+template <typename Work>
+auto do_at(Node const &node, Work const &work) {
+  try {
+    return work();
+  } catch (Refused const &refused) {
+    node.fail("the host refuses it: " + refusal_text(refused));
+  }
+}
+
+template <typename Each>
+void for_each_in(Node const &node, std::string_view key, Each const &each) {
+  if (auto const list = node.find(key)) {
+    for (auto const &item : list->items()) {
+      do_at(item, [&] { each(item); });
+    }
+  }
+}
+
+template <typename Each>
+void for_each_member(Node const &object, Each const &each) {
+  for (auto const &member : object.members()) {
+    do_at(member.value, [&] { each(member.key, member.value); });
+  }
+}
+
+template <typename Use>
+void if_there(Node const &node, std::string_view key, Use const &use) {
+  if (auto const found = node.find(key)) {
+    do_at(*found, [&] { use(*found); });
+  }
+}
+
+}  // namespace simhost::scenario

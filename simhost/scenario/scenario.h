@@ -1,0 +1,28 @@
+// Scenario documents: a host, or a change of one, in JSON. Every key is described in SCENARIOS.md.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "scenario/document.h"
+
+namespace simhost::storage {
+class Transaction;
+}
+
+namespace simhost::scenario {
+
+/// Makes the host what a document says. What the document names is added or changed; nothing else
+/// is touched. Throws DocumentError for a document that is malformed or that the host refuses; the
+/// transaction must not be committed then.
+void apply(storage::Transaction &transaction, std::string_view document);
+
+/// The whole host as a document. Beside what apply() reads, switches and ports have a key
+/// "observed" with what follows from the rest, which apply() passes over.
+Json host_to_json(storage::Transaction &transaction);
+
+/// Likewise, as text. JSON holds UTF-8 only: bytes of a name that are none, which raw calls and
+/// images can set, are shown as U+FFFD.
+std::string description(storage::Transaction &transaction);
+
+}  // namespace simhost::scenario

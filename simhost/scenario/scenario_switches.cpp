@@ -1,0 +1,293 @@
+// From a document to the host: switches, their ports, and what is known of them.
+#include "scenario/scenario_switches.h"
+
+#include <algorithm>
+#include <cstring>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "model/lookup.h"
+#include "model/ports/ports.h"
+#include "model/properties/properties.h"
+#include "model/switches/switches.h"
+#include "planes/stored/counters.h"
+#include "planes/stored/links.h"
+#include "planes/stored/mac_tables.h"
+#include "planes/stored/multicast.h"
+#include "scenario/named_properties.h"
+#include "scenario/reading.h"
+#include "storage/store.h"
+
+namespace simhost::scenario {
+namespace {
+
+using storage::PropertyOwner;
+using storage::Transaction;
+
+Bytes bytes_from(Node const &node) {
+  auto const hex = node.find("hex");
+  auto const text = node.find("text");
+  if (hex.has_value() == text.has_value()) {
+    node.fail("must have one of the keys hex, text");
+  }
+  if (text) {
+    return bytes_of_text(text->text());
+  }
+  auto const bytes = bytes_from_hex(hex->text());
+  if (!bytes) {
+    hex->fail("must be hexadecimal digits, two for each byte");
+  }
+  return *bytes;
+}
+
+template <typename IsWanted>
+void apply_raw(Transaction &transaction, PropertyOwner const &owner, Node const &node,
+               std::string_view under, IsWanted const &is_wanted) {
+  if_there(node, under, [&](Node const &properties) {
+    for_each_member(properties, [&](std::string const &key, Node const &property) {
+      if (!is_wanted(key)) {
+        return;
+      }
+      property.only({"type", "hex", "text"});
+      auto const type = property.at("type").choice(std::span(kPropertyTypes));
+      set_property(transaction, owner, key, bytes_from(property), type);
+    });
+  });
+}
+
+// Those without a member of their own.
+void apply_others(Transaction &transaction, PropertyOwner const &owner, NamedProperties named,
+                  Node const &node, std::string_view under = "properties") {
+  apply_raw(transaction, owner, node, under,
+            [&](std::string_view key) { return find_named(named, key) == nullptr; });
+}
+
+// Bytes win over the member, which may not be able to say them.
+void apply_named(Transaction &transaction, PropertyOwner const &owner, NamedProperties named,
+                 Node const &node) {
+  apply_members(transaction, owner, named, node);
+  apply_raw(transaction, owner, node, "properties",
+            [&](std::string_view key) { return find_named(named, key) != nullptr; });
+}
+
+void apply_properties(Transaction &transaction, PropertyOwner const &owner, NamedProperties named,
+                      Node const &node) {
+  apply_others(transaction, owner, named, node);
+  apply_named(transaction, owner, named, node);
+}
+
+void set_counters(Transaction &transaction, CounterOwner const &owner, Node const &counters) {
+  for_each_member(counters, [&](std::string const &name, Node const &value) {
+    stored::set_counter(transaction, owner, name, value.counter());
+  });
+}
+
+void apply_counters(Transaction &transaction, CounterOwner const &owner, Node const &node) {
+  if_there(node, "counters",
+           [&](Node const &counters) { set_counters(transaction, owner, counters); });
+}
+
+VSMACEntry address_entry_from(Node const &node) {
+  node.only({"mac", "vlan", "vni", "type", "ages", "age"});
+  VSMACEntry entry{};
+  auto const mac = mac_from(node.at("mac").text());
+  if (!mac) {
+    node.at("mac").fail("must be six bytes such as 02:00:00:00:00:01");
+  }
+  std::memcpy(entry.macAddress, mac->data(), mac->size());
+  auto const type = node.get("type", VS_MAC_ADDR_TYPE_LEARNED, [](Node const &given) {
+    return given.choice(std::span(kAddressTypes));
+  });
+  entry.macAddrType = type;
+  entry.vid =
+      node.get("vlan", qex_VlanID{0}, [](Node const &given) { return given.integer(0, 4094); });
+  entry.vni =
+      node.get("vni", qex_uint32{0}, [](Node const &given) { return given.integer(0, 0xFFFFFF); });
+  entry.aging =
+      node.get("ages", static_cast<qex_Bool>(type == VS_MAC_ADDR_TYPE_LEARNED), &Node::flag_of);
+  entry.elapsed = node.get("age", qex_uint32{0}, number_of_32_bits);
+  return entry;
+}
+
+void apply_addresses(Transaction &transaction, Place const &place, Node const &node) {
+  for_each_in(node, "addresses", [&](Node const &item) {
+    stored::describe_address(transaction, place, address_entry_from(item));
+  });
+}
+
+McastGroup group_from(Node const &node) {
+  node.only({"address", "version", "sources", "source_mode", "vni", "observed"});
+  auto const address = [](Node const &given) {
+    auto const bytes = address_from(given.text());
+    if (!bytes) {
+      given.fail("must be an address of Ethernet, IPv4 or IPv6");
+    }
+    return *bytes;
+  };
+  McastGroup group{.address = address(node.at("address")),
+                   .version = node.get("version", 0U, number_of_32_bits),
+                   .source_mode = node.get(
+                       "source_mode", 0U,
+                       [](Node const &given) { return given.choice(std::span(kSourceModes)); }),
+                   .vni = node.get("vni", 0U, number_of_32_bits),
+                   .updated = {},
+                   .sources = {}};
+  if (auto const sources = node.find("sources")) {
+    for (auto const &source : sources->items()) {
+      group.sources.push_back(address(source));
+    }
+  }
+  return group;
+}
+
+void apply_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+  node.only({"id", "external_id", "teaming", "uplink", "mac_learning", "addresses", "groups",
+             "mirror_sessions", "counters", "properties", "observed"});
+  auto const identifier = node.at("id").text();
+  auto const found = storage::find_port(transaction, key, identifier);
+  auto const port = found ? *found : add_client_port(transaction, key, identifier);
+  auto const owner = PropertyOwner::port(key, port.number);
+  if_there(node, "external_id",
+           [&](Node const &external) { set_external_id(transaction, port, external.text()); });
+  apply_properties(transaction, owner, named_of_port(), node);
+  apply_addresses(transaction, {.switch_key = key, .port = port.number}, node);
+  for_each_in(node, "groups",
+              [&](Node const &item) { stored::join(transaction, port.number, group_from(item)); });
+  apply_counters(transaction, {.switch_key = key, .port = port.number}, node);
+}
+
+// The keys with which a switch is made, and which cannot change later.
+storage::SwitchKey made_switch(Transaction &transaction, std::string const &alias,
+                               Node const &node) {
+  auto const identifier = node.get("id", std::string(), text_of_node);
+  auto const portset = node.get("portset", std::string(), text_of_node);
+  SwitchSpec const spec{
+      .alias = alias,
+      .identifier = identifier,
+      .portset = portset,
+      .max_ports =
+          node.get("max_ports", 0U, [](Node const &given) { return given.integer(1, 65535); }),
+      .persistent = node.get("persistent", true, &Node::flag_of),
+      .version = node.get("version", 0U, number_of_32_bits)};
+  create_switch(transaction, spec);
+  return get_switch(transaction, alias).key;
+}
+
+storage::SwitchKey changed_switch(storage::FoundSwitch const &known, Node const &node) {
+  auto const keep = [&](std::string_view key, auto const &value, auto const &read) {
+    if (auto const given = node.find(key); given && read(*given) != value) {
+      given->fail("cannot change while the switch exists");
+    }
+  };
+  keep("id", known.row.identifier, text_of_node);
+  keep("portset", known.row.portset, text_of_node);
+  keep("max_ports", known.row.max_ports, number_of_32_bits);
+  keep("persistent", known.row.persistent, &Node::flag_of);
+  keep("version", known.row.version, number_of_32_bits);
+  return known.key;
+}
+
+// The port is to have the uplink, and no other one.
+void attach_to(Transaction &transaction, storage::Port const &port, std::string const &uplink) {
+  auto const known = get_uplink(transaction, uplink);
+  auto const present = storage::uplink_at(transaction, port.number);
+  if (present == uplink) {
+    return;
+  }
+  if (present) {
+    throw Refused(QEX_BUSY, "the port has the uplink '" + *present + "'");
+  }
+  if (known.port) {
+    throw Refused(QEX_BUSY, "the uplink '" + uplink + "' is at another port");
+  }
+  storage::attach_uplink(transaction, uplink, port.number);
+}
+
+void apply_uplink_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+  node.only({"id", "name", "uplink", "properties"});
+  auto const identifier = node.at("id").text();
+  auto const found = storage::find_port(transaction, key, identifier);
+  auto const port = found ? *found : add_vacant_uplink_port(transaction, key, identifier);
+  if (port.kind != storage::PortKind::uplink) {
+    node.at("id").fail("is a port that is no uplink port");
+  }
+  auto const owner = PropertyOwner::port(key, port.number);
+  apply_properties(transaction, owner, named_of_uplink_port(), node);
+  if_there(node, "uplink",
+           [&](Node const &uplink) { attach_to(transaction, port, uplink.text()); });
+}
+
+void attach_uplinks(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+  for_each_in(node, "uplinks", [&](Node const &item) {
+    auto const name = item.text();
+    auto const attached = storage::uplinks_of(transaction, key);
+    bool const here = std::any_of(attached.begin(), attached.end(),
+                                  [&](auto const &uplink) { return uplink.name == name; });
+    if (!here) {
+      add_uplink_port(transaction, key, name);
+    }
+  });
+}
+
+void apply_lag(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+  node.only({"name", "uplinks", "observed"});
+  std::vector<std::string> uplinks;
+  for (auto const &uplink : node.at("uplinks").items()) {
+    uplinks.push_back(uplink.text());
+  }
+  stored::put_lag(transaction, key, node.at("name").text(), uplinks);
+}
+
+void apply_session_counters(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+  if_there(node, "mirror_counters", [&](Node const &sessions) {
+    for_each_member(sessions, [&](std::string const &sid, Node const &counters) {
+      set_counters(transaction, {.switch_key = key, .session = sid}, counters);
+    });
+  });
+}
+
+}  // namespace
+
+void apply_switch(Transaction &transaction, Node const &node) {
+  node.only({"alias",
+             "id",
+             "portset",
+             "max_ports",
+             "persistent",
+             "version",
+             "running",
+             "mtu",
+             "uplink_ports",
+             "uplinks",
+             "lags",
+             "teaming",
+             "mac_learning",
+             "multicast",
+             "addresses",
+             "counters",
+             "mirror_counters",
+             "properties",
+             "host_properties",
+             "ports",
+             "observed"});
+  auto const alias = node.at("alias").text();
+  auto const known = storage::find_switch(transaction, storage::SwitchName::alias, alias);
+  auto const key = known ? changed_switch(*known, node) : made_switch(transaction, alias, node);
+  auto const owner = PropertyOwner::global(key);
+  apply_others(transaction, owner, named_of_switch(), node);
+  apply_others(transaction, PropertyOwner::host(key), {}, node, "host_properties");
+  for_each_in(node, "uplink_ports",
+              [&](Node const &item) { apply_uplink_port(transaction, key, item); });
+  attach_uplinks(transaction, key, node);
+  for_each_in(node, "lags", [&](Node const &item) { apply_lag(transaction, key, item); });
+  apply_named(transaction, owner, named_of_switch(), node);
+  for_each_in(node, "ports", [&](Node const &item) { apply_port(transaction, key, item); });
+  apply_addresses(transaction, {.switch_key = key, .port = std::nullopt}, node);
+  apply_counters(transaction, {.switch_key = key}, node);
+  apply_session_counters(transaction, key, node);
+  if_there(node, "running",
+           [&](Node const &running) { change_running(transaction, key, running.flag()); });
+}
+
+}  // namespace simhost::scenario

@@ -1,0 +1,18 @@
+// The tables of a state file, and the marks by which one is recognised.
+#pragma once
+
+#include <cstdint>
+
+namespace simhost::storage {
+
+/// "VSim": no other program's database carries it.
+inline constexpr std::int64_t kApplicationId = 0x5653696D;
+/// Rises with every change of the tables; a file of another version is refused, not converted.
+inline constexpr std::int64_t kSchemaVersion = 3;
+
+/// Creates the tables of an empty database.
+extern char const *const kSchema;
+/// Likewise those of what runs on the configuration that the tables of kSchema hold.
+extern char const *const kRunningSchema;
+
+}  // namespace simhost::storage
