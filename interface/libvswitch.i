@@ -23,6 +23,9 @@
 %include "frame/typemaps/results.i"
 %include "frame/typemaps/constants.i"
 
+// Words for what C does not say of calls.
+%include "calls/facts.i"
+
 // The host kernel interface: scalars, names, management, packets, links, ports.
 %include "records/types.i"
 %include "records/kernel.i"

@@ -62,10 +62,13 @@ class Type:
 class Parameter:
     name: str
     type: Type
+    c_type: str
+    is_const: bool  # what it points to
     is_output: bool  # the wrapper owns it and appends its value to the result
-    output_record: str  # of an output that is a record: under which type it is answered
+    output_record: str  # of an output that is a record: under which type it is returned
     is_required: bool  # null is refused
-    is_bytes: bool  # the inside of a bytes object
+    python: str  # what stands for it where C does not say it: bytes, a buffer, or nothing, a "part"
+    room: int  # of an output that is a text: bytes at most
 
 
 @dataclass(frozen=True)
@@ -79,6 +82,14 @@ class Function:
     owns_elements: bool = False  # answers a new array
     null: str = ""  # when it answers null: "never", only on "failure", or in the course of things
     body: str = ""  # of a method, in C
+    c_result: str = ""
+    family: str = ""  # of a call of the host, as interface/calls names it
+    deallocator: str = ""  # of what a call leaves behind pointers, unless `said` names another
+    said: Dict[Tuple[str, str], str] = field(default_factory=dict, hash=False)
+
+    def says(self, kind: str, name: str) -> str:
+        """What interface/calls says of a parameter or of the result; nothing if it does not."""
+        return self.said.get((kind, name), "")
 
     @property
     def inputs(self) -> List[Parameter]:
@@ -221,7 +232,7 @@ def _collect_members(node: ET.Element, record: Record) -> None:
         if child.tag == "extend":
             _collect_members(child, record)
         elif child.tag == "constructor":
-            record.constructor = _parameters(child)
+            record.constructor = _parameters(child, seen)
         elif child.tag == "cdecl" and seen.get("kind") == "function":
             record.methods.append(_function(child, seen))
         elif child.tag == "cdecl" and "sym_name" in seen:
@@ -230,7 +241,7 @@ def _collect_members(node: ET.Element, record: Record) -> None:
                     seen["sym_name"],
                     _type(seen["decl"] + seen["type"]),
                     is_writable=seen.get("feature_immutable") != "1",
-                    reads_as_text="mac_text" in seen.get("tmap_out", ""),
+                    reads_as_text=seen.get("tmap_out_python") == "text",
                     doc=_text(seen),
                     count=seen.get("feature_count", ""),
                     is_bit_field="bitfield" in seen,
@@ -240,41 +251,74 @@ def _collect_members(node: ET.Element, record: Record) -> None:
 
 def _function(node: ET.Element, seen: _Attributes) -> Function:
     whole = _split_layers(seen["decl"] + seen["type"])
-    parameters = _parameters(node)
+    parameters = _parameters(node, seen)
     named = tuple(parameter for parameter in parameters if parameter.type.name != "...")
+    result = ".".join(whole[1:])
     return Function(
         seen["sym_name"],
         named,
-        _type(".".join(whole[1:])),
+        _type(result),
         _text(seen),
         takes_more=len(named) != len(parameters),
         answers=seen.get("feature_answers", ""),
         owns_elements=seen.get("feature_new") == "1",
         null=seen.get("feature_null", ""),
         body=seen.get("code", ""),
+        c_result=_spelled_in_c(result),
+        family=seen.get("feature_family", ""),
+        deallocator=seen.get("feature_deallocator", ""),
+        said=_said(seen),
     )
 
 
-def _parameters(node: ET.Element) -> Tuple[Parameter, ...]:
+# The words of interface/calls/facts.i that are said of one parameter, or of the result.
+_WORDS = (
+    "allocates",
+    "bytes",
+    "elements",
+    "form",
+    "nullable",
+    "reads",
+    "releases",
+    "shows",
+    "takes",
+    "unless",
+)
+
+
+def _said(seen: _Attributes) -> Dict[Tuple[str, str], str]:
+    found = {}
+    for key, value in seen.items():
+        kind, _, name = key[len("feature_") :].partition("_")
+        if key.startswith("feature_") and kind in _WORDS and name and value:
+            found[kind, name] = value
+    return found
+
+
+def _parameters(node: ET.Element, of: _Attributes) -> Tuple[Parameter, ...]:
     found = []
     listed = node.find("attributelist/parmlist")
+    said = _said(of)
     for parm in [] if listed is None else list(listed):
         seen = _attributes(parm)
         if seen.get("type") == "void":
             continue
-        answered = re.search(r"SWIGTYPE_p_(\w+)", seen.get("tmap_argout", ""))
+        name, encoded = seen.get("name", ""), seen["type"]
         found.append(
             Parameter(
-                seen.get("name", ""),
-                Type((), "...") if seen["type"] == "v(...)" else _type(seen["type"]),
+                name,
+                Type((), "...") if encoded == "v(...)" else _type(encoded),
+                c_type="..." if encoded == "v(...)" else _spelled_in_c(encoded),
+                is_const="q(const)" in encoded,
                 is_output=seen.get("tmap_in_numinputs") == "0",
-                output_record=answered.group(1) if answered else "",
-                is_required="tmap_check" in seen,
-                is_bytes="PyBytes_AsString" in seen.get("tmap_in", ""),
+                output_record=seen.get("tmap_argout_record", ""),
+                is_required="tmap_check_required" in seen,
+                python=seen.get("tmap_in_python", "") or said.get(("takes", name), ""),
+                room=int(seen.get("tmap_in_room", "0")),
             )
         )
     # An argument of several C parameters is one of Python's.
-    return tuple(one for one in found if one.type.name != "SIZE")
+    return tuple(one for one in found if one.python != "part")
 
 
 def _split_layers(encoded: str) -> List[str]:
@@ -293,6 +337,22 @@ def _split_layers(encoded: str) -> List[str]:
 def _type(encoded: str) -> Type:
     *layers, name = _split_layers(encoded)
     return Type(tuple(layer for layer in layers if not layer.startswith("q(")), _bare(name))
+
+
+def _spelled_in_c(encoded: str) -> str:
+    """A type as C has it: `char const *`, `VSUplinks **`, `char const [32]`."""
+    *layers, name = _split_layers(encoded)
+    text = ""
+    for layer in layers:
+        if layer == "p":
+            text = f"*{text}"
+        elif layer.startswith("q("):
+            text = f" {layer[2:-1]} {text}"
+        elif layer.startswith("a("):
+            text = f"{text}[{layer[2:-1]}]"
+        else:
+            return f"{name} (*)({layer[2:-1]})"
+    return re.sub(r"\s+", " ", f"{name} {text}").strip()
 
 
 def _text(seen: _Attributes) -> str:

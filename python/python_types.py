@@ -50,9 +50,9 @@ class PythonTypes:
 
     def argument(self, one: Parameter) -> str:
         type_ = self.known.resolve(one.type)
-        if one.is_bytes:
+        if one.python == "bytes":
             return "bytes"
-        if one.name == "mac_str":
+        if one.python == "buffer":
             return "Union[bytes, bytearray, memoryview]"
         if not type_.layers and type_.name in self.known.records:
             return self.pointer(Type(("p",), type_.name))
@@ -123,7 +123,8 @@ class PythonTypes:
         if target.is_pointer:
             if self.prefix and target.name == "VSPvlanMapEntry":
                 return f"Union[Array[{target.name}], Any]"
-            return f"Union[{self.pointer(Type(('p',), one.output_record))}, Any]"
+            record = one.output_record or target.name
+            return f"Union[{self.pointer(Type(('p',), record))}, Any]"
         return "str" if target.name == "char" and one.type.name == "char" else "int"
 
     def read(self, field: Field) -> str:

@@ -4,6 +4,7 @@ import re
 from dataclasses import dataclass
 from typing import Collection, Dict, Iterable, List, Optional, Sequence, Tuple
 
+import call_model
 import comments
 import ownership
 import statuses
@@ -60,6 +61,7 @@ class Entries:
         self, known: Definitions, headers: Dict[str, Header], helpers: Collection[Header]
     ) -> None:
         self._known = known
+        self._calls = {call.name: call for call in call_model.read(known)}
         self._headers = headers
         self._helpers = helpers
         self._said_of_types = {
@@ -89,9 +91,15 @@ class Entries:
             results=self._results(forms[0]),
             shape=_shape_of_result(forms[0]),
             statuses=statuses.of_call(name, header) if header else {},
-            ownership=tuple(ownership.of_call(self._known, longest, prototype, header, comment)),
+            ownership=tuple(self._ownership(longest)),
             header=header.name if header else "",
         )
+
+    def _ownership(self, function: Function) -> List[str]:
+        call = self._calls.get(function.name)
+        if call is not None:
+            return ownership.of_call(call)
+        return ownership.of_function(self._known, function)
 
     def _names(self, form: Function) -> Tuple[str, ...]:
         names = tuple(_said(one.name) for one in form.inputs)
@@ -179,7 +187,7 @@ class Entries:
         if type_.layers == ("p", "p"):
             return True
         is_number = type_.name not in ("void", "char") and type_.name not in self._known.records
-        return type_.layers == ("p",) and is_number and not one.is_bytes
+        return type_.layers == ("p",) and is_number and one.python != "bytes"
 
     def _results(self, function: Function) -> Tuple[str, str]:
         plain = self._in_words(self._python_types[0].result(function))

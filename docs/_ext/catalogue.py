@@ -3,12 +3,11 @@
 import json
 import re
 from pathlib import Path
-from typing import Dict, Iterable, List, Optional, Tuple
+from typing import Dict, Iterable, List, Tuple
 
 import comments
 import definitions
 import layout
-import ownership
 import statuses
 from call_entries import Call, Entries
 from comments import Family, Header
@@ -80,10 +79,6 @@ class Catalogue:
 
     def header_of(self, record: Record) -> str:
         return "/".join(Path(record.header).parts[-2:])
-
-    def door(self, call: Call) -> Optional[str]:
-        """The call that takes back what this one hands out."""
-        return ownership.door(call.prototype, self.headers.get(call.header), call.comment)
 
     def reads_as(self, one: Field) -> str:
         """What an attribute of a class reads as."""

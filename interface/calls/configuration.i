@@ -19,4 +19,16 @@
 %record_out(DVMirrorSessionTable **table)               // VSDVS_GetDVMirrorSessions
 %array_argument(char const sid[32])                     // VSDVS_RemoveDVMirrorSession
 
+%calls(configuration, VSDVS_FreeMemory)
+%elements(ranges, numRanges)                            // VSDVS_SetPortVLANPolicy
+%elements(entries, count)                               // VSDVS_GetPrivateVLANMap, ...
+%nullable(VSDVS_CreateVSwitch, switchId)
+%nullable(VSDVS_CreateVSwitch, portsetName)
+%nullable(VSDVS_SetPortVLANPolicy, ranges)
+%nullable(VSDVS_SetPrivateVLANMap, entries)
+%reads(VSDVS_SetPortVLANPolicy, ranges)
+%reads(VSDVS_AppendDVMirrorSessions, table)
+%releases(VSDVS_FreeMemory, memory)
+%nullable(VSDVS_FreeMemory, memory)
 %include "vswitch/configuration.h"
+%end_calls

@@ -16,4 +16,13 @@
 %record_out(VSPromiscSessionActiveDsts **ports)         // VSQEX_GetPromiscSessionActiveDsts
 %record_out(VSRuntimeOptions **options)                 // VSQEX_GetRuntimeOptions
 
+%calls(queries, VSQEX_FreeMemory)
+%elements(ids, count)                                   // VSQEX_GetRuntimeOptions
+%nullable(VSQEX_GetRuntimeOptions, ids)
+%form(VSQEX_GetMcastFilterStats, group, mode)
+%reads(VSQEX_SetRuntimeOptions, options)
+%reads(VSQEX_SetGlobalMACLearningProps, props)
+%releases(VSQEX_FreeMemory, memory)
+%nullable(VSQEX_FreeMemory, memory)
 %include "vswitch/queries.h"
+%end_calls

@@ -16,7 +16,7 @@ typedef size_t SIZE;
 %}
 
 // A hardware address reads as text; it is written as bytes.
-%typemap(out, noblock=1) unsigned char macAddress[6], unsigned char fixedHwID[6] {
+%typemap(out, noblock=1, python="text") unsigned char macAddress[6], unsigned char fixedHwID[6] {
   %set_output(mac_text($1));
 }
 
@@ -35,6 +35,10 @@ typedef size_t SIZE;
 }
 // The default, which nothing uses, would put a type into the table.
 %typemap(typecheck) SIZE "";
+
+// For what is made beside the module: one buffer stands for both parameters.
+%feature("takes:mac_str", "buffer") VSMACEntry::set_mac_address;
+%feature("takes:length", "part") VSMACEntry::set_mac_address;
 
 %include "vswitch/device.h"
 %include "vswitch/mac_tables.h"

@@ -20,6 +20,9 @@
 %include "vswitch/properties.h"
 %include "vswitch/mirror.h"
 
+%allocates(alloc_dvmirror_session_table, RESULT, free_dvmirror_session_table)
+%releases(free_dvmirror_session_table, table)
+%nullable(free_dvmirror_session_table, table)
 DVMirrorSessionTable *alloc_dvmirror_session_table(int numSessions, int numEntities);
 void free_dvmirror_session_table(DVMirrorSessionTable *table);
 void MIRROR_ENCAP_TYPE(void);

@@ -5,23 +5,43 @@ import types_in_words
 from catalogue import Catalogue
 
 
-def test_doors(catalogue: Catalogue) -> None:
-    """The headers' words name the door that the classes use."""
-    from libvswitch import _layout, _ownership
-
-    handing_out = [*_layout.CALLS_WITH_CELLS]
-    for name, call in catalogue.calls.items():
-        if any("to be given back once" in one for one in call.ownership):
-            handing_out.append(name)
-    assert len(set(handing_out)) > 30
-    for name in handing_out:
-        call = catalogue.calls[name]
-        door = catalogue.door(call)
-        views = [one for one in call.ownership if "nothing frees it" in one]
-        if views:
-            assert _ownership.door_of(name) is None, name
-        elif name != "DVSData_Serialize":  # of the list's own allocator, so it may be another
-            assert door == _ownership.door_of(name), name
+def test_ownership_follows_from_what_is_declared(catalogue: Catalogue) -> None:
+    allocating = [
+        call
+        for call in catalogue.calls.values()
+        if any("the library's memory" in one for one in call.ownership)
+    ]
+    assert len(allocating) == 31
+    said = {name: list(call.ownership) for name, call in catalogue.calls.items()}
+    library = "the library's memory, for {} to release once"
+    assert said["VSQEX_GetUplinks"] == [f"`uplinks`: {library.format('VSQEX_FreeMemory')}."]
+    assert said["DVSQEX_VendorPortPropList"] == [f"`list`: {library.format('DVSData_Free')}."]
+    assert said["DVSData_Serialize"] == [
+        f"`bytes`: {library.format('DVSQEX_DataFree')}, unless the list has an allocator of its"
+        " own, whose counterpart frees it."
+    ]
+    view = "a view of what stays the library's, good until {}; nothing frees it."
+    assert said["DVSData_Data"] == [f"`data`: {view.format('the item ends')}"]
+    ends = view.format("a reset or a cleanup of the state")
+    assert said["DVSState_PortFind"] == [f"What is returned is {ends}"]
+    assert said["VSQEX_GetVSInfo"] == ["`info`: the caller's; the call fills it."]
+    assert said["VSQEX_SetRuntimeOptions"] == ["`options`: the caller's, only read."]
+    assert said["VSDVS_SetMTU"] == ["nothing changes hands."]
+    released = ["releases memory; what the caller has of it is no longer to be used."]
+    deallocators = {name for name, sentences in said.items() if sentences == released}
+    assert deallocators == {
+        "VSDVS_FreeMemory",
+        "VSQEX_FreeMemory",
+        "DVSQEX_DataFree",
+        "DVSData_Free",
+        "free_dvmirror_session_table",
+        "delete_vidrangeArray",
+        "delete_pvlanmapentryArray",
+    }
+    owned = ["Python owns what is returned, and frees it."]
+    assert said["new_vidrangeArray"] == said["vidrangeArray_getitem"] == owned
+    table = "the caller's, until free_dvmirror_session_table releases it."
+    assert said["alloc_dvmirror_session_table"] == [table]
 
 
 @pytest.mark.parametrize(

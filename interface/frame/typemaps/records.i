@@ -71,7 +71,7 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self),
 %enddef
 
 // Other arguments that a method needs.
-%typemap(check, noblock=1) SWIGTYPE *REQUIRED, char *REQUIRED {
+%typemap(check, noblock=1, required="1") SWIGTYPE *REQUIRED, char *REQUIRED {
   if (!$1) %null_argument($argnum, "$type");
 }
 %define %required(PARAMETER...)

@@ -11,9 +11,13 @@
 //
 // A line also matches parameters of that name that are const, so the buffers of texts have names that
 // no input has. Stands before the calls; each line before the header of its calls.
+//
+// `python` says beside a typemap what stands for the parameter in Python, for whatever is made of the
+// definitions beside the module; so do `record`, the record that a pointer is one of, and `room`, the
+// bytes of text at most.
 
 %define %record_out(PARAMETER...)
-%typemap(in, numinputs=0, noblock=1) PARAMETER ($*1_ltype record = NULL) {
+%typemap(in, numinputs=0, noblock=1, python="record") PARAMETER ($*1_ltype record = NULL) {
   $1 = &record;
 }
 %typemap(argout, noblock=1) PARAMETER {
@@ -23,13 +27,13 @@
 
 %define %record_out_as(PARAMETER, RECORD)
 %record_out(PARAMETER)
-%typemap(argout, noblock=1) PARAMETER {
+%typemap(argout, noblock=1, record="RECORD") PARAMETER {
   %append_output(SWIG_NewPointerObj(%as_voidptr(*$1), $descriptor(RECORD *), 0));
 }
 %enddef
 
 %define %integer_out(PARAMETER...)
-%typemap(in, numinputs=0, noblock=1) PARAMETER ($*1_ltype value = 0) {
+%typemap(in, numinputs=0, noblock=1, python="number") PARAMETER ($*1_ltype value = 0) {
   $1 = &value;
 }
 %typemap(argout, noblock=1, fragment=SWIG_From_frag(int)) PARAMETER {
@@ -44,7 +48,7 @@
 // The buffer is handed over as it is, and what comes back is cut whatever the library wrote: behind
 // the bytes that it is promised there is room for as many again, for a text that is too long.
 %define %text_out(PARAMETER, LENGTH)
-%typemap(in, numinputs=0, noblock=1) PARAMETER (char text[2 * (LENGTH + 1)]) {
+%typemap(in, numinputs=0, noblock=1, python="text", room="LENGTH") PARAMETER (char text[2 * (LENGTH + 1)]) {
   $1 = text;
 }
 %typemap(argout, noblock=1, fragment="SWIG_FromCharPtr") PARAMETER {
@@ -55,7 +59,7 @@
 
 // Anything but bytes makes the call with a null pointer, and its TypeError surfaces afterwards.
 %define %raw_bytes(PARAMETER...)
-%typemap(in, noblock=1) PARAMETER {
+%typemap(in, noblock=1, python="bytes") PARAMETER {
   $1 = ($1_ltype)PyBytes_AsString($input);
 }
 %typemap(argout, noblock=1) PARAMETER {
