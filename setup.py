@@ -1,12 +1,11 @@
 """Builds the wheel: CMake builds and installs, setuptools packs.
 
 The wheel holds the module with its classes and stubs, and the simulated host, which the module
-finds behind LD_LIBRARY_PATH and before the system's libraries. What it makes on the way lies in
+finds after LD_LIBRARY_PATH and before the system's libraries. What it makes on the way lies in
 build/wheel/.
 """
 
 import os
-import re
 import shutil
 import subprocess
 import sys
@@ -31,15 +30,6 @@ CONFIGURATION = {
     # A wheel cannot ask for libraries of the system.
     "COMPILE_FMT_IN": "ON",
 }
-
-
-def version() -> str:
-    """The version of the CMake project, which is that of everything here."""
-    text = (ROOT / "CMakeLists.txt").read_text(encoding="utf-8")
-    found = re.search(r"^project\(libvswitch VERSION ([0-9.]+)", text, re.MULTILINE)
-    if not found:
-        raise SystemExit("setup.py: CMakeLists.txt names no version")
-    return found.group(1)
 
 
 def require_setuptools(major: int) -> None:
@@ -76,7 +66,7 @@ class CMakeBuild(build_ext):
 require_setuptools(65)
 (ROOT / WORK).mkdir(parents=True, exist_ok=True)
 setup(
-    version=version(),
+    version=(ROOT / "VERSION").read_text(encoding="ascii").strip(),
     ext_modules=[Extension("_libvswitch", [])],
     cmdclass={"build_ext": CMakeBuild},
     options={

@@ -12,7 +12,8 @@ sys.path.append(str(HERE.parent / "simhost/libvswitch"))
 project = "libvswitch"
 author = "the authors of libvswitch"
 project_copyright = author
-html_title = "libvswitch for Python"
+version = release = (HERE.parent / "VERSION").read_text(encoding="ascii").strip()
+html_title = f"libvswitch {version} for Python"
 
 extensions = ["myst_parser", "documents", "reference", "sources"]
 build_folder = os.environ.get("BUILD_DIR", str(HERE.parent / "build"))

@@ -8,7 +8,7 @@ set -eu
 mkdir -p "$1"
 folder=$(CDPATH='' cd -- "$1" && pwd)
 cd "$(dirname -- "$0")/.."
-version=$(/usr/bin/python3 -W ignore setup.py --version)
+version=$(cat VERSION)
 
 source=$folder/source
 mkdir -p "$source"
@@ -22,7 +22,7 @@ maintainer=$(sed -n 's/^Maintainer: //p' "$source/debian/control")
 cat >"$source/debian/changelog" <<EOF
 libvswitch ($version) unstable; urgency=medium
 
-  * Packages of this version.
+  * CHANGELOG.md says what is new.
 
  -- $maintainer  $(date -R -u -d "@$SOURCE_DATE_EPOCH")
 EOF

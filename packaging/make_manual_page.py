@@ -54,7 +54,7 @@ def read(program: str, words: Sequence[str]) -> Help:
 
 
 def entries(lines: Sequence[str]) -> Iterator[Entry]:
-    """A term stands two columns in, what is said of it behind it or on the next line."""
+    """A term stands two columns in, what is said of it after it or on the next line."""
     for part in re.findall(r"^  \S.*(?:\n {3,}.*)*", "\n".join(lines), re.MULTILINE):
         term, *said = re.split(r"\s{2,}", part.strip())
         yield re.sub(r" REQUIRED| Excludes: \S+", "", term), " ".join(said)
