@@ -5,8 +5,9 @@
 #
 # Usage: ./dev lint
 #
-# clang-format, clang-tidy, shellcheck, black, flake8 and mypy --strict. clang-tidy leaves out files
-# that were clean before and have not changed since, nor any header.
+# clang-format, clang-tidy, shellcheck, black, flake8, mypy --strict, and chores/words.py for the words
+# of the glossary. clang-tidy leaves out files that were clean before and have not changed since, nor
+# any header that they include.
 # To put the format right: clang-format -i FILE..., black FILE...
 cmd_lint() {
   [ $# -eq 0 ] || die "lint takes no options"
@@ -29,6 +30,7 @@ lint() {
   check black check_black
   check flake8 check_flake8
   check mypy check_mypy
+  check words check_words
 }
 
 check() {
@@ -41,14 +43,15 @@ check() {
   fi
 }
 
-# sources PATTERN...: our own files with such names, a line each.
+# sources PATTERN...: our own files with such names, a line each; of those that the file $only lists,
+# if it is set.
 sources() {
   for pattern; do
     find . -path './build*' -prune -o -path './.*/*' -prune -o -type f -name "$pattern" -print
-  done
+  done | if [ -n "${only-}" ]; then grep -xF -f "$only" || :; else cat; fi
 }
 
-check_format() { sources '*.h' '*.c' '*.cpp' | xargs clang-format --dry-run -Werror; }
+check_format() { sources '*.h' '*.c' '*.cpp' | xargs -r clang-format --dry-run -Werror; }
 
 check_shell() {
   # The chores are checked where dev takes them in.
@@ -56,31 +59,32 @@ check_shell() {
   shellcheck -x dev .ci/run $(sources '*.sh' | grep -v '^\./chores/')
 }
 
-check_black() { sources '*.py' | xargs black --check --quiet --diff; }
+check_black() { sources '*.py' | xargs -r black --check --quiet --diff; }
 
-check_flake8() { sources '*.py' | xargs flake8; }
+check_flake8() { sources '*.py' | xargs -r flake8; }
 
 # A folder at a time: several folders have a conftest, which as modules are one name.
 check_mypy() {
   status=0
-  for directory in $(sources '*.py' | xargs -n 1 dirname | sort -u); do
+  for directory in $(sources '*.py' | xargs -r -n 1 dirname | sort -u); do
     MYPYPATH=$directory mypy --no-error-summary --cache-dir build/mypy "$directory"/*.py || status=1
   done
   return "$status"
 }
 
-# What clang-tidy says of a file depends on the file, its flags, all headers and the configuration;
-# the hash of these names a stamp that is left when it had nothing to say.
+check_words() { "$python" chores/words.py; }
+
+# What clang-tidy says of a file depends on what tidy_inputs.py hashes; the hash names a stamp that is
+# left when it had nothing to say.
 check_tidy() {
   export folder ours="^$root/(include|helpers|simhost|tests|bench)/"
   stamps=$folder/tidy
   mkdir -p "$stamps"
-  common=$({ sources '*.h' | sort | xargs cat; cat .clang-tidy "$folder/compile_commands.json" \
-    "${FUZZERS_DIR-$folder}/compile_commands.json"; } | sha256sum)
-  # shellcheck disable=SC2016 # the inner shell expands it
-  sources '*.c' '*.cpp' | grep -v "${untidied:-^$}" | while read -r file; do
-    stamp=$stamps/$({ say "$common"; cat "$file"; } | sha256sum | cut -c 1-40)
-    [ -e "$stamp" ] || say "$file $stamp"
+  # shellcheck disable=SC2046 # none of our file names has a space
+  inputs=$("$python" chores/tidy_inputs.py "$folder" ${FUZZERS_DIR:+"$FUZZERS_DIR"} -- \
+    $(sources '*.c' '*.cpp' | grep -v "${untidied:-^$}")) || return
+  say "$inputs" | while read -r file hash; do
+    [ -e "$stamps/$hash" ] || say "$file $stamps/$hash"
   done | nice xargs -r -n 2 -P "$jobs" sh -c '
     echo "clang-tidy $1"
     case $1 in ./tests/fuzz/*) folder=$FUZZERS_DIR ;; esac

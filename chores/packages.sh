@@ -6,6 +6,7 @@ build_packages='cmake ninja-build g++ swig python3-dev libsqlitecpp-dev libsqlit
 docs_packages='python3-sphinx python3-myst-parser furo'
 test_packages="libgtest-dev libgmock-dev python3-pytest python3-hypothesis valgrind nodejs
   $docs_packages"
+check_packages='git python3-pytest-xdist'
 fuzz_packages='clang libclang-rt-14-dev'
 lint_packages='clang-format clang-tidy shellcheck black flake8 mypy'
 bench_packages='pybind11-dev python3-cffi cython3'

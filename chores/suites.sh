@@ -41,6 +41,20 @@ junit() {
   tally "$title" $counts
 }
 
+# cxx_tests [NUMBERS]: all C++ tests, or those with these numbers of ctest, a comma before each.
+cxx_tests() {
+  junit "C++ tests" ctest.xml ctest --test-dir "$folder" --output-on-failure --no-tests=error \
+    -j "$jobs" ${1:+-I "0,0,0$1"} --output-junit "$root/$folder/ctest.xml"
+}
+
+# select_tests WHICH...: what chores/select_tests.py chooses, in the file that $selected names; then
+# the C++ tests of it are run.
+select_tests() {
+  /usr/bin/python3 chores/select_tests.py "$folder" "$@" >"$selected" || die "no tests are chosen"
+  numbers=$(sed -n 's/^ctest /,/p' "$selected" | tr -d '\n')
+  [ -z "$numbers" ] || cxx_tests "$numbers"
+}
+
 tally() {
   passed=$((passed + $2)) failed=$((failed + $3))
   summary="$summary$(printf '%-16s %5d passed %5d failed' "$1" "$2" "$3")

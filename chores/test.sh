@@ -12,7 +12,7 @@
 #                   the newest of each version, one after the other in build folders of their own
 #   --packages      instead of all else what ./dev package makes, installed into empty systems and
 #                   removed again; it takes root's rights. ARGUMENTS are pytest's
-#   -k EXPRESSION   only the Python tests that match: no lint, C++ tests, fuzzers or peers
+#   -k EXPRESSION   only the tests that match, C++ and Python alike: no lint, fuzzers or peers
 #   -- ARGUMENTS    given to each run of pytest as they are
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
@@ -78,9 +78,12 @@ cmd_test() {
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
 
-  [ -n "$expression" ] ||
-    junit "C++ tests" ctest.xml ctest --test-dir "$folder" --output-on-failure --no-tests=error \
-      -j "$jobs" --output-junit "$root/$folder/ctest.xml"
+  if [ -n "$expression" ]; then
+    selected=$folder/selected
+    select_tests named "$expression"
+  else
+    cxx_tests
+  fi
   pytest "Python tests" module.xml '' tests --ignore=tests/contract --ignore=tests/classes \
     --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages "$@"
   class_tests "$@"
