@@ -38,7 +38,7 @@ class Worker:
             raise PeerMissing(f"{peer} runs on {loaded}, which is not the null host")
 
     def ask(self, form: str, figure: str, loops: Optional[int] = None) -> Any:
-        """Return what the peer answers for a figure; with loops, the nanoseconds it takes."""
+        """Return the peer's result for a figure; with loops, the nanoseconds it takes."""
         request: Dict[str, Any] = {"form": form, "figure": figure}
         if loops is not None:
             request["loops"] = loops

@@ -56,12 +56,12 @@ EXPECTED: Dict[str, Any] = {
     "item": "nic1",
     "length": 2,
 }
-"""What every peer must answer: the value of the expression, or what it left behind."""
+"""What every peer must return: the value of the expression, or what it left behind."""
 
 
 @dataclass
 class Figure:
-    """An expression with the values of its names, and a way to see what it answers."""
+    """An expression with the values of its names, and a way to see its result."""
 
     expression: str
     names: Dict[str, Any]

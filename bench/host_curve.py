@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""How fast the simulated host answers, in memory and on a file, and how that grows with its ports.
+"""How fast the simulated host is, in memory and on a file, and how that grows with its ports.
 
 usage: host_curve.py [--quick] BUILD_FOLDER
 
@@ -54,7 +54,7 @@ def mac(number: int) -> str:
     return "02:00:" + ":".join(f"{byte:02x}" for byte in number.to_bytes(4, "big"))
 
 
-def furnish(simhost: Any, ports: int) -> None:
+def populate(simhost: Any, ports: int) -> None:
     """A switch with two uplinks, and so many ports with addresses that they learned."""
     learning = {"learning": True, "limit": 4096}
     document: Dict[str, Any] = {
@@ -89,7 +89,7 @@ def measure(build: Path, ports: int, effort: Effort) -> Dict[str, float]:
     import _libvswitch as vs
 
     simhost = ctypes.CDLL(str(build / "simhost" / "libsimhost.so"))
-    furnish(simhost, ports)
+    populate(simhost, ports)
     names = [f"port-{index * 7919 % ports}" for index in range(1_000)]
     numbers = [vs.VSDVS_DvPortIDToPortID("curve", name)[1] for name in names]
     security, info, uplink = vs.new_VSPropSecurity(), vs.new_VSInfo(), vs.new_qex_Name()

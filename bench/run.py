@@ -54,24 +54,24 @@ def make_twin(build: Path) -> None:
     shutil.copy(module, twin)
 
 
-Answers = Dict[str, Dict[str, Dict[str, Any]]]
-"""For each form, peer and figure, what the peer answers."""
+Results = Dict[str, Dict[str, Dict[str, Any]]]
+"""For each form, peer and figure, the peer's results."""
 
 
-def ask_all(build: Path, core: int) -> Answers:
+def ask_all(build: Path, core: int) -> Results:
     """Ask every peer for every figure."""
-    answers: Answers = {form: {} for form in FORMS}
+    results: Results = {form: {} for form in FORMS}
     for peer in PEERS:
         with calls.Worker(peer, build, core, seed=0) as worker:
             for form, peers in FORMS.items():
                 if peer in peers:
-                    answers[form][peer] = {figure: worker.ask(form, figure) for figure in FIGURES}
-    return answers
+                    results[form][peer] = {figure: worker.ask(form, figure) for figure in FIGURES}
+    return results
 
 
-def wrong(answers: Answers) -> Iterator[str]:
-    """The answers that differ from what is expected, a line each."""
-    for form, peers in answers.items():
+def wrong(results: Results) -> Iterator[str]:
+    """The results that differ from what is expected, a line each."""
+    for form, peers in results.items():
         for peer, figures in peers.items():
             for figure, answer in figures.items():
                 if answer != EXPECTED[figure]:
@@ -143,8 +143,8 @@ def main() -> None:
     )
 
     make_twin(build)
-    answers = ask_all(build, core)
-    if mistakes := list(wrong(answers)):
+    returned = ask_all(build, core)
+    if mistakes := list(wrong(returned)):
         sys.exit("bench: these peers answer something else:\n" + "\n".join(mistakes))
     progress = Progress()
     times = calls.measure(build, core, **settings, progress=progress)
@@ -172,7 +172,7 @@ def main() -> None:
     results = {
         "machine": machine(),
         "settings": {**settings, "core": core, "quick": arguments.quick},
-        "calls": {"answers": answers, "times": times, "medians": middle, "ratios": ratios},
+        "calls": {"results": returned, "times": times, "medians": middle, "ratios": ratios},
         "modules": {"values": whole, "medians": middle_of(whole), "ratios": ratios_to(whole)},
         "targets": judged,
     }

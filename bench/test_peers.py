@@ -1,4 +1,4 @@
-"""The comparison is one of equals: every peer answers the same and keeps what it claims to keep."""
+"""The comparison is one of equals: every peer returns the same and keeps what it claims to keep."""
 
 import json
 import os
@@ -82,12 +82,12 @@ module.delete_VSInfo(info)
 sys.stderr.write(json.dumps([module.qex_Name_string_get(name), *outcomes]))
 """
 
-PANIC = """
+TRAP = """
 import sys
 module = __import__(sys.argv[1])
 from recording_host import RecordingHost
 host = RecordingHost()
-host.spring("VSDVS_SetMTU", LookupError, "the host gives up", nth=1)
+host.spring("VSDVS_SetMTU", LookupError, "the call traps", nth=1)
 try:
     module.VSDVS_SetMTU("dvs0", 1500)
 except LookupError as error:
@@ -124,9 +124,9 @@ def fixture_quick(build: Path) -> Dict[str, Any]:
     return results
 
 
-def test_every_peer_answers_the_same_for_every_figure(quick: Dict[str, Any]) -> None:
+def test_every_peer_returns_the_same_for_every_figure(quick: Dict[str, Any]) -> None:
     expected = {form: {peer: EXPECTED for peer in peers} for form, peers in FORMS.items()}
-    assert quick["calls"]["answers"] == expected
+    assert quick["calls"]["results"] == expected
 
 
 def test_stock_frame_knows_the_vocabulary_of_the_definitions(tmp_path: Path) -> None:
@@ -174,4 +174,4 @@ def test_call_trap_is_armed(build: Path, module: str) -> None:
     host = build / "tests" / "recording_host"
     contract = ROOT / "tests" / "contract"
     folders = build / "python", build / "bench" / "peers", contract
-    assert run(PANIC, module, host, *folders) == "the host gives up; 0 0"
+    assert run(TRAP, module, host, *folders) == "the call traps; 0 0"

@@ -4,10 +4,10 @@
     worker.py PEER CORE SEED FOLDER...
 
 The modules of the peer are in the FOLDERs, the process stays on CORE, and SEED
-decides which of the varied values each evaluation takes. It answers each line
+decides which of the varied values each evaluation takes. It replies to each line
 with a line of JSON:
 
-    {"form": W, "figure": F}               the value that the peer answers for the figure
+    {"form": W, "figure": F}               the peer's value for the figure
     {"form": W, "figure": F, "loops": N}   the nanoseconds of one evaluation, from N loops
 
 Time is the processor's time of this thread: a process that has to wait for the core is not slower.

@@ -5,7 +5,7 @@
 #
 # Usage: ./dev lint
 #
-# clang-format, clang-tidy, shellcheck, black, flake8, mypy --strict, and chores/words.py for the words
+# clang-format, clang-tidy, shellcheck, black, flake8, mypy --strict, and chores/check_words.py for the words
 # of the glossary. clang-tidy leaves out files that were clean before and have not changed since, nor
 # any header that they include.
 # To put the format right: clang-format -i FILE..., black FILE...
@@ -72,7 +72,7 @@ check_mypy() {
   return "$status"
 }
 
-check_words() { "$python" chores/words.py; }
+check_words() { "$python" chores/check_words.py; }
 
 # What clang-tidy says of a file depends on what tidy_inputs.py hashes; the hash names a stamp that is
 # left when it had nothing to say.

@@ -28,7 +28,7 @@ class NotRestored(Exception):
     """The port may have neither the policy that it had nor the one that it was to get."""
 
 
-# The last two are what a host raises that gives up on a call.
+# The last two are what a call raises that traps.
 FAILURES = (HostError, RuntimeError, OSError)
 
 

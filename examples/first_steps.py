@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """First steps with a virtual switch: create one, configure it, ask the running switch about it.
 
-Runs on any host; without a real one, the simulated host answers. Prints what it does. However it
+Runs on any host; without a real one, it is the simulated host. Prints what it does. However it
 ends, the switch does not stay behind.
 """
 
@@ -42,7 +42,7 @@ def read_back() -> None:
 
 
 def list_uplinks() -> None:
-    """The library makes this record; it goes back to the library, and only once."""
+    """The library makes this record; it is released to the library, and only once."""
     status, uplinks = vs.VSQEX_GetUplinks(SWITCH)
     show(f"VSQEX_GetUplinks({SWITCH!r})", status)
     names = [vs.VSUplinks___getitem__(uplinks, i) for i in range(vs.VSUplinks___len__(uplinks))]

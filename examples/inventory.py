@@ -149,7 +149,7 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
             raise HostError(f"there is no switch {alias!r}")
         wanted = [names for names in known if not options.switch or names[0] in options.switch]
         switches = [examine(*names) for names in wanted]
-    except (HostError, RuntimeError, OSError) as error:  # the last two when the host gives up
+    except (HostError, RuntimeError, OSError) as error:  # the last two when a call traps
         print(f"inventory: {error}", file=sys.stderr)
         return 1
     if options.json:

@@ -21,7 +21,7 @@ def heading(text: str) -> None:
 
 
 def set_entity(entity: Any, kind: int, text: str) -> Any:
-    """Fills an entity and answers the one behind it; the kind must be set before the text."""
+    """Fills an entity and returns the next one; the kind must be set before the text."""
     vs.DVMirrorEntity_type_set(entity, kind)
     vs.DVMirrorEntity_set_entity(entity, text)
     return vs.DVMirrorEntity_next(entity)
@@ -75,7 +75,7 @@ def show_mirror_table() -> None:
     vs.free_dvmirror_session_table(table)
 
 
-# A runtime options list is a length and the options behind it, one after the other.
+# A runtime options list is a length and the trailing options, one after the other.
 
 OPTIONS: Dict[str, Union[int, str]] = {
     "MaxRARPsPerInterval": 20,

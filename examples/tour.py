@@ -43,7 +43,7 @@ def identifier() -> str:
 
 
 def raw(key: str, port: str = "") -> bytes:
-    """The bytes of a property, through the other door."""
+    """The bytes of a property, by the raw call."""
     data, length = vs.Cell("void *"), vs.Cell("int")
     if port:
         status = vs.DVSQEX_PortDataGet(identifier(), port, key, data.pointer, length.pointer)

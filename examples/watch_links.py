@@ -105,7 +105,7 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
         watch(options.switch, options.every, options.duration)
     except KeyboardInterrupt:
         pass
-    except (HostError, RuntimeError) as error:  # the last when the host gives up
+    except (HostError, RuntimeError) as error:  # the last when a call traps
         print(f"watch_links: {error}", file=sys.stderr)
         return 1
     return 0
@@ -117,6 +117,6 @@ if __name__ == "__main__":
             sys.exit(main())
         finally:
             print(end="", flush=True)
-    except OSError as error:  # the host gives up, nobody reads to the end, or the disk is full
+    except OSError as error:  # a call traps, nobody reads to the end, or the disk is full
         os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())  # for what is left
         sys.exit(1 if isinstance(error, BrokenPipeError) else f"watch_links: {error}")

@@ -5,7 +5,7 @@
  * @file
  * RETURNS_AT_ONCE(name) implements a call of the host as nothing but a return.
  *
- * It answers zero, which is QEX_OK, a null pointer or nothing, and touches no output. All such
+ * It returns zero, which is QEX_OK, a null pointer or nothing, and touches no output. All such
  * calls are one function under as many names; the assembler gives it these, because to the compiler
  * a function has one type.
  */

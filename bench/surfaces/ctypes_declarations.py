@@ -85,7 +85,7 @@ def fields(record: record_table.Record) -> Iterator[str]:
 
 
 def in_order() -> List[record_table.Record]:
-    """The records, each behind those that it holds by value."""
+    """The records, each after those that it holds by value."""
     ordered: List[record_table.Record] = []
     seen: Set[str] = set()
 

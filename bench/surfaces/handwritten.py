@@ -307,7 +307,7 @@ def output(
     outputs: List[str],
     function: surface.Function,
 ) -> None:
-    """A parameter through which the call answers."""
+    """A parameter through which the call returns a value."""
     name = f"out{number}"
     if spelled == "char *" and "text" in function.result:
         body.locals.append(f"char {name}[130];")

@@ -3,7 +3,7 @@
 
 /**
  * @file
- * Switches, ports and data items behind their handles: DVS_* and DVSData_*.
+ * Switches, ports and data items, by their handles: DVS_* and DVSData_*.
  *
  * Texts that a call returns belong to the library and live as long as what the handle designates.
  *
@@ -42,7 +42,7 @@ char const *DVS_PortAlias(DVSPortHandle handle);
 /**
  * Makes an empty list of items.
  *
- * @param list receives the list, which goes back through DVSData_Free
+ * @param list receives the list, which is released with DVSData_Free
  * @param alloc how the list allocates; null, like `release`, for the library's own way
  * @param release how it frees
  */
@@ -72,7 +72,7 @@ QEX_ReturnStatus DVSData_Update(DVSDataHandle list, char const *name, void *data
  * Writes a list as one block, which is allocated with the list's own allocator.
  *
  * @param bytes receives the block, which the caller frees the same way; what the library allocated
- *              goes back through DVSQEX_DataFree
+ *              is released with DVSQEX_DataFree
  * @param length receives its bytes
  * @param version version of the distributed switch to write for
  */

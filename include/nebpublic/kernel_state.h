@@ -8,7 +8,7 @@
  * Every call returns a status. The arguments are the caller's; they are read during the call and
  * not kept. Texts are NUL-terminated UTF-8. The module passes every argument through unchanged. An
  * output is meaningful only with QEX_OK. What an output pointer refers to was allocated by the
- * library and goes back through DVSQEX_DataFree.
+ * library and is released with DVSQEX_DataFree.
  *
  * - QEX_NOT_FOUND for a name the host does not know (`switchId`, `port`, `externalId`)
  * - QEX_BAD_PARAM for a null where nothing allows it
@@ -20,7 +20,7 @@
  * @param data the bytes of the property
  * @param state the bytes of the state
  * @param length bytes
- * @param list receives a list in the library's own memory, which goes back through DVSData_Free
+ * @param list receives a list in the library's own memory, which is released with DVSData_Free
  * @param propertyType one of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
  *                     POLICY_PROP_TYPE
  * @param propertyTypes a mask of CONFIG_PROP_TYPE, RUNTIME_PROP_TYPE, VOLATILE_PROP_TYPE and
@@ -49,10 +49,10 @@ extern "C" {
  */
 QEX_ReturnStatus DVSQEX_StateInit(void *state, int length);
 
-/** Hands out the whole state. */
+/** Returns the whole state. */
 QEX_ReturnStatus DVSQEX_StateGet(void **state, int *length);
 
-/** Hands out the part of the state that survives a restart of the host. */
+/** Returns the part of the state that survives a restart of the host. */
 QEX_ReturnStatus DVSQEX_PersistentStateGet(void **state, int *length);
 
 /**
@@ -65,7 +65,7 @@ QEX_ReturnStatus DVSQEX_StateSanitize(void);
 QEX_ReturnStatus DVSQEX_StateCleanup(void);
 
 /**
- * Gives back memory that a DVSQEX_* call handed out.
+ * Releases memory that a DVSQEX_* call allocated.
  *
  * @param data what the library allocated, once; null does nothing
  */
@@ -105,7 +105,7 @@ QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion versio
  */
 QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts);
 
-/** Hands out the ports of one type, uplink ports among them. */
+/** Returns the ports of one type, uplink ports among them. */
 QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type);
 
 /**
@@ -123,7 +123,7 @@ QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command, void 
                                 int inputLength, void **output, int *outputLength);
 
 /**
- * Hands out the value of a global property of a switch.
+ * Returns the value of a global property of a switch.
  *
  * - QEX_NOT_FOUND if it is not set
  */
@@ -149,7 +149,7 @@ QEX_ReturnStatus DVSQEX_GlobalPropSet(char const *switchId, char const *key, voi
 QEX_ReturnStatus DVSQEX_GlobalPropClear(char const *switchId, char const *key);
 
 /**
- * Hands out the value of a host property of a switch.
+ * Returns the value of a host property of a switch.
  *
  * - QEX_NOT_FOUND if it is not set
  */
@@ -200,7 +200,7 @@ QEX_ReturnStatus DVSQEX_PortRemove(char const *switchId, char const *port);
 QEX_ReturnStatus DVSQEX_PortFind(char const *switchId, char const *port);
 
 /**
- * Hands out a port that another system manages.
+ * Returns a port that another system manages.
  *
  * @param port receives the port
  */
@@ -208,7 +208,7 @@ QEX_ReturnStatus DVSQEX_PortGetByExternalId(char const *switchId, char const *ex
                                             OpaqueDVPortData **port);
 
 /**
- * Hands out the value of a property of a port.
+ * Returns the value of a property of a port.
  *
  * - QEX_NOT_FOUND if it is not set
  */
@@ -232,16 +232,16 @@ QEX_ReturnStatus DVSQEX_PortDataSet(char const *switchId, char const *port, char
  */
 QEX_ReturnStatus DVSQEX_PortDataClear(char const *switchId, char const *port, char const *key);
 
-/** Hands out all properties of a port. */
+/** Returns all properties of a port. */
 QEX_ReturnStatus DVSQEX_PortStateGet(char const *switchId, char const *port, void **state,
                                      int *length);
 
-/** Hands out the properties of a port that survive a restart, written for one version. */
+/** Returns the properties of a port that survive a restart, written for one version. */
 QEX_ReturnStatus DVSQEX_PersistentPortStateGet(char const *switchId, char const *port,
                                                NEBVersion version, void **state, int *length);
 
 /**
- * Hands out the value of a property of an uplink port.
+ * Returns the value of a property of an uplink port.
  *
  * - QEX_NOT_FOUND if it is not set, or no uplink port of the switch has the number
  *

@@ -8,7 +8,7 @@
 
 #include "qexapi/types.h"
 
-/** The word size of the process behind a control call. */
+/** The word size of the process that makes a control call. */
 enum {
   QEX_IOCTL_CALLER_64 = 0,
   QEX_IOCTL_CALLER_32 = 1,

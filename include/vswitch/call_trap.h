@@ -3,12 +3,13 @@
 
 /**
  * @file
- * The call trap: how a library of the host gives up on a call without ending the process.
+ * The call trap: how a library of the host ends a call that it cannot carry out, without ending the
+ * process.
  *
  * The caller arms the trap right before a call: it stores the result of `setjmp(exception_buffer)`
- * in `exception_status`, which is 0 then. A library that gives up stores an exception type and a
- * message and jumps to the buffer with a value other than 0; the caller raises that exception. The
- * jump must come from the thread that armed the trap and while its call is running. Nothing that
+ * in `exception_status`, which is 0 then. A call that traps stores an exception type and a message
+ * and jumps to the buffer with a value other than 0; the caller raises that exception. The jump
+ * must come from the thread that armed the trap and while its call is running. Nothing that
  * the jump crosses is cleaned up.
  *
  * The module defines and exports the four globals; they are zero until first used.

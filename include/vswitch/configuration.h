@@ -8,7 +8,7 @@
  * Every call returns a status and reads or writes one property, whose key its group names. The
  * arguments are the caller's; they are read during the call and not kept. Texts are NUL-terminated
  * UTF-8. An output is meaningful only with QEX_OK. What an output pointer refers to was allocated
- * by the library and goes back through VSDVS_FreeMemory.
+ * by the library and is released with VSDVS_FreeMemory.
  *
  * - QEX_NOT_FOUND for a name the host does not know (`switchName`, `switchId`, `port`, `uplink`,
  *   `portsetName`)
@@ -109,7 +109,7 @@ QEX_ReturnStatus VSDVS_DvPortIDToPortIDFromDVSID(char const *switchId, char cons
 /** Writes the alias of a set of ports into `aliasBuffer`: at most 128 bytes of text and a NUL. */
 QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *aliasBuffer);
 
-/** Hands out the uplink ports of a switch, as names and as identifiers in the same order. */
+/** Returns the uplink ports of a switch, as names and as identifiers in the same order. */
 QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPorts **names,
                                             VSUplinkPortIds **ids);
 
@@ -296,7 +296,7 @@ QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode);
 QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode);
 
 /**
- * Hands out the VLANs of a port, and its priority, -1 if it has none; VSPROP_PORT_VLAN,
+ * Returns the VLANs of a port, and its priority, -1 if it has none; VSPROP_PORT_VLAN,
  * VSPROP_PORT_PRIORITY.
  */
 QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *port,
@@ -334,7 +334,7 @@ QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char con
                                                 qex_Bool enabled);
 
 /**
- * Hands out the private-VLAN map of a switch as an array of `count` entries, null if there are
+ * Returns the private-VLAN map of a switch as an array of `count` entries, null if there are
  * none; VSPROP_PVLAN_MAP.
  */
 QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry **entries,
@@ -353,7 +353,7 @@ QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
 QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry const *entries,
                                          int count);
 
-/** Hands out the mirror sessions of a port; VSPROP_PORT_MIRROR_SESSIONS. */
+/** Returns the mirror sessions of a port; VSPROP_PORT_MIRROR_SESSIONS. */
 QEX_ReturnStatus VSDVS_GetDVMirrorSessions(char const *switchName, char const *port,
                                            DVMirrorSessionTable **table);
 
@@ -382,7 +382,7 @@ QEX_ReturnStatus VSDVS_RemoveDVMirrorSession(char const *switchName, char const 
 QEX_ReturnStatus VSDVS_ClearDVMirrorSessions(char const *switchName, char const *port);
 
 /**
- * Gives back memory that a VSDVS_* call handed out.
+ * Releases memory that a VSDVS_* call allocated.
  *
  * @param memory what the library allocated, once; null does nothing
  */

@@ -7,7 +7,7 @@
  *
  * Every call returns a status. The arguments are the caller's; they are read during the call and
  * not kept. Texts are NUL-terminated UTF-8. An output is meaningful only with QEX_OK. What an
- * output pointer refers to was allocated by the library and goes back through VSQEX_FreeMemory.
+ * output pointer refers to was allocated by the library and is released with VSQEX_FreeMemory.
  *
  * - QEX_NOT_FOUND for a name the host does not know (`switchName`, `port`, `uplink`, `sid`)
  * - QEX_BAD_PARAM for a null where nothing allows it
@@ -44,7 +44,7 @@ QEX_ReturnStatus VSQEX_GetPortMACLearningStats(char const *switchName, char cons
                                                VSPMACLearningStats *stats);
 
 /**
- * Hands out the addresses of one kind that a switch's team of uplinks knows.
+ * Returns the addresses of one kind that a switch's team of uplinks knows.
  *
  * - QEX_BAD_PARAM for an unknown kind
  */
@@ -52,7 +52,7 @@ QEX_ReturnStatus VSQEX_GetTeamMACTable(char const *switchName, VSMACAddrType typ
                                        VSMACTable **table);
 
 /**
- * Hands out the addresses of one kind that a port knows.
+ * Returns the addresses of one kind that a port knows.
  *
  * - QEX_BAD_PARAM for an unknown kind
  */
@@ -78,7 +78,7 @@ QEX_ReturnStatus VSQEX_SetPortMACTable(char const *switchName, char const *port,
 QEX_ReturnStatus VSQEX_ClearPortMACTable(char const *switchName, char const *port,
                                          VSMACEntry const *entry);
 
-/** Hands out the link-aggregation groups of a switch. */
+/** Returns the link-aggregation groups of a switch. */
 QEX_ReturnStatus VSQEX_GetLAGTable(char const *switchName, VSLAGTable **table);
 
 /**
@@ -96,7 +96,7 @@ QEX_ReturnStatus VSQEX_GetUplinkLinkState(char const *switchName, char const *up
 QEX_ReturnStatus VSQEX_GetUplinkLACPLinkState(char const *switchName, char const *uplink,
                                               int *state);
 
-/** Hands out the uplinks of a switch. */
+/** Returns the uplinks of a switch. */
 QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks);
 
 /**
@@ -107,7 +107,7 @@ QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks);
 QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer);
 
 /**
- * Hands out the multicast groups of a port, in the form of one mode.
+ * Returns the multicast groups of a port, in the form of one mode.
  *
  * - QEX_NOT_FOUND for a number that no port of the switch has
  * - QEX_BAD_PARAM for a mode that is no form
@@ -119,7 +119,7 @@ QEX_ReturnStatus VSQEX_GetMcastFilters(char const *switchName, qex_SwitchPortID 
                                        VSMcastFilterMode mode, VSMcastFilters **filters);
 
 /**
- * Hands out one multicast group of a port and its sources.
+ * Returns one multicast group of a port and its sources.
  *
  * - QEX_NOT_FOUND if the port has not joined the group, or no port of the switch has the number
  * - QEX_BAD_PARAM for a mode that is no form
@@ -132,7 +132,7 @@ QEX_ReturnStatus VSQEX_GetMcastFilterStats(char const *switchName, qex_SwitchPor
                                            VSMcastFilterMode mode, unsigned char const *group,
                                            VSMcastFilterStats **stats);
 
-/** Puts the VSMcastFilterMode that a switch runs into `mode`. */
+/** Puts the VSMcastFilterMode in force on a switch into `mode`. */
 QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode);
 
 /**
@@ -144,10 +144,10 @@ QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode);
 QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char const sid[32],
                                                VSDVMirrorSessionStats *stats);
 
-/** Hands out the identifiers of the mirror sessions that run on a switch. */
+/** Returns the identifiers of the mirror sessions that are running on a switch. */
 QEX_ReturnStatus VSQEX_GetDVMirrorSessionIDs(char const *switchName, VSDVMirrorSessionIDs **ids);
 
-/** Hands out the ports that see the frames of a switch in promiscuous mode. */
+/** Returns the ports that see the frames of a switch in promiscuous mode. */
 QEX_ReturnStatus VSQEX_GetPromiscSessionActiveDsts(char const *switchName,
                                                    VSPromiscSessionActiveDsts **ports);
 
@@ -159,11 +159,11 @@ QEX_ReturnStatus VSQEX_GetServicePortTeamingStats(char const *switchName,
 QEX_ReturnStatus VSQEX_GetRARPStats(char const *switchName, VSRARPStats *stats);
 
 /**
- * Hands out runtime options of the host.
+ * Returns runtime options of the host.
  *
  * - QEX_NOT_SUPPORTED for an unknown option
  *
- * @param ids the options to hand out, each a VSRuntimeOptionType; null with a count of 0 means all
+ * @param ids the options to return, each a VSRuntimeOptionType; null with a count of 0 means all
  * @param count how many
  */
 QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count,
@@ -201,7 +201,7 @@ QEX_ReturnStatus VSQEX_SetGlobalMACLearningProps(VSMACLearningGlobalProps *props
 QEX_ReturnStatus VSQEX_PortGetTeamUplinkHint(qex_SwitchPortID port, qex_Name *name);
 
 /**
- * Gives back memory that a VSQEX_* call handed out.
+ * Releases memory that a VSQEX_* call allocated.
  *
  * @param memory what the library allocated, once; null does nothing
  */

@@ -3,7 +3,7 @@
 
 /**
  * @file
- * The text of a status, and giving up.
+ * The text of a status, and the report of a fatal condition.
  */
 
 #include "qexapi/status.h"

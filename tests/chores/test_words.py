@@ -5,7 +5,7 @@ from pathlib import Path
 from typing import List
 
 import pytest
-from words import EXEMPT, NOT_CONVERTED, findings
+from check_words import EXEMPT, NOT_CONVERTED, findings
 
 ROOT = Path(__file__).resolve().parents[2]
 
@@ -74,7 +74,7 @@ def test_what_is_built_is_not_read(tmp_path: Path) -> None:
 
 def test_a_finding_fails_and_says_what_to_say_instead(tmp_path: Path) -> None:
     said(tmp_path, "chores/a.py", "it panics")
-    command = ["/usr/bin/python3", str(ROOT / "chores/words.py"), str(tmp_path)]
+    command = ["/usr/bin/python3", str(ROOT / "chores/check_words.py"), str(tmp_path)]
     done = subprocess.run(command, stdout=subprocess.PIPE, encoding="utf-8")
     assert done.stdout == "chores/a.py:2: 'panics'; say: the call traps; a trap\n"
     assert done.returncode == 1

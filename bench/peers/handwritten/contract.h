@@ -29,7 +29,7 @@
 #define COLD __attribute__((cold, noinline, unused))
 #define SHARED static inline __attribute__((unused))
 
-/* Failures. Each answers NULL or false, so that it can be returned. */
+/* Failures. Each returns NULL or false, so that it can be returned. */
 
 typedef struct {
   char const *method;
@@ -113,7 +113,7 @@ SHARED bool record_from(PyObject *object, RecordType const *type, void **pointer
   return LIKELY(*pointer != NULL) || raise_null_reference(place);
 }
 
-/** A pointer that its object gives up, to be freed. */
+/** A pointer that its object no longer owns, to be freed. */
 SHARED bool pointer_given_up(PyObject *object, RecordType const *type, void **pointer,
                              Place place) {
   if (!pointer_from(object, type, pointer, place)) return false;
@@ -190,7 +190,7 @@ SHARED bool text_from(PyObject *object, Text *text, Place place) {
   return true;
 }
 
-/** The text of an argument in an array of chars, zero-filled behind it. */
+/** The text of an argument in an array of chars, zero-filled after it. */
 SHARED bool char_array_from(PyObject *object, char *array, size_t capacity, Place place) {
   char const *bytes = NULL;
   Py_ssize_t length = -1;
@@ -235,7 +235,7 @@ SHARED PyObject *list_of_two(PyObject *first, PyObject *second) {
 
 /* The call trap. */
 
-/** Copies of texts stay behind when the trap springs: the library may still hold them. */
+/** Copies of texts stay behind when a call traps: the library may still hold them. */
 #define ARM_TRAP()                                  \
   do {                                              \
     exception_status = setjmp(exception_buffer);    \

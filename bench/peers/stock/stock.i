@@ -10,7 +10,7 @@
 %include <typemaps.i>
 %apply int *OUTPUT { int *portID };
 
-// The library has no typemap for a record behind a pointer, so a user writes one.
+// The library has no typemap for the record that a pointer points to, so a user writes one.
 %typemap(in, numinputs=0) VSUplinks **uplinks (VSUplinks *record = NULL) "$1 = &record;"
 %typemap(argout) VSUplinks **uplinks {
   $result = SWIG_Python_AppendOutput($result, SWIG_NewPointerObj(*$1, $*1_descriptor, 0));

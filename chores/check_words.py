@@ -1,4 +1,4 @@
-"""Holds the tree to the field's words: words.py [FOLDER]
+"""Holds the tree to the field's words: check_words.py [FOLDER]
 
 Code, pages and tests say a thing in the word that the field has for it, so that nobody needs a
 dictionary; docs/development/glossary.md has them. Prints each line that says it otherwise, and the
@@ -16,12 +16,13 @@ NAMES = {"dev", "run", "rules", "control"}
 
 # Folders whose words are still to be taken over, and who reads them until then.
 NOT_CONVERTED: List[str] = [
-    "README.md",
-    "bench",
-    "docs",
-    "examples",
+    "docs/_ext",
+    "docs/_static",
+    "docs/guides/errors.md",
+    "docs/guides/memory.md",
+    "docs/guides/porting.md",
+    "docs/guides/testing.md",
     "helpers",
-    "include",
     "interface",
     "python",
     "simhost",
@@ -30,7 +31,7 @@ NOT_CONVERTED: List[str] = [
 
 # They name the words to say which those are.
 EXEMPT = {
-    "chores/words.py": "the list itself",
+    "chores/check_words.py": "the list itself",
     "tests/chores/test_words.py": "plants each of them",
 }
 
@@ -67,9 +68,9 @@ RULES = [
         "Panic is a function of C",
     ),
     rule(
-        r"\b(?:springs?|sprang|sprung|springing)\b",
+        r"\b(?:springs|sprang|springing)\b",
         "the call traps; a trap",
-        r"\bspr[aiu]ng(?:s|ing)? (?:\w+ )?trap\b|\btraps? (?:\w+ )?spr[aiu]ngs?\b",
+        r"\bspr(?:ings|ang|inging) (?:\w+ )?trap\b",
         "to spring the trap is what a library does to the module's buffer",
     ),
     rule(
