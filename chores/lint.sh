@@ -5,9 +5,9 @@
 #
 # Usage: ./dev lint
 #
-# clang-format, clang-tidy, shellcheck, black, flake8, mypy --strict, and chores/check_words.py for the words
-# of the glossary. clang-tidy leaves out files that were clean before and have not changed since, nor
-# any header that they include.
+# clang-format, clang-tidy, shellcheck, black, flake8, mypy --strict, and chores/check_words.py for the
+# words of the glossary. clang-tidy leaves out files that were clean before and have not changed
+# since, nor any header that they include.
 # To put the format right: clang-format -i FILE..., black FILE...
 cmd_lint() {
   [ $# -eq 0 ] || die "lint takes no options"

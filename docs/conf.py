@@ -7,7 +7,7 @@ from pathlib import Path
 HERE = Path(__file__).resolve().parent
 # The extensions, and what reads the definitions and the statuses' texts for them.
 sys.path[:0] = [str(HERE / "_ext"), str(HERE.parent / "python")]
-sys.path.append(str(HERE.parent / "simhost/libvswitch"))
+sys.path.append(str(HERE.parent / "simhost/abi/libvswitch"))
 
 project = "libvswitch"
 author = "the authors of libvswitch"
