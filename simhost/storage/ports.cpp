@@ -1,6 +1,7 @@
 // Port and uplink rows in SQL.
 #include "storage/ports.h"
 
+#include <limits>
 #include <utility>
 
 #include "storage/store.h"
@@ -9,7 +10,8 @@ namespace simhost::storage {
 namespace {
 
 PortNumber number_at(Query const &query, int column) {
-  return PortNumber(static_cast<std::uint32_t>(query.integer(column)));
+  auto const number = query.integer(column, 1, std::numeric_limits<std::uint32_t>::max());
+  return PortNumber(static_cast<std::uint32_t>(number));
 }
 
 // What port_at() reads; a macro, so that a statement is one literal.
@@ -19,7 +21,7 @@ Port port_at(Query const &query) {
   return {.number = number_at(query, 0),
           .switch_key = SwitchKey{query.integer(1)},
           .identifier = query.text(2),
-          .kind = query.integer(3) != 0 ? PortKind::uplink : PortKind::client};
+          .kind = query.flag(3) ? PortKind::uplink : PortKind::client};
 }
 
 std::optional<Port> port_from(Query &select) {
@@ -34,11 +36,11 @@ std::vector<Port> ports_from(Query &select) {
   return ports;
 }
 
-// Of a row of name, port; numbers of ports begin at 1.
+// Of a row of name, port.
 Uplink uplink_at(Query const &query) {
   Uplink uplink{.name = query.text(0), .port = std::nullopt};
-  if (auto const number = number_at(query, 1); number != PortNumber{}) {
-    uplink.port = number;
+  if (!query.is_null(1)) {
+    uplink.port = number_at(query, 1);
   }
   return uplink;
 }
@@ -120,7 +122,7 @@ std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKi
                                       ? "SELECT clients FROM switch WHERE key = ?"
                                       : "SELECT count(*) FROM port WHERE switch = ? AND is_uplink");
   select.with(std::int64_t(switch_key));
-  return select.next() ? static_cast<std::uint32_t>(select.integer(0)) : 0;
+  return select.next() ? select.number<std::uint32_t>(0) : 0;
 }
 
 std::optional<Uplink> find_uplink(Transaction &transaction, std::string_view name) {

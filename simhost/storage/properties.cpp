@@ -13,8 +13,15 @@ std::int64_t number_or_none(PropertyOwner const &owner) {
 
 // Of a row that begins with type, value.
 Property property_at(Query const &query) {
-  return {.type = PropertyType(static_cast<std::uint32_t>(query.integer(0))),
-          .value = query.bytes(1)};
+  auto const type = PropertyType(query.number<std::uint32_t>(0));
+  switch (type) {
+    case PropertyType::config:
+    case PropertyType::runtime:
+    case PropertyType::transient:
+    case PropertyType::policy:
+      return {.type = type, .value = query.bytes(1)};
+  }
+  query.refuse(0, std::to_string(static_cast<std::uint32_t>(type)));
 }
 
 }  // namespace
@@ -70,8 +77,7 @@ std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey ke
   select.with(std::int64_t(key)).with(name);
   std::vector<PortProperty> all;
   while (select.next()) {
-    all.push_back({.port = PortNumber(static_cast<std::uint32_t>(select.integer(0))),
-                   .value = select.bytes(1)});
+    all.push_back({.port = PortNumber(select.number<std::uint32_t>(0)), .value = select.bytes(1)});
   }
   return all;
 }

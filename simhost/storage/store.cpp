@@ -94,21 +94,62 @@ int Query::run() {
 }
 
 std::int64_t Query::integer(int column) const {
-  return statement_.getColumn(column).getInt64();
+  auto const value = statement_.getColumn(column);
+  if (!value.isInteger()) {
+    refuse(column, "no integer");
+  }
+  return value.getInt64();
+}
+
+std::int64_t Query::integer(int column, std::int64_t least, std::int64_t greatest) const {
+  auto const value = integer(column);
+  if (value < least || value > greatest) {
+    refuse(column, std::to_string(value));
+  }
+  return value;
 }
 
 std::string Query::text(int column) const {
-  return statement_.getColumn(column).getString();
+  auto const value = statement_.getColumn(column);
+  if (!value.isText()) {
+    refuse(column, "no text");
+  }
+  auto text = value.getString();
+  if (text.find('\0') != std::string::npos) {
+    refuse(column, "a text with a NUL in it");
+  }
+  return text;
 }
 
 std::vector<std::byte> Query::bytes(int column) const {
   auto const value = statement_.getColumn(column);
+  if (!value.isBlob()) {
+    refuse(column, "no bytes");
+  }
   auto const *first = static_cast<std::byte const *>(value.getBlob());
   return {first, first + value.getBytes()};
 }
 
+std::vector<std::byte> Query::bytes(int column, std::size_t length) const {
+  auto value = bytes(column);
+  if (value.size() != length) {
+    refuse(column, std::to_string(value.size()) + " bytes instead of " + std::to_string(length));
+  }
+  return value;
+}
+
+bool Query::is_null(int column) const {
+  return statement_.getColumn(column).isNull();
+}
+
+void Query::refuse(int column, std::string const &what) const {
+  store_.refuse(std::string("the column '") + statement_.getColumn(column).getName() + "' holds " +
+                what);
+}
+
 Store::Store(std::optional<std::filesystem::path> const &file, Populate const &populate) try
-    : database_(file ? file->string() : std::string(":memory:"),
+    : name_(file.value_or(":memory:")),
+      database_(file ? file->string() : std::string(":memory:"),
                 SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE,
                 static_cast<int>(std::chrono::milliseconds(kPatience).count())) {
   database_.exec("PRAGMA foreign_keys = ON");
@@ -124,6 +165,10 @@ Store::Store(std::optional<std::filesystem::path> const &file, Populate const &p
     throw;
   }
   refuse_file(file.value_or(":memory:"), error.what());
+}
+
+void Store::refuse(std::string const &why) const {
+  refuse_file(name_, why);
 }
 
 void Store::prepare_file(Populate const &populate) {

@@ -27,10 +27,10 @@ FoundSwitch switch_at(Query const &query) {
           .row = {.alias = query.text(1),
                   .identifier = query.text(2),
                   .portset = query.text(3),
-                  .max_ports = static_cast<std::uint32_t>(query.integer(4)),
-                  .version = static_cast<std::uint32_t>(query.integer(5)),
-                  .persistent = query.integer(6) != 0,
-                  .associated = query.integer(7) != 0}};
+                  .max_ports = query.number<std::uint32_t>(4),
+                  .version = query.number<std::uint32_t>(5),
+                  .persistent = query.flag(6),
+                  .associated = query.flag(7)}};
 }
 
 }  // namespace

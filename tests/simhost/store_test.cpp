@@ -5,8 +5,10 @@
 #include <SQLiteCpp/Exception.h>
 #include <gtest/gtest.h>
 
+#include <cstdint>
 #include <filesystem>
 #include <fstream>
+#include <list>
 #include <string>
 
 #include "storage/ports.h"
@@ -219,6 +221,64 @@ TEST(Store, APortIdentifierIsUniqueOnItsSwitch) {
   EXPECT_TRUE(simhost::storage::add_port(transaction, a, "p", PortKind::client));
   EXPECT_FALSE(simhost::storage::add_port(transaction, a, "p", PortKind::client));
   EXPECT_TRUE(simhost::storage::add_port(transaction, b, "p", PortKind::client));
+}
+
+// What reading a value, made by SQL, says is wrong with it; empty if nothing is.
+template <typename Read>
+std::string complaint_about(std::string const &value, Read const &read) {
+  Store store(std::nullopt, populate_nothing);
+  Transaction transaction(store, Access::read);
+  static std::list<std::string> statements;  // a query is of a text that stays
+  auto select = transaction.query(statements.emplace_back("SELECT " + value + " AS answer"));
+  select.next();
+  try {
+    static_cast<void>(read(select));
+    return "";
+  } catch (UnusableState const &error) {
+    return error.what();
+  }
+}
+
+std::string of_answer(std::string const &what) {
+  return "the state file :memory: cannot be used: the column 'answer' holds " + what;
+}
+
+TEST(AValueThatIsRead, IsOfItsType) {
+  auto const integer = [](auto const &query) { return query.integer(0); };
+  auto const text = [](auto const &query) { return query.text(0); };
+  auto const bytes = [](auto const &query) { return query.bytes(0); };
+  for (auto const *other : {"'1'", "x'31'", "1.0", "NULL"}) {
+    EXPECT_EQ(complaint_about(other, integer), of_answer("no integer")) << other;
+  }
+  for (auto const *other : {"1", "x'31'", "1.0", "NULL"}) {
+    EXPECT_EQ(complaint_about(other, text), of_answer("no text")) << other;
+  }
+  for (auto const *other : {"1", "'1'", "1.0", "NULL"}) {
+    EXPECT_EQ(complaint_about(other, bytes), of_answer("no bytes")) << other;
+  }
+  EXPECT_EQ(complaint_about("1", integer), "");
+  EXPECT_EQ(complaint_about("'1'", text), "");
+  EXPECT_EQ(complaint_about("x''", bytes), "");
+}
+
+TEST(AValueThatIsRead, IsWithinItsBounds) {
+  auto const vlan = [](auto const &query) { return query.integer(0, 1, 4094); };
+  auto const flag = [](auto const &query) { return query.flag(0); };
+  auto const number = [](auto const &query) { return query.template number<std::uint32_t>(0); };
+  EXPECT_EQ(complaint_about("0", vlan), of_answer("0"));
+  EXPECT_EQ(complaint_about("4095", vlan), of_answer("4095"));
+  EXPECT_EQ(complaint_about("4094", vlan), "");
+  EXPECT_EQ(complaint_about("2", flag), of_answer("2"));
+  EXPECT_EQ(complaint_about("-1", number), of_answer("-1"));
+  EXPECT_EQ(complaint_about("4294967296", number), of_answer("4294967296"));
+  EXPECT_EQ(complaint_about("4294967295", number), "");
+}
+
+TEST(AValueThatIsRead, IsOfItsLength) {
+  auto const mac = [](auto const &query) { return query.bytes(0, 6); };
+  auto const text = [](auto const &query) { return query.text(0); };
+  EXPECT_EQ(complaint_about("x'0200'", mac), of_answer("2 bytes instead of 6"));
+  EXPECT_EQ(complaint_about("CAST(x'610062' AS TEXT)", text), of_answer("a text with a NUL in it"));
 }
 
 TEST(UnusableStateFile, ThatCannotBeOpened) {
