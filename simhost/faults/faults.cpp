@@ -1,4 +1,4 @@
-// Faults in SQL, and striking.
+// Which faults make sense, and what they do to a call.
 #include "faults/faults.h"
 
 #include <fmt/format.h>
@@ -8,7 +8,6 @@
 #include <thread>
 
 #include "base/outcomes.h"
-#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -66,16 +65,6 @@ void check(Fault const &fault) {
   }
 }
 
-Fault fault_at(storage::Query const &row) {
-  return {.function = row.text(0),
-          .first = row.integer(1),
-          .last = row.integer(2),
-          .delay = std::chrono::milliseconds(row.integer(4)),
-          .status = static_cast<QEX_ReturnStatus>(row.integer(5)),
-          .exception = row.text(6),
-          .message = row.text(7)};
-}
-
 void apply(Fault const &fault) {
   if (fault.status != QEX_OK) {
     throw Refused(fault.status);
@@ -88,50 +77,29 @@ void apply(Fault const &fault) {
 }  // namespace
 
 bool any_fault_waits(storage::Transaction &transaction, std::string_view function) {
-  return transaction.query("SELECT 1 FROM fault WHERE function = ?").with(function).next();
+  return storage::has_fault(transaction, function);
 }
 
 std::vector<Fault> count_call(storage::Transaction &transaction, std::string_view function) {
-  transaction.query("UPDATE fault SET seen = seen + 1 WHERE function = ?").with(function).run();
-  std::vector<Fault> hits;
-  {
-    auto select = transaction.query(
-        "SELECT function, first, last, seen, delay, status, exception, message FROM fault"
-        " WHERE function = ? AND seen BETWEEN first AND last ORDER BY key");
-    select.with(function);
-    while (select.next()) {
-      hits.push_back(fault_at(select));
-    }
-  }
-  transaction.query("DELETE FROM fault WHERE function = ? AND seen >= last").with(function).run();
-  return hits;
+  return storage::count_for_faults(transaction, function);
 }
 
 void add_fault(storage::Transaction &transaction, Fault const &fault) {
   check(fault);
-  auto insert = transaction.query(
-      "INSERT INTO fault (function, first, last, delay, status, exception, message)"
-      " VALUES (?, ?, ?, ?, ?, ?, ?)");
-  insert.with(fault.function).with(fault.first).with(fault.last).with(fault.delay.count());
-  insert.with(std::int64_t{fault.status}).with(fault.exception).with(fault.message).run();
+  storage::insert_fault(transaction, fault);
 }
 
 std::vector<WaitingFault> waiting_faults(storage::Transaction &transaction) {
-  auto select = transaction.query(
-      "SELECT function, first, last, seen, delay, status, exception, message FROM fault"
-      " ORDER BY key");
-  std::vector<WaitingFault> waiting;
-  while (select.next()) {
-    waiting.push_back({.fault = fault_at(select), .seen = select.integer(3)});
-  }
-  return waiting;
+  return storage::all_faults(transaction);
 }
 
 void clear_faults(storage::Transaction &transaction, std::string_view function) {
-  if (!function.empty()) {
+  if (function.empty()) {
+    storage::remove_all_faults(transaction);
+  } else {
     get_call(function);
+    storage::remove_faults(transaction, function);
   }
-  transaction.query("DELETE FROM fault WHERE ? IN ('', function)").with(function).run();
 }
 
 void inject(std::vector<Fault> const &hits) {

@@ -2,40 +2,16 @@
 // wait in the state, so that processes that share it share them and their counts.
 #pragma once
 
-#include <chrono>
-#include <cstdint>
-#include <limits>
-#include <string>
 #include <string_view>
 #include <vector>
 
 #include "base/api.h"
-#include "qexapi/status.h"
-
-namespace simhost::storage {
-class Transaction;
-}
+#include "storage/running/faults.h"
 
 namespace simhost {
 
-/// One or more of a delay, and a status or an exception. A call that several faults hit waits for
-/// all their delays and ends with the first status or exception.
-struct Fault {
-  static constexpr std::int64_t kForever = std::numeric_limits<std::int64_t>::max();
-
-  std::string function;
-  std::int64_t first = 1;  ///< the first call that is hit, counted from the next one as 1
-  std::int64_t last = 1;   ///< the last one
-  std::chrono::milliseconds delay{0};  ///< in real time
-  QEX_ReturnStatus status = QEX_OK;    ///< QEX_OK for none
-  std::string exception = {};          ///< such as "OSError"; empty for none
-  std::string message = {};            ///< of the exception
-};
-
-struct WaitingFault {
-  Fault fault;
-  std::int64_t seen;  ///< calls since it was added
-};
+using storage::Fault;
+using storage::WaitingFault;
 
 /// Refuses a function that the host does not have (QEX_NOT_FOUND); Panic, and a status for a call
 /// that answers none (QEX_NOT_SUPPORTED); an unknown exception, both a status and an exception, no

@@ -14,15 +14,17 @@
 #include "base/api.h"
 #include "clock/clock.h"
 #include "storage/ports.h"
+#include "storage/running/addresses.h"
+#include "storage/running/counters.h"
+#include "storage/running/multicast.h"
 #include "vswitch/mac_tables.h"
 
 namespace simhost {
 
-/// Where an address is reached: at a port, or through the switch's team of uplinks.
-struct Place {
-  storage::SwitchKey switch_key;
-  std::optional<storage::PortNumber> port;  ///< none: the team
-};
+using storage::AddressBytes;
+using storage::CounterOwner;
+using storage::McastGroup;
+using storage::Place;
 
 /// A link-aggregation group and its uplinks, each with whether aggregation uses it.
 struct SIMHOST_API Lag {
@@ -37,26 +39,6 @@ struct SIMHOST_API Lag {
 
   /// A group carries frames while one of its uplinks does.
   [[nodiscard]] bool up() const;
-};
-
-/// The bytes of an address as they go over the wire: 6 of Ethernet, 4 of IPv4, 16 of IPv6.
-using AddressBytes = std::vector<std::byte>;
-
-/// A multicast group that a port joined.
-struct McastGroup {
-  AddressBytes address;
-  std::uint32_t version;      ///< of the protocol that joined
-  std::uint32_t source_mode;  ///< a VSMcastSrcIPFilterMode
-  std::uint32_t vni;
-  ClockTime updated;
-  std::vector<AddressBytes> sources;
-};
-
-/// What counts: a switch, one of its ports, or one of its mirror sessions.
-struct CounterOwner {
-  storage::SwitchKey switch_key;
-  std::optional<storage::PortNumber> port = std::nullopt;
-  std::string session = {};
 };
 
 /// The counters of an owner by the names of the fields in which callers see them; one that is
@@ -82,7 +64,7 @@ class Plane {
   /// The addresses of one type at a place, or of all, in the order of the addresses.
   virtual std::vector<VSMACEntry> addresses(storage::Transaction &transaction, Place const &place,
                                             VSMACAddrType type) = 0;
-  /// Puts a static or user address at a place; see the rules in dataplane/mac_tables.h.
+  /// Puts a static or user address at a place; see the rules in planes/stored/mac_tables.h.
   virtual void put_address(storage::Transaction &transaction, Place const &place,
                            VSMACEntry const &entry) = 0;
   /// Refuses what is not there (QEX_NOT_FOUND).

@@ -67,6 +67,8 @@ std::optional<Uplink> find_uplink(Transaction &transaction, std::string_view nam
 std::vector<Uplink> all_uplinks(Transaction &transaction);
 /// Adds a free uplink to the host. Its name is unique there.
 void add_uplink(Transaction &transaction, std::string_view name);
+/// Removes all uplinks from the host.
+void remove_uplinks(Transaction &transaction);
 /// The free uplinks of the host, in the order in which they were added.
 std::vector<std::string> free_uplinks(Transaction &transaction);
 /// Puts an uplink at an uplink port.
@@ -77,5 +79,9 @@ std::vector<Port> uplink_ports_of(Transaction &transaction, SwitchKey switch_key
 std::optional<std::string> uplink_at(Transaction &transaction, PortNumber number);
 /// The uplinks at the ports of a switch, in the order of the ports.
 std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switch_key);
+
+/// The numbers that callers see, of ports and of link-aggregation groups, begin anew: for a host
+/// that has none of them.
+void restart_numbering(Transaction &transaction);
 
 }  // namespace simhost::storage

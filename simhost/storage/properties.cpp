@@ -1,7 +1,7 @@
 // Property rows in SQL.
 #include "storage/properties.h"
 
-#include "storage/store.h"
+#include "storage/query.h"
 
 namespace simhost::storage {
 namespace {
@@ -12,78 +12,70 @@ std::int64_t number_or_none(PropertyOwner const &owner) {
 }
 
 // Of a row that begins with type, value.
-Property property_at(Query const &query) {
-  auto const type = PropertyType(query.number<std::uint32_t>(0));
+Property property_at(Query const &row) {
+  auto const type = PropertyType(row.number<std::uint32_t>(0));
   switch (type) {
     case PropertyType::config:
     case PropertyType::runtime:
     case PropertyType::transient:
     case PropertyType::policy:
-      return {.type = type, .value = query.bytes(1)};
+      return {.type = type, .value = row.bytes(1)};
   }
-  query.refuse(0, std::to_string(static_cast<std::uint32_t>(type)));
+  row.refuse(0, std::to_string(static_cast<std::uint32_t>(type)));
 }
 
 }  // namespace
 
 void put_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name,
                   std::span<std::byte const> value, PropertyType type) {
-  auto upsert = transaction.query(
-      "INSERT INTO property (switch, scope, port, name, type, value)"
-      " VALUES (?, ?, nullif(?, 0), ?, ?, ?)"
-      " ON CONFLICT (switch, scope, ifnull(port, 0), name)"
-      " DO UPDATE SET type = excluded.type, value = excluded.value");
-  upsert.with(std::int64_t(owner.switch_key)).with(std::int64_t(owner.scope));
-  upsert.with(number_or_none(owner)).with(name).with(std::int64_t(type)).with(value).run();
+  Query upsert(transaction,
+               "INSERT INTO property (switch, scope, port, name, type, value)"
+               " VALUES (?, ?, nullif(?, 0), ?, ?, ?)"
+               " ON CONFLICT (switch, scope, ifnull(port, 0), name)"
+               " DO UPDATE SET type = excluded.type, value = excluded.value");
+  upsert.with(owner.switch_key).with(owner.scope);
+  upsert.with(number_or_none(owner)).with(name).with(type).with(value).run();
 }
 
 std::optional<Property> find_property(Transaction &transaction, PropertyOwner const &owner,
                                       std::string_view name) {
-  auto select = transaction.query(
-      "SELECT type, value FROM property"
-      " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? AND name = ?");
-  select.with(std::int64_t(owner.switch_key)).with(std::int64_t(owner.scope));
-  if (!select.with(number_or_none(owner)).with(name).next()) {
-    return std::nullopt;
-  }
-  return property_at(select);
+  Query select(transaction,
+               "SELECT type, value FROM property"
+               " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? AND name = ?");
+  select.with(owner.switch_key).with(owner.scope);
+  return select.with(number_or_none(owner)).with(name).first(property_at);
 }
 
 bool remove_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name) {
-  auto remove = transaction.query(
-      "DELETE FROM property"
-      " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? AND name = ?");
-  remove.with(std::int64_t(owner.switch_key)).with(std::int64_t(owner.scope));
+  Query remove(transaction,
+               "DELETE FROM property"
+               " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? AND name = ?");
+  remove.with(owner.switch_key).with(owner.scope);
   return remove.with(number_or_none(owner)).with(name).run() != 0;
 }
 
 std::vector<NamedProperty> properties_of(Transaction &transaction, PropertyOwner const &owner) {
-  auto select = transaction.query(
-      "SELECT type, value, name FROM property"
-      " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? ORDER BY name");
-  select.with(std::int64_t(owner.switch_key)).with(std::int64_t(owner.scope));
-  select.with(number_or_none(owner));
-  std::vector<NamedProperty> all;
-  while (select.next()) {
-    all.push_back({.name = select.text(2), .property = property_at(select)});
-  }
-  return all;
+  Query select(transaction,
+               "SELECT type, value, name FROM property"
+               " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? ORDER BY name");
+  select.with(owner.switch_key).with(owner.scope);
+  return select.with(number_or_none(owner)).all([](Query const &row) {
+    return NamedProperty{.name = row.text(2), .property = property_at(row)};
+  });
 }
 
 std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey key,
                                           std::string_view name) {
-  auto select = transaction.query(
+  Query select(
+      transaction,
       "SELECT port, value FROM property WHERE switch = ? AND name = ? AND port IS NOT NULL");
-  select.with(std::int64_t(key)).with(name);
-  std::vector<PortProperty> all;
-  while (select.next()) {
-    all.push_back({.port = PortNumber(select.number<std::uint32_t>(0)), .value = select.bytes(1)});
-  }
-  return all;
+  return select.with(key).with(name).all([](Query const &row) {
+    return PortProperty{.port = PortNumber(row.number<std::uint32_t>(0)), .value = row.bytes(1)};
+  });
 }
 
 void remove_properties(Transaction &transaction, PropertyType type) {
-  transaction.query("DELETE FROM property WHERE type = ?").with(std::int64_t(type)).run();
+  Query(transaction, "DELETE FROM property WHERE type = ?").with(type).run();
 }
 
 }  // namespace simhost::storage

@@ -12,6 +12,7 @@
 #include <string>
 
 #include "storage/ports.h"
+#include "storage/query.h"
 #include "storage/schema.h"
 #include "storage/switches.h"
 #include "temporary_folder.h"
@@ -229,7 +230,8 @@ std::string complaint_about(std::string const &value, Read const &read) {
   Store store(std::nullopt, populate_nothing);
   Transaction transaction(store, Access::read);
   static std::list<std::string> statements;  // a query is of a text that stays
-  auto select = transaction.query(statements.emplace_back("SELECT " + value + " AS answer"));
+  simhost::storage::Query select(transaction,
+                                 statements.emplace_back("SELECT " + value + " AS answer"));
   select.next();
   try {
     static_cast<void>(read(select));

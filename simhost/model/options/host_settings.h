@@ -1,11 +1,5 @@
-// Settings of the host as a whole, under names; one that was never set has no row. None outlasts a
-// restart of the host.
+// Settings of the host as a whole. None outlasts a restart of the host.
 #pragma once
-
-#include <cstdint>
-#include <optional>
-#include <string>
-#include <string_view>
 
 #include "base/api.h"
 #include "vswitch/mac_tables.h"
@@ -15,13 +9,6 @@ class Transaction;
 }
 
 namespace simhost {
-
-std::optional<std::int64_t> host_number(storage::Transaction &transaction, std::string_view name);
-std::optional<std::string> host_text(storage::Transaction &transaction, std::string_view name);
-void set_host_number(storage::Transaction &transaction, std::string_view name, std::int64_t value);
-void set_host_text(storage::Transaction &transaction, std::string_view name,
-                   std::string_view value);
-void forget_host_settings(storage::Transaction &transaction);
 
 /// MAC learning of the switches that have no setting of their own.
 SIMHOST_API VSMACLearningGlobalProps global_mac_learning(storage::Transaction &transaction);

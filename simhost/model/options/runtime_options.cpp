@@ -7,7 +7,7 @@
 #include <cstring>
 
 #include "base/outcomes.h"
-#include "model/options/host_settings.h"
+#include "storage/running/host_settings.h"
 
 namespace simhost {
 namespace {
@@ -109,10 +109,10 @@ std::span<RuntimeOption const, VS_NUM_RT_OPT> runtime_options() {
 RuntimeValue runtime_option(storage::Transaction &transaction, unsigned type) {
   auto const &option = get_option(type);
   if (option.is_number()) {
-    return static_cast<std::int32_t>(
-        host_number(transaction, option.name).value_or(std::get<std::int32_t>(option.initial)));
+    return static_cast<std::int32_t>(storage::find_host_number(transaction, option.name)
+                                         .value_or(std::get<std::int32_t>(option.initial)));
   }
-  return host_text(transaction, option.name)
+  return storage::find_host_text(transaction, option.name)
       .value_or(std::string(std::get<std::string_view>(option.initial)));
 }
 
@@ -128,10 +128,10 @@ void set_runtime_option(storage::Transaction &transaction, unsigned type,
   }
   if (auto const *const number = std::get_if<std::int32_t>(&value)) {
     check_number(option, *number);
-    set_host_number(transaction, option.name, *number);
+    storage::put_host_number(transaction, option.name, *number);
   } else {
     check_address(type, std::get<std::string>(value));
-    set_host_text(transaction, option.name, std::get<std::string>(value));
+    storage::put_host_text(transaction, option.name, std::get<std::string>(value));
   }
 }
 

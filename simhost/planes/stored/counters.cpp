@@ -1,4 +1,4 @@
-// Counters in SQL.
+// The names and widths of the counters.
 #include "planes/stored/counters.h"
 
 #include <fmt/format.h>
@@ -8,7 +8,6 @@
 #include <limits>
 
 #include "base/outcomes.h"
-#include "storage/store.h"
 
 namespace simhost::stored {
 namespace {
@@ -56,10 +55,6 @@ constexpr std::array kOfSession{
     CounterName{.name = "failedPkts", .greatest = k64Bits},
 };
 
-std::int64_t port_or_none(CounterOwner const &owner) {
-  return owner.port ? std::int64_t(*owner.port) : 0;
-}
-
 std::string_view kind_of(CounterOwner const &owner) {
   if (!owner.session.empty()) {
     return "mirror session";
@@ -88,13 +83,9 @@ std::span<CounterName const> counter_names(CounterOwner const &owner) {
 }
 
 Counters counters_of(storage::Transaction &transaction, CounterOwner const &owner) {
-  auto select = transaction.query(
-      "SELECT name, value FROM counter"
-      " WHERE switch = ? AND ifnull(port, 0) = ? AND session = ?");
-  select.with(std::int64_t(owner.switch_key)).with(port_or_none(owner)).with(owner.session);
   Counters counters;
-  while (select.next()) {
-    counters.emplace(select.text(0), static_cast<std::uint64_t>(select.integer(1)));
+  for (auto const &[name, value] : storage::all_counters(transaction, owner)) {
+    counters.emplace(name, value);
   }
   return counters;
 }
@@ -104,36 +95,23 @@ void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
   if (auto const greatest = known_name(owner, name).greatest; value > greatest) {
     throw Refused(QEX_BAD_PARAM, fmt::format("{} is above {}", value, greatest));
   }
-  auto upsert = transaction.query(
-      "INSERT INTO counter (switch, port, session, name, value) VALUES (?, nullif(?, 0), ?, ?, ?)"
-      " ON CONFLICT (switch, ifnull(port, 0), session, name) DO UPDATE SET value = excluded.value");
-  upsert.with(std::int64_t(owner.switch_key)).with(port_or_none(owner)).with(owner.session);
-  upsert.with(name).with(static_cast<std::int64_t>(value)).run();
+  storage::put_counter(transaction, owner, name, value);
 }
 
 void add_to_counter(storage::Transaction &transaction, CounterOwner const &owner,
                     std::string_view name, std::uint64_t more) {
-  auto const before = counters_of(transaction, owner);
-  auto const found = before.find(name);
-  auto const value = found == before.end() ? 0 : found->second;
+  auto const value = storage::find_counter(transaction, owner, name).value_or(0);
   auto const room = known_name(owner, name).greatest - value;
   set_counter(transaction, owner, name, value + std::min(more, room));
 }
 
 std::vector<std::string> counting_sessions(storage::Transaction &transaction,
                                            storage::SwitchKey key) {
-  auto select = transaction.query(
-      "SELECT DISTINCT session FROM counter WHERE switch = ? AND session <> '' ORDER BY session");
-  select.with(std::int64_t(key));
-  std::vector<std::string> sessions;
-  while (select.next()) {
-    sessions.push_back(select.text(0));
-  }
-  return sessions;
+  return storage::sessions_with_counters(transaction, key);
 }
 
 void forget_counters(storage::Transaction &transaction) {
-  transaction.query("DELETE FROM counter").run();
+  storage::remove_counters(transaction);
 }
 
 }  // namespace simhost::stored

@@ -1,32 +1,20 @@
 // The physical side of the uplinks: cables, the switch at the other end, aggregation.
 #pragma once
 
-#include <cstdint>
+#include <string>
 #include <string_view>
 #include <vector>
 
 #include "model/plane.h"
+#include "storage/running/links.h"
 
 namespace simhost::stored {
 
-/// The link of an uplink; as it is here while nobody has touched it.
-struct Link {
-  bool carrier = true;          ///< the cable is plugged in
-  bool admin = true;            ///< the host has not switched it off
-  bool partner = true;          ///< the other end answers link aggregation
-  std::uint32_t speed = 10000;  ///< Mbit/s
-  bool full_duplex = true;
-  bool beacons = true;              ///< the beacons of the other uplinks arrive
-  std::uint32_t error_percent = 0;  ///< of its frames are damaged
-  bool driver = true;               ///< the driver of the card is loaded
-  ClockTime up_since = {};  ///< when it came up last; the beginning of time if it was never down
-
-  [[nodiscard]] bool up() const { return carrier && admin; }
-};
+using storage::Link;
 
 Link link_of(storage::Transaction &transaction, std::string_view uplink);
 /// Changes a link. Its up_since is kept by the clock, whatever `link` says.
-void put_link(storage::Transaction &transaction, std::string_view uplink, Link const &link);
+void set_link(storage::Transaction &transaction, std::string_view uplink, Link const &link);
 
 std::vector<Lag> lags_of(storage::Transaction &transaction, storage::SwitchKey switch_key);
 /// Whether an uplink is in a group.

@@ -1,5 +1,4 @@
-// Addresses in SQL. What is too old is left out when it is read, and removed when the switch's
-// table changes.
+// What is too old is left out when it is read, and removed when the switch's table changes.
 #include "planes/stored/mac_tables.h"
 
 #include <algorithm>
@@ -12,7 +11,6 @@
 #include "planes/stored/counters.h"
 #include "planes/stored/policies.h"
 #include "qexapi/protocols.h"
-#include "storage/store.h"
 #include "vswitch/mac_learning.h"
 #include "vswitch/port_mac_policies.h"
 #include "vswitch/properties.h"
@@ -23,10 +21,6 @@ namespace {
 constexpr std::uint16_t kGreatestVlan = 4094;
 constexpr std::uint32_t kGreatestNetwork = 0xFFFFFF;
 constexpr unsigned kMulticastBit = 1;
-
-std::int64_t port_or_none(Place const &place) {
-  return place.port ? std::int64_t(*place.port) : 0;
-}
 
 std::span<std::byte const> mac_of(VSMACEntry const &entry) {
   return std::as_bytes(std::span(entry.macAddress));
@@ -69,71 +63,35 @@ VSPMACLearning port_learning(storage::Transaction &transaction, Place const &pla
 }
 
 // The last time at which an address that ages may have been seen and be gone now.
-std::int64_t gone_if_seen_by(storage::Transaction &transaction, VSMACLearning const &learning) {
-  return (clock_now(transaction) - std::chrono::seconds(learning.agingTime)).count();
+ClockTime gone_if_seen_by(storage::Transaction &transaction, VSMACLearning const &learning) {
+  return clock_now(transaction) - std::chrono::seconds(learning.agingTime);
 }
 
 void remove_aged(storage::Transaction &transaction, storage::SwitchKey key,
                  VSMACLearning const &learning) {
-  transaction.query("DELETE FROM address WHERE switch = ? AND ages AND seen <= ?")
-      .with(std::int64_t(key))
-      .with(gone_if_seen_by(transaction, learning))
-      .run();
+  storage::remove_aged(transaction, key, gone_if_seen_by(transaction, learning));
 }
 
-struct Known {
-  std::int64_t row;
-  bool here;
-  VSMACAddrType type;
-};
-
-std::optional<Known> find_address(storage::Transaction &transaction, Place const &place,
-                                  VSMACEntry const &entry) {
-  auto select = transaction.query(
-      "SELECT rowid, ifnull(port, 0), type FROM address"
-      " WHERE switch = ? AND mac = ? AND vid = ? AND vni = ?");
-  select.with(std::int64_t(place.switch_key)).with(mac_of(entry));
-  if (!select.with(std::int64_t{entry.vid}).with(std::int64_t{entry.vni}).next()) {
-    return std::nullopt;
-  }
-  return Known{.row = select.integer(0),
-               .here = select.integer(1) == port_or_none(place),
-               .type = static_cast<VSMACAddrType>(select.integer(2))};
+storage::AddressName name_of(VSMACEntry const &entry) {
+  storage::AddressName name{.mac = {}, .vid = entry.vid, .vni = entry.vni};
+  std::memcpy(name.mac.data(), entry.macAddress, name.mac.size());
+  return name;
 }
 
-// Puts the address here, wherever it was before.
-void store_address(storage::Transaction &transaction, Place const &place, VSMACEntry const &entry,
-                   ClockTime seen) {
-  auto upsert = transaction.query(
-      "INSERT INTO address (switch, port, mac, vid, vni, type, ages, seen)"
-      " VALUES (?, nullif(?, 0), ?, ?, ?, ?, ?, ?)"
-      " ON CONFLICT (switch, mac, vid, vni) DO UPDATE SET port = excluded.port,"
-      " type = excluded.type, ages = excluded.ages, seen = excluded.seen");
-  upsert.with(std::int64_t(place.switch_key)).with(port_or_none(place)).with(mac_of(entry));
-  upsert.with(std::int64_t{entry.vid}).with(std::int64_t{entry.vni});
-  upsert.with(std::int64_t{entry.macAddrType}).with(std::int64_t{entry.aging != 0});
-  upsert.with(seen.count()).run();
+bool is_at(Place const &place, storage::FoundAddress const &address) {
+  return address.port == place.port;
 }
 
-static_assert(VS_MAC_ADDR_TYPE_LEARNED == 2, "the tables count what is of this type");
-
-// At a place, or kEverywhere: with what is too old and has not been removed yet.
-constexpr std::int64_t kEverywhere = -1;
-
-std::int64_t count_learned(storage::Transaction &transaction, storage::SwitchKey key,
-                           std::int64_t place) {
-  auto select = transaction.query("SELECT addresses FROM learned WHERE switch = ? AND place = ?");
-  return select.with(std::int64_t(key)).with(place).next() ? select.integer(0) : 0;
-}
-
-std::int64_t count_too_old(storage::Transaction &transaction, Place const &place,
-                           VSMACLearning const &learning) {
-  auto select = transaction.query(
-      "SELECT count(*) FROM address WHERE switch = ? AND ages AND seen <= ?"
-      " AND ifnull(port, 0) = ? AND type = ?");
-  select.with(std::int64_t(place.switch_key)).with(gone_if_seen_by(transaction, learning));
-  select.with(port_or_none(place)).with(std::int64_t{VS_MAC_ADDR_TYPE_LEARNED}).next();
-  return select.integer(0);
+VSMACEntry entry_of(storage::Address const &address, ClockTime now) {
+  VSMACEntry entry{};
+  std::memcpy(entry.macAddress, address.name.mac.data(), sizeof entry.macAddress);
+  entry.macAddrType = address.type;
+  entry.aging = address.ages ? 1 : 0;
+  entry.vid = address.name.vid;
+  entry.vni = address.name.vni;
+  auto const since = std::max(now - address.seen, ClockTime::zero());
+  entry.elapsed = static_cast<qex_uint32>(since / std::chrono::seconds(1));
+  return entry;
 }
 
 // Of a switch from which what is too old has been removed.
@@ -141,9 +99,9 @@ bool has_room(storage::Transaction &transaction, Place const &place, VSMACLearni
               VSPMACLearning const &port, bool new_to_switch) {
   auto const limit =
       place.port ? port.macLimit : std::uint32_t{TEAM_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT};
-  auto const key = place.switch_key;
-  return count_learned(transaction, key, port_or_none(place)) < limit &&
-         !(new_to_switch && count_learned(transaction, key, kEverywhere) >= learning.macLimit);
+  return storage::count_learned(transaction, place) < limit &&
+         !(new_to_switch &&
+           storage::count_learned(transaction, place.switch_key) >= learning.macLimit);
 }
 
 // A source that is not learned because there is no room.
@@ -163,24 +121,10 @@ Sighting turn_away(storage::Transaction &transaction, Place const &place,
 std::vector<VSMACEntry> addresses(storage::Transaction &transaction, Place const &place,
                                   VSMACAddrType type) {
   auto const now = clock_now(transaction);
-  auto select = transaction.query(
-      "SELECT mac, type, ages, vid, vni, seen FROM address"
-      " WHERE switch = ? AND ifnull(port, 0) = ? AND ? IN (type, ?)"
-      " AND NOT (ages AND seen <= ?) ORDER BY mac, vid, vni");
   auto const gone = gone_if_seen_by(transaction, learning_of(transaction, place.switch_key));
-  select.with(std::int64_t(place.switch_key)).with(port_or_none(place));
-  select.with(std::int64_t{type}).with(std::int64_t{VS_MAC_ADDR_TYPE_ALL}).with(gone);
   std::vector<VSMACEntry> entries;
-  while (select.next()) {
-    VSMACEntry entry{};
-    std::memcpy(entry.macAddress, select.bytes(0).data(), sizeof entry.macAddress);
-    entry.macAddrType = static_cast<VSMACAddrType>(select.integer(1));
-    entry.aging = static_cast<qex_Bool>(select.integer(2));
-    entry.vid = static_cast<qex_VlanID>(select.integer(3));
-    entry.vni = static_cast<qex_uint32>(select.integer(4));
-    auto const since = std::max(now - ClockTime(select.integer(5)), ClockTime::zero());
-    entry.elapsed = static_cast<qex_uint32>(since / std::chrono::seconds(1));
-    entries.push_back(entry);
+  for (auto const &address : storage::addresses_at(transaction, place, type, gone)) {
+    entries.push_back(entry_of(address, now));
   }
   return entries;
 }
@@ -201,24 +145,28 @@ void describe_address(storage::Transaction &transaction, Place const &place,
     throw Refused(QEX_BAD_PARAM);
   }
   remove_aged(transaction, place.switch_key, learning_of(transaction, place.switch_key));
-  auto const known = find_address(transaction, place, entry);
-  if (known && !known->here && known->type != VS_MAC_ADDR_TYPE_LEARNED) {
+  auto const known = storage::find_address(transaction, place.switch_key, name_of(entry));
+  if (known && !is_at(place, *known) && known->type != VS_MAC_ADDR_TYPE_LEARNED) {
     throw Refused(QEX_EXISTS);
   }
   // By value: a field of a packed record may lie where no reference can.
   qex_uint32 const elapsed = entry.elapsed;
-  store_address(transaction, place, entry, clock_now(transaction) - std::chrono::seconds(elapsed));
+  storage::place_address(transaction, place,
+                         {.name = name_of(entry),
+                          .type = entry.macAddrType,
+                          .ages = entry.aging != 0,
+                          .seen = clock_now(transaction) - std::chrono::seconds(elapsed)});
 }
 
 void remove_address(storage::Transaction &transaction, Place const &place,
                     VSMACEntry const &entry) {
   remove_aged(transaction, place.switch_key, learning_of(transaction, place.switch_key));
-  auto const known = find_address(transaction, place, entry);
-  if (!known || !known->here ||
+  auto const known = storage::find_address(transaction, place.switch_key, name_of(entry));
+  if (!known || !is_at(place, *known) ||
       (entry.macAddrType != VS_MAC_ADDR_TYPE_ALL && entry.macAddrType != known->type)) {
     throw Refused(QEX_NOT_FOUND);
   }
-  transaction.query("DELETE FROM address WHERE rowid = ?").with(known->row).run();
+  storage::remove_address(transaction, known->row);
 }
 
 Sighting learn(storage::Transaction &transaction, Place const &place, VSMACEntry const &source) {
@@ -230,12 +178,9 @@ Sighting learn(storage::Transaction &transaction, Place const &place, VSMACEntry
   }
   remove_aged(transaction, place.switch_key, learning);
   auto const now = clock_now(transaction);
-  auto const known = find_address(transaction, place, source);
-  if (known && known->here) {
-    transaction.query("UPDATE address SET seen = ? WHERE rowid = ?")
-        .with(now.count())
-        .with(known->row)
-        .run();
+  auto const known = storage::find_address(transaction, place.switch_key, name_of(source));
+  if (known && is_at(place, *known)) {
+    storage::set_seen(transaction, known->row, now);
     return Sighting::refreshed;
   }
   if (known && known->type != VS_MAC_ADDR_TYPE_LEARNED &&
@@ -246,10 +191,9 @@ Sighting learn(storage::Transaction &transaction, Place const &place, VSMACEntry
   if (!has_room(transaction, place, learning, port, new_to_switch)) {
     return turn_away(transaction, place, port);
   }
-  VSMACEntry entry = source;
-  entry.macAddrType = VS_MAC_ADDR_TYPE_LEARNED;
-  entry.aging = 1;
-  store_address(transaction, place, entry, now);
+  storage::place_address(
+      transaction, place,
+      {.name = name_of(source), .type = VS_MAC_ADDR_TYPE_LEARNED, .ages = true, .seen = now});
   if (known && place.port) {
     CounterOwner const owner{.switch_key = place.switch_key, .port = place.port};
     add_to_counter(transaction, owner, "numMACsMoved", 1);
@@ -259,11 +203,10 @@ Sighting learn(storage::Transaction &transaction, Place const &place, VSMACEntry
 
 VSPMACLearningStats learning_stats(storage::Transaction &transaction, Place const &place) {
   auto counters = counters_of(transaction, {.switch_key = place.switch_key, .port = place.port});
-  auto const learning = learning_of(transaction, place.switch_key);
+  auto const gone = gone_if_seen_by(transaction, learning_of(transaction, place.switch_key));
   VSPMACLearningStats stats{};
-  stats.numMACsLearned =
-      static_cast<qex_uint32>(count_learned(transaction, place.switch_key, port_or_none(place)) -
-                              count_too_old(transaction, place, learning));
+  stats.numMACsLearned = static_cast<qex_uint32>(storage::count_learned(transaction, place) -
+                                                 storage::count_aged(transaction, place, gone));
   stats.noLearningAllowedPkts = counters["noLearningAllowedPkts"];
   stats.noLearningDroppedPkts = counters["noLearningDroppedPkts"];
   stats.numMACsMoved = counters["numMACsMoved"];
@@ -271,9 +214,7 @@ VSPMACLearningStats learning_stats(storage::Transaction &transaction, Place cons
 }
 
 void forget_learned(storage::Transaction &transaction) {
-  transaction.query("DELETE FROM address WHERE type = ?")
-      .with(std::int64_t{VS_MAC_ADDR_TYPE_LEARNED})
-      .run();
+  storage::remove_learned(transaction);
 }
 
 }  // namespace simhost::stored

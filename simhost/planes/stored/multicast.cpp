@@ -1,4 +1,4 @@
-// Groups and their sources in SQL.
+// Which groups a port may join.
 #include "planes/stored/multicast.h"
 
 #include <algorithm>
@@ -6,7 +6,6 @@
 #include "base/outcomes.h"
 #include "model/options/runtime_options.h"
 #include "qexapi/protocols.h"
-#include "storage/store.h"
 #include "vswitch/mcast_filters.h"
 
 namespace simhost::stored {
@@ -52,80 +51,35 @@ void check(storage::Transaction &transaction, McastGroup const &group) {
   }
 }
 
-bool forget(storage::Transaction &transaction, storage::PortNumber port,
-            AddressBytes const &address) {
-  auto erase = transaction.query("DELETE FROM mcast_group WHERE port = ? AND address = ?");
-  return erase.with(std::int64_t(port)).with(address).run() != 0;
-}
-
-std::vector<AddressBytes> sources_of(storage::Transaction &transaction, std::int64_t key) {
-  auto select =
-      transaction.query("SELECT address FROM mcast_source WHERE mcast_group = ? ORDER BY position");
-  select.with(key);
-  std::vector<AddressBytes> sources;
-  while (select.next()) {
-    sources.push_back(select.bytes(0));
-  }
-  return sources;
-}
-
 }  // namespace
 
 void join(storage::Transaction &transaction, storage::PortNumber port, McastGroup const &group) {
   check(transaction, group);
-  forget(transaction, port, group.address);
-  auto insert = transaction.query(
-      "INSERT INTO mcast_group (port, address, version, source_mode, vni, updated)"
-      " VALUES (?, ?, ?, ?, ?, ?)");
-  insert.with(std::int64_t(port)).with(group.address).with(std::int64_t{group.version});
-  insert.with(std::int64_t{group.source_mode}).with(std::int64_t{group.vni});
-  insert.with(clock_now(transaction).count()).run();
-  auto const key = transaction.last_key();
-  for (auto const &source : group.sources) {
-    transaction.query("INSERT INTO mcast_source (mcast_group, address) VALUES (?, ?)")
-        .with(key)
-        .with(source)
-        .run();
-  }
+  auto joined = group;
+  joined.updated = clock_now(transaction);
+  storage::remove_group(transaction, port, group.address);
+  storage::insert_group(transaction, port, joined);
 }
 
 void leave(storage::Transaction &transaction, storage::PortNumber port,
            AddressBytes const &address) {
-  if (!forget(transaction, port, address)) {
+  if (!storage::remove_group(transaction, port, address)) {
     throw Refused(QEX_NOT_FOUND);
   }
 }
 
 std::vector<AddressBytes> groups(storage::Transaction &transaction, storage::PortNumber port,
                                  std::size_t length) {
-  auto select = transaction.query(
-      "SELECT address FROM mcast_group WHERE port = ? AND length(address) = ? ORDER BY address");
-  select.with(std::int64_t(port)).with(static_cast<std::int64_t>(length));
-  std::vector<AddressBytes> addresses;
-  while (select.next()) {
-    addresses.push_back(select.bytes(0));
-  }
-  return addresses;
+  return storage::group_addresses(transaction, port, length);
 }
 
 std::optional<McastGroup> group(storage::Transaction &transaction, storage::PortNumber port,
                                 AddressBytes const &address) {
-  auto select = transaction.query(
-      "SELECT key, version, source_mode, vni, updated FROM mcast_group"
-      " WHERE port = ? AND address = ?");
-  if (!select.with(std::int64_t(port)).with(address).next()) {
-    return std::nullopt;
-  }
-  return McastGroup{.address = address,
-                    .version = static_cast<std::uint32_t>(select.integer(1)),
-                    .source_mode = static_cast<std::uint32_t>(select.integer(2)),
-                    .vni = static_cast<std::uint32_t>(select.integer(3)),
-                    .updated = ClockTime(select.integer(4)),
-                    .sources = sources_of(transaction, select.integer(0))};
+  return storage::find_group(transaction, port, address);
 }
 
 void forget_groups(storage::Transaction &transaction) {
-  transaction.query("DELETE FROM mcast_group").run();
+  storage::remove_groups(transaction);
 }
 
 }  // namespace simhost::stored

@@ -11,7 +11,6 @@
 #include "model/ports/ports.h"
 #include "planes/stored/policies.h"
 #include "qexapi/switch_properties.h"
-#include "storage/store.h"
 #include "vswitch/properties.h"
 
 namespace simhost::stored {

@@ -11,7 +11,6 @@
 #include "model/options/runtime_options.h"
 #include "planes/stored/counters.h"
 #include "planes/stored/policies.h"
-#include "storage/store.h"
 #include "vswitch/properties.h"
 
 namespace simhost::stored {
@@ -110,13 +109,13 @@ std::string team_uplink(storage::Transaction &transaction, storage::Port const &
 void change_link(storage::Transaction &transaction, std::string_view uplink, Link const &link) {
   auto const running = switch_running_over(transaction, uplink);
   if (!running) {
-    put_link(transaction, uplink, link);
+    set_link(transaction, uplink, link);
     return;
   }
   auto const key = *running;
   auto const own = own_teamings(transaction, key);
   Carriers const before(team_of(transaction, key), own);
-  put_link(transaction, uplink, link);
+  set_link(transaction, uplink, link);
   Carriers const after(team_of(transaction, key), own);
   auto const numbers = storage::client_numbers(transaction, key);
   auto const moved = std::count_if(numbers.begin(), numbers.end(), [&](storage::PortNumber number) {

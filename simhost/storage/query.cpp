@@ -1,0 +1,103 @@
+// Statements: prepared once, bound and stepped for each run.
+#include "storage/query.h"
+
+#include <SQLiteCpp/Exception.h>
+
+namespace simhost::storage {
+
+SQLite::Statement &Connection::prepared(std::string_view sql) {
+  if (auto const found = statements.find(sql); found != statements.end()) {
+    return found->second;
+  }
+  return statements.try_emplace(sql, database, std::string(sql)).first->second;
+}
+
+Query::~Query() {
+  statement_.tryReset();
+  try {
+    statement_.clearBindings();
+  } catch (SQLite::Exception const &) {
+    // Bindings that stay are overwritten by the next run.
+  }
+}
+
+Query &Query::with(std::int64_t value) {
+  statement_.bind(++bound_, value);
+  return *this;
+}
+
+Query &Query::with(std::string_view text) {
+  statement_.bind(++bound_, std::string(text));
+  return *this;
+}
+
+Query &Query::with(std::span<std::byte const> bytes) {
+  // SQLite takes no bytes at a null address for NULL, which is not the same as no bytes.
+  void const *const first = bytes.empty() ? "" : static_cast<void const *>(bytes.data());
+  statement_.bind(++bound_, first, static_cast<int>(bytes.size()));
+  return *this;
+}
+
+bool Query::next() {
+  return statement_.executeStep();
+}
+
+int Query::run() {
+  return statement_.exec();
+}
+
+std::int64_t Query::integer(int column) const {
+  auto const value = statement_.getColumn(column);
+  if (!value.isInteger()) {
+    refuse(column, "no integer");
+  }
+  return value.getInt64();
+}
+
+std::int64_t Query::integer(int column, std::int64_t least, std::int64_t greatest) const {
+  auto const value = integer(column);
+  if (value < least || value > greatest) {
+    refuse(column, std::to_string(value));
+  }
+  return value;
+}
+
+std::string Query::text(int column) const {
+  auto const value = statement_.getColumn(column);
+  if (!value.isText()) {
+    refuse(column, "no text");
+  }
+  auto text = value.getString();
+  if (text.find('\0') != std::string::npos) {
+    refuse(column, "a text with a NUL in it");
+  }
+  return text;
+}
+
+std::vector<std::byte> Query::bytes(int column) const {
+  auto const value = statement_.getColumn(column);
+  if (!value.isBlob()) {
+    refuse(column, "no bytes");
+  }
+  auto const *first = static_cast<std::byte const *>(value.getBlob());
+  return {first, first + value.getBytes()};
+}
+
+std::vector<std::byte> Query::bytes(int column, std::size_t length) const {
+  auto value = bytes(column);
+  if (value.size() != length) {
+    refuse(column, std::to_string(value.size()) + " bytes instead of " + std::to_string(length));
+  }
+  return value;
+}
+
+bool Query::is_null(int column) const {
+  return statement_.getColumn(column).isNull();
+}
+
+void Query::refuse(int column, std::string const &what) const {
+  store_.refuse(std::string("the column '") + statement_.getColumn(column).getName() + "' holds " +
+                what);
+}
+
+}  // namespace simhost::storage

@@ -1,0 +1,100 @@
+// SQL on the state. Private to this layer: those above know rows and the functions on them.
+#pragma once
+
+#include <SQLiteCpp/Database.h>
+#include <SQLiteCpp/Statement.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <limits>
+#include <map>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+#include <type_traits>
+#include <vector>
+
+#include "storage/store.h"
+
+namespace simhost::storage {
+
+/// The open database, and the statements that were prepared on it.
+struct Connection {
+  explicit Connection(std::optional<std::filesystem::path> const &file);
+
+  SQLite::Statement &prepared(std::string_view sql);
+
+  SQLite::Database database;
+  std::map<std::string_view, SQLite::Statement> statements;
+};
+
+/// One run of a prepared statement. It resets the statement when it goes, because a statement left
+/// in the middle of its rows would keep its transaction from ending.
+class Query {
+ public:
+  /// `sql` is a literal: the statement prepared from it is kept.
+  Query(Transaction &transaction, std::string_view sql)
+      : store_(transaction.store()), statement_(transaction.connection().prepared(sql)) {}
+  ~Query();
+  Query(Query const &) = delete;
+  Query &operator=(Query const &) = delete;
+
+  /// Binds the parameters from the left, one per call; the value is copied.
+  Query &with(std::int64_t value);
+  Query &with(std::string_view text);
+  Query &with(std::span<std::byte const> bytes);
+  /// A key, a number or a kind of row.
+  template <typename Enum>
+  requires std::is_enum_v<Enum> Query &with(Enum value) {
+    return with(static_cast<std::int64_t>(value));
+  }
+
+  /// Steps to the next row; false when there is none.
+  bool next();
+  /// Runs a statement that yields no rows; returns how many rows it changed.
+  int run();
+
+  /// The columns of the row that next() reached, counted from 0. The file may have been written by
+  /// anybody: these throw UnusableState for a value of another type or outside its bounds.
+  [[nodiscard]] std::int64_t integer(int column) const;
+  [[nodiscard]] std::int64_t integer(int column, std::int64_t least, std::int64_t greatest) const;
+  /// Any value of an unsigned type of up to 32 bits.
+  template <typename Number>
+  [[nodiscard]] Number number(int column) const {
+    static_assert(std::is_unsigned_v<Number> && sizeof(Number) < sizeof(std::int64_t));
+    return static_cast<Number>(integer(column, 0, std::numeric_limits<Number>::max()));
+  }
+  /// 0 or 1.
+  [[nodiscard]] bool flag(int column) const { return integer(column, 0, 1) != 0; }
+  /// Without a NUL in it.
+  [[nodiscard]] std::string text(int column) const;
+  [[nodiscard]] std::vector<std::byte> bytes(int column) const;
+  /// Of that length.
+  [[nodiscard]] std::vector<std::byte> bytes(int column, std::size_t length) const;
+  [[nodiscard]] bool is_null(int column) const;
+  /// Throws UnusableState, which says that the column holds `what`.
+  [[noreturn]] void refuse(int column, std::string const &what) const;
+
+  /// What `read` makes of the first row; nothing without one.
+  template <typename Read>
+  auto first(Read const &read) {
+    return next() ? std::optional(read(*this)) : std::nullopt;
+  }
+  /// What `read` makes of each row.
+  template <typename Read>
+  auto all(Read const &read) {
+    std::vector<std::decay_t<decltype(read(*this))>> rows;
+    while (next()) {
+      rows.push_back(read(*this));
+    }
+    return rows;
+  }
+
+ private:
+  Store const &store_;
+  SQLite::Statement &statement_;
+  int bound_ = 0;
+};
+
+}  // namespace simhost::storage

@@ -1,0 +1,19 @@
+// The row of the clock in SQL.
+#include "storage/running/clock.h"
+
+#include "storage/query.h"
+
+namespace simhost::storage {
+
+ClockRow get_clock(Transaction &transaction) {
+  Query select(transaction, "SELECT stopped, value FROM clock");
+  select.next();
+  return {.stopped = select.flag(0), .value = std::chrono::milliseconds(select.integer(1))};
+}
+
+void put_clock(Transaction &transaction, ClockRow const &row) {
+  Query update(transaction, "UPDATE clock SET stopped = ?, value = ?");
+  update.with(row.stopped).with(row.value.count()).run();
+}
+
+}  // namespace simhost::storage

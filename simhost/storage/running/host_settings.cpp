@@ -1,0 +1,46 @@
+// Host settings in SQL.
+#include "storage/running/host_settings.h"
+
+#include "storage/query.h"
+
+namespace simhost::storage {
+namespace {
+
+template <typename Value>
+void put_value(Transaction &transaction, std::string_view name, Value const &value) {
+  Query(transaction,
+        "INSERT INTO host_setting (name, value) VALUES (?, ?)"
+        " ON CONFLICT (name) DO UPDATE SET value = excluded.value")
+      .with(name)
+      .with(value)
+      .run();
+}
+
+template <typename Read>
+auto find_value(Transaction &transaction, std::string_view name, Read const &read) {
+  return Query(transaction, "SELECT value FROM host_setting WHERE name = ?").with(name).first(read);
+}
+
+}  // namespace
+
+std::optional<std::int64_t> find_host_number(Transaction &transaction, std::string_view name) {
+  return find_value(transaction, name, [](Query const &row) { return row.integer(0); });
+}
+
+std::optional<std::string> find_host_text(Transaction &transaction, std::string_view name) {
+  return find_value(transaction, name, [](Query const &row) { return row.text(0); });
+}
+
+void put_host_number(Transaction &transaction, std::string_view name, std::int64_t value) {
+  put_value(transaction, name, value);
+}
+
+void put_host_text(Transaction &transaction, std::string_view name, std::string_view value) {
+  put_value(transaction, name, value);
+}
+
+void remove_host_settings(Transaction &transaction) {
+  Query(transaction, "DELETE FROM host_setting").run();
+}
+
+}  // namespace simhost::storage
