@@ -26,7 +26,13 @@ NOT_CONVERTED: List[str] = [
     "interface",
     "python",
     "simhost",
-    "tests",
+    "tests/classes",
+    "tests/docs/test_pictures.py",
+    "tests/docs/test_comments.py",
+    "tests/docs/test_site.py",
+    "tests/module",
+    "tests/plugin",
+    "tests/simhost",
 ]
 
 # They name the words to say which those are.
@@ -70,7 +76,7 @@ RULES = [
     rule(
         r"\b(?:springs|sprang|springing)\b",
         "the call traps; a trap",
-        r"\bspr(?:ings|ang|inging) (?:\w+ )?trap\b",
+        r"\bspr(?:ings|ang|inging) (?:\w+ ){0,2}trap\b",
         "to spring the trap is what a library does to the module's buffer",
     ),
     rule(

@@ -33,7 +33,7 @@ class Call:
     """Whether it takes any number of further arguments; the host then sees a null pointer."""
     result: str
     outputs: Tuple[str, ...]
-    """What the list holds behind the result; with no outputs the result stands alone."""
+    """What the list holds after the result; with no outputs the result stands alone."""
     forms: int
 
     def __str__(self) -> str:
@@ -62,8 +62,8 @@ class Call:
 
     def seen(self, samples: Iterable[Sample]) -> Tuple[Any, ...]:
         """All parameters of the host's function for such arguments."""
-        behind = (None,) if self.ignores_more else (ANY,) * len(self.outputs)
-        return (*(sample.seen for sample in samples), *behind)
+        rest = (None,) if self.ignores_more else (ANY,) * len(self.outputs)
+        return (*(sample.seen for sample in samples), *rest)
 
     def positions(self, *kinds: Type[Kind]) -> List[int]:
         """The positions of all arguments, or of those of some kinds."""

@@ -17,7 +17,7 @@ def pytest_configure(config: pytest.Config) -> None:
 
 
 def pytest_sessionstart() -> None:
-    """Refuse to run on another host: its answers would prove nothing."""
+    """Refuse to run on another host: what it returns would prove nothing."""
     try:
         RecordingHost()
     except WrongHost as error:

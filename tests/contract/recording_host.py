@@ -1,4 +1,4 @@
-"""The recording host from Python: what the module called, and what the host answers.
+"""The recording host from Python: what the module called, and what the host returns.
 
 The host's two libraries note each call and answer with zeros and nulls unless told otherwise:
 
@@ -88,7 +88,7 @@ class RecordingHost:
         self._alive: List[object] = []
 
     def reset(self) -> None:
-        """Forget all calls and answers, and lower the trap's status."""
+        """Forget all calls and what they return, and lower the trap's status."""
         self._recorder.recorder_reset()
         self._alive.clear()
         self.exception_status = 0
@@ -122,7 +122,7 @@ class RecordingHost:
         outputs: Optional[Mapping[int, Value]] = None,
         nth: int = 0,
     ) -> None:
-        """Set what a call answers: the nth one, or all that have no answer of their own.
+        """Set what a call returns: the nth one, or all of which nothing else is said.
 
         The result is an integer, a text or an address, as the call declares it. An output is an
         integer or an address, as wide as the parameter has it, or just bytes: those of a record,

@@ -1,4 +1,4 @@
-"""How a result of each kind crosses: what the host answers, and what Python then gets."""
+"""How a result of each kind crosses: what the host returns, and what Python then gets."""
 
 import re
 from dataclasses import dataclass
@@ -19,7 +19,7 @@ class PointerTo(NamedTuple):
 
 
 class Answer(NamedTuple):
-    """What the host answers, and what Python gets."""
+    """What the host returns, and what Python gets."""
 
     told: Value
     expected: Any
@@ -49,7 +49,7 @@ class IntegerResult:
     low: int
     high: int
 
-    def answers(self) -> List[Answer]:
+    def samples(self) -> List[Answer]:
         middle = self.high // 2 + 1
         return [
             Answer(value, value) for value in (0, 1, self.low, self.high, middle, self.low // 2)
@@ -60,7 +60,7 @@ class IntegerResult:
 class StatusResult:
     """A status: returned, whatever it says."""
 
-    def answers(self) -> List[Answer]:
+    def samples(self) -> List[Answer]:
         low, high = scalars.SIGNED_32
         return [Answer(value, value) for value in (0, 0x0BAD0001, 0x2BAD0000, 1, -1, low, high)]
 
@@ -80,7 +80,7 @@ TEXTS: List[Tuple[bytes, str]] = [
 class TextResult:
     """A text of the library, or none."""
 
-    def answers(self) -> List[Answer]:
+    def samples(self) -> List[Answer]:
         texts = [Answer(told, expected) for told, expected in TEXTS]
         return [Answer(None, None), *texts, Answer(b"x" * 70_000, "x" * 70_000)]
 
@@ -94,7 +94,7 @@ class BufferResult:
 
     limit: int
 
-    def answers(self) -> List[Answer]:
+    def samples(self) -> List[Answer]:
         limit = self.limit
         return [
             *(Answer(told + b"\0", expected) for told, expected in TEXTS),
@@ -111,7 +111,7 @@ class BufferResult:
 class CharacterResult:
     """One byte as a text."""
 
-    def answers(self) -> List[Answer]:
+    def samples(self) -> List[Answer]:
         bytes_of_ascii = [Answer(byte, chr(byte)) for byte in (0, 1, 65, 127)]
         return [
             *bytes_of_ascii,
@@ -127,7 +127,7 @@ class PointerResult:
 
     type: str
 
-    def answers(self) -> List[Answer]:
+    def samples(self) -> List[Answer]:
         spellings = arguments.spellings_of(self.type)
         addresses = (0x1000, 2**64 - 16)
         pointers = [Answer(place, PointerTo(spellings, place, False)) for place in addresses]
@@ -138,7 +138,7 @@ class PointerResult:
 class NoResult:
     """None."""
 
-    def answers(self) -> List[Answer]:
+    def samples(self) -> List[Answer]:
         return [Answer(None, None)]
 
 

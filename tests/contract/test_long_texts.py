@@ -39,7 +39,7 @@ def fixture_text() -> Iterator[int]:
 
     file = os.memfd_create("text")
     os.write(file, b"x" * PIECE)
-    # The page behind the text is the zeros that end it.
+    # The page after the text is the zeros that end it.
     size = TOO_LONG + mmap.PAGESIZE
     anonymous = mmap.MAP_PRIVATE | mmap.MAP_ANONYMOUS
     start = libc.mmap(None, size, mmap.PROT_READ, anonymous, -1, 0)

@@ -15,12 +15,12 @@ from results import BufferResult
 @calls.each()
 @pytest.mark.proves("result")
 def test_a_result_comes_back_in_its_shape(host: RecordingHost, call: Call) -> None:
-    own = results.kind(call.result).answers()
-    outputs = [results.kind(output).answers() for output in call.outputs]
+    own = results.kind(call.result).samples()
+    outputs = [results.kind(output).samples() for output in call.outputs]
     rounds = max(map(len, outputs), default=1)
     for answer, turn in product(own, range(rounds)):
         # Outputs of one call differ, or it would not show which is which.
-        chosen = [answers[(turn + index) % len(answers)] for index, answers in enumerate(outputs)]
+        chosen = [samples[(turn + index) % len(samples)] for index, samples in enumerate(outputs)]
         host.reset()
         told = {call.output_position(index): output.told for index, output in enumerate(chosen)}
         host.answer(call.name, answer.told, outputs=told)

@@ -12,7 +12,7 @@ KEY = "com.example.key"
 # The number of no port.
 UNKNOWN = 4711
 
-# Asks the host for one call, and answers that call's status.
+# Asks the host for one call, and returns that call's status.
 Act = Callable[[Host], int]
 
 
@@ -37,8 +37,8 @@ def uplink_number() -> int:
         return int(uplinks.entries[0].portID)
 
 
-def answered(call: Callable[..., Any], *arguments: Any) -> int:
-    """The status of a call; what it hands out goes back."""
+def status_of(call: Callable[..., Any], *arguments: Any) -> int:
+    """The status of a call; what it allocates is released."""
     result = call(*arguments)
     if not isinstance(result, tuple):
         return int(result)

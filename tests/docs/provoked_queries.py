@@ -3,7 +3,18 @@
 from typing import Any, Dict
 
 import libvswitch as vs
-from asking import PORT, SWITCH, UNKNOWN, Act, answered, create, made, mirror, number, uplink_number
+from asking import (
+    PORT,
+    SWITCH,
+    UNKNOWN,
+    Act,
+    status_of,
+    create,
+    made,
+    mirror,
+    number,
+    uplink_number,
+)
 from simhost import Host
 
 
@@ -21,15 +32,15 @@ def options(kind: int, value: Any) -> Any:
     listed = vs.VSRuntimeOptions(256)
     first = listed.get_first_option()
     add = listed.add_int_option if isinstance(value, int) else listed.add_str_option
-    behind = add(first, "", kind, value)
-    assert behind is not None
-    listed.set_options_length(int(behind) - int(first))
+    following = add(first, "", kind, value)
+    assert following is not None
+    listed.set_options_length(int(following) - int(first))
     return listed
 
 
 def group(mode: int) -> int:
     address = bytes([239, 9, 9, 9])
-    return answered(vs.VSQEX_GetMcastFilterStats, SWITCH, number(), mode, address)
+    return status_of(vs.VSQEX_GetMcastFilterStats, SWITCH, number(), mode, address)
 
 
 def uncounted(host: Host) -> int:
@@ -52,10 +63,10 @@ def no_team(host: Host) -> int:
 
 PROVOKED: Dict[str, Dict[str, Act]] = {
     "VSQEX_GetTeamMACTable": {
-        "QEX_BAD_PARAM": lambda host: answered(vs.VSQEX_GetTeamMACTable, SWITCH, 9)
+        "QEX_BAD_PARAM": lambda host: status_of(vs.VSQEX_GetTeamMACTable, SWITCH, 9)
     },
     "VSQEX_GetPortMACTable": {
-        "QEX_BAD_PARAM": lambda host: answered(vs.VSQEX_GetPortMACTable, SWITCH, PORT, 9)
+        "QEX_BAD_PARAM": lambda host: status_of(vs.VSQEX_GetPortMACTable, SWITCH, PORT, 9)
     },
     "VSQEX_SetPortMACTable": {
         "QEX_BAD_PARAM": lambda host: vs.VSQEX_SetPortMACTable(
@@ -80,13 +91,13 @@ PROVOKED: Dict[str, Dict[str, Act]] = {
         "QEX_BAD_PARAM": lambda host: vs.VSQEX_SetUplinkAdminLinkState(SWITCH, "nic4", 2)
     },
     "VSQEX_GetUplinkDVPortID": {
-        "QEX_IS_DISCONNECTED": lambda host: answered(vs.VSQEX_GetUplinkDVPortID, "nic0")
+        "QEX_IS_DISCONNECTED": lambda host: status_of(vs.VSQEX_GetUplinkDVPortID, "nic0")
     },
     "VSQEX_GetMcastFilters": {
-        "QEX_NOT_FOUND": lambda host: answered(
+        "QEX_NOT_FOUND": lambda host: status_of(
             vs.VSQEX_GetMcastFilters, SWITCH, UNKNOWN, vs.VS_MCAST_FILTER_MODE_IGMP
         ),
-        "QEX_BAD_PARAM": lambda host: answered(
+        "QEX_BAD_PARAM": lambda host: status_of(
             vs.VSQEX_GetMcastFilters, SWITCH, number(), vs.VS_MCAST_FILTER_MODE_SNOOPING
         ),
     },
@@ -96,7 +107,7 @@ PROVOKED: Dict[str, Dict[str, Act]] = {
     },
     "VSQEX_GetDVMirrorSessionStats": {"QEX_IS_DISABLED": uncounted},
     "VSQEX_GetRuntimeOptions": {
-        "QEX_NOT_SUPPORTED": lambda host: answered(
+        "QEX_NOT_SUPPORTED": lambda host: status_of(
             vs.VSQEX_GetRuntimeOptions, vs.Cell("qex_uint16", [99]).pointer, 1
         )
     },

@@ -6,7 +6,7 @@ import libvswitch as vs
 from asking import ID, KEY, PORT, UNKNOWN, Act, fill, uplink_number
 
 LONG = "x" * 300
-# Where an image says its format, behind the four bytes by which it is known.
+# Where an image says its format, after the four bytes by which it is known.
 FORMAT_AT = 4
 READ_ONLY = "com.quorix.common.port.volatile.status"
 PORTSET = "com.quorix.common.host.portset"

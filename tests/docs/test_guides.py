@@ -1,4 +1,4 @@
-"""The guides: what they show is run, and answers what they say."""
+"""The guides: what they show is run, and prints what they say."""
 
 import doctest
 import os

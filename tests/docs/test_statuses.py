@@ -1,4 +1,4 @@
-"""What the headers say of statuses, the simulated host answers.
+"""What the headers say of statuses, the simulated host returns.
 
 Each status that the comment of a call lists is provoked; one without a provocation fails. What the
 comment of a header lists is tried on every call that it is about: names of nothing, and nulls.
@@ -14,7 +14,7 @@ import provoked_queries
 import provoked_state
 import pytest
 import statuses
-from asking import ID, KEY, PORT, SWITCH, answered, made, number
+from asking import ID, KEY, PORT, SWITCH, status_of, made, number
 from call_entries import Call
 from catalogue import Catalogue
 from conftest import BUILD, ROOT
@@ -75,10 +75,10 @@ def arguments(call: Call) -> Dict[str, Any]:
 
 
 def status_with(call: Call, name: str, given: Any) -> int:
-    """What a call answers when one of its arguments is another."""
+    """What a call returns when one of its arguments is another."""
     passed = {**arguments(call), name: given}
     values = list(passed.values())[: len(call.forms[0])]
-    return answered(getattr(vs, call.name), *values)
+    return status_of(getattr(vs, call.name), *values)
 
 
 def names() -> Iterator[Tuple[str, str]]:

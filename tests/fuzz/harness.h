@@ -32,7 +32,7 @@ struct Free {
 template <typename Record>
 using Made = std::unique_ptr<Record, Free>;
 
-/// A block of exactly so many bytes, with nothing of ours in front of it or behind it.
+/// A block of exactly so many bytes, with nothing of ours before it or after it.
 class Block {
  public:
   explicit Block(std::size_t size) : bytes_(new std::byte[size]()), size_(size) {}

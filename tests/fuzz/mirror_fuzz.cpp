@@ -31,7 +31,7 @@ void set_session(Input &input, Table const &table) {
   mirror_set_session_at(table.get(), index, &session);
   if (is_there) {
     require(reinterpret_cast<char *>(found) == position(table, static_cast<std::size_t>(index), 0),
-            "sessions lie behind the header");
+            "sessions lie after the header");
     require(std::memcmp(found, &session, sizeof session) == 0, "a session is stored whole");
     mirror_set_session_at(table.get(), 0, found);
   }
@@ -51,7 +51,7 @@ void set_entity(Input &input, Table const &table) {
   auto const index = input.ConsumeIntegralInRange<qex_uint32>(0, table->numEntities - 1);
   auto *const entity = mirror_entity_at(table.get(), static_cast<int>(index));
   require(reinterpret_cast<char *>(entity) == position(table, table->numSessions, index),
-          "entities lie behind the sessions");
+          "entities lie after the sessions");
   auto const bytes = consume_record<DVMirrorEntity>(input);
   std::memcpy(entity, &bytes, sizeof bytes);
   if (input.ConsumeBool()) {

@@ -1,4 +1,4 @@
-// Faults that the fuzzers must find, each behind a word that no seed holds.
+// Faults that the fuzzers must find, each after a word that no seed holds.
 
 #include <cstdlib>
 #include <cstring>
@@ -9,7 +9,7 @@
 
 namespace {
 
-void write_behind_a_block(std::size_t offset) {
+void write_past_a_block(std::size_t offset) {
   Block const block(16);
   block.chars()[offset] = 1;
 }
@@ -40,8 +40,8 @@ extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size
   if (!word.starts_with("dvs")) {
     return 0;
   }
-  if (fault == "behind") {
-    write_behind_a_block(15 + size);
+  if (fault == "past the end") {
+    write_past_a_block(15 + size);
   } else if (fault == "overflow") {
     overflow_an_integer(static_cast<int>(size));
   } else if (fault == "leak") {

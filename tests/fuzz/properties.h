@@ -41,7 +41,7 @@ inline void append(simhost::Bytes &all, simhost::Bytes const &more) {
   all.insert(all.end(), more.begin(), more.end());
 }
 
-/// A record that counts the ones behind it.
+/// A record that counts the ones after it.
 template <typename Record, typename Entry, typename Count>
 simhost::Bytes consume_counted(Input &input, Count Record::*count) {
   auto record = consume_record<Record>(input);

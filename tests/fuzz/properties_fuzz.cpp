@@ -1,5 +1,5 @@
-// Properties through the raw door: each is set as it is or refused, and the host still describes
-// itself, writes its state, and answers for its ports.
+// Properties by the raw calls: each is set as it is or refused, and the host still describes
+// itself, writes its state, and returns what its ports have.
 
 #include <string>
 
@@ -31,7 +31,7 @@ PropertyOwner consume_owner(Input &input, Transaction &transaction) {
 }
 
 /// What callers set elsewhere too, such as the names of uplink ports, the host keeps as what it
-/// means: what stands behind the NUL of a name is lost.
+/// means: what stands after the NUL of a name is lost.
 bool is_kept_as_bytes(std::string const &key) {
   auto const *const known = simhost::find_property_key(key);
   return known == nullptr || known->read == nullptr;

@@ -77,7 +77,7 @@ void require_same(std::vector<Option> const &one, std::vector<Option> const &oth
   }
 }
 
-/// What the host is given or hands out: a list in memory of its own size.
+/// What the host is given or allocates: a list in memory of its own size.
 void offer(VSRuntimeOptions const &list) {
   simhost::storage::Transaction transaction(shared_host(), simhost::storage::Access::write);
   is_accepted([&] { simhost::set_runtime_options(transaction, list); });

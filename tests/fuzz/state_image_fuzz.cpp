@@ -22,7 +22,7 @@ using simhost::Extent;
 using simhost::Writer;
 using simhost::storage::Transaction;
 
-/// What the header of a block says behind its magic number, format, kind and version.
+/// What the header of a block says after its magic number, format, kind and version.
 constexpr std::size_t kLength = 16;
 constexpr std::size_t kChecksum = 20;
 constexpr std::size_t kHeader = 24;
@@ -32,7 +32,7 @@ void put(Bytes &block, std::size_t offset, Number number) {
   std::memcpy(block.data() + offset, &number, sizeof number);
 }
 
-/// Makes length and checksum right, so that what is behind them is looked at.
+/// Makes length and checksum right, so that what follows them is looked at.
 Bytes sealed(Bytes block) {
   std::uint32_t sum = 2166136261U;
   for (auto at = block.begin() + kHeader; at != block.end(); ++at) {

@@ -1,4 +1,4 @@
-// Records with a count and entries behind it, as the host hands them out, through every method that
+// Records with a count and trailing entries, as the host allocates them, through every method that
 // reaches an entry by its index.
 //
 // Not tried, because nothing checks it: counts that say more than there is, indexes out of range

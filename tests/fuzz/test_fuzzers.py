@@ -21,7 +21,7 @@ INPUTS = {
 }
 
 FAULTS = {
-    "behind": "AddressSanitizer: heap-buffer-overflow",
+    "past the end": "AddressSanitizer: heap-buffer-overflow",
     "overflow": "runtime error: signed integer overflow",
     "leak": "byte(s) leaked in 1 allocation(s)",
     "hang": "libFuzzer: timeout",

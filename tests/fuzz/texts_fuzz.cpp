@@ -25,7 +25,7 @@ constexpr Wide kLeastSigned = std::numeric_limits<long>::min();
 constexpr Wide kMostSigned = std::numeric_limits<long>::max();
 constexpr Wide kMostUnsigned = std::numeric_limits<unsigned long>::max();
 
-/// What a conversion answers and stores; nothing is stored where it fails.
+/// What a conversion returns and stores; nothing is stored where it fails.
 struct Reading {
   int outcome;
   std::optional<Wide> value;
@@ -47,7 +47,7 @@ int reported_outcome() {
   return PyErr_ExceptionMatches(PyExc_OverflowError) != 0 ? kOutOfRange : kWrongType;
 }
 
-/// An argument of a method, which reports what it cannot read, and the conversion behind it.
+/// An argument of a method, which reports what it cannot read, and the conversion that does.
 template <typename Value>
 Reading read_both(bool (*argument)(PyObject *, Value *, char const *, int, char const *),
                   int (*convert)(PyObject *, Value *), PyObject *object) {

@@ -32,12 +32,12 @@ inline std::string text_of(PyObject *str) {
   return {text, static_cast<size_t>(size)};
 }
 
-/// A record in a block that may go on in front of it and behind it, all bytes alike at first.
+/// A record in a block that may go on before it and after it, all bytes alike at first.
 template <typename Record>
 class Block {
  public:
-  explicit Block(size_t behind = 0, char filling = '\0', size_t in_front = 0)
-      : bytes_(in_front + sizeof(Record) + behind, filling), in_front_(in_front) {}
+  explicit Block(size_t after = 0, char filling = '\0', size_t in_front = 0)
+      : bytes_(in_front + sizeof(Record) + after, filling), in_front_(in_front) {}
 
   Record *get() { return reinterpret_cast<Record *>(bytes_.data() + in_front_); }
   Record *operator->() { return get(); }

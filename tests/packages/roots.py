@@ -86,7 +86,7 @@ class Root:
         self.run("apt-get", "satisfy", "-q", "-y", "--no-install-recommends", dependencies)
 
     def put(self, file: Path, folder: str) -> str:
-        """Copies the file into the folder there; answers its path there."""
+        """Copies the file into the folder there; returns its path there."""
         self.path(folder).mkdir(parents=True, exist_ok=True)
         shutil.copy(file, self.path(folder))
         return f"{folder}/{file.name}"

@@ -32,7 +32,7 @@ def foreign(dependencies: str) -> str:
 
 
 def install(root: Root, debs: List[Path]) -> Set[str]:
-    """Installs the packages, and answers the names of all that apt adds for them."""
+    """Installs the packages, and returns the names of all that apt adds for them."""
     files = [root.put(deb, "/tmp/packages") for deb in debs]
     said = root.run("apt-get", "install", "-q", "-y", "--no-install-recommends", *files)
     return set(re.findall(r"^Setting up ([^ :]+)", said, re.MULTILINE))
@@ -174,8 +174,8 @@ def words_of_the_help(machine: Machine, *above: str) -> Set[str]:
     """Its commands, their commands, and all options."""
     said = machine.root.run(machine.simhostctl, *above, "--help")
     found = set(re.findall(r"^  (--[a-z-]+)", said, re.MULTILINE))
-    _, _, behind = said.partition("Subcommands:\n")
-    for command in re.findall(r"^  ([a-z]+) ", behind.partition("\n\n")[0], re.MULTILINE):
+    _, _, listed = said.partition("Subcommands:\n")
+    for command in re.findall(r"^  ([a-z]+) ", listed.partition("\n\n")[0], re.MULTILINE):
         words = (*above, command)
         found |= {" ".join(words)} | words_of_the_help(machine, *words)
     return found

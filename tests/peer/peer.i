@@ -76,13 +76,13 @@ PyObject *documented_function(char const *documentation) {
   return function;
 }
 
-/* What the function answers on a stack where whatever it does not initialise is the filling. */
+/* What the function returns on a stack where whatever it does not initialise is the filling. */
 PyObject *call_on_used_stack(char filling, PyObject *function, PyObject *arguments) {
   use_stack(filling);
   return PyObject_CallObject(function, arguments);
 }
 
-/* What an initialisation function answers while the interpreter gets no memory for objects. */
+/* What an initialisation function returns while the interpreter gets no memory for objects. */
 PyObject *initialise_without_memory(unsigned long function) {
   PyMemAllocatorEx plenty, none;
   PyObject *module;

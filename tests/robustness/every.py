@@ -94,7 +94,7 @@ def block(position: int) -> int:
 
 
 POOL = 8
-"""The position, behind those of all arguments, of what takes an argument's place."""
+"""The position, after those of all arguments, of what takes an argument's place."""
 
 
 def refresh(positions: int) -> None:

@@ -95,7 +95,7 @@ SYSTEM_ERRORS: List[Rule] = [
         _is_beyond,
     ),
     Rule(
-        "An index of no session answers null without an error.",
+        "An index of no session returns null without an error.",
         r"VSDVMirrorSessionIDs___getitem__",
         _always,
     ),

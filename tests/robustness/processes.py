@@ -72,7 +72,7 @@ def watch(command: List[str], note: Path, patience: float) -> Tuple[Optional[int
 def sweep(
     batch: str, folder: Path, seed: int = 0, seconds: float = 1.0, patience: float = 60.0
 ) -> Tuple[int, List[str]]:
-    """Sweep a batch; a crash or a hang is noted, and the rest goes on behind it.
+    """Sweep a batch; a crash or a hang is noted, and the rest goes on after it.
 
     Returns how many calls there were, and what was wrong.
     """

@@ -3,8 +3,8 @@
 
     stress.py [--minutes N] [--seed N]
 
-First what has an end: every batch of the sweep, then a million calls of every kind and giving up a
-million times on each call, fewer in less than twenty minutes. What has none shares the time that
+First what has an end: every batch of the sweep, then a million calls of every kind and a million
+traps of each call, fewer in less than twenty minutes. What has none shares the time that
 is left: fuzzers, sequences, killed processes and random pairs of values.
 """
 
@@ -111,8 +111,8 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
     for kind in test_repeat.KINDS:
         repeat = whole(program, "repeat.py", "memory", kind, calls)
         yield Part(f"memory, {kind}", "calls", repeat)
-    yield Part("giving up, in turns", "calls", whole(program, "panics.py", "in-turns", calls))
-    yield Part("giving up, in a row", "calls", whole(program, "panics.py", "in-a-row", calls))
+    yield Part("traps, in turns", "calls", whole(program, "traps.py", "in-turns", calls))
+    yield Part("traps, in a row", "calls", whole(program, "traps.py", "in-a-row", calls))
     for name in fuzzing.NAMES:
         share = SHARES["fuzzing"] / len(fuzzing.NAMES)
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
@@ -132,7 +132,7 @@ def _clock(seconds: float) -> str:
 
 
 class Progress:
-    """Says what runs: in one line of a terminal, else in a line for each part."""
+    """Says what is under way: in one line of a terminal, else in a line for each part."""
 
     def __init__(self, minutes: float) -> None:
         self._start = time.monotonic()
@@ -180,7 +180,7 @@ def run_all(seed: int, minutes: float, progress: Progress) -> List[Result]:
             wrong = sum(len(result.wrong) for result in results)
             progress.show(part.name + (f" ({wrong} wrong so far)" if wrong else ""))
             if part.share:
-                # What one takes too much or leaves, those behind it share.
+                # What one takes too much or leaves, those after it share.
                 shares = shares or 1.0
                 seconds = max(1.0, (end - time.monotonic()) * part.share / shares)
                 shares -= part.share

@@ -8,7 +8,7 @@ import pytest
 
 PROGRAM = processes.BUILD / "tests" / "canaries" / "leaking"
 FAULTS = {
-    "behind": "AddressSanitizer: heap-buffer-overflow",
+    "past the end": "AddressSanitizer: heap-buffer-overflow",
     "overflow": "runtime error: signed integer overflow",
     "leak": "LeakSanitizer: detected memory leaks",
 }
@@ -37,7 +37,7 @@ def test_a_program_without_one_is_not() -> None:
 
 @pytest.mark.parametrize(
     "function, report",
-    [("write_behind_a_block", FAULTS["behind"]), ("overflow_an_integer", FAULTS["overflow"])],
+    [("write_past_a_block", FAULTS["past the end"]), ("overflow_an_integer", FAULTS["overflow"])],
 )
 def test_a_module_with_a_fault_is_ended_where_modules_are_instrumented(
     function: str, report: str

@@ -46,13 +46,13 @@ def test_what_is_found_is_told_and_is_status_1(
 
 def test_what_a_program_finds_is_found(monkeypatch: pytest.MonkeyPatch) -> None:
     monkeypatch.setenv("PLANTED", "yes")
-    count, wrong = stress.program("panics.py", "in-turns", "10000")
+    count, wrong = stress.program("traps.py", "in-turns", "10000")
     assert count > 5_000
     assert len(wrong) == 1 and "bytes of the heap" in wrong[0]
 
 
 def test_a_program_that_ends_early_is_found() -> None:
-    count, wrong = stress.program("panics.py", "in-turns", "no number")
+    count, wrong = stress.program("traps.py", "in-turns", "no number")
     assert count == 0
     assert len(wrong) == 1 and "ValueError" in wrong[0]
 

@@ -5,9 +5,9 @@ from pathlib import Path
 from typing import Any, Callable, Dict, List, Optional, Tuple, Union
 
 import _libvswitch as vs
-import doors
+import host_calls
 import host_model
-from doors import HandedOut
+from host_calls import Allocated
 from host_model import Model, Port, Refusals, Switch
 from hypothesis import strategies as st
 from hypothesis.stateful import Bundle, RuleBasedStateMachine, initialize, invariant, rule
@@ -77,7 +77,7 @@ class HostMachine(RuleBasedStateMachine):
     def teardown(self) -> None:
         self.host.clear_faults()
         for address in self.out:
-            doors.give_back(address)
+            host_calls.release(address)
         assert self.host.ledger() == []
 
     @invariant()
@@ -89,7 +89,7 @@ class HostMachine(RuleBasedStateMachine):
     def call(
         self, name: str, refusals: Refusals, make: Callable[..., Any], *arguments: Any
     ) -> Optional[Tuple[Any, ...]]:
-        """Makes a call; what it answers beside its status, or None if it did nothing."""
+        """Makes a call; what it returns beside its status, or None if it did nothing."""
         fault = self._fault_that_hits(name)
         if isinstance(fault, type) and issubclass(fault, Exception):
             try:
@@ -99,13 +99,13 @@ class HostMachine(RuleBasedStateMachine):
                 return None
             raise AssertionError(f"{name} does not raise {fault}")
         made = make(*arguments)
-        answers = list(made) if isinstance(made, (list, tuple)) else [made]
+        returned = list(made) if isinstance(made, (list, tuple)) else [made]
         expected: Refusals = {str(fault)} if fault else refusals or {"QEX_OK"}
-        said = vs.QEX_ReturnStatusToString(answers[0])
-        assert answers[0] in {
+        said = vs.QEX_ReturnStatusToString(returned[0])
+        assert returned[0] in {
             getattr(vs, known) for known in expected
-        }, f"{name}{arguments} answers {said!r} and not {' or '.join(sorted(expected))}"
-        return None if fault or refusals else tuple(answers[1:])
+        }, f"{name}{arguments} returns {said!r} and not {' or '.join(sorted(expected))}"
+        return None if fault or refusals else tuple(returned[1:])
 
     def _fault_that_hits(self, name: str) -> Any:
         if name not in self.faults:
@@ -248,21 +248,26 @@ class HostMachine(RuleBasedStateMachine):
     @rule(alias=aliases)
     def list_uplinks(self, alias: str) -> None:
         refusals = self.model.refusals_of_running(alias)
-        answer = self.call("VSQEX_GetUplinks", refusals, doors.uplinks_of, alias)
+        answer = self.call("VSQEX_GetUplinks", refusals, host_calls.uplinks_of, alias)
         if answer is not None:
             assert sorted(answer[0]) == sorted(self.model.switches[alias].uplinks)
 
-    # Properties, through the typed door and the raw one.
+    # Properties, by the typed calls and the raw ones.
 
-    @rule(alias=aliases, key=st.sampled_from(list(doors.TYPED_OF_SWITCH)), value=numbers)
+    @rule(alias=aliases, key=st.sampled_from(list(host_calls.TYPED_OF_SWITCH)), value=numbers)
     def set_and_get_of_switch(self, alias: str, key: str, value: int) -> None:
-        known, typed = host_model.OF_SWITCH[key], doors.TYPED_OF_SWITCH[key]
+        known, typed = host_model.OF_SWITCH[key], host_calls.TYPED_OF_SWITCH[key]
         owner = self._owner(alias, NO_PORT)
         self._set_and_get(owner, known, typed, host_model.CONFIG, (alias,), value)
 
-    @rule(alias=aliases, port=ports, key=st.sampled_from(list(doors.TYPED_OF_PORT)), value=numbers)
+    @rule(
+        alias=aliases,
+        port=ports,
+        key=st.sampled_from(list(host_calls.TYPED_OF_PORT)),
+        value=numbers,
+    )
     def set_and_get_of_port(self, alias: str, port: str, key: str, value: int) -> None:
-        known, typed = host_model.OF_PORT[key], doors.TYPED_OF_PORT[key]
+        known, typed = host_model.OF_PORT[key], host_calls.TYPED_OF_PORT[key]
         if known.form == "<B":
             value %= 2
         owner = self._owner(alias, port)
@@ -272,7 +277,7 @@ class HostMachine(RuleBasedStateMachine):
         self,
         owner: Tuple[Refusals, host_model.Properties],
         known: host_model.Property,
-        typed: doors.TypedDoor,
+        typed: host_calls.TypedCall,
         kind: str,
         names: Tuple[str, ...],
         value: int,
@@ -292,7 +297,7 @@ class HostMachine(RuleBasedStateMachine):
         data = value if isinstance(value, bytes) else host_model.encoded(key, value)
         refusals, held = self._owner(alias, port)
         name, names = self._raw("Set", alias, port)
-        pointer, length = doors.buffer(data)
+        pointer, length = host_calls.buffer(data)
         given = *names, key, pointer, length, getattr(vs, f"{kind}_PROP_TYPE")
         refusals = refusals | held.refusals_to_set(key, data)
         if self.call(name, refusals, getattr(vs, name), *given) is not None:
@@ -304,7 +309,7 @@ class HostMachine(RuleBasedStateMachine):
         refusals, held = self._owner(alias, port)
         name, names = self._raw("Get", alias, port)
         refusals = refusals | held.refusals_to_find(key)
-        answer = self.call(name, refusals, doors.block_of, getattr(vs, name), *names, key)
+        answer = self.call(name, refusals, host_calls.block_of, getattr(vs, name), *names, key)
         if answer is not None:
             assert answer[0].data == held.all[key][0]
             self._hold(answer[0], keep)
@@ -336,24 +341,24 @@ class HostMachine(RuleBasedStateMachine):
 
     # Memory.
 
-    def _hold(self, block: HandedOut, keep: bool) -> None:
+    def _hold(self, block: Allocated, keep: bool) -> None:
         if keep and block.address:
             self.out.append(block.address)
         else:
-            doors.give_back(block.address)
+            host_calls.release(block.address)
 
-    @rule(door=st.sampled_from(doors.DOORS), which=st.integers(0, 99))
-    def give_back(self, door: str, which: int) -> None:
+    @rule(deallocator=st.sampled_from(host_calls.DEALLOCATORS), which=st.integers(0, 99))
+    def release(self, deallocator: str, which: int) -> None:
         if self.out:
             address = self.out.pop(which % len(self.out))
-            doors.give_back(address, door)
-            self._give_back_again(address, door)
+            host_calls.release(address, deallocator)
+            self._release_again(address, deallocator)
 
-    def _give_back_again(self, address: int, door: str) -> None:
+    def _release_again(self, address: int, deallocator: str) -> None:
         try:
-            doors.give_back(address, door)
+            host_calls.release(address, deallocator)
         except RuntimeError as error:
-            assert f"{door}: the memory at {address:#x} is given back twice" in str(error)
+            assert f"{deallocator}: the memory at {address:#x} is given back twice" in str(error)
         else:
             raise AssertionError("memory is given back twice without a word")
 
@@ -368,7 +373,7 @@ class HostMachine(RuleBasedStateMachine):
     )
     def fix_address(self, alias: str, port: str, mac: bytes, vlan: int, kind: str) -> None:
         refusals = self.model.refusals_to_fix(alias, port, (mac, vlan), kind)
-        make, number = doors.with_entry(vs.VSQEX_SetPortMACTable), self._kind(kind)
+        make, number = host_calls.with_entry(vs.VSQEX_SetPortMACTable), self._kind(kind)
         given = alias, port, mac, vlan, number
         if self.call("VSQEX_SetPortMACTable", refusals, make, *given) is not None:
             self.model.switches[alias].addresses[mac, vlan] = host_model.Seen(
@@ -378,7 +383,7 @@ class HostMachine(RuleBasedStateMachine):
     @rule(alias=aliases, port=ports, mac=macs, vlan=vlans, kind=kinds | st.just("ALL"))
     def clear_address(self, alias: str, port: str, mac: bytes, vlan: int, kind: str) -> None:
         refusals = self.model.refusals_to_clear(alias, port, (mac, vlan), kind)
-        make, number = doors.with_entry(vs.VSQEX_ClearPortMACTable), self._kind(kind)
+        make, number = host_calls.with_entry(vs.VSQEX_ClearPortMACTable), self._kind(kind)
         given = alias, port, mac, vlan, number
         if self.call("VSQEX_ClearPortMACTable", refusals, make, *given) is not None:
             del self.model.switches[alias].addresses[mac, vlan]
@@ -410,11 +415,13 @@ class HostMachine(RuleBasedStateMachine):
         refusals = self.model.refusals_of_running(alias)
         number = self._kind(kind)
         if port is None:
-            answer = self.call("VSQEX_GetTeamMACTable", refusals, doors.team_table, alias, number)
+            answer = self.call(
+                "VSQEX_GetTeamMACTable", refusals, host_calls.team_table, alias, number
+            )
         else:
             refusals = refusals | self.model.refusals_of_port(alias, port)
             given = alias, port, number
-            answer = self.call("VSQEX_GetPortMACTable", refusals, doors.port_table, *given)
+            answer = self.call("VSQEX_GetPortMACTable", refusals, host_calls.port_table, *given)
         if answer is not None:
             assert answer[0] == self._expected_table(alias, port, kind)
 
@@ -450,15 +457,15 @@ class HostMachine(RuleBasedStateMachine):
     @rule(target=images, persistent=st.booleans())
     def write_an_image(self, persistent: bool) -> Tuple[bytes, bool, Dict[str, Switch]]:
         make = vs.DVSQEX_PersistentStateGet if persistent else vs.DVSQEX_StateGet
-        status, block = doors.block_of(make)
+        status, block = host_calls.block_of(make)
         assert status == vs.QEX_OK
-        doors.give_back(block.address)
+        host_calls.release(block.address)
         return block.data, persistent, self.model.image(persistent)
 
     @rule(image=images, by_kernel=st.booleans())
     def read_an_image(self, image: Tuple[bytes, bool, Dict[str, Switch]], by_kernel: bool) -> None:
         data, persistent, switches = image
-        pointer, length = doors.buffer(data)
+        pointer, length = host_calls.buffer(data)
         name = "DVSQEX_StateInit" if by_kernel else "DVSState_ConfigDeserialize"
         refusals = set() if by_kernel or persistent else {"QEX_BAD_PARAM"}
         if self.call(name, refusals, getattr(vs, name), pointer, length) is not None:
@@ -466,7 +473,7 @@ class HostMachine(RuleBasedStateMachine):
 
     @rule(image=images, cut=st.integers(1, 40))
     def read_a_damaged_image(self, image: Tuple[bytes, bool, Dict[str, Switch]], cut: int) -> None:
-        pointer, length = doors.buffer(image[0][:-cut])
+        pointer, length = host_calls.buffer(image[0][:-cut])
         refusals = {"QEX_INVALID_METADATA"} if length else set()
         name = "DVSQEX_StateInit"
         if self.call(name, refusals, vs.DVSQEX_StateInit, pointer, length) is not None:

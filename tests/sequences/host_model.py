@@ -1,6 +1,6 @@
 """What a host is to those who call it: a model in plain Python, made from its description.
 
-A question that begins with `refusals` answers the names of all statuses with which the host may
+A question that begins with `refusals` returns the names of all statuses with which the host may
 refuse a call; with none it does what it is asked. Which of several it names is its own choice.
 """
 
@@ -260,7 +260,7 @@ class Model:
             switch.addresses = {a: s for a, s in switch.addresses.items() if s.gone is None}
 
     def image(self, persistent: bool) -> Dict[str, Switch]:
-        """What an image holds: what callers set, and not what runs."""
+        """What an image holds: what callers set, and not the runtime state."""
         image = Model()
         image.switches = copy.deepcopy(self.switches)
         if persistent:

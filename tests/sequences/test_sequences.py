@@ -2,7 +2,7 @@
 
 from typing import Any, List, Type
 
-import doors
+import host_calls
 import pytest
 import sequences
 from host_machine import HostMachine
@@ -34,12 +34,12 @@ class LostMemory(HostMachine):
         super().__init__()
         self.forgotten: List[int] = []
 
-    def _hold(self, block: doors.HandedOut, keep: bool) -> None:
+    def _hold(self, block: host_calls.Allocated, keep: bool) -> None:
         self.forgotten.append(block.address)
 
     def teardown(self) -> None:
         for address in self.forgotten:
-            doors.give_back(address)
+            host_calls.release(address)
         super().teardown()
 
 

@@ -222,28 +222,35 @@ TEST_F(StateLibrary, AWalkEndsWithWhatItWalksOver) {
 }
 
 // What a callback does that calls the host through the module: the buffer then leads into a frame
-// that is gone when the walk goes on.
-char arm_the_trap(void * /*reached*/, void * /*context*/) {
-  std::memset(&exception_buffer, 0xA5, sizeof exception_buffer);
+// that is gone when the walk goes on. The next callback traps.
+char arm_the_trap_and_trap_later(void * /*reached*/, void *context) {
+  auto *const called = static_cast<int *>(context);
+  if (++*called == 1) {
+    EXPECT_EQ(raised_by([] { VSDVS_FreeMemory(nullptr); }), std::nullopt);
+  } else {
+    VSDVS_FreeMemory(called);
+  }
   return 1;
 }
 
-std::array<unsigned char, sizeof(jmp_buf)> buffer_of_the_trap() {
-  std::array<unsigned char, sizeof(jmp_buf)> bytes{};
-  std::memcpy(bytes.data(), &exception_buffer, bytes.size());
-  return bytes;
-}
-
 TEST_F(StateLibrary, AfterACallbackTheTrapIsTheWalksAgain) {
-  std::memset(&exception_buffer, 0x5A, sizeof exception_buffer);
-  auto const armed = buffer_of_the_trap();
+  ASSERT_EQ(VSDVS_CreateVSwitch("t", nullptr, nullptr, 0, 1, 0, 0, 0), QEX_OK);
+  ASSERT_EQ(VSDVS_AddDVPort("s", "q", 0), QEX_OK);
+  ASSERT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK);
+  ASSERT_EQ(VSDVS_SetMcastFilterMode("s", VS_MCAST_FILTER_MODE_SNOOPING), QEX_OK);
   auto *const handle = DVSState_SwitchFindByAlias("s");
-  DVSState_SwitchForEach(arm_the_trap, nullptr);
-  EXPECT_EQ(buffer_of_the_trap(), armed);
-  DVSState_PortForEach(handle, arm_the_trap, nullptr);
-  EXPECT_EQ(buffer_of_the_trap(), armed);
-  DVSState_GlobalPropForEach(handle, arm_the_trap, nullptr);
-  EXPECT_EQ(buffer_of_the_trap(), armed);
+  int called = 0;
+  auto *const context = &called;
+  EXPECT_TRUE(raised_by([=] { DVSState_SwitchForEach(arm_the_trap_and_trap_later, context); }));
+  EXPECT_EQ(called, 2);
+  called = 0;
+  EXPECT_TRUE(
+      raised_by([=] { DVSState_PortForEach(handle, arm_the_trap_and_trap_later, context); }));
+  EXPECT_EQ(called, 2);
+  called = 0;
+  EXPECT_TRUE(
+      raised_by([=] { DVSState_GlobalPropForEach(handle, arm_the_trap_and_trap_later, context); }));
+  EXPECT_EQ(called, 2);
 }
 
 char give_back_rubbish(void * /*handle*/, void *context) {

@@ -99,7 +99,7 @@ std::string described(Parameter const &parameter, std::uint64_t bits, std::size_
          R"(,"value":)" + value + R"(,"memory":)" + memory + "}";
 }
 
-/** A panic of the recorder's own: a test that goes on would prove nothing. */
+/** A defect of the recorder's own: a test that goes on would prove nothing. */
 [[noreturn]] void give_up(char const *reason) {
   std::fputs(reason, stderr);
   std::abort();

@@ -3,7 +3,7 @@
 
 /**
  * @file
- * What the two recording libraries share: the list of calls so far, and what to answer next.
+ * What the two recording libraries share: the list of calls so far, and what to return next.
  *
  * The first half is for the libraries (see recording.h), the second for the tests, which reach it
  * through ctypes.
@@ -40,10 +40,11 @@ struct Answer {
 void declare(std::string_view function, std::string_view result,
              std::span<Parameter const> parameters) noexcept;
 
-/** Notes one call, fills its output parameters as told, and says what to answer. */
+/** Notes one call, fills its output parameters as told, and says what to return. */
 Answer record(std::string_view name, std::span<Argument const> arguments) noexcept;
 
-/** Gives up on the call in progress, as record() was told; its frames hold nothing to destroy. */
+/** Springs the trap in the call in progress, as record() was told; its frames hold nothing to
+ * destroy. */
 [[noreturn]] void spring() noexcept;
 
 }  // namespace recording
@@ -65,7 +66,7 @@ char const *recorder_functions(void);
 /** The calls since the last reset, in order, as a JSON list. */
 char const *recorder_calls(void);
 
-/** Notes no more calls until the next reset; they are counted and answered as before. */
+/** Notes no more calls until the next reset; they are counted and return as before. */
 void recorder_take_no_notes(void);
 
 /** Sets the result: a sign-extended integer or an address. Without a rule it is 0 or null. */

@@ -3,7 +3,7 @@
 
 /**
  * @file
- * CALL(name) implements a call of the host: it records its arguments and answers as told.
+ * CALL(name) implements a call of the host: it records its arguments and returns as told.
  *
  * All types come from the host's own declaration, so there is nothing here to get wrong.
  */

@@ -60,8 +60,8 @@ static PyObject *leak_memory(PyObject *self, PyObject *none) {
 }
 // NOLINTEND(clang-analyzer-unix.Malloc)
 
-/* The byte behind 20 is the allocator's own rounding: it harms nobody, and is not ours. */
-static PyObject *write_behind_a_block(PyObject *self, PyObject *none) {
+/* The byte after 20 is the allocator's own rounding: it harms nobody, and is not ours. */
+static PyObject *write_past_a_block(PyObject *self, PyObject *none) {
   char volatile *volatile block = malloc(20);
   int volatile size = 20;
   (void)self, (void)none;
@@ -87,7 +87,7 @@ static PyMethodDef methods[] = {
     {"leak_a_reference", leak_a_reference, METH_O, NULL},
     {"leak_an_object", leak_an_object, METH_NOARGS, NULL},
     {"leak_memory", leak_memory, METH_NOARGS, NULL},
-    {"write_behind_a_block", write_behind_a_block, METH_NOARGS, NULL},
+    {"write_past_a_block", write_past_a_block, METH_NOARGS, NULL},
     {"overflow_an_integer", overflow_an_integer, METH_NOARGS, NULL},
     {NULL, NULL, 0, NULL},
 };

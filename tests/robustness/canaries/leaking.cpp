@@ -7,7 +7,7 @@
 
 namespace {
 
-void write_behind_a_block() {
+void write_past_a_block() {
   auto *volatile block = static_cast<char volatile *>(std::malloc(20));
   int volatile const size = 20;
   block[size] = 1;
@@ -29,8 +29,8 @@ void leak_a_block() {
 
 int main(int count, char *arguments[]) {
   std::string_view const fault = count > 1 ? arguments[1] : "";
-  if (fault == "behind") {
-    write_behind_a_block();
+  if (fault == "past the end") {
+    write_past_a_block();
   } else if (fault == "overflow") {
     return overflow_an_integer() == 0 ? 0 : 1;
   } else if (fault == "leak") {

@@ -1,4 +1,4 @@
-"""A host that gives up: the exception it names, and a module that goes on."""
+"""Calls that trap: the exception that the host names, and a module that goes on."""
 
 import calls
 import pytest
@@ -19,7 +19,7 @@ class HostExit(BaseException):
 
 
 GIVING_UP = [
-    (RuntimeError, "the host gave up: größe 100%s%n", 1),
+    (RuntimeError, "the call trapped: größe 100%s%n", 1),
     (ValueError, "", -1),
     (MemoryError, "x" * 5000, 2**31 - 1),
     (HostError, "line\nbreak", 7),
@@ -28,7 +28,7 @@ GIVING_UP = [
 
 
 def answer_something(host: RecordingHost, call: Call) -> None:
-    told = [results.kind(output).answers()[-1].told for output in call.outputs]
+    told = [results.kind(output).samples()[-1].told for output in call.outputs]
     host.answer(call.name, outputs={call.output_position(i): told[i] for i in range(len(told))})
 
 

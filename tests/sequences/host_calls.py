@@ -1,4 +1,4 @@
-"""The module's calls as the machine makes them: values in, values out, memory given back."""
+"""The module's calls as the machine makes them: values in, values out, memory released."""
 
 import ctypes
 from typing import Any, Callable, Dict, List, NamedTuple, Tuple
@@ -19,7 +19,7 @@ class Cell:
         return int(self._held.value or 0)
 
 
-class HandedOut(NamedTuple):
+class Allocated(NamedTuple):
     """A block of the host's memory."""
 
     address: int
@@ -27,7 +27,7 @@ class HandedOut(NamedTuple):
 
 
 Result = Tuple[int, Any]
-"""The status, and what the call answers with QEX_OK."""
+"""The status, and what the call returns with QEX_OK."""
 
 
 def buffer(data: bytes) -> Tuple[Any, int]:
@@ -41,20 +41,20 @@ _kept: List[Any] = []
 
 
 def block_of(call: Callable[..., int], *arguments: Any) -> Result:
-    """A call that hands out bytes through `void **` and `int *`."""
+    """A call that allocates bytes through `void **` and `int *`."""
     place, length = Cell(ctypes.c_void_p, "void **"), Cell(ctypes.c_int, "int *")
     status = call(*arguments, place.pointer, length.pointer)
     if status != vs.QEX_OK:
         return status, None
     data = ctypes.string_at(place.value, length.value) if place.value else b""
-    return status, HandedOut(place.value, data)
+    return status, Allocated(place.value, data)
 
 
-def give_back(address: int, door: str = "DVSQEX_DataFree") -> None:
-    getattr(vs, door)(peer.pointer_object(address, "void *") if address else None)
+def release(address: int, deallocator: str = "DVSQEX_DataFree") -> None:
+    getattr(vs, deallocator)(peer.pointer_object(address, "void *") if address else None)
 
 
-DOORS = ["VSDVS_FreeMemory", "VSQEX_FreeMemory", "DVSQEX_DataFree"]
+DEALLOCATORS = ["VSDVS_FreeMemory", "VSQEX_FreeMemory", "DVSQEX_DataFree"]
 
 
 def get_mtu(alias: str) -> Result:
@@ -63,7 +63,7 @@ def get_mtu(alias: str) -> Result:
 
 
 def get_pair(name: str) -> Callable[..., Result]:
-    """A call that answers its status and one value."""
+    """A call that returns its status and one value."""
 
     def get(*names: str) -> Result:
         status, value = getattr(vs, name)(*names)
@@ -143,7 +143,7 @@ def with_entry(call: Callable[..., int]) -> Callable[..., int]:
     return change
 
 
-class TypedDoor(NamedTuple):
+class TypedCall(NamedTuple):
     """The two calls of a setting, and how they are made."""
 
     setter: str
@@ -152,17 +152,17 @@ class TypedDoor(NamedTuple):
     get: Callable[..., Result]
 
 
-def _door(name: str, set_: Any = None, get: Any = None) -> TypedDoor:
+def _typed(name: str, set_: Any = None, get: Any = None) -> TypedCall:
     setter, getter = f"VSDVS_Set{name}", f"VSDVS_Get{name}"
-    return TypedDoor(setter, set_ or getattr(vs, setter), getter, get or get_pair(getter))
+    return TypedCall(setter, set_ or getattr(vs, setter), getter, get or get_pair(getter))
 
 
-TYPED_OF_SWITCH: Dict[str, TypedDoor] = {
-    "com.quorix.vswitch.mtu": _door("MTU", get=get_mtu),
-    "com.quorix.vswitch.multicastFilter": _door("McastFilterMode"),
+TYPED_OF_SWITCH: Dict[str, TypedCall] = {
+    "com.quorix.vswitch.mtu": _typed("MTU", get=get_mtu),
+    "com.quorix.vswitch.multicastFilter": _typed("McastFilterMode"),
 }
-TYPED_OF_PORT: Dict[str, TypedDoor] = {
-    "com.quorix.vswitch.port.vlanNestedTag": _door("PortNestedVLANTagging"),
-    "com.quorix.vswitch.port.txUplink": _door("TxUplinkAlways"),
-    "com.quorix.vswitch.port.security": _door("PortSecurity", set_security, get_security),
+TYPED_OF_PORT: Dict[str, TypedCall] = {
+    "com.quorix.vswitch.port.vlanNestedTag": _typed("PortNestedVLANTagging"),
+    "com.quorix.vswitch.port.txUplink": _typed("TxUplinkAlways"),
+    "com.quorix.vswitch.port.security": _typed("PortSecurity", set_security, get_security),
 }

@@ -1,9 +1,9 @@
-"""Lets the host give up on one call after another, and reports what goes wrong or grows.
+"""Lets one call after another trap, and reports what goes wrong or grows.
 
-    panics.py in-turns PANICS   all calls take turns, and each is made again when it was given up
-    panics.py in-a-row PANICS   of each call so many, one right after the other
+    traps.py in-turns TRAPS   all calls take turns, and each is made again after its trap
+    traps.py in-a-row TRAPS   of each call so many, one right after the other
 
-Prints a line for each thing that is wrong, and at the end how many times the host gave up.
+Prints a line for each thing that is wrong, and at the end how many traps there were.
 """
 
 import gc
@@ -45,8 +45,8 @@ class Exit(BaseException):
     """No Exception."""
 
 
-class Panic(NamedTuple):
-    """What the host names when it gives up, and what the call raises then."""
+class Trap(NamedTuple):
+    """What the host names in a trap, and what the call raises then."""
 
     type: Type[BaseException]
     text: bytes
@@ -54,21 +54,21 @@ class Panic(NamedTuple):
     """Which of these may depend on the interpreter."""
 
 
-PANICS = [
-    Panic(RuntimeError, b"given up", (RuntimeError,)),
-    Panic(Exit, b"", (Exit,)),
-    Panic(KeyboardInterrupt, b"given up", (KeyboardInterrupt,)),
-    Panic(SystemExit, b"3", (SystemExit,)),
-    Panic(StopIteration, b"x" * 5000, (StopIteration,)),
-    Panic(MemoryError, b"given up", (MemoryError,)),
-    Panic(Failing, b"given up", (ArithmeticError,)),
-    Panic(Demanding, b"given up", (TypeError,)),
-    Panic(UnicodeDecodeError, b"given up", (TypeError,)),
-    Panic(RuntimeError, b"no text: \xff", (RuntimeError, UnicodeDecodeError)),
+TRAPS = [
+    Trap(RuntimeError, b"trapped", (RuntimeError,)),
+    Trap(Exit, b"", (Exit,)),
+    Trap(KeyboardInterrupt, b"trapped", (KeyboardInterrupt,)),
+    Trap(SystemExit, b"3", (SystemExit,)),
+    Trap(StopIteration, b"x" * 5000, (StopIteration,)),
+    Trap(MemoryError, b"trapped", (MemoryError,)),
+    Trap(Failing, b"trapped", (ArithmeticError,)),
+    Trap(Demanding, b"trapped", (TypeError,)),
+    Trap(UnicodeDecodeError, b"trapped", (TypeError,)),
+    Trap(RuntimeError, b"no text: \xff", (RuntimeError, UnicodeDecodeError)),
 ]
 if sys.version_info >= (3, 9):
     # Before, the interpreter itself crashes when it makes such an exception.
-    PANICS.append(Panic(Impostor, b"given up", (TypeError,)))
+    TRAPS.append(Trap(Impostor, b"trapped", (TypeError,)))
 
 
 class Target(NamedTuple):
@@ -83,13 +83,13 @@ def targets() -> Iterator[Target]:
     """Every call that arms the trap."""
     for call in calls.ALL:
         if call.name != "Panic":
-            told = [results.kind(output).answers()[-1].told for output in call.outputs]
+            told = [results.kind(output).samples()[-1].told for output in call.outputs]
             outputs = [(call.output_position(index), value) for index, value in enumerate(told)]
             yield Target(call, call.given(), outputs)
 
 
-def panic(host: RecordingHost, target: Target, chosen: Panic, after_outputs: bool) -> str:
-    """Give up once, then answer; what is wrong, or nothing."""
+def trap(host: RecordingHost, target: Target, chosen: Trap, after_outputs: bool) -> str:
+    """Trap once, then return; what is wrong, or nothing."""
     call = target.call
     host.reset()
     host.answer(call.name, outputs=dict(target.outputs))
@@ -109,13 +109,13 @@ def panic(host: RecordingHost, target: Target, chosen: Panic, after_outputs: boo
     return ""
 
 
-def all_of_them() -> Iterator[Tuple[Target, Panic, bool]]:
-    """Every call with every way of giving up."""
-    return itertools.product(list(targets()), PANICS, (False, True))
+def all_of_them() -> Iterator[Tuple[Target, Trap, bool]]:
+    """Every call with every kind of trap."""
+    return itertools.product(list(targets()), TRAPS, (False, True))
 
 
-def in_a_row(host: RecordingHost, target: Target, chosen: Panic, count: int) -> Iterator[str]:
-    """Give up so many times, before and after the outputs; what is wrong."""
+def in_a_row(host: RecordingHost, target: Target, chosen: Trap, count: int) -> Iterator[str]:
+    """Trap so many times, before and after the outputs; what is wrong."""
     call, leaks = target.call, os.environ.get("PLANTED")
     for after_outputs in (False, True):
         host.reset()
@@ -136,14 +136,14 @@ def in_a_row(host: RecordingHost, target: Target, chosen: Panic, count: int) -> 
 
 
 def each_in_a_row(count: int) -> None:
-    """Give up so many times on each call; the last nine tenths must not need more memory."""
+    """Trap so many times on each call; the last nine tenths must not need more memory."""
     host = RecordingHost()
-    each = max(10, count // len(PANICS) // 2)
+    each = max(10, count // len(TRAPS) // 2)
     done = 0
     for target in targets():
         sizes = []
         for share in (each - each * 9 // 10, each * 9 // 10):
-            for chosen in PANICS:
+            for chosen in TRAPS:
                 for wrong in in_a_row(host, target, chosen, share):
                     say(wrong)
                 done += 2 * share
@@ -163,7 +163,7 @@ def say_what_grows(sizes: List[Tuple[int, int]], where: str = "") -> None:
 
 
 def all_in_turns(count: int) -> None:
-    """Give up so many times, in three parts that must end with the same memory."""
+    """Trap so many times, in three parts that must end with the same memory."""
     host = RecordingHost()
     found = list(all_of_them())
     rounds = max(1, count // 3 // len(found))
@@ -172,7 +172,7 @@ def all_in_turns(count: int) -> None:
     for _ in range(3):
         for _ in range(rounds):
             for target, chosen, after_outputs in found:
-                wrong = panic(host, target, chosen, after_outputs)
+                wrong = trap(host, target, chosen, after_outputs)
                 if wrong:
                     say(wrong)
                 if leaks:
