@@ -45,10 +45,12 @@
 %integer_out(PARAMETER)
 %enddef
 
-// The buffer is handed over as it is, and what comes back is cut whatever the library wrote: behind
-// the bytes that it is promised there is room for as many again, for a text that is too long.
+// A library that writes nothing leaves an empty text, so nothing of the stack shows; more of the buffer
+// is not cleared. What comes back is cut whatever the library wrote: after the bytes that it is
+// promised there is room for as many again, for a text that is too long.
 %define %text_out(PARAMETER, LENGTH)
 %typemap(in, numinputs=0, noblock=1, python="text", room="LENGTH") PARAMETER (char text[2 * (LENGTH + 1)]) {
+  text[0] = '\0';
   $1 = text;
 }
 %typemap(argout, noblock=1, fragment="SWIG_FromCharPtr") PARAMETER {
