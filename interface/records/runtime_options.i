@@ -11,13 +11,13 @@
 %include "vswitch/runtime_options.h"
 
 %extend VSRuntimeOptions {
-  VSRuntimeOptionHeader *add_int_option(VSRuntimeOptionHeader *at, char *option_name, int type,
+  VSRuntimeOptionHeader *add_int_option(VSRuntimeOptionHeader *at, char *name, int type,
                                         int value) {
-    return runtime_options_add_int($self, at, option_name, type, value);
+    return runtime_options_add_int($self, at, name, type, value);
   }
-  VSRuntimeOptionHeader *add_str_option(VSRuntimeOptionHeader *at, char *option_name, int type,
+  VSRuntimeOptionHeader *add_str_option(VSRuntimeOptionHeader *at, char *name, int type,
                                         char *option_text) {
-    return runtime_options_add_text($self, at, option_name, type, option_text);
+    return runtime_options_add_text($self, at, name, type, option_text);
   }
   void set_options_length(int used) { runtime_options_set_length($self, used); }
   VSRuntimeOptionHeader *get_first_option() { return runtime_options_first($self); }
