@@ -23,6 +23,23 @@
 #define FAST_PATHS 0
 #endif
 
+/**
+ * Whether calls come by the interpreter's vectorcall protocol. What the slot of a built-in function
+ * may be used for, and how deep calls are counted, is known of these versions.
+ */
+#if FAST_PATHS && PY_VERSION_HEX >= 0x03080000 && PY_VERSION_HEX < 0x030E0000
+#define VECTOR_CALLS 1
+#else
+#define VECTOR_CALLS 0
+#endif
+
+/** What marks a type whose instances may have a function of the protocol. */
+#if PY_VERSION_HEX >= 0x03090000
+#define HAS_VECTORCALL Py_TPFLAGS_HAVE_VECTORCALL
+#else
+#define HAS_VECTORCALL _Py_TPFLAGS_HAVE_VECTORCALL
+#endif
+
 /** Whether `object` is an int of one digit, and its value, which has less than 31 bits. */
 static inline bool is_small_integer(PyObject *object, int *value) {
 #if FAST_PATHS && PY_VERSION_HEX >= 0x030C0000

@@ -90,6 +90,7 @@
 %include "nebpublic/names.h"
 QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128]);
 %end_calls
+%called_by_tuple(DVSAliasToPortsetName)
 
 // Panic reports and returns, or ends the process: it never springs the trap. Of its arguments only the
 // format is passed on, with a null pointer behind it.
@@ -98,3 +99,4 @@ QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128])
 %shows(QEX_ReturnStatusToString, RESULT, "the process ends")
 %include "vswitch/status_text.h"
 %end_calls
+%called_by_tuple(Panic)

@@ -30,7 +30,7 @@
 // The class that shadows a record: pointers that calls and readers answer become its instances.
 %define %class_registration(NAME)
 %wrapper %{
-SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *SWIGUNUSEDPARM(self), PyObject *args) {
+SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *self, PyObject *args) {
   PyObject *cls = NULL;
   if (!PyArg_UnpackTuple(args, "swigregister", 1, 1, &cls)) return NULL;
   return register_class(SWIGTYPE_p_##NAME, cls);
