@@ -29,9 +29,9 @@ def declarations(header: str) -> List[Tuple[str, str, str]]:
 def definition(result: str, name: str, parameters: str) -> str:
     """A definition that another one replaces."""
     if result == "QEX_ReturnStatus":
-        body = "  return simhost::answer(__func__, [](Call &) { simhost::refuse_unmodelled(); });\n"
+        body = "  return simhost::stateless(__func__, [](Call &) { simhost::refuse_unmodelled(); });\n"
     else:
-        body = "  simhost::run(__func__, [](Call &) { simhost::give_up_unmodelled(); });\n"
+        body = "  simhost::stateless_or_trap(__func__, [](Call &) { simhost::give_up_unmodelled(); });\n"
         if result != "void":
             body += "  return {};\n"
     return f"__attribute__((weak)) {result} {name}({parameters}) {{\n{body}}}\n"

@@ -1,11 +1,16 @@
 // A call's hold on the host.
 #include "abi/call.h"
 
+#include <cstdio>
+#include <cstdlib>
+
 #include "abi/host.h"
 #include "faults/faults.h"
 
 namespace simhost {
 namespace {
+
+constinit thread_local bool call_runs = false;
 
 // The faults that hit the call of a function that is being made now.
 std::vector<Fault> hits_on(std::string_view function) {
@@ -13,12 +18,12 @@ std::vector<Fault> hits_on(std::string_view function) {
   std::scoped_lock const held(host.lock());
   auto &state = host.state();
   {
-    storage::Transaction look(state, storage::Access::read);
+    storage::ReadingTransaction look(state);
     if (!any_fault_waits(look, function)) {
       return {};
     }
   }
-  storage::Transaction transaction(state, storage::Access::write);
+  storage::ChangingTransaction transaction(state);
   auto hits = count_call(transaction, function);
   transaction.commit();
   return hits;
@@ -34,31 +39,26 @@ void inject_faults(std::string_view function) {
   inject(hits);
 }
 
-}  // namespace
-
-Call::Call(char const *name) : name_(name) {
-  inject_faults(name);
-  this_host().lock().lock();
+template <typename Transaction>
+void commit(std::unique_ptr<Transaction> const &transaction) {
+  if (transaction) {
+    transaction->commit();
+  }
 }
 
-Call::Call(char const *name, Resumed /*unused*/) : name_(name) {
+}  // namespace
+
+Call::Call(CallName const &name) : name_(name.text) {
+  if (!name.is_resumed) {
+    inject_faults(name.text);
+  }
   this_host().lock().lock();
+  call_runs = true;
 }
 
 Call::~Call() {
-  transaction_.reset();
+  call_runs = false;
   this_host().lock().unlock();
-}
-
-storage::Transaction &Call::reading() {
-  transaction_ = std::make_unique<storage::Transaction>(this_host().state(), storage::Access::read);
-  return *transaction_;
-}
-
-storage::Transaction &Call::changing() {
-  transaction_ =
-      std::make_unique<storage::Transaction>(this_host().state(), storage::Access::write);
-  return *transaction_;
 }
 
 Ledger &Call::ledger() {
@@ -73,18 +73,39 @@ DataLists &Call::lists() {
   return this_host().lists();
 }
 
-Call::Unlocked::Unlocked() {
-  this_host().lock().unlock();
-}
-
-Call::Unlocked::~Unlocked() {
-  this_host().lock().lock();
-}
-
-void Call::complete() {
-  if (transaction_) {
-    transaction_->commit();
+void require_no_call() noexcept {
+  if (call_runs) {
+    std::fputs("simulated host: code of the caller's must not run within a call\n", stderr);
+    std::abort();
   }
+}
+
+ReadingCall::ReadingCall(CallName const &name) : Call(name) {}
+ReadingCall::~ReadingCall() = default;
+
+storage::ReadingTransaction &ReadingCall::transaction() {
+  if (!transaction_) {
+    transaction_ = std::make_unique<storage::ReadingTransaction>(this_host().state());
+  }
+  return *transaction_;
+}
+
+void ReadingCall::complete() {
+  commit(transaction_);
+}
+
+ChangingCall::ChangingCall(CallName const &name) : Call(name) {}
+ChangingCall::~ChangingCall() = default;
+
+storage::ChangingTransaction &ChangingCall::transaction() {
+  if (!transaction_) {
+    transaction_ = std::make_unique<storage::ChangingTransaction>(this_host().state());
+  }
+  return *transaction_;
+}
+
+void ChangingCall::complete() {
+  commit(transaction_);
 }
 
 }  // namespace simhost

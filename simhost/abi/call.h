@@ -1,13 +1,11 @@
-// One call of the host, from its entry to its answer.
+// One call of the host, from its entry to what it returns: one that reads the state, one that
+// changes it, or one that does neither.
 #pragma once
 
 #include <memory>
 
 #include "base/api.h"
-
-namespace simhost::storage {
-class Transaction;
-}
+#include "storage/store.h"
 
 namespace simhost {
 
@@ -15,48 +13,80 @@ class DataLists;
 class Handles;
 class Ledger;
 
-/// Holds the host's lock for its whole life, so none of the caller's code may run meanwhile. What
-/// it changed in the state is undone when it goes without complete().
+/// The name of a call, which is a literal.
+struct CallName {
+  // NOLINTNEXTLINE(google-explicit-constructor): a literal is what callers have
+  CallName(char const *literal) : text(literal) {}
+  CallName(char const *literal, bool is_resumed) : text(literal), is_resumed(is_resumed) {}
+
+  char const *text;
+  bool is_resumed = false;
+};
+
+/// Goes on with a call after code of the caller's has run in between: it is no further call, so no
+/// fault that waits for one hits it.
+inline CallName resumed(char const *name) {
+  return {name, true};
+}
+
+/// Holds the host's lock for its whole life, so none of the caller's code may run meanwhile.
 class SIMHOST_API Call {
  public:
-  /// `name` is a literal. Throws what a fault that waits for this call says.
-  explicit Call(char const *name);
-  /// Goes on with a call that another Call began and has let go of: it is no further call, so no
-  /// fault that waits for one meets it.
-  struct Resumed {};
-  Call(char const *name, Resumed);
+  /// Throws what a fault that waits for this call says.
+  explicit Call(CallName const &name);
   ~Call();
   Call(Call const &) = delete;
   Call &operator=(Call const &) = delete;
 
   [[nodiscard]] char const *name() const { return name_; }
-  /// The call's one transaction on the state, for a call that only reads or for one that changes
-  /// it.
-  storage::Transaction &reading();
-  storage::Transaction &changing();
   Ledger &ledger();
   Handles &handles();
   DataLists &lists();
-  /// Lets go of the lock while `work` runs, which may then run the caller's code. Not with a
-  /// transaction.
-  template <typename Work>
-  decltype(auto) unlocked(Work const &work) {
-    Unlocked const unlocked;
-    return work();
-  }
-  /// Makes the changes last.
+
+ private:
+  char const *name_;
+};
+
+/// Ends the process with a message while a call runs in this thread: its lock is held.
+SIMHOST_API void require_no_call() noexcept;
+
+/// A call that does not look at the state.
+class StatelessCall : public Call {
+ public:
+  using Call::Call;
+  void complete() {}
+};
+
+/// A call that reads the state.
+class SIMHOST_API ReadingCall : public Call {
+ public:
+  explicit ReadingCall(CallName const &name);
+  ~ReadingCall();
+  ReadingCall(ReadingCall const &) = delete;
+  ReadingCall &operator=(ReadingCall const &) = delete;
+
+  /// The one transaction of the call, which begins when it is first asked for.
+  storage::ReadingTransaction &transaction();
   void complete();
 
  private:
-  struct SIMHOST_API Unlocked {
-    Unlocked();
-    ~Unlocked();
-    Unlocked(Unlocked const &) = delete;
-    Unlocked &operator=(Unlocked const &) = delete;
-  };
+  std::unique_ptr<storage::ReadingTransaction> transaction_;
+};
 
-  char const *name_;
-  std::unique_ptr<storage::Transaction> transaction_;
+/// A call that changes the state; what it changed is undone when it goes without complete().
+class SIMHOST_API ChangingCall : public Call {
+ public:
+  explicit ChangingCall(CallName const &name);
+  ~ChangingCall();
+  ChangingCall(ChangingCall const &) = delete;
+  ChangingCall &operator=(ChangingCall const &) = delete;
+
+  /// The one transaction of the call, which begins when it is first asked for.
+  storage::ChangingTransaction &transaction();
+  void complete();
+
+ private:
+  std::unique_ptr<storage::ChangingTransaction> transaction_;
 };
 
 }  // namespace simhost

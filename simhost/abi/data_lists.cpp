@@ -3,7 +3,9 @@
 
 #include <algorithm>
 #include <new>
+#include <span>
 
+#include "abi/callers_code.h"
 #include "abi/handles.h"
 #include "base/blocks.h"
 #include "base/outcomes.h"
@@ -15,79 +17,102 @@ constexpr std::size_t kRememberedLists = 1024;
 
 }  // namespace
 
-ListMemory::ListMemory(DVSData_MemAlloc alloc, DVSData_MemFree release)
-    : alloc_(alloc), release_(release) {
-  if ((alloc == nullptr) != (release == nullptr)) {
-    throw Refused(QEX_BAD_PARAM);
+// The bytes of the name and the value follow it.
+struct DataList::Item {
+  Item *next;
+  std::size_t name_length;
+  std::size_t value_length;
+  storage::PropertyType type;
+
+  [[nodiscard]] std::byte *bytes() { return reinterpret_cast<std::byte *>(this + 1); }
+  [[nodiscard]] std::byte const *bytes() const {
+    return reinterpret_cast<std::byte const *>(this + 1);
   }
+  [[nodiscard]] std::string_view name() const {
+    return {reinterpret_cast<char const *>(bytes()), name_length};
+  }
+  [[nodiscard]] BytesView value() const { return {bytes() + name_length, value_length}; }
+  [[nodiscard]] std::size_t size() const { return sizeof(Item) + name_length + value_length; }
+};
+
+void *allocate_block(ListMemory const &memory, std::size_t size) {
+  return memory.is_hosts() ? ::operator new(size, std::nothrow) : call_back(memory.alloc, size);
 }
 
-void *ListMemory::do_allocate(std::size_t size, std::size_t /*alignment*/) {
-  auto *const memory = is_hosts() ? ::operator new(size) : alloc_(size);
-  if (memory == nullptr) {
-    throw std::bad_alloc();
-  }
-  in_use_ += size;
-  return memory;
-}
-
-void ListMemory::do_deallocate(void *memory, std::size_t size, std::size_t /*alignment*/) {
-  in_use_ -= size;
-  if (is_hosts()) {
-    ::operator delete(memory);
+void release_block(ListMemory const &memory, void *block) {
+  if (memory.is_hosts()) {
+    ::operator delete(block);
   } else {
-    release_(memory);
+    call_back(memory.release, block);
   }
 }
 
-bool ListMemory::do_is_equal(memory_resource const &other) const noexcept {
-  return this == &other;
-}
-
-DataList *DataList::make(DVSData_MemAlloc alloc, DVSData_MemFree release) {
-  ListMemory memory(alloc, release);
-  auto *const place = memory.allocate(sizeof(DataList), alignof(DataList));
-  return new (place) DataList(ListMemory(alloc, release));
+DataList *DataList::make(void *block, ListMemory const &memory) {
+  return new (block) DataList(memory);
 }
 
 void DataList::destroy(DataList *list) {
-  auto own = list->memory_;
-  list->~DataList();
-  own.deallocate(list, sizeof(DataList), alignof(DataList));
+  auto const memory = list->memory_;
+  while (auto *const item = list->first_) {
+    list->first_ = item->next;
+    release_block(memory, item);
+  }
+  release_block(memory, list);
 }
 
-void *DataList::allocate(std::size_t size) {
-  auto leaving = memory_;
-  return leaving.allocate(size);
+std::size_t DataList::item_size(std::string_view name, BytesView value) {
+  return sizeof(Item) + name.size() + value.size();
 }
 
-void DataList::update(std::string_view name, BytesView value, storage::PropertyType type) {
-  if (name.empty()) {
-    throw Refused(QEX_BAD_PARAM);
+void *DataList::put(void *block, std::string_view name, BytesView value,
+                    storage::PropertyType type) {
+  auto *const item = new (block)
+      Item{.next = nullptr, .name_length = name.size(), .value_length = value.size(), .type = type};
+  auto const name_bytes = std::as_bytes(std::span(name));
+  std::copy(value.begin(), value.end(),
+            std::copy(name_bytes.begin(), name_bytes.end(), item->bytes()));
+  auto **link = &first_;
+  while (*link != nullptr && (*link)->name() != name) {
+    link = &(*link)->next;
   }
-  std::pmr::vector<std::byte> copy(value.begin(), value.end(), &memory_);
-  auto const found = std::find_if(entries_.begin(), entries_.end(),
-                                  [&](Entry const &entry) { return entry.name == name; });
-  if (found != entries_.end()) {
-    found->value = std::move(copy);
-    found->type = type;
-  } else {
-    entries_.push_back({std::pmr::string(name, &memory_), std::move(copy), type});
+  auto *const replaced = *link;
+  item->next = replaced == nullptr ? nullptr : replaced->next;
+  *link = item;
+  return replaced;
+}
+
+std::size_t DataList::size() const {
+  auto size = sizeof(DataList);
+  for (auto const *item = first_; item != nullptr; item = item->next) {
+    size += item->size();
   }
+  return size;
 }
 
 Bytes DataList::serialized(std::uint32_t version) const {
   if (version == 0) {
     throw Refused(QEX_BAD_PARAM);
   }
+  std::uint32_t count = 0;
+  for (auto const *item = first_; item != nullptr; item = item->next) {
+    ++count;
+  }
   Writer writer;
-  writer.number(static_cast<std::uint32_t>(entries_.size()));
-  for (auto const &entry : entries_) {
-    writer.text(entry.name);
-    writer.number(static_cast<std::uint32_t>(entry.type));
-    writer.bytes(entry.value);
+  writer.number(count);
+  for (auto const *item = first_; item != nullptr; item = item->next) {
+    writer.text(item->name());
+    writer.number(static_cast<std::uint32_t>(item->type));
+    writer.bytes(item->value());
   }
   return writer.block(BlockKind::list, version);
+}
+
+OwnedList make_list_of_host() {
+  return OwnedList(DataList::make(::operator new(sizeof(DataList)), {nullptr, nullptr}));
+}
+
+void add_item(DataList &list, std::string_view name, BytesView value, storage::PropertyType type) {
+  ::operator delete(list.put(::operator new(DataList::item_size(name, value)), name, value, type));
 }
 
 void DataLists::add(DataList *list, char const *call) {
@@ -99,7 +124,7 @@ void DataLists::changed(DataList const &list) {
   ledger_.resize(&list, list.size());
 }
 
-DataList &DataLists::known(void *handle) const {
+DataList &DataLists::get_list(void *handle) const {
   if (!lists_.contains(handle)) {
     bool const freed = std::find(freed_.begin(), freed_.end(), handle) != freed_.end();
     throw Trapped(TrapKind::runtime_error,
@@ -110,7 +135,7 @@ DataList &DataLists::known(void *handle) const {
 }
 
 DataList *DataLists::release(void *handle) {
-  auto *const list = &known(handle);
+  auto *const list = &get_list(handle);
   lists_.erase(handle);
   ledger_.forget(handle);
   freed_.push_back(handle);

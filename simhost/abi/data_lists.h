@@ -4,13 +4,9 @@
 #include <cstddef>
 #include <cstdint>
 #include <deque>
-#include <list>
-#include <memory_resource>
-#include <string>
+#include <memory>
 #include <string_view>
 #include <unordered_set>
-#include <utility>
-#include <vector>
 
 #include "abi/ledger.h"
 #include "base/api.h"
@@ -20,62 +16,65 @@
 
 namespace simhost {
 
-/// How a list gets its memory: the caller's two functions, or the host's own way. Throws
-/// std::bad_alloc.
-class ListMemory : public std::pmr::memory_resource {
- public:
-  /// Refuses one function without the other (QEX_BAD_PARAM).
-  ListMemory(DVSData_MemAlloc alloc, DVSData_MemFree release);
+/// How a list gets its memory: the caller's two functions, or the host's own way for null.
+struct ListMemory {
+  DVSData_MemAlloc alloc;
+  DVSData_MemFree release;
 
-  [[nodiscard]] bool is_hosts() const { return alloc_ == nullptr; }
-  /// Bytes that are allocated in it.
-  [[nodiscard]] std::size_t in_use() const { return in_use_; }
-
- private:
-  void *do_allocate(std::size_t size, std::size_t alignment) override;
-  void do_deallocate(void *memory, std::size_t size, std::size_t alignment) override;
-  [[nodiscard]] bool do_is_equal(memory_resource const &other) const noexcept override;
-
-  DVSData_MemAlloc alloc_;
-  DVSData_MemFree release_;
-  std::size_t in_use_ = 0;
+  [[nodiscard]] bool is_hosts() const { return alloc == nullptr; }
 };
 
-/// A list lives, with all that it holds, in its own memory. Its functions run the caller's
-/// allocator, so they are not for use under the host's lock, except with the host's own memory.
+/// These run the caller's code, so no call may be running, unless the memory is the host's. Null if
+/// there is none.
+SIMHOST_API void *allocate_block(ListMemory const &memory, std::size_t size);
+SIMHOST_API void release_block(ListMemory const &memory, void *block);
+
+/// A list is one block of its own kind of memory, and each item is another. It allocates none of
+/// them, so that the caller's allocator runs before the list is changed, and after it.
 class SIMHOST_API DataList {
  public:
-  /// Null for both functions is the host's own way. Refuses one without the other (QEX_BAD_PARAM).
-  static DataList *make(DVSData_MemAlloc alloc, DVSData_MemFree release);
+  /// An empty list in a block of sizeof(DataList) bytes.
+  static DataList *make(void *block, ListMemory const &memory);
+  /// Releases all blocks of a list that nobody knows any more, with release_block().
   static void destroy(DataList *list);
   DataList(DataList const &) = delete;
   DataList &operator=(DataList const &) = delete;
 
-  [[nodiscard]] bool is_in_hosts_memory() const { return memory_.is_hosts(); }
+  /// Bytes of the block of an item.
+  static std::size_t item_size(std::string_view name, BytesView value);
+  /// Adds an item in a block of item_size() bytes, or replaces the one of that name. Returns the
+  /// block of the item that was replaced; null if it is a new one.
+  [[nodiscard]] void *put(void *block, std::string_view name, BytesView value,
+                          storage::PropertyType type);
+
+  [[nodiscard]] ListMemory const &memory() const { return memory_; }
   /// Bytes of the list and all that it holds.
-  [[nodiscard]] std::size_t size() const { return sizeof(DataList) + memory_.in_use(); }
-  /// Memory of the list's kind for a block that leaves it.
-  void *allocate(std::size_t size);
-  /// Adds an item or replaces the one of that name. Refuses no name (QEX_BAD_PARAM).
-  void update(std::string_view name, BytesView value, storage::PropertyType type);
+  [[nodiscard]] std::size_t size() const;
   /// Refuses version 0 (QEX_BAD_PARAM).
   [[nodiscard]] Bytes serialized(std::uint32_t version) const;
 
  private:
-  struct Entry {
-    std::pmr::string name;
-    std::pmr::vector<std::byte> value;
-    storage::PropertyType type;
-  };
+  struct Item;
 
-  explicit DataList(ListMemory memory) : memory_(std::move(memory)), entries_(&memory_) {}
+  explicit DataList(ListMemory const &memory) : memory_(memory) {}
   ~DataList() = default;
 
   ListMemory memory_;
-  std::pmr::list<Entry> entries_;
+  Item *first_ = nullptr;
 };
 
-/// The lists that are out, which the ledger is told of.
+/// For a list in the host's memory.
+struct DestroyList {
+  void operator()(DataList *list) const { DataList::destroy(list); }
+};
+using OwnedList = std::unique_ptr<DataList, DestroyList>;
+
+/// An empty list in the host's memory, and an item more in it. Both throw std::bad_alloc.
+SIMHOST_API OwnedList make_list_of_host();
+SIMHOST_API void add_item(DataList &list, std::string_view name, BytesView value,
+                          storage::PropertyType type);
+
+/// The lists that callers have, which the ledger is told of.
 class DataLists {
  public:
   explicit DataLists(Ledger &ledger) : ledger_(ledger) {}
@@ -84,7 +83,7 @@ class DataLists {
   /// The list holds more or less than before.
   SIMHOST_API void changed(DataList const &list);
   /// These throw Trapped for a list that was never made, or is freed already.
-  [[nodiscard]] SIMHOST_API DataList &known(void *handle) const;
+  [[nodiscard]] SIMHOST_API DataList &get_list(void *handle) const;
   SIMHOST_API DataList *release(void *handle);
 
  private:

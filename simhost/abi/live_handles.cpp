@@ -24,30 +24,30 @@ Found alive(std::optional<Found> found, char const *kind, void const *handle) {
 
 }  // namespace
 
-storage::FoundSwitch live_switch(Call &call, storage::Transaction &transaction,
-                                 void const *handle) {
+storage::FoundSwitch live_switch(ReadingCall &call, void const *handle) {
   auto const key = call.handles().get_switch_key(handle);
-  return alive(storage::find_switch(transaction, key), "switch", handle);
+  return alive(storage::find_switch(call.transaction(), key), "switch", handle);
 }
 
-storage::Port live_port(Call &call, storage::Transaction &transaction, void const *handle) {
+storage::Port live_port(ReadingCall &call, void const *handle) {
   auto const [switch_key, number] = call.handles().get_port_key(handle);
-  return alive(storage::find_port(transaction, switch_key, number), "port", handle);
+  return alive(storage::find_port(call.transaction(), switch_key, number), "port", handle);
 }
 
-void *handle_of_switch(Call &call, std::string_view alias) {
-  auto const found = storage::find_switch(call.reading(), storage::SwitchName::alias, alias);
+void *handle_of_switch(ReadingCall &call, std::string_view alias) {
+  auto const found = storage::find_switch(call.transaction(), storage::SwitchName::alias, alias);
   return found ? call.handles().of_switch(found->key) : nullptr;
 }
 
-void *handle_of_port(Call &call, std::string_view switch_identifier, std::string_view identifier) {
+void *handle_of_port(ReadingCall &call, std::string_view switch_identifier,
+                     std::string_view identifier) {
   auto const found =
-      find_port(call.reading(), storage::SwitchName::identifier, switch_identifier, identifier);
+      find_port(call.transaction(), storage::SwitchName::identifier, switch_identifier, identifier);
   return found ? call.handles().of_port(*found) : nullptr;
 }
 
-void *handle_after(Call &call, storage::SwitchKey &last) {
-  auto const next = storage::next_switch(call.reading(), last);
+void *handle_after(ReadingCall &call, storage::SwitchKey &last) {
+  auto const next = storage::next_switch(call.transaction(), last);
   if (!next) {
     return nullptr;
   }
@@ -55,8 +55,8 @@ void *handle_after(Call &call, storage::SwitchKey &last) {
   return call.handles().of_switch(last);
 }
 
-void *handle_after(Call &call, storage::SwitchKey switch_key, storage::PortNumber &last) {
-  auto const next = storage::next_port(call.reading(), switch_key, last);
+void *handle_after(ReadingCall &call, storage::SwitchKey switch_key, storage::PortNumber &last) {
+  auto const next = storage::next_port(call.transaction(), switch_key, last);
   if (!next) {
     return nullptr;
   }

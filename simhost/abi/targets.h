@@ -38,36 +38,36 @@ inline NamedPort port_of(NamedSwitch const &owner, char const *identifier) {
 }
 
 /// These refuse what is not there (QEX_NOT_FOUND).
-inline storage::SwitchKey found(storage::Transaction &transaction, NamedSwitch const &target) {
+inline storage::SwitchKey get_target(storage::Transaction &transaction, NamedSwitch const &target) {
   return get_switch(transaction, target.name, target.kind).key;
 }
-inline storage::Port found(storage::Transaction &transaction, NamedPort const &target) {
-  return get_port(transaction, found(transaction, target.owner), target.identifier);
+inline storage::Port get_target(storage::Transaction &transaction, NamedPort const &target) {
+  return get_port(transaction, get_target(transaction, target.owner), target.identifier);
 }
 inline storage::PropertyOwner owner_of(storage::Transaction &transaction,
                                        NamedSwitch const &target) {
-  return storage::PropertyOwner::global(found(transaction, target));
+  return storage::PropertyOwner::global(get_target(transaction, target));
 }
 inline storage::PropertyOwner owner_of(storage::Transaction &transaction, NamedPort const &target) {
-  return owner_of(found(transaction, target));
+  return owner_of(get_target(transaction, target));
 }
 
 template <typename Target, typename Record>
-Record read(Call &call, Target const &target, RecordProperty<Record> const &property) {
-  auto &transaction = call.reading();
+Record read(ReadingCall &call, Target const &target, RecordProperty<Record> const &property) {
+  auto &transaction = call.transaction();
   return read(transaction, owner_of(transaction, target), property);
 }
 
 template <typename Target, typename Record>
-void write(Call &call, Target const &target, RecordProperty<Record> const &property,
+void write(ChangingCall &call, Target const &target, RecordProperty<Record> const &property,
            Record const &record) {
-  auto &transaction = call.changing();
+  auto &transaction = call.transaction();
   write(transaction, owner_of(transaction, target), property, record);
 }
 
 template <typename Target>
-void reset(Call &call, Target const &target, std::string_view key) {
-  auto &transaction = call.changing();
+void reset(ChangingCall &call, Target const &target, std::string_view key) {
+  auto &transaction = call.transaction();
   reset_property(transaction, owner_of(transaction, target), key);
 }
 

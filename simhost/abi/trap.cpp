@@ -123,17 +123,16 @@ void spring_trap(TrapReport const &report) noexcept {
   longjmp(exception_buffer, 1);
 }
 
-char call_back(char (*callback)(void *, void *), void *reached, void *context) {
-  jmp_buf armed;
-  bool const is_armed = trap_is_there();
-  if (is_armed) {
-    std::memcpy(&armed, &exception_buffer, sizeof armed);
+void save_trap(SavedTrap &saved) noexcept {
+  if (trap_is_there()) {
+    std::memcpy(&saved.buffer, &exception_buffer, sizeof saved.buffer);
   }
-  char const answer = callback(reached, context);
-  if (is_armed) {
-    std::memcpy(&exception_buffer, &armed, sizeof armed);
+}
+
+void restore_trap(SavedTrap const &saved) noexcept {
+  if (trap_is_there()) {
+    std::memcpy(&exception_buffer, &saved.buffer, sizeof saved.buffer);
   }
-  return answer;
 }
 
 }  // namespace simhost

@@ -1,5 +1,7 @@
-// Springing the call trap.
+// The call trap: springing it, and keeping where it leads.
 #pragma once
+
+#include <setjmp.h>
 
 #include <array>
 #include <string_view>
@@ -9,15 +11,15 @@
 
 namespace simhost {
 
-/// Why the host gives up on a call. Plain memory: a jump may leave it behind.
+/// Why a call traps. Plain memory: a jump may leave it behind.
 struct TrapReport {
   TrapKind kind;
   std::array<char, 1024> text;  ///< UTF-8 with its NUL
 };
 
 /// Writes "<call>: <message>", or the message alone without a call, into the report: cut at its
-/// size between two characters, and with a
-/// "?" for each byte that is no UTF-8, because the interpreter refuses a text with such bytes.
+/// size between two characters, and with a "?" for each byte that is no UTF-8, because the
+/// interpreter refuses a text with such bytes.
 void describe(TrapReport &report, TrapKind kind, std::string_view call,
               std::string_view message) noexcept;
 
@@ -26,8 +28,12 @@ void describe(TrapReport &report, TrapKind kind, std::string_view call,
 /// destroying.
 [[noreturn]] SIMHOST_API void spring_trap(TrapReport const &report) noexcept;
 
-/// What a function of the caller's answers. It may call the host, for which the trap is armed anew:
-/// afterwards the trap leads again to where it led before.
-SIMHOST_API char call_back(char (*callback)(void *, void *), void *reached, void *context);
+/// Where the trap leads. Plain memory, so that code of the caller's may jump over it.
+struct SavedTrap {
+  jmp_buf buffer;
+};
+
+SIMHOST_API void save_trap(SavedTrap &saved) noexcept;
+SIMHOST_API void restore_trap(SavedTrap const &saved) noexcept;
 
 }  // namespace simhost

@@ -76,4 +76,16 @@ class Transaction {
   bool open_ = true;
 };
 
+/// A transaction that only reads the state.
+class ReadingTransaction : public Transaction {
+ public:
+  explicit ReadingTransaction(Store &store) : Transaction(store, Access::read) {}
+};
+
+/// A transaction that changes the state: what changes it takes one of these.
+class ChangingTransaction : public Transaction {
+ public:
+  explicit ChangingTransaction(Store &store) : Transaction(store, Access::write) {}
+};
+
 }  // namespace simhost::storage

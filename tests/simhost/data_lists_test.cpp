@@ -7,6 +7,7 @@
 #include <array>
 #include <cstdlib>
 #include <string>
+#include <utility>
 
 #include "address_text.h"
 #include "configured_switch.h"
@@ -73,6 +74,92 @@ TEST_F(DataLists, AnAllocatorMayRunDry) {
     }
     EXPECT_EQ(status, done ? QEX_OK : QEX_NO_MEMORY);
     EXPECT_EQ(blocks_out, 0);
+  }
+}
+
+// Allocators that call the host, or worse.
+void *alloc_and_call_the_host(size_t size) {
+  lead_the_trap_elsewhere();
+  return std::malloc(size);
+}
+
+void free_and_call_the_host(void *memory) {
+  lead_the_trap_elsewhere();
+  std::free(memory);
+}
+
+TEST_F(DataLists, AfterAnAllocatorTheTrapIsTheCallsAgain) {
+  static DVSDataHandle list = nullptr;
+  static void *bytes = nullptr;
+  static qex_uint32 length = 0;
+  auto const misuse = [] { DVSData_Name(&length); };
+  EXPECT_TRUE(keeps_the_trap(
+      [] { DVSData_Alloc(&list, alloc_and_call_the_host, free_and_call_the_host); }, misuse));
+  auto const update = [] { DVSData_Update(list, "n", &length, 4, CONFIG_PROP_TYPE); };
+  EXPECT_TRUE(keeps_the_trap(update, misuse));
+  EXPECT_TRUE(keeps_the_trap(update, misuse)) << "which frees what it replaces";
+  EXPECT_TRUE(keeps_the_trap([] { DVSData_Serialize(list, &bytes, &length, 200); }, misuse));
+  std::free(bytes);
+  EXPECT_TRUE(keeps_the_trap([] { DVSData_Free(list); }, misuse));
+  EXPECT_EQ(simhost_ledger_count(), 0U);
+}
+
+// What an allocator does next, once, to the list that memory is wanted for.
+DVSDataHandle meddled_with = nullptr;
+void (*meddle)() = nullptr;
+
+void *alloc_and_meddle(size_t size) {
+  if (auto const once = std::exchange(meddle, nullptr)) {
+    raised_by([=] { once(); });
+  }
+  return counted_alloc(size);
+}
+
+struct MeddlingAllocator : DataLists {
+  MeddlingAllocator() {
+    blocks_left = 1000;
+    EXPECT_EQ(DVSData_Alloc(&meddled_with, alloc_and_meddle, counted_free), QEX_OK);
+  }
+};
+
+QEX_ReturnStatus update_meddled_with(char const *name) {
+  return DVSData_Update(meddled_with, name, &meddled_with, 8, CONFIG_PROP_TYPE);
+}
+
+TEST_F(MeddlingAllocator, MayChangeTheListThatItAllocatesFor) {
+  meddle = [] { EXPECT_EQ(update_meddled_with("inner"), QEX_OK); };
+  EXPECT_EQ(update_meddled_with("outer"), QEX_OK);
+  void *bytes = nullptr;
+  qex_uint32 length = 0;
+  meddle = [] { EXPECT_EQ(update_meddled_with("more"), QEX_OK); };
+  EXPECT_EQ(DVSData_Serialize(meddled_with, &bytes, &length, 200), QEX_BUSY);
+  ASSERT_EQ(DVSData_Serialize(meddled_with, &bytes, &length, 200), QEX_OK);
+  EXPECT_THAT(std::string(static_cast<char *>(bytes), length),
+              testing::AllOf(testing::HasSubstr("inner"), testing::HasSubstr("outer"),
+                             testing::HasSubstr("more")));
+  counted_free(bytes);
+  DVSData_Free(meddled_with);
+  EXPECT_EQ(blocks_out, 0);
+}
+
+TEST_F(MeddlingAllocator, MayFreeTheListThatItAllocatesFor) {
+  meddle = [] { DVSData_Free(meddled_with); };
+  EXPECT_EQ(
+      raised_by([] { update_meddled_with("n"); }),
+      gave_up_with("DVSData_Update: the list " + text_of(meddled_with) + " is freed already"));
+  EXPECT_EQ(std::exchange(blocks_out, 0), 1) << "what it allocated for a list that was gone";
+}
+
+void *alloc_and_jump(size_t /*size*/) {
+  DVSData_Name(&meddled_with);
+  return nullptr;
+}
+
+TEST_F(DataLists, AnAllocatorMayTrap) {
+  for (int round = 0; round < 100; ++round) {
+    ASSERT_TRUE(
+        raised_by([] { DVSData_Alloc(&meddled_with, alloc_and_jump, counted_free); }).has_value());
+    ASSERT_EQ(VSDVS_SetMTU("s", 9000), QEX_OK) << "the host goes on";
   }
 }
 

@@ -1,6 +1,7 @@
 // Calling the host the way the module does: with the trap armed.
 #pragma once
 
+#include <cstring>
 #include <optional>
 #include <ostream>
 #include <string>
@@ -37,4 +38,29 @@ std::optional<Raised> raised_by(Call const &call) {
   }
   call();
   return std::nullopt;
+}
+
+/// Where the trap leads after lead_the_trap_elsewhere(), which is to be no frame of a call.
+inline jmp_buf elsewhere;
+
+/// What code of a caller's does to the trap by calling the host through the module.
+inline void lead_the_trap_elsewhere() {
+  std::memcpy(&exception_buffer, &elsewhere, sizeof exception_buffer);
+}
+
+/// Whether `call` leaves the trap where it was armed for it, although the code that it runs leads
+/// it elsewhere: `misuse`, which traps, lands where it would have landed before.
+template <typename Call, typename Misuse>
+bool keeps_the_trap(Call const &call, Misuse const &misuse) {
+  static bool landed;
+  landed = false;
+  auto const went_elsewhere = raised_by([&] {
+    std::memcpy(&elsewhere, &exception_buffer, sizeof elsewhere);
+    raised_by([&] {
+      call();
+      misuse();
+    });
+    landed = true;
+  });
+  return landed && !went_elsewhere.has_value();
 }

@@ -25,7 +25,7 @@ inline void *require_handle(void *handle) {
   return handle;
 }
 
-/// Where a call hands bytes out.
+/// Where a call returns bytes that it allocates.
 struct Output {
   void **data;
   int *length;

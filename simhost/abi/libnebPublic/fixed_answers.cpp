@@ -5,17 +5,17 @@
 #include "abi/targets.h"
 #include "nebpublic/kernel_state.h"
 
-using simhost::answer;
-using simhost::Call;
-
 // No switch here has commands of its own.
+using simhost::reading;
+using simhost::ReadingCall;
+
 extern "C" QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command,
                                            void * /*input*/, int /*inputLength*/,
                                            void ** /*output*/, int * /*outputLength*/) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = simhost::switch_identified(switchId);
     simhost::require_text(command);
-    simhost::found(call.reading(), target);
+    simhost::get_target(call.transaction(), target);
     simhost::refuse(QEX_NOT_SUPPORTED);
   });
 }

@@ -7,23 +7,20 @@
 #include "nebpublic/data.h"
 #include "vswitch/properties.h"
 
-using simhost::Call;
-
 namespace {
 
+using simhost::Call;
+using simhost::reading_or_trap;
+using simhost::ReadingCall;
 using simhost::storage::Switch;
 
 // What `result_of` makes of a switch; `nothing` for a null handle.
 template <typename Result, typename ResultOf>
 Result of_switch(char const *name, DVSwitchHandle handle, Result nothing,
                  ResultOf const &result_of) {
-  auto result = nothing;
-  simhost::run(name, [&](Call &call) {
-    if (handle != nullptr) {
-      result = result_of(call, simhost::live_switch(call, call.reading(), handle).row);
-    }
+  return reading_or_trap(name, [&](ReadingCall &call) {
+    return handle == nullptr ? nothing : result_of(call, simhost::live_switch(call, handle).row);
   });
-  return result;
 }
 
 }  // namespace
@@ -58,29 +55,20 @@ NEBVersion DVS_Version(DVSwitchHandle handle) {
 }
 
 char const *DVS_PortId(DVSPortHandle handle) {
-  char const *identifier = nullptr;
-  simhost::run(__func__, [&](Call &call) {
-    if (handle != nullptr) {
-      identifier =
-          call.handles().lasting(simhost::live_port(call, call.reading(), handle).identifier);
-    }
+  return reading_or_trap(__func__, [&](ReadingCall &call) -> char const * {
+    return handle == nullptr ? nullptr
+                             : call.handles().lasting(simhost::live_port(call, handle).identifier);
   });
-  return identifier;
 }
 
 char const *DVS_PortAlias(DVSPortHandle handle) {
-  char const *alias = nullptr;
-  simhost::run(__func__, [&](Call &call) {
+  return reading_or_trap(__func__, [&](ReadingCall &call) -> char const * {
     if (handle == nullptr) {
-      return;
+      return nullptr;
     }
-    auto &transaction = call.reading();
-    auto const port = simhost::live_port(call, transaction, handle);
-    if (auto const text = simhost::alias_of(transaction, port)) {
-      alias = call.handles().lasting(*text);
-    }
+    auto const alias = simhost::alias_of(call.transaction(), simhost::live_port(call, handle));
+    return alias ? call.handles().lasting(*alias) : nullptr;
   });
-  return alias;
 }
 
 }  // extern "C"

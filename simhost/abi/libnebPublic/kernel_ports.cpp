@@ -9,24 +9,26 @@
 #include "storage/store.h"
 #include "vswitch/mirror.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
 using simhost::Extent;
 using simhost::port_of;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::switch_identified;
 
 namespace {
 
-QEX_ReturnStatus hand_out_port(char const *name, char const *switch_id, char const *port,
-                               Extent extent, NEBVersion version, void **state, int *length) {
-  return answer(name, [&](Call &call) {
+QEX_ReturnStatus return_port(char const *name, char const *switch_id, char const *port,
+                             Extent extent, NEBVersion version, void **state, int *length) {
+  return reading(name, [&](ReadingCall &call) {
     auto const target = port_of(switch_identified(switch_id), port);
     auto const output = simhost::output_at(state, length);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const image =
-        simhost::port_image(transaction, simhost::found(transaction, target), extent, version);
+        simhost::port_image(transaction, simhost::get_target(transaction, target), extent, version);
     simhost::allocate_copy(call, output, image);
   });
 }
@@ -37,12 +39,12 @@ extern "C" {
 
 QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *state,
                                 int stateLength) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_identified(switchId), port);
     auto const image = simhost::argument_bytes(state, stateLength);
-    auto &transaction = call.changing();
+    auto &transaction = call.transaction();
     auto const added = simhost::add_client_port(
-        transaction, simhost::found(transaction, target.owner), target.identifier);
+        transaction, simhost::get_target(transaction, target.owner), target.identifier);
     if (!image.empty()) {
       simhost::load_port(transaction, added, image);
     }
@@ -50,29 +52,29 @@ QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *st
 }
 
 QEX_ReturnStatus DVSQEX_PortRemove(char const *switchId, char const *port) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_identified(switchId), port);
-    auto &transaction = call.changing();
-    simhost::remove_port(transaction, simhost::found(transaction, target));
+    auto &transaction = call.transaction();
+    simhost::remove_port(transaction, simhost::get_target(transaction, target));
   });
 }
 
 QEX_ReturnStatus DVSQEX_PortFind(char const *switchId, char const *port) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = port_of(switch_identified(switchId), port);
-    simhost::found(call.reading(), target);
+    simhost::get_target(call.transaction(), target);
   });
 }
 
 QEX_ReturnStatus DVSQEX_PortGetByExternalId(char const *switchId, char const *externalId,
                                             OpaqueDVPortData **port) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = switch_identified(switchId);
     auto const external = require_text(externalId);
     auto &output = require(port);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const found =
-        simhost::get_external_port(transaction, simhost::found(transaction, target), external);
+        simhost::get_external_port(transaction, simhost::get_target(transaction, target), external);
     OpaqueDVPortData data{};
     simhost::put_text(data.dvPortId, found.identifier);
     simhost::put_text(data.externalId, external);
@@ -82,13 +84,12 @@ QEX_ReturnStatus DVSQEX_PortGetByExternalId(char const *switchId, char const *ex
 
 QEX_ReturnStatus DVSQEX_PortStateGet(char const *switchId, char const *port, void **state,
                                      int *length) {
-  return hand_out_port(__func__, switchId, port, Extent::whole, VS_YKT_NEB_VERSION_20, state,
-                       length);
+  return return_port(__func__, switchId, port, Extent::whole, VS_YKT_NEB_VERSION_20, state, length);
 }
 
 QEX_ReturnStatus DVSQEX_PersistentPortStateGet(char const *switchId, char const *port,
                                                NEBVersion version, void **state, int *length) {
-  return hand_out_port(__func__, switchId, port, Extent::persistent, version, state, length);
+  return return_port(__func__, switchId, port, Extent::persistent, version, state, length);
 }
 
 }  // extern "C"

@@ -1,6 +1,5 @@
 // DVSQEX_*: properties by their keys, one by one and as lists.
 #include <array>
-#include <memory>
 
 #include "abi/boundary.h"
 #include "abi/data_lists.h"
@@ -12,10 +11,12 @@
 #include "nebpublic/kernel_state.h"
 #include "storage/store.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
 using simhost::KeyFamily;
 using simhost::port_of;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::switch_identified;
@@ -34,19 +35,19 @@ struct UplinkPort {
 };
 
 PropertyOwner owner_of(Transaction &transaction, HostPart const &target) {
-  return PropertyOwner::host(simhost::found(transaction, target.owner));
+  return PropertyOwner::host(simhost::get_target(transaction, target.owner));
 }
 PropertyOwner owner_of(Transaction &transaction, UplinkPort const &target) {
-  auto const key = simhost::found(transaction, target.owner);
+  auto const key = simhost::get_target(transaction, target.owner);
   return simhost::owner_of(simhost::get_uplink_port(transaction, key, target.number));
 }
 using simhost::owner_of;
 
 template <typename Target>
-void get(Call &call, Target const &target, char const *key, void **data, int *length) {
+void get(ReadingCall &call, Target const &target, char const *key, void **data, int *length) {
   auto const name = require_text(key);
   auto const output = simhost::output_at(data, length);
-  auto &transaction = call.reading();
+  auto &transaction = call.transaction();
   auto const property = simhost::get_property(transaction, owner_of(transaction, target), name);
   if (!property) {
     simhost::refuse(QEX_NOT_FOUND);
@@ -55,19 +56,19 @@ void get(Call &call, Target const &target, char const *key, void **data, int *le
 }
 
 template <typename Target>
-void set(Call &call, Target const &target, char const *key, void const *data, int length,
+void set(ChangingCall &call, Target const &target, char const *key, void const *data, int length,
          qex_uint32 type) {
   auto const name = require_text(key);
   auto const value = simhost::argument_bytes(data, length);
   auto const get_type = simhost::property_type(type);
-  auto &transaction = call.changing();
+  auto &transaction = call.transaction();
   simhost::set_property(transaction, owner_of(transaction, target), name, value, get_type);
 }
 
 template <typename Target>
-void clear(Call &call, Target const &target, char const *key) {
+void clear(ChangingCall &call, Target const &target, char const *key) {
   auto const name = require_text(key);
-  auto &transaction = call.changing();
+  auto &transaction = call.transaction();
   simhost::clear_property(transaction, owner_of(transaction, target), name);
 }
 
@@ -82,22 +83,22 @@ void add_chosen(simhost::DataList &list, Transaction &transaction, PropertyOwner
   for (auto const &[name, property] : simhost::list_properties(transaction, owner)) {
     if (simhost::family_of(name) == choice.family &&
         (static_cast<qex_uint32>(property.type) & choice.types) != 0) {
-      list.update(name, property.value, property.type);
+      simhost::add_item(list, name, property.value, property.type);
     }
   }
 }
 
 // A list in the host's own memory of what the owners have; where two have it, of the last.
 template <typename... Targets>
-void make_list(Call &call, DVSDataHandle *output, Choice const &choice, Targets const &...targets) {
+void make_list(ReadingCall &call, DVSDataHandle *output, Choice const &choice,
+               Targets const &...targets) {
   auto &handle = require(output);
   if (choice.types == 0 || (choice.types & ~qex_uint32{ALL_PROP_TYPE}) != 0) {
     simhost::refuse(QEX_BAD_PARAM);
   }
-  auto &transaction = call.reading();
+  auto &transaction = call.transaction();
   std::array const owners{owner_of(transaction, targets)...};
-  std::unique_ptr<simhost::DataList, decltype(&simhost::DataList::destroy)> made(
-      simhost::DataList::make(nullptr, nullptr), &simhost::DataList::destroy);
+  auto made = simhost::make_list_of_host();
   for (auto const &owner : owners) {
     add_chosen(*made, transaction, owner, choice);
   }
@@ -111,83 +112,87 @@ extern "C" {
 
 QEX_ReturnStatus DVSQEX_GlobalPropGet(char const *switchId, char const *key, void **data,
                                       int *length) {
-  return answer(__func__,
-                [&](Call &call) { get(call, switch_identified(switchId), key, data, length); });
+  return reading(__func__, [&](ReadingCall &call) {
+    get(call, switch_identified(switchId), key, data, length);
+  });
 }
 
 QEX_ReturnStatus DVSQEX_GlobalPropSet(char const *switchId, char const *key, void *data, int length,
                                       qex_uint32 propertyType) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     set(call, switch_identified(switchId), key, data, length, propertyType);
   });
 }
 
 QEX_ReturnStatus DVSQEX_GlobalPropClear(char const *switchId, char const *key) {
-  return answer(__func__, [&](Call &call) { clear(call, switch_identified(switchId), key); });
+  return changing(__func__,
+                  [&](ChangingCall &call) { clear(call, switch_identified(switchId), key); });
 }
 
 QEX_ReturnStatus DVSQEX_HostPropGet(char const *switchId, char const *key, void **data,
                                     int *length) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     get(call, HostPart{switch_identified(switchId)}, key, data, length);
   });
 }
 
 QEX_ReturnStatus DVSQEX_HostPropSet(char const *switchId, char const *key, void *data, int length,
                                     qex_uint32 propertyType) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     set(call, HostPart{switch_identified(switchId)}, key, data, length, propertyType);
   });
 }
 
 QEX_ReturnStatus DVSQEX_HostPropClear(char const *switchId, char const *key) {
-  return answer(__func__,
-                [&](Call &call) { clear(call, HostPart{switch_identified(switchId)}, key); });
+  return changing(__func__, [&](ChangingCall &call) {
+    clear(call, HostPart{switch_identified(switchId)}, key);
+  });
 }
 
 QEX_ReturnStatus DVSQEX_PortDataGet(char const *switchId, char const *port, char const *key,
                                     void **data, int *length) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     get(call, port_of(switch_identified(switchId), port), key, data, length);
   });
 }
 
 QEX_ReturnStatus DVSQEX_PortDataSet(char const *switchId, char const *port, char const *key,
                                     void *data, int length, qex_uint32 propertyType) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     set(call, port_of(switch_identified(switchId), port), key, data, length, propertyType);
   });
 }
 
 QEX_ReturnStatus DVSQEX_PortDataClear(char const *switchId, char const *port, char const *key) {
-  return answer(__func__,
-                [&](Call &call) { clear(call, port_of(switch_identified(switchId), port), key); });
+  return changing(__func__, [&](ChangingCall &call) {
+    clear(call, port_of(switch_identified(switchId), port), key);
+  });
 }
 
 QEX_ReturnStatus DVSQEX_UplinkDataGet(char const *switchId, char const *key, qex_uint32 portID,
                                       void **data, int *length) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     get(call, UplinkPort{switch_identified(switchId), portID}, key, data, length);
   });
 }
 
 QEX_ReturnStatus DVSQEX_UplinkDataSet(char const *switchId, char const *key, qex_uint32 portID,
                                       void *data, int length, qex_uint32 propertyType) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     set(call, UplinkPort{switch_identified(switchId), portID}, key, data, length, propertyType);
   });
 }
 
 QEX_ReturnStatus DVSQEX_VendorGlobalPropList(char const *switchId, DVSDataHandle *list,
                                              qex_uint32 propertyTypes) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     make_list(call, list, {KeyFamily::vendor, propertyTypes}, switch_identified(switchId));
   });
 }
 
 QEX_ReturnStatus DVSQEX_VendorHostPropList(char const *switchId, DVSDataHandle *list,
                                            qex_uint32 propertyTypes) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     make_list(call, list, {KeyFamily::vendor, propertyTypes},
               HostPart{switch_identified(switchId)});
   });
@@ -195,7 +200,7 @@ QEX_ReturnStatus DVSQEX_VendorHostPropList(char const *switchId, DVSDataHandle *
 
 QEX_ReturnStatus DVSQEX_VendorPortPropList(char const *switchId, char const *port,
                                            DVSDataHandle *list, qex_uint32 propertyTypes) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     make_list(call, list, {KeyFamily::vendor, propertyTypes},
               port_of(switch_identified(switchId), port));
   });
@@ -203,7 +208,7 @@ QEX_ReturnStatus DVSQEX_VendorPortPropList(char const *switchId, char const *por
 
 QEX_ReturnStatus DVSQEX_ExtraConfigPropList(char const *switchId, DVSDataHandle *list,
                                             qex_uint32 propertyTypes) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = switch_identified(switchId);
     make_list(call, list, {KeyFamily::extra, propertyTypes}, target, HostPart{target});
   });
@@ -211,7 +216,7 @@ QEX_ReturnStatus DVSQEX_ExtraConfigPropList(char const *switchId, DVSDataHandle 
 
 QEX_ReturnStatus DVSQEX_ExtraConfigPortPropList(char const *switchId, char const *port,
                                                 DVSDataHandle *list, qex_uint32 propertyTypes) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     make_list(call, list, {KeyFamily::extra, propertyTypes},
               port_of(switch_identified(switchId), port));
   });

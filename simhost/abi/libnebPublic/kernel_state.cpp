@@ -5,16 +5,20 @@
 #include "abi/libnebPublic/arguments.h"
 #include "model/state/images.h"
 
-using simhost::answer;
 using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
 using simhost::Extent;
+using simhost::reading;
+using simhost::ReadingCall;
+using simhost::stateless_or_trap;
 
 namespace {
 
-QEX_ReturnStatus hand_out_state(char const *name, Extent extent, void **state, int *length) {
-  return answer(name, [&](Call &call) {
+QEX_ReturnStatus return_state(char const *name, Extent extent, void **state, int *length) {
+  return reading(name, [&](ReadingCall &call) {
     auto const output = simhost::output_at(state, length);
-    simhost::allocate_copy(call, output, simhost::state_image(call.reading(), extent));
+    simhost::allocate_copy(call, output, simhost::state_image(call.transaction(), extent));
   });
 }
 
@@ -23,34 +27,35 @@ QEX_ReturnStatus hand_out_state(char const *name, Extent extent, void **state, i
 extern "C" {
 
 QEX_ReturnStatus DVSQEX_StateInit(void *state, int length) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const image = simhost::argument_bytes(state, length);
     if (image.empty()) {
-      simhost::clear_state(call.changing());
+      simhost::clear_state(call.transaction());
     } else {
-      simhost::load_state(call.changing(), image, Extent::whole);
+      simhost::load_state(call.transaction(), image, Extent::whole);
     }
   });
 }
 
 QEX_ReturnStatus DVSQEX_StateGet(void **state, int *length) {
-  return hand_out_state(__func__, Extent::whole, state, length);
+  return return_state(__func__, Extent::whole, state, length);
 }
 
 QEX_ReturnStatus DVSQEX_PersistentStateGet(void **state, int *length) {
-  return hand_out_state(__func__, Extent::persistent, state, length);
+  return return_state(__func__, Extent::persistent, state, length);
 }
 
 QEX_ReturnStatus DVSQEX_StateSanitize(void) {
-  return answer(__func__, [&](Call &call) { simhost::sanitize_state(call.changing()); });
+  return changing(__func__,
+                  [&](ChangingCall &call) { simhost::sanitize_state(call.transaction()); });
 }
 
 QEX_ReturnStatus DVSQEX_StateCleanup(void) {
-  return answer(__func__, [&](Call &call) { simhost::clear_state(call.changing()); });
+  return changing(__func__, [&](ChangingCall &call) { simhost::clear_state(call.transaction()); });
 }
 
 void DVSQEX_DataFree(void *data) {
-  simhost::run(__func__, [&](Call &call) { call.ledger().release(data, call.name()); });
+  stateless_or_trap(__func__, [&](Call &call) { call.ledger().release(data, call.name()); });
 }
 
 }  // extern "C"

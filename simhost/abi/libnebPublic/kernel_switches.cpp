@@ -9,8 +9,10 @@
 #include "nebpublic/kernel_state.h"
 #include "storage/store.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::switch_identified;
@@ -20,10 +22,10 @@ namespace {
 // Does `work` to the switch with an identifier.
 template <typename Work>
 QEX_ReturnStatus change(char const *name, char const *switch_id, Work const &work) {
-  return answer(name, [&](Call &call) {
+  return changing(name, [&](ChangingCall &call) {
     auto const target = switch_identified(switch_id);
-    auto &transaction = call.changing();
-    work(transaction, simhost::found(transaction, target));
+    auto &transaction = call.transaction();
+    work(transaction, simhost::get_target(transaction, target));
   });
 }
 
@@ -36,7 +38,7 @@ extern "C" {
 
 QEX_ReturnStatus DVSQEX_SwitchAdd(char const *switchId, char const *alias, qex_uint32 maxPorts,
                                   NEBVersion version) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::SwitchSpec const spec{.alias = require_text(alias),
                                    .identifier = require_text(switchId),
                                    .max_ports = maxPorts,
@@ -46,7 +48,7 @@ QEX_ReturnStatus DVSQEX_SwitchAdd(char const *switchId, char const *alias, qex_u
     if (spec.identifier.empty()) {
       simhost::refuse(QEX_BAD_PARAM);
     }
-    simhost::create_switch(call.changing(), spec);
+    simhost::create_switch(call.transaction(), spec);
   });
 }
 
@@ -81,16 +83,16 @@ QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPo
 }
 
 QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = switch_identified(switchId);
     auto &output = require(ports);
     auto const number = static_cast<int>(type);
     if (number < DVSPORT_TYPE_ACTIVE || number > DVSPORT_TYPE_LOCALCACHE) {
       simhost::refuse(QEX_BAD_PARAM);
     }
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const entries =
-        simhost::ports_of_type(transaction, simhost::found(transaction, target), type);
+        simhost::ports_of_type(transaction, simhost::get_target(transaction, target), type);
     auto const beyond_first = std::max<std::size_t>(entries.size(), 1) - 1;
     auto const size = sizeof(DVPortList) + (beyond_first * sizeof(DVPortData));
     auto *const list = static_cast<DVPortList *>(call.ledger().allocate(size, call.name()));

@@ -8,8 +8,9 @@
 #include "model/lookup.h"
 #include "model/switches/switches.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::reading;
+using simhost::reading_or_trap;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::storage::SwitchName;
@@ -26,38 +27,35 @@ void copy_text(std::string const &text, char *output) {
 extern "C" {
 
 QEX_ReturnStatus DVSAliasToSwitchId(char const *alias, char switchId[64]) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(alias);
     auto *const output = &require(switchId);
-    copy_text(simhost::identifier_of(call.reading(), name), output);
+    copy_text(simhost::identifier_of(call.transaction(), name), output);
   });
 }
 
 QEX_ReturnStatus DVSPortsetNameToAlias(char const *portsetName, char alias[128]) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(portsetName);
     auto *const output = &require(alias);
-    copy_text(simhost::alias_of_portset(call.reading(), name), output);
+    copy_text(simhost::alias_of_portset(call.transaction(), name), output);
   });
 }
 
 QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetBuffer) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(alias);
     auto *const output = &require(portsetBuffer);
-    copy_text(simhost::portset_of(call.reading(), name), output);
+    copy_text(simhost::portset_of(call.transaction(), name), output);
   });
 }
 
 char DVPortExist(char const *switchId, char const *port) {
-  char exists = 0;
-  simhost::run(__func__, [&](Call &call) {
-    if (switchId != nullptr && port != nullptr) {
-      exists = static_cast<char>(
-          simhost::find_port(call.reading(), SwitchName::identifier, switchId, port).has_value());
-    }
+  return reading_or_trap(__func__, [&](ReadingCall &call) {
+    return static_cast<char>(
+        switchId != nullptr && port != nullptr &&
+        simhost::find_port(call.transaction(), SwitchName::identifier, switchId, port).has_value());
   });
-  return exists;
 }
 
 }  // extern "C"

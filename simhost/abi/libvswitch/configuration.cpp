@@ -10,19 +10,23 @@
 #include "model/switches/switches.h"
 #include "qexapi/switch_properties.h"
 
-using simhost::answer;
 using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
 using simhost::optional_text;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
+using simhost::stateless_or_trap;
 using simhost::switch_called;
 using simhost::switch_identified;
 
 namespace {
 
 // The number of a port; a switch that does not run has given its ports none.
-int running_number(Call &call, simhost::NamedPort const &target) {
-  auto &transaction = call.reading();
+int running_number(ReadingCall &call, simhost::NamedPort const &target) {
+  auto &transaction = call.transaction();
   auto const [key, row] = simhost::get_switch(transaction, target.owner.name, target.owner.kind);
   if (!row.associated) {
     simhost::refuse(QEX_NOT_FOUND);
@@ -38,7 +42,7 @@ QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
                                      char const *portsetName, qex_uint32 maxPorts,
                                      qex_Bool persistent, qex_uint32 version, qex_uint32 mtu,
                                      qex_uint32 uplinkCount) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::SwitchSpec const spec{.alias = require_text(alias),
                                    .identifier = optional_text(switchId),
                                    .portset = optional_text(portsetName),
@@ -47,23 +51,23 @@ QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
                                    .version = version,
                                    .mtu = mtu,
                                    .uplink_count = uplinkCount};
-    simhost::create_switch(call.changing(), spec);
+    simhost::create_switch(call.transaction(), spec);
   });
 }
 
 QEX_ReturnStatus VSDVS_DestroyVSwitch(char const *switchName) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const alias = require_text(switchName);
-    simhost::destroy_switch(call.changing(), alias);
+    simhost::destroy_switch(call.transaction(), alias);
   });
 }
 
 QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_uint32 connectId) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = simhost::port_of(switch_called(switchName), port);
-    auto &transaction = call.changing();
+    auto &transaction = call.transaction();
     auto const added = simhost::add_client_port(
-        transaction, simhost::found(transaction, target.owner), target.identifier);
+        transaction, simhost::get_target(transaction, target.owner), target.identifier);
     simhost::set_property(transaction, simhost::owner_of(added), QEX_NEBPROP_PORT_CONNECTID,
                           simhost::bytes_of(connectId));
   });
@@ -71,26 +75,26 @@ QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_u
 
 QEX_ReturnStatus VSDVS_AddOpaqueDVPort(char const *switchName, char const *port,
                                        char const *externalId) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = simhost::port_of(switch_called(switchName), port);
     auto const external = require_text(externalId);
-    auto &transaction = call.changing();
+    auto &transaction = call.transaction();
     auto const added = simhost::add_client_port(
-        transaction, simhost::found(transaction, target.owner), target.identifier);
+        transaction, simhost::get_target(transaction, target.owner), target.identifier);
     simhost::set_external_id(transaction, added, external);
   });
 }
 
 QEX_ReturnStatus VSDVS_RemoveDVPort(char const *switchName, char const *port) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = simhost::port_of(switch_called(switchName), port);
-    auto &transaction = call.changing();
-    simhost::remove_port(transaction, simhost::found(transaction, target));
+    auto &transaction = call.transaction();
+    simhost::remove_port(transaction, simhost::get_target(transaction, target));
   });
 }
 
 QEX_ReturnStatus VSDVS_DvPortIDToPortID(char const *switchName, char const *port, int *portID) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = simhost::port_of(switch_called(switchName), port);
     require(portID) = running_number(call, target);
   });
@@ -98,37 +102,37 @@ QEX_ReturnStatus VSDVS_DvPortIDToPortID(char const *switchName, char const *port
 
 QEX_ReturnStatus VSDVS_DvPortIDToPortIDFromDVSID(char const *switchId, char const *port,
                                                  int *portID) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = simhost::port_of(switch_identified(switchId), port);
     require(portID) = running_number(call, target);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *aliasBuffer) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(portsetName);
     auto *const output = &require(aliasBuffer);
-    auto const alias = simhost::alias_of_portset(call.reading(), name);
+    auto const alias = simhost::alias_of_portset(call.transaction(), name);
     *std::copy(alias.begin(), alias.end(), output) = '\0';
   });
 }
 
 QEX_ReturnStatus VSDVS_GetMTU(char const *switchName, qex_uint32 *mtu) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
-    require(mtu) = simhost::mtu_of(call.reading(), alias);
+    require(mtu) = simhost::mtu_of(call.transaction(), alias);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMTU(char const *switchName, qex_uint32 mtu) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const alias = require_text(switchName);
-    simhost::set_mtu(call.changing(), alias, mtu);
+    simhost::set_mtu(call.transaction(), alias, mtu);
   });
 }
 
 void VSDVS_FreeMemory(void *memory) {
-  simhost::run(__func__, [&](Call &call) { call.ledger().release(memory, call.name()); });
+  stateless_or_trap(__func__, [&](Call &call) { call.ledger().release(memory, call.name()); });
 }
 
 }  // extern "C"

@@ -3,9 +3,11 @@
 #include "vswitch/configuration.h"
 #include "vswitch/properties.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
 using simhost::port_of;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::RecordProperty;
 using simhost::require;
 using simhost::switch_called;
@@ -35,26 +37,26 @@ constexpr RecordProperty<qex_uint32> kFilterMode{.key = VSPROP_MULTICAST_FILTER,
 extern "C" {
 
 QEX_ReturnStatus VSDVS_GetMACLearning(char const *switchName, VSMACLearning *learning) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     require(learning) = simhost::read(call, switch_called(switchName), kLearning);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMACLearning(char const *switchName, VSMACLearning const *learning) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::write(call, switch_called(switchName), kLearning, require(learning));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearMACLearning(char const *switchName) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::reset(call, switch_called(switchName), VSPROP_SWITCH_MAC_LEARNING);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *port,
                                           VSPMACLearning *learning) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const management =
         simhost::read(call, port_of(switch_called(switchName), port), kManagement);
     require(learning) = management.portMACLearning;
@@ -63,10 +65,10 @@ QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *po
 
 QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *port,
                                           VSPMACLearning const *learning) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto const &wanted = require(learning);
-    auto &transaction = call.changing();
+    auto &transaction = call.transaction();
     auto const owner = simhost::owner_of(transaction, target);
     auto management = simhost::read(transaction, owner, kManagement);
     management.portMACLearning = wanted;
@@ -76,41 +78,41 @@ QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *po
 
 QEX_ReturnStatus VSDVS_GetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity *security) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     require(security) = simhost::read(call, port_of(switch_called(switchName), port), kSecurity);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity const *security) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::write(call, port_of(switch_called(switchName), port), kSecurity, require(security));
   });
 }
 
 QEX_ReturnStatus VSDVS_GetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter *filter) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     require(filter) = simhost::read(call, port_of(switch_called(switchName), port), kFilter);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter const *filter) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::write(call, port_of(switch_called(switchName), port), kFilter, require(filter));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearExtraEthFilter(char const *switchName, char const *port) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::reset(call, port_of(switch_called(switchName), port), VSPROP_PORT_EXTRA_ETH_FRP);
   });
 }
 
 QEX_ReturnStatus VSDVS_IsSinkPortEnabled(char const *switchName, char const *port,
                                          qex_Bool *enabled) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const filter = simhost::read(call, port_of(switch_called(switchName), port), kFilter);
     require(enabled) = static_cast<qex_Bool>((filter.flags & QEX_ETH_FILTER_SINK) != 0);
   });
@@ -118,9 +120,9 @@ QEX_ReturnStatus VSDVS_IsSinkPortEnabled(char const *switchName, char const *por
 
 QEX_ReturnStatus VSDVS_ConfigureSinkPort(char const *switchName, char const *port,
                                          qex_Bool enabled) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
-    auto &transaction = call.changing();
+    auto &transaction = call.transaction();
     auto const owner = simhost::owner_of(transaction, target);
     auto filter = simhost::read(transaction, owner, kFilter);
     auto const others = filter.flags & ~qex_uint32{QEX_ETH_FILTER_SINK};
@@ -130,13 +132,13 @@ QEX_ReturnStatus VSDVS_ConfigureSinkPort(char const *switchName, char const *por
 }
 
 QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     require(mode) = static_cast<int>(simhost::read(call, switch_called(switchName), kFilterMode));
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     simhost::write(call, switch_called(switchName), kFilterMode, static_cast<qex_uint32>(mode));
   });
 }

@@ -5,9 +5,11 @@
 #include "vswitch/configuration.h"
 #include "vswitch/teaming.h"
 
-using simhost::answer;
 using simhost::BytesView;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::switch_called;
@@ -29,11 +31,11 @@ extern "C" {
 
 QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPorts **names,
                                             VSUplinkPortIds **ids) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = switch_called(switchName);
     auto &names_output = require(names);
     auto &ids_output = require(ids);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const owner = simhost::owner_of(transaction, target);
     auto const name_list = simhost::read_uplink_names(transaction, owner);
     auto const id_list = simhost::read_uplink_ids(transaction, owner);
@@ -44,38 +46,38 @@ QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPort
 
 QEX_ReturnStatus VSDVS_SetSwitchUplinkPorts(char const *switchName, VSUplinkPorts const *names,
                                             VSUplinkPortIds const *ids) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
     auto const ports = simhost::uplink_ports_in(list_bytes(require(names), QEX_NEB_NAME_MAX_LEN),
                                                 list_bytes(require(ids), QEX_NEB_PORT_ID_MAX_LEN));
-    auto &transaction = call.changing();
-    simhost::set_uplink_ports(transaction, simhost::found(transaction, target), ports);
+    auto &transaction = call.transaction();
+    simhost::set_uplink_ports(transaction, simhost::get_target(transaction, target), ports);
   });
 }
 
 QEX_ReturnStatus VSDVS_AddSwitchUplinkPort(char const *switchName, char const *uplink) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
     auto const name = require_text(uplink);
-    auto &transaction = call.changing();
-    simhost::add_uplink_port(transaction, simhost::found(transaction, target), name);
+    auto &transaction = call.transaction();
+    simhost::add_uplink_port(transaction, simhost::get_target(transaction, target), name);
   });
 }
 
 QEX_ReturnStatus VSDVS_RemoveSwitchUplinkPort(char const *switchName, char const *uplink) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
     auto const name = require_text(uplink);
-    auto &transaction = call.changing();
-    simhost::remove_uplink_port(transaction, simhost::found(transaction, target), name);
+    auto &transaction = call.transaction();
+    simhost::remove_uplink_port(transaction, simhost::get_target(transaction, target), name);
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearSwitchUplinkPorts(char const *switchName) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
-    auto &transaction = call.changing();
-    simhost::set_uplink_ports(transaction, simhost::found(transaction, target), {});
+    auto &transaction = call.transaction();
+    simhost::set_uplink_ports(transaction, simhost::get_target(transaction, target), {});
   });
 }
 

@@ -6,9 +6,11 @@
 #include "vswitch/configuration.h"
 #include "vswitch/properties.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
 using simhost::port_of;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::RecordProperty;
 using simhost::require;
 using simhost::switch_called;
@@ -36,12 +38,12 @@ extern "C" {
 
 QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *port,
                                          VSPortVlanPolicy **policy, int *priority) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto &policy_output = require(policy);
     auto &priority_output = require(priority);
-    auto &transaction = call.reading();
-    auto const found = simhost::found(transaction, target);
+    auto &transaction = call.transaction();
+    auto const found = simhost::get_target(transaction, target);
     auto const bytes = simhost::vlan_policy_of(transaction, found);
     priority_output = simhost::priority_of(transaction, found);
     policy_output = simhost::allocate<VSPortVlanPolicy>(call, bytes);
@@ -52,36 +54,36 @@ QEX_ReturnStatus VSDVS_SetPortVLANPolicy(char const *switchName, char const *por
                                          qex_uint16 vlanID, int priority, qex_Bool guestTagging,
                                          qex_Bool privateVlan, qex_NEBPortVIDRange *ranges,
                                          qex_uint16 numRanges) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     simhost::VlanSpec const spec{.vlan = vlanID,
                                  .priority = priority,
                                  .guest_tagging = guestTagging != 0,
                                  .private_vlan = privateVlan != 0,
                                  .ranges = array(ranges, numRanges)};
-    auto &transaction = call.changing();
-    simhost::set_vlans(transaction, simhost::found(transaction, target), spec);
+    auto &transaction = call.transaction();
+    simhost::set_vlans(transaction, simhost::get_target(transaction, target), spec);
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearPortVLANPolicy(char const *switchName, char const *port) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
-    auto &transaction = call.changing();
-    simhost::clear_vlans(transaction, simhost::found(transaction, target));
+    auto &transaction = call.transaction();
+    simhost::clear_vlans(transaction, simhost::get_target(transaction, target));
   });
 }
 
 QEX_ReturnStatus VSDVS_GetPortNestedVLANTagging(char const *switchName, char const *port,
                                                 qex_Bool *enabled) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     require(enabled) = simhost::read(call, port_of(switch_called(switchName), port), kNestedTag);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char const *port,
                                                 qex_Bool enabled) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const value = static_cast<qex_Bool>(enabled != 0);
     simhost::write(call, port_of(switch_called(switchName), port), kNestedTag, value);
   });
@@ -89,11 +91,11 @@ QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char con
 
 QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry **entries,
                                          int *count) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const target = switch_called(switchName);
     auto &entries_output = require(entries);
     auto &count_output = require(count);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const property = simhost::get_property(transaction, simhost::owner_of(transaction, target),
                                                 VSPROP_PVLAN_MAP);
     auto const bytes = property ? simhost::BytesView(property->value) : simhost::BytesView();
@@ -104,10 +106,10 @@ QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
 
 QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry const *entries,
                                          int count) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
     auto const map = array(entries, count);
-    auto &transaction = call.changing();
+    auto &transaction = call.transaction();
     simhost::set_property(transaction, simhost::owner_of(transaction, target), VSPROP_PVLAN_MAP,
                           std::as_bytes(map));
   });

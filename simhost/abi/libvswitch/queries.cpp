@@ -8,10 +8,12 @@
 #include "model/lookup.h"
 #include "model/switches/switches.h"
 
-using simhost::answer;
 using simhost::Call;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
+using simhost::stateless_or_trap;
 
 namespace {
 
@@ -27,28 +29,28 @@ VSUplinks_entries entry_of(simhost::storage::AttachedUplink const &uplink) {
 extern "C" {
 
 QEX_ReturnStatus VSQEX_GetVSInfo(char const *switchName, VSInfo *info) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
-    require(info) = simhost::switch_info(call.reading(), alias);
+    require(info) = simhost::switch_info(call.transaction(), alias);
   });
 }
 
 QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(uplinks);
-    auto const attached = simhost::uplinks_of(call.reading(), alias);
+    auto const attached = simhost::uplinks_of(call.transaction(), alias);
     std::vector<VSUplinks_entries> entries(attached.size());
     std::transform(attached.begin(), attached.end(), entries.begin(), entry_of);
-    output = simhost::give_list<VSUplinks>(call, entries);
+    output = simhost::allocate_list<VSUplinks>(call, entries);
   });
 }
 
 QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(uplink);
     auto *const output = &require(portBuffer);
-    auto &state = call.reading();
+    auto &state = call.transaction();
     auto const found = simhost::get_uplink(state, name);
     if (!found.port) {
       simhost::refuse(QEX_IS_DISCONNECTED);
@@ -59,7 +61,7 @@ QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer) {
 }
 
 void VSQEX_FreeMemory(void *memory) {
-  simhost::run(__func__, [&](Call &call) { call.ledger().release(memory, call.name()); });
+  stateless_or_trap(__func__, [&](Call &call) { call.ledger().release(memory, call.name()); });
 }
 
 }  // extern "C"

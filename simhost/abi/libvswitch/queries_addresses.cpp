@@ -5,9 +5,11 @@
 #include "model/plane.h"
 #include "vswitch/queries.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
 using simhost::Place;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::running_plane;
@@ -33,12 +35,12 @@ Place port_of(Transaction &transaction, std::string_view alias, std::string_view
 
 // Lets `change` work with an entry on the table of a port.
 template <typename Change>
-void change_table(Call &call, char const *switch_name, char const *port, VSMACEntry const *entry,
-                  Change const &change) {
+void change_table(ChangingCall &call, char const *switch_name, char const *port,
+                  VSMACEntry const *entry, Change const &change) {
   auto const alias = require_text(switch_name);
   auto const identifier = require_text(port);
   auto const &wanted = require(entry);
-  auto &transaction = call.changing();
+  auto &transaction = call.transaction();
   change(transaction, port_of(transaction, alias, identifier), wanted);
 }
 
@@ -48,33 +50,33 @@ extern "C" {
 
 QEX_ReturnStatus VSQEX_GetTeamMACTable(char const *switchName, VSMACAddrType type,
                                        VSMACTable **table) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(table);
     auto const wanted = checked(type);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const entries = running_plane().addresses(transaction, team(transaction, alias), wanted);
-    output = simhost::give_list<VSMACTable>(call, entries);
+    output = simhost::allocate_list<VSMACTable>(call, entries);
   });
 }
 
 QEX_ReturnStatus VSQEX_GetPortMACTable(char const *switchName, char const *port, VSMACAddrType type,
                                        VSMACTable **table) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto const identifier = require_text(port);
     auto &output = require(table);
     auto const wanted = checked(type);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const entries =
         running_plane().addresses(transaction, port_of(transaction, alias, identifier), wanted);
-    output = simhost::give_list<VSMACTable>(call, entries);
+    output = simhost::allocate_list<VSMACTable>(call, entries);
   });
 }
 
 QEX_ReturnStatus VSQEX_SetPortMACTable(char const *switchName, char const *port,
                                        VSMACEntry const *entry) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     change_table(call, switchName, port, entry,
                  [](Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
                    running_plane().put_address(transaction, place, wanted);
@@ -84,7 +86,7 @@ QEX_ReturnStatus VSQEX_SetPortMACTable(char const *switchName, char const *port,
 
 QEX_ReturnStatus VSQEX_ClearPortMACTable(char const *switchName, char const *port,
                                          VSMACEntry const *entry) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     change_table(call, switchName, port, entry,
                  [](Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
                    running_plane().remove_address(transaction, place, wanted);
@@ -94,26 +96,26 @@ QEX_ReturnStatus VSQEX_ClearPortMACTable(char const *switchName, char const *por
 
 QEX_ReturnStatus VSQEX_GetPortMACLearningStats(char const *switchName, char const *port,
                                                VSPMACLearningStats *stats) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto const identifier = require_text(port);
     auto &output = require(stats);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     output = running_plane().learning_stats(transaction, port_of(transaction, alias, identifier));
   });
 }
 
 QEX_ReturnStatus VSQEX_GetGlobalMACLearningProps(VSMACLearningGlobalProps *props) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(props);
-    output = simhost::global_mac_learning(call.reading());
+    output = simhost::global_mac_learning(call.transaction());
   });
 }
 
 QEX_ReturnStatus VSQEX_SetGlobalMACLearningProps(VSMACLearningGlobalProps *props) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const &wanted = require(props);
-    simhost::set_global_mac_learning(call.changing(), wanted);
+    simhost::set_global_mac_learning(call.transaction(), wanted);
   });
 }
 

@@ -12,8 +12,8 @@
 #include "model/plane.h"
 #include "vswitch/queries.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::running_plane;
@@ -33,10 +33,10 @@ Sid sid_of(simhost::MirrorSession const &session) {
 extern "C" {
 
 QEX_ReturnStatus VSQEX_GetDVMirrorSessionIDs(char const *switchName, VSDVMirrorSessionIDs **ids) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(ids);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const key = simhost::get_running_switch(transaction, alias).key;
     std::vector<Sid> running;
     for (auto const &session : simhost::mirrors_of(transaction, key)) {
@@ -45,18 +45,18 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionIDs(char const *switchName, VSDVMirrorS
         running.push_back(sid);
       }
     }
-    output = simhost::give_list<VSDVMirrorSessionIDs>(call, running);
+    output = simhost::allocate_list<VSDVMirrorSessionIDs>(call, running);
   });
 }
 
 QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char const sid[32],
                                                VSDVMirrorSessionStats *stats) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto const *const first = &require(sid);
     std::string const wanted(first, strnlen(first, sizeof(DVMirrorSID)));
     auto &output = require(stats);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const key = simhost::get_running_switch(transaction, alias).key;
     auto sessions = simhost::mirrors_of(transaction, key);
     std::erase_if(sessions, [&](auto const &session) { return session.sid() != wanted; });
@@ -83,13 +83,13 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char cons
 
 QEX_ReturnStatus VSQEX_GetPromiscSessionActiveDsts(char const *switchName,
                                                    VSPromiscSessionActiveDsts **ports) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(ports);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const active = simhost::promiscuous_ports(
         transaction, simhost::get_running_switch(transaction, alias).key);
-    output = simhost::give_list<VSPromiscSessionActiveDsts>(call, active);
+    output = simhost::allocate_list<VSPromiscSessionActiveDsts>(call, active);
   });
 }
 

@@ -9,8 +9,8 @@
 #include "vswitch/queries.h"
 
 using simhost::AddressBytes;
-using simhost::answer;
-using simhost::Call;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::running_plane;
@@ -51,33 +51,33 @@ extern "C" {
 
 QEX_ReturnStatus VSQEX_GetMcastFilters(char const *switchName, qex_SwitchPortID port,
                                        VSMcastFilterMode mode, VSMcastFilters **filters) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(filters);
     auto const length = address_length(mode);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const groups =
         running_plane().groups(transaction, port_of(transaction, alias, port), length);
-    output = simhost::give_counted<VSMcastFilters>(call, joined(groups), groups.size());
+    output = simhost::allocate_counted<VSMcastFilters>(call, joined(groups), groups.size());
   });
 }
 
 QEX_ReturnStatus VSQEX_GetMcastFilterStats(char const *switchName, qex_SwitchPortID port,
                                            VSMcastFilterMode mode, unsigned char const *group,
                                            VSMcastFilterStats **stats) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(stats);
     auto const *const first = reinterpret_cast<std::byte const *>(&require(group));
     AddressBytes const address(first, first + address_length(mode));
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const found =
         running_plane().group(transaction, port_of(transaction, alias, port), address);
     if (!found) {
       simhost::refuse(QEX_NOT_FOUND);
     }
-    auto *const record = simhost::give_counted<VSMcastFilterStats>(call, joined(found->sources),
-                                                                   found->sources.size());
+    auto *const record = simhost::allocate_counted<VSMcastFilterStats>(call, joined(found->sources),
+                                                                       found->sources.size());
     record->version = found->version;
     record->srcIPFilterMode = found->source_mode;
     record->updateTime = static_cast<qex_uint64>(found->updated / std::chrono::seconds(1));
@@ -87,10 +87,10 @@ QEX_ReturnStatus VSQEX_GetMcastFilterStats(char const *switchName, qex_SwitchPor
 }
 
 QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(mode);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const owner = simhost::storage::PropertyOwner::global(
         simhost::get_running_switch(transaction, alias).key);
     simhost::RecordProperty<int> const filter{.key = VSPROP_MULTICAST_FILTER,

@@ -7,8 +7,10 @@
 #include "model/options/runtime_options.h"
 #include "vswitch/queries.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 
 namespace {
@@ -29,10 +31,10 @@ extern "C" {
 
 QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count,
                                          VSRuntimeOptions **options) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(options);
     auto const types = wanted_types(ids, count);
-    auto const list = simhost::packed_runtime_options(call.reading(), types);
+    auto const list = simhost::packed_runtime_options(call.transaction(), types);
     auto *const memory = call.ledger().allocate(list.size(), call.name());
     std::memcpy(memory, list.data(), list.size());
     output = static_cast<VSRuntimeOptions *>(memory);
@@ -40,9 +42,9 @@ QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count
 }
 
 QEX_ReturnStatus VSQEX_SetRuntimeOptions(VSRuntimeOptions *options) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const &list = require(options);
-    simhost::set_runtime_options(call.changing(), list);
+    simhost::set_runtime_options(call.transaction(), list);
   });
 }
 

@@ -6,8 +6,10 @@
 #include "model/plane.h"
 #include "vswitch/queries.h"
 
-using simhost::answer;
-using simhost::Call;
+using simhost::changing;
+using simhost::ChangingCall;
+using simhost::reading;
+using simhost::ReadingCall;
 using simhost::require;
 using simhost::require_text;
 using simhost::running_plane;
@@ -16,20 +18,20 @@ namespace {
 
 // Answers `ask` about an uplink of a switch as a link state.
 template <typename Ask>
-void link_state(Call &call, char const *switch_name, char const *uplink, int *state,
+void link_state(ReadingCall &call, char const *switch_name, char const *uplink, int *state,
                 Ask const &ask) {
   auto const alias = require_text(switch_name);
   auto const name = require_text(uplink);
   auto &output = require(state);
-  auto &transaction = call.reading();
+  auto &transaction = call.transaction();
   auto const key = simhost::get_running_switch(transaction, alias).key;
   bool const up = ask(transaction, simhost::get_uplink(transaction, key, name).name);
   output = up ? QEX_LINK_STATE_UP : QEX_LINK_STATE_DOWN;
 }
 
-simhost::Counters switch_counters(Call &call, char const *switch_name) {
+simhost::Counters switch_counters(ReadingCall &call, char const *switch_name) {
   auto const alias = require_text(switch_name);
-  auto &transaction = call.reading();
+  auto &transaction = call.transaction();
   return running_plane().counters(
       transaction, {.switch_key = simhost::get_running_switch(transaction, alias).key});
 }
@@ -62,7 +64,7 @@ std::byte *write_lag(std::byte *at, simhost::Lag const &lag) {
 extern "C" {
 
 QEX_ReturnStatus VSQEX_GetUplinkLinkState(char const *switchName, char const *uplink, int *state) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     link_state(call, switchName, uplink, state, [](auto &transaction, auto const &name) {
       return running_plane().link_is_up(transaction, name);
     });
@@ -71,7 +73,7 @@ QEX_ReturnStatus VSQEX_GetUplinkLinkState(char const *switchName, char const *up
 
 QEX_ReturnStatus VSQEX_GetUplinkLACPLinkState(char const *switchName, char const *uplink,
                                               int *state) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     link_state(call, switchName, uplink, state, [](auto &transaction, auto const &name) {
       return running_plane().lacp_is_up(transaction, name);
     });
@@ -80,13 +82,13 @@ QEX_ReturnStatus VSQEX_GetUplinkLACPLinkState(char const *switchName, char const
 
 QEX_ReturnStatus VSQEX_SetUplinkAdminLinkState(char const *switchName, char const *uplink,
                                                qex_LinkState state) {
-  return answer(__func__, [&](Call &call) {
+  return changing(__func__, [&](ChangingCall &call) {
     auto const alias = require_text(switchName);
     auto const name = require_text(uplink);
     if (state != QEX_LINK_STATE_UP && state != QEX_LINK_STATE_DOWN) {
       simhost::refuse(QEX_BAD_PARAM);
     }
-    auto &transaction = call.changing();
+    auto &transaction = call.transaction();
     auto const key = simhost::get_running_switch(transaction, alias).key;
     auto const known = simhost::get_uplink(transaction, key, name);
     running_plane().set_admin_state(transaction, known.name, state == QEX_LINK_STATE_UP);
@@ -94,17 +96,17 @@ QEX_ReturnStatus VSQEX_SetUplinkAdminLinkState(char const *switchName, char cons
 }
 
 QEX_ReturnStatus VSQEX_GetLAGTable(char const *switchName, VSLAGTable **table) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(table);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const lags =
         running_plane().lags(transaction, simhost::get_running_switch(transaction, alias).key);
     std::size_t trailing = 0;
     for (auto const &lag : lags) {
       trailing += size_of(lag);
     }
-    auto *const record = simhost::give_record<VSLAGTable>(call, trailing);
+    auto *const record = simhost::allocate_record<VSLAGTable>(call, trailing);
     record->numLAGs = static_cast<qex_uint32>(lags.size());
     auto *at = reinterpret_cast<std::byte *>(record + 1);
     for (auto const &lag : lags) {
@@ -115,16 +117,16 @@ QEX_ReturnStatus VSQEX_GetLAGTable(char const *switchName, VSLAGTable **table) {
 }
 
 QEX_ReturnStatus VSQEX_PortGetTeamUplinkHint(qex_SwitchPortID port, qex_Name *name) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(name);
-    auto &transaction = call.reading();
+    auto &transaction = call.transaction();
     auto const known = simhost::get_running_port(transaction, simhost::storage::PortNumber{port});
     output = simhost::name_of(running_plane().team_uplink(transaction, known));
   });
 }
 
 QEX_ReturnStatus VSQEX_GetRARPStats(char const *switchName, VSRARPStats *stats) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(stats);
     auto counters = switch_counters(call, switchName);
     output.rarpPktsSent = static_cast<qex_uint32>(counters["rarpPktsSent"]);
@@ -135,7 +137,7 @@ QEX_ReturnStatus VSQEX_GetRARPStats(char const *switchName, VSRARPStats *stats) 
 
 QEX_ReturnStatus VSQEX_GetServicePortTeamingStats(char const *switchName,
                                                   VSServicePortTeamingStats *stats) {
-  return answer(__func__, [&](Call &call) {
+  return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(stats);
     auto counters = switch_counters(call, switchName);
     output.txFromSrvPort = counters["txFromSrvPort"];

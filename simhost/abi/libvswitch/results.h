@@ -14,14 +14,14 @@ namespace simhost {
 
 /// A record of zeros with room for `trailing` bytes behind it.
 template <typename Record>
-Record *give_record(Call &call, std::size_t trailing = 0) {
+Record *allocate_record(Call &call, std::size_t trailing = 0) {
   return static_cast<Record *>(call.ledger().allocate(sizeof(Record) + trailing, call.name()));
 }
 
 /// A record that counts its entries and has them right behind it.
 template <typename Record>
-Record *give_counted(Call &call, std::span<std::byte const> entries, std::size_t count) {
-  auto *const record = give_record<Record>(call, entries.size());
+Record *allocate_counted(Call &call, std::span<std::byte const> entries, std::size_t count) {
+  auto *const record = allocate_record<Record>(call, entries.size());
   record->totalEntries = static_cast<qex_uint32>(count);
   record->numEntries = static_cast<qex_uint32>(count);
   if (!entries.empty()) {
@@ -31,8 +31,8 @@ Record *give_counted(Call &call, std::span<std::byte const> entries, std::size_t
 }
 
 template <typename Record, typename Entries>
-Record *give_list(Call &call, Entries const &entries) {
-  return give_counted<Record>(call, std::as_bytes(std::span(entries)), entries.size());
+Record *allocate_list(Call &call, Entries const &entries) {
+  return allocate_counted<Record>(call, std::as_bytes(std::span(entries)), entries.size());
 }
 
 /// A name as records hold it, cut at 31 bytes.

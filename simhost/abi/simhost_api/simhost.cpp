@@ -9,6 +9,7 @@
 
 #include "abi/fresh_host.h"
 #include "abi/host.h"
+#include "abi/outcome.h"
 #include "base/api.h"
 #include "base/outcomes.h"
 #include "clock/clock.h"
@@ -25,45 +26,42 @@
 namespace {
 
 using simhost::Refused;
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
 using simhost::storage::Transaction;
 
 thread_local std::string last_error;
 
-int failed(QEX_ReturnStatus status, std::string why) {
-  last_error = std::move(why);
-  return status;
-}
-
-// What the exception being handled makes of a function with a status.
+// Keeps the reason of the exception being handled; returns its status.
 int failure() noexcept {
-  try {
-    throw;
-  } catch (Refused const &refused) {
-    return failed(refused.status(), simhost::scenario::refusal_text(refused));
-  } catch (simhost::scenario::DocumentError const &error) {
-    return failed(QEX_BAD_PARAM, error.what());
-  } catch (simhost::storage::UnusableState const &error) {
-    return failed(QEX_IO_ERROR, error.what());
-  } catch (std::exception const &error) {
-    return failed(QEX_FAILURE, error.what());
-  }
+  auto outcome = simhost::current_outcome();
+  last_error = std::move(outcome.reason);
+  return outcome.status;
 }
 
-// Does `work` on the state, in one transaction.
-template <typename Work>
-int on_state(Access access, Work const &work) noexcept {
+// Does `work` on the state, in one transaction of a kind.
+template <typename Kind, typename Work>
+int on_state(Work const &work) noexcept {
   last_error.clear();
   try {
     auto &host = simhost::this_host();
     std::scoped_lock const held(host.lock());
-    Transaction transaction(host.state(), access);
+    Kind transaction(host.state());
     work(transaction);
     transaction.commit();
     return QEX_OK;
   } catch (...) {
     return failure();
   }
+}
+
+template <typename Work>
+int reading(Work const &work) noexcept {
+  return on_state<simhost::storage::ReadingTransaction>(work);
+}
+
+template <typename Work>
+int changing(Work const &work) noexcept {
+  return on_state<simhost::storage::ChangingTransaction>(work);
 }
 
 std::string given(char const *text) {
@@ -130,7 +128,7 @@ simhost::Fault fault_on(char const *function, uint32_t nth, uint32_t times) {
 // What the calls that are hit do, `outcome` puts into the fault.
 template <typename Outcome>
 int add_fault(char const *function, uint32_t nth, uint32_t times, Outcome const &outcome) noexcept {
-  return on_state(Access::write, [&](Transaction &transaction) {
+  return changing([&](ChangingTransaction &transaction) {
     auto fault = fault_on(function, nth, times);
     outcome(fault);
     simhost::add_fault(transaction, fault);
@@ -150,26 +148,25 @@ SIMHOST_API char const *simhost_error() {
 }
 
 SIMHOST_API int simhost_apply(char const *document) {
-  return on_state(Access::write, [&](Transaction &transaction) {
+  return changing([&](ChangingTransaction &transaction) {
     simhost::scenario::apply(transaction, given(document));
   });
 }
 
 SIMHOST_API size_t simhost_describe(char *text, size_t size) {
   size_t length = 0;
-  on_state(Access::read, [&](Transaction &transaction) {
+  reading([&](Transaction &transaction) {
     length = copy_out(simhost::scenario::description(transaction), text, size);
   });
   return length;
 }
 
 SIMHOST_API int simhost_restart() {
-  return on_state(Access::write,
-                  [](Transaction &transaction) { simhost::scenario::restart_host(transaction); });
+  return changing([](Transaction &transaction) { simhost::scenario::restart_host(transaction); });
 }
 
 SIMHOST_API int simhost_reset() {
-  return on_state(Access::write, [](Transaction &transaction) {
+  return changing([](ChangingTransaction &transaction) {
     simhost::scenario::empty_host(transaction);
     simhost::populate_fresh_host(transaction);
   });
@@ -177,34 +174,32 @@ SIMHOST_API int simhost_reset() {
 
 SIMHOST_API int64_t simhost_clock_now() {
   int64_t now = -1;
-  on_state(Access::read,
-           [&](Transaction &transaction) { now = simhost::clock_now(transaction).count(); });
+  reading([&](Transaction &transaction) { now = simhost::clock_now(transaction).count(); });
   return now;
 }
 
 SIMHOST_API int simhost_clock_stop() {
-  return on_state(Access::write,
-                  [](Transaction &transaction) { simhost::stop_clock(transaction); });
+  return changing([](Transaction &transaction) { simhost::stop_clock(transaction); });
 }
 
 SIMHOST_API int simhost_clock_run() {
-  return on_state(Access::write, [](Transaction &transaction) { simhost::run_clock(transaction); });
+  return changing([](ChangingTransaction &transaction) { simhost::run_clock(transaction); });
 }
 
 SIMHOST_API int simhost_clock_step(int64_t milliseconds) {
-  return on_state(Access::write, [&](Transaction &transaction) {
+  return changing([&](ChangingTransaction &transaction) {
     simhost::step_clock(transaction, simhost::ClockTime(milliseconds));
   });
 }
 
 SIMHOST_API int simhost_clock_set(int64_t milliseconds) {
-  return on_state(Access::write, [&](Transaction &transaction) {
+  return changing([&](ChangingTransaction &transaction) {
     simhost::set_clock(transaction, simhost::ClockTime(milliseconds));
   });
 }
 
 SIMHOST_API int simhost_set_link(char const *uplink, int up) {
-  return on_state(Access::write, [&](Transaction &transaction) {
+  return changing([&](ChangingTransaction &transaction) {
     auto const name = simhost::get_uplink(transaction, given(uplink)).name;
     auto link = simhost::stored::link_of(transaction, name);
     link.carrier = up != 0;
@@ -215,7 +210,7 @@ SIMHOST_API int simhost_set_link(char const *uplink, int up) {
 SIMHOST_API int simhost_learn(char const *switchName, char const *port, char const *mac,
                               uint16_t vlan, uint32_t vni) {
   auto sighting = simhost::stored::Sighting::learned;
-  auto const status = on_state(Access::write, [&](Transaction &transaction) {
+  auto const status = changing([&](ChangingTransaction &transaction) {
     simhost::get_running_switch(transaction, given(switchName));
     sighting = simhost::stored::learn(transaction, place_of(transaction, switchName, port),
                                       source_of(given(mac), vlan, vni));
@@ -234,7 +229,7 @@ SIMHOST_API int simhost_learn(char const *switchName, char const *port, char con
 
 SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, char const *session,
                                     char const *name, uint64_t value) {
-  return on_state(Access::write, [&](Transaction &transaction) {
+  return changing([&](ChangingTransaction &transaction) {
     if (port != nullptr && session != nullptr) {
       throw Refused(QEX_BAD_PARAM, "a counter is of a port or of a session, not of both");
     }
@@ -268,7 +263,7 @@ SIMHOST_API int simhost_delay_call(char const *function, uint32_t nth, uint32_t 
 }
 
 SIMHOST_API int simhost_clear_faults(char const *function) {
-  return on_state(Access::write, [&](Transaction &transaction) {
+  return changing([&](ChangingTransaction &transaction) {
     simhost::clear_faults(transaction, function == nullptr ? "" : function);
   });
 }

@@ -1,0 +1,81 @@
+// A row for each exception that the layers below throw.
+#include "abi/outcome.h"
+
+#include <SQLiteCpp/Exception.h>
+#include <sqlite3.h>
+
+#include <new>
+
+#include "scenario/document.h"
+#include "scenario/texts.h"
+#include "storage/store.h"
+
+namespace simhost {
+namespace {
+
+Outcome returns(QEX_ReturnStatus status, std::string reason,
+                TrapKind without_status = TrapKind::runtime_error) {
+  return {.status = status,
+          .traps = false,
+          .kind = without_status,
+          .text = TrapText::after_call,
+          .reason = std::move(reason)};
+}
+
+Outcome traps(TrapKind kind, QEX_ReturnStatus status, std::string reason,
+              TrapText text = TrapText::after_call) {
+  return {.status = status, .traps = true, .kind = kind, .text = text, .reason = std::move(reason)};
+}
+
+// A status is for what a caller may wait out or put right.
+Outcome outcome_of(SQLite::Exception const &error) {
+  switch (error.getErrorCode()) {
+    case SQLITE_BUSY:
+      return returns(QEX_BUSY, "another process keeps the state file locked", TrapKind::os_error);
+    case SQLITE_FULL:
+      return returns(QEX_NO_SPACE, "there is no room for the state file", TrapKind::os_error);
+    case SQLITE_IOERR:
+      return returns(QEX_IO_ERROR, "the state file cannot be read or written", TrapKind::os_error);
+    case SQLITE_NOMEM:
+      return returns(QEX_NO_MEMORY, "there is no memory left", TrapKind::memory_error);
+    case SQLITE_READONLY:
+      return returns(QEX_READ_ONLY, "the state file cannot be written", TrapKind::os_error);
+    default:
+      return traps(TrapKind::os_error, QEX_IO_ERROR, error.what());
+  }
+}
+
+Outcome table() {
+  try {
+    throw;
+  } catch (Refused const &refused) {
+    return returns(refused.status(), scenario::refusal_text(refused));
+  } catch (Trapped const &trapped) {
+    return traps(trapped.kind(), QEX_FAILURE, trapped.what(), trapped.text());
+  } catch (scenario::DocumentError const &error) {
+    return traps(TrapKind::runtime_error, QEX_BAD_PARAM, error.what());
+  } catch (storage::UnusableState const &error) {
+    return traps(TrapKind::os_error, QEX_IO_ERROR, error.what());
+  } catch (SQLite::Exception const &error) {
+    return outcome_of(error);
+  } catch (std::bad_alloc const &) {
+    return returns(QEX_NO_MEMORY, "there is no memory left", TrapKind::memory_error);
+  } catch (std::exception const &error) {
+    return traps(TrapKind::runtime_error, QEX_FAILURE, error.what());
+  } catch (...) {
+    return traps(TrapKind::runtime_error, QEX_FAILURE, "the simulated host failed");
+  }
+}
+
+}  // namespace
+
+Outcome current_outcome() noexcept {
+  try {
+    return table();
+  } catch (std::bad_alloc const &) {
+    // Short enough to need no memory itself.
+    return returns(QEX_NO_MEMORY, "no memory left", TrapKind::memory_error);
+  }
+}
+
+}  // namespace simhost

@@ -1,0 +1,23 @@
+// The one table from exceptions to what a caller of the host sees of them.
+#pragma once
+
+#include <string>
+
+#include "base/outcomes.h"
+#include "qexapi/status.h"
+
+namespace simhost {
+
+/// What ended a call early, for callers of every kind.
+struct Outcome {
+  QEX_ReturnStatus status;  ///< for a function that returns one
+  bool traps;               ///< whether a call of the host traps although it could return a status
+  TrapKind kind;            ///< with which a call traps
+  TrapText text;
+  std::string reason;  ///< in words
+};
+
+/// The outcome of the exception that is being handled.
+Outcome current_outcome() noexcept;
+
+}  // namespace simhost
