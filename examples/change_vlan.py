@@ -13,6 +13,8 @@ from typing import Optional, Sequence, Tuple
 
 import libvswitch as vs
 
+import private_host
+
 NO_PRIORITY = -1
 
 
@@ -157,6 +159,7 @@ def parse(arguments: Optional[Sequence[str]]) -> argparse.Namespace:
 
 def main(arguments: Optional[Sequence[str]] = None) -> int:
     options = parse(arguments)
+    private_host.tell("change_vlan")
     switch, port = options.switch, options.port
     try:
         before = read(switch, port)

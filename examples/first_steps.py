@@ -11,6 +11,8 @@ import sys
 
 import _libvswitch as vs
 
+import private_host
+
 SWITCH = "demo-switch"
 
 
@@ -60,6 +62,7 @@ def main() -> None:
     argparse.ArgumentParser(
         description="Creates a virtual switch, configures it, asks about it and removes it again."
     ).parse_args()
+    private_host.tell("first_steps")
     status = create_switch()
     if status != vs.QEX_OK:  # a switch of that name would be somebody else's
         sys.exit(f"first_steps: no switch {SWITCH!r} could be made: {status_text(status)}")

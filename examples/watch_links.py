@@ -12,6 +12,8 @@ from typing import Dict, Iterator, Optional, Sequence
 
 import libvswitch as vs
 
+import private_host
+
 UP, DOWN, GONE = "up", "down", "gone"
 
 
@@ -101,6 +103,7 @@ def main(arguments: Optional[Sequence[str]] = None) -> int:
     )
     parser.add_argument("--for", type=seconds, metavar="SECONDS", dest="duration", help="then end")
     options = parser.parse_args(arguments)
+    private_host.tell("watch_links")
     try:
         watch(options.switch, options.every, options.duration)
     except KeyboardInterrupt:

@@ -109,7 +109,8 @@ QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPo
 QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type);
 
 /**
- * Has a switch carry out a command of its own kind.
+ * Has a switch carry out a command of its own kind. The switch is looked for first, then the
+ * command.
  *
  * - QEX_NOT_SUPPORTED for a command that it does not have
  *

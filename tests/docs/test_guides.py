@@ -20,6 +20,7 @@ FLAGS = doctest.ELLIPSIS | doctest.REPORT_NDIFF
 READ_ONLY = {
     "./dev build",
     "./dev demo",
+    'eval "$(./dev env)"',
     "cmake -S . -B build -DCMAKE_BUILD_TYPE=Release -DHOST_LIBRARY_DIR=/usr/lib64",
     "cmake --build build",
 }

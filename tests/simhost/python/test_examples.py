@@ -6,7 +6,7 @@ import os
 import subprocess
 import sys
 from pathlib import Path
-from typing import Dict, List
+from typing import Dict, List, Optional
 
 import pytest
 from programs import EXAMPLES
@@ -15,10 +15,14 @@ from simhost import SharedHost
 # These show something. The others are tools, with a test file each.
 SHOWS = ["first_steps", "records", "tour"]
 TOOLS = ["change_vlan", "inventory", "mirror_session", "watch_links"]
+# What they share.
+SHARED = ["private_host"]
 
 
 def test_every_example_is_run() -> None:
-    assert sorted(example.stem for example in EXAMPLES.glob("*.py")) == sorted(SHOWS + TOOLS)
+    assert sorted(example.stem for example in EXAMPLES.glob("*.py")) == sorted(
+        SHOWS + TOOLS + SHARED
+    )
     for tool in TOOLS:
         assert Path(__file__).with_name(f"test_{tool}.py").exists()
 
@@ -139,6 +143,42 @@ def test_a_full_disk(writer: Dict[str, str], name: str, words: List[str]) -> Non
         )
     assert done.stderr == f"{name}: [Errno 28] No space left on device\n"
     assert done.returncode == NOT_TOLD.get(name, 1)
+
+
+@pytest.mark.parametrize("state", [None, "", "host.db"])
+@pytest.mark.parametrize("name, words", WRITING)
+def test_a_host_that_nobody_else_sees_is_told(
+    writer: Dict[str, str], tmp_path: Path, name: str, words: List[str], state: Optional[str]
+) -> None:
+    environment = {key: value for key, value in writer.items() if key != "SIMHOST_STATE"}
+    if state is not None:
+        environment["SIMHOST_STATE"] = state and str(tmp_path / state)
+    done = subprocess.run(
+        [sys.executable, str(EXAMPLES / f"{name}.py"), *words],
+        env=environment,
+        stdout=subprocess.PIPE,
+        stderr=subprocess.PIPE,
+        encoding="utf-8",
+    )
+    assert done.returncode == 0
+    # Records touch no host, and the tour has a state file of its own.
+    told = not state and name not in ("records", "tour") and words != ["--help"]
+    said = f"{name}: this host is simulated and private to this process; set SIMHOST_STATE to"
+    assert done.stderr.startswith(said) if told else done.stderr == ""
+
+
+def test_a_host_that_is_not_simulated_is_none_of_these() -> None:
+    program = "import private_host; private_host.tell('p'); print(private_host.is_simulated())"
+    environment = {**os.environ, "PYTHONPATH": str(EXAMPLES)}
+    environment.pop("SIMHOST_STATE", None)
+    done = subprocess.run(
+        [sys.executable, "-c", program],
+        env=environment,
+        stdout=subprocess.PIPE,
+        stderr=subprocess.PIPE,
+        encoding="utf-8",
+    )
+    assert (done.returncode, done.stdout, done.stderr) == (0, "False\n", "")
 
 
 def test_the_first_steps_leave_no_switch(shared_host: SharedHost, writer: Dict[str, str]) -> None:
