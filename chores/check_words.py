@@ -96,7 +96,12 @@ RULES = [
         r"\b(?:left|leaves?|leaving|stays?|staying|remains?) (?:\w+ ){0,3}behind\b",
         "what stays behind lies after nothing",
     ),
-    rule(r"\bwhat runs\b", "the runtime state; running"),
+    rule(
+        r"\bwhat runs\b",
+        "the runtime state; running",
+        r"\bwhat runs the switches\b",
+        "a plane does",
+    ),
     rule(r"\bfurnish\w*\b|\bmeet_faults\b", "populate, inject"),
     rule(r"\bstrikes?\(|\baside\(", "apply, unlocked", below="simhost"),
     rule(r"\bknown_\w+\(|\bfound\(|\brequired\(", "find_*, get_*, require_*", below="simhost"),
