@@ -6,6 +6,7 @@
 
 #include "abi/host.h"
 #include "faults/faults.h"
+#include "model/plane.h"
 
 namespace simhost {
 namespace {
@@ -40,9 +41,9 @@ void inject_faults(std::string_view function) {
 }
 
 template <typename Transaction>
-void commit(std::unique_ptr<Transaction> const &transaction) {
+void commit_any(std::unique_ptr<Transaction> const &transaction) {
   if (transaction) {
-    transaction->commit();
+    commit(*transaction);
   }
 }
 
@@ -91,7 +92,7 @@ storage::ReadingTransaction &ReadingCall::transaction() {
 }
 
 void ReadingCall::complete() {
-  commit(transaction_);
+  commit_any(transaction_);
 }
 
 ChangingCall::ChangingCall(CallName const &name) : Call(name) {}
@@ -105,7 +106,7 @@ storage::ChangingTransaction &ChangingCall::transaction() {
 }
 
 void ChangingCall::complete() {
-  commit(transaction_);
+  commit_any(transaction_);
 }
 
 }  // namespace simhost

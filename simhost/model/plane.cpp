@@ -1,8 +1,10 @@
 // The plane that was chosen for this process.
 #include "model/plane.h"
 
-#include <algorithm>
 #include <cassert>
+
+#include "base/outcomes.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -11,10 +13,6 @@ constinit Plane *chosen = nullptr;
 
 }  // namespace
 
-bool Lag::up() const {
-  return std::any_of(members.begin(), members.end(), [](Member const &m) { return m.up; });
-}
-
 Plane &running_plane() {
   assert(chosen != nullptr);
   return *chosen;
@@ -22,6 +20,25 @@ Plane &running_plane() {
 
 void run_on(Plane &plane) {
   chosen = &plane;
+}
+
+Wires &get_wires() {
+  auto *const wires = running_plane().find_wires();
+  if (wires == nullptr) {
+    throw Refused(QEX_NOT_SUPPORTED, "the wires are real: what comes over them cannot be set");
+  }
+  return *wires;
+}
+
+void commit(storage::Transaction &transaction) {
+  if (transaction.access() == storage::Access::read) {
+    transaction.commit();
+    return;
+  }
+  auto &plane = running_plane();
+  plane.prepare(transaction);
+  transaction.commit();
+  plane.committed();
 }
 
 }  // namespace simhost

@@ -8,12 +8,9 @@
 #include "model/lookup.h"
 #include "model/options/host_settings.h"
 #include "model/options/runtime_options.h"
+#include "model/plane.h"
 #include "model/switches/switches.h"
-#include "planes/stored/counters.h"
-#include "planes/stored/links.h"
-#include "planes/stored/mac_tables.h"
-#include "planes/stored/multicast.h"
-#include "planes/stored/teaming.h"
+#include "model/uplinks/lags.h"
 #include "scenario/named_properties.h"
 #include "scenario/scenario.h"
 #include "scenario/texts.h"
@@ -39,17 +36,22 @@ double seconds(ClockTime time) {
   return static_cast<double>(time.count()) / 1000;
 }
 
+void describe_link(Json &described, Link const &link) {
+  described["link"] = choice_to_json(link.carrier, kUpDown);
+  described["admin"] = choice_to_json(link.admin, kUpDown);
+  described["lacp"] = choice_to_json(link.partner, kUpDown);
+  described["speed"] = link.speed;
+  described["duplex"] = choice_to_json(link.full_duplex, kDuplex);
+  described["beacons"] = choice_to_json(link.beacons, kUpDown);
+  described["error_percent"] = link.error_percent;
+  described["driver"] = link.driver;
+}
+
 Json uplink_to_json(Transaction &transaction, storage::Uplink const &uplink) {
-  auto const link = stored::link_of(transaction, uplink.name);
-  Json described{{"name", uplink.name},
-                 {"link", choice_to_json(link.carrier, kUpDown)},
-                 {"admin", choice_to_json(link.admin, kUpDown)},
-                 {"lacp", choice_to_json(link.partner, kUpDown)},
-                 {"speed", link.speed},
-                 {"duplex", choice_to_json(link.full_duplex, kDuplex)},
-                 {"beacons", choice_to_json(link.beacons, kUpDown)},
-                 {"error_percent", link.error_percent},
-                 {"driver", link.driver}};
+  Json described{{"name", uplink.name}};
+  if (auto *const wires = running_plane().find_wires()) {
+    describe_link(described, wires->link_of(transaction, uplink.name));
+  }
   if (uplink.port) {
     auto const port = get_port(transaction, *uplink.port);
     described["observed"] = {
@@ -70,15 +72,16 @@ Json address_to_json(VSMACEntry const &entry) {
 }
 
 Json addresses_to_json(Transaction &transaction, Place const &place) {
-  return each_to_json(stored::addresses(transaction, place, VS_MAC_ADDR_TYPE_ALL), address_to_json);
+  return each_to_json(running_plane().addresses(transaction, place, VS_MAC_ADDR_TYPE_ALL),
+                      address_to_json);
 }
 
 Json groups_to_json(Transaction &transaction, storage::PortNumber port) {
   Json list = Json::array();
   for (auto const length : {6, 4, 16}) {
     for (auto const &address :
-         stored::groups(transaction, port, static_cast<std::size_t>(length))) {
-      auto const group = *stored::group(transaction, port, address);
+         running_plane().groups(transaction, port, static_cast<std::size_t>(length))) {
+      auto const group = *running_plane().group(transaction, port, address);
       list.push_back({{"address", address_text(address)},
                       {"version", group.version},
                       {"source_mode", choice_to_json(group.source_mode, kSourceModes)},
@@ -106,14 +109,13 @@ void describe_properties(Json &described, Transaction &transaction, PropertyOwne
 
 Json counters_to_json(Transaction &transaction, CounterOwner const &owner) {
   Json list = Json::object();
-  for (auto const &[name, value] : stored::counters_of(transaction, owner)) {
-    list[name] = value;
+  for (auto const &[name, value] : running_plane().counters(transaction, owner)) {
+    list[std::string(name)] = value;
   }
   return list;
 }
 
-Json port_to_json(Transaction &transaction, storage::Port const &port,
-                  stored::Carriers const &carriers) {
+Json port_to_json(Transaction &transaction, storage::Port const &port) {
   auto const owner = PropertyOwner::port(port.switch_key, port.number);
   Place const place{.switch_key = port.switch_key, .port = port.number};
   Json described{{"id", port.identifier}};
@@ -128,7 +130,7 @@ Json port_to_json(Transaction &transaction, storage::Port const &port,
   describe_properties(described, transaction, owner, named_of_port());
   Json observed{{"number", static_cast<std::uint32_t>(port.number)}};
   try {
-    observed["uplink"] = carriers.required_of(port);
+    observed["uplink"] = running_plane().team_uplink(transaction, port);
   } catch (Refused const &refused) {
     observed["uplink"] = nullptr;
     observed["why"] = refusal_text(refused);
@@ -161,12 +163,10 @@ Json lag_to_json(Lag const &lag) {
 }
 
 Json ports_to_json(Transaction &transaction, storage::SwitchKey key) {
-  auto const own = stored::own_teamings(transaction, key);
-  stored::Carriers const carriers(stored::team_of(transaction, key), own);
   Json list = Json::array();
   for (auto const &port : storage::ports_of(transaction, key)) {
     if (port.kind == storage::PortKind::client) {
-      list.push_back(port_to_json(transaction, port, carriers));
+      list.push_back(port_to_json(transaction, port));
     }
   }
   return list;
@@ -174,7 +174,7 @@ Json ports_to_json(Transaction &transaction, storage::SwitchKey key) {
 
 Json session_counters_to_json(Transaction &transaction, storage::SwitchKey key) {
   Json sessions = Json::object();
-  for (auto const &sid : stored::counting_sessions(transaction, key)) {
+  for (auto const &sid : running_plane().counting_sessions(transaction, key)) {
     sessions[sid] = counters_to_json(transaction, {.switch_key = key, .session = sid});
   }
   return sessions;
@@ -191,7 +191,7 @@ Json switch_to_json(Transaction &transaction, storage::FoundSwitch const &known)
   described["uplink_ports"] = uplink_ports_to_json(transaction, key);
   described["uplinks"] = each_to_json(storage::uplinks_of(transaction, key),
                                       [](auto const &uplink) { return uplink.name; });
-  described["lags"] = each_to_json(stored::lags_of(transaction, key), lag_to_json);
+  described["lags"] = each_to_json(lags_of(transaction, key), lag_to_json);
   describe_members(described, transaction, owner, named_of_switch());
   described["ports"] = ports_to_json(transaction, key);
   described["addresses"] =

@@ -2,14 +2,14 @@
 #include "scenario/scenario.h"
 
 #include <algorithm>
+#include <array>
 #include <string>
 
 #include "clock/clock.h"
 #include "faults/faults.h"
 #include "model/options/host_settings.h"
 #include "model/options/runtime_options.h"
-#include "planes/stored/links.h"
-#include "planes/stored/teaming.h"
+#include "model/plane.h"
 #include "qexapi/names.h"
 #include "scenario/reading.h"
 #include "scenario/scenario_switches.h"
@@ -34,17 +34,17 @@ void apply_clock(Transaction &transaction, Node const &node) {
            [&](Node const &now) { set_clock(transaction, ClockTime(now.milliseconds())); });
 }
 
-void apply_uplink(Transaction &transaction, Node const &node) {
-  node.only({"name", "link", "admin", "lacp", "speed", "duplex", "beacons", "error_percent",
-             "driver", "observed"});
-  auto const name = node.at("name").text();
-  if (name.empty() || name.size() >= QEX_MISC_NAME_MAX) {
-    node.at("name").fail("must have 1 to 31 bytes");
-  }
-  if (!storage::find_uplink(transaction, name)) {
-    storage::add_uplink(transaction, name);
-  }
-  auto const before = stored::link_of(transaction, name);
+constexpr std::array kLinkKeys{"link",   "admin",   "lacp",          "speed",
+                               "duplex", "beacons", "error_percent", "driver"};
+
+bool has_link(Node const &node) {
+  return std::ranges::any_of(kLinkKeys,
+                             [&](auto const *key) { return node.find(key).has_value(); });
+}
+
+void apply_link(Transaction &transaction, std::string const &name, Node const &node) {
+  auto &wires = get_wires();
+  auto const before = wires.link_of(transaction, name);
   auto link = before;
   link.carrier = node.get("link", before.carrier, up_or_down);
   link.admin = node.get("admin", before.admin, up_or_down);
@@ -57,7 +57,22 @@ void apply_uplink(Transaction &transaction, Node const &node) {
   link.error_percent = node.get("error_percent", before.error_percent,
                                 [](Node const &percent) { return percent.integer(0, 100); });
   link.driver = node.get("driver", before.driver, [](Node const &driver) { return driver.flag(); });
-  stored::change_link(transaction, name, link);
+  wires.change_link(transaction, name, link);
+}
+
+void apply_uplink(Transaction &transaction, Node const &node) {
+  node.only({"name", "link", "admin", "lacp", "speed", "duplex", "beacons", "error_percent",
+             "driver", "observed"});
+  auto const name = node.at("name").text();
+  if (name.empty() || name.size() >= QEX_MISC_NAME_MAX) {
+    node.at("name").fail("must have 1 to 31 bytes");
+  }
+  if (!storage::find_uplink(transaction, name)) {
+    storage::add_uplink(transaction, name);
+  }
+  if (has_link(node)) {
+    apply_link(transaction, name, node);
+  }
 }
 
 void apply_runtime_option(Transaction &transaction, std::string const &name, Node const &node) {

@@ -7,14 +7,13 @@
 #include <string_view>
 #include <vector>
 
+#include "model/counters/counters.h"
 #include "model/lookup.h"
+#include "model/plane.h"
 #include "model/ports/ports.h"
 #include "model/properties/properties.h"
 #include "model/switches/switches.h"
-#include "planes/stored/counters.h"
-#include "planes/stored/links.h"
-#include "planes/stored/mac_tables.h"
-#include "planes/stored/multicast.h"
+#include "model/uplinks/lags.h"
 #include "scenario/named_properties.h"
 #include "scenario/reading.h"
 #include "storage/store.h"
@@ -79,7 +78,7 @@ void apply_properties(Transaction &transaction, PropertyOwner const &owner, Name
 
 void set_counters(Transaction &transaction, CounterOwner const &owner, Node const &counters) {
   for_each_member(counters, [&](std::string const &name, Node const &value) {
-    stored::set_counter(transaction, owner, name, value.counter());
+    set_counter(transaction, owner, name, value.counter());
   });
 }
 
@@ -112,7 +111,7 @@ VSMACEntry address_entry_from(Node const &node) {
 
 void apply_addresses(Transaction &transaction, Place const &place, Node const &node) {
   for_each_in(node, "addresses", [&](Node const &item) {
-    stored::describe_address(transaction, place, address_entry_from(item));
+    get_wires().describe_address(transaction, place, address_entry_from(item));
   });
 }
 
@@ -152,8 +151,9 @@ void apply_port(Transaction &transaction, storage::SwitchKey key, Node const &no
            [&](Node const &external) { set_external_id(transaction, port, external.text()); });
   apply_properties(transaction, owner, named_of_port(), node);
   apply_addresses(transaction, {.switch_key = key, .port = port.number}, node);
-  for_each_in(node, "groups",
-              [&](Node const &item) { stored::join(transaction, port.number, group_from(item)); });
+  for_each_in(node, "groups", [&](Node const &item) {
+    get_wires().join(transaction, port.number, group_from(item));
+  });
   apply_counters(transaction, {.switch_key = key, .port = port.number}, node);
 }
 
@@ -236,7 +236,7 @@ void apply_lag(Transaction &transaction, storage::SwitchKey key, Node const &nod
   for (auto const &uplink : node.at("uplinks").items()) {
     uplinks.push_back(uplink.text());
   }
-  stored::put_lag(transaction, key, node.at("name").text(), uplinks);
+  put_lag(transaction, key, node.at("name").text(), uplinks);
 }
 
 void apply_session_counters(Transaction &transaction, storage::SwitchKey key, Node const &node) {

@@ -116,7 +116,7 @@ void Store::create_if_blank(Populate const &populate) {
   transaction.commit();
 }
 
-Transaction::Transaction(Store &store, Access access) : store_(store) {
+Transaction::Transaction(Store &store, Access access) : store_(store), access_(access) {
   connection().database.exec(access == Access::write ? "BEGIN IMMEDIATE" : "BEGIN");
 }
 

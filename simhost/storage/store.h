@@ -61,6 +61,7 @@ class Transaction {
   Transaction(Transaction const &) = delete;
   Transaction &operator=(Transaction const &) = delete;
 
+  [[nodiscard]] Access access() const { return access_; }
   void commit();
 
   /// The key of the row that was inserted last.
@@ -73,6 +74,7 @@ class Transaction {
   [[nodiscard]] Connection &connection() const { return *store_.connection_; }
 
   Store &store_;
+  Access access_;
   bool open_ = true;
 };
 

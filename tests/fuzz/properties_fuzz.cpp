@@ -4,9 +4,9 @@
 #include <string>
 
 #include "model/lookup.h"
+#include "model/plane.h"
 #include "model/properties/properties.h"
 #include "model/state/images.h"
-#include "planes/stored/teaming.h"
 #include "tests/fuzz/host.h"
 #include "tests/fuzz/properties.h"
 

@@ -1,6 +1,4 @@
 // MAC tables: what is learned, what ages when, what has no room.
-#include "planes/stored/mac_tables.h"
-
 #include <gmock/gmock.h>
 
 #include <cstring>
@@ -15,10 +13,14 @@
 namespace {
 
 using simhost::Place;
-using simhost::stored::learn;
-using simhost::stored::Sighting;
+using simhost::Sighting;
 using std::chrono::milliseconds;
 using std::chrono::seconds;
+
+Sighting learn(simhost::storage::Transaction &transaction, Place const &place,
+               VSMACEntry const &source) {
+  return simhost::get_wires().learn(transaction, place, source);
+}
 
 VSMACEntry entry(unsigned char last, VSMACAddrType type = VS_MAC_ADDR_TYPE_USER,
                  qex_VlanID vid = 0) {
@@ -58,16 +60,16 @@ struct MacTables : Plane {
   /// The last bytes of the addresses at a place.
   std::vector<int> at(Place const &place, VSMACAddrType type = VS_MAC_ADDR_TYPE_ALL) {
     std::vector<int> lasts;
-    for (auto const &found : simhost::stored::addresses(transaction, place, type)) {
+    for (auto const &found : simhost::running_plane().addresses(transaction, place, type)) {
       lasts.push_back(found.macAddress[5]);
     }
     return lasts;
   }
   QEX_ReturnStatus put(Place const &place, VSMACEntry const &wanted) {
-    return status_of([&] { simhost::stored::put_address(transaction, place, wanted); });
+    return status_of([&] { simhost::running_plane().put_address(transaction, place, wanted); });
   }
   QEX_ReturnStatus remove(Place const &place, VSMACEntry const &wanted) {
-    return status_of([&] { simhost::stored::remove_address(transaction, place, wanted); });
+    return status_of([&] { simhost::running_plane().remove_address(transaction, place, wanted); });
   }
 
   Place at1;
@@ -90,7 +92,8 @@ TEST_F(MacTables, LearnWhereAnAddressIs) {
 TEST_F(MacTables, EntriesSayWhatIsKnown) {
   learn(transaction, at1, entry(1, VS_MAC_ADDR_TYPE_LEARNED, 42));
   simhost::step_clock(transaction, milliseconds(2999));
-  auto const found = simhost::stored::addresses(transaction, at1, VS_MAC_ADDR_TYPE_ALL).at(0);
+  auto const found =
+      simhost::running_plane().addresses(transaction, at1, VS_MAC_ADDR_TYPE_ALL).at(0);
   EXPECT_EQ(std::memcmp(found.macAddress, entry(1).macAddress, sizeof found.macAddress), 0);
   EXPECT_EQ(found.macAddrType, VS_MAC_ADDR_TYPE_LEARNED);
   EXPECT_EQ(found.aging, 1);
@@ -113,9 +116,9 @@ TEST_F(MacTables, AgeToTheMillisecond) {
   EXPECT_THAT(at(at1), ElementsAre(1));
   simhost::step_clock(transaction, milliseconds(1));
   EXPECT_THAT(at(at1), IsEmpty());
-  EXPECT_EQ(
-      static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at1).numMACsLearned),
-      0U);
+  EXPECT_EQ(static_cast<qex_uint64>(
+                simhost::running_plane().learning_stats(transaction, at1).numMACsLearned),
+            0U);
   EXPECT_EQ(learn(transaction, at1, entry(1)), Sighting::learned) << "it is new again";
 }
 
@@ -165,13 +168,16 @@ TEST_F(MacTables, MovesAreCountedWhereTheyGo) {
   EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::moved);
   EXPECT_THAT(at(at1), IsEmpty());
   EXPECT_THAT(at(at2), ElementsAre(1));
-  EXPECT_EQ(static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at1).numMACsMoved),
+  EXPECT_EQ(static_cast<qex_uint64>(
+                simhost::running_plane().learning_stats(transaction, at1).numMACsMoved),
             0U);
-  EXPECT_EQ(static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at2).numMACsMoved),
+  EXPECT_EQ(static_cast<qex_uint64>(
+                simhost::running_plane().learning_stats(transaction, at2).numMACsMoved),
             1U);
   EXPECT_EQ(learn(transaction, team, entry(1)), Sighting::moved);
   EXPECT_EQ(learn(transaction, at2, entry(1)), Sighting::moved);
-  EXPECT_EQ(static_cast<qex_uint64>(simhost::stored::learning_stats(transaction, at2).numMACsMoved),
+  EXPECT_EQ(static_cast<qex_uint64>(
+                simhost::running_plane().learning_stats(transaction, at2).numMACsMoved),
             2U);
 }
 
@@ -206,7 +212,7 @@ TEST_F(MacTables, AFullPortFollowsItsPolicy) {
   EXPECT_EQ(learn(transaction, at1, entry(3)), Sighting::dropped);
   EXPECT_EQ(learn(transaction, at1, entry(4)), Sighting::dropped);
   EXPECT_THAT(at(at1), ElementsAre(1, 2));
-  auto const stats = simhost::stored::learning_stats(transaction, at1);
+  auto const stats = simhost::running_plane().learning_stats(transaction, at1);
   EXPECT_EQ(stats.numMACsLearned, 2U);
   EXPECT_EQ(qex_uint64{stats.noLearningAllowedPkts}, 1U);
   EXPECT_EQ(qex_uint64{stats.noLearningDroppedPkts}, 2U);
@@ -232,7 +238,7 @@ TEST_F(MacTables, TheSwitchHasALimitForAllItsPlaces) {
 // counts.
 TEST_F(MacTables, CountsFollowEveryChange) {
   auto const counted = [&](Place const &place) {
-    return qex_uint32{simhost::stored::learning_stats(transaction, place).numMACsLearned};
+    return qex_uint32{simhost::running_plane().learning_stats(transaction, place).numMACsLearned};
   };
   auto const learned = [&](std::initializer_list<unsigned char> lasts, Place const &place) {
     for (auto const last : lasts) {

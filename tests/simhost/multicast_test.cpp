@@ -1,6 +1,4 @@
 // Multicast groups of ports.
-#include "planes/stored/multicast.h"
-
 #include <gmock/gmock.h>
 
 #include <initializer_list>
@@ -27,10 +25,10 @@ AddressBytes const kIPv6 = bytes({0xFF, 2, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0
 
 struct Multicast : Plane {
   QEX_ReturnStatus join(McastGroup const &group) {
-    return status_of([&] { simhost::stored::join(transaction, p1.number, group); });
+    return status_of([&] { simhost::get_wires().join(transaction, p1.number, group); });
   }
   std::vector<AddressBytes> groups(simhost::storage::Port const &port, std::size_t length) {
-    return simhost::stored::groups(transaction, port.number, length);
+    return simhost::running_plane().groups(transaction, port.number, length);
   }
 };
 
@@ -57,24 +55,24 @@ TEST_F(Multicast, AReportReplacesWhatWasKnown) {
   first.sources = {bytes({10, 0, 0, 2}), bytes({10, 0, 0, 1})};
   ASSERT_EQ(join(first), QEX_OK);
   simhost::step_clock(transaction, std::chrono::seconds(5));
-  auto const known = simhost::stored::group(transaction, p1.number, kIPv4).value();
+  auto const known = simhost::running_plane().group(transaction, p1.number, kIPv4).value();
   EXPECT_EQ(known.version, 3U);
   EXPECT_EQ(known.source_mode, 1U);
   EXPECT_EQ(known.vni, 5U);
   EXPECT_EQ(known.updated, kStart);
   EXPECT_EQ(known.sources, first.sources) << "in the order of the report";
   ASSERT_EQ(join(group(kIPv4)), QEX_OK);
-  auto const replaced = simhost::stored::group(transaction, p1.number, kIPv4).value();
+  auto const replaced = simhost::running_plane().group(transaction, p1.number, kIPv4).value();
   EXPECT_EQ(replaced.updated, kStart + std::chrono::seconds(5));
   EXPECT_THAT(replaced.sources, IsEmpty());
 }
 
 TEST_F(Multicast, GroupsAreLeft) {
   ASSERT_EQ(join(group(kIPv4)), QEX_OK);
-  simhost::stored::leave(transaction, p1.number, kIPv4);
+  simhost::get_wires().leave(transaction, p1.number, kIPv4);
   EXPECT_THAT(groups(p1, 4), IsEmpty());
-  EXPECT_FALSE(simhost::stored::group(transaction, p1.number, kIPv4).has_value());
-  EXPECT_EQ(status_of([&] { simhost::stored::leave(transaction, p1.number, kIPv4); }),
+  EXPECT_FALSE(simhost::running_plane().group(transaction, p1.number, kIPv4).has_value());
+  EXPECT_EQ(status_of([&] { simhost::get_wires().leave(transaction, p1.number, kIPv4); }),
             QEX_NOT_FOUND);
 }
 

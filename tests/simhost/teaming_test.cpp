@@ -1,6 +1,4 @@
 // Links, groups of links, and which of them a port uses.
-#include "planes/stored/teaming.h"
-
 #include <gmock/gmock.h>
 
 #include <cstddef>
@@ -10,8 +8,8 @@
 #include <vector>
 
 #include "model/options/runtime_options.h"
+#include "model/uplinks/lags.h"
 #include "plane.h"
-#include "planes/stored/counters.h"
 #include "qexapi/switch_properties.h"
 #include "vswitch/lags.h"
 #include "vswitch/properties.h"
@@ -19,17 +17,20 @@
 
 namespace {
 
-using simhost::stored::Link;
+using simhost::Link;
 using testing::ElementsAre;
+
+constexpr auto kSent = simhost::counter_in(&VSRARPStats::rarpPktsSent);
+constexpr auto kTime = simhost::counter_in(&VSRARPStats::rarpTime);
 
 struct Teaming : Plane {
   std::string hint(simhost::storage::Port const &port) {
     return simhost::running_plane().team_uplink(transaction, port);
   }
   void change(char const *uplink, void (*how)(Link &)) {
-    auto link = simhost::stored::link_of(transaction, uplink);
+    auto link = simhost::get_wires().link_of(transaction, uplink);
     how(link);
-    simhost::stored::change_link(transaction, uplink, link);
+    simhost::get_wires().change_link(transaction, uplink, link);
   }
   void down(char const *uplink) {
     change(uplink, [](Link &link) { link.carrier = false; });
@@ -37,8 +38,8 @@ struct Teaming : Plane {
   void up(char const *uplink) {
     change(uplink, [](Link &link) { link.carrier = true; });
   }
-  std::uint64_t counted(char const *name) {
-    return simhost::stored::counters_of(transaction, {.switch_key = key})[name];
+  std::uint64_t counted(simhost::Counter const &counter) {
+    return simhost::running_plane().counters(transaction, {.switch_key = key}).of(counter);
   }
 };
 
@@ -230,15 +231,15 @@ TEST_F(Teaming, MovesAreAnnounced) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, notifying);
   set_policy(of(p2), VSPROP_PORT_TEAMING_POLICY, policy({"uplink1"}, {"uplink2"}));
   down("nic0");
-  EXPECT_EQ(counted("rarpPktsSent"), 1U) << "the policy of p2 does not ask for it";
-  EXPECT_EQ(counted("rarpTime"), 1000000U);
+  EXPECT_EQ(counted(kSent), 1U) << "the policy of p2 does not ask for it";
+  EXPECT_EQ(counted(kTime), 1000000U);
   down("nic2");
-  EXPECT_EQ(counted("rarpPktsSent"), 1U) << "nothing moved";
+  EXPECT_EQ(counted(kSent), 1U) << "nothing moved";
   up("nic0");
-  EXPECT_EQ(counted("rarpPktsSent"), 2U);
+  EXPECT_EQ(counted(kSent), 2U);
   simhost::set_runtime_option(transaction, VS_RT_OPT_MAX_RARPS_PER_INTERVAL, 0);
   down("nic0");
-  EXPECT_EQ(counted("rarpPktsSent"), 2U);
+  EXPECT_EQ(counted(kSent), 2U);
 }
 
 TEST_F(Teaming, ASwitchThatDoesNotRunAnnouncesNothing) {
@@ -247,14 +248,14 @@ TEST_F(Teaming, ASwitchThatDoesNotRunAnnouncesNothing) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, notifying);
   simhost::change_running(transaction, key, false);
   down("nic0");
-  EXPECT_EQ(counted("rarpPktsSent"), 0U);
+  EXPECT_EQ(counted(kSent), 0U);
   EXPECT_EQ(hint(p1), "nic1");
 }
 
 struct Lags : Teaming {
-  std::vector<simhost::Lag> lags() { return simhost::running_plane().lags(transaction, key); }
+  std::vector<simhost::Lag> lags() { return simhost::lags_of(transaction, key); }
   QEX_ReturnStatus put(std::string const &name, std::vector<std::string> const &uplinks) {
-    return status_of([&] { simhost::stored::put_lag(transaction, key, name, uplinks); });
+    return status_of([&] { simhost::put_lag(transaction, key, name, uplinks); });
   }
 };
 

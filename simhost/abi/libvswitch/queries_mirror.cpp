@@ -70,12 +70,9 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char cons
         simhost::runtime_number(transaction, VS_RT_OPT_ALLOW_MIRROR_STATS) == 0) {
       simhost::refuse(QEX_IS_DISABLED);
     }
-    auto counters = running_plane().counters(transaction, {.switch_key = key, .session = wanted});
-    output.mirrorPktCnt = counters["mirrorPktCnt"];
-    output.mirrorPktFailCnt = counters["mirrorPktFailCnt"];
-    output.mirroredPkts = counters["mirroredPkts"];
-    output.discardedPkts = counters["discardedPkts"];
-    output.failedPkts = counters["failedPkts"];
+    auto const counters =
+        running_plane().counters(transaction, {.switch_key = key, .session = wanted});
+    simhost::show(counters, output);
     static_assert(sizeof output.name == sizeof found->record.dname);
     std::memcpy(output.name, found->record.dname, sizeof output.name);
   });

@@ -4,6 +4,7 @@
 #include "abi/libvswitch/results.h"
 #include "model/lookup.h"
 #include "model/plane.h"
+#include "model/uplinks/lags.h"
 #include "vswitch/queries.h"
 
 using simhost::changing;
@@ -101,7 +102,7 @@ QEX_ReturnStatus VSQEX_GetLAGTable(char const *switchName, VSLAGTable **table) {
     auto &output = require(table);
     auto &transaction = call.transaction();
     auto const lags =
-        running_plane().lags(transaction, simhost::get_running_switch(transaction, alias).key);
+        simhost::lags_of(transaction, simhost::get_running_switch(transaction, alias).key);
     std::size_t trailing = 0;
     for (auto const &lag : lags) {
       trailing += size_of(lag);
@@ -128,10 +129,7 @@ QEX_ReturnStatus VSQEX_PortGetTeamUplinkHint(qex_SwitchPortID port, qex_Name *na
 QEX_ReturnStatus VSQEX_GetRARPStats(char const *switchName, VSRARPStats *stats) {
   return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(stats);
-    auto counters = switch_counters(call, switchName);
-    output.rarpPktsSent = static_cast<qex_uint32>(counters["rarpPktsSent"]);
-    output.maxRARPTime = static_cast<qex_uint32>(counters["maxRARPTime"]);
-    output.rarpTime = counters["rarpTime"];
+    simhost::show(switch_counters(call, switchName), output);
   });
 }
 
@@ -139,13 +137,7 @@ QEX_ReturnStatus VSQEX_GetServicePortTeamingStats(char const *switchName,
                                                   VSServicePortTeamingStats *stats) {
   return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(stats);
-    auto counters = switch_counters(call, switchName);
-    output.txFromSrvPort = counters["txFromSrvPort"];
-    output.txUsingSrvPortFRP = counters["txUsingSrvPortFRP"];
-    output.txUsingPktSrcPortFRP = counters["txUsingPktSrcPortFRP"];
-    output.txErrors = counters["txErrors"];
-    output.rxToSrvPort = counters["rxToSrvPort"];
-    output.rxRpfOverride = counters["rxRpfOverride"];
+    simhost::show(switch_counters(call, switchName), output);
   });
 }
 

@@ -14,11 +14,9 @@
 #include "base/outcomes.h"
 #include "clock/clock.h"
 #include "faults/faults.h"
+#include "model/counters/counters.h"
 #include "model/lookup.h"
-#include "planes/stored/counters.h"
-#include "planes/stored/links.h"
-#include "planes/stored/mac_tables.h"
-#include "planes/stored/teaming.h"
+#include "model/plane.h"
 #include "scenario/lifecycle.h"
 #include "scenario/scenario.h"
 #include "scenario/texts.h"
@@ -47,7 +45,7 @@ int on_state(Work const &work) noexcept {
     std::scoped_lock const held(host.lock());
     Kind transaction(host.state());
     work(transaction);
-    transaction.commit();
+    simhost::commit(transaction);
     return QEX_OK;
   } catch (...) {
     return failure();
@@ -88,8 +86,8 @@ simhost::Place place_of(Transaction &transaction, char const *switch_name, char 
 }
 
 // What a frame's sender learns of what became of its address.
-void refuse_unlearned(simhost::stored::Sighting sighting) {
-  using simhost::stored::Sighting;
+void refuse_unlearned(simhost::Sighting sighting) {
+  using simhost::Sighting;
   switch (sighting) {
     case Sighting::learning_off:
       throw Refused(QEX_IS_DISABLED, "the port does not learn");
@@ -201,19 +199,20 @@ SIMHOST_API int simhost_clock_set(int64_t milliseconds) {
 SIMHOST_API int simhost_set_link(char const *uplink, int up) {
   return changing([&](ChangingTransaction &transaction) {
     auto const name = simhost::get_uplink(transaction, given(uplink)).name;
-    auto link = simhost::stored::link_of(transaction, name);
+    auto &wires = simhost::get_wires();
+    auto link = wires.link_of(transaction, name);
     link.carrier = up != 0;
-    simhost::stored::change_link(transaction, name, link);
+    wires.change_link(transaction, name, link);
   });
 }
 
 SIMHOST_API int simhost_learn(char const *switchName, char const *port, char const *mac,
                               uint16_t vlan, uint32_t vni) {
-  auto sighting = simhost::stored::Sighting::learned;
+  auto sighting = simhost::Sighting::learned;
   auto const status = changing([&](ChangingTransaction &transaction) {
     simhost::get_running_switch(transaction, given(switchName));
-    sighting = simhost::stored::learn(transaction, place_of(transaction, switchName, port),
-                                      source_of(given(mac), vlan, vni));
+    sighting = simhost::get_wires().learn(transaction, place_of(transaction, switchName, port),
+                                          source_of(given(mac), vlan, vni));
   });
   if (status != QEX_OK) {
     return status;
@@ -237,7 +236,7 @@ SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, ch
     simhost::CounterOwner const owner{.switch_key = place.switch_key,
                                       .port = place.port,
                                       .session = session == nullptr ? "" : session};
-    simhost::stored::set_counter(transaction, owner, given(name), value);
+    simhost::set_counter(transaction, owner, given(name), value);
   });
 }
 

@@ -1,9 +1,6 @@
 // Asking the data plane on behalf of those who ask for bytes.
 #include "model/ports/runtime_state.h"
 
-#include <array>
-#include <string_view>
-
 #include "base/outcomes.h"
 #include "model/lookup.h"
 #include "model/plane.h"
@@ -15,31 +12,6 @@
 
 namespace simhost {
 namespace {
-
-struct StatisticsField {
-  std::string_view name;
-  qex_uint64 qex_NEBPortStatistics::*field;
-};
-
-constexpr std::array<StatisticsField, 16> kStatistics{{
-    {"pktsInUnicast", &qex_NEBPortStatistics::pktsInUnicast},
-    {"bytesInUnicast", &qex_NEBPortStatistics::bytesInUnicast},
-    {"pktsInMulticast", &qex_NEBPortStatistics::pktsInMulticast},
-    {"bytesInMulticast", &qex_NEBPortStatistics::bytesInMulticast},
-    {"pktsInBroadcast", &qex_NEBPortStatistics::pktsInBroadcast},
-    {"bytesInBroadcast", &qex_NEBPortStatistics::bytesInBroadcast},
-    {"pktsOutUnicast", &qex_NEBPortStatistics::pktsOutUnicast},
-    {"bytesOutUnicast", &qex_NEBPortStatistics::bytesOutUnicast},
-    {"pktsOutMulticast", &qex_NEBPortStatistics::pktsOutMulticast},
-    {"bytesOutMulticast", &qex_NEBPortStatistics::bytesOutMulticast},
-    {"pktsOutBroadcast", &qex_NEBPortStatistics::pktsOutBroadcast},
-    {"bytesOutBroadcast", &qex_NEBPortStatistics::bytesOutBroadcast},
-    {"pktsInDropped", &qex_NEBPortStatistics::pktsInDropped},
-    {"pktsOutDropped", &qex_NEBPortStatistics::pktsOutDropped},
-    {"pktsInException", &qex_NEBPortStatistics::pktsInException},
-    {"pktsOutException", &qex_NEBPortStatistics::pktsOutException},
-}};
-static_assert(sizeof(qex_NEBPortStatistics) == kStatistics.size() * sizeof(qex_uint64));
 
 storage::Port get_port_key(storage::Transaction &transaction, storage::PropertyOwner const &owner) {
   return storage::find_port(transaction, owner.port_number.value()).value();
@@ -100,11 +72,7 @@ Bytes read_port_statistics(storage::Transaction &transaction, storage::PropertyO
   auto const counters = running_plane().counters(
       transaction, {.switch_key = owner.switch_key, .port = owner.port_number});
   qex_NEBPortStatistics statistics{};
-  for (auto const &[name, field] : kStatistics) {
-    if (auto const counter = counters.find(name); counter != counters.end()) {
-      statistics.*field = counter->second;
-    }
-  }
+  show(counters, statistics);
   return copied(bytes_of(statistics));
 }
 

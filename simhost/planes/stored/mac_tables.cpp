@@ -112,7 +112,10 @@ Sighting turn_away(storage::Transaction &transaction, Place const &place,
   }
   bool const drop = port.macLimitPolicy == VSPORT_MAC_LEARNING_LIMIT_POLICY_DROP;
   CounterOwner const owner{.switch_key = place.switch_key, .port = place.port};
-  add_to_counter(transaction, owner, drop ? "noLearningDroppedPkts" : "noLearningAllowedPkts", 1);
+  add_to_counter(transaction, owner,
+                 drop ? counter_in(&VSPMACLearningStats::noLearningDroppedPkts)
+                      : counter_in(&VSPMACLearningStats::noLearningAllowedPkts),
+                 1);
   return drop ? Sighting::dropped : Sighting::let_through;
 }
 
@@ -196,25 +199,20 @@ Sighting learn(storage::Transaction &transaction, Place const &place, VSMACEntry
       {.name = name_of(source), .type = VS_MAC_ADDR_TYPE_LEARNED, .ages = true, .seen = now});
   if (known && place.port) {
     CounterOwner const owner{.switch_key = place.switch_key, .port = place.port};
-    add_to_counter(transaction, owner, "numMACsMoved", 1);
+    add_to_counter(transaction, owner, counter_in(&VSPMACLearningStats::numMACsMoved), 1);
   }
   return known ? Sighting::moved : Sighting::learned;
 }
 
 VSPMACLearningStats learning_stats(storage::Transaction &transaction, Place const &place) {
-  auto counters = counters_of(transaction, {.switch_key = place.switch_key, .port = place.port});
   auto const gone = gone_if_seen_by(transaction, learning_of(transaction, place.switch_key));
   VSPMACLearningStats stats{};
   stats.numMACsLearned = static_cast<qex_uint32>(storage::count_learned(transaction, place) -
                                                  storage::count_aged(transaction, place, gone));
-  stats.noLearningAllowedPkts = counters["noLearningAllowedPkts"];
-  stats.noLearningDroppedPkts = counters["noLearningDroppedPkts"];
-  stats.numMACsMoved = counters["numMACsMoved"];
+  if (place.port) {
+    show(counters_of(transaction, {.switch_key = place.switch_key, .port = place.port}), stats);
+  }
   return stats;
-}
-
-void forget_learned(storage::Transaction &transaction) {
-  storage::remove_learned(transaction);
 }
 
 }  // namespace simhost::stored

@@ -68,18 +68,4 @@ void leave(storage::Transaction &transaction, storage::PortNumber port,
   }
 }
 
-std::vector<AddressBytes> groups(storage::Transaction &transaction, storage::PortNumber port,
-                                 std::size_t length) {
-  return storage::group_addresses(transaction, port, length);
-}
-
-std::optional<McastGroup> group(storage::Transaction &transaction, storage::PortNumber port,
-                                AddressBytes const &address) {
-  return storage::find_group(transaction, port, address);
-}
-
-void forget_groups(storage::Transaction &transaction) {
-  storage::remove_groups(transaction);
-}
-
 }  // namespace simhost::stored

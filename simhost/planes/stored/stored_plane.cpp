@@ -1,5 +1,5 @@
-// A data plane without frames: what it knows is in the state, so all processes see the same. What
-// would come to it over wires is put there by the functions beside this file.
+// A plane without frames: what it knows is in the state, so that all processes see the same, in the
+// transaction in which they ask.
 #include "planes/stored/stored_plane.h"
 
 #include "planes/stored/counters.h"
@@ -8,34 +8,80 @@
 #include "planes/stored/multicast.h"
 #include "planes/stored/teaming.h"
 
-namespace simhost {
+namespace simhost::stored {
 namespace {
+
+class StoredWires : public Wires {
+ public:
+  Link link_of(storage::Transaction &transaction, std::string_view uplink) override {
+    return stored::link_of(transaction, uplink);
+  }
+  void change_link(storage::Transaction &transaction, std::string_view uplink,
+                   Link const &link) override {
+    stored::change_link(transaction, uplink, link);
+  }
+  Sighting learn(storage::Transaction &transaction, Place const &place,
+                 VSMACEntry const &source) override {
+    return stored::learn(transaction, place, source);
+  }
+  void describe_address(storage::Transaction &transaction, Place const &place,
+                        VSMACEntry const &entry) override {
+    stored::describe_address(transaction, place, entry);
+  }
+  void join(storage::Transaction &transaction, storage::PortNumber port,
+            McastGroup const &group) override {
+    stored::join(transaction, port, group);
+  }
+  void leave(storage::Transaction &transaction, storage::PortNumber port,
+             AddressBytes const &address) override {
+    stored::leave(transaction, port, address);
+  }
+  void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
+                   Counter const &counter, std::uint64_t value) override {
+    stored::set_counter(transaction, owner, counter, value);
+  }
+};
 
 class StoredPlane : public Plane {
  public:
   bool link_is_up(storage::Transaction &transaction, std::string_view uplink) override {
-    return stored::link_of(transaction, uplink).up();
+    return link_of(transaction, uplink).up();
   }
   bool lacp_is_up(storage::Transaction &transaction, std::string_view uplink) override {
-    auto const link = stored::link_of(transaction, uplink);
-    return link.up() && link.partner && stored::is_aggregated(transaction, uplink);
-  }
-  void set_admin_state(storage::Transaction &transaction, std::string_view uplink,
-                       bool up) override {
-    auto link = stored::link_of(transaction, uplink);
-    link.admin = up;
-    stored::change_link(transaction, uplink, link);
-  }
-  std::vector<Lag> lags(storage::Transaction &transaction, storage::SwitchKey switch_key) override {
-    return stored::lags_of(transaction, switch_key);
+    return stored::lacp_is_up(transaction, uplink);
   }
   std::string team_uplink(storage::Transaction &transaction, storage::Port const &port) override {
     return stored::team_uplink(transaction, port);
   }
-
   std::vector<VSMACEntry> addresses(storage::Transaction &transaction, Place const &place,
                                     VSMACAddrType type) override {
     return stored::addresses(transaction, place, type);
+  }
+  VSPMACLearningStats learning_stats(storage::Transaction &transaction,
+                                     Place const &place) override {
+    return stored::learning_stats(transaction, place);
+  }
+  std::vector<AddressBytes> groups(storage::Transaction &transaction, storage::PortNumber port,
+                                   std::size_t length) override {
+    return storage::group_addresses(transaction, port, length);
+  }
+  std::optional<McastGroup> group(storage::Transaction &transaction, storage::PortNumber port,
+                                  AddressBytes const &address) override {
+    return storage::find_group(transaction, port, address);
+  }
+  Counters counters(storage::Transaction &transaction, CounterOwner const &owner) override {
+    return counters_of(transaction, owner);
+  }
+  std::vector<std::string> counting_sessions(storage::Transaction &transaction,
+                                             storage::SwitchKey key) override {
+    return storage::sessions_with_counters(transaction, key);
+  }
+
+  void set_admin_state(storage::Transaction &transaction, std::string_view uplink,
+                       bool up) override {
+    auto link = link_of(transaction, uplink);
+    link.admin = up;
+    change_link(transaction, uplink, link);
   }
   void put_address(storage::Transaction &transaction, Place const &place,
                    VSMACEntry const &entry) override {
@@ -45,39 +91,27 @@ class StoredPlane : public Plane {
                       VSMACEntry const &entry) override {
     stored::remove_address(transaction, place, entry);
   }
-  VSPMACLearningStats learning_stats(storage::Transaction &transaction,
-                                     Place const &place) override {
-    return stored::learning_stats(transaction, place);
-  }
-
-  std::vector<AddressBytes> groups(storage::Transaction &transaction, storage::PortNumber port,
-                                   std::size_t length) override {
-    return stored::groups(transaction, port, length);
-  }
-  std::optional<McastGroup> group(storage::Transaction &transaction, storage::PortNumber port,
-                                  AddressBytes const &address) override {
-    return stored::group(transaction, port, address);
-  }
-
-  Counters counters(storage::Transaction &transaction, CounterOwner const &owner) override {
-    return stored::counters_of(transaction, owner);
-  }
-
   void restart(storage::Transaction &transaction) override {
-    stored::forget_learned(transaction);
-    stored::forget_groups(transaction);
-    stored::forget_counters(transaction);
+    storage::remove_learned(transaction);
+    storage::remove_groups(transaction);
+    storage::remove_counters(transaction);
   }
+
+  // The state is what runs: whatever it says, it says to whoever asks next.
+  void prepare(storage::Transaction & /*transaction*/) override {}
+  void committed() noexcept override {}
+
+  Wires *find_wires() override { return &wires_; }
+
+ private:
+  StoredWires wires_;
 };
 
 }  // namespace
-
-namespace stored {
 
 Plane &plane() {
   static StoredPlane plane;
   return plane;
 }
 
-}  // namespace stored
-}  // namespace simhost
+}  // namespace simhost::stored

@@ -55,10 +55,11 @@ std::optional<std::size_t> place_of(Team const &team, std::string_view name) {
 std::vector<std::size_t> places_in_group(Team const &team, std::string_view name) {
   std::vector<std::size_t> places;
   auto const lag = std::find_if(team.lags.begin(), team.lags.end(),
-                                [&](Lag const &known) { return known.name == name; });
+                                [&](auto const &known) { return known.name == name; });
   if (lag != team.lags.end()) {
-    for (auto const &member : lag->members) {
-      if (auto const place = place_of(team, member.uplink); member.up && place) {
+    for (auto const &uplink : lag->uplinks) {
+      if (auto const place = place_of(team, uplink);
+          place && answers_aggregation(team.uplinks[*place].link)) {
         places.push_back(*place);
       }
     }
@@ -108,7 +109,7 @@ Named named_by(Team const &team, VSTeamPolicy const &policy) {
 
 Team team_of(storage::Transaction &transaction, storage::SwitchKey key) {
   Team team{.uplinks = {},
-            .lags = lags_of(transaction, key),
+            .lags = storage::all_lags(transaction, key),
             .policy = policy<VSTeamPolicy>(transaction, storage::PropertyOwner::global(key),
                                            VSPROP_SWITCH_TEAMING)
                           .value_or(kDefaultTeaming),
@@ -122,7 +123,7 @@ Team team_of(storage::Transaction &transaction, storage::SwitchKey key) {
                             .port = alias_of(transaction, port).value_or(port.identifier),
                             .identifier = port.identifier,
                             .link = link_of(transaction, name),
-                            .aggregated = is_aggregated(transaction, name),
+                            .aggregated = storage::is_in_lag(transaction, name),
                             .blocked = blocked != 0});
   }
   return team;

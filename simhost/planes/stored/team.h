@@ -25,7 +25,7 @@ struct TeamUplink {
 /// What all ports of a switch have in common.
 struct Team {
   std::vector<TeamUplink> uplinks;  ///< in the order of their ports
-  std::vector<Lag> lags;
+  std::vector<storage::LagRow> lags;
   VSTeamPolicy policy;  ///< of the ports without one of their own
   ClockTime now;
   ClockTime up_delay;

@@ -39,8 +39,8 @@ void announce(storage::Transaction &transaction, storage::SwitchKey key, std::ui
       static_cast<std::uint64_t>(runtime_number(transaction, VS_RT_OPT_MAX_RARPS_PER_INTERVAL));
   if (auto const sent = std::min(moves, most); sent > 0) {
     CounterOwner const owner{.switch_key = key};
-    add_to_counter(transaction, owner, "rarpPktsSent", sent);
-    set_counter(transaction, owner, "rarpTime",
+    add_to_counter(transaction, owner, counter_in(&VSRARPStats::rarpPktsSent), sent);
+    set_counter(transaction, owner, counter_in(&VSRARPStats::rarpTime),
                 static_cast<std::uint64_t>(clock_now(transaction).count()));
   }
 }
