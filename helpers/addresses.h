@@ -1,7 +1,7 @@
 /**
  * Text forms of network addresses.
  *
- * For the module's own C++ only. Each answers a new `str`.
+ * For the module's own C++ only. Each returns a new `str`.
  */
 #ifndef HELPERS_ADDRESSES_H
 #define HELPERS_ADDRESSES_H

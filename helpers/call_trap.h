@@ -10,7 +10,7 @@
 extern "C" {
 #endif
 
-/** Raises what the library that sprang the trap left behind, and answers null. */
+/** Raises what the library that sprang the trap left behind, and returns null. */
 PyObject *raise_sprung_trap(void);
 
 #ifdef __cplusplus

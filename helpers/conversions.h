@@ -1,7 +1,7 @@
 /**
  * Conversions between Python objects and C values that every wrapper of the module shares.
  *
- * A conversion either fills its target and answers `kConverted`, or leaves it untouched and answers
+ * A conversion either fills its target and returns `kConverted`, or leaves it untouched and returns
  * the kind of failure, which the wrapper reports with the method's name, the argument's position
  * and its C type. Where a target may be null, the object is only tested. No conversion takes a
  * reference.
@@ -51,7 +51,7 @@ int unsigned_char_from_object(PyObject *object, unsigned char *value);
 int char_from_object(PyObject *object, char *value);
 
 /**
- * The UTF-8 bytes of a `str` in a new allocation, with a NUL behind them.
+ * The UTF-8 bytes of a `str` in a new allocation, with a trailing NUL.
  *
  * `*text` is the caller's to give to `free`; `*size` counts the NUL. A `str` that UTF-8 cannot
  * encode is a wrong type. The object must be a `str`; `text` and `size` may be null.
@@ -72,7 +72,7 @@ typedef struct ArrayText {
 int array_text_from_str(PyObject *str, size_t capacity, ArrayText *text);
 int array_text_from_chars(char const *chars, size_t capacity, ArrayText *text);
 
-/** Whether a text fits, and if so how much of it is stored; the rule behind the two above. */
+/** Whether a text fits, and if so how much of it is stored; the rule of the two above. */
 static inline int fit_array_text(size_t capacity, ArrayText *text) {
   if (capacity == 1 && text->size == 2) {
     text->size = 1;

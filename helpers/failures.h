@@ -34,7 +34,7 @@ void report_null_argument(char const *method, int position, char const *type) CO
 void report_null_variable(char const *name, char const *type) COLD;
 
 /**
- * Raises the interpreter's own error for a wrong number of arguments; null, as a call answers then.
+ * Raises the interpreter's own error for a wrong number of arguments; null, as a call returns then.
  *
  * `args` is the argument tuple, `expected` the number of arguments that `method` takes.
  */

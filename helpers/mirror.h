@@ -1,7 +1,7 @@
 /**
  * The mirror session table: its allocator, and the methods that walk and edit a table in place.
  *
- * Whatever a method answers lies in the table and ends with it.
+ * Whatever a method returns lies in the table and ends with it.
  */
 #ifndef HELPERS_MIRROR_H
 #define HELPERS_MIRROR_H
@@ -33,13 +33,13 @@ DVMirrorSession *mirror_session_at(DVMirrorSessionTable *table, int index);
 void mirror_set_session_at(DVMirrorSessionTable *table, int index, DVMirrorSession const *session);
 
 /**
- * An entity of the array behind the sessions.
+ * An entity of the array after the sessions.
  *
  * Warning: the index is not checked; pass a session's `startIdx`.
  */
 DVMirrorEntity *mirror_entity_at(DVMirrorSessionTable *table, int index);
 
-/** The entity behind this one. Warning: nothing tells the last one; count them. */
+/** The next entity. Warning: nothing tells the last one; count them. */
 DVMirrorEntity *mirror_next_entity(DVMirrorEntity *entity);
 
 /** What an entity of any kind names, NUL-terminated. */

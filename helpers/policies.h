@@ -25,7 +25,7 @@ void team_policy_set_name_at(VSTeamPolicy *policy, int index, char const *name);
 /** A copy of an entry of the array that starts at `entries`. Warning: the index is not checked. */
 VSPvlanMapEntry pvlan_entry_at(VSPvlanMapEntry *entries, int index);
 
-/** A copy of a range behind the policy. Warning: the index is not checked. */
+/** A copy of a trailing range of the policy. Warning: the index is not checked. */
 qex_NEBPortVIDRange vlan_policy_range_at(VSPortVlanPolicy *policy, int index);
 
 #ifdef __cplusplus

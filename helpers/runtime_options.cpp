@@ -20,7 +20,7 @@ std::uintptr_t address(void const *position) {
   return reinterpret_cast<std::uintptr_t>(position);
 }
 
-VSRuntimeOptionHeader *behind(void *position, size_t bytes) {
+VSRuntimeOptionHeader *after(void *position, size_t bytes) {
   return reinterpret_cast<VSRuntimeOptionHeader *>(address(position) + bytes);
 }
 
@@ -35,13 +35,13 @@ bool is_text(VSRuntimeOptionHeader const *option) {
 /// The option at `at` if `length` bytes fit there, and where the next one goes.
 VSRuntimeOptionHeader *write(VSRuntimeOptions *list, VSRuntimeOptionHeader *at, int type,
                              size_t length, void const *value) {
-  VSRuntimeOptionHeader *const next = behind(at, length);
+  VSRuntimeOptionHeader *const next = after(at, length);
   if (!lies_inside(list, next)) {
     return nullptr;
   }
   at->type = static_cast<qex_uint16>(type);
   at->length = static_cast<qex_uint16>(length);
-  std::memcpy(behind(at, kHeaderSize), value, length - kHeaderSize);
+  std::memcpy(after(at, kHeaderSize), value, length - kHeaderSize);
   return next;
 }
 
@@ -95,11 +95,11 @@ void runtime_options_set_length(VSRuntimeOptions *list, int used) {
 }
 
 VSRuntimeOptionHeader *runtime_options_first(VSRuntimeOptions *list) {
-  return behind(list, kLengthSize);
+  return after(list, kLengthSize);
 }
 
 VSRuntimeOptionHeader *runtime_options_next(VSRuntimeOptions *list, VSRuntimeOptionHeader *option) {
-  VSRuntimeOptionHeader *const next = behind(option, option->length);
+  VSRuntimeOptionHeader *const next = after(option, option->length);
   return lies_inside(list, next) ? next : nullptr;
 }
 
@@ -108,7 +108,7 @@ char const *runtime_option_name(VSRuntimeOptionHeader *option) {
 }
 
 PyObject *runtime_option_value(VSRuntimeOptionHeader *option) {
-  void const *const value = behind(option, kHeaderSize);
+  void const *const value = after(option, kHeaderSize);
   if (is_text(option)) {
     return PyBytes_FromString(static_cast<char const *>(value));
   }

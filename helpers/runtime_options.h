@@ -2,7 +2,7 @@
  * The runtime options list: building one, walking one, and the names of the options.
  *
  * A list is its total length, then options back to back, each a header of 4 bytes and its value.
- * Options may start at any byte. All positions that a function answers lie in the list.
+ * Options may start at any byte. All positions that a function returns lie in the list.
  */
 #ifndef HELPERS_RUNTIME_OPTIONS_H
 #define HELPERS_RUNTIME_OPTIONS_H
@@ -30,7 +30,7 @@ int get_runtime_option_type_from_name(char *name);
 VSRuntimeOptions *runtime_options_new(int size);
 
 /**
- * Writes an option at `at` and answers where the next one goes.
+ * Writes an option at `at` and returns where the next one goes.
  *
  * Null, with nothing written, if the option does not end before the last byte of the list: one byte
  * must stay free. An integer takes 8 bytes, a text its length and 5; a text of more than 127 bytes
@@ -47,7 +47,8 @@ void runtime_options_set_length(VSRuntimeOptions *list, int used);
 /** Where the first option is, even in an empty list: look at `totalLength` first. */
 VSRuntimeOptionHeader *runtime_options_first(VSRuntimeOptions *list);
 
-/** The option behind this one, or null. An option of length 0 answers itself for ever. */
+/** The next option, or null. The next one of an option of length 0 is that option itself, for ever.
+ */
 VSRuntimeOptionHeader *runtime_options_next(VSRuntimeOptions *list, VSRuntimeOptionHeader *option);
 
 /** The name of an option. Warning: its type is not checked; only types below VS_NUM_RT_OPT have

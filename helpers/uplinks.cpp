@@ -8,7 +8,7 @@
 
 namespace {
 
-/// A record with room for `count` slots behind it; a negative count asks for more than there is.
+/// A record with room for `count` trailing slots; a negative count asks for more than there is.
 template <typename Record>
 Record *allocate(int count, size_t slot_size) {
   return static_cast<Record *>(

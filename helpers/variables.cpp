@@ -1,4 +1,4 @@
-// The constants behind the module's variables.
+// The constants that the module's variables read.
 
 #include "helpers/exported.h"
 #include "qexapi/types.h"

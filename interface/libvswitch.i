@@ -38,7 +38,7 @@
 %include "records/switch_ports.i"
 %include "records/socket_addresses.i"
 
-// The two libraries: what runs, what is configured, what the state holds.
+// The two libraries: the runtime state, what is configured, what the state holds.
 %include "records/runtime_option_names.i"
 %include "records/ports.i"
 %include "records/mac_tables.i"

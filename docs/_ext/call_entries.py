@@ -1,4 +1,4 @@
-"""What there is to say of a call: arguments, answers, statuses, and whose memory is whose."""
+"""What there is to say of a call: arguments, results, statuses, and whose memory is whose."""
 
 import re
 from dataclasses import dataclass
@@ -44,7 +44,7 @@ class Call:
     forms: Tuple[Tuple[str, ...], ...]  # the names of the arguments; mostly one form
     results: Tuple[str, str]
     shape: Tuple[str, ...]  # the names of what a list holds; empty for a single result
-    statuses: Dict[str, str]  # when each is answered; empty where there is none
+    statuses: Dict[str, str]  # when each is returned; empty where there is none
     ownership: Tuple[str, ...]
     header: str
 
@@ -182,7 +182,7 @@ class Entries:
         return re.split(r"[.;](?:\s|$)", text, maxsplit=1)[0].replace("\n", " ")
 
     def _is_cell(self, one: Parameter) -> bool:
-        """Whether a call fills or reads a number or a pointer behind this one."""
+        """Whether a call fills or reads the number or the pointer that this one points to."""
         type_ = self._known.resolve(one.type)
         if type_.layers == ("p", "p"):
             return True

@@ -1,4 +1,4 @@
-"""The pages of calls: what each takes and answers, and with which statuses."""
+"""The pages of calls: what each takes and returns, and with which statuses."""
 
 from typing import Iterable, List, Sequence
 
@@ -32,7 +32,7 @@ class Functions(Described):
             yield self.labelled("In C", [self.words.code(call.prototype.rstrip(";"), call.name)])
         if call.arguments:
             yield self._parameters(call)
-        yield self.labelled("Answers", self._answer(call))
+        yield self.labelled("Returns", self._answer(call))
         if call.ownership:
             yield self.labelled("Ownership", self._joined(call.ownership))
         if call.statuses:

@@ -102,6 +102,6 @@ def _simulated(table: Path) -> Dict[str, str]:
         return {}
     rows = json.loads(table.read_text(encoding="utf-8"))
     return {
-        row["call"]: f"answers always {row['status']}" if "status" in row else row["answer"]
+        row["call"]: f"always returns {row['status']}" if "status" in row else row["answer"]
         for row in rows
     }

@@ -45,7 +45,7 @@ _COMMENT = r"/\*\*(?!<)(?P<comment>(?:[^*]|\*(?!/))*)\*/"
 _ITEM = re.compile(
     r"(?:/\*\*(?P<above>[^<](?:[^*]|\*(?!/))*)\*/\s*)?"
     r"(?P<name>\b\w+)\s*(?:=\s*[^,}/]+?)?\s*(?:,|$)[ \t]*"
-    r"(?:/\*\*<(?P<behind>(?:[^*]|\*(?!/))*)\*/)?",
+    r"(?:/\*\*<(?P<trailing>(?:[^*]|\*(?!/))*)\*/)?",
     re.MULTILINE,
 )
 _LISTED = re.compile(r"^- (?P<status>\w*) ?(?P<when>.*(?:\n(?!- ).+)*)\n?", re.MULTILINE)
@@ -76,7 +76,7 @@ def first_sentence(text: str) -> str:
 
 
 def _listed(text: str) -> Dict[str, str]:
-    """The statuses of a list, each with when it is answered."""
+    """The statuses of a list, each with when it is returned."""
     found: Dict[str, str] = {}
     for item in _LISTED.finditer(text):
         if item["status"] in found:
@@ -107,9 +107,9 @@ def _read_families(source: str, header: Header) -> None:
     for match in re.finditer(enumeration, source):
         items = list(_ITEM.finditer(match["items"]))
         remarks = {
-            item["name"]: undecorated(item["above"] or item["behind"])
+            item["name"]: undecorated(item["above"] or item["trailing"])
             for item in items
-            if item["above"] or item["behind"]
+            if item["above"] or item["trailing"]
         }
         names = tuple(item["name"] for item in items)
         title = match["title"] or common_start(names)

@@ -15,9 +15,9 @@ class Types(Described):
         for name, text in self.catalogue.types.items():
             anchor = f"{TYPES}.{name}"
             self.note(anchor, "data", anchor)
-            behind = self.catalogue.known.typedefs.get(name)
-            spelled = behind.spelled() if behind else ""
-            if "f(" in "".join(behind.layers if behind else ()):
+            original = self.catalogue.known.typedefs.get(name)
+            spelled = original.spelled() if original else ""
+            if "f(" in "".join(original.layers if original else ()):
                 spelled = "a function"
             cells = (
                 [nodes.literal(text=name)],

@@ -39,7 +39,7 @@ def picture(name: str, shapes: Sequence[Shape], size: int) -> str:
         body.extend(_row(row, top))
         top += ROW
     for shape in shapes:
-        if shape.is_behind:
+        if shape.is_trailing:
             body.extend(_behind(shape, top))
             top += ROW
     for segment in parts:
@@ -124,7 +124,7 @@ def _ticks(piece: _Piece, x: float, top: float) -> Iterator[str]:
 
 def _behind(shape: Shape, top: float) -> Iterator[str]:
     yield _ruler(str(shape.place.offset), top)
-    yield _box(shape.kind + " behind", GUTTER, top, BYTES * CELL, ROW)
+    yield _box(shape.kind + " trailing", GUTTER, top, BYTES * CELL, ROW)
     said = f"{shape.count} of {shape.element} {'bytes' if shape.element > 1 else 'byte'} each"
     yield _label(GUTTER, top, BYTES * CELL, ROW, shape.name, f"{shape.type}: {said}")
 

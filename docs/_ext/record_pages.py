@@ -55,7 +55,7 @@ class Records(Functions):
                 last = place.first_bit + place.bits - 1
                 size = f"bit {last}" if place.bits == 1 else f"bits {place.first_bit} to {last}"
             elif one.type.is_array and one.type.count is None:
-                size = "behind"
+                size = "trailing"
             attribute = f"{CLASSES}.{record.name}.{one.name}"
             self.note(attribute, "attribute", attribute)
             cells = (

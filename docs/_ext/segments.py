@@ -15,10 +15,10 @@ class Shape:
     kind: str  # number, text, array, record, pointer, bits: a class of the style sheet
     place: Place
     element: int = 0  # bytes of an array's element
-    count: str = ""  # of an array behind the record: how many
+    count: str = ""  # of a trailing array: how many
 
     @property
-    def is_behind(self) -> bool:
+    def is_trailing(self) -> bool:
         return bool(self.count)
 
     @property
@@ -86,7 +86,7 @@ def segments(shapes: Sequence[Shape], size: int) -> List[Segment]:
     """The record from its first byte to its last, padding included."""
     found: List[Segment] = []
     for shape in sorted(shapes, key=lambda one: one.place.offset):
-        if shape.is_behind:
+        if shape.is_trailing:
             continue
         end = found[-1].end if found else 0
         if found and shape.place.offset < end:

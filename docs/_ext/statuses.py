@@ -1,4 +1,4 @@
-"""Which statuses a call answers and when, as the comments of the call and of its header list them.
+"""Which statuses a call returns and when, as the comments of the call and of its header list them.
 
 Nothing is read out of running text. What is not written as include/README.md asks for is refused.
 """
@@ -13,7 +13,7 @@ _CONCERNED = re.compile(r" \((`\w+`(?:, `\w+`)*)\)$")
 
 
 def of_call(name: str, header: Header) -> Dict[str, str]:
-    """The statuses of a call; none if it answers something else."""
+    """The statuses of a call; none if it returns something else."""
     if not answers_status(header.prototypes[name]):
         return {}
     found = {"QEX_OK": "done", **header.comments[name].statuses}
@@ -48,7 +48,7 @@ def _said_of(name: str, text: str, header: Header) -> str:
 
 
 def _parted(text: str) -> Tuple[str, List[str]]:
-    """When a header's status is answered, and the parameters that it is about."""
+    """When a header's status is returned, and the parameters that it is about."""
     listed = _CONCERNED.search(text)
     if listed is None:
         return text, []
@@ -86,7 +86,7 @@ def _refused_of_call(
     prototype = header.prototypes[name]
     yield from _misplaced(name, comment, statuses)
     if comment.statuses and not answers_status(prototype):
-        yield f"{name}: lists statuses, but answers none"
+        yield f"{name}: lists statuses, but returns none"
     for parameter in comment.parameters:
         if not has_parameter(prototype, parameter):
             yield f"{name}: has no parameter {parameter}"

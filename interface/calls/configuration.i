@@ -1,5 +1,5 @@
-// VSDVS_*: configuring switches. Every call answers a status, with the outputs below behind it.
-// VSDVS_FreeMemory takes back what the others hand out.
+// VSDVS_*: configuring switches. Every call returns a status, with the outputs below after it.
+// VSDVS_FreeMemory releases what the others allocate.
 
 %{
 #include "vswitch/configuration.h"

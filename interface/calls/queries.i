@@ -1,5 +1,5 @@
-// VSQEX_*: asking the running switches, and commanding them. Every call answers a status, with the
-// outputs below behind it. Records among them belong to the library until VSQEX_FreeMemory.
+// VSQEX_*: asking the running switches, and commanding them. Every call returns a status, with the
+// outputs below after it. Records among them belong to the library until VSQEX_FreeMemory.
 
 %{
 #include "vswitch/queries.h"

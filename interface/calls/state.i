@@ -1,6 +1,6 @@
-// libnebPublic: the state of distributed switches. Every DVSQEX_* call answers a status; what calls
-// hand out through a pointer that the caller passes is the library's until DVSQEX_DataFree. Of
-// libvswitch, the text of a status and the panic of a caller.
+// libnebPublic: the state of distributed switches. Every DVSQEX_* call returns a status; what calls
+// allocate through a pointer that the caller passes is the library's until DVSQEX_DataFree. Of
+// libvswitch, the text of a status and the report of a fatal condition.
 
 %{
 #include "nebpublic/data.h"
@@ -80,7 +80,7 @@
 %include "nebpublic/kernel_state.h"
 %end_calls
 
-// One C function under two shapes: with a text behind the status, or with an array of the caller's
+// One C function under two shapes: with a text after the status, or with an array of the caller's
 // whose contents are discarded.
 %text_out(char *portsetBuffer, 128)
 %array_argument(char switchId[64])                      // DVSAliasToSwitchId
@@ -93,7 +93,7 @@ QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128])
 %called_by_tuple(DVSAliasToPortsetName)
 
 // Panic reports and returns, or ends the process: it never springs the trap. Of its arguments only the
-// format is passed on, with a null pointer behind it.
+// format is passed on, with a null pointer after it.
 %untrapped(Panic)
 %calls(status_text)
 %shows(QEX_ReturnStatusToString, RESULT, "the process ends")

@@ -1,4 +1,4 @@
-// MAC tables. Tables are the library's and go back to it through VSQEX_FreeMemory; statistics and
+// MAC tables. Tables are the library's and are released with VSQEX_FreeMemory; statistics and
 // properties are the caller's.
 
 %record(VSMACEntry)

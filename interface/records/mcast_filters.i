@@ -1,4 +1,4 @@
-// Multicast filters and their statistics. Both are the library's and go back to it through
+// Multicast filters and their statistics. Both are the library's and are released with
 // VSQEX_FreeMemory.
 
 %record(VSMcastFilters)

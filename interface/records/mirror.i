@@ -1,5 +1,5 @@
 // Mirror session tables, and what running sessions tell. A table that the caller allocates, the
-// caller frees; one that a call answers goes back to the library. Sessions and entities lie in their
+// caller frees; one that a call returns is released to the library. Sessions and entities lie in their
 // table.
 
 %record(DVMirrorIP)

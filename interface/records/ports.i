@@ -1,5 +1,5 @@
 // Ports of distributed switches in the state, and the types of properties. Lists of ports are the
-// library's and go back to it through DVSQEX_DataFree.
+// library's and are released with DVSQEX_DataFree.
 
 %record(OpaqueDVPortData)
 %record(DVPortData)

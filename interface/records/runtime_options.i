@@ -1,5 +1,5 @@
-// Runtime options lists. A caller builds one and frees it; one that a query answers goes back to the
-// library through VSQEX_FreeMemory. Headers lie in their list.
+// Runtime options lists. A caller builds one and frees it; one that a query returns is released to the
+// library with VSQEX_FreeMemory. Headers lie in their list.
 
 %record(VSRuntimeOptionHeader)
 %sized_record(VSRuntimeOptions, runtime_options_new)

@@ -157,7 +157,7 @@ typedef enum Kind {
         (
             "/** Whether there is a port: 1 or 0. */",
             "/**\n * Whether there is a port.\n *\n * - QEX_OK if there is\n */",
-            ["Exists: lists statuses, but answers none"],
+            ["Exists: lists statuses, but returns none"],
         ),
     ],
 )

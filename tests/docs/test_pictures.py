@@ -34,9 +34,9 @@ def test_the_bytes_are_covered_once(catalogue: Catalogue, name: str) -> None:
     assert [one.start for one in found] == [0, *[one.end for one in found[:-1]]]
     assert found[-1].end == RECORDS[name].size
     inside = [shape.name for one in found for shape in one.shapes]
-    behind = [shape.name for shape in shapes if shape.is_behind]
-    assert sorted(inside + behind) == sorted(field.name for field in RECORDS[name].fields)
-    assert all(field.width == 0 for field in RECORDS[name].fields if field.name in behind)
+    trailing = [shape.name for shape in shapes if shape.is_trailing]
+    assert sorted(inside + trailing) == sorted(field.name for field in RECORDS[name].fields)
+    assert all(field.width == 0 for field in RECORDS[name].fields if field.name in trailing)
     taken = {byte for field in RECORDS[name].fields for byte in bytes_of(field)}
     padding = {byte for one in found if not one.shapes for byte in range(one.start, one.end)}
     assert taken | padding == set(range(RECORDS[name].size))

@@ -50,7 +50,7 @@ def test_every_call(site: Site) -> None:
     for name in calls:
         place_of(site, "calls", f"libvswitch.{name}")
         text = entry(site, "calls", name)
-        assert "Answers" in text, name
+        assert "Returns" in text, name
         assert "Ownership" in text, name
         assert "Simulated host" in text, name
         assert ("Statuses" in text) == ("status" in listed[name].result), name
@@ -58,9 +58,9 @@ def test_every_call(site: Site) -> None:
 
 
 def test_only_what_is_not_modelled_is_said_not_to_be(site: Site) -> None:
-    fixed = [name for name in of_kind("call") if "answers always" in entry(site, "calls", name)]
+    fixed = [name for name in of_kind("call") if "always returns" in entry(site, "calls", name)]
     assert fixed == ["DVSQEX_CmdExec"]
-    assert "answers always QEX_NOT_SUPPORTED" in entry(site, "calls", "DVSQEX_CmdExec")
+    assert "always returns QEX_NOT_SUPPORTED" in entry(site, "calls", "DVSQEX_CmdExec")
     said = "Simulated host modelled."
     assert len([name for name in of_kind("call") if said in entry(site, "calls", name)]) == 145
 
@@ -70,10 +70,10 @@ def test_every_method_and_helper(site: Site) -> None:
     assert len(methods) == 44
     for name in methods:
         is_of_record = name.partition("_")[0] in records.read() or name.startswith("qex_Name_")
-        assert "Answers" in entry(site, "records" if is_of_record else "calls", name)
+        assert "Returns" in entry(site, "records" if is_of_record else "calls", name)
     assert len(of_kind("helper")) == 3
     for name in of_kind("helper"):
-        assert "Answers" in entry(site, "calls", name)
+        assert "Returns" in entry(site, "calls", name)
 
 
 def test_every_record(site: Site) -> None:
@@ -103,7 +103,7 @@ def told_size(field: records.Field) -> str:
         last = field.first_bit + field.bit_count - 1
         return f"bit {last}" if field.bit_count == 1 else f"bits {field.first_bit} to {last}"
     if field.kind.startswith("flexible"):
-        return "behind"
+        return "trailing"
     # A whole byte of bits is a field of its own to the table.
     return "bits 0 to 7" if field.name == "macAddrType" else f"{field.width:,}"
 

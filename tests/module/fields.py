@@ -62,7 +62,7 @@ def each(cases: Iterable[Case]) -> Callable[[Any], Any]:
 
 
 def make(record: records.Record) -> Any:
-    """A zero-filled record with room behind it for whatever a flexible array's test wants."""
+    """A zero-filled record with trailing room for whatever a flexible array's test wants."""
     if record.name not in SIZED:
         return getattr(vs, f"new_{record.name}")()
     import native

@@ -25,7 +25,7 @@ def method_flags(function: Any) -> int:
 
 
 def module_state_size(module: Any) -> int:
-    """The m_size of the definition behind a module object."""
+    """The m_size of the definition of a module object."""
 
     class ModuleDef(ctypes.Structure):
         _fields_ = [

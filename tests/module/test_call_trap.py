@@ -1,4 +1,4 @@
-"""What arms the call trap and what does not, and a host that gives up inside a call."""
+"""What arms the call trap and what does not, and a call that traps."""
 
 import os
 import subprocess

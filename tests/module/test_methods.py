@@ -49,7 +49,7 @@ IGNORED = {("VSRuntimeOptions_add_int_option", 3), ("VSRuntimeOptions_add_str_op
 # Functions that free what they are given.
 FREEING = NULL_IS_ACCEPTED - {"qex_Name___repr__"}
 
-# How to free what a function answers.
+# How to free what a function returns.
 ALLOCATING: Dict[str, Any] = {
     "new_VSUplinks": vs.delete_VSUplinks,
     "new_VSRuntimeOptions": vs.delete_VSRuntimeOptions,

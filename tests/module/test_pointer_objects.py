@@ -89,7 +89,7 @@ def test_a_chain_does_not_close(view: Callable[[], Any]) -> None:
     reports.raises(ValueError, twice, first.append, second)
     assert first.append(third) is None
     assert first.next() is third and third.next() is second and second.next() is None
-    # What was behind an object is dropped when the object joins another chain.
+    # What followed an object is dropped when the object joins another chain.
     assert second.append(first) is None
     assert first.next() is None
     shown = repr(second)

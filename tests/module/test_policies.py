@@ -98,7 +98,7 @@ def test_the_names_of_a_team_need_a_source() -> None:
 
 @pytest.mark.parametrize("index, low, high", [(0, 10, 11), (1, 1, 4094), (2, 0, 65535), (-1, 7, 2)])
 def test_a_range_is_a_copy_that_python_owns(capfd: Any, index: int, low: int, high: int) -> None:
-    # The ranges begin behind the number of ranges, which is 2 and bounds nothing.
+    # The ranges begin after the number of ranges, which is 2 and bounds nothing.
     data = b"\1\0\x64\0\7\0\2\0" + b"\x0a\0\x0b\0" + b"\1\0\xfe\x0f" + b"\0\0\xff\xff"
     policy = methods.Block("VSPortVlanPolicy *", data)
     reading = (vs.VSPortVlanPolicy_get_vid_range, policy.record, index)

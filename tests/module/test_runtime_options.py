@@ -49,7 +49,7 @@ def resize(options: methods.Block, size: int) -> None:
 
 
 def add(options: methods.Block, offset: int, kind: int, value: Any) -> Any:
-    """Adds an option, and answers the offset of the next one or None."""
+    """Adds an option, and returns the offset of the next one or None."""
     add_option = vs.VSRuntimeOptions_add_int_option
     if isinstance(value, str):
         add_option = vs.VSRuntimeOptions_add_str_option

@@ -197,7 +197,7 @@ _PIECE = 16 * 2**20
 
 @pytest.fixture
 def endless() -> Iterator[int]:
-    """The address of 2 GiB of text behind a page of zeros, one piece of memory again and again."""
+    """The address of 2 GiB of text after a page of zeros, one piece of memory again and again."""
     size = _PAGE + 2**31 + _PAGE
     piece = os.memfd_create("text")
     os.write(piece, b"x" * _PIECE)
