@@ -38,10 +38,6 @@ PyObject *exception_of_kind(int kind) {
   }
 }
 
-void report_failure(int kind, char const *text) {
-  PyErr_SetString(exception_of_kind(kind), text);
-}
-
 void report_argument(int kind, char const *method, int position, char const *type) {
   PyErr_Format(exception_of_kind(kind), "in method '%s', argument %d of type '%s'", method,
                position, type);

@@ -21,9 +21,6 @@ extern "C" {
  */
 PyObject *exception_of_kind(int kind);
 
-/** Raises the exception of `kind` with `text`. */
-void report_failure(int kind, char const *text) COLD;
-
 /** "in method '...', argument <position> of type '...'", with the exception of `kind`. */
 void report_argument(int kind, char const *method, int position, char const *type) COLD;
 

@@ -4,25 +4,8 @@
 
 %module _libvswitch
 
-// The frame: what of the generator's runtime is mended and what is made faster, then how values cross.
-// Each file states what must stand before it.
-%include "frame/fixes/startup.i"
-%include "frame/fixes/overloads.i"
-%include "frame/fixes/pointer_objects.i"
-%include "frame/speed/arguments.i"
-%include "frame/speed/vector_calls.i"
-%include "frame/speed/pointer_objects.i"
-%include "frame/speed/memory.i"
-%include "frame/speed/results.i"
-%include "frame/typemaps/failures.i"
-%include "frame/typemaps/call_trap.i"
-%include "frame/typemaps/pointers.i"
-%include "frame/typemaps/scalars.i"
-%include "frame/typemaps/texts.i"
-%include "frame/typemaps/records.i"
-%include "frame/typemaps/arrays.i"
-%include "frame/typemaps/results.i"
-%include "frame/typemaps/constants.i"
+// How the runtime is mended and made faster, and how values cross.
+%include "frame/frame.i"
 
 // Words for what C does not say of calls.
 %include "calls/facts.i"

@@ -90,7 +90,7 @@
 %include "nebpublic/names.h"
 QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128]);
 %end_calls
-%called_by_tuple(DVSAliasToPortsetName)
+%overloaded(DVSAliasToPortsetName)
 
 // Panic reports and returns, or ends the process: it never springs the trap. Of its arguments only the
 // format is passed on, with a null pointer after it.

@@ -24,7 +24,8 @@ typedef size_t SIZE;
 %typemap(in, noblock=1) (unsigned char *mac_str, SIZE) (Py_buffer view, int held = 0) {
   if (PyObject_GetBuffer($input, &view, PyBUF_SIMPLE) < 0) {
     PyErr_Clear();
-    %bad_argument(kWrongType, "(unsigned char *mac_str, SIZE)");
+    report_argument(kWrongType, "$symname", $argnum, "(unsigned char *mac_str, SIZE)");
+    SWIG_fail;
   }
   held = 1;
   $1 = view.buf;

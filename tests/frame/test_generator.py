@@ -1,4 +1,4 @@
-"""Only versions of the generator that the frame is tested with make the module, unless one insists."""
+"""Only versions of the generator that the frame is tested with make the module, unless told to."""
 
 import subprocess
 from pathlib import Path

@@ -37,8 +37,6 @@ TEST(ErrorKinds, HaveTheExceptionsOfTheWrapperRuntime) {
 }
 
 TEST(Reports, AreMadeInTheModulesWords) {
-  report_failure(-7, "any text");
-  EXPECT_EQ("any text", take_error(PyExc_OverflowError));
   report_argument(-5, "VSDVS_SetMTU", 2, "qex_uint32");
   EXPECT_EQ("in method 'VSDVS_SetMTU', argument 2 of type 'qex_uint32'",
             take_error(PyExc_TypeError));

@@ -132,6 +132,18 @@ def test_runtime_is_shared_under_its_generation() -> None:
     )
 
 
+def test_the_runtime_does_not_end_with_records_that_change_hands() -> None:
+    capsule = sys.modules["swig_runtime_data4"].type_pointer_capsule
+    signature = vs.new_qex_MgmtApiSignature()
+    before = sys.getrefcount(capsule)
+    for _ in range(10):
+        view = vs.qex_MgmtApiSignature_name_get(signature)
+        view.acquire()
+        del view
+    assert sys.getrefcount(capsule) == before
+    vs.delete_qex_MgmtApiSignature(signature)
+
+
 def test_second_initialisation_reuses_types_and_variables() -> None:
     initialise = native.library.PyInit__libvswitch
     initialise.restype = ctypes.py_object

@@ -45,7 +45,8 @@ static PyObject *pointer_object_behind(PyObject *object) {
   return object;
 }
 
-static int convert_any_pointer(PyObject *object, void **pointer, swig_type_info *type, int flags) {
+/* What the typemaps convert with. */
+static int convert_pointer(PyObject *object, void **pointer, swig_type_info *type, int flags) {
   PyObject *found = NULL;
   int kind = SWIG_ERROR;
   if (object == Py_None) return SWIG_Python_ConvertPtr(object, pointer, type, flags);
@@ -54,16 +55,11 @@ static int convert_any_pointer(PyObject *object, void **pointer, swig_type_info 
   Py_XDECREF(found);
   return kind;
 }
-#undef SWIG_ConvertPtr
-#define SWIG_ConvertPtr(object, pointer, type, flags) \
-  convert_any_pointer(object, (void **)(pointer), type, flags)
 
 static int convert_function(PyObject *object, void **pointer, swig_type_info *type) {
   return PyCFunction_Check(object) ? SWIG_Python_ConvertFunctionPtr(object, pointer, type)
-                                   : SWIG_ConvertPtr(object, pointer, type, 0);
+                                   : convert_pointer(object, pointer, type, 0);
 }
-#undef SWIG_ConvertFunctionPtr
-#define SWIG_ConvertFunctionPtr(object, pointer, type) convert_function(object, pointer, type)
 
 static PyObject *compare_pointers(PyObject *left, PyObject *right, int operation) {
   if (!is_pointer_object(right)) Py_RETURN_NOTIMPLEMENTED;
@@ -175,6 +171,55 @@ static int ready_type(PyTypeObject *type) {
     if (strcmp(method->ml_name, "__repr__") == 0) method->ml_meth = show_pointer_by_name;
   }
   return PyType_Ready(type);
+}
+
+static bool is_replaced(char const *name, PyCFunction function) {
+  PyMethodDef const *method = swigobject_methods;
+  while (method->ml_name && strcmp(method->ml_name, name) != 0) method++;
+  return method->ml_name && method->ml_meth == function;
+}
+
+static bool compares_pointers(PyObject *SWIGUNUSEDPARM(module)) {
+  return SwigPyObject_type()->tp_richcompare == compare_pointers;
+}
+
+static bool shows_chains(PyObject *SWIGUNUSEDPARM(module)) {
+  return SwigPyObject_type()->tp_repr == show_pointer && is_replaced("__repr__", show_pointer_by_name);
+}
+
+static bool drops_chains(PyObject *SWIGUNUSEDPARM(module)) {
+  return SwigPyObject_type()->tp_dealloc == drop_pointer;
+}
+
+static bool appends_once(PyObject *SWIGUNUSEDPARM(module)) {
+  return is_replaced("append", append_pointer);
+}
+
+static bool asks_for_truth(PyObject *SWIGUNUSEDPARM(module)) {
+  return is_replaced("own", own_pointer);
+}
+
+static bool fails_by_minus_one(PyObject *SWIGUNUSEDPARM(module)) {
+  return Py_TYPE(SWIG_globals())->tp_setattr == set_variable_or_fail;
+}
+
+/* Asked with a class whose destructor takes one object and no tuple. */
+static bool calls_any_destructor(PyObject *module) {
+  PyObject *cls = PyObject_CallObject(PyExc_Exception, NULL);
+  PyObject *destructor = PyObject_GetAttrString(module, "SWIG_PyInstanceMethod_New");
+  SwigPyClientData *shadow = NULL;
+  bool is_called = false;
+  if (cls && destructor && PyObject_SetAttrString(cls, "__swig_destroy__", destructor) == 0) {
+    shadow = SwigPyClientData_New(cls);
+  }
+  if (shadow) {
+    is_called = shadow->delargs != 0;
+    SwigPyClientData_Del(shadow);
+  }
+  PyErr_Clear();
+  Py_XDECREF(destructor);
+  Py_XDECREF(cls);
+  return is_called;
 }
 
 /* Whether the runtime can make instances: by what a type has for it, or by the `__new__` of what is

@@ -2,7 +2,7 @@
 // Stands before every function with a pointer.
 
 %wrapper %{
-/* What an argument without a pointer answers, for null is one. */
+/* What is read of an argument without a pointer, for null is one. */
 static char no_pointer;
 #define NO_POINTER ((void *)&no_pointer)
 
@@ -10,7 +10,7 @@ static char no_pointer;
 static void *read_pointer(PyObject *object, swig_type_info *type, int flags, char const *method,
                           int position, char const *spelling) {
   void *pointer = NULL;
-  if (SWIG_IsOK(SWIG_ConvertPtr(object, &pointer, type, flags))) return pointer;
+  if (SWIG_IsOK(convert_pointer(object, &pointer, type, flags))) return pointer;
   report_argument(kWrongType, method, position, spelling);
   return NO_POINTER;
 }
@@ -38,6 +38,30 @@ static void *read_record(PyObject *object, swig_type_info *type, int flags, char
 %pointer_argument(SWIGTYPE *, read_pointer)
 %pointer_argument(SWIGTYPE *self, read_record)
 %typemap(in) SWIGTYPE [] = SWIGTYPE *;
+%typemap(in, noblock=1) SWIGTYPE *DISOWN {
+  $1 = ($ltype)read_pointer($input, $descriptor, SWIG_POINTER_DISOWN, "$symname", $argnum, "$type");
+  if ((void *)$1 == NO_POINTER) SWIG_fail;
+}
 %typemap(in, noblock=1) void * {
-  if (!SWIG_IsOK(SWIG_ConvertPtr($input, &$1, 0, $disown))) %bad_argument(kWrongType, "$type");
+  $1 = read_pointer($input, NULL, $disown, "$symname", $argnum, "$type");
+  if ($1 == NO_POINTER) SWIG_fail;
+}
+
+// A record by value is a pointer object that leads to one.
+%typemap(in, noblock=1) SWIGTYPE (void *record) {
+  record = read_pointer($input, $&descriptor, 0, "$symname", $argnum, "$type");
+  if (record == NO_POINTER) SWIG_fail;
+  if (!record) {
+    report_null_argument("$symname", $argnum, "$type");
+    SWIG_fail;
+  }
+  $1 = *($&ltype)record;
+}
+
+// A function of C, as an object that the generator made of one or as a pointer to one.
+%typemap(in, noblock=1) SWIGTYPE ((*)(ANY)) {
+  if (!SWIG_IsOK(convert_function($input, (void **)&$1, $descriptor))) {
+    report_argument(kWrongType, "$symname", $argnum, "$type");
+    SWIG_fail;
+  }
 }

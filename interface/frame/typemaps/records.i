@@ -21,7 +21,10 @@
 %define %nested_record(NAME)
 %typemap(memberin, noblock=1) NAME {
   if (arg1) {
-    if (!$input) %null_argument(2, "$type *");
+    if (!$input) {
+      report_null_argument("$symname", 2, "$type *");
+      SWIG_fail;
+    }
     $1 = *$input;
   }
 }
@@ -72,7 +75,10 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *self, PyObject *args)
 
 // Other arguments that a method needs.
 %typemap(check, noblock=1, required="1") SWIGTYPE *REQUIRED, char *REQUIRED {
-  if (!$1) %null_argument($argnum, "$type");
+  if (!$1) {
+    report_null_argument("$symname", $argnum, "$type");
+    SWIG_fail;
+  }
 }
 %define %required(PARAMETER...)
 %typemap(check) PARAMETER = SWIGTYPE *REQUIRED;
@@ -82,7 +88,10 @@ SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *self, PyObject *args)
 // of any kind store nothing into a null record.
 %typemap(memberin, noblock=1) SWIGTYPE [ANY], SWIGTYPE [ANY][ANY] {
   if (arg1) {
-    if (!$input) %null_variable("$name", "$type");
+    if (!$input) {
+      report_null_variable("$name", "$type");
+      SWIG_fail;
+    }
     memcpy($1, $input, sizeof($1));
   }
 }

@@ -22,7 +22,10 @@
 
 %typemap(in, noblock=1) char (char value, int kind) {
   kind = char_from_object($input, &value);
-  if (kind != kConverted) %bad_argument(kind, "$ltype");
+  if (kind != kConverted) {
+    report_argument(kind, "$symname", $argnum, "$ltype");
+    SWIG_fail;
+  }
   $1 = ($ltype)value;
 }
 

@@ -9,7 +9,7 @@ SWIGINTERN int text_from_pointer(PyObject *object, char **text) {
   static swig_type_info *type = NULL;
   void *pointer = NULL;
   if (!type) type = SWIG_TypeQuery("_p_char");
-  if (!SWIG_IsOK(SWIG_ConvertPtr(object, &pointer, type, 0))) return kWrongType;
+  if (!SWIG_IsOK(convert_pointer(object, &pointer, type, 0))) return kWrongType;
   *text = (char *)pointer;
   return kConverted;
 }
