@@ -45,11 +45,10 @@ def add(switch: str, port: str, to: str, session_id: str, length: int) -> None:
         session.type = vs.VS_DVMIRROR_SESSIONTYPE_DVPORT
         session.snapLen = length
         session.numDstEntities = session.numSrcInEntities = session.numSrcOutEntities = 1
-        entity = table.get_first_session_entity(0)
-        for name in (to, port, port):  # the destination, received by, sent by
+        for number, name in enumerate((to, port, port)):  # the destination, received by, sent by
+            entity = table.get_first_session_entity(number)
             entity.type = vs.MIRROR_ENTTYPE_DVPORT  # before the text, which it gives a meaning
             entity.set_entity(name)
-            entity = entity.next()
         status = vs.VSDVS_AppendDVMirrorSessions(switch, port, table)
     check(f"VSDVS_AppendDVMirrorSessions({switch!r}, {port!r})", status)
 

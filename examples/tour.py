@@ -176,11 +176,10 @@ def mirror(port: str, to: str) -> None:
     session.sid, session.dname = f"audit-{port}", f"audit of {port}"
     session.type = vs.VS_DVMIRROR_SESSIONTYPE_DVPORT
     session.numDstEntities = session.numSrcInEntities = 1
-    entity = table.get_first_session_entity(0)
-    for end in (to, port):
+    for number, end in enumerate((to, port)):
+        entity = table.get_first_session_entity(number)
         entity.type = vs.MIRROR_ENTTYPE_DVPORT
         entity.set_entity(end)
-        entity = entity.next()
     must(vs.VSDVS_AppendDVMirrorSessions(SWITCH, port, table))
     vs.free_dvmirror_session_table(table)
 

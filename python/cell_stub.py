@@ -7,8 +7,8 @@ from python_types import CALLBACK, PythonTypes
 
 _CELLS_HEAD = '''"""Cells: memory of one C type for calls, and functions that C may call."""
 
-from typing import Any, Callable, Generic, Iterable, Iterator, Literal, Optional, TypeVar, Union
-from typing import overload
+from typing import Any, Callable, Generic, Iterable, Iterator, Literal, Optional, Tuple, TypeVar
+from typing import Union, overload
 
 import _libvswitch as _flat
 from libvswitch import _classes
@@ -26,18 +26,28 @@ class Pointer(_Pointing, _flat._VoidPointer):
 class Callback(_Pointing, _flat.{callback}):
     """A function that the library may call for each item of a walk."""
 
-    pointer: _flat.{callback}
+    @property
+    def pointer(self) -> _flat.{callback}: ...
     def __init__(self, function: Callable[[Any, Any], Any]) -> None: ...
     def reraise(self) -> None: ...
 
 def cell_behind(argument: Any) -> Optional[Cell[Any, Any]]: ...
+def filled(
+    argument: Any, deallocator: Optional[str], length: Any = ..., is_view: bool = ...
+) -> None: ...
+def walk(
+    call: Callable[..., None], before: Tuple[Any, ...], function: Any, context: Any
+) -> None: ...
 
 class Cell(_Pointing, Generic[_Value, _Pointer]):
     """Memory that holds one value of a C type, or several."""
 
-    type: str
-    door: Optional[str]
-    pointer: _Pointer
+    @property
+    def type(self) -> str: ...
+    @property
+    def pointer(self) -> _Pointer: ...
+    @property
+    def deallocator(self) -> Optional[str]: ...
     @property
     def value(self) -> _Value: ...
     @value.setter

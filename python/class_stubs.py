@@ -6,63 +6,99 @@ from definitions import Definitions, Field, Function, Record
 from python_types import PythonTypes, not_null
 from stub_text import constants, doc, function
 
-_CLASSES_HEAD = '''"""The classes, the calls and the constants."""
+_CLASSES_HEAD = '''"""The records of the host as classes."""
 
-from typing import Any, Callable, Final, Optional, Tuple, Union, overload
+from typing import Any, Optional, Tuple, Union
 
 import _libvswitch as _flat
-from _libvswitch import cvar as cvar
+from libvswitch import _by_hand
 from libvswitch._arrays import Array
-from libvswitch._records import Record as Record, Table as Table
+from libvswitch._records import Record, Table
 
-# As it was when the classes were loaded; cvar has it as it is.
-qex_ModuleCurrentID: int
+'''
+
+_CALLS_HEAD = '''"""The calls of the host, and what the module adds to them."""
+
+from typing import Any, Callable, Optional, Tuple, Union, overload
+
+import _libvswitch as _flat
+from libvswitch._arrays import Array
+from libvswitch._classes import (
+{classes})
+
+'''
+
+_CONSTANTS_HEAD = '''"""The constants of the host."""
+
+from typing import Final
 
 '''
 
 _PACKAGE_HEAD = '''"""Virtual switches of this host, as classes and functions."""
 
+from _libvswitch import cvar as cvar
 from libvswitch._arrays import Array as Array
 from libvswitch._ownership import owned as owned
+from libvswitch._records import Record as Record, Table as Table
 from libvswitch.cells import Callback as Callback, Cell as Cell, Pointer as Pointer
 '''
 
 
 def classes(types: PythonTypes) -> str:
-    known = types.known
-    parts = [_CLASSES_HEAD, constants(known)]
-    for record in known.records.values():
-        if not record.is_inner:
-            parts.append(_class(types, record))
-    for name, forms in known.forms().items():
+    made = [one for one in types.known.records.values() if not one.is_inner]
+    listed = "".join(f'    "{one.name}",\n' for one in made)
+    return f"{_CLASSES_HEAD}__all__ = [\n{listed}]\n{''.join(_class(types, one) for one in made)}"
+
+
+def calls(types: PythonTypes) -> str:
+    made = [one.name for one in types.known.records.values() if not one.is_inner]
+    listed = "".join(f"    {name},\n" for name in made)
+    parts = [_CALLS_HEAD.replace("{classes}", listed)]
+    for name, forms in types.known.forms().items():
         for one in forms:
-            arguments = types.arguments(one)
-            hidden = len(forms) > 1
-            text = function(name, arguments, types.result(one), one.doc, hidden=hidden)
-            parts.append(f"@overload\n{text}" if hidden else text)
+            arguments = [
+                ("array" if given.isupper() else given, type_)
+                for given, type_ in types.arguments(one)
+            ]
+            text = function(name, arguments, types.result(one), one.doc)
+            if one.takes_more:
+                text = text.replace(") ->", ", *more: Any) ->", 1)
+            parts.append(f"@overload\n{text}" if len(forms) > 1 else text)
     return "".join(parts)
+
+
+def constants_of(known: Definitions) -> str:
+    return f"{_CONSTANTS_HEAD}{constants(known)}"
 
 
 def package(known: Definitions) -> str:
     """What the package takes from where."""
-    names = ["Record", "Table", "cvar"]
-    names += [one.name for one in known.constants]
-    names += [one.name for one in known.records.values() if not one.is_inner]
-    names += list(known.forms())
-    taken = "".join(f"    {name} as {name},\n" for name in sorted(names))
-    names += ["Array", "Callback", "Cell", "Pointer", "owned"]
+    taken = {
+        "_constants": [one.name for one in known.constants],
+        "_classes": [one.name for one in known.records.values() if not one.is_inner],
+        "_calls": list(known.forms()),
+    }
+    text = _PACKAGE_HEAD
+    names = ["Array", "Callback", "Cell", "Pointer", "Record", "Table", "cvar", "owned"]
+    for module, found in taken.items():
+        listed = "".join(f"    {name} as {name},\n" for name in sorted(found))
+        text += f"from libvswitch.{module} import (\n{listed})\n"
+        names += found
     listed = "".join(f'    "{name}",\n' for name in sorted(names))
-    return f"{_PACKAGE_HEAD}from libvswitch._classes import (\n{taken})\n\n__all__ = [\n{listed}]\n"
+    return f"{text}\n__all__ = [\n{listed}]\n"
 
 
 def _class(types: PythonTypes, record: Record) -> str:
     element = _element(types, record)
     base = f"Table[{element}]" if record.count else "Record"
+    if record.base:
+        base = f"_by_hand.{record.base}"
     text = f"\nclass {record.name}({base}, _flat._{record.name}):\n{doc(record.doc, '    ')}"
     arguments = [("self", ""), *((one.name, types.argument(one)) for one in record.constructor)]
     text += _method("__init__", arguments, "None", "")
     text += "".join(_property(field, types.member(field)) for field in record.fields)
-    text += "".join(_method_of(types, record, one, element) for one in record.methods)
+    methods = [one for one in record.methods if not one.is_by_hand]
+    text += "".join(_method_of(types, record, one, element) for one in methods)
     if any(one.name == "__getitem__" for one in record.methods) and not record.count:
         text += "    __iter__: None  # an entry is no sequence\n"
     return text

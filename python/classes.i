@@ -1,24 +1,31 @@
-// libvswitch: the same definitions once more, as classes over the flat functions. Only the Python
-// that the generator writes for them is used, and the tree from which stubs are made.
+// libvswitch: the same definitions once more, and what its classes are beyond them. Only the tree that
+// the generator parsed is used: from it make_classes.py, make_calls.py and make_stubs.py write what
+// Python gets.
 //
+//   %base(RECORD, Class)          the base of the record's class, in libvswitch/_by_hand.py
+//   %by_hand(METHOD)              the base has the method
+//   %within(METHOD, array)        its index is one of the array's
 //   %table(RECORD, count)         a record that is a sequence, and how many elements it has: a field
 //                                 or a number
 //   %counted(RECORD::field, count)  an array without a size, and the field that counts its elements
-//   %answers(METHOD, type)        what a method answers, where the definitions only say an object
-
-//   %null(METHOD, when)           that it answers null never, or only on a failure
+//   %answers(METHOD, type)        what a method returns, where the definitions only say an object
+//   %null(METHOD, when)           that it returns null never, or only on a failure
 
 %module libvswitch
 
-%pythonbegin %{
-from libvswitch._records import Record, Table
-%}
+%define %base(RECORD, CLASS)
+%feature("base", "CLASS") RECORD;
+%enddef
 
-// Every record has the base that prints it and keeps its memory; its fields are all it can be given.
-%feature("python:abc", "Record");
+%define %by_hand(METHOD)
+%feature("by_hand", "1") METHOD;
+%enddef
+
+%define %within(METHOD, ARRAY)
+%feature("within:index", "ARRAY") METHOD;
+%enddef
 
 %define %table(RECORD, COUNT)
-%feature("python:abc", "Table") RECORD;
 %feature("count", "COUNT") RECORD;
 %enddef
 
@@ -42,6 +49,27 @@ from libvswitch._records import Record, Table
 %table(VSDVMirrorSessionIDs, numEntries)
 %table(VSPromiscSessionActiveDsts, numEntries)
 %table(DVMirrorSessionTable, numSessions)
+
+%base(VSLAGTable, LagTable)
+%base(VSRuntimeOptions, RuntimeOptions)
+%base(VSRuntimeOptionHeader, RuntimeOption)
+%base(DVMirrorSessionTable, MirrorTable)
+%base(VSMcastFilters, OfOneForm)
+%base(VSMcastFilterStats, OfOneForm)
+%by_hand(VSRuntimeOptions::add_int_option)
+%by_hand(VSRuntimeOptions::add_str_option)
+%by_hand(VSRuntimeOptions::set_options_length)
+%by_hand(VSRuntimeOptions::get_first_option)
+%by_hand(VSRuntimeOptions::get_next_option)
+%by_hand(VSRuntimeOptionHeader::get_option_name)
+%by_hand(VSRuntimeOptionHeader::get_option_value)
+
+%within(VSMcastFilters::get_mac_entry, macEntries)
+%within(VSMcastFilters::get_ip_entry, ipv4Entries)
+%within(VSMcastFilters::get_ipv6_entry, ipv6Entries)
+%within(VSMcastFilterStats::get_ip_entry, ipv4Entries)
+%within(VSMcastFilterStats::get_ipv6_entry, ipv6Entries)
+%within(VSPortVlanPolicy::get_vid_range, vidRanges)
 
 %counted(VSUplinks::entries, numEntries)
 %counted(VSUplinkPorts::uplinkPortName, nUplinkPorts)
@@ -95,9 +123,3 @@ from libvswitch._records import Record, Table
 array of the caller's as well, only the status.";
 
 %include "libvswitch.i"
-
-// Every class has registered itself; nobody else is to.
-%pythoncode %{
-for _name in [_name for _name in globals() if _name.endswith("_swigregister")]:
-    del globals()[_name]
-%}

@@ -84,6 +84,7 @@ class Function:
     body: str = ""  # of a method, in C
     c_result: str = ""
     family: str = ""  # of a call of the host, as interface/calls names it
+    is_by_hand: bool = False  # in the class's base
     deallocator: str = ""  # of what a call leaves behind pointers, unless `said` names another
     said: Dict[Tuple[str, str], str] = field(default_factory=dict, hash=False)
 
@@ -120,6 +121,7 @@ class Record:
     count: str  # of a sequence: the field that counts its elements, or their number
     fields: List[Field] = field(default_factory=list)
     methods: List[Function] = field(default_factory=list)
+    base: str = ""  # of its class, written by hand
     constructor: Tuple[Parameter, ...] = ()
 
 
@@ -222,6 +224,7 @@ def _record(node: ET.Element, seen: _Attributes, header: str) -> Record:
         is_inner=not any(member.tag == "destructor" for member in node),
         header=header,
         count=seen.get("feature_count", ""),
+        base=seen.get("feature_base", ""),
     )
     _collect_members(node, record)
     return record
@@ -266,6 +269,7 @@ def _function(node: ET.Element, seen: _Attributes) -> Function:
         body=seen.get("code", ""),
         c_result=_spelled_in_c(result),
         family=seen.get("feature_family", ""),
+        is_by_hand=seen.get("feature_by_hand") == "1",
         deallocator=seen.get("feature_deallocator", ""),
         said=_said(seen),
     )
@@ -283,6 +287,7 @@ _WORDS = (
     "shows",
     "takes",
     "unless",
+    "within",
 )
 
 

@@ -16,7 +16,9 @@ def main() -> None:
     types = PythonTypes(known, "_flat.")
     written = {
         "libvswitch/__init__.pyi": class_stubs.package(known),
+        "libvswitch/_calls.pyi": class_stubs.calls(types),
         "libvswitch/_classes.pyi": class_stubs.classes(types),
+        "libvswitch/_constants.pyi": class_stubs.constants_of(known),
         "libvswitch/cells.pyi": cell_stub.cells(types),
     }
     # Last: it has the classes of all pointers that the others name.

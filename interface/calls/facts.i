@@ -16,7 +16,8 @@
 //   %releases(CALL, argument)             the call is a deallocator
 //   %reads(CALL, argument)                what C could write there it only reads
 //   %length(CALL, argument, length)       `argument` is as many bytes as `length` says
-//   %form(CALL, argument, mode)           `argument` is an address of the form that `mode` names
+//   %form(CALL, argument, mode)           `argument` is an address, or has such as entries, of the form
+//                                         that `mode` names
 //   %nullable(CALL, argument)             null is allowed, of a counted argument with a length of 0
 
 %define %calls(FAMILY, DEALLOCATOR...)

@@ -19,7 +19,9 @@
 %calls(queries, VSQEX_FreeMemory)
 %elements(ids, count)                                   // VSQEX_GetRuntimeOptions
 %nullable(VSQEX_GetRuntimeOptions, ids)
+%form(VSQEX_GetMcastFilters, filters, mode)
 %form(VSQEX_GetMcastFilterStats, group, mode)
+%form(VSQEX_GetMcastFilterStats, stats, mode)
 %reads(VSQEX_SetRuntimeOptions, options)
 %reads(VSQEX_SetGlobalMACLearningProps, props)
 %releases(VSQEX_FreeMemory, memory)

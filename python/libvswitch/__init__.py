@@ -17,7 +17,9 @@ from typing import Any as _Any
 from typing import List as _List
 
 _MODULES = ("cells", "doctor")
+_PARTS = ("_constants", "_classes", "_calls")
 _BESIDE = {
+    "_records": ("Record", "Table"),
     "_arrays": ("Array",),
     "_ownership": ("owned",),
     "cells": ("Callback", "Cell", "Pointer"),
@@ -29,11 +31,11 @@ def _load() -> None:
     libraries would not load."""
     if "__all__" in globals():
         return
-    classes = _import_module("libvswitch._classes")
-    for name, value in vars(classes).items():
-        # A variable of the module is read where it changes, not copied here.
-        if not name.startswith("_") and not hasattr(classes.cvar, name):
-            globals()[name] = value
+    globals()["cvar"] = _import_module("_libvswitch").cvar
+    for part in _PARTS:
+        made = vars(_import_module(f"libvswitch.{part}"))
+        names = made.get("__all__") or [name for name in made if not name.startswith("_")]
+        globals().update({name: made[name] for name in names})
     for module, names in _BESIDE.items():
         for name in names:
             globals()[name] = getattr(_import_module(f"libvswitch.{module}"), name)

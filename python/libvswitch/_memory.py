@@ -1,4 +1,4 @@
-"""Memory behind pointer objects: its addresses, and the values of C types in it."""
+"""Values of C types in memory: numbers, texts and bytes, and how many of them there may be."""
 
 import ctypes
 import operator
@@ -20,6 +20,12 @@ SIMPLE: Dict[str, Type[Any]] = {
 SIMPLE["char"] = ctypes.c_ubyte
 
 RECORD_SIZES = _pointers.record_sizes()
+ARRAY_OFFSETS = _pointers.array_offsets()
+
+POINTER_SIZE = ctypes.sizeof(ctypes.c_void_p)
+
+# No list of a host comes near, and memory for more is a mistake of the caller's.
+MOST_ELEMENTS = 1_000_000
 
 
 def scalar(name: str) -> Type[Any]:
@@ -29,6 +35,11 @@ def scalar(name: str) -> Type[Any]:
 
 def is_scalar(name: str) -> bool:
     return _layout.SCALARS.get(name, name) in SIMPLE
+
+
+def size_of(name: str) -> int:
+    """Bytes of a record or a scalar."""
+    return RECORD_SIZES[name] if name in RECORD_SIZES else ctypes.sizeof(scalar(name))
 
 
 def checked(name: str, value: Any) -> int:
@@ -58,6 +69,14 @@ def length(given: Any) -> int:
     return count
 
 
+def length_to_make(given: Any) -> int:
+    """Likewise, of elements that memory is to be made for."""
+    count = length(given)
+    if count > MOST_ELEMENTS:
+        raise ValueError(f"a length of {count} is more than {MOST_ELEMENTS}, the most there may be")
+    return count
+
+
 def _whole(given: Any, rule: str) -> int:
     try:
         return operator.index(given)
@@ -65,15 +84,19 @@ def _whole(given: Any, rule: str) -> int:
         raise TypeError(f"{rule}, not {type(given).__name__}") from None
 
 
-def text_at(address: int, size: int) -> str:
-    """The text of an array of chars, which a NUL may end."""
-    held: bytes = ctypes.string_at(address, size)
-    return held.split(b"\0", 1)[0].decode("utf-8", "surrogateescape")
+def number_in(name: str, held: bytes) -> int:
+    """The number that the memory of a scalar holds."""
+    return int(scalar(name).from_buffer_copy(held).value)
 
 
 def scalar_bytes(name: str, value: Any) -> bytes:
     """What memory of a scalar holds for a value."""
     return bytes(scalar(name)(checked(name, value)))
+
+
+def text_in(held: bytes) -> str:
+    """The text in an array of chars, which a NUL may end."""
+    return held.split(b"\0", 1)[0].decode("utf-8", "surrogateescape")
 
 
 def text_bytes(size: int, text: Any) -> bytes:
@@ -83,6 +106,8 @@ def text_bytes(size: int, text: Any) -> bytes:
     held = text.encode("utf-8", "surrogateescape")
     if len(held) >= size:
         raise ValueError(f"{text!r} takes more than {size - 1} bytes")
+    if b"\0" in held:
+        raise ValueError(f"a text has no NUL in it, as {text!r} has")
     return held.ljust(size, b"\0")
 
 

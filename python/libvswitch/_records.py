@@ -1,13 +1,21 @@
-"""What all classes share: printing, keeping memory alive, sequences of records."""
+"""What all classes share: printing, memory that stays while it is seen, room that ends.
 
-import ctypes
+Nothing here locks, and other threads may come in between any two steps. What holds all the same:
+
+- A pointer object is null from the moment that its memory is about to be released. Whoever releases
+  makes the owner null first, and then the views that it finds.
+- A view is tied to its owner before anybody looks whether the owner is null. So it is among the
+  views that are found, or it is seen that its owner is gone.
+- Memory is read and written by functions in C which find a pointer null, or do all of it.
+"""
+
 import typing
 import weakref
 from typing import Any, ClassVar, Dict, List, Optional, Tuple, Type, TypeVar
 
 from libvswitch import _layout, _memory, _pointers
 
-__all__ = ["CLASSES", "Record", "Table", "end", "place_in", "record_at", "shown", "wanted", "wrap"]
+__all__ = ["CLASSES", "Record", "Table"]
 
 T = TypeVar("T")
 
@@ -17,7 +25,10 @@ CLASSES: Dict[str, Type["Record"]] = {}
 class _Pointing:
     """An object that the wrapper runtime takes for the pointer object in its `this`.
 
-    The runtime looks for `this` in the object's dictionary and nowhere else.
+    The runtime looks for `this` in the object's dictionary and nowhere else. Beside it is what
+    the object needs to know of its memory: `_owner`, in which it lies, and `_kept`, the pointer
+    objects that keep that, whatever becomes of the owner; `_end`, where the memory ends;
+    `_deallocator`; `_views` into it and `_cells` that hold it.
     """
 
     this: Any
@@ -34,6 +45,17 @@ class _Pointing:
     def __hash__(self) -> int:
         return hash(int(self))
 
+    # A type checker that saw these would let every name pass.
+    if not typing.TYPE_CHECKING:
+
+        def __setattr__(self, name: str, value: Any) -> None:
+            if name != "this" or "this" in self.__dict__:
+                raise AttributeError(f"the attribute {name!r} of {_a(self)} cannot be set")
+            self.__dict__["this"] = value  # the runtime's, on interpreters that it does not know
+
+        def __delattr__(self, name: str) -> None:
+            raise AttributeError(f"the attribute {name!r} of {_a(self)} cannot be deleted")
+
     def __copy__(self) -> Any:
         raise TypeError(
             f"{type(self).__name__} objects cannot be copied; "
@@ -48,9 +70,18 @@ class _Pointing:
             f"{type(self).__name__} objects cannot be pickled; they are memory of this process"
         )
 
-    def _handed_out(self) -> List["_Pointing"]:
-        """What a call of the library has handed out through this object."""
+    def _allocated(self) -> List["_Pointing"]:
+        """What a call of the library has allocated and this object points to."""
         return [self]
+
+    def _require(self) -> None:
+        if not _pointers.address_of(self):
+            raise ValueError(f"this {type(self).__name__} is gone: its memory was released")
+
+
+def _a(given: _Pointing) -> str:
+    name = type(given).__name__
+    return f"{'an' if name[0] in 'AEIOU' else 'a'} {name}"
 
 
 def place_in(owner: Any, view: Any) -> Any:
@@ -59,18 +90,89 @@ def place_in(owner: Any, view: Any) -> Any:
         views: Dict[int, Any] = owner.__dict__.setdefault("_views", {})
         key = id(view)
         views[key] = weakref.ref(view, lambda _: views.pop(key, None))
-        view.__dict__["_owner"] = owner
+        kept = owner.__dict__.get("this"), owner.__dict__.get("_kept")
+        view.__dict__.update(_owner=owner, _kept=kept)
+        if not _pointers.address_of(owner):
+            _pointers.clear(view)
+            owner._require()
     return view
 
 
-def end(pointing: Any) -> None:
-    """Makes an object null, and all views into it."""
-    for view in list(pointing.__dict__.get("_views", {}).values()):
-        if view() is not None:
-            end(view())
-    for cell in list(pointing.__dict__.get("_cells", ())):
-        cell._forget(pointing)
-    _pointers.clear(pointing)
+def inner(owner: Any, view: Any) -> Any:
+    """Ties a record to the one in whose room it lies; IndexError if it sticks out of that."""
+    if view is not None:
+        available = room(owner)
+        needed = _memory.RECORD_SIZES[view._name]
+        offset = int(view) - int(owner)
+        if available is not None and offset + needed > available:
+            raise IndexError(f"{_a(view)} at this place would lie past the memory of its list")
+        place_in(owner, view)
+    return view
+
+
+def room(pointing: Any) -> Optional[int]:
+    """How many bytes there are from where an object points; None where nothing tells."""
+    end = pointing.__dict__.get("_end")
+    if end is None:
+        end = _end(pointing)
+        if end is None:
+            return None
+        pointing.__dict__["_end"] = end
+    remaining: int = end - _pointers.address_of(pointing)
+    return remaining
+
+
+def _end(pointing: Any) -> Optional[int]:
+    """Where the memory ends in which an object lies: its owner's, or its own record's."""
+    owner = pointing.__dict__.get("_owner")
+    if owner is not None:
+        available = room(owner)
+        return None if available is None else int(owner) + available
+    if isinstance(pointing, Record) and pointing.this.own():
+        return int(pointing) + _memory.RECORD_SIZES[pointing._name]
+    return None
+
+
+def require_room(pointing: Any, needed: int, what: str) -> None:
+    available = room(pointing)
+    if available is not None and needed > available:
+        raise ValueError(f"{what} takes {needed} bytes, and there are {max(available, 0)}")
+
+
+def counted(record: Any, count: int, array: str, element: int) -> int:
+    """How many elements an array has, as its record says; ValueError if it has no room for them."""
+    available = room(record)
+    if available is not None:
+        fitting = max(available - _memory.ARRAY_OFFSETS[array], 0) // element
+        if not 0 <= count <= fitting:
+            name = type(record).__name__
+            raise ValueError(f"this {name} counts {count} elements, and has room for {fitting}")
+    return count
+
+
+class Taken:
+    """An object and all views into it, made null so that their memory can be released."""
+
+    def __init__(self, pointing: Any) -> None:
+        self._pointers: List[Tuple[Any, Any]] = []
+        self._cells: List[Tuple[Any, int, Any]] = []
+        self._take(pointing)
+        self.pointer = self._pointers[0][1]
+
+    def _take(self, pointing: Any) -> None:
+        self._pointers.append((pointing, _pointers.take(pointing)))
+        for reference in list(pointing.__dict__.get("_views", {}).values()):
+            view = reference()
+            if view is not None:
+                self._take(view)
+        for cell in list(pointing.__dict__.get("_cells", ())):
+            self._cells += cell._withdraw(pointing)
+
+    def put_back(self) -> None:
+        for pointing, pointer in self._pointers:
+            _pointers.put_back(pointing, pointer)
+        for cell, index, pointing in self._cells:
+            cell[index] = pointing
 
 
 class Record(_Pointing):
@@ -80,38 +182,23 @@ class Record(_Pointing):
     one alive. Two records are equal if they are the same memory.
     """
 
-    thisown: bool
-    __swig_destroy__: ClassVar[Any]
+    _name: ClassVar[str]
+    """Of the C structure."""
     _fields: ClassVar[Tuple[str, ...]] = ()
     _alternatives: ClassVar[Tuple[str, ...]] = ()
     """Fields that show the same entries, of which only one at a time holds."""
+    _trailing: ClassVar[Optional[Tuple[str, Any, int]]] = None
+    """The array that a record ends with: its place, the reader of its count, its element's size."""
 
-    def __init_subclass__(cls) -> None:
-        members = vars(cls)
-        if "thisown" not in members:
-            return
-        # Unless it has a printed form of its own, it prints as all records do.
-        if members["__repr__"].__name__ == "_swig_repr":
-            del cls.__repr__
-        # A name with two underscores in front is another one inside a class body.
-        hidden = f"_{cls.__name__.lstrip('_')}__"
-        for name in [name for name in members if name.startswith(hidden)]:
-            setattr(cls, name[len(hidden) - 2 :], members[name])
-        cls._fields = tuple(
-            name
-            for name, member in vars(cls).items()
-            if isinstance(member, property) and name != "thisown" and not name.startswith(hidden)
-        )
-        counts = [_layout.ARRAYS.get(f"{cls.__name__}_{name}", (None,))[-1] for name in cls._fields]
-        cls._alternatives = tuple(
-            name
-            for name, count in zip(cls._fields, counts)
-            if isinstance(count, str) and counts.count(count) > 1
-        )
-        # An access by index alone would let Python iterate without an end.
-        if "__getitem__" in vars(cls) and not issubclass(cls, Table):
-            cls.__iter__ = None  # type: ignore[attr-defined]  # so Python is told
-        CLASSES[cls.__name__] = cls
+    @classmethod
+    def _end_of(cls, record: Any) -> Optional[int]:
+        """Where the memory of a record ends that a library has just filled."""
+        own = type(record)
+        size = _memory.RECORD_SIZES[own._name]
+        if own._trailing is not None:
+            place, count, element = own._trailing
+            size = max(size, _memory.ARRAY_OFFSETS[place] + count(record) * element)
+        return int(record) + size
 
     # A type checker that saw this would let every name pass.
     if not typing.TYPE_CHECKING:
@@ -119,7 +206,9 @@ class Record(_Pointing):
         def __setattr__(self, name: str, value: Any) -> None:
             if name in self._fields:
                 self._require()
-            elif name not in ("this", "thisown"):
+            elif name != "thisown":
+                if name == "this":
+                    return super().__setattr__(name, value)
                 raise AttributeError(f"{type(self).__name__} has no field {name!r}")
             object.__setattr__(self, name, value)
 
@@ -131,50 +220,100 @@ class Record(_Pointing):
 
     def _shown(self, name: str) -> str:
         # Only one is as long as the entries are, and the record knows not which.
-        return "..." if name in self._alternatives else shown(getattr(self, name))
+        if name in self._alternatives:
+            return "..."
+        try:
+            return shown(getattr(self, name))
+        except ValueError as error:
+            return f"<{error}>"
 
     def __copy__(self) -> "Record":
         """The same bytes in a record of the caller's own, where these are all of the record."""
-        name = type(self).__name__
-        if name not in _layout.WHOLE_RECORDS:
+        if self._name not in _layout.WHOLE_RECORDS:
             super().__copy__()
         self._require()
-        made = CLASSES[name]()
-        ctypes.memmove(int(made), int(self), _memory.RECORD_SIZES[name])
+        held = _pointers.read_memory(self, 0, _memory.RECORD_SIZES[self._name])
+        made = CLASSES[self._name]()
+        _pointers.write_memory(made, 0, held)
         return made
 
+    @property
+    def thisown(self) -> bool:
+        """Whether Python frees the record when it is collected."""
+        return bool(self.this.own())
+
+    @thisown.setter
+    def thisown(self, owned: bool) -> None:
+        self.own(owned)
+
     def own(self, owned: Optional[bool] = None) -> bool:
-        """Whether Python owned the record; with an argument, makes it so."""
-        before: bool = self.this.own() if owned is None else self.this.own(owned)
+        """Whether Python owned the record; with an argument, makes it so.
+
+        Only what Python made and then disowned can be acquired again: a ValueError otherwise.
+        """
+        before: bool = self.this.own()
+        if owned is not None and bool(owned) != before:
+            if not owned:
+                room(self)  # while it can be told
+            elif "_disowned" not in self.__dict__ or not int(self):
+                raise ValueError(f"this {type(self).__name__} is not Python's to free")
+            self.__dict__["_disowned"] = True
+            self.this.own(owned)
         return before
 
     def acquire(self) -> None:
-        self.this.acquire()
+        self.own(True)
 
     def disown(self) -> None:
-        self.this.disown()
-
-    def _require(self) -> None:
-        if not int(self):
-            raise ValueError(f"this {type(self).__name__} is gone: its memory was given back")
+        self.own(False)
 
 
 class Table(Record, typing.Generic[T]):
     """A record that is a sequence: it has a length, elements by index, and can be iterated."""
 
+    _elements: ClassVar[str]
+    """The array that holds them."""
+
     def __iter__(self) -> typing.Iterator[T]:
-        for index in range(len(self)):
-            yield self[index]
+        return iter(self._sequence())
 
     def __len__(self) -> int:
-        self._require()
-        count = _layout.TABLES[type(self).__name__]
-        return int(count) if count.isdigit() else int(getattr(self, count))
+        return len(self._sequence())
 
     def __getitem__(self, index: int) -> T:
-        """An element of the array that is counted, where the record has no method for it."""
-        elements: typing.Sequence[T] = getattr(self, _layout.ELEMENTS[type(self).__name__])
-        return elements[_memory.position(index, len(self))]
+        elements = self._sequence()
+        return elements[_memory.position(index, len(elements))]
+
+    def _sequence(self) -> typing.Sequence[T]:
+        self._require()
+        elements: typing.Sequence[T] = getattr(self, self._elements)
+        return elements
+
+    def __contains__(self, element: object) -> bool:
+        return any(one is element or one == element for one in self)
+
+
+def register(cls: Type[Record], registered: Any) -> None:
+    """Makes a class the one of which pointers of its type become instances."""
+    registered(cls)
+    # The runtime has taken it; called by anybody else, it would free what a record still shows.
+    del cls.__swig_destroy__  # type: ignore[attr-defined]  # generated
+    CLASSES[cls._name] = cls
+
+
+def attach(record: Any, pointer: Any) -> None:
+    """What the constructor of a class does with the pointer object that the flat one made."""
+    if pointer is None:
+        raise MemoryError(f"no memory for {_a(record)}")
+    if record.__dict__.setdefault("this", pointer) is not pointer:
+        raise TypeError(f"this {type(record).__name__} has its memory already")
+
+
+def attach_bytes(record: Any, pointer: Any, size: int) -> None:
+    """Likewise of a record that is as large as its caller says, which starts as zeros."""
+    attach(record, pointer)
+    _pointers.write_memory(record, 0, bytes(size))
+    record.__dict__["_end"] = int(record) + size
 
 
 def record_at(name: str, address: int) -> Record:

@@ -32,8 +32,8 @@ ALLOCATED = """
     VSQEX_GetPortMACTable               table    -               VSQEX_FreeMemory
     VSQEX_GetLAGTable                   table    -               VSQEX_FreeMemory
     VSQEX_GetUplinks                    uplinks  -               VSQEX_FreeMemory
-    VSQEX_GetMcastFilters               filters  -               VSQEX_FreeMemory
-    VSQEX_GetMcastFilterStats           stats    -               VSQEX_FreeMemory
+    VSQEX_GetMcastFilters               filters  mode            VSQEX_FreeMemory
+    VSQEX_GetMcastFilterStats           stats    mode            VSQEX_FreeMemory
     VSQEX_GetDVMirrorSessionIDs         ids      -               VSQEX_FreeMemory
     VSQEX_GetPromiscSessionActiveDsts   ports    -               VSQEX_FreeMemory
     VSQEX_GetRuntimeOptions             options  -               VSQEX_FreeMemory

@@ -39,7 +39,7 @@ def test_an_array_that_a_call_reads() -> None:
     assert found == wanted
 
 
-def test_a_property_through_the_raw_door(switch: str, switch_id: str) -> None:
+def test_a_property_by_the_raw_call(switch: str, switch_id: str) -> None:
     data, length = Cell("void *"), Cell("int")
     assert (
         vs.DVSQEX_GlobalPropGet(switch_id, vs.VSPROP_MTU, data.pointer, length.pointer) == vs.QEX_OK
@@ -104,7 +104,7 @@ def test_lists_and_items(switch_id: str) -> None:
     assert vs.DVSData_Data(item.value, data.pointer) == 4
     assert int.from_bytes(data.read(4), "little") == 1500
     # A look at the state is nobody's to give back.
-    with pytest.raises(ValueError, match="name the door"):
+    with pytest.raises(ValueError, match="name the deallocator"):
         vs.owned(item)
 
 
@@ -298,7 +298,7 @@ def test_what_was_put_in_stays_alive() -> None:
     pointers = [*kept, *(cell.value for cell in untyped)]
     sent = [_libvswitch.VSStats_pktsTx_get(at(int(one) + offset)) for one in pointers]
     assert sent == list(range(200))
-    assert [cell.value.numLAGs for cell in typed if cell.value] == list(range(200))
+    assert [cell.value.numLAGs for cell in typed if cell.value is not None] == list(range(200))
 
 
 def at(address: int) -> Any:
@@ -310,7 +310,7 @@ def test_what_was_put_in_reads_back_and_ends_with_its_memory(switch: str) -> Non
     cell = Cell("VSLAGTable *", lags)
     assert cell.value is lags
     # It is the caller's own, whatever call the cell went through.
-    with pytest.raises(ValueError, match="name the door"):
+    with pytest.raises(ValueError, match="name the deallocator"):
         vs.owned(cell)
 
     _, uplinks = vs.VSQEX_GetUplinks(switch)
@@ -319,7 +319,7 @@ def test_what_was_put_in_reads_back_and_ends_with_its_memory(switch: str) -> Non
         vs.VSQEX_FreeMemory(plain)
     vs.VSQEX_FreeMemory(uplinks)
     assert [*plain] == [None, None] and bytes(plain) == bytes(16)
-    with pytest.raises(ValueError, match="^this VSUplinks is gone: its memory was given back$"):
+    with pytest.raises(ValueError, match="^this VSUplinks is gone: its memory was released$"):
         plain.value = uplinks
 
 

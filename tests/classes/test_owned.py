@@ -1,11 +1,11 @@
-"""Memory of the library goes back once, through the right door, and is not used afterwards."""
+"""Memory of the library goes back once, by the right deallocator, and is not used afterwards."""
 
-from typing import Any, Callable, List, Optional
+from typing import Any, Callable, List
 
 import _libvswitch
 import libvswitch as vs
 import pytest
-from libvswitch._ownership import DOORS, door_of
+from libvswitch._layout import DEALLOCATORS
 
 
 def uses(uplinks: Any) -> List[Callable[[], Any]]:
@@ -64,39 +64,21 @@ def test_lists_of_the_configuration_go_back(switch: str) -> None:
         assert len(policy.vidRanges) == 0
 
 
-@pytest.mark.parametrize(
-    "call, door",
-    [
-        ("VSQEX_GetUplinks", "VSQEX_FreeMemory"),
-        ("VSDVS_GetDVMirrorSessions", "VSDVS_FreeMemory"),
-        ("DVSQEX_GlobalPropGet", "DVSQEX_DataFree"),
-        ("DVSQEX_SwitchPortList", "DVSQEX_DataFree"),
-        ("DVSQEX_VendorPortPropList", "DVSData_Free"),
-        ("DVSData_Alloc", "DVSData_Free"),
-        ("DVSData_Data", None),
-        ("DVSState_GlobalPropLookup", None),
-    ],
-)
-def test_the_call_chooses_the_door(call: str, door: Optional[str]) -> None:
-    """As the headers say it of each."""
-    assert door_of(call) == door
-
-
-def test_the_caller_chooses_the_door(switch: str) -> None:
+def test_the_caller_chooses_the_deallocator(switch: str) -> None:
     through: List[Any] = []
 
-    def door(memory: Any) -> None:
+    def deallocator(memory: Any) -> None:
         through.append(int(memory))
         _libvswitch.VSQEX_FreeMemory(memory)
 
     _, uplinks = vs.VSQEX_GetUplinks(switch)
     address = int(uplinks)
-    with vs.owned(uplinks, door):
+    with vs.owned(uplinks, deallocator):
         assert through == []
     assert through == [address]
     with pytest.raises(ValueError):
         uplinks[0]
-    with pytest.raises(ValueError, match="takes no memory back"):
+    with pytest.raises(ValueError, match="releases no memory"):
         vs.owned(vs.VSInfo(), "VSQEX_GetVSInfo")
 
 
@@ -110,12 +92,12 @@ def test_the_host_counts_it_once(switch: str) -> None:
         _libvswitch.VSQEX_FreeMemory(memory)
 
 
-def test_what_nobody_handed_out_has_no_door() -> None:
-    with pytest.raises(ValueError, match="name the door"):
+def test_what_nobody_allocated_has_no_deallocator() -> None:
+    with pytest.raises(ValueError, match="name the deallocator"):
         vs.owned(vs.VSInfo())
 
 
-def test_a_call_that_failed_hands_nothing_out() -> None:
+def test_a_call_that_failed_allocates_nothing() -> None:
     with vs.owned(vs.VSQEX_GetUplinks("no such switch")) as (status, uplinks):
         assert (status, uplinks) == (vs.QEX_NOT_FOUND, None)
 
@@ -127,35 +109,35 @@ def test_a_table_of_the_callers_own() -> None:
         len(table)
 
 
-def test_a_wrong_door_leaves_the_record_to_the_right_one(switch: str) -> None:
+def test_a_wrong_deallocator_leaves_the_record_to_the_right_one(switch: str) -> None:
     _, uplinks = vs.VSQEX_GetUplinks(switch)
     names = list(uplinks)
-    wrong = [name for name in DOORS if name != "VSQEX_FreeMemory"]
+    wrong = [name for name in DEALLOCATORS if name != "VSQEX_FreeMemory"]
     assert len(wrong) == 4
-    for door in wrong:
-        text = f"this VSUplinks goes back through VSQEX_FreeMemory, not {door}"
+    for deallocator in wrong:
+        text = f"VSQEX_FreeMemory releases this VSUplinks, not {deallocator}"
         with pytest.raises(ValueError, match=f"^{text}$"):
-            getattr(vs, door)(uplinks)
+            getattr(vs, deallocator)(uplinks)
         with pytest.raises(ValueError, match=f"^{text}$"):
-            vs.owned(uplinks, door)
+            vs.owned(uplinks, deallocator)
     assert list(uplinks) == names
     vs.VSQEX_FreeMemory(uplinks)
     assert repr(uplinks) == "<VSUplinks that is gone>"
 
 
-@pytest.mark.parametrize("door", DOORS)
-def test_no_door_takes_a_record_of_the_callers_own(door: str) -> None:
+@pytest.mark.parametrize("deallocator", DEALLOCATORS)
+def test_no_deallocator_takes_a_record_of_the_callers_own(deallocator: str) -> None:
     info = vs.VSInfo()
     info.mtu = 9000
-    text = f"^this VSInfo is the caller's own, and {door} takes none of that$"
+    text = f"^this VSInfo is the caller's own, and {deallocator} releases none of that$"
     with pytest.raises(ValueError, match=text):
-        getattr(vs, door)(info)
+        getattr(vs, deallocator)(info)
     assert info.mtu == 9000 and info.thisown
 
 
-def test_a_wrong_door_leaves_the_callers_table(switch: str) -> None:
+def test_a_wrong_deallocator_leaves_the_callers_table(switch: str) -> None:
     table = vs.alloc_dvmirror_session_table(1, 1)
-    text = "goes back through free_dvmirror_session_table, not VSDVS_FreeMemory$"
+    text = "^free_dvmirror_session_table releases this DVMirrorSessionTable, not VSDVS_FreeMemory$"
     with pytest.raises(ValueError, match=text):
         vs.VSDVS_FreeMemory(table)
     assert len(table) == 1
@@ -208,7 +190,7 @@ def test_what_can_hold_no_memory_is_no_result(given: Any) -> None:
     with pytest.raises(TypeError) as raised:
         vs.owned(given)
     assert str(raised.value) == (
-        "owned takes what a call answered, a record, an array, a cell or a pointer, "
+        "owned takes what a call returned, a record, an array, a cell or a pointer, "
         f"not {type(odd).__name__}"
     )
 
@@ -221,8 +203,8 @@ def test_a_pointer_object_without_a_class_is_no_result(switch: str) -> None:
 
 
 def test_a_cell_of_numbers_holds_no_memory() -> None:
-    doors: List[Callable[[Any], Any]] = [vs.owned, vs.VSQEX_FreeMemory]
-    for take in doors:
+    deallocators: List[Callable[[Any], Any]] = [vs.owned, vs.VSQEX_FreeMemory]
+    for take in deallocators:
         with pytest.raises(TypeError, match="^a cell of int points to nothing$"):
             take(vs.Cell("int", 5))
 

@@ -121,7 +121,7 @@ def test_what_is_wrong_is_found(tmp_path: Path) -> None:
 
 
 def test_the_stubs_carry_the_documentation() -> None:
-    text = (FOLDER / "libvswitch" / "_classes.pyi").read_text(encoding="utf-8")
+    text = (FOLDER / "libvswitch" / "_calls.pyi").read_text(encoding="utf-8")
     assert "Sets the MTU of a switch." in text
     assert "- QEX_BAD_PARAM for an MTU out of its bounds" in text
     assert "how many ranges" in text

@@ -18,6 +18,9 @@ static void NAME##_setitem(TYPE *array, size_t index, TYPE value) { array[index]
 
 %newobject new_##NAME;
 %feature("releases:DISOWN", "1") delete_##NAME;
+%feature("elements:RESULT", "nelements") new_##NAME;
+%feature("within:index", "REQUIRED") NAME##_getitem;
+%feature("within:index", "REQUIRED") NAME##_setitem;
 TYPE *new_##NAME(size_t nelements);
 void delete_##NAME(TYPE *DISOWN);
 TYPE NAME##_getitem(TYPE *REQUIRED, size_t index);
