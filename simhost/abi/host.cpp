@@ -5,6 +5,7 @@
 
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
 #include <string_view>
 #include <system_error>
 
@@ -70,6 +71,9 @@ storage::Store &Host::state() {
       state_file_ = absolute(named);
     }
     configured_ = true;
+  }
+  if (state_ && !state_->is_current()) {
+    state_.reset();
   }
   if (!state_) {
     state_.emplace(state_file_, populate_fresh_host);

@@ -1,7 +1,6 @@
 // The host of this process: both libraries and all threads share it.
 #pragma once
 
-#include <filesystem>
 #include <mutex>
 #include <optional>
 
@@ -32,7 +31,7 @@ class Host {
   Handles handles_;
   DataLists lists_{ledger_};
   bool configured_ = false;
-  std::optional<std::filesystem::path> state_file_;
+  std::optional<storage::StateFile> state_file_;
   std::optional<storage::Store> state_;
 };
 

@@ -5,13 +5,6 @@
 
 namespace simhost::storage {
 
-SQLite::Statement &Connection::prepared(std::string_view sql) {
-  if (auto const found = statements.find(sql); found != statements.end()) {
-    return found->second;
-  }
-  return statements.try_emplace(sql, database, std::string(sql)).first->second;
-}
-
 Query::~Query() {
   statement_.tryReset();
   try {
@@ -39,11 +32,30 @@ Query &Query::with(std::span<std::byte const> bytes) {
 }
 
 bool Query::next() {
-  return statement_.executeStep();
+  constexpr std::size_t kRow = 8;
+  bool const found = connection_.guarded([&] { return statement_.executeStep(); });
+  connection_.require_schema_of_now();
+  take(kRow);
+  return found;
 }
 
 int Query::run() {
-  return statement_.exec();
+  int const changed = connection_.guarded([&] { return statement_.exec(); });
+  connection_.require_schema_of_now();
+  return changed;
+}
+
+// A page that leads to itself has rows without end.
+void Query::take(std::size_t size) const {
+  constexpr std::uint64_t kPerByte = 16;
+  taken_ += size;
+  if (taken_ <= allowed_) {
+    return;
+  }
+  allowed_ = connection_.allowance(kFree, kPerByte);
+  if (taken_ > allowed_) {
+    connection_.refuse("it yields more than it can hold");
+  }
 }
 
 std::int64_t Query::integer(int column) const {
@@ -68,6 +80,7 @@ std::string Query::text(int column) const {
     refuse(column, "no text");
   }
   auto text = value.getString();
+  take(text.size());
   if (text.find('\0') != std::string::npos) {
     refuse(column, "a text with a NUL in it");
   }
@@ -80,7 +93,9 @@ std::vector<std::byte> Query::bytes(int column) const {
     refuse(column, "no bytes");
   }
   auto const *first = static_cast<std::byte const *>(value.getBlob());
-  return {first, first + value.getBytes()};
+  auto const size = static_cast<std::size_t>(value.getBytes());
+  take(size);
+  return {first, first + size};
 }
 
 std::vector<std::byte> Query::bytes(int column, std::size_t length) const {
@@ -96,8 +111,8 @@ bool Query::is_null(int column) const {
 }
 
 void Query::refuse(int column, std::string const &what) const {
-  store_.refuse(std::string("the column '") + statement_.getColumn(column).getName() + "' holds " +
-                what);
+  connection_.refuse(std::string("the column '") + statement_.getColumn(column).getName() +
+                     "' holds " + what);
 }
 
 }  // namespace simhost::storage

@@ -1,13 +1,11 @@
 // SQL on the state. Private to this layer: those above know rows and the functions on them.
 #pragma once
 
-#include <SQLiteCpp/Database.h>
 #include <SQLiteCpp/Statement.h>
 
 #include <cstddef>
 #include <cstdint>
 #include <limits>
-#include <map>
 #include <optional>
 #include <span>
 #include <string>
@@ -15,19 +13,10 @@
 #include <type_traits>
 #include <vector>
 
+#include "storage/connection.h"
 #include "storage/store.h"
 
 namespace simhost::storage {
-
-/// The open database, and the statements that were prepared on it.
-struct Connection {
-  explicit Connection(std::optional<std::filesystem::path> const &file);
-
-  SQLite::Statement &prepared(std::string_view sql);
-
-  SQLite::Database database;
-  std::map<std::string_view, SQLite::Statement> statements;
-};
 
 /// One run of a prepared statement. It resets the statement when it goes, because a statement left
 /// in the middle of its rows would keep its transaction from ending.
@@ -35,7 +24,9 @@ class Query {
  public:
   /// `sql` is a literal: the statement prepared from it is kept.
   Query(Transaction &transaction, std::string_view sql)
-      : store_(transaction.store()), statement_(transaction.connection().prepared(sql)) {}
+      : connection_(transaction.connection()), statement_(connection_.prepared(sql)) {
+    connection_.start_statement();
+  }
   ~Query();
   Query(Query const &) = delete;
   Query &operator=(Query const &) = delete;
@@ -92,9 +83,17 @@ class Query {
   }
 
  private:
-  Store const &store_;
+  // Bytes that may come out of the state before it is asked how large the file is.
+  static constexpr std::uint64_t kFree = std::uint64_t{1} << 20;
+
+  // Counts bytes that came out.
+  void take(std::size_t size) const;
+
+  Connection &connection_;
   SQLite::Statement &statement_;
   int bound_ = 0;
+  mutable std::uint64_t taken_ = 0;
+  mutable std::uint64_t allowed_ = kFree;
 };
 
 }  // namespace simhost::storage

@@ -7,8 +7,11 @@ namespace simhost::storage {
 
 /// "VSim": no other program's database carries it.
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
-/// Rises with every change of the tables; a file of another version is refused, not converted.
+/// Rises with every change of the tables, by a step of state_format.cpp that brings a file of the
+/// version before forward.
 inline constexpr std::int64_t kSchemaVersion = 3;
+/// The version that the first of those steps begins with; what is older is refused.
+inline constexpr std::int64_t kOldestSchema = 3;
 
 /// Creates the tables of an empty database.
 extern char const *const kSchema;

@@ -1,139 +1,93 @@
 // Opening the state without ever touching a file that is not ours, and running work on it.
 #include "storage/store.h"
 
-#include <SQLiteCpp/Exception.h>
-#include <sqlite3.h>
+#include <utility>
 
-#include <chrono>
-#include <thread>
-
-#include "storage/query.h"
+#include "storage/connection.h"
+#include "storage/patience.h"
 #include "storage/schema.h"
 
 namespace simhost::storage {
-namespace {
 
-constexpr std::chrono::seconds kPatience{10};
-
-// Switching a file to write-ahead logging, and recovering it after a crash, may answer "busy"
-// without asking the busy handler; two processes that open a new file together run into that.
-template <typename Work>
-auto patiently(Work const &work) {
-  auto const deadline = std::chrono::steady_clock::now() + kPatience;
-  while (true) {
-    try {
-      return work();
-    } catch (SQLite::Exception const &error) {
-      if (error.getErrorCode() != SQLITE_BUSY || std::chrono::steady_clock::now() >= deadline) {
-        throw;
-      }
-    }
-    std::this_thread::sleep_for(std::chrono::milliseconds(2));
-  }
-}
-
-std::int64_t integer_of(SQLite::Database &database, char const *sql) {
-  return database.execAndGet(sql).getInt64();
-}
-
-// Whether nothing has been written to this state yet; refuses what another program wrote.
-bool is_blank(SQLite::Database &database) {
-  auto const application = integer_of(database, "PRAGMA application_id");
-  auto const version = integer_of(database, "PRAGMA user_version");
-  if (application == 0 && version == 0 &&
-      integer_of(database, "SELECT count(*) FROM sqlite_master") == 0) {
-    return true;
-  }
-  if (application != kApplicationId) {
-    throw UnusableState("it is a database of another program");
-  }
-  if (version != kSchemaVersion) {
-    throw UnusableState("it has schema version " + std::to_string(version) + ", this host reads " +
-                        std::to_string(kSchemaVersion));
-  }
-  return false;
-}
-
-}  // namespace
-
-void refuse_file(std::filesystem::path const &file, std::string const &why) {
-  throw UnusableState("the state file " + file.string() + " cannot be used: " + why);
-}
-
-Connection::Connection(std::optional<std::filesystem::path> const &file)
-    : database(file ? file->string() : std::string(":memory:"),
-               SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE,
-               static_cast<int>(std::chrono::milliseconds(kPatience).count())) {}
-
-Store::Store(std::optional<std::filesystem::path> const &file, Populate const &populate) try
-    : name_(file.value_or(":memory:")), connection_(std::make_unique<Connection>(file)) {
-  connection_->database.exec("PRAGMA foreign_keys = ON");
-  if (file) {
-    prepare_file(populate);
-  } else {
-    create_if_blank(populate);
-  }
-} catch (UnusableState const &error) {
-  refuse_file(file.value_or(":memory:"), error.what());
-} catch (SQLite::Exception const &error) {
-  if (error.getErrorCode() == SQLITE_BUSY) {
-    throw;
-  }
-  refuse_file(file.value_or(":memory:"), error.what());
+Store::Store(std::optional<StateFile> file, Populate const &populate)
+    : connection_(std::make_unique<Connection>(std::move(file))) {
+  connection_->guarded([&] { prepare(populate); });
 }
 
 Store::~Store() = default;
 
-void Store::refuse(std::string const &why) const {
-  refuse_file(name_, why);
+bool Store::is_current() const {
+  auto const &file = connection_->file();
+  return !file || file->is_writable() || file->is_unchanged();
 }
 
-void Store::prepare_file(Populate const &populate) {
-  // Nothing may be written before is_blank() has looked at what is there.
-  auto const looks_blank = [&] {
+void Store::refuse(std::string const &why) const {
+  connection_->refuse(why);
+}
+
+void Store::prepare(Populate const &populate) {
+  auto &database = connection_->database();
+  auto const &file = connection_->file();
+  // Nothing may be written before it is known what is there.
+  auto const version = patiently([&] {
     // In one transaction, or another process could create the state between two of the questions.
     Transaction const look(*this, Access::read);
-    return is_blank(connection_->database);
-  };
-  if (patiently(looks_blank)) {
-    patiently([&] { connection_->database.exec("PRAGMA journal_mode = WAL"); });
-    patiently([&] { create_if_blank(populate); });
+    return version_of(database);
+  });
+  if (version != kSchemaVersion && file && !file->is_writable()) {
+    refuse("it has no state of this version in it, and this program may only look at it");
   }
-  // A commit is in the operating system's hands when it returns, so it outlives a killed process;
-  // waiting for the disk as well would only guard against a power cut.
-  connection_->database.exec("PRAGMA synchronous = NORMAL");
+  if (version == kBlank && file) {
+    patiently([&] { database.exec("PRAGMA journal_mode = WAL"); });
+  }
+  if (version != kSchemaVersion) {
+    patiently([&] { create_or_bring_forward(populate); });
+  }
+  if (file) {
+    // A commit is in the operating system's hands when it returns, so it outlives a killed process;
+    // waiting for the disk as well would only guard against a power cut.
+    database.exec("PRAGMA synchronous = NORMAL");
+    patiently([&] {
+      Transaction const look(*this, Access::read);
+      connection_->watch();
+    });
+  }
 }
 
-void Store::create_if_blank(Populate const &populate) {
+void Store::create_or_bring_forward(Populate const &populate) {
   Transaction transaction(*this, Access::write);
-  if (is_blank(connection_->database)) {
-    connection_->database.exec("PRAGMA application_id = " + std::to_string(kApplicationId));
-    connection_->database.exec("PRAGMA user_version = " + std::to_string(kSchemaVersion));
-    connection_->database.exec(kSchema);
-    connection_->database.exec(kRunningSchema);
+  auto &database = connection_->database();
+  if (auto const version = version_of(database); version == kBlank) {
+    create_state(database);
     populate(transaction);
+  } else {
+    bring_forward(database, version);
   }
   transaction.commit();
 }
 
 Transaction::Transaction(Store &store, Access access) : store_(store), access_(access) {
-  connection().database.exec(access == Access::write ? "BEGIN IMMEDIATE" : "BEGIN");
+  connection().require_in_place();
+  connection().guarded(
+      [&] { connection().database().exec(access == Access::write ? "BEGIN IMMEDIATE" : "BEGIN"); });
 }
 
 Transaction::~Transaction() {
   if (open_) {
     // It fails when SQLite has rolled back by itself, and then there is nothing left to undo.
-    connection().database.tryExec("ROLLBACK");
+    connection().database().tryExec("ROLLBACK");
   }
 }
 
 void Transaction::commit() {
-  connection().database.exec("COMMIT");
+  connection().guarded([&] { connection().database().exec("COMMIT"); });
   open_ = false;
+  // Into a file that is gone it was written for nobody.
+  connection().require_in_place();
 }
 
 std::int64_t Transaction::last_key() const {
-  return connection().database.getLastInsertRowid();
+  return connection().database().getLastInsertRowid();
 }
 
 }  // namespace simhost::storage

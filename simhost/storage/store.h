@@ -2,50 +2,44 @@
 #pragma once
 
 #include <cstdint>
-#include <filesystem>
 #include <functional>
 #include <memory>
 #include <optional>
-#include <stdexcept>
 #include <string>
+
+#include "storage/state_file.h"
 
 namespace simhost::storage {
 
-/// A state file that cannot be used; what() says which file and why.
-class UnusableState : public std::runtime_error {
-  using std::runtime_error::runtime_error;
-};
-
-/// Throws UnusableState.
-[[noreturn]] void refuse_file(std::filesystem::path const &file, std::string const &why);
-
 class Query;
 class Transaction;
-struct Connection;
+class Connection;
 
-/// A connection to the state. Not safe for use by several threads at once, nor across a fork.
+/// A connection to the state. Not safe for use by several threads at once, nor across a fork. What
+/// is wrong with a file is thrown as UnusableState; but what a caller may wait out or put right (a
+/// lock, a full disk, a medium that can only be read) as SQLite::Exception.
 class Store {
  public:
   using Populate = std::function<void(Transaction &)>;
 
   /// Opens the state in `file`, or a private one in memory if there is none; `populate` fills a
-  /// state that is new. Throws UnusableState, or SQLite::Exception if another process keeps it
-  /// locked.
-  Store(std::optional<std::filesystem::path> const &file, Populate const &populate);
+  /// state that is new.
+  Store(std::optional<StateFile> file, Populate const &populate);
   ~Store();
   Store(Store const &) = delete;
   Store &operator=(Store const &) = delete;
 
+  /// Whether it shows the file as it is; a file that may only be looked at is read as it once was.
+  [[nodiscard]] bool is_current() const;
   /// Throws UnusableState, which names the file.
   [[noreturn]] void refuse(std::string const &why) const;
 
  private:
   friend class Transaction;
 
-  void prepare_file(Populate const &populate);
-  void create_if_blank(Populate const &populate);
+  void prepare(Populate const &populate);
+  void create_or_bring_forward(Populate const &populate);
 
-  std::filesystem::path name_;
   std::unique_ptr<Connection> connection_;
 };
 
@@ -70,7 +64,6 @@ class Transaction {
  private:
   friend class Query;
 
-  [[nodiscard]] Store const &store() const { return store_; }
   [[nodiscard]] Connection &connection() const { return *store_.connection_; }
 
   Store &store_;

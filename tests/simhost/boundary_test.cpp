@@ -238,8 +238,8 @@ TEST(StateFile, ThatCannotBeOpenedSpringsTheTrap) {
         std::exit(0);
       },
       testing::ExitedWithCode(0),
-      "^OSError: VSDVS_DestroyVSwitch: the state file /nowhere/host.db cannot be used: unable to "
-      "open database file\\.$");
+      "^OSError: VSDVS_DestroyVSwitch: the state file /nowhere/host.db cannot be used: No such "
+      "file or directory\\.$");
 }
 
 TEST(StateFile, ThatCannotBeOpenedSpringsTheTrapOfACallWithoutStatus) {
@@ -253,7 +253,7 @@ TEST(StateFile, ThatCannotBeOpenedSpringsTheTrapOfACallWithoutStatus) {
       },
       testing::ExitedWithCode(0),
       "^OSError: DVSState_SwitchFindByAlias: the state file /nowhere/host.db cannot be used: "
-      "unable to open database file\\.$");
+      "No such file or directory\\.$");
 }
 
 TEST(StateFile, InAFolderThatIsGoneSpringsTheTrap) {

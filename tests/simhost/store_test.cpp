@@ -287,7 +287,7 @@ TEST(UnusableStateFile, ThatCannotBeOpened) {
   TemporaryFolder const folder;
   auto const file = folder.file("missing") / "host.db";
   EXPECT_EQ(refusal_of(file),
-            "the state file " + file.string() + " cannot be used: unable to open database file");
+            "the state file " + file.string() + " cannot be used: No such file or directory");
 }
 
 TEST(UnusableStateFile, ThatIsSomethingElse) {

@@ -41,8 +41,8 @@ TEST_F(WithoutModuleDeathTest, AnUnusableStateFileIsNamed) {
         VSDVS_SetMTU("s", 1500);
       },
       testing::KilledBySignal(SIGABRT),
-      "^simulated host: VSDVS_SetMTU: the state file /dev/null/host.db cannot be used: unable to "
-      "open database file\n$");
+      "^simulated host: VSDVS_SetMTU: the state file /dev/null/host.db cannot be used: Not a "
+      "directory\n$");
 }
 
 }  // namespace

@@ -1,0 +1,78 @@
+// The database behind a state, which this host did not always write. Private to this layer.
+#pragma once
+
+#include <SQLiteCpp/Database.h>
+#include <SQLiteCpp/Exception.h>
+#include <SQLiteCpp/Statement.h>
+
+#include <cstdint>
+#include <map>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "storage/state_file.h"
+#include "storage/state_format.h"
+
+namespace simhost::storage {
+
+/// The open database, the statements that were prepared on it, and what it is watched for: that the
+/// file stays in place, that its tables stay a state's, that no statement goes on for ever. What
+/// SQLite says is wrong with a file is thrown as UnusableState; but what a caller may wait out or
+/// put right (a lock, a full disk, a medium that can only be read) as SQLite::Exception.
+class Connection {
+ public:
+  /// To the file, or to a database of its own in memory.
+  explicit Connection(std::optional<StateFile> file);
+  Connection(Connection const &) = delete;
+  Connection &operator=(Connection const &) = delete;
+
+  SQLite::Database &database() { return *database_; }
+  [[nodiscard]] std::optional<StateFile> const &file() const { return file_; }
+  /// Throws UnusableState, which names the file.
+  [[noreturn]] void refuse(std::string const &why) const;
+  /// Runs work of SQLite's, and says of which file it is what it throws.
+  template <typename Work>
+  decltype(auto) guarded(Work const &work) const;
+
+  /// Requires the tables to be a state's, and from now on the file and them to stay that.
+  void watch();
+  void require_in_place() const;
+  /// Costs little while nobody writes to the file.
+  void require_schema_of_now();
+
+  /// `sql` is a literal: the statement prepared from it is kept.
+  SQLite::Statement &prepared(std::string_view sql);
+  /// Begins to count the steps of a statement anew.
+  void start_statement() { rounds_ = 0; }
+  /// What a statement may come to: what is free, and that much for each byte of the file.
+  [[nodiscard]] std::uint64_t allowance(std::uint64_t free, std::uint64_t per_byte) const;
+
+ private:
+  static int stop_if_endless(void *connection);
+  void open_file();
+  void require_schema();
+  [[nodiscard]] std::uint32_t data_version() const;
+  [[noreturn]] void refuse(SQLite::Exception const &error) const;
+
+  std::optional<StateFile> file_;
+  std::optional<SQLite::Database> database_;
+  std::map<std::string_view, SQLite::Statement> statements_;
+  std::uint64_t rounds_ = 0;
+  bool watching_ = false;
+  std::uint32_t seen_ = 0;   // the version of the data whose schema is known
+  std::int64_t schema_ = 0;  // the version of the schema that was found to be a state's
+};
+
+template <typename Work>
+decltype(auto) Connection::guarded(Work const &work) const {
+  try {
+    return work();
+  } catch (SQLite::Exception const &error) {
+    refuse(error);
+  } catch (WrongFormat const &error) {
+    refuse(error.what());
+  }
+}
+
+}  // namespace simhost::storage

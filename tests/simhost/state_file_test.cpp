@@ -1,0 +1,449 @@
+// Which files the host takes for a state, and what it says of the others.
+#include "storage/state_file.h"
+
+#include <SQLiteCpp/Database.h>
+#include <SQLiteCpp/Exception.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sqlite3.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <fstream>
+#include <string>
+
+#include "schema_3.h"
+#include "storage/query.h"
+#include "storage/schema.h"
+#include "storage/state_format.h"
+#include "storage/store.h"
+#include "storage/switches.h"
+#include "temporary_folder.h"
+
+namespace {
+
+using simhost::storage::Access;
+using simhost::storage::StateFile;
+using simhost::storage::Store;
+using simhost::storage::Switch;
+using simhost::storage::SwitchName;
+using simhost::storage::Transaction;
+using simhost::storage::UnusableState;
+using testing::HasSubstr;
+
+constexpr uid_t kSomebody = 12345;
+
+void populate_nothing(Transaction &) {}
+
+// What `work` says is wrong with a state; empty if nothing is.
+template <typename Work>
+std::string refusal_by(Work const &work) {
+  try {
+    work();
+    return "";
+  } catch (UnusableState const &error) {
+    return error.what();
+  }
+}
+
+std::string refusal_of(StateFile const &file) {
+  return refusal_by([&] { Store const store(file, populate_nothing); });
+}
+
+std::string refused(std::filesystem::path const &file, std::string const &why) {
+  return "the state file " + file.string() + " cannot be used: " + why;
+}
+
+std::string content(std::filesystem::path const &file) {
+  std::ifstream stream(file, std::ios::binary);
+  return {std::istreambuf_iterator<char>(stream), {}};
+}
+
+void write(std::filesystem::path const &file, std::string const &text) {
+  std::ofstream(file, std::ios::binary) << text;
+}
+
+void add(Store &store, std::string const &name) {
+  Transaction transaction(store, Access::write);
+  simhost::storage::add_switch(transaction, {.alias = name,
+                                             .identifier = name,
+                                             .portset = name,
+                                             .max_ports = 1,
+                                             .version = 1,
+                                             .persistent = true});
+  transaction.commit();
+}
+
+bool has(Store &store, std::string const &name) {
+  Transaction transaction(store, Access::read);
+  return simhost::storage::find_switch(transaction, SwitchName::alias, name).has_value();
+}
+
+/// A state with the switch "a", closed.
+std::filesystem::path made(TemporaryFolder const &folder) {
+  auto file = folder.file("host.db");
+  Store store(file, populate_nothing);
+  add(store, "a");
+  return file;
+}
+
+void execute(std::filesystem::path const &file, std::string const &sql) {
+  SQLite::Database(file.string(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(sql);
+}
+
+std::string of_somebody(uid_t us) {
+  return "belongs to the user 12345, and this program runs as the user " + std::to_string(us) +
+         ": all programs on one state run as one user";
+}
+
+/// Tests that give files away, which only root can do.
+struct StateFileAsRoot : testing::Test {
+  void SetUp() override {
+    if (geteuid() != 0) {
+      GTEST_SKIP() << "only root can make files of other users; run these as root as well";
+    }
+  }
+
+  static void give_away(std::filesystem::path const &file) {
+    ASSERT_EQ(lchown(file.c_str(), kSomebody, kSomebody), 0);
+  }
+
+  /// Whether `work` comes true in a child that is another user.
+  template <typename Work>
+  static bool true_for_somebody(Work const &work) {
+    auto const child = fork();
+    if (child == 0) {
+      _exit(setegid(kSomebody) == 0 && seteuid(kSomebody) == 0 && work() ? 0 : 1);
+    }
+    int status = 0;
+    waitpid(child, &status, 0);
+    return WIFEXITED(status) && WEXITSTATUS(status) == 0;
+  }
+};
+
+TEST(StateFile, IsMadeForItsUserAlone) {
+  TemporaryFolder const folder;
+  auto const before = umask(0);
+  Store store(folder.file("host.db"), populate_nothing);
+  umask(before);
+  add(store, "a");
+  for (auto const *name : {"host.db", "host.db-wal", "host.db-shm"}) {
+    EXPECT_EQ(std::filesystem::status(folder.file(name)).permissions(),
+              std::filesystem::perms::owner_read | std::filesystem::perms::owner_write)
+        << name;
+  }
+}
+
+TEST(StateFile, ThatIsNoRegularFileIsRefused) {
+  TemporaryFolder const folder;
+  auto const pipe = folder.file("pipe");
+  ASSERT_EQ(mkfifo(pipe.c_str(), S_IRUSR | S_IWUSR), 0);
+  for (auto const &file : {std::filesystem::path("/dev/null"), pipe, pipe.parent_path()}) {
+    EXPECT_EQ(refusal_of(file), refused(file, "it is no regular file"));
+    EXPECT_FALSE(std::filesystem::exists(file.string() + "-journal"));
+    EXPECT_FALSE(std::filesystem::exists(file.string() + "-wal"));
+  }
+}
+
+TEST(StateFile, OfLessThanADatabaseIsRefused) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.db");
+  for (std::string const &text : {std::string("x"), std::string(511, '\0')}) {
+    write(file, text);
+    EXPECT_EQ(refusal_of(file), refused(file, "file is not a database"));
+    EXPECT_EQ(content(file), text) << "it is left as it was";
+  }
+}
+
+TEST(StateFile, MayBeNamedByALink) {
+  TemporaryFolder const folder;
+  made(folder);
+  std::filesystem::create_symlink("host.db", folder.file("link"));
+  Store store(folder.file("link"), populate_nothing);
+  EXPECT_TRUE(has(store, "a"));
+}
+
+TEST(StateFile, IsNotMadeThroughALinkToNothing) {
+  TemporaryFolder const folder;
+  std::filesystem::create_symlink("elsewhere", folder.file("host.db"));
+  EXPECT_EQ(refusal_of(folder.file("host.db")),
+            refused(folder.file("host.db"), "No such file or directory"));
+  EXPECT_FALSE(std::filesystem::exists(folder.file("elsewhere")));
+}
+
+TEST(StateFile, WithALinkBesideItIsRefused) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  write(folder.file("precious"), "mine");
+  for (auto const *name : {"host.db-wal", "host.db-shm", "host.db-journal"}) {
+    std::filesystem::create_symlink("precious", folder.file(name));
+    EXPECT_EQ(refusal_of(file), refused(file, std::string(name) + " beside it is no regular file"));
+    std::filesystem::remove(folder.file(name));
+  }
+  EXPECT_EQ(content(folder.file("precious")), "mine");
+}
+
+TEST_F(StateFileAsRoot, OfAnotherUserIsRefused) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  give_away(file);
+  EXPECT_EQ(refusal_of(file), refused(file, "it " + of_somebody(0)));
+  EXPECT_FALSE(std::filesystem::exists(folder.file("host.db-shm")));
+}
+
+TEST_F(StateFileAsRoot, OfAnotherUserIsRefusedBehindALinkToo) {
+  TemporaryFolder const folder;
+  give_away(made(folder));
+  std::filesystem::create_symlink("host.db", folder.file("link"));
+  EXPECT_EQ(refusal_of(folder.file("link")), refused(folder.file("link"), "it " + of_somebody(0)));
+}
+
+TEST_F(StateFileAsRoot, IsNotFoundByALinkOfAnotherUser) {
+  TemporaryFolder const folder;
+  made(folder);
+  std::filesystem::create_symlink("host.db", folder.file("link"));
+  give_away(folder.file("link"));
+  EXPECT_EQ(refusal_of(folder.file("link")),
+            refused(folder.file("link"), "it is a symbolic link that " + of_somebody(0)));
+}
+
+TEST_F(StateFileAsRoot, WithAFileOfAnotherUserBesideItIsRefused) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  for (auto const *name : {"host.db-wal", "host.db-shm", "host.db-journal"}) {
+    write(folder.file(name), "");
+    give_away(folder.file(name));
+    EXPECT_EQ(refusal_of(file), refused(file, std::string(name) + " beside it " + of_somebody(0)));
+    std::filesystem::remove(folder.file(name));
+  }
+}
+
+TEST_F(StateFileAsRoot, OfRootMayBeLookedAtAndNotChanged) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  std::filesystem::permissions(file.parent_path(), std::filesystem::perms::all);
+  std::filesystem::permissions(file, std::filesystem::perms(0666));
+  EXPECT_TRUE(true_for_somebody([&] {
+    Store store(file, populate_nothing);
+    try {
+      add(store, "b");
+      return false;
+    } catch (SQLite::Exception const &error) {
+      return error.getErrorCode() == SQLITE_READONLY && has(store, "a");
+    }
+  }));
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(file.parent_path()), {}), 1)
+      << "who looks leaves nothing beside it";
+}
+
+TEST_F(StateFileAsRoot, OfRootIsNotLookedAtWhileItIsInUse) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  std::filesystem::permissions(file.parent_path(), std::filesystem::perms::all);
+  std::filesystem::permissions(file, std::filesystem::perms(0666));
+  Store const user(file, populate_nothing);
+  EXPECT_TRUE(true_for_somebody([&] {
+    return refusal_of(file) == refused(file,
+                                       "host.db-wal beside it holds changes, and this program may "
+                                       "only look at the state");
+  }));
+}
+
+TEST_F(StateFileAsRoot, InAFolderThatCannotBeWrittenMayBeLookedAt) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  give_away(file);
+  std::filesystem::permissions(file.parent_path(), std::filesystem::perms(0755));
+  EXPECT_TRUE(true_for_somebody([&] {
+    Store store(file, populate_nothing);
+    return has(store, "a");
+  }));
+}
+
+TEST_F(StateFileAsRoot, ThatIsOnlyLookedAtIsToBeOpenedAgainWhenItChanges) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  give_away(file);
+  std::filesystem::permissions(file.parent_path(), std::filesystem::perms(0755));
+  EXPECT_TRUE(true_for_somebody([&] {
+    Store const store(file, populate_nothing);
+    bool const before = store.is_current();
+    std::filesystem::last_write_time(file, std::filesystem::file_time_type::clock::now());
+    return before && !store.is_current();
+  }));
+}
+
+TEST(StateFile, ThatWasRemovedIsToldOfAndNotMadeAgain) {
+  TemporaryFolder const folder;
+  StateFile const file(folder.file("host.db"));
+  auto const gone =
+      refused(folder.file("host.db"), "it was removed after this program had opened it");
+  {
+    Store store(file, populate_nothing);
+    add(store, "a");
+    std::filesystem::remove(folder.file("host.db"));
+    EXPECT_EQ(refusal_by([&] { has(store, "a"); }), gone);
+    EXPECT_EQ(refusal_by([&] { add(store, "b"); }), gone);
+  }
+  EXPECT_EQ(refusal_of(file), gone) << "after it was closed, as for a fork";
+  EXPECT_FALSE(std::filesystem::exists(folder.file("host.db")));
+}
+
+TEST(StateFile, ThatIsRemovedBeforeACommitIsToldOf) {
+  TemporaryFolder const folder;
+  Store store(folder.file("host.db"), populate_nothing);
+  EXPECT_EQ(refusal_by([&] {
+              Transaction transaction(store, Access::write);
+              std::filesystem::remove(folder.file("host.db"));
+              transaction.commit();
+            }),
+            refused(folder.file("host.db"), "it was removed after this program had opened it"));
+}
+
+TEST(StateFile, ThatWasReplacedIsToldOf) {
+  TemporaryFolder const folder;
+  StateFile const file(made(folder));
+  std::filesystem::copy_file(folder.file("host.db"), folder.file("other.db"));
+  auto const replaced = refused(folder.file("host.db"),
+                                "another file took its place after this program had opened it");
+  {
+    Store store(file, populate_nothing);
+    std::filesystem::rename(folder.file("other.db"), folder.file("host.db"));
+    EXPECT_EQ(refusal_by([&] { has(store, "a"); }), replaced);
+  }
+  EXPECT_EQ(refusal_of(file), replaced);
+}
+
+TEST(StateFile, ThatWasEmptiedIsToldOf) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  Store store(file, populate_nothing);
+  write(file, "");
+  EXPECT_EQ(refusal_by([&] { has(store, "a"); }),
+            refused(file, "it was emptied after this program had opened it"));
+}
+
+struct Strange {
+  char const *sql;
+  char const *why;
+};
+
+Strange const kStrange[] = {
+    {"CREATE TRIGGER t AFTER INSERT ON switch BEGIN UPDATE switch SET version = 2; END",
+     "the trigger 't' in it is none of this host's"},
+    {"CREATE VIEW v AS SELECT * FROM switch", "the view 'v' in it is none of this host's"},
+    {"CREATE TABLE notes (text)", "the table 'notes' in it is none of this host's"},
+    {"CREATE INDEX i ON switch (version)", "the index 'i' in it is none of this host's"},
+    {"ALTER TABLE switch ADD COLUMN colour TEXT",
+     "the table 'switch' in it is not as this host made it"},
+    {"ALTER TABLE clock RENAME COLUMN value TO shown",
+     "the table 'clock' in it is not as this host made it"},
+    {"DROP TRIGGER client_added", "the trigger 'client_added' is missing in it"},
+    {"DROP INDEX port_by_switch", "the index 'port_by_switch' is missing in it"},
+    {"DROP TABLE fault", "the table 'fault' is missing in it"},
+    {"DROP TRIGGER client_added; CREATE TRIGGER client_added AFTER INSERT ON port BEGIN"
+     "  UPDATE switch SET clients = 7; END",
+     "the trigger 'client_added' in it is not as this host made it"},
+};
+
+TEST(StateFile, WithOtherTablesIsRefused) {
+  for (auto const &strange : kStrange) {
+    TemporaryFolder const folder;
+    auto const file = made(folder);
+    execute(file, strange.sql);
+    EXPECT_EQ(refusal_of(file), refused(file, strange.why)) << strange.sql;
+  }
+}
+
+TEST(StateFile, WhoseTablesChangeIsRefusedAndLeftAlone) {
+  for (auto const &strange : kStrange) {
+    TemporaryFolder const folder;
+    auto const file = made(folder);
+    Store store(file, populate_nothing);
+    execute(file, strange.sql);
+    EXPECT_EQ(refusal_by([&] { add(store, "b"); }), refused(file, strange.why)) << strange.sql;
+    SQLite::Database reader(file.string());
+    EXPECT_EQ(reader.execAndGet("SELECT count(*) FROM switch").getInt(), 1) << strange.sql;
+  }
+}
+
+TEST(StateFile, KnowsTablesThatAreOnlyWrittenOtherwise) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  execute(file,
+          "DROP INDEX port_by_switch;"
+          "CREATE INDEX port_by_switch ON port\n  (switch, -- of the host\n number)");
+  EXPECT_EQ(refusal_of(file), "");
+}
+
+TEST(StateFile, OfSchema3IsRead) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.db");
+  execute(file, kSchema3);
+  Store store(file, populate_nothing);
+  EXPECT_TRUE(has(store, "old"));
+  add(store, "new");
+}
+
+TEST(StateFile, OfAVersionThatNothingReadsIsRefused) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  for (auto const version : {2, 70, -1}) {
+    execute(file, "PRAGMA user_version = " + std::to_string(version));
+    EXPECT_THAT(refusal_of(file), HasSubstr("it has schema version " + std::to_string(version) +
+                                            ", this host reads "));
+    EXPECT_THAT(refusal_of(file),
+                testing::EndsWith(std::to_string(simhost::storage::kSchemaVersion)));
+  }
+}
+
+TEST(StateFile, IsBroughtForwardStepByStep) {
+  SQLite::Database database(":memory:", SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
+  database.exec(kSchema3);
+  char const *const steps[] = {"CREATE TABLE more (number)", "INSERT INTO more VALUES (5)"};
+  simhost::storage::bring_forward(database, 3, steps);
+  EXPECT_EQ(database.execAndGet("PRAGMA user_version").getInt(), 5);
+  EXPECT_EQ(database.execAndGet("SELECT number FROM more").getInt(), 5);
+}
+
+std::string refusal_of_query(char const *sql) {
+  TemporaryFolder const folder;
+  Store store(folder.file("host.db"), populate_nothing);
+  return refusal_by([&] {
+    Transaction transaction(store, Access::read);
+    simhost::storage::Query query(transaction, sql);
+    while (query.next()) {
+    }
+  });
+}
+
+TEST(StateFile, KeepsNoStatementBusyForEver) {
+  EXPECT_THAT(refusal_of_query("WITH RECURSIVE n(x) AS (SELECT 1 UNION ALL SELECT x + 1 FROM n)"
+                               " SELECT count(*) FROM n"),
+              HasSubstr("cannot be used: it keeps a statement busy without end"));
+}
+
+TEST(StateFile, YieldsNoRowsForEver) {
+  EXPECT_THAT(refusal_of_query("WITH RECURSIVE n(x) AS (SELECT 1 UNION ALL SELECT x + 1 FROM n)"
+                               " SELECT x FROM n"),
+              HasSubstr("cannot be used: it yields more than it can hold"));
+}
+
+TEST(StateFile, ThatIsDamagedIsNamed) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  auto bytes = content(file);
+  for (std::size_t page = 1; page * 4096 < bytes.size(); ++page) {
+    bytes.replace(page * 4096, 8, 8, '\xFF');
+  }
+  write(file, bytes);
+  EXPECT_EQ(refusal_by([&] {
+              Store store(file, populate_nothing);
+              has(store, "a");
+            }),
+            refused(file, "database disk image is malformed"));
+}
+
+}  // namespace
