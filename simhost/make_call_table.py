@@ -1,59 +1,63 @@
-"""Makes the table of the host's calls: which are modelled, and which answer a fixed status.
+"""Makes the table of the host's calls, and checks that each is exported where it is declared.
 
-usage: make_call_table.py OUTPUT_JSON OUTPUT_MARKDOWN NM FIXED_ANSWERS LIBRARY...
+usage: make_call_table.py --json OUTPUT --markdown OUTPUT --nm PROGRAM --fixed FILE
+                          --library LIBRARY HEADER... [--library ...]
 
-A call is what a library exports. One that only the generated definition answers is a weak symbol:
-it is not modelled, and answers QEX_NOT_IMPLEMENTED or gives up. One that FIXED_ANSWERS, a source
-file, defines answers the status that it refuses with. Every other call is modelled.
+A library is loaded only if it has every call, so the calls that its headers declare and the
+functions that it exports are to be the same. FILE names the calls that model nothing, each with the
+one status that it returns; every other call is modelled.
 """
 
+import argparse
 import json
 import os
 import re
 import subprocess
-import sys
-from typing import Dict, List
+from typing import Dict, List, Set
 
-FIXED = re.compile(r"QEX_ReturnStatus (\w+)\([^{]*\{(.*?)^\}", re.DOTALL | re.MULTILINE)
-STATUS = re.compile(r"simhost::refuse\((QEX_\w+)\);\s*\}\);\s*$")
+from make_call_names import calls_in
 
 # The families in the order in which tables have them.
 FAMILIES = ["VSDVS_", "VSQEX_", "DVS_", "DVSData_", "DVSState_", "DVSQEX_"]
 
-
-def fixed_answers(source: str) -> Dict[str, str]:
-    """The one status of each call that a source file defines."""
-    answers = {}
-    for name, body in FIXED.findall(source):
-        status = STATUS.search(body)
-        if status is None:
-            raise SystemExit(f"{name} does not end by refusing with a status")
-        answers[name] = status.group(1)
-    return answers
+Row = Dict[str, str]
 
 
-def exported(program: str, library: str) -> Dict[str, str]:
-    """The functions that a library exports, each with the letter of its kind."""
+def exported(program: str, library: str) -> Set[str]:
+    """The functions that a library exports."""
     lines = subprocess.run(
         [program, "-D", "--defined-only", library], check=True, stdout=subprocess.PIPE, text=True
     ).stdout
-    return {name: kind for kind, name in re.findall(r" ([TW]) (\w+)$", lines, re.MULTILINE)}
+    return set(re.findall(r" T (\w+)$", lines, re.MULTILINE))
+
+
+def declared(headers: List[str]) -> Set[str]:
+    return {call.name for header in headers for call in calls_in(header)}
+
+
+def require_same(library: str, calls: Set[str], functions: Set[str]) -> None:
+    """Ends the program unless a library exports what its headers declare."""
+    name = os.path.basename(library)
+    if calls - functions:
+        raise SystemExit(f"{name} does not export {', '.join(sorted(calls - functions))}")
+    if functions - calls:
+        raise SystemExit(
+            f"{name} exports {', '.join(sorted(functions - calls))}, which no header declares"
+        )
 
 
 def family(name: str) -> str:
     return next((prefix + "*" for prefix in FAMILIES if name.startswith(prefix)), "names and texts")
 
 
-def row(name: str, kind: str, library: str, fixed: Dict[str, str]) -> Dict[str, str]:
+def row(name: str, library: str, fixed: Dict[str, str]) -> Row:
     entry = {"call": name, "family": family(name), "library": os.path.basename(library)}
-    if kind == "W":
-        return {**entry, "answer": "not modelled"}
     if name in fixed:
         return {**entry, "answer": "fixed", "status": fixed[name]}
     return {**entry, "answer": "modelled"}
 
 
-def markdown(rows: List[Dict[str, str]]) -> str:
+def markdown(rows: List[Row]) -> str:
     lines = ["| Call | Library | Answer |", "|---|---|---|"]
     for entry in rows:
         answer = entry["answer"] + (f": `{entry['status']}`" if "status" in entry else "")
@@ -61,26 +65,36 @@ def markdown(rows: List[Dict[str, str]]) -> str:
     return "\n".join(lines) + "\n"
 
 
+def parsed() -> argparse.Namespace:
+    parser = argparse.ArgumentParser()
+    parser.add_argument("--json", required=True)
+    parser.add_argument("--markdown", required=True)
+    parser.add_argument("--nm", required=True)
+    parser.add_argument("--fixed", required=True)
+    parser.add_argument("--library", required=True, nargs="+", action="append")
+    return parser.parse_args()
+
+
 def main() -> None:
-    """Reads the symbols and writes the table twice."""
-    json_path, markdown_path, program, source_path, *libraries = sys.argv[1:]
-    with open(source_path, encoding="utf-8") as source:
-        fixed = fixed_answers(source.read())
-    rows = [
-        row(name, kind, library, fixed)
-        for library in libraries
-        for name, kind in exported(program, library).items()
-    ]
+    """Checks the libraries and writes the table twice."""
+    given = parsed()
+    with open(given.fixed, encoding="utf-8") as file:
+        fixed: Dict[str, str] = json.load(file)
+    rows: List[Row] = []
+    for library, *headers in given.library:
+        calls = declared(headers)
+        require_same(library, calls, exported(given.nm, library))
+        rows += [row(name, library, fixed) for name in calls]
+    unknown = set(fixed) - {entry["call"] for entry in rows}
+    if unknown:
+        raise SystemExit(f"{given.fixed}: no header declares {', '.join(sorted(unknown))}")
     rows.sort(
         key=lambda entry: (entry["library"] != "libvswitch.so", entry["family"], entry["call"])
     )
-    unknown = set(fixed) - {entry["call"] for entry in rows}
-    if unknown:
-        raise SystemExit(f"no library exports {', '.join(sorted(unknown))}")
-    with open(json_path, "w", encoding="utf-8") as output:
+    with open(given.json, "w", encoding="utf-8") as output:
         json.dump(rows, output, indent=2)
         output.write("\n")
-    with open(markdown_path, "w", encoding="utf-8") as output:
+    with open(given.markdown, "w", encoding="utf-8") as output:
         output.write(markdown(rows))
 
 

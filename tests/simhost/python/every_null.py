@@ -16,7 +16,7 @@ from witness import FOLDER, ID, LAB, PORT
 
 ROOT = Path(__file__).parents[3]
 sys.path.append(str(ROOT / "simhost"))
-declarations = import_module("make_unmodelled_calls").declarations
+declared_calls = import_module("make_call_names").declared_calls
 
 HEADERS = {
     "libvswitch.so": ["vswitch/configuration.h", "vswitch/queries.h", "vswitch/status_text.h"],
@@ -64,8 +64,9 @@ def calls() -> Iterator[Tuple[Any, str, str, List[Tuple[str, str]]]]:
         functions = ctypes.CDLL(str(FOLDER / library))
         for header in headers:
             text = (ROOT / "include" / header).read_text(encoding="utf-8")
-            for result, name, given in declarations(text):
-                yield getattr(functions, name), name, result, parameters(given)
+            for call in declared_calls(text):
+                function = getattr(functions, call.name)
+                yield function, call.name, call.result, parameters(call.parameters)
 
 
 def main() -> None:

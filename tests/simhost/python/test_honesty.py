@@ -72,7 +72,7 @@ def test_a_call_that_stopped_doing_anything_would_be_noticed(table: Table, host:
     assert calls(table, "modelled") - modelled == idle
 
 
-def test_only_one_call_answers_a_fixed_status(table: Table) -> None:
+def test_only_one_call_returns_a_fixed_status(table: Table) -> None:
     rest = [row for row in table if row["answer"] != "modelled"]
     assert rest == [
         {
@@ -85,7 +85,7 @@ def test_only_one_call_answers_a_fixed_status(table: Table) -> None:
     ]
 
 
-def test_a_fixed_answer_is_the_one_in_the_table(table: Table, run: Callable[[str], str]) -> None:
+def test_a_fixed_status_is_the_one_in_the_table(table: Table, run: Callable[[str], str]) -> None:
     status = next(row["status"] for row in table if row["answer"] == "fixed")
     output = run(
         f"""
@@ -106,50 +106,67 @@ def test_simhostctl_shows_the_same_table(table: Table, host: Host) -> None:
     assert [line.split("`")[1] for line in markdown] == [row["call"] for row in table]
 
 
-LIBRARY = """
-int VSDVS_One(void) { return 0; }
-__attribute__((weak)) int VSDVS_Two(void) { return 1; }
-int DVSQEX_Three(void) { return 2; }
+HEADER = """
+#ifndef THREE_H
+int VSDVS_One(void);
+/** Not int DVSQEX_Four(void); */
+typedef int (*Function)(void);
+QEX_ReturnStatus DVSQEX_Two(char const *, int
+                            *);
+#endif
 """
-FIXED = """
-extern "C" QEX_ReturnStatus DVSQEX_Three(char const *) {
-  return answer(__func__, [&](Call &call) {
-    simhost::refuse(QEX_BUSY);
-  });
-}
-"""
+LIBRARY = "int VSDVS_One(void) { return 0; } int DVSQEX_Two(char *a, int *b) { return a && b; }"
+MADE = ["calls.json", "calls.md"]
 
 
-def made(folder: Path, fixed: str) -> "subprocess.CompletedProcess[str]":
-    """The maker of the table, over a library of three functions."""
-    (folder / "fixed.cpp").write_text(fixed, encoding="ascii")
-    (folder / "three.c").write_text(LIBRARY, encoding="ascii")
-    library = folder / "libthree.so"
-    subprocess.run(["cc", "-shared", "-fPIC", "-o", library, folder / "three.c"], check=True)
+def made(
+    folder: Path, library: str = LIBRARY, fixed: str = '{"DVSQEX_Two": "QEX_BUSY"}'
+) -> "subprocess.CompletedProcess[str]":
+    """The maker of the table, over a library of two functions."""
+    (folder / "fixed.json").write_text(fixed, encoding="ascii")
+    (folder / "two.h").write_text(HEADER, encoding="ascii")
+    (folder / "two.c").write_text(library, encoding="ascii")
+    subprocess.run(["cc", "-shared", "-fPIC", "-o", "libtwo.so", "two.c"], cwd=folder, check=True)
     script = ROOT / "simhost" / "make_call_table.py"
-    outputs = [str(folder / "calls.json"), str(folder / "calls.md")]
+    options = ["--json", MADE[0], "--markdown", MADE[1], "--nm", "nm", "--fixed", "fixed.json"]
     return subprocess.run(
-        [sys.executable, str(script), *outputs, "nm", str(folder / "fixed.cpp"), str(library)],
+        [sys.executable, str(script), *options, "--library", "libtwo.so", "two.h"],
+        cwd=folder,
         capture_output=True,
         text=True,
     )
 
 
-def test_the_table_tells_what_a_library_lacks(tmp_path: Path) -> None:
-    assert made(tmp_path, FIXED).returncode == 0
+def test_the_table_tells_what_is_fixed(tmp_path: Path) -> None:
+    assert made(tmp_path).returncode == 0
     rows = json.loads((tmp_path / "calls.json").read_text(encoding="utf-8"))
     assert {row["call"]: (row["answer"], row.get("status")) for row in rows} == {
         "VSDVS_One": ("modelled", None),
-        "VSDVS_Two": ("not modelled", None),
-        "DVSQEX_Three": ("fixed", "QEX_BUSY"),
+        "DVSQEX_Two": ("fixed", "QEX_BUSY"),
     }
 
 
-def test_a_fixed_answer_must_be_one_and_of_a_call(tmp_path: Path) -> None:
-    unknown = made(tmp_path, FIXED.replace("Three", "Four"))
-    assert (unknown.returncode, unknown.stderr) == (1, "no library exports DVSQEX_Four\n")
-    endless = made(tmp_path, FIXED.replace("simhost::refuse(QEX_BUSY);", "work();"))
-    assert (endless.returncode, endless.stderr) == (
-        1,
-        "DVSQEX_Three does not end by refusing with a status\n",
-    )
+@pytest.mark.parametrize(
+    "library, complaint",
+    [
+        (LIBRARY.replace("VSDVS_One", "VSDVS_Won"), "libtwo.so does not export VSDVS_One"),
+        (LIBRARY.replace("int VSDVS", "static int VSDVS"), "libtwo.so does not export VSDVS_One"),
+        ("__attribute__((weak)) " + LIBRARY, "libtwo.so does not export VSDVS_One"),
+        (
+            LIBRARY + "int VSDVS_Three(void) { return 0; }",
+            "libtwo.so exports VSDVS_Three, which no header declares",
+        ),
+    ],
+    ids=["misspelt", "hidden", "weak", "undeclared"],
+)
+def test_a_library_exports_what_its_headers_declare(
+    tmp_path: Path, library: str, complaint: str
+) -> None:
+    done = made(tmp_path, library)
+    assert (done.returncode, done.stderr) == (1, complaint + "\n")
+    assert not any((tmp_path / name).exists() for name in MADE)
+
+
+def test_a_fixed_call_must_be_a_call(tmp_path: Path) -> None:
+    done = made(tmp_path, fixed='{"DVSQEX_Four": "QEX_BUSY"}')
+    assert (done.returncode, done.stderr) == (1, "fixed.json: no header declares DVSQEX_Four\n")

@@ -1,6 +1,5 @@
-// The calls that model nothing: with sound arguments each answers one status, whatever the state.
-// The table of calls is made from this file and from the symbols of the libraries, so a call that
-// stands here stands there as fixed, with the status that it answers.
+// The calls that model nothing: with sound arguments each returns the one status that
+// simhost/fixed_calls.json names, whatever the state.
 #include "abi/boundary.h"
 #include "abi/targets.h"
 #include "nebpublic/kernel_state.h"
