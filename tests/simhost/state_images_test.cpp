@@ -70,6 +70,16 @@ TEST_F(StateImages, TheWholeStateComesBackFromItsImage) {
   EXPECT_EQ(image(DVSQEX_StateGet), whole);
 }
 
+// Only null is no image: one of no bytes is cut short.
+TEST_F(StateImages, AnImageOfNoBytesIsRefused) {
+  auto const whole = image(DVSQEX_StateGet);
+  std::byte nothing{};
+  EXPECT_EQ(DVSQEX_StateInit(&nothing, 0), QEX_INVALID_METADATA);
+  EXPECT_EQ(DVSState_ConfigDeserialize(&nothing, 0), QEX_INVALID_METADATA);
+  EXPECT_EQ(DVSQEX_PortAdd("s-id", "q", &nothing, 0), QEX_INVALID_METADATA);
+  EXPECT_EQ(image(DVSQEX_StateGet), whole);
+}
+
 TEST_F(StateImages, DamagedImagesAreRefusedAndChangeNothing) {
   ASSERT_EQ(set_port(VSPROP_PORT_TX_UPLINK, {1}), QEX_OK);
   auto const good = image(DVSQEX_PersistentStateGet);

@@ -45,7 +45,7 @@ QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *st
     auto &transaction = call.transaction();
     auto const added = simhost::add_client_port(
         transaction, simhost::get_target(transaction, target.owner), target.identifier);
-    if (!image.empty()) {
+    if (state != nullptr) {
       simhost::load_port(transaction, added, image);
     }
   });

@@ -29,7 +29,7 @@ extern "C" {
 QEX_ReturnStatus DVSQEX_StateInit(void *state, int length) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const image = simhost::argument_bytes(state, length);
-    if (image.empty()) {
+    if (state == nullptr) {
       simhost::clear_state(call.transaction());
     } else {
       simhost::load_state(call.transaction(), image, Extent::whole);
