@@ -11,6 +11,7 @@ void end_call(Ending &ending, char const *call) noexcept {
   ending.traps = outcome.traps;
   describe(ending.report, outcome.kind, outcome.text == TrapText::verbatim ? "" : call,
            outcome.reason);
+  ending.report.type = outcome.type;
 }
 
 }  // namespace simhost

@@ -1,10 +1,14 @@
 // A call's hold on the host.
 #include "abi/call.h"
 
+#include <SQLiteCpp/Exception.h>
+#include <sqlite3.h>
+
 #include <cstdio>
 #include <cstdlib>
 
 #include "abi/host.h"
+#include "abi/pause.h"
 #include "faults/faults.h"
 #include "model/plane.h"
 
@@ -30,13 +34,23 @@ std::vector<Fault> hits_on(std::string_view function) {
   return hits;
 }
 
-void inject_faults(std::string_view function) {
-  std::vector<Fault> hits;
+// Likewise; a state that cannot be read has no faults, and a call that needs it will say so itself.
+// But one that is only busy may have some.
+std::vector<Fault> readable_hits_on(std::string_view function) {
   try {
-    hits = hits_on(function);
+    return hits_on(function);
+  } catch (SQLite::Exception const &error) {
+    if (error.getErrorCode() == SQLITE_BUSY) {
+      throw;
+    }
   } catch (std::exception const &) {
-    return;  // a state that cannot be read has no faults; a call that needs it will say so itself
   }
+  return {};
+}
+
+void inject_faults(std::string_view function) {
+  auto const hits = readable_hits_on(function);
+  pause(delay_of(hits));
   inject(hits);
 }
 

@@ -6,6 +6,7 @@
 
 #include <new>
 
+#include "abi/pause.h"
 #include "scenario/document.h"
 #include "scenario/texts.h"
 #include "storage/store.h"
@@ -50,6 +51,11 @@ Outcome table() {
     throw;
   } catch (Refused const &refused) {
     return returns(refused.status(), scenario::refusal_text(refused));
+  } catch (Interrupted const &interrupted) {
+    auto outcome =
+        traps(TrapKind::runtime_error, QEX_FAILURE, interrupted.what(), TrapText::verbatim);
+    outcome.type = interrupted.type();
+    return outcome;
   } catch (Trapped const &trapped) {
     return traps(trapped.kind(), QEX_FAILURE, trapped.what(), trapped.text());
   } catch (scenario::DocumentError const &error) {

@@ -6,6 +6,9 @@
 #include "base/outcomes.h"
 #include "qexapi/status.h"
 
+/// An object of the interpreter's; only its address goes anywhere.
+struct _object;
+
 namespace simhost {
 
 /// What ended a call early, for callers of every kind.
@@ -14,7 +17,8 @@ struct Outcome {
   bool traps;               ///< whether a call of the host traps although it could return a status
   TrapKind kind;            ///< with which a call traps
   TrapText text;
-  std::string reason;  ///< in words
+  std::string reason;       ///< in words
+  _object *type = nullptr;  ///< of the interpreter's own, instead of that of the kind
 };
 
 /// The outcome of the exception that is being handled.

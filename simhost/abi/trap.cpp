@@ -29,7 +29,7 @@ namespace {
 // The caller reads the message after the jump, and may keep the pointer until the next one.
 constinit TrapReport last_report{};
 
-struct _object **exception_variable(TrapKind kind) {
+_object **exception_variable(TrapKind kind) {
   switch (kind) {
 #define SIMHOST_KIND(kind, type) \
   case TrapKind::kind:           \
@@ -40,8 +40,8 @@ struct _object **exception_variable(TrapKind kind) {
   __builtin_unreachable();
 }
 
-struct _object *exception_type(TrapKind kind) {
-  struct _object **const type = exception_variable(kind);
+_object *exception_type(TrapKind kind) {
+  _object **const type = exception_variable(kind);
   return type == nullptr ? nullptr : *type;
 }
 
@@ -102,6 +102,7 @@ std::size_t append(std::span<char> target, std::size_t used, std::string_view te
 void describe(TrapReport &report, TrapKind kind, std::string_view call,
               std::string_view message) noexcept {
   report.kind = kind;
+  report.type = nullptr;
   std::size_t used = 0;
   if (!call.empty()) {
     used = append(report.text, used, call);
@@ -112,7 +113,7 @@ void describe(TrapReport &report, TrapKind kind, std::string_view call,
 }
 
 void spring_trap(TrapReport const &report) noexcept {
-  auto *const type = exception_type(report.kind);
+  auto *const type = report.type == nullptr ? exception_type(report.kind) : report.type;
   if (!trap_is_there() || type == nullptr) {
     std::fprintf(stderr, "simulated host: %s\n", report.text.data());
     std::abort();

@@ -9,11 +9,15 @@
 #include "base/api.h"
 #include "base/outcomes.h"
 
+/// An object of the interpreter's; only its address goes anywhere.
+struct _object;
+
 namespace simhost {
 
 /// Why a call traps. Plain memory: a jump may leave it behind.
 struct TrapReport {
   TrapKind kind;
+  _object *type;                ///< of the interpreter's own; null for that of the kind
   std::array<char, 1024> text;  ///< UTF-8 with its NUL
 };
 

@@ -5,7 +5,6 @@
 
 #include <algorithm>
 #include <array>
-#include <thread>
 
 #include "base/outcomes.h"
 
@@ -47,6 +46,9 @@ void check_effect(Fault const &fault) {
   }
   if (fault.delay.count() < 0) {
     throw Refused(QEX_BAD_PARAM, "a delay is not negative");
+  }
+  if (fault.delay > kLongestDelay) {
+    throw Refused(QEX_BAD_PARAM, "a delay is an hour at most");
   }
   if (!status && !exception && fault.delay.count() == 0) {
     throw Refused(QEX_BAD_PARAM, "a fault needs a status, an exception or a delay");
@@ -102,14 +104,15 @@ void clear_faults(storage::Transaction &transaction, std::string_view function) 
   }
 }
 
-void inject(std::vector<Fault> const &hits) {
+std::chrono::milliseconds delay_of(std::vector<Fault> const &hits) {
   std::chrono::milliseconds delay{0};
   for (auto const &fault : hits) {
-    delay += fault.delay;
+    delay = std::min(delay + std::min(fault.delay, kLongestDelay), kLongestDelay);
   }
-  if (delay.count() > 0) {
-    std::this_thread::sleep_for(delay);
-  }
+  return delay;
+}
+
+void inject(std::vector<Fault> const &hits) {
   for (auto const &fault : hits) {
     apply(fault);
   }

@@ -2,6 +2,7 @@
 // wait in the state, so that processes that share it share them and their counts.
 #pragma once
 
+#include <chrono>
 #include <string_view>
 #include <vector>
 
@@ -13,9 +14,13 @@ namespace simhost {
 using storage::Fault;
 using storage::WaitingFault;
 
+/// The most that a fault, or all that hit one call, may delay it.
+inline constexpr std::chrono::milliseconds kLongestDelay = std::chrono::hours(1);
+
 /// Refuses a function that the host does not have (QEX_NOT_FOUND); Panic, and a status for a call
 /// that answers none (QEX_NOT_SUPPORTED); an unknown exception, both a status and an exception, no
-/// effect at all, calls that are none, and a negative delay (QEX_BAD_PARAM).
+/// effect at all, calls that are none, and a delay that is negative or longer
+/// than kLongestDelay (QEX_BAD_PARAM).
 void add_fault(storage::Transaction &transaction, Fault const &fault);
 std::vector<WaitingFault> waiting_faults(storage::Transaction &transaction);
 /// Removes the faults of a function, or all if it is empty. Refuses a function that no fault can
@@ -26,8 +31,9 @@ void clear_faults(storage::Transaction &transaction, std::string_view function);
 bool any_fault_waits(storage::Transaction &transaction, std::string_view function);
 /// Counts a call of a function that is being made. Returns the faults that hit it.
 std::vector<Fault> count_call(storage::Transaction &transaction, std::string_view function);
-/// Does to a call what the faults that hit it say: sleeps, throws Refused or Trapped. The host's
-/// lock must not be held.
+/// How long a call waits that they hit: for all of them, but kLongestDelay at most.
+std::chrono::milliseconds delay_of(std::vector<Fault> const &hits);
+/// Does to a call what the faults that hit it say: throws Refused or Trapped.
 void inject(std::vector<Fault> const &hits);
 
 }  // namespace simhost

@@ -71,6 +71,8 @@ TEST_F(Faults, AreChecked) {
   EXPECT_STREQ(simhost_error(), "the first call that is hit is 1 or later (QEX_BAD_PARAM)");
   EXPECT_EQ(simhost_fail_call("VSDVS_SetMTU", 1, 1, QEX_OK), QEX_BAD_PARAM);
   EXPECT_STREQ(simhost_error(), "a fault needs a status, an exception or a delay (QEX_BAD_PARAM)");
+  EXPECT_EQ(simhost_delay_call("VSDVS_SetMTU", 1, 1, 3600001), QEX_BAD_PARAM);
+  EXPECT_STREQ(simhost_error(), "a delay is an hour at most (QEX_BAD_PARAM)");
   EXPECT_EQ(simhost_panic_call("VSDVS_SetMTU", 1, 1, "NoError", ""), QEX_BAD_PARAM);
   EXPECT_STREQ(simhost_error(),
                "'NoError' is none of the exception types RuntimeError, OSError, ConnectionError, "

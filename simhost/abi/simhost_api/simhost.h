@@ -92,7 +92,12 @@ int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int st
 int simhost_panic_call(char const *function, uint32_t nth, uint32_t times, char const *exception,
                        char const *message);
 
-/** The calls wait so many milliseconds of real time, then do what they do. */
+/**
+ * The calls wait so many milliseconds of real time, then do what they do; QEX_BAD_PARAM for more
+ * than an hour. A thread that holds the interpreter's lock gives it up while it waits, so that other
+ * threads run. A signal handler of the interpreter's runs during the wait, if it is the main thread
+ * that waits; what it raises is raised by the call, which then does nothing.
+ */
 int simhost_delay_call(char const *function, uint32_t nth, uint32_t times, uint32_t milliseconds);
 
 /** Removes the faults of a function, or all for null; QEX_NOT_FOUND for no function of the host. */
