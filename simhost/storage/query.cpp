@@ -39,6 +39,12 @@ bool Query::next() {
   return found;
 }
 
+void Query::require_row() {
+  if (!next()) {
+    connection_.refuse("a row is missing in it that every state has");
+  }
+}
+
 int Query::run() {
   int const changed = connection_.guarded([&] { return statement_.exec(); });
   connection_.require_schema_of_now();

@@ -43,6 +43,8 @@ class Query {
 
   /// Steps to the next row; false when there is none.
   bool next();
+  /// Steps to the row that every state has; throws UnusableState without one.
+  void require_row();
   /// Runs a statement that yields no rows; returns how many rows it changed.
   int run();
 

@@ -9,7 +9,7 @@ namespace simhost::storage {
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables, by a step of state_format.cpp that brings a file of the
 /// version before forward.
-inline constexpr std::int64_t kSchemaVersion = 3;
+inline constexpr std::int64_t kSchemaVersion = 4;
 /// The version that the first of those steps begins with; what is older is refused.
 inline constexpr std::int64_t kOldestSchema = 3;
 
@@ -17,5 +17,7 @@ inline constexpr std::int64_t kOldestSchema = 3;
 extern char const *const kSchema;
 /// Likewise those of what runs on the configuration that the tables of kSchema hold.
 extern char const *const kRunningSchema;
+/// Likewise the generations of the switches that are there.
+extern char const *const kGenerationSchema;
 
 }  // namespace simhost::storage

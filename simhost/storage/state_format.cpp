@@ -16,7 +16,7 @@ namespace simhost::storage {
 namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
-constexpr std::array<char const *, kSchemaVersion - kOldestSchema> kSteps{};
+std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{kGenerationSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -108,6 +108,7 @@ void create_state(SQLite::Database &database) {
   set_version(database, kSchemaVersion);
   database.exec(kSchema);
   database.exec(kRunningSchema);
+  database.exec(kGenerationSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

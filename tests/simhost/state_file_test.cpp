@@ -16,6 +16,8 @@
 
 #include "schema_3.h"
 #include "storage/query.h"
+#include "storage/running/clock.h"
+#include "storage/running/generations.h"
 #include "storage/schema.h"
 #include "storage/state_format.h"
 #include "storage/store.h"
@@ -385,6 +387,27 @@ TEST(StateFile, OfSchema3IsRead) {
   Store store(file, populate_nothing);
   EXPECT_TRUE(has(store, "old"));
   add(store, "new");
+  Transaction transaction(store, Access::read);
+  for (auto const &known : simhost::storage::all_switches(transaction)) {
+    EXPECT_NO_THROW(simhost::storage::get_generations(transaction, known.key)) << known.row.alias;
+  }
+}
+
+TEST(StateFile, WithoutARowThatEachHasIsRefused) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  {
+    Store store(file, populate_nothing);
+    add(store, "a");
+  }
+  execute(file, "DELETE FROM clock; DELETE FROM generation");
+  Store store(file, populate_nothing);
+  Transaction transaction(store, Access::read);
+  auto const key = simhost::storage::all_switches(transaction).at(0).key;
+  EXPECT_THAT(refusal_by([&] { simhost::storage::get_clock(transaction); }),
+              HasSubstr("a row is missing in it"));
+  EXPECT_THAT(refusal_by([&] { simhost::storage::get_generations(transaction, key); }),
+              HasSubstr("a row is missing in it"));
 }
 
 TEST(StateFile, OfAVersionThatNothingReadsIsRefused) {

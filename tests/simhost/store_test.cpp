@@ -319,6 +319,7 @@ TEST(UnusableStateFile, ThatHasAnotherSchema) {
   SQLite::Database(file.string(), SQLite::OPEN_READWRITE).exec("PRAGMA user_version = 70");
   EXPECT_EQ(refusal_of(file), "the state file " + file.string() +
                                   " cannot be used: it has schema version 70, this host reads " +
+                                  std::to_string(simhost::storage::kOldestSchema) + " to " +
                                   std::to_string(simhost::storage::kSchemaVersion));
 }
 

@@ -13,12 +13,14 @@ namespace {
 
 class StoredWires : public Wires {
  public:
+  explicit StoredWires(Teaming &teaming) : teaming_(teaming) {}
+
   Link link_of(storage::Transaction &transaction, std::string_view uplink) override {
     return stored::link_of(transaction, uplink);
   }
   void change_link(storage::Transaction &transaction, std::string_view uplink,
                    Link const &link) override {
-    stored::change_link(transaction, uplink, link);
+    teaming_.change_link(transaction, uplink, link);
   }
   Sighting learn(storage::Transaction &transaction, Place const &place,
                  VSMACEntry const &source) override {
@@ -40,6 +42,9 @@ class StoredWires : public Wires {
                    Counter const &counter, std::uint64_t value) override {
     stored::set_counter(transaction, owner, counter, value);
   }
+
+ private:
+  Teaming &teaming_;
 };
 
 class StoredPlane : public Plane {
@@ -51,7 +56,7 @@ class StoredPlane : public Plane {
     return stored::lacp_is_up(transaction, uplink);
   }
   std::string team_uplink(storage::Transaction &transaction, storage::Port const &port) override {
-    return stored::team_uplink(transaction, port);
+    return teaming_.uplink_of(transaction, port);
   }
   std::vector<VSMACEntry> addresses(storage::Transaction &transaction, Place const &place,
                                     VSMACAddrType type) override {
@@ -81,7 +86,7 @@ class StoredPlane : public Plane {
                        bool up) override {
     auto link = link_of(transaction, uplink);
     link.admin = up;
-    change_link(transaction, uplink, link);
+    teaming_.change_link(transaction, uplink, link);
   }
   void put_address(storage::Transaction &transaction, Place const &place,
                    VSMACEntry const &entry) override {
@@ -104,7 +109,8 @@ class StoredPlane : public Plane {
   Wires *find_wires() override { return &wires_; }
 
  private:
-  StoredWires wires_;
+  Teaming teaming_;
+  StoredWires wires_{teaming_};
 };
 
 }  // namespace

@@ -152,11 +152,14 @@ std::optional<std::size_t> uplink_for(std::vector<Slot> const &slots, VSTeamPoli
     return std::nullopt;
   }
   auto const spread = static_cast<std::uint32_t>(number);
+  auto const share = [spread](std::size_t of) {
+    return of == 1 ? 0 : spread % static_cast<std::uint32_t>(of);
+  };
   bool const first =
       policy.loadBalance == TEAM_FRP_TYPE_NONE || policy.loadBalance == TEAM_FRP_TYPE_FO_EXPLICIT;
-  auto const &slot = slots[first ? 0 : spread % slots.size()];
+  auto const &slot = slots[first ? 0 : share(slots.size())];
   // A group spreads the ports over its uplinks, whatever the policy does with the slots.
-  return slot.uplinks[spread % slot.uplinks.size()];
+  return slot.uplinks[share(slot.uplinks.size())];
 }
 
 std::optional<std::size_t> bound_uplink(Team const &team, std::string_view name) {

@@ -37,6 +37,8 @@ Team team_of(storage::Transaction &transaction, storage::SwitchKey key);
 struct Slot {
   std::vector<std::size_t> uplinks;  ///< where they are in Team::uplinks; not empty
   ClockTime since;                   ///< when the first of them became usable
+
+  bool operator==(Slot const &) const = default;
 };
 
 /// The slots that a policy has in use, in its order. The same for all ports, so that a team is

@@ -1,8 +1,8 @@
-// A team is looked at once for all ports that ask.
+// A team is worked out once for all ports and questions, until its generation is another one.
 #include "planes/stored/teaming.h"
 
 #include <algorithm>
-#include <optional>
+#include <cstddef>
 #include <utility>
 
 #include "base/bytes.h"
@@ -10,17 +10,49 @@
 #include "model/lookup.h"
 #include "model/options/runtime_options.h"
 #include "planes/stored/counters.h"
+#include "planes/stored/links.h"
 #include "planes/stored/policies.h"
 #include "vswitch/properties.h"
 
 namespace simhost::stored {
 namespace {
 
+// Switches that come and go must not pile up; no host has so many at a time.
+constexpr std::size_t kMostKept = 1024;
+
+template <typename Kept>
+Kept &keep(std::map<storage::SwitchKey, Kept> &all, storage::SwitchKey key, Kept kept) {
+  if (all.size() >= kMostKept) {
+    all.clear();
+  }
+  return all.insert_or_assign(key, std::move(kept)).first->second;
+}
+
 OwnTeaming own_teaming(storage::Transaction &transaction, storage::Port const &port) {
   auto const owner = owner_of(port);
   auto const bound = storage::find_property(transaction, owner, VSPROP_PORT_TEAMING_OVERRIDE);
   return {.policy = policy<VSTeamPolicy>(transaction, owner, VSPROP_PORT_TEAMING_POLICY),
           .uplink = bound ? std::optional(text_of(bound->value)) : std::nullopt};
+}
+
+// Where in Team::uplinks the uplink is that a port uses, in whatever it has of its own.
+std::optional<std::size_t> place_by(Team const &team, OwnTeaming const &own,
+                                    std::vector<Slot> const &shared, storage::PortNumber number) {
+  if (own.uplink) {
+    return bound_uplink(team, *own.uplink);
+  }
+  if (own.policy) {
+    return uplink_for(slots_in_use(team, *own.policy), *own.policy, number);
+  }
+  return uplink_for(shared, team.policy, number);
+}
+
+bool announces(VSTeamPolicy const &policy) {
+  return (policy.flags & TEAM_FRP_FLAG_NOTIFY_SWITCH) != 0;
+}
+
+bool has_moved(std::optional<std::size_t> before, std::optional<std::size_t> after) {
+  return after && after != before;
 }
 
 // The switch whose ports a change of an uplink's link may move, if it is at one and that one runs.
@@ -34,10 +66,8 @@ std::optional<storage::SwitchKey> switch_running_over(storage::Transaction &tran
   return storage::find_switch(transaction, key)->row.associated ? std::optional(key) : std::nullopt;
 }
 
-void announce(storage::Transaction &transaction, storage::SwitchKey key, std::uint64_t moves) {
-  auto const most =
-      static_cast<std::uint64_t>(runtime_number(transaction, VS_RT_OPT_MAX_RARPS_PER_INTERVAL));
-  if (auto const sent = std::min(moves, most); sent > 0) {
+void announce(storage::Transaction &transaction, storage::SwitchKey key, std::uint64_t sent) {
+  if (sent > 0) {
     CounterOwner const owner{.switch_key = key};
     add_to_counter(transaction, owner, counter_in(&VSRARPStats::rarpPktsSent), sent);
     set_counter(transaction, owner, counter_in(&VSRARPStats::rarpTime),
@@ -47,82 +77,129 @@ void announce(storage::Transaction &transaction, storage::SwitchKey key, std::ui
 
 }  // namespace
 
-OwnTeamings own_teamings(storage::Transaction &transaction, storage::SwitchKey key) {
-  OwnTeamings all;
-  for (auto const &[port, value] :
-       storage::port_properties(transaction, key, VSPROP_PORT_TEAMING_POLICY)) {
-    all[static_cast<std::uint32_t>(port)].policy = record_in<VSTeamPolicy>(value);
+Teaming::KeptTeam const &Teaming::team_of_switch(storage::Transaction &transaction,
+                                                 storage::SwitchKey key,
+                                                 storage::Generations const &generations) {
+  auto const found = teams_.find(key);
+  if (found == teams_.end() || found->second.generation != generations.team) {
+    auto team = team_of(transaction, key);
+    auto slots = slots_in_use(team, team.policy);
+    return keep(
+        teams_, key,
+        KeptTeam{
+            .generation = generations.team, .team = std::move(team), .slots = std::move(slots)});
   }
-  for (auto const &[port, value] :
-       storage::port_properties(transaction, key, VSPROP_PORT_TEAMING_OVERRIDE)) {
-    all[static_cast<std::uint32_t>(port)].uplink = text_of(value);
+  auto &kept = found->second;
+  if (kept.team.up_delay != ClockTime::zero()) {
+    kept.team.now = clock_now(transaction);
+    kept.slots = slots_in_use(kept.team, kept.team.policy);
   }
-  return all;
+  return kept;
 }
 
-Carriers::Carriers(Team team, OwnTeamings const &own)
-    : team_(std::move(team)), shared_(slots_in_use(team_, team_.policy)), own_(own) {}
-
-OwnTeaming const *Carriers::own_of(storage::PortNumber number) const {
-  auto const found = own_.find(static_cast<std::uint32_t>(number));
-  return found == own_.end() ? nullptr : &found->second;
-}
-
-std::string_view Carriers::of(storage::PortNumber number) const {
-  auto const *const own = own_of(number);
-  std::optional<std::size_t> place;
-  if (own != nullptr && own->uplink) {
-    place = bound_uplink(team_, *own->uplink);
-  } else if (own != nullptr && own->policy) {
-    place = uplink_for(slots_in_use(team_, *own->policy), *own->policy, number);
-  } else {
-    place = uplink_for(shared_, team_.policy, number);
+Teaming::KeptPorts &Teaming::ports_of_switch(storage::SwitchKey key,
+                                             storage::Generations const &generations) {
+  auto const found = ports_.find(key);
+  if (found == ports_.end() || found->second.generation != generations.ports) {
+    return keep(ports_, key,
+                KeptPorts{.generation = generations.ports, .own = {}, .plain = std::nullopt});
   }
-  return place ? std::string_view(team_.uplinks[*place].name) : std::string_view();
+  return found->second;
 }
 
-std::string Carriers::required_of(storage::Port const &port) const {
+OwnTeaming const &Teaming::own_of(storage::Transaction &transaction, storage::Port const &port,
+                                  KeptPorts &ports) {
+  auto const found = ports.own.find(port.number);
+  if (found != ports.own.end()) {
+    return found->second;
+  }
+  if (ports.plain) {
+    static OwnTeaming const nothing;
+    return nothing;
+  }
+  return ports.own.emplace(port.number, own_teaming(transaction, port)).first->second;
+}
+
+Teaming::KeptPorts const &Teaming::all_ports(storage::Transaction &transaction,
+                                             storage::SwitchKey key,
+                                             storage::Generations const &generations) {
+  auto &ports = ports_of_switch(key, generations);
+  if (!ports.plain) {
+    ports.own.clear();
+    for (auto const &[port, value] :
+         storage::port_properties(transaction, key, VSPROP_PORT_TEAMING_POLICY)) {
+      ports.own[port].policy = record_in<VSTeamPolicy>(value);
+    }
+    for (auto const &[port, value] :
+         storage::port_properties(transaction, key, VSPROP_PORT_TEAMING_OVERRIDE)) {
+      ports.own[port].uplink = text_of(value);
+    }
+    // What is too short for a policy is none.
+    std::erase_if(ports.own, [](auto const &own) { return own.second.is_nothing(); });
+    auto numbers = storage::client_numbers(transaction, key);
+    std::erase_if(numbers, [&](auto number) { return ports.own.contains(number); });
+    ports.plain = std::move(numbers);
+  }
+  return ports;
+}
+
+std::string Teaming::uplink_of(storage::Transaction &transaction, storage::Port const &port) {
   if (port.kind == storage::PortKind::uplink) {
     throw Refused(QEX_NOT_SUPPORTED);
   }
-  if (team_.uplinks.empty()) {
+  auto const generations = storage::get_generations(transaction, port.switch_key);
+  auto const &kept = team_of_switch(transaction, port.switch_key, generations);
+  if (kept.team.uplinks.empty()) {
     throw Refused(QEX_ENETUNREACH);
   }
-  auto const uplink = of(port.number);
-  if (uplink.empty()) {
+  auto const &own = own_of(transaction, port, ports_of_switch(port.switch_key, generations));
+  auto const place = place_by(kept.team, own, kept.slots, port.number);
+  if (!place) {
     throw Refused(QEX_ENETDOWN);
   }
-  return std::string(uplink);
+  return kept.team.uplinks[*place].name;
 }
 
-bool Carriers::announces(storage::PortNumber number) const {
-  auto const *const own = own_of(number);
-  auto const &policy = own != nullptr && own->policy ? *own->policy : team_.policy;
-  return (policy.flags & TEAM_FRP_FLAG_NOTIFY_SWITCH) != 0;
+// Counts no further than there may be announced: most ports of a large switch need no look.
+std::uint64_t Teaming::count_announced(KeptTeam const &before, KeptTeam const &after,
+                                       KeptPorts const &ports, std::uint64_t most) {
+  std::uint64_t count = 0;
+  auto const &shared = after.team.policy;
+  if (announces(shared) && before.slots != after.slots) {
+    for (auto at = ports.plain->begin(); at != ports.plain->end() && count < most; ++at) {
+      count +=
+          has_moved(uplink_for(before.slots, shared, *at), uplink_for(after.slots, shared, *at))
+              ? 1
+              : 0;
+    }
+  }
+  for (auto at = ports.own.begin(); at != ports.own.end() && count < most; ++at) {
+    auto const &[number, own] = *at;
+    bool const counts = announces(own.policy.value_or(shared)) &&
+                        has_moved(place_by(before.team, own, before.slots, number),
+                                  place_by(after.team, own, after.slots, number));
+    count += counts ? 1 : 0;
+  }
+  return count;
 }
 
-std::string team_uplink(storage::Transaction &transaction, storage::Port const &port) {
-  OwnTeamings const own{{static_cast<std::uint32_t>(port.number), own_teaming(transaction, port)}};
-  return Carriers(team_of(transaction, port.switch_key), own).required_of(port);
-}
-
-void change_link(storage::Transaction &transaction, std::string_view uplink, Link const &link) {
+void Teaming::change_link(storage::Transaction &transaction, std::string_view uplink,
+                          Link const &link) {
   auto const running = switch_running_over(transaction, uplink);
   if (!running) {
     set_link(transaction, uplink, link);
     return;
   }
   auto const key = *running;
-  auto const own = own_teamings(transaction, key);
-  Carriers const before(team_of(transaction, key), own);
+  auto const generations = storage::get_generations(transaction, key);
+  auto const before = team_of_switch(transaction, key, generations);
   set_link(transaction, uplink, link);
-  Carriers const after(team_of(transaction, key), own);
-  auto const numbers = storage::client_numbers(transaction, key);
-  auto const moved = std::count_if(numbers.begin(), numbers.end(), [&](storage::PortNumber number) {
-    auto const carrier = after.of(number);
-    return !carrier.empty() && after.announces(number) && carrier != before.of(number);
-  });
-  announce(transaction, key, static_cast<std::uint64_t>(moved));
+  auto const &after = team_of_switch(transaction, key, storage::get_generations(transaction, key));
+
+  auto const most =
+      static_cast<std::uint64_t>(runtime_number(transaction, VS_RT_OPT_MAX_RARPS_PER_INTERVAL));
+  auto const &ports = all_ports(transaction, key, generations);
+  announce(transaction, key, count_announced(before, after, ports, most));
 }
 
 }  // namespace simhost::stored

@@ -11,6 +11,7 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -18,8 +19,8 @@
 #include <vector>
 
 #include "model/plane.h"
-#include "planes/stored/links.h"
 #include "planes/stored/team.h"
+#include "storage/running/generations.h"
 
 namespace simhost::stored {
 
@@ -27,38 +28,48 @@ namespace simhost::stored {
 struct OwnTeaming {
   std::optional<VSTeamPolicy> policy;
   std::optional<std::string> uplink;  ///< the one that it is bound to
+
+  [[nodiscard]] bool is_nothing() const { return !policy && !uplink; }
 };
 
-/// The ports of a switch that have something of their own; most have nothing.
-using OwnTeamings = std::unordered_map<std::uint32_t, OwnTeaming>;
-OwnTeamings own_teamings(storage::Transaction &transaction, storage::SwitchKey key);
-
-/// Which uplinks carry what the ports of one switch send, for many ports at one moment.
-class Carriers {
+/// The teams of a host. What was worked out of the state is kept until something changes there on
+/// which it depends, in this process or in another one.
+class Teaming {
  public:
-  Carriers(Team team, OwnTeamings const &own);
-
-  /// The uplink of a port; empty if none of its team is in use.
-  [[nodiscard]] std::string_view of(storage::PortNumber number) const;
   /// See Plane::team_uplink.
-  [[nodiscard]] std::string required_of(storage::Port const &port) const;
-  /// Whether the port's policy wants its moves to be announced.
-  [[nodiscard]] bool announces(storage::PortNumber number) const;
+  std::string uplink_of(storage::Transaction &transaction, storage::Port const &port);
+
+  /// Changes a link and lets the teams of its switch follow: every port that moves to another
+  /// uplink is announced with a reverse-ARP packet if its policy says TEAM_FRP_FLAG_NOTIFY_SWITCH,
+  /// at most MaxRARPsPerInterval of them.
+  void change_link(storage::Transaction &transaction, std::string_view uplink, Link const &link);
 
  private:
-  [[nodiscard]] OwnTeaming const *own_of(storage::PortNumber number) const;
+  struct KeptTeam {
+    std::int64_t generation;
+    Team team;
+    std::vector<Slot> slots;  ///< that the team's policy has in use
+  };
+  struct KeptPorts {
+    std::int64_t generation;
+    /// Of the ports that were asked for; once `plain` is there, of all that have something.
+    std::unordered_map<storage::PortNumber, OwnTeaming> own;
+    /// All ports for clients that have nothing of their own.
+    std::optional<std::vector<storage::PortNumber>> plain;
+  };
 
-  Team team_;
-  std::vector<Slot> shared_;  // what the switch's policy has in use
-  OwnTeamings const &own_;
+  KeptTeam const &team_of_switch(storage::Transaction &transaction, storage::SwitchKey key,
+                                 storage::Generations const &generations);
+  KeptPorts &ports_of_switch(storage::SwitchKey key, storage::Generations const &generations);
+  OwnTeaming const &own_of(storage::Transaction &transaction, storage::Port const &port,
+                           KeptPorts &ports);
+  KeptPorts const &all_ports(storage::Transaction &transaction, storage::SwitchKey key,
+                             storage::Generations const &generations);
+  static std::uint64_t count_announced(KeptTeam const &before, KeptTeam const &after,
+                                       KeptPorts const &ports, std::uint64_t most);
+
+  std::map<storage::SwitchKey, KeptTeam> teams_;
+  std::map<storage::SwitchKey, KeptPorts> ports_;
 };
-
-/// See Plane::team_uplink.
-std::string team_uplink(storage::Transaction &transaction, storage::Port const &port);
-
-/// Changes a link and lets the teams of its switch follow: every port that moves to another uplink
-/// is announced with a reverse-ARP packet if its policy says TEAM_FRP_FLAG_NOTIFY_SWITCH, at most
-/// MaxRARPsPerInterval of them.
-void change_link(storage::Transaction &transaction, std::string_view uplink, Link const &link);
 
 }  // namespace simhost::stored

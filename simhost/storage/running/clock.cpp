@@ -7,7 +7,7 @@ namespace simhost::storage {
 
 ClockRow get_clock(Transaction &transaction) {
   Query select(transaction, "SELECT stopped, value FROM clock");
-  select.next();
+  select.require_row();
   return {.stopped = select.flag(0), .value = std::chrono::milliseconds(select.integer(1))};
 }
 

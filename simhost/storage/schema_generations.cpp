@@ -1,0 +1,90 @@
+// The table of generations, and the triggers that give a switch new ones. They make exact what
+// processes keep of the state, whichever of them changes it and by whichever way.
+#include "qexapi/switch_properties.h"
+#include "storage/schema.h"
+#include "vswitch/properties.h"
+
+namespace simhost::storage {
+
+// Macros, so that the schema is one literal: the properties of a switch and its uplink ports on
+// which its team depends, and those of a port on which its uplink does.
+#define OF_TEAM \
+  "('" VSPROP_SWITCH_TEAMING "', '" QEX_NEBPROP_PORT_BLOCK "', '" QEX_NEBPROP_PORT_ALIAS "')"
+#define OF_PORT "('" VSPROP_PORT_TEAMING_POLICY "', '" VSPROP_PORT_TEAMING_OVERRIDE "')"
+
+char const *const kGenerationSchema = R"sql(
+  CREATE TABLE generation (
+    switch      INTEGER PRIMARY KEY REFERENCES switch ON DELETE CASCADE,
+    team        INTEGER NOT NULL DEFAULT (random()),
+    ports       INTEGER NOT NULL DEFAULT (random())
+  ) STRICT;
+  INSERT INTO generation (switch) SELECT key FROM switch;
+  CREATE TRIGGER generations_begin AFTER INSERT ON switch BEGIN
+    INSERT INTO generation (switch) VALUES (new.key);
+  END;
+
+  CREATE TRIGGER generation_by_added_port AFTER INSERT ON port BEGIN
+    UPDATE generation SET team = random() WHERE switch = new.switch AND new.is_uplink;
+    UPDATE generation SET ports = random() WHERE switch = new.switch AND NOT new.is_uplink;
+  END;
+  CREATE TRIGGER generation_by_removed_port AFTER DELETE ON port BEGIN
+    UPDATE generation SET team = random() WHERE switch = old.switch AND old.is_uplink;
+    UPDATE generation SET ports = random() WHERE switch = old.switch AND NOT old.is_uplink;
+  END;
+
+  CREATE TRIGGER generation_by_moved_uplink AFTER UPDATE OF port ON uplink BEGIN
+    UPDATE generation SET team = random()
+      WHERE switch IN (SELECT switch FROM port WHERE number IN (old.port, new.port));
+  END;
+
+  -- A link is replaced, never updated; a group without uplinks is like none; uplinks go when no
+  -- switch is left.
+  CREATE TRIGGER generation_by_replaced_link AFTER INSERT ON link BEGIN
+    UPDATE generation SET team = random() WHERE switch =
+      (SELECT port.switch FROM uplink JOIN port ON port.number = uplink.port
+         WHERE uplink.name = new.uplink);
+  END;
+
+  CREATE TRIGGER generation_by_joined_uplink AFTER INSERT ON lag_uplink BEGIN
+    UPDATE generation SET team = random()
+      WHERE switch = (SELECT switch FROM lag WHERE id = new.lag);
+  END;
+  CREATE TRIGGER generation_by_parted_uplink AFTER DELETE ON lag_uplink BEGIN
+    UPDATE generation SET team = random()
+      WHERE switch = (SELECT switch FROM lag WHERE id = old.lag);
+  END;
+
+  CREATE TRIGGER generation_by_set_property AFTER INSERT ON property
+    WHEN new.name IN )sql" OF_TEAM R"sql( OR new.name IN )sql" OF_PORT R"sql( BEGIN
+    UPDATE generation SET team = random()
+      WHERE switch = new.switch AND new.name IN )sql" OF_TEAM R"sql(;
+    UPDATE generation SET ports = random()
+      WHERE switch = new.switch AND new.name IN )sql" OF_PORT R"sql(;
+  END;
+  CREATE TRIGGER generation_by_changed_property AFTER UPDATE ON property
+    WHEN new.name IN )sql" OF_TEAM R"sql( OR new.name IN )sql" OF_PORT R"sql( BEGIN
+    UPDATE generation SET team = random()
+      WHERE switch = new.switch AND new.name IN )sql" OF_TEAM R"sql(;
+    UPDATE generation SET ports = random()
+      WHERE switch = new.switch AND new.name IN )sql" OF_PORT R"sql(;
+  END;
+  CREATE TRIGGER generation_by_removed_property AFTER DELETE ON property
+    WHEN old.name IN )sql" OF_TEAM R"sql( OR old.name IN )sql" OF_PORT R"sql( BEGIN
+    UPDATE generation SET team = random()
+      WHERE switch = old.switch AND old.name IN )sql" OF_TEAM R"sql(;
+    UPDATE generation SET ports = random()
+      WHERE switch = old.switch AND old.name IN )sql" OF_PORT R"sql(;
+  END;
+
+  CREATE TRIGGER generation_by_added_setting AFTER INSERT ON host_setting BEGIN
+    UPDATE generation SET team = random();
+  END;
+  CREATE TRIGGER generation_by_changed_setting AFTER UPDATE ON host_setting BEGIN
+    UPDATE generation SET team = random();
+  END;
+  CREATE TRIGGER generation_by_removed_setting AFTER DELETE ON host_setting BEGIN
+    UPDATE generation SET team = random();
+  END;
+)sql";
+
+}  // namespace simhost::storage
