@@ -11,10 +11,10 @@
 #include "model/plane.h"
 #include "model/switches/switches.h"
 #include "model/uplinks/lags.h"
-#include "scenario/named_properties.h"
 #include "scenario/scenario.h"
+#include "scenario/settings.h"
 #include "scenario/texts.h"
-#include "scenario/vocabulary.h"
+#include "scenario/words.h"
 #include "storage/store.h"
 
 namespace simhost::scenario {
@@ -37,12 +37,12 @@ double seconds(ClockTime time) {
 }
 
 void describe_link(Json &described, Link const &link) {
-  described["link"] = choice_to_json(link.carrier, kUpDown);
-  described["admin"] = choice_to_json(link.admin, kUpDown);
-  described["lacp"] = choice_to_json(link.partner, kUpDown);
+  described["link"] = word_to_json(link.carrier, kUpDown);
+  described["admin"] = word_to_json(link.admin, kUpDown);
+  described["lacp"] = word_to_json(link.partner, kUpDown);
   described["speed"] = link.speed;
-  described["duplex"] = choice_to_json(link.full_duplex, kDuplex);
-  described["beacons"] = choice_to_json(link.beacons, kUpDown);
+  described["duplex"] = word_to_json(link.full_duplex, kDuplex);
+  described["beacons"] = word_to_json(link.beacons, kUpDown);
   described["error_percent"] = link.error_percent;
   described["driver"] = link.driver;
 }
@@ -66,7 +66,7 @@ Json address_to_json(VSMACEntry const &entry) {
   return {{"mac", mac_text(std::as_bytes(std::span(entry.macAddress)))},
           {"vlan", qex_VlanID{entry.vid}},
           {"vni", qex_uint32{entry.vni}},
-          {"type", choice_to_json(type, kAddressTypes)},
+          {"type", word_to_json(type, kAddressTypes)},
           {"ages", entry.aging != 0},
           {"age", qex_uint32{entry.elapsed}}};
 }
@@ -84,27 +84,13 @@ Json groups_to_json(Transaction &transaction, storage::PortNumber port) {
       auto const group = *running_plane().group(transaction, port, address);
       list.push_back({{"address", address_text(address)},
                       {"version", group.version},
-                      {"source_mode", choice_to_json(group.source_mode, kSourceModes)},
+                      {"source_mode", word_to_json(group.source_mode, kSourceModes)},
                       {"sources", each_to_json(group.sources, address_text)},
                       {"vni", group.vni},
                       {"observed", {{"updated", seconds(group.updated)}}}});
     }
   }
   return list;
-}
-
-// Bytes of what a member says whole are not repeated.
-void describe_properties(Json &described, Transaction &transaction, PropertyOwner const &owner,
-                         NamedProperties named, char const *under = "properties") {
-  Json list = Json::object();
-  for (auto const &[name, property] : storage::properties_of(transaction, owner)) {
-    auto const *const member = find_named(named, name);
-    if (member == nullptr || !round_trips(described, *member, property)) {
-      list[name] = {{"type", choice_to_json(property.type, kPropertyTypes)},
-                    {"hex", hex_text(property.value)}};
-    }
-  }
-  described[under] = std::move(list);
 }
 
 Json counters_to_json(Transaction &transaction, CounterOwner const &owner) {
@@ -122,12 +108,12 @@ Json port_to_json(Transaction &transaction, storage::Port const &port) {
   if (auto const external = storage::external_id_of(transaction, port.number); !external.empty()) {
     described["external_id"] = external;
   }
-  describe_members(described, transaction, owner, named_of_port());
+  describe_named(described, transaction, owner, SettingOwner::of_port);
   described["addresses"] = addresses_to_json(transaction, place);
   described["groups"] = groups_to_json(transaction, port.number);
   described["counters"] =
       counters_to_json(transaction, {.switch_key = port.switch_key, .port = port.number});
-  describe_properties(described, transaction, owner, named_of_port());
+  describe_raw(described, transaction, owner, SettingOwner::of_port);
   Json observed{{"number", static_cast<std::uint32_t>(port.number)}};
   try {
     observed["uplink"] = running_plane().team_uplink(transaction, port);
@@ -142,11 +128,11 @@ Json port_to_json(Transaction &transaction, storage::Port const &port) {
 Json uplink_port_to_json(Transaction &transaction, storage::Port const &port) {
   auto const owner = owner_of(port);
   Json described{{"id", port.identifier}};
-  describe_members(described, transaction, owner, named_of_uplink_port());
+  describe_named(described, transaction, owner, SettingOwner::of_uplink_port);
   if (auto const uplink = storage::uplink_at(transaction, port.number)) {
     described["uplink"] = *uplink;
   }
-  describe_properties(described, transaction, owner, named_of_uplink_port());
+  describe_raw(described, transaction, owner, SettingOwner::of_uplink_port);
   return described;
 }
 
@@ -187,19 +173,20 @@ Json switch_to_json(Transaction &transaction, storage::FoundSwitch const &known)
   Json described{{"alias", row.alias},           {"id", row.identifier},
                  {"portset", row.portset},       {"max_ports", row.max_ports},
                  {"persistent", row.persistent}, {"version", row.version},
-                 {"running", row.associated},    {"mtu", mtu_of(transaction, row.alias)}};
+                 {"running", row.associated}};
   described["uplink_ports"] = uplink_ports_to_json(transaction, key);
   described["uplinks"] = each_to_json(storage::uplinks_of(transaction, key),
                                       [](auto const &uplink) { return uplink.name; });
   described["lags"] = each_to_json(lags_of(transaction, key), lag_to_json);
-  describe_members(described, transaction, owner, named_of_switch());
+  describe_named(described, transaction, owner, SettingOwner::of_switch);
   described["ports"] = ports_to_json(transaction, key);
   described["addresses"] =
       addresses_to_json(transaction, {.switch_key = key, .port = std::nullopt});
   described["counters"] = counters_to_json(transaction, {.switch_key = key});
   described["mirror_counters"] = session_counters_to_json(transaction, key);
-  describe_properties(described, transaction, owner, named_of_switch());
-  describe_properties(described, transaction, PropertyOwner::host(key), {}, "host_properties");
+  describe_raw(described, transaction, owner, SettingOwner::of_switch);
+  describe_raw(described, transaction, PropertyOwner::host(key), SettingOwner::of_host,
+               "host_properties");
   return described;
 }
 

@@ -53,7 +53,17 @@ void Node::fail(std::string const &why) const {
   throw DocumentError((path_.empty() ? "the document" : path_) + ": " + why);
 }
 
+Json word_to_json(std::int64_t number, std::span<Word const> words) {
+  auto const found = std::find_if(words.begin(), words.end(),
+                                  [&](Word const &word) { return word.value == number; });
+  return found == words.end() ? Json() : Json(found->text);
+}
+
 void Node::only(std::initializer_list<std::string_view> keys) const {
+  only(std::span(keys.begin(), keys.size()));
+}
+
+void Node::only(std::span<std::string_view const> keys) const {
   for (auto const &member : members()) {
     if (std::find(keys.begin(), keys.end(), member.key) == keys.end()) {
       member.value.fail("unknown key");
@@ -80,11 +90,11 @@ std::optional<Node> Node::find(std::string_view key) const {
   return Node(*found, path_.empty() ? std::string(key) : path_ + "." + std::string(key));
 }
 
-std::vector<Member> Node::members() const {
+std::vector<NamedNode> Node::members() const {
   if (!value_->is_object()) {
     fail("must be an object");
   }
-  std::vector<Member> all;
+  std::vector<NamedNode> all;
   for (auto const &[key, value] : value_->items()) {
     all.push_back({.key = key, .value = at(key)});
   }
@@ -100,6 +110,19 @@ std::vector<Node> Node::items() const {
     all.emplace_back((*value_)[index], fmt::format("{}[{}]", path_, index));
   }
   return all;
+}
+
+std::int64_t Node::choice(std::span<Word const> words) const {
+  auto const given = text();
+  std::string known;
+  for (auto const &word : words) {
+    if (word.text == given) {
+      return word.value;
+    }
+    known += known.empty() ? "" : ", ";
+    known += word.text;
+  }
+  fail("'" + given + "' is none of " + known);
 }
 
 bool Node::flag() const {

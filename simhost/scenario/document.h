@@ -2,8 +2,6 @@
 // told with the path of the key, such as "switches[0].mtu: 99 is below 1280".
 #pragma once
 
-#include <algorithm>
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <initializer_list>
@@ -15,6 +13,8 @@
 #include <string_view>
 #include <utility>
 #include <vector>
+
+#include "model/properties/form.h"
 
 namespace simhost::scenario {
 
@@ -28,22 +28,10 @@ class DocumentError : public std::runtime_error {
 /// Throws DocumentError for a text that is no JSON, or has a key twice in one object.
 Json parsed(std::string_view text);
 
-/// A text and what it stands for.
-template <typename Value>
-struct Choice {
-  std::string_view text;
-  Value value;
-};
+/// The word of a number; null for one that has none.
+Json word_to_json(std::int64_t number, std::span<Word const> words);
 
-/// The text of a value; null for one that is not among the choices.
-template <typename Value, std::size_t kCount>
-Json choice_to_json(Value value, std::array<Choice<Value>, kCount> const &choices) {
-  auto const found = std::find_if(choices.begin(), choices.end(),
-                                  [&](auto const &choice) { return choice.value == value; });
-  return found == choices.end() ? Json() : Json(found->text);
-}
-
-struct Member;
+struct NamedNode;
 
 /// A value of a document and its path. The document must outlive it.
 class Node {
@@ -53,11 +41,15 @@ class Node {
 
   [[noreturn]] void fail(std::string const &why) const;
 
+  [[nodiscard]] bool is_object() const { return value_->is_object(); }
+  [[nodiscard]] bool is_text() const { return value_->is_string(); }
+
   /// The value must be an object that has no other keys.
   void only(std::initializer_list<std::string_view> keys) const;
+  void only(std::span<std::string_view const> keys) const;
   [[nodiscard]] Node at(std::string_view key) const;
   [[nodiscard]] std::optional<Node> find(std::string_view key) const;
-  [[nodiscard]] std::vector<Member> members() const;
+  [[nodiscard]] std::vector<NamedNode> members() const;
   /// The value must be an array.
   [[nodiscard]] std::vector<Node> items() const;
 
@@ -68,19 +60,8 @@ class Node {
   [[nodiscard]] std::uint64_t counter() const;
   /// Seconds with up to three decimals, as milliseconds.
   [[nodiscard]] std::int64_t milliseconds() const;
-  template <typename Value, std::size_t kCount>
-  [[nodiscard]] Value choice(std::span<Choice<Value> const, kCount> choices) const {
-    auto const given = text();
-    std::string known;
-    for (auto const &choice : choices) {
-      if (choice.text == given) {
-        return choice.value;
-      }
-      known += known.empty() ? "" : ", ";
-      known += choice.text;
-    }
-    fail("'" + given + "' is none of " + known);
-  }
+  /// The number of one of the words.
+  [[nodiscard]] std::int64_t choice(std::span<Word const> words) const;
 
   /// What `read` makes of the value under a key, or `otherwise` if there is none.
   template <typename Value, typename Read>
@@ -95,7 +76,7 @@ class Node {
 };
 
 /// A key of an object and its value.
-struct Member {
+struct NamedNode {
   std::string key;
   Node value;
 };

@@ -9,14 +9,14 @@
 #include "base/outcomes.h"
 #include "scenario/document.h"
 #include "scenario/texts.h"
-#include "scenario/vocabulary.h"
+#include "scenario/words.h"
 
 namespace simhost::scenario {
 
 inline constexpr std::int64_t k32Bits = 0xFFFFFFFF;
 
 inline bool up_or_down(Node const &node) {
-  return node.choice(std::span(kUpDown));
+  return node.choice(kUpDown) != 0;
 }
 
 inline std::string text_of_node(Node const &node) {

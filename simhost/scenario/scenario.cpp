@@ -52,7 +52,7 @@ void apply_link(Transaction &transaction, std::string const &name, Node const &n
   link.speed =
       node.get("speed", before.speed, [](Node const &speed) { return speed.integer(1, 1000000); });
   link.full_duplex = node.get("duplex", before.full_duplex,
-                              [](Node const &duplex) { return duplex.choice(std::span(kDuplex)); });
+                              [](Node const &duplex) { return duplex.choice(kDuplex) != 0; });
   link.beacons = node.get("beacons", before.beacons, up_or_down);
   link.error_percent = node.get("error_percent", before.error_percent,
                                 [](Node const &percent) { return percent.integer(0, 100); });

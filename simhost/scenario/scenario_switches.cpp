@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <initializer_list>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -11,11 +12,11 @@
 #include "model/lookup.h"
 #include "model/plane.h"
 #include "model/ports/ports.h"
-#include "model/properties/properties.h"
 #include "model/switches/switches.h"
 #include "model/uplinks/lags.h"
-#include "scenario/named_properties.h"
+#include "model/vlans/properties.h"
 #include "scenario/reading.h"
+#include "scenario/settings.h"
 #include "storage/store.h"
 
 namespace simhost::scenario {
@@ -24,56 +25,11 @@ namespace {
 using storage::PropertyOwner;
 using storage::Transaction;
 
-Bytes bytes_from(Node const &node) {
-  auto const hex = node.find("hex");
-  auto const text = node.find("text");
-  if (hex.has_value() == text.has_value()) {
-    node.fail("must have one of the keys hex, text");
-  }
-  if (text) {
-    return bytes_of_text(text->text());
-  }
-  auto const bytes = bytes_from_hex(hex->text());
-  if (!bytes) {
-    hex->fail("must be hexadecimal digits, two for each byte");
-  }
-  return *bytes;
-}
-
-template <typename IsWanted>
-void apply_raw(Transaction &transaction, PropertyOwner const &owner, Node const &node,
-               std::string_view under, IsWanted const &is_wanted) {
-  if_there(node, under, [&](Node const &properties) {
-    for_each_member(properties, [&](std::string const &key, Node const &property) {
-      if (!is_wanted(key)) {
-        return;
-      }
-      property.only({"type", "hex", "text"});
-      auto const type = property.at("type").choice(std::span(kPropertyTypes));
-      set_property(transaction, owner, key, bytes_from(property), type);
-    });
-  });
-}
-
-// Those without a member of their own.
-void apply_others(Transaction &transaction, PropertyOwner const &owner, NamedProperties named,
-                  Node const &node, std::string_view under = "properties") {
-  apply_raw(transaction, owner, node, under,
-            [&](std::string_view key) { return find_named(named, key) == nullptr; });
-}
-
-// Bytes win over the member, which may not be able to say them.
-void apply_named(Transaction &transaction, PropertyOwner const &owner, NamedProperties named,
-                 Node const &node) {
-  apply_members(transaction, owner, named, node);
-  apply_raw(transaction, owner, node, "properties",
-            [&](std::string_view key) { return find_named(named, key) != nullptr; });
-}
-
-void apply_properties(Transaction &transaction, PropertyOwner const &owner, NamedProperties named,
-                      Node const &node) {
-  apply_others(transaction, owner, named, node);
-  apply_named(transaction, owner, named, node);
+// The object must have no other keys than these and those of its settings.
+void only(Node const &node, SettingOwner kind, std::initializer_list<std::string_view> keys) {
+  auto all = setting_names(kind);
+  all.insert(all.end(), keys);
+  node.only(all);
 }
 
 void set_counters(Transaction &transaction, CounterOwner const &owner, Node const &counters) {
@@ -95,14 +51,14 @@ VSMACEntry address_entry_from(Node const &node) {
     node.at("mac").fail("must be six bytes such as 02:00:00:00:00:01");
   }
   std::memcpy(entry.macAddress, mac->data(), mac->size());
-  auto const type = node.get("type", VS_MAC_ADDR_TYPE_LEARNED, [](Node const &given) {
-    return given.choice(std::span(kAddressTypes));
-  });
+  auto const type = node.get("type", VS_MAC_ADDR_TYPE_LEARNED,
+                             [](Node const &given) { return given.choice(kAddressTypes); });
   entry.macAddrType = type;
-  entry.vid =
-      node.get("vlan", qex_VlanID{0}, [](Node const &given) { return given.integer(0, 4094); });
-  entry.vni =
-      node.get("vni", qex_uint32{0}, [](Node const &given) { return given.integer(0, 0xFFFFFF); });
+  entry.vid = node.get("vlan", qex_VlanID{0},
+                       [](Node const &given) { return given.integer(0, vlans::kGreatest); });
+  entry.vni = node.get("vni", qex_uint32{0}, [](Node const &given) {
+    return given.integer(0, QEX_VIRTUAL_NETWORK_ID_MAX);
+  });
   entry.aging =
       node.get("ages", static_cast<qex_Bool>(type == VS_MAC_ADDR_TYPE_LEARNED), &Node::flag_of);
   entry.elapsed = node.get("age", qex_uint32{0}, number_of_32_bits);
@@ -124,14 +80,14 @@ McastGroup group_from(Node const &node) {
     }
     return *bytes;
   };
-  McastGroup group{.address = address(node.at("address")),
-                   .version = node.get("version", 0U, number_of_32_bits),
-                   .source_mode = node.get(
-                       "source_mode", 0U,
-                       [](Node const &given) { return given.choice(std::span(kSourceModes)); }),
-                   .vni = node.get("vni", 0U, number_of_32_bits),
-                   .updated = {},
-                   .sources = {}};
+  McastGroup group{
+      .address = address(node.at("address")),
+      .version = node.get("version", 0U, number_of_32_bits),
+      .source_mode =
+          node.get("source_mode", 0U, [](Node const &given) { return given.choice(kSourceModes); }),
+      .vni = node.get("vni", 0U, number_of_32_bits),
+      .updated = {},
+      .sources = {}};
   if (auto const sources = node.find("sources")) {
     for (auto const &source : sources->items()) {
       group.sources.push_back(address(source));
@@ -141,15 +97,15 @@ McastGroup group_from(Node const &node) {
 }
 
 void apply_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
-  node.only({"id", "external_id", "teaming", "uplink", "mac_learning", "addresses", "groups",
-             "mirror_sessions", "counters", "properties", "observed"});
+  only(node, SettingOwner::of_port,
+       {"id", "external_id", "addresses", "groups", "counters", "properties", "observed"});
   auto const identifier = node.at("id").text();
   auto const found = storage::find_port(transaction, key, identifier);
   auto const port = found ? *found : add_client_port(transaction, key, identifier);
   auto const owner = PropertyOwner::port(key, port.number);
   if_there(node, "external_id",
            [&](Node const &external) { set_external_id(transaction, port, external.text()); });
-  apply_properties(transaction, owner, named_of_port(), node);
+  apply_settings(transaction, owner, SettingOwner::of_port, node);
   apply_addresses(transaction, {.switch_key = key, .port = port.number}, node);
   for_each_in(node, "groups", [&](Node const &item) {
     get_wires().join(transaction, port.number, group_from(item));
@@ -166,8 +122,8 @@ storage::SwitchKey made_switch(Transaction &transaction, std::string const &alia
       .alias = alias,
       .identifier = identifier,
       .portset = portset,
-      .max_ports =
-          node.get("max_ports", 0U, [](Node const &given) { return given.integer(1, 65535); }),
+      .max_ports = node.get("max_ports", 0U,
+                            [](Node const &given) { return given.integer(1, kGreatestMaxPorts); }),
       .persistent = node.get("persistent", true, &Node::flag_of),
       .version = node.get("version", 0U, number_of_32_bits)};
   create_switch(transaction, spec);
@@ -205,7 +161,7 @@ void attach_to(Transaction &transaction, storage::Port const &port, std::string 
 }
 
 void apply_uplink_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
-  node.only({"id", "name", "uplink", "properties"});
+  only(node, SettingOwner::of_uplink_port, {"id", "uplink", "properties"});
   auto const identifier = node.at("id").text();
   auto const found = storage::find_port(transaction, key, identifier);
   auto const port = found ? *found : add_vacant_uplink_port(transaction, key, identifier);
@@ -213,7 +169,7 @@ void apply_uplink_port(Transaction &transaction, storage::SwitchKey key, Node co
     node.at("id").fail("is a port that is no uplink port");
   }
   auto const owner = PropertyOwner::port(key, port.number);
-  apply_properties(transaction, owner, named_of_uplink_port(), node);
+  apply_settings(transaction, owner, SettingOwner::of_uplink_port, node);
   if_there(node, "uplink",
            [&](Node const &uplink) { attach_to(transaction, port, uplink.text()); });
 }
@@ -250,38 +206,21 @@ void apply_session_counters(Transaction &transaction, storage::SwitchKey key, No
 }  // namespace
 
 void apply_switch(Transaction &transaction, Node const &node) {
-  node.only({"alias",
-             "id",
-             "portset",
-             "max_ports",
-             "persistent",
-             "version",
-             "running",
-             "mtu",
-             "uplink_ports",
-             "uplinks",
-             "lags",
-             "teaming",
-             "mac_learning",
-             "multicast",
-             "addresses",
-             "counters",
-             "mirror_counters",
-             "properties",
-             "host_properties",
-             "ports",
-             "observed"});
+  only(node, SettingOwner::of_switch,
+       {"alias", "id", "portset", "max_ports", "persistent", "version", "running", "uplink_ports",
+        "uplinks", "lags", "addresses", "counters", "mirror_counters", "properties",
+        "host_properties", "ports", "observed"});
   auto const alias = node.at("alias").text();
   auto const known = storage::find_switch(transaction, storage::SwitchName::alias, alias);
   auto const key = known ? changed_switch(*known, node) : made_switch(transaction, alias, node);
   auto const owner = PropertyOwner::global(key);
-  apply_others(transaction, owner, named_of_switch(), node);
-  apply_others(transaction, PropertyOwner::host(key), {}, node, "host_properties");
+  apply_raw(transaction, owner, SettingOwner::of_switch, node);
+  apply_raw(transaction, PropertyOwner::host(key), SettingOwner::of_host, node, "host_properties");
   for_each_in(node, "uplink_ports",
               [&](Node const &item) { apply_uplink_port(transaction, key, item); });
   attach_uplinks(transaction, key, node);
   for_each_in(node, "lags", [&](Node const &item) { apply_lag(transaction, key, item); });
-  apply_named(transaction, owner, named_of_switch(), node);
+  apply_named(transaction, owner, SettingOwner::of_switch, node);
   for_each_in(node, "ports", [&](Node const &item) { apply_port(transaction, key, item); });
   apply_addresses(transaction, {.switch_key = key, .port = std::nullopt}, node);
   apply_counters(transaction, {.switch_key = key}, node);

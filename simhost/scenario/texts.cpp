@@ -51,8 +51,8 @@ std::optional<std::vector<std::byte>> ip_from(std::string const &text) {
 
 }  // namespace
 
-std::optional<std::array<std::byte, 6>> mac_from(std::string_view text) {
-  std::array<std::byte, 6> mac{};
+std::optional<std::array<std::byte, kMacBytes>> mac_from(std::string_view text) {
+  std::array<std::byte, kMacBytes> mac{};
   if (text.size() != 17) {
     return std::nullopt;
   }
@@ -66,7 +66,7 @@ std::optional<std::array<std::byte, 6>> mac_from(std::string_view text) {
   return mac;
 }
 
-std::string mac_text(std::span<std::byte const, 6> mac) {
+std::string mac_text(std::span<std::byte const, kMacBytes> mac) {
   return fmt::format("{:02x}:{:02x}:{:02x}:{:02x}:{:02x}:{:02x}", mac[0], mac[1], mac[2], mac[3],
                      mac[4], mac[5]);
 }
@@ -82,8 +82,8 @@ std::optional<std::vector<std::byte>> address_from(std::string const &text) {
 }
 
 std::string address_text(std::span<std::byte const> address) {
-  if (address.size() == 6) {
-    return mac_text(address.first<6>());
+  if (address.size() == kMacBytes) {
+    return mac_text(address.first<kMacBytes>());
   }
   std::array<char, INET6_ADDRSTRLEN> text{};
   inet_ntop(address.size() == sizeof(in_addr) ? AF_INET : AF_INET6, address.data(), text.data(),

@@ -14,9 +14,12 @@
 
 namespace simhost::scenario {
 
+/// Bytes of an address of Ethernet.
+inline constexpr std::size_t kMacBytes = 6;
+
 /// Six bytes in hexadecimal with colons between them.
-std::optional<std::array<std::byte, 6>> mac_from(std::string_view text);
-std::string mac_text(std::span<std::byte const, 6> mac);
+std::optional<std::array<std::byte, kMacBytes>> mac_from(std::string_view text);
+std::string mac_text(std::span<std::byte const, kMacBytes> mac);
 
 /// An address of Ethernet, IPv4 or IPv6, told apart by its form and its length in bytes.
 std::optional<std::vector<std::byte>> address_from(std::string const &text);

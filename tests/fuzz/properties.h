@@ -6,7 +6,7 @@
 #include <string>
 
 #include "base/bytes.h"
-#include "model/properties/keys.h"
+#include "model/properties/registry.h"
 #include "tests/fuzz/harness.h"
 #include "vswitch/mac_learning.h"
 #include "vswitch/mac_tables.h"
@@ -18,9 +18,9 @@
 #include "vswitch/uplinks.h"
 
 inline std::string consume_key(Input &input) {
-  auto const keys = simhost::property_keys();
-  auto const index = input.ConsumeIntegralInRange<std::size_t>(0, keys.size());
-  return index < keys.size() ? std::string(keys[index].name) : input.ConsumeRandomLengthString(260);
+  auto const known = simhost::descriptors();
+  auto const index = input.ConsumeIntegralInRange<std::size_t>(0, known.size());
+  return index < known.size() ? std::string(known[index]->key) : input.ConsumeRandomLengthString(260);
 }
 
 template <typename Record>

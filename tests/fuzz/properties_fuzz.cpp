@@ -33,8 +33,8 @@ PropertyOwner consume_owner(Input &input, Transaction &transaction) {
 /// What callers set elsewhere too, such as the names of uplink ports, the host keeps as what it
 /// means: what stands after the NUL of a name is lost.
 bool is_kept_as_bytes(std::string const &key) {
-  auto const *const known = simhost::find_property_key(key);
-  return known == nullptr || known->read == nullptr;
+  auto const *const known = simhost::find_descriptor(key);
+  return known == nullptr || !known->is_computed();
 }
 
 void set_and_get(Input &input, Transaction &transaction) {

@@ -8,7 +8,7 @@
 #include "abi/data_lists.h"
 #include "base/blocks.h"
 #include "model/lookup.h"
-#include "model/properties/keys.h"
+#include "model/properties/registry.h"
 #include "model/state/images.h"
 #include "tests/fuzz/host.h"
 #include "tests/fuzz/properties.h"

@@ -17,7 +17,7 @@ inline constexpr char const *kHost = R"({
   "switches": [
     {"alias": "s", "uplinks": ["nic0", "nic1"],
      "teaming": {"balance": "explicit", "active": ["uplink1"], "standby": ["uplink2"], "flags": []},
-     "ports": [{"id": "p1", "mac_learning": {"limit": 3}}, {"id": "p2"}]},
+     "ports": [{"id": "p1", "mac_learning": {"learning": true, "limit": 3}}, {"id": "p2"}]},
     {"alias": "other", "ports": [{"id": "p9"}]}
   ]})";
 

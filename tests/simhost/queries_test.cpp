@@ -75,7 +75,7 @@ TEST_F(Queries, LearnedAddressesAgeOnTheHostsClock) {
 
 TEST_F(Queries, LearningIsCounted) {
   apply(R"({"switches": [{"alias": "s", "ports": [
-            {"id": "p1", "mac_learning": {"limit": 1, "limit_policy": "drop"},
+            {"id": "p1", "mac_learning": {"learning": true, "limit": 1, "limit_policy": "drop"},
              "counters": {"noLearningAllowedPkts": 18446744073709551615}}]}]})");
   EXPECT_EQ(simhost_learn("s", "p1", "02:00:00:00:00:01", 0, 0), QEX_OK);
   EXPECT_EQ(simhost_learn("s", "p1", "02:00:00:00:00:02", 0, 0), QEX_LIMIT_EXCEEDED);

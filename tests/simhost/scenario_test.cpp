@@ -16,6 +16,7 @@
 #include "model/lookup.h"
 #include "model/properties/properties.h"
 #include "model/switches/switches.h"
+#include "qexapi/switch_properties.h"
 #include "scenario/lifecycle.h"
 #include "storage/store.h"
 #include "temporary_folder.h"
@@ -249,8 +250,8 @@ TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
     return simhost::get_property(transaction, owner_of_p(), key).value();
   };
   auto table = property(VSPROP_PORT_MIRROR_SESSIONS).value;
-  // A VLAN to encapsulate in, for which documents have no word.
-  table.at(sizeof(DVMirrorSessionTable) + offsetof(DVMirrorSession, encapVlan)) = std::byte{7};
+  // Padding, for which documents have no word.
+  table.at(sizeof(DVMirrorSessionTable) + offsetof(DVMirrorSession, pad2)) = std::byte{7};
   simhost::set_property(transaction, owner_of_p(), VSPROP_PORT_MIRROR_SESSIONS, table);
   simhost::set_property(transaction, owner_of_p(), VSPROP_PORT_TEAMING_POLICY,
                         property(VSPROP_PORT_TEAMING_POLICY).value,
@@ -273,6 +274,198 @@ TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
   EXPECT_EQ(property(VSPROP_PORT_MIRROR_SESSIONS).value, table);
   EXPECT_EQ(property(VSPROP_PORT_TEAMING_POLICY).type, simhost::storage::PropertyType::runtime);
   EXPECT_EQ(property(VSPROP_PORT_TEAMING_OVERRIDE).value, no_utf8);
+}
+
+// Each named form, and the bytes that it stands for; nothing of it is left for raw bytes.
+struct Said {
+  char const *members;
+  char const *key;
+  char const *hex;
+};
+
+struct NamedForms : Scenario, testing::WithParamInterface<Said> {
+  simhost::scenario::Json only_switch(Transaction &transaction) {
+    return simhost::scenario::host_to_json(transaction)["switches"][0];
+  }
+};
+
+struct NamedFormsOfPorts : NamedForms {};
+struct NamedFormsOfSwitches : NamedForms {};
+
+TEST_P(NamedFormsOfPorts, SayTheBytesWhole) {
+  auto const &[members, key, hex] = GetParam();
+  auto const map = R"("private_vlans": [
+      {"primary": 100, "secondary": 100, "type": "promiscuous"},
+      {"primary": 100, "secondary": 101, "type": "isolated"}])";
+  auto const document = [&](std::string const &port) {
+    return fmt::format(R"({{"switches": [{{"alias": "s", {}, "ports": [{{"id": "p", {}}}]}}]}})",
+                       map, port);
+  };
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(
+      transaction,
+      document(fmt::format(R"("properties": {{"{}": {{"type": "{}", "hex": "{}"}}}})", key,
+                           std::string_view(key).find("vswitch") == std::string_view::npos &&
+                                   std::string_view(key) != QEX_NEBPROP_PORT_BLOCK
+                               ? "config"
+                               : "policy",
+                           hex)));
+  auto const by_bytes = only_switch(transaction)["ports"][0];
+  EXPECT_TRUE(by_bytes["properties"].empty()) << by_bytes["properties"];
+  simhost::scenario::empty_host(transaction);
+  simhost::scenario::apply(transaction, document(members));
+  auto by_name = only_switch(transaction)["ports"][0];
+  EXPECT_TRUE(by_name["properties"].empty()) << by_name["properties"];
+  by_name["observed"] = by_bytes["observed"];
+  EXPECT_EQ(by_name, by_bytes);
+  auto const said = simhost::scenario::parsed(fmt::format("{{{}}}", members));
+  EXPECT_EQ(by_name[said.begin().key()], said.front()) << "as it was said";
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    EachOfThem, NamedFormsOfPorts,
+    testing::Values(
+        Said{R"("vlan": 100)", VSPROP_PORT_VLAN, "0000640000000000"},
+        Said{R"("vlan": {"id": 100, "trunk": ["10-12", 20]})", VSPROP_PORT_VLAN,
+             "00006400000002000a000c0014001400"},
+        Said{R"("vlan": {"id": 101, "private": true})", VSPROP_PORT_VLAN, "0200650000000000"},
+        Said{R"("vlan": {"guest_tagging": true})", VSPROP_PORT_VLAN, "0100000000000000"},
+        Said{R"("forbids": ["promiscuous", "forged_transmits"])", VSPROP_PORT_SECURITY, "05000000"},
+        Said{R"("blocked": true)", QEX_NEBPROP_PORT_BLOCK, "01"},
+        Said{R"("nested_tag": true)", VSPROP_PORT_VLAN_NESTEDTAG, "01"},
+        Said{R"("transmit_uplink": true)", VSPROP_PORT_TX_UPLINK, "01"},
+        Said{R"("alias": "desk")", QEX_NEBPROP_PORT_ALIAS, "6465736b00"},
+        Said{R"("connection": 7)", QEX_NEBPROP_PORT_CONNECTID, "07000000"}));
+
+TEST_P(NamedFormsOfSwitches, SayTheBytesWhole) {
+  auto const &[members, key, hex] = GetParam();
+  auto const document = [&](std::string const &given) {
+    return fmt::format(R"({{"switches": [{{"alias": "s", "id": "i", "portset": "p", {}}}]}})",
+                       given);
+  };
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(
+      transaction, document(fmt::format(
+                       R"("properties": {{"{}": {{"type": "config", "hex": "{}"}}}})", key, hex)));
+  auto const by_bytes = only_switch(transaction);
+  EXPECT_TRUE(by_bytes["properties"].empty()) << by_bytes["properties"];
+  simhost::scenario::empty_host(transaction);
+  simhost::scenario::apply(transaction, document(members));
+  EXPECT_EQ(only_switch(transaction), by_bytes);
+  auto const said = simhost::scenario::parsed(fmt::format("{{{}}}", members));
+  EXPECT_EQ(by_bytes[said.begin().key()], said.front()) << "as it was said";
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    EachOfThem, NamedFormsOfSwitches,
+    testing::Values(Said{R"("disabled": true)", VSPROP_SWITCH_FORWARDING_DISABLED, "01"},
+                    Said{R"("mtu": 4660)", VSPROP_MTU, "34120000"},
+                    Said{R"("multicast": "igmp")", VSPROP_MULTICAST_FILTER, "02000000"},
+                    Said{R"("private_vlans": [
+                          {"primary": 100, "secondary": 100, "type": "promiscuous"},
+                          {"primary": 100, "secondary": 101, "type": "isolated"}])",
+                         VSPROP_PVLAN_MAP, "64006400010000006400650002000000"}));
+
+TEST_F(Scenario, AVlanReplacesTheWholeValueItsPriorityToo) {
+  Transaction transaction(store, Access::write);
+  auto const vlan = [&](std::string const &said) {
+    simhost::scenario::apply(
+        transaction,
+        R"({"switches": [{"alias": "s", "ports": [{"id": "p", "vlan": )" + said + "}]}]}");
+    auto const port = simhost::scenario::host_to_json(transaction)["switches"][0]["ports"][0];
+    EXPECT_TRUE(port["properties"].empty()) << port["properties"];
+    return port["vlan"].dump();
+  };
+  auto const stored = [&](char const *key) {
+    auto const port =
+        simhost::get_port(transaction, simhost::get_switch(transaction, "s").key, "p");
+    return simhost::storage::find_property(transaction, simhost::owner_of(port), key);
+  };
+  EXPECT_EQ(vlan(R"({"id": 100, "trunk": ["10-12", 20], "priority": 5})"),
+            R"({"id":100,"trunk":["10-12",20],"priority":5})");
+  EXPECT_EQ(stored(VSPROP_PORT_PRIORITY)->value, simhost::copied(simhost::bytes_of(5)));
+  EXPECT_EQ(vlan(R"({"priority": 0})"), R"({"priority":0})");
+  EXPECT_EQ(vlan("100"), "100");
+  EXPECT_FALSE(stored(VSPROP_PORT_PRIORITY).has_value());
+}
+
+TEST_F(Scenario, AMemberThatIsNotGivenIsWhatItIsWhileTheSettingIsNotSet) {
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "teaming": {},
+      "mac_learning": {}, "ports": [{"id": "p", "mac_learning": {}, "ethernet_filter": {}}]}]})");
+  auto const key = simhost::get_switch(transaction, "s").key;
+  auto const of_switch = simhost::storage::PropertyOwner::global(key);
+  auto const of_port = simhost::owner_of(simhost::get_port(transaction, key, "p"));
+  for (auto const &[owner, name] : {std::pair{of_switch, VSPROP_SWITCH_TEAMING},
+                                    std::pair{of_switch, VSPROP_SWITCH_MAC_LEARNING},
+                                    std::pair{of_port, VSPROP_PORT_MAC_MANAGEMENT},
+                                    std::pair{of_port, VSPROP_PORT_EXTRA_ETH_FRP}}) {
+    auto const given = simhost::storage::find_property(transaction, owner, name).value().value;
+    EXPECT_EQ(given, simhost::find_descriptor(name)->default_bytes()) << name;
+  }
+}
+
+TEST_F(Scenario, AnEncapsulatedSessionIsSaidWhole) {
+  constexpr auto kSession = R"({"sid": "far", "name": "", "type": "encapsulated",
+      "snap_length": 0, "sampling_rate": 0, "disabled": false, "promiscuous": false,
+      "to": [{"ip": "192.0.2.1"}], "received_by": [], "sent_by": [],
+      "encapsulation": {"type": "erspan2", "key": 9, "vlan": 30, "id": 4, "cos": 1,
+                        "granularity": 2},
+      "encapsulates": true, "keeps_vlan": true, "no_output": true, "no_input": true,
+      "mirrors_uplinks": true, "uplink_filter": "vxlan", "received_from": ["uplinks"],
+      "sent_from": ["vmm", "test"], "stack": true})";
+  Transaction transaction(store, Access::write);
+  simhost::scenario::apply(
+      transaction, fmt::format(R"({{"switches": [{{"alias": "s", "uplink_mirror_sessions": [{}],
+                                  "ports": [{{"id": "p", "mirror_sessions": [{}]}}]}}]}})",
+                               kSession, kSession));
+  auto const described = simhost::scenario::host_to_json(transaction)["switches"][0];
+  auto const said = simhost::scenario::parsed(kSession);
+  EXPECT_EQ(described["ports"][0]["mirror_sessions"][0], said);
+  EXPECT_TRUE(described["ports"][0]["properties"].empty());
+  EXPECT_EQ(described["uplink_mirror_sessions"][0], said);
+  EXPECT_TRUE(described["properties"].empty());
+  auto const port = simhost::get_port(transaction, simhost::get_switch(transaction, "s").key, "p");
+  auto const table = simhost::storage::find_property(transaction, simhost::owner_of(port),
+                                                     VSPROP_PORT_MIRROR_SESSIONS)
+                         .value()
+                         .value;
+  auto const session = simhost::record_at<DVMirrorSession>(
+      simhost::BytesView(table).subspan(sizeof(DVMirrorSessionTable)));
+  EXPECT_EQ(session.encapType, DVMIRROR_ENCAP_ERSPAN2);
+  EXPECT_EQ(qex_uint32{session.greKey}, 9U);
+  EXPECT_EQ(qex_uint16{session.encapVlan}, 30);
+  EXPECT_EQ(qex_uint16{session.erspanID}, 4);
+  EXPECT_EQ(session.erspanCOS, 1);
+  EXPECT_EQ(session.erspanGra, 2);
+  EXPECT_EQ(qex_uint32{session.flags}, 1U | 2U | 4U | 8U | 64U);
+  EXPECT_EQ(qex_uint16{session.wildIn}, VS_DVMIRROR_WILDCARD_PNIC);
+  EXPECT_EQ(qex_uint16{session.wildOut}, VS_DVMIRROR_WILDCARD_VMM | VS_DVMIRROR_WILDCARD_TEST);
+  EXPECT_EQ(session.uplinkFilter, MIRROR_UPLINK_FILTER_VXLAN);
+  EXPECT_EQ(session.stack, 1);
+}
+
+TEST_F(Scenario, WhatANamedFormCannotBeIsToldByItsPath) {
+  EXPECT_EQ(refusal_in_port(R"("vlan": 4095)"), "switches[0].ports[0].vlan: 4095 is above 4094");
+  EXPECT_EQ(refusal_in_port(R"("vlan": {"trunk": ["12"]})"),
+            "switches[0].ports[0].vlan.trunk[0]: must be a number or a range such as \"10-12\", 0 "
+            "to 4094");
+  EXPECT_EQ(refusal_in_port(R"("vlan": {"trunk": [20, "10-12"]})"),
+            "switches[0].ports[0].vlan: the host refuses it: Bad parameter (QEX_BAD_PARAM)");
+  EXPECT_EQ(refusal_in_port(R"("vlan": {"id": 9, "private": true})"),
+            "switches[0].ports[0].vlan: the host refuses it: Bad VLAN id "
+            "(QEX_BAD_VLANID)");
+  EXPECT_EQ(refusal_in_port(R"("vlan": {"tag": 9})"), "switches[0].ports[0].vlan.tag: unknown key");
+  EXPECT_EQ(refusal_in_port(R"("forbids": ["all"])"),
+            "switches[0].ports[0].forbids[0]: 'all' is none of promiscuous, mac_changes, "
+            "forged_transmits");
+  EXPECT_EQ(refusal_in_switch(R"("private_vlans": [{"primary": 1, "secondary": 1}])"),
+            "switches[0].private_vlans[0]: 'type' is missing");
+  EXPECT_EQ(refusal_in_port(R"("ethernet_filter": {"addresses": ["10.0.0.1"]})"),
+            "switches[0].ports[0].ethernet_filter.addresses[0]: must be six bytes such as "
+            "02:00:00:00:00:01");
+  EXPECT_EQ(refusal_in_port(R"("alias": ")" + std::string(81, 'x') + "\""),
+            "switches[0].ports[0].alias: has more than 80 bytes");
 }
 
 TEST_F(Scenario, NamesThatAreNoUtf8AreDescribedByAReplacement) {

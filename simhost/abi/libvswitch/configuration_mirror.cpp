@@ -21,8 +21,8 @@ QEX_ReturnStatus VSDVS_GetDVMirrorSessions(char const *switchName, char const *p
     auto const target = port_of(switch_called(switchName), port);
     auto &output = require(table);
     auto &transaction = call.transaction();
-    auto const bytes =
-        simhost::mirror_sessions_of(transaction, simhost::get_target(transaction, target));
+    auto const bytes = simhost::effective_bytes(transaction, simhost::mirror::sessions,
+                                                simhost::owner_of(transaction, target));
     output = simhost::allocate<DVMirrorSessionTable>(call, bytes);
   });
 }
@@ -31,9 +31,9 @@ QEX_ReturnStatus VSDVS_AppendDVMirrorSessions(char const *switchName, char const
                                               DVMirrorSessionTable *table) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
-    auto const bytes = simhost::mirror_table_bytes(require(table));
+    auto const bytes = simhost::mirror::table_bytes(require(table));
     auto &transaction = call.transaction();
-    simhost::append_mirror_sessions(transaction, simhost::get_target(transaction, target), bytes);
+    simhost::mirror::append_sessions(transaction, simhost::get_target(transaction, target), bytes);
   });
 }
 
@@ -43,7 +43,7 @@ QEX_ReturnStatus VSDVS_RemoveDVMirrorSession(char const *switchName, char const 
     auto const target = port_of(switch_called(switchName), port);
     auto const name = require_text(sid);
     auto &transaction = call.transaction();
-    simhost::remove_mirror_session(transaction, simhost::get_target(transaction, target), name);
+    simhost::mirror::remove_session(transaction, simhost::get_target(transaction, target), name);
   });
 }
 

@@ -3,7 +3,7 @@
 #include <string>
 
 #include "abi/targets.h"
-#include "model/policies.h"
+#include "model/teaming/properties.h"
 #include "vswitch/configuration.h"
 #include "vswitch/properties.h"
 
@@ -21,7 +21,7 @@ using simhost::switch_identified;
 namespace {
 
 constexpr RecordProperty<VSTeamPolicy> kSwitchTeaming{.key = VSPROP_SWITCH_TEAMING,
-                                                      .unset = simhost::kDefaultTeaming};
+                                                      .unset = simhost::teaming::of_switch.unset};
 constexpr RecordProperty<qex_Bool> kTxUplink{.key = VSPROP_PORT_TX_UPLINK, .unset = 0};
 
 // What a port uses: its own policy, or else its switch's.

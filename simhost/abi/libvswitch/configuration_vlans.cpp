@@ -19,14 +19,11 @@ namespace {
 
 constexpr RecordProperty<qex_Bool> kNestedTag{.key = VSPROP_PORT_VLAN_NESTEDTAG, .unset = 0};
 
-// No list has more entries than there are VLANs.
-constexpr int kMostEntries = 4096;
-
 // An array of the caller; refuses null with a count, and a count that nothing can have, before that
 // much is read (QEX_BAD_PARAM).
 template <typename Entry>
 std::span<Entry const> array(Entry const *first, int count) {
-  if (count < 0 || count > kMostEntries || (first == nullptr && count != 0)) {
+  if (count < 0 || count > simhost::vlans::kNumbers || (first == nullptr && count != 0)) {
     simhost::refuse(QEX_BAD_PARAM);
   }
   return {first, static_cast<std::size_t>(count)};
@@ -43,9 +40,9 @@ QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *por
     auto &policy_output = require(policy);
     auto &priority_output = require(priority);
     auto &transaction = call.transaction();
-    auto const found = simhost::get_target(transaction, target);
-    auto const bytes = simhost::vlan_policy_of(transaction, found);
-    priority_output = simhost::priority_of(transaction, found);
+    auto const owner = simhost::owner_of(transaction, target);
+    auto const bytes = simhost::effective_bytes(transaction, simhost::vlans::of_port, owner);
+    priority_output = simhost::effective(transaction, simhost::vlans::priority, owner);
     policy_output = simhost::allocate<VSPortVlanPolicy>(call, bytes);
   });
 }
@@ -56,13 +53,14 @@ QEX_ReturnStatus VSDVS_SetPortVLANPolicy(char const *switchName, char const *por
                                          qex_uint16 numRanges) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
-    simhost::VlanSpec const spec{.vlan = vlanID,
-                                 .priority = priority,
-                                 .guest_tagging = guestTagging != 0,
-                                 .private_vlan = privateVlan != 0,
-                                 .ranges = array(ranges, numRanges)};
+    auto const trunk = array(ranges, numRanges);
+    simhost::vlans::PortVlans const wanted{.vlan = vlanID,
+                                           .priority = priority,
+                                           .guest_tagging = guestTagging != 0,
+                                           .private_vlan = privateVlan != 0,
+                                           .ranges = {trunk.begin(), trunk.end()}};
     auto &transaction = call.transaction();
-    simhost::set_vlans(transaction, simhost::get_target(transaction, target), spec);
+    simhost::set_vlans(transaction, simhost::get_target(transaction, target), wanted);
   });
 }
 

@@ -1,50 +1,17 @@
 // Reading the tables that the ports hold.
 #include "model/mirror/running.h"
 
-#include <algorithm>
-#include <cstring>
 #include <optional>
 #include <set>
-#include <span>
+#include <utility>
 
 #include "base/bytes.h"
+#include "model/mirror/properties.h"
 #include "model/properties/properties.h"
-#include "vswitch/port_policies.h"
-#include "vswitch/properties.h"
+#include "model/security/properties.h"
 
 namespace simhost {
 namespace {
-
-// The records from the first on; those of them that are there.
-template <typename Record>
-std::vector<Record> records(std::span<std::byte const> bytes, std::size_t first,
-                            std::size_t count) {
-  auto const there = bytes.size() / sizeof(Record);
-  auto const begin = std::min(first, there);
-  std::vector<Record> found(std::min(count, there - begin));
-  if (!found.empty()) {
-    std::memcpy(found.data(), &bytes[begin * sizeof(Record)], found.size() * sizeof(Record));
-  }
-  return found;
-}
-
-void append_sessions(std::vector<MirrorSession> &sessions, storage::Port const &port,
-                     std::span<std::byte const> table) {
-  DVMirrorSessionTable head;
-  if (table.size() < sizeof head) {
-    return;
-  }
-  std::memcpy(&head, table.data(), sizeof head);
-  auto const rest = table.subspan(sizeof head);
-  auto const records_found = records<DVMirrorSession>(rest, 0, head.numSessions);
-  auto const entities = rest.subspan(records_found.size() * sizeof(DVMirrorSession));
-  for (auto const &record : records_found) {
-    sessions.push_back({.port = port,
-                        .record = record,
-                        .destinations = records<DVMirrorEntity>(entities, record.startIdx,
-                                                                record.numDstEntities)});
-  }
-}
 
 std::optional<storage::Port> port_named_by(storage::Transaction &transaction,
                                            storage::SwitchKey key, DVMirrorEntity const &entity) {
@@ -61,9 +28,9 @@ std::optional<storage::Port> port_named_by(storage::Transaction &transaction,
 }
 
 bool may_be_promiscuous(storage::Transaction &transaction, storage::Port const &port) {
-  RecordProperty<VSPropSecurity> const security{.key = VSPROP_PORT_SECURITY, .unset = {}};
   auto const owner = storage::PropertyOwner::port(port.switch_key, port.number);
-  return (read(transaction, owner, security).flags & VSPORT_SECURITY_DISALLOW_PROMISC) == 0;
+  auto const forbidden = effective(transaction, security::forbids, owner).flags;
+  return (forbidden & VSPORT_SECURITY_DISALLOW_PROMISC) == 0;
 }
 
 }  // namespace
@@ -85,8 +52,9 @@ std::vector<MirrorSession> mirrors_of(storage::Transaction &transaction, storage
   std::vector<MirrorSession> sessions;
   for (auto const &port : storage::ports_of(transaction, key)) {
     auto const owner = storage::PropertyOwner::port(key, port.number);
-    if (auto const table = get_property(transaction, owner, VSPROP_PORT_MIRROR_SESSIONS)) {
-      append_sessions(sessions, port, table->value);
+    for (auto &session : effective(transaction, mirror::sessions, owner).sessions) {
+      sessions.push_back(
+          {.port = port, .record = session.record, .destinations = std::move(session.to)});
     }
   }
   return sessions;

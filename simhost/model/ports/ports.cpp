@@ -8,9 +8,9 @@
 
 #include "base/outcomes.h"
 #include "model/lookup.h"
+#include "model/ports/properties.h"
 #include "model/properties/properties.h"
 #include "qexapi/switch_ports.h"
-#include "qexapi/switch_properties.h"
 #include "storage/store.h"
 #include "storage/switches.h"
 #include "vswitch/teaming.h"
@@ -19,8 +19,6 @@
 namespace simhost {
 namespace {
 
-constexpr std::size_t kLongestIdentifier = QEX_NEB_PORT_ID_MAX_LEN - 1;
-constexpr std::size_t kLongestName = QEX_NEB_NAME_MAX_LEN - 1;
 static_assert(QEX_NEB_PORT_ALIAS_MAX_LEN == QEX_NEB_NAME_MAX_LEN,
               "an uplink port's alias is its name");
 
@@ -192,13 +190,11 @@ storage::Port get_uplink_port(storage::Transaction &transaction, storage::Switch
 }
 
 DVSPortType type_of(storage::Transaction &transaction, storage::Port const &port) {
-  return read(transaction, owner_of(port),
-              RecordProperty<DVSPortType>{QEX_NEBPROP_PORT_TYPE, DVSPORT_TYPE_ACTIVE});
+  return static_cast<DVSPortType>(effective(transaction, ports::type, owner_of(port)));
 }
 
 std::uint32_t connect_id_of(storage::Transaction &transaction, storage::Port const &port) {
-  return read(transaction, owner_of(port),
-              RecordProperty<std::uint32_t>{QEX_NEBPROP_PORT_CONNECTID, 0});
+  return effective(transaction, ports::connection, owner_of(port));
 }
 
 std::vector<DVPortData> ports_of_type(storage::Transaction &transaction,
@@ -215,8 +211,7 @@ std::vector<DVPortData> ports_of_type(storage::Transaction &transaction,
 }
 
 std::optional<std::string> alias_of(storage::Transaction &transaction, storage::Port const &port) {
-  auto const property = get_property(transaction, owner_of(port), QEX_NEBPROP_PORT_ALIAS);
-  return property ? std::optional(text_of(property->value)) : std::nullopt;
+  return find_value(transaction, ports::alias, owner_of(port));
 }
 
 std::vector<UplinkPort> named_uplink_ports(storage::Transaction &transaction,
@@ -230,9 +225,6 @@ std::vector<UplinkPort> named_uplink_ports(storage::Transaction &transaction,
 
 void check_port_alias(Setting const &setting) {
   auto const alias = text_of(setting.value);
-  if (alias.size() > kLongestName) {
-    throw Refused(QEX_NAME_TOO_LONG);
-  }
   auto const port =
       storage::find_port(setting.transaction, setting.owner.port_number.value()).value();
   if (port.kind != storage::PortKind::uplink) {
@@ -260,8 +252,8 @@ void set_uplink_ports(storage::Transaction &transaction, storage::SwitchKey swit
     auto const port = uplink_port(transaction, switch_key, identifier);
     if (name_of(transaction, port) != name) {
       // They are right together, if not one after the other: two may exchange their names.
-      storage::put_property(transaction, owner_of(port), QEX_NEBPROP_PORT_ALIAS,
-                            bytes_of_text(name), storage::PropertyType::config);
+      storage::put_property(transaction, owner_of(port), ports::alias.key, bytes_of_text(name),
+                            ports::alias.type);
     }
   }
 }

@@ -9,11 +9,16 @@
 
 #include "base/api.h"
 #include "base/bytes.h"
-#include "model/properties/keys.h"
+#include "model/properties/descriptor.h"
 #include "nebpublic/ports.h"
+#include "qexapi/switch_ports.h"
 #include "storage/ports.h"
 
 namespace simhost {
+
+/// Bytes of names, without the NUL that callers have room for.
+inline constexpr std::size_t kLongestIdentifier = QEX_NEB_PORT_ID_MAX_LEN - 1;
+inline constexpr std::size_t kLongestName = QEX_NEB_NAME_MAX_LEN - 1;
 
 /// Adds a port for a client. Refuses an empty identifier (QEX_BAD_PARAM), one of more than 47 bytes
 /// (QEX_NAME_TOO_LONG), one that is taken (QEX_EXISTS), and a port past the switch's limit
@@ -64,7 +69,7 @@ SIMHOST_API std::vector<UplinkPort> named_uplink_ports(storage::Transaction &tra
 /// The rules of QEX_NEBPROP_PORT_ALIAS: refuses a text that is too long (QEX_NAME_TOO_LONG), and
 /// for an uplink port no name (QEX_BAD_PARAM) and the name of another one of its switch
 /// (QEX_EXISTS).
-void check_port_alias(Setting const &setting);
+SIMHOST_API void check_port_alias(Setting const &setting);
 /// Makes the uplink ports of a switch those, known by their identifiers: new ones are added without
 /// an uplink, those left out are removed and their uplinks set free, the others keep theirs.
 /// Refuses empty names (QEX_BAD_PARAM), long ones (QEX_NAME_TOO_LONG), a name or an identifier
@@ -92,8 +97,8 @@ SIMHOST_API Bytes read_uplink_names(storage::Transaction &transaction,
 SIMHOST_API Bytes read_uplink_ids(storage::Transaction &transaction,
                                   storage::PropertyOwner const &owner);
 /// Names for the uplink ports in their order; further ones add ports, missing ones remove ports.
-void write_uplink_names(Setting const &setting);
+SIMHOST_API void write_uplink_names(Setting const &setting);
 /// The identifiers that the uplink ports are to have; new ports are named after theirs.
-void write_uplink_ids(Setting const &setting);
+SIMHOST_API void write_uplink_ids(Setting const &setting);
 
 }  // namespace simhost

@@ -5,10 +5,10 @@
 #include "model/lookup.h"
 #include "model/plane.h"
 #include "model/ports/ports.h"
+#include "model/ports/properties.h"
 #include "model/properties/properties.h"
 #include "qexapi/links.h"
 #include "qexapi/switch_ports.h"
-#include "qexapi/switch_properties.h"
 
 namespace simhost {
 namespace {
@@ -30,8 +30,8 @@ Attached attached_to(storage::Transaction &transaction, storage::Port const &por
             .link_up = uplink && running_plane().link_is_up(transaction, *uplink)};
   }
   auto const owner = owner_of(port);
-  bool const client = get_property(transaction, owner, QEX_NEBPROP_PORT_VNIC_CONNECTEE).has_value();
-  auto const side = storage::find_property(transaction, owner, QEX_NEBPROP_PORT_LINK_STATUS);
+  bool const client = find_value(transaction, ports::client, owner).has_value();
+  auto const side = storage::find_property(transaction, owner, ports::link.key);
   bool const side_up = !side || record_of<qex_uint32>(side->value) == QEX_LINK_STATE_UP;
   return {.in_use = client, .link_up = client && side_up};
 }
@@ -41,8 +41,7 @@ Attached attached_to(storage::Transaction &transaction, storage::Port const &por
 Bytes read_port_status(storage::Transaction &transaction, storage::PropertyOwner const &owner) {
   auto const port = get_port_key(transaction, owner);
   auto const attached = attached_to(transaction, port);
-  bool const blocked =
-      read(transaction, owner, RecordProperty<qex_Bool>{QEX_NEBPROP_PORT_BLOCK, 0}) != 0;
+  bool const blocked = effective(transaction, ports::blocked, owner) != 0;
   qex_NEBPortStatus status{};
   status.flags = (attached.in_use ? qex_uint64{QEX_NEBPORT_STATUS_INUSE} : 0U) |
                  (attached.link_up ? qex_uint64{QEX_NEBPORT_STATUS_LINKUP} : 0U) |
@@ -64,8 +63,8 @@ void write_link_status(Setting const &setting) {
   if (get_port_key(setting.transaction, setting.owner).kind == storage::PortKind::uplink) {
     throw Refused(QEX_READ_ONLY);
   }
-  storage::put_property(setting.transaction, setting.owner, QEX_NEBPROP_PORT_LINK_STATUS,
-                        setting.value, storage::PropertyType::runtime);
+  storage::put_property(setting.transaction, setting.owner, ports::link.key, setting.value,
+                        ports::link.type);
 }
 
 Bytes read_port_statistics(storage::Transaction &transaction, storage::PropertyOwner const &owner) {

@@ -12,9 +12,9 @@ namespace {
 
 constexpr std::size_t kLongestKey = 255;
 
-// The key, if it has a meaning for such an owner.
-PropertyKey const *key_of(storage::PropertyOwner const &owner, std::string_view name) {
-  auto const *const key = find_property_key(name);
+// The setting of that key, if such an owner has it.
+Descriptor const *find_meant(storage::PropertyOwner const &owner, std::string_view name) {
+  auto const *const key = find_descriptor(name);
   return key != nullptr && key->scope == owner.scope ? key : nullptr;
 }
 
@@ -25,15 +25,29 @@ void check_key(storage::PropertyOwner const &owner, std::string_view name) {
   if (name.size() > kLongestKey) {
     throw Refused(QEX_NAME_TOO_LONG);
   }
-  auto const *const key = find_property_key(name);
-  if (key != nullptr && key->scope != owner.scope) {
+  auto const *const known = find_descriptor(name);
+  if (known != nullptr && known->scope != owner.scope) {
     throw Refused(QEX_BAD_PARAM);
   }
 }
 
 storage::Property computed(storage::Transaction &transaction, storage::PropertyOwner const &owner,
-                           PropertyKey const &key) {
-  return {.type = key.type, .value = key.read(transaction, owner)};
+                           Descriptor const &descriptor) {
+  return {.type = descriptor.type, .value = descriptor.read(transaction, owner)};
+}
+
+void put(storage::Transaction &transaction, Descriptor const &descriptor,
+         storage::PropertyOwner const &owner, BytesView value, storage::PropertyType type) {
+  if (descriptor.is_read_only()) {
+    throw Refused(QEX_READ_ONLY);
+  }
+  Setting const setting{.transaction = transaction, .owner = owner, .value = value};
+  check_bytes(descriptor, setting);
+  if (descriptor.is_computed()) {
+    descriptor.write(setting);
+  } else {
+    storage::put_property(transaction, owner, descriptor.key, value, type);
+  }
 }
 
 bool by_name(storage::NamedProperty const &left, storage::NamedProperty const &right) {
@@ -57,26 +71,17 @@ storage::PropertyType property_type(std::uint32_t number) {
 void set_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
                   std::string_view key, BytesView value, storage::PropertyType type) {
   check_key(owner, key);
-  auto const *const known = key_of(owner, key);
+  auto const *const known = find_meant(owner, key);
   if (known == nullptr) {
     storage::put_property(transaction, owner, key, value, type);
     return;
   }
-  Setting const setting{.transaction = transaction, .owner = owner, .value = value};
-  if (known->read != nullptr && known->write == nullptr) {
-    throw Refused(QEX_READ_ONLY);
-  }
-  known->check(setting);
-  if (known->write != nullptr) {
-    known->write(setting);
-  } else {
-    storage::put_property(transaction, owner, key, value, type);
-  }
+  put(transaction, *known, owner, value, type);
 }
 
 void set_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
                   std::string_view key, BytesView value) {
-  auto const *const known = key_of(owner, key);
+  auto const *const known = find_meant(owner, key);
   if (known == nullptr) {
     throw Refused(QEX_BAD_PARAM);
   }
@@ -86,8 +91,8 @@ void set_property(storage::Transaction &transaction, storage::PropertyOwner cons
 std::optional<storage::Property> get_property(storage::Transaction &transaction,
                                               storage::PropertyOwner const &owner,
                                               std::string_view key) {
-  auto const *const known = key_of(owner, key);
-  if (known != nullptr && known->read != nullptr) {
+  auto const *const known = find_meant(owner, key);
+  if (known != nullptr && known->is_computed()) {
     return computed(transaction, owner, *known);
   }
   return storage::find_property(transaction, owner, key);
@@ -98,12 +103,13 @@ std::vector<storage::NamedProperty> list_properties(storage::Transaction &transa
   auto all = storage::properties_of(transaction, owner);
   // Of a key that is read elsewhere, what is stored is only a part of the value.
   std::erase_if(all, [&](storage::NamedProperty const &property) {
-    auto const *const key = key_of(owner, property.name);
-    return key != nullptr && key->read != nullptr;
+    auto const *const key = find_meant(owner, property.name);
+    return key != nullptr && key->is_computed();
   });
-  for (auto const &key : property_keys()) {
-    if (key.scope == owner.scope && key.read != nullptr) {
-      all.push_back({.name = std::string(key.name), .property = computed(transaction, owner, key)});
+  for (auto const *const known : descriptors()) {
+    if (known->scope == owner.scope && known->is_computed()) {
+      all.push_back(
+          {.name = std::string(known->key), .property = computed(transaction, owner, *known)});
     }
   }
   std::sort(all.begin(), all.end(), by_name);
@@ -125,8 +131,8 @@ std::optional<storage::NamedProperty> next_property(storage::Transaction &transa
 
 void clear_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
                     std::string_view key) {
-  auto const *const known = key_of(owner, key);
-  if (known != nullptr && known->read != nullptr) {
+  auto const *const known = find_meant(owner, key);
+  if (known != nullptr && known->is_computed()) {
     throw Refused(QEX_READ_ONLY);
   }
   if (!storage::remove_property(transaction, owner, key)) {
@@ -137,6 +143,31 @@ void clear_property(storage::Transaction &transaction, storage::PropertyOwner co
 void reset_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
                     std::string_view key) {
   storage::remove_property(transaction, owner, key);
+}
+
+std::optional<Bytes> find_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
+                                storage::PropertyOwner const &owner) {
+  if (descriptor.is_computed()) {
+    return descriptor.read(transaction, owner);
+  }
+  auto property = storage::find_property(transaction, owner, descriptor.key);
+  return property ? std::optional(std::move(property->value)) : std::nullopt;
+}
+
+Bytes effective_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
+                      storage::PropertyOwner const &owner) {
+  if (auto own = find_bytes(transaction, descriptor, owner)) {
+    return *std::move(own);
+  }
+  return descriptor.inherited == nullptr
+             ? descriptor.default_bytes()
+             : effective_bytes(transaction, *descriptor.inherited,
+                               storage::PropertyOwner::global(owner.switch_key));
+}
+
+void set_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
+               storage::PropertyOwner const &owner, BytesView value) {
+  put(transaction, descriptor, owner, value, descriptor.type);
 }
 
 }  // namespace simhost

@@ -7,7 +7,8 @@
 
 #include "base/api.h"
 #include "base/bytes.h"
-#include "model/properties/keys.h"
+#include "model/properties/descriptor.h"
+#include "model/properties/registry.h"
 #include "storage/properties.h"
 
 namespace simhost {
@@ -45,6 +46,45 @@ SIMHOST_API void clear_property(storage::Transaction &transaction,
 /// Likewise, but it need not be set.
 SIMHOST_API void reset_property(storage::Transaction &transaction,
                                 storage::PropertyOwner const &owner, std::string_view key);
+
+/// Likewise of a setting that is known: its bytes, if it is set or computed.
+SIMHOST_API std::optional<Bytes> find_bytes(storage::Transaction &transaction,
+                                            Descriptor const &descriptor,
+                                            storage::PropertyOwner const &owner);
+/// Those that hold: what is set, what the port's switch has instead, or else the default.
+SIMHOST_API Bytes effective_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
+                                  storage::PropertyOwner const &owner);
+/// Sets it, with the type that typed calls give it.
+SIMHOST_API void set_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
+                           storage::PropertyOwner const &owner, BytesView value);
+
+/// The value of a setting, if it is set.
+template <typename Value>
+std::optional<Value> find_value(storage::Transaction &transaction, Property<Value> const &property,
+                                storage::PropertyOwner const &owner) {
+  auto const bytes = find_bytes(transaction, property, owner);
+  return bytes ? std::optional(Codec<Value>::value(*bytes)) : std::nullopt;
+}
+
+/// The value that holds, set or not.
+template <typename Value>
+Value effective(storage::Transaction &transaction, Property<Value> const &property,
+                storage::PropertyOwner const &owner) {
+  return Codec<Value>::value(effective_bytes(transaction, property, owner));
+}
+
+/// Sets a value; refuses one that the property may not have.
+template <typename Value>
+void set(storage::Transaction &transaction, Property<Value> const &property,
+         storage::PropertyOwner const &owner, std::type_identity_t<Value> const &value) {
+  set_bytes(transaction, property, owner, Codec<Value>::bytes(value));
+}
+
+/// Clears a setting, which need not be set.
+inline void clear(storage::Transaction &transaction, Descriptor const &descriptor,
+                  storage::PropertyOwner const &owner) {
+  reset_property(transaction, owner, descriptor.key);
+}
 
 /// A property that is one record, and what stands for it while it is not set.
 template <typename Record>

@@ -9,10 +9,10 @@
 #include "model/lookup.h"
 #include "model/ports/ports.h"
 #include "model/properties/properties.h"
+#include "model/switches/properties.h"
 #include "model/switches/switches.h"
 #include "storage/store.h"
 #include "storage/switches.h"
-#include "vswitch/properties.h"
 
 namespace simhost {
 namespace {
@@ -114,7 +114,7 @@ void read_switch(Reader &reader, storage::Transaction &transaction) {
                                                .version = version,
                                                .associated = associated});
   // A new switch has an MTU, and one that was written may not.
-  reset_property(transaction, PropertyOwner::global(key), VSPROP_MTU);
+  clear(transaction, switches::mtu, PropertyOwner::global(key));
   read_properties(reader, transaction, PropertyOwner::global(key));
   read_properties(reader, transaction, PropertyOwner::host(key));
   for (auto left = reader.number(); left != 0; --left) {

@@ -11,12 +11,12 @@
 #include "model/lookup.h"
 #include "model/ports/ports.h"
 #include "model/properties/properties.h"
+#include "model/switches/properties.h"
+#include "model/vlans/properties.h"
 #include "storage/properties.h"
 #include "storage/store.h"
 #include "storage/switches.h"
-#include "vswitch/device.h"
 #include "vswitch/mirror.h"
-#include "vswitch/properties.h"
 
 namespace simhost {
 namespace {
@@ -24,19 +24,7 @@ namespace {
 using storage::PropertyOwner;
 using storage::SwitchName;
 
-constexpr std::uint32_t kDefaultMaxPorts = 128;
-constexpr std::uint32_t kGreatestMaxPorts = 65535;
-constexpr std::uint32_t kDefaultMtu = 1500;
 constexpr std::uint32_t kDefaultVersion = VS_YKT_NEB_VERSION_20;
-
-// Bytes without the terminating NUL: what the fixed texts of the callers' records have room for.
-constexpr std::size_t kLongestAlias = sizeof(VSInfo::dvsName) - 1;
-constexpr std::size_t kLongestIdentifier = sizeof(VSInfo::nebID) - 1;
-constexpr std::size_t kLongestPortset = VS_PORTSET_NAME_MAX - 1;
-
-// VLAN 0 is "untagged" and 4095 is reserved.
-constexpr std::uint16_t kLeastVlan = 1;
-constexpr std::uint16_t kGreatestVlan = 4094;
 
 void check_length(std::string_view name, std::size_t longest) {
   if (name.size() > longest) {
@@ -79,7 +67,7 @@ std::string fresh_portset(storage::Transaction &transaction) {
 
 storage::Switch row_of(storage::Transaction &transaction, SwitchSpec const &spec) {
   check_alias(spec.alias);
-  check_length(spec.identifier, kLongestIdentifier);
+  check_length(spec.identifier, kLongestSwitchIdentifier);
   check_length(spec.portset, kLongestPortset);
   auto const max_ports = or_default(spec.max_ports, kDefaultMaxPorts);
   if (max_ports > kGreatestMaxPorts) {
@@ -93,8 +81,6 @@ storage::Switch row_of(storage::Transaction &transaction, SwitchSpec const &spec
           .persistent = spec.persistent,
           .associated = spec.associated};
 }
-
-constexpr RecordProperty<std::uint32_t> kMtu{.key = VSPROP_MTU, .unset = kDefaultMtu};
 
 void attach_free_uplinks(storage::Transaction &transaction, storage::SwitchKey key,
                          std::uint32_t count) {
@@ -118,7 +104,8 @@ storage::SwitchKey create_switch(storage::Transaction &transaction, SwitchSpec c
   if (!key) {
     throw Refused(QEX_EXISTS);
   }
-  write(transaction, PropertyOwner::global(*key), kMtu, or_default(spec.mtu, kDefaultMtu));
+  set(transaction, switches::mtu, PropertyOwner::global(*key),
+      or_default(spec.mtu, switches::mtu.unset));
   attach_free_uplinks(transaction, *key, spec.uplink_count);
   return *key;
 }
@@ -156,19 +143,20 @@ void change_max_ports(storage::Transaction &transaction, storage::SwitchKey key,
 
 void set_mtu(storage::Transaction &transaction, std::string_view alias, std::uint32_t mtu) {
   auto const owner = PropertyOwner::global(get_switch(transaction, alias).key);
-  write(transaction, owner, kMtu, mtu);
+  set(transaction, switches::mtu, owner, mtu);
 }
 
 std::uint32_t mtu_of(storage::Transaction &transaction, std::string_view alias) {
-  return read(transaction, PropertyOwner::global(get_switch(transaction, alias).key), kMtu);
+  auto const owner = PropertyOwner::global(get_switch(transaction, alias).key);
+  return effective(transaction, switches::mtu, owner);
 }
 
 VSInfo switch_info(storage::Transaction &transaction, std::string_view alias) {
   auto const [key, row] = get_running_switch(transaction, alias);
   VSInfo info{};
-  info.mtu = read(transaction, PropertyOwner::global(key), kMtu);
-  info.minValidVlan = kLeastVlan;
-  info.maxValidVlan = kGreatestVlan;
+  info.mtu = effective(transaction, switches::mtu, PropertyOwner::global(key));
+  info.minValidVlan = vlans::kLeast;
+  info.maxValidVlan = vlans::kGreatest;
   info.activePorts = storage::count_ports(transaction, key, storage::PortKind::client);
   info.maxPorts = row.max_ports;
   put_text(info.dvsName, row.alias);

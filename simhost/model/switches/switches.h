@@ -8,15 +8,21 @@
 #include <vector>
 
 #include "base/api.h"
-#include "model/properties/keys.h"
+#include "model/properties/descriptor.h"
 #include "storage/ports.h"
+#include "vswitch/device.h"
 #include "vswitch/switch_info.h"
 
 namespace simhost {
 
-/// MTUs in bytes.
-inline constexpr std::uint32_t kLeastMtu = 1280;
-inline constexpr std::uint32_t kGreatestMtu = 9190;
+/// Ports of a switch, uplink ports not counted.
+inline constexpr std::uint32_t kDefaultMaxPorts = 128;
+inline constexpr std::uint32_t kGreatestMaxPorts = 65535;
+
+/// Bytes of names, without the NUL that the fixed texts of the callers' records have room for.
+inline constexpr std::size_t kLongestAlias = sizeof(VSInfo::dvsName) - 1;
+inline constexpr std::size_t kLongestSwitchIdentifier = sizeof(VSInfo::nebID) - 1;
+inline constexpr std::size_t kLongestPortset = VS_PORTSET_NAME_MAX - 1;
 
 /// What a new switch is to be. An empty identifier or portset and a 0 leave the choice to the host.
 struct SwitchSpec {
@@ -70,10 +76,13 @@ SIMHOST_API std::vector<storage::AttachedUplink> uplinks_of(storage::Transaction
 
 /// The values of QEX_NEBPROP_SWITCH_ALIAS, QEX_NEBPROP_SWITCH_VERSION and QEX_NEBPROP_HOST_PROXY,
 /// which are names and a number of the switch; the first two can be set.
-Bytes read_alias(storage::Transaction &transaction, storage::PropertyOwner const &owner);
-Bytes read_version(storage::Transaction &transaction, storage::PropertyOwner const &owner);
-Bytes read_portset(storage::Transaction &transaction, storage::PropertyOwner const &owner);
-void write_alias(Setting const &setting);
-void write_version(Setting const &setting);
+SIMHOST_API Bytes read_alias(storage::Transaction &transaction,
+                             storage::PropertyOwner const &owner);
+SIMHOST_API Bytes read_version(storage::Transaction &transaction,
+                               storage::PropertyOwner const &owner);
+SIMHOST_API Bytes read_portset(storage::Transaction &transaction,
+                               storage::PropertyOwner const &owner);
+SIMHOST_API void write_alias(Setting const &setting);
+SIMHOST_API void write_version(Setting const &setting);
 
 }  // namespace simhost

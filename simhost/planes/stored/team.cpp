@@ -7,8 +7,8 @@
 #include "base/bytes.h"
 #include "model/lookup.h"
 #include "model/options/runtime_options.h"
-#include "model/policies.h"
 #include "model/ports/ports.h"
+#include "model/teaming/properties.h"
 #include "planes/stored/policies.h"
 #include "qexapi/switch_properties.h"
 #include "vswitch/properties.h"
@@ -112,7 +112,7 @@ Team team_of(storage::Transaction &transaction, storage::SwitchKey key) {
             .lags = storage::all_lags(transaction, key),
             .policy = policy<VSTeamPolicy>(transaction, storage::PropertyOwner::global(key),
                                            VSPROP_SWITCH_TEAMING)
-                          .value_or(kDefaultTeaming),
+                          .value_or(teaming::of_switch.unset),
             .now = clock_now(transaction),
             .up_delay = ClockTime(runtime_number(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY))};
   for (auto const &[name, number] : storage::uplinks_of(transaction, key)) {

@@ -1,0 +1,19 @@
+// Values as documents say them: what a form tells, in both directions.
+#pragma once
+
+#include "model/properties/form.h"
+#include "scenario/document.h"
+
+namespace simhost::scenario {
+
+/// Makes the object what a document says; what is not said stays. Throws DocumentError for what is
+/// no such value.
+void read(Form const &form, Node const &node, void *object);
+
+/// What documents say of the object.
+Json to_json(Form const &form, void const *object);
+
+/// What there is to say: kinds, bounds and words, and the defaults that members have in the object.
+Json form_to_json(Form const &form, void const *defaults);
+
+}  // namespace simhost::scenario
