@@ -64,7 +64,7 @@ Host *new_host() {
 
 }  // namespace
 
-storage::Store &Host::state() {
+std::optional<storage::StateFile> const &Host::state_file() {
   if (!configured_) {
     if (char const *const named = std::getenv("SIMHOST_STATE");
         named != nullptr && *named != '\0') {
@@ -72,11 +72,16 @@ storage::Store &Host::state() {
     }
     configured_ = true;
   }
+  return state_file_;
+}
+
+storage::Store &Host::state() {
+  auto const &file = state_file();
   if (state_ && !state_->is_current()) {
     state_.reset();
   }
   if (!state_) {
-    state_.emplace(state_file_, populate_fresh_host);
+    state_.emplace(file, populate_fresh_host);
   }
   return *state_;
 }

@@ -19,8 +19,10 @@ class Host {
   Ledger &ledger() { return ledger_; }
   Handles &handles() { return handles_; }
   DataLists &lists() { return lists_; }
-  /// The state; opened on first use, from the file that SIMHOST_STATE names then, or in memory.
-  /// Throws storage::UnusableState.
+  /// The file of the state, the one that SIMHOST_STATE names when it is first asked for or used;
+  /// none in memory. Throws storage::UnusableState.
+  std::optional<storage::StateFile> const &state_file();
+  /// The state; opened on first use. Throws storage::UnusableState.
   storage::Store &state();
   /// Closes a state file; state() opens it again. A state in memory stays.
   void close_state_file();

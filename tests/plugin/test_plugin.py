@@ -3,6 +3,7 @@
 import os
 import re
 import subprocess
+import sys
 import textwrap
 from pathlib import Path
 
@@ -393,6 +394,63 @@ def test_makes_no_host_anew_that_others_may_use(
         "SIMHOST_STATE names /nowhere/host.db, a host that the test would make anew: unset it."
         " The fixture shared_host gives each test a host in a file of its own."
     )
+
+
+FIXES_ITS_FILE = """
+import os
+os.environ["SIMHOST_STATE"] = {file!r}
+import _libvswitch as vs
+assert vs.VSDVS_CreateVSwitch("kept", None, None, 64, 1, 0, 0, 0) == vs.QEX_OK
+{then}
+"""
+
+
+@pytest.mark.parametrize(
+    "then", ['del os.environ["SIMHOST_STATE"]', 'os.environ["SIMHOST_STATE"] = ""']
+)
+def test_nor_when_the_environment_has_changed_since(
+    pytester: pytest.Pytester, tmp_path: Path, then: str
+) -> None:
+    file = tmp_path / "shared.db"
+    pytester.makeconftest(FIXES_ITS_FILE.format(file=str(file), then=then))
+    result = run(pytester, USES_A_HOST.format(fixture="host"))
+    result.assert_outcomes(passed=1, errors=1)
+    assert section(result, "ERROR at setup of test_uses_a_host") == (
+        f"the host of this process is kept in {file}, which the test would make anew:"
+        " SIMHOST_STATE named it when the host was first used, before this test."
+    )
+    shown = subprocess.run(
+        [Path(os.environ["BUILD_DIR"], "simhost", "simhostctl"), f"--state={file}", "show"],
+        capture_output=True,
+        text=True,
+    )
+    assert shown.returncode == 0 and "kept" in shown.stdout
+
+
+def test_the_library_tells_its_file_once_and_for_all(tmp_path: Path) -> None:
+    code = """
+import os
+from simhost._loaded import LoadedControl
+control = LoadedControl()
+{asked}
+os.environ["SIMHOST_STATE"] = {file!r}
+print(control.state_file())
+try:
+    control.reset(empty=False)
+except Exception as error:
+    print(type(error).__name__)
+"""
+    file = str(tmp_path / "shared.db")
+    answers = []
+    for asked in ("control.state_file()", ""):
+        done = subprocess.run(
+            [sys.executable, "-c", code.format(asked=asked, file=file)],
+            capture_output=True,
+            text=True,
+        )
+        answers.append(done.stdout.split())
+    assert answers == [["None"], [file, "HostRefused"]]
+    assert not Path(file).exists()
 
 
 def test_what_the_shell_has_chosen_is_not_under_test(

@@ -321,6 +321,14 @@ TEST(HostPanicCall, TakesNullForNothing) {
   EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
 }
 
+TEST(Simulated, TellsThatItsStateIsInMemory) {
+  std::string text = "anything";
+  EXPECT_EQ(simhost_state_file(text.data(), text.size()), 0);
+  EXPECT_EQ(text[0], '\0');
+  EXPECT_STREQ(simhost_error(), "");
+  EXPECT_EQ(simhost_state_file(nullptr, 0), 0);
+}
+
 TEST(Simulated, HasAVersion) {
   EXPECT_THAT(simhost_version(), testing::MatchesRegex("[0-9]+\\.[0-9]+\\.[0-9]+"));
 }

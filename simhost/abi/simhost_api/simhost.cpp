@@ -145,6 +145,19 @@ SIMHOST_API char const *simhost_error() {
   return last_error.c_str();
 }
 
+SIMHOST_API size_t simhost_state_file(char *text, size_t size) {
+  last_error.clear();
+  try {
+    auto &host = simhost::this_host();
+    std::scoped_lock const held(host.lock());
+    auto const &file = host.state_file();
+    return copy_out(file ? file->name().string() : std::string(), text, size);
+  } catch (...) {
+    failure();
+    return copy_out(std::string(), text, size);
+  }
+}
+
 SIMHOST_API int simhost_apply(char const *document) {
   return changing([&](ChangingTransaction &transaction) {
     simhost::scenario::apply(transaction, given(document));

@@ -34,6 +34,17 @@ int simhost_apply(char const *document);
  */
 size_t simhost_describe(char *text, size_t size);
 
+/**
+ * The file that holds the state of this process's host, absolute: the one that SIMHOST_STATE named
+ * when the host was first used or asked for it, whatever it names by now.
+ *
+ * @param text receives as much as fits and a NUL, empty for a state in memory; null if `size` is 0
+ * @param size bytes at `text`
+ * @return bytes of the whole name without its NUL; 0 for a state in memory, and if it failed, which
+ *         simhost_error() tells
+ */
+size_t simhost_state_file(char *text, size_t size);
+
 /** Restarts the host: what is volatile, learned or counted goes, and switches not persistent. */
 int simhost_restart(void);
 

@@ -13,7 +13,7 @@ class HostRefused(Exception):
 
 
 class Control(abc.ABC):
-    """The functions of abi/simhost_api/simhost.h. Each raises HostRefused with the host's own words.
+    """The functions of abi/simhost_api/simhost.h; each raises HostRefused with the host's words.
 
     Times are milliseconds.
     """

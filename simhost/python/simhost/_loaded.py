@@ -21,6 +21,7 @@ _SIGNATURES = {
     "simhost_error": (_TEXT, []),
     "simhost_apply": (_STATUS, [_TEXT]),
     "simhost_describe": (_SIZE, [_TEXT, _SIZE]),
+    "simhost_state_file": (_SIZE, [_TEXT, _SIZE]),
     "simhost_restart": (_STATUS, []),
     "simhost_reset": (_STATUS, []),
     "simhost_clock_now": (_MILLISECONDS, []),
@@ -56,7 +57,22 @@ class LoadedControl(Control):
     def __init__(self) -> None:
         self._library = _library()
 
+    def state_file(self) -> Optional[Path]:
+        """The file in which the host of this process is kept, whatever the environment says by now;
+        None for a host in memory."""
+        name = self._text("state_file")
+        refusal = self._refusal()
+        if str(refusal):
+            raise refusal
+        return Path(name) if name else None
+
     def reset(self, *, empty: bool) -> None:
+        file = self.state_file()
+        if file is not None:
+            raise HostRefused(
+                f"the host of this process is kept in {file}, which other processes may use and a"
+                " reset would empty: SIMHOST_STATE named it when the host was first used"
+            )
         with _fresh_hosts_are(EMPTY if empty else None):
             self._do("reset")
 
@@ -118,7 +134,7 @@ class LoadedControl(Control):
             # Another thread may have made it longer in between.
             size = write(text, len(text))
             if size < len(text):
-                return text.value.decode()
+                return os.fsdecode(text.value)
 
     def _refusal(self) -> HostRefused:
         return HostRefused(self._library.simhost_error().decode())

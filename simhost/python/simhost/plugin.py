@@ -74,6 +74,7 @@ def host(request: pytest.FixtureRequest, scenario: Optional[Document]) -> Iterat
             " The fixture shared_host gives each test a host in a file of its own.",
             pytrace=False,
         )
+    _refuse_shared_state()
     may_leave = _may_leave_memory(request)
     host = _made(Host, _scenario(request, scenario), request.path.parent)
     watch = request.node.stash[_WATCH] = _Watch(host, may_leave)
@@ -81,6 +82,22 @@ def host(request: pytest.FixtureRequest, scenario: Optional[Document]) -> Iterat
     # The next test may not ask for a host; it has nothing to do with what happened on this one.
     LoadedControl().reset(empty=False)
     watch.end_of_teardown()
+
+
+def _refuse_shared_state() -> None:
+    """The library has fixed its file when it was first used; the environment may say another."""
+    try:
+        file = LoadedControl().state_file()
+    except NotSimulated as error:
+        pytest.fail(str(error), pytrace=False)
+    except HostRefused as error:
+        pytest.fail(f"the host of this process cannot be used: {error}", pytrace=False)
+    if file is not None:
+        pytest.fail(
+            f"the host of this process is kept in {file}, which the test would make anew:"
+            " SIMHOST_STATE named it when the host was first used, before this test.",
+            pytrace=False,
+        )
 
 
 @pytest.fixture
