@@ -35,4 +35,48 @@ std::function<std::string(std::string const &)> whole_number(std::uint64_t least
   };
 }
 
+std::function<std::string(std::string const &)> decimal_number() {
+  return [](std::string const &text) -> std::string {
+    static constexpr std::size_t kDigits = 12;
+    static constexpr std::size_t kDecimals = 3;
+    auto const point = text.find('.');
+    auto const decimals = point == std::string::npos ? "0" : text.substr(point + 1);
+    bool const is_decimal = are_digits(text.substr(0, point)) && are_digits("1" + decimals) &&
+                            !decimals.empty() && decimals.size() <= kDecimals;
+    if (!is_decimal) {
+      return fmt::format("'{}' is no number such as 3 or 0.25", text);
+    }
+    return text.substr(0, point).size() > kDigits
+               ? fmt::format("{} has more than {} digits", text, kDigits)
+               : "";
+  };
+}
+
+std::string text_of(nlohmann::ordered_json const &document) {
+  try {
+    return document.dump();
+  } catch (nlohmann::ordered_json::exception const &) {
+    throw Failure("a word is no UTF-8");
+  }
+}
+
+std::string printable(std::string_view text) {
+  std::string shown;
+  for (std::size_t at = 0; at < text.size(); ++at) {
+    auto const byte = static_cast<unsigned char>(text[at]);
+    // The second set of control characters has this byte first.
+    bool const is_second_set = byte == 0xC2 && at + 1 < text.size() &&
+                               static_cast<unsigned char>(text[at + 1]) >= 0x80 &&
+                               static_cast<unsigned char>(text[at + 1]) < 0xA0;
+    if (is_second_set) {
+      shown += fmt::format("\\xc2\\x{:02x}", static_cast<unsigned char>(text[++at]));
+    } else if (byte < 0x20 || byte == 0x7F) {
+      shown += fmt::format("\\x{:02x}", byte);
+    } else {
+      shown += text[at];
+    }
+  }
+  return shown;
+}
+
 }  // namespace simhost::cli

@@ -6,8 +6,11 @@
 #include <cstdint>
 #include <functional>
 #include <limits>
+#include <memory>
+#include <nlohmann/json.hpp>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 
 #include "abi/simhost_api/simhost.h"
 
@@ -35,6 +38,20 @@ inline std::int64_t milliseconds(double seconds) {
 /// What is wrong with a text that has to be a whole number in digits; empty if nothing is.
 std::function<std::string(std::string const &)> whole_number(
     std::uint64_t least = 0, std::uint64_t greatest = std::numeric_limits<std::uint64_t>::max());
+
+/// Likewise for a number of up to twelve digits and three decimals.
+std::function<std::string(std::string const &)> decimal_number();
+
+/// What a command was given, which lives as long as the app does whose callbacks keep it.
+template <typename Words>
+std::shared_ptr<Words> words_of_command() {
+  return std::make_shared<Words>();
+}
+
+/// A document as text; fails for words that are no UTF-8.
+std::string text_of(nlohmann::ordered_json const &document);
+/// A text for a terminal: control characters as \xNN.
+std::string printable(std::string_view text);
 
 /// The whole host as a document.
 std::string description();

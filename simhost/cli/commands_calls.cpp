@@ -16,28 +16,18 @@ constexpr std::string_view kCallTable =
 #include "call_table.inc"
     ;
 
-FaultWords given_fault;
-
-void add_fault_options(CLI::App &add) {
+void add_fault_options(CLI::App &add, FaultWords &fault) {
   constexpr auto kMost = std::numeric_limits<std::uint32_t>::max();
-  auto &fault = given_fault;
-  fault = {.function = "",
-           .nth = 1,
-           .times = 1,
-           .status = "",
-           .exception = "",
-           .message = "",
-           .delay = 0};
   add.add_option("function", fault.function, "such as VSDVS_SetMTU")->required();
   add.add_option("--nth", fault.nth, "the first call that is hit; 1, the next, unless given")
       ->check(whole_number(1, kMost));
   add.add_option("--times", fault.times, "how many are hit; 0 for all that follow, 1 unless given")
       ->check(whole_number(0, kMost));
-  auto *const status = add.add_option("--status", fault.status, "answer this, such as QEX_BUSY");
-  add.add_option("--exception", fault.exception, "spring the trap with this type, such as OSError")
+  auto *const status = add.add_option("--status", fault.status, "return this, such as QEX_BUSY");
+  add.add_option("--exception", fault.exception, "trap with this type, such as OSError")
       ->excludes(status);
   add.add_option("--message", fault.message, "the text of the exception");
-  add.add_option("--delay", fault.delay, "wait so many seconds first")->check(CLI::Range(0.0, 1e6));
+  add.add_option("--delay", fault.delay, "wait so many seconds first")->check(decimal_number());
 }
 
 void add_fault(CLI::App &app) {
@@ -48,16 +38,17 @@ void add_fault(CLI::App &app) {
       "  simhostctl fault add VSDVS_SetMTU --nth 2 --status QEX_BUSY\n"
       "  simhostctl fault add VSQEX_GetUplinks --exception OSError --message 'it is gone'");
   auto *const add = fault->add_subcommand("add", "Add a fault");
-  add_fault_options(*add);
+  auto const given = words_of_command<FaultWords>();
+  add_fault_options(*add, *given);
   // Through a document, because that knows statuses by their names and reads several effects.
-  add->callback([] { check(simhost_apply(fault_document(given_fault).c_str())); });
+  add->callback([given] { check(simhost_apply(fault_document(*given).c_str())); });
   fault->add_subcommand("list", "List the faults that are waiting")->callback([] {
     std::cout << fault_list(description());
   });
   auto *const clear = fault->add_subcommand("clear", "Remove faults");
-  static std::string function;
-  clear->add_option("function", function, "of this function; all unless given");
-  clear->callback([] { check(simhost_clear_faults(or_null(function))); });
+  auto const function = words_of_command<std::string>();
+  clear->add_option("function", *function, "of this function; all unless given");
+  clear->callback([function] { check(simhost_clear_faults(or_null(*function))); });
 }
 
 void show_calls() {
@@ -73,11 +64,11 @@ void show_calls() {
 
 void add_calls(CLI::App &app) {
   auto *const calls = app.add_subcommand("calls", "List the host's calls, modelled or not");
-  static bool json = false;
-  calls->add_flag("--json", json, "as a list of objects");
+  auto const json = words_of_command<bool>();
+  calls->add_flag("--json", *json, "as a list of objects");
   calls->footer("Needs no host. The table is made from the libraries when they are built.");
-  calls->callback([] {
-    if (json) {
+  calls->callback([json] {
+    if (*json) {
       std::cout << kCallTable;
     } else {
       show_calls();

@@ -22,21 +22,21 @@ void add_clock(CLI::App &app) {
       "Real time until it is stopped, stepped or set; stopped and stepped, ageing is exact:\n"
       "  simhostctl clock stop\n"
       "  simhostctl clock step 299.999");
-  static double seconds = 0;
+  auto const seconds = words_of_command<double>();
   clock->add_subcommand("show", "Show what it shows, in seconds since the beginning of 1970")
       ->callback(show_clock);
   clock->add_subcommand("stop", "Stop it")->callback([] { check(simhost_clock_stop()); });
   clock->add_subcommand("run", "Let it run on")->callback([] { check(simhost_clock_run()); });
   auto *const step = clock->add_subcommand("step", "Move it forward, whether or not it runs");
-  step->add_option("seconds", seconds, "with up to three decimals")
+  step->add_option("seconds", *seconds, "with up to three decimals")
       ->required()
-      ->check(CLI::Range(0.0, 1e12));
-  step->callback([] { check(simhost_clock_step(milliseconds(seconds))); });
+      ->check(decimal_number());
+  step->callback([seconds] { check(simhost_clock_step(milliseconds(*seconds))); });
   auto *const set = clock->add_subcommand("set", "Set it");
-  set->add_option("seconds", seconds, "since the beginning of 1970")
+  set->add_option("seconds", *seconds, "since the beginning of 1970")
       ->required()
-      ->check(CLI::Range(0.0, 1e12));
-  set->callback([] { check(simhost_clock_set(milliseconds(seconds))); });
+      ->check(decimal_number());
+  set->callback([seconds] { check(simhost_clock_set(milliseconds(*seconds))); });
 }
 
 }  // namespace

@@ -29,7 +29,7 @@ void add_commands(CLI::App &app) {
   simhost::cli::add_call_commands(app);
 }
 
-// Whether a command is still to come behind the words that were understood.
+// Whether a command is still to come after the words that were understood.
 bool lacks_command(CLI::App const &app) {
   auto const chosen = app.get_subcommands();
   return chosen.empty() ? app.get_require_subcommand_min() > 0 : lacks_command(*chosen.back());
@@ -59,12 +59,12 @@ int run(CLI::App &app, int count, char **words) {
     return app.exit(help_or_version);
   } catch (CLI::ParseError const &error) {
     std::fprintf(stderr, "simhostctl: %s\nRun with --help for more information.\n",
-                 complaint(app, error).c_str());
+                 simhost::cli::printable(complaint(app, error)).c_str());
     return kWrongUsage;
   }
 }
 
-// A command whose answer was lost, on a full disk say, has not done what it was asked for.
+// A command whose output was lost, on a full disk say, has not done what it was asked for.
 void write_out() {
   if (std::fflush(stdout) != 0 || std::ferror(stdout) != 0) {
     throw simhost::cli::Failure("the output cannot be written");
@@ -81,6 +81,6 @@ int main(int count, char **words) try {
   write_out();
   return status;
 } catch (std::exception const &error) {
-  std::fprintf(stderr, "simhostctl: %s\n", error.what());
+  std::fprintf(stderr, "simhostctl: %s\n", simhost::cli::printable(error.what()).c_str());
   return 1;
 }

@@ -7,6 +7,8 @@
 #include <utility>
 #include <vector>
 
+#include "cli/commands.h"
+
 namespace simhost::cli {
 namespace {
 
@@ -21,7 +23,7 @@ struct Branch {
 void draw(std::string &text, std::vector<Branch> const &branches, std::string const &indent) {
   for (std::size_t at = 0; at < branches.size(); ++at) {
     bool const last = at + 1 == branches.size();
-    text += indent + (last ? "`-- " : "|-- ") + branches[at].line + "\n";
+    text += indent + (last ? "`-- " : "|-- ") + printable(branches[at].line) + "\n";
     draw(text, branches[at].branches, indent + (last ? "    " : "|   "));
   }
 }
@@ -226,14 +228,14 @@ std::string fault_document(FaultWords const &words) {
   if (words.delay > 0) {
     fault["delay"] = words.delay;
   }
-  return Json{{"faults", Json::array({fault})}}.dump();
+  return text_of(Json{{"faults", Json::array({fault})}});
 }
 
 std::string fault_list(std::string_view document) {
   auto const host = Json::parse(document);
   std::string text;
   for (auto const &fault : host["faults"]) {
-    text += fault_line(fault) + "\n";
+    text += printable(fault_line(fault)) + "\n";
   }
   return text;
 }

@@ -12,13 +12,13 @@ std::string tree(std::string_view document);
 
 /// A fault as the command line gives it; empty texts and 0 are no effect.
 struct FaultWords {
-  std::string function;
-  std::uint32_t nth;
-  std::uint32_t times;
-  std::string status;
-  std::string exception;
-  std::string message;
-  double delay;  ///< seconds
+  std::string function = {};
+  std::uint32_t nth = 1;
+  std::uint32_t times = 1;
+  std::string status = {};
+  std::string exception = {};
+  std::string message = {};
+  double delay = 0;  ///< seconds
 };
 
 /// The scenario document that adds a fault.

@@ -278,8 +278,14 @@ WRONG_WORDS = [
     ("link nic0 sideways", "state: sideways not in {up,down}"),
     (
         "fault add VSDVS_SetMTU --delay soon",
-        "--delay: Value soon not in range 0.000000 to 1000000.000000",
+        "--delay: 'soon' is no number such as 3 or 0.25",
     ),
+    ("fault add VSDVS_SetMTU --delay 0x10", "--delay: '0x10' is no number such as 3 or 0.25"),
+    ("fault add VSDVS_SetMTU --delay 1e3", "--delay: '1e3' is no number such as 3 or 0.25"),
+    ("clock step 1.2345", "seconds: '1.2345' is no number such as 3 or 0.25"),
+    ("clock set inf", "seconds: 'inf' is no number such as 3 or 0.25"),
+    ("clock step 1.", "seconds: '1.' is no number such as 3 or 0.25"),
+    ("clock set 1000000000000", "seconds: 1000000000000 has more than 12 digits"),
 ]
 
 
@@ -288,6 +294,27 @@ def test_wrong_words_are_named(host: Host, words: str, complaint: str) -> None:
     assert host.complaint(*words.split()) == complaint
     del host.environment["SIMHOST_STATE"]
     assert host.complaint(*words.split()) == complaint
+
+
+def test_shows_no_control_characters(host: Host) -> None:
+    host.apply({"switches": [{"alias": "red\x1b[31m", "ports": [{"id": "a\u009bb"}]}]})
+    shown = host.ctl("show")
+    assert "switch red\\x1b[31m: 1 of" in shown
+    assert "port a\\xc2\\x9bb" in shown
+    assert not re.search(r"[\x00-\x09\x0b-\x1f\x7f-\x9f]", shown)
+    assert "'red\\x1b'" in host.refusal("learn", "vswitch0", "red\x1b")
+    assert host.complaint("red\x1b") == "there is no command 'red\\x1b'"
+
+
+def test_words_that_are_no_utf_8_are_refused_in_words(host: Host) -> None:
+    for words in (["uplink", "nic\udcff"], ["fault", "add", "\udcff", "--status", "QEX_BUSY"]):
+        assert host.refusal(*words) == "simhostctl: a word is no UTF-8\n"
+
+
+def test_a_delay_is_bounded_by_the_host(host: Host) -> None:
+    refusal = host.refusal("fault", "add", "VSDVS_SetMTU", "--delay", "3600.001")
+    assert "a delay is an hour at most" in refusal
+    host.ctl("fault", "add", "VSDVS_SetMTU", "--delay", "3600")
 
 
 def test_tells_its_version_without_a_host(host: Host) -> None:
