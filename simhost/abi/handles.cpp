@@ -10,7 +10,7 @@
 namespace simhost {
 namespace {
 
-[[noreturn]] void give_up(char const *kind, void const *address) {
+[[noreturn]] void refuse_address(char const *kind, void const *address) {
   throw Trapped(TrapKind::runtime_error, std::string("the host never gave out the ") + kind + " " +
                                              text_of_address(address));
 }
@@ -46,7 +46,7 @@ Item *Handles::of_property(storage::PropertyOwner const &owner, storage::NamedPr
 storage::SwitchKey Handles::get_switch_key(void const *handle) const {
   auto const *const key = switches_.find_key(handle);
   if (key == nullptr) {
-    give_up("switch handle", handle);
+    refuse_address("switch handle", handle);
   }
   return *key;
 }
@@ -54,7 +54,7 @@ storage::SwitchKey Handles::get_switch_key(void const *handle) const {
 PortKey Handles::get_port_key(void const *handle) const {
   auto const *const key = ports_.find_key(handle);
   if (key == nullptr) {
-    give_up("port handle", handle);
+    refuse_address("port handle", handle);
   }
   return *key;
 }
@@ -62,7 +62,7 @@ PortKey Handles::get_port_key(void const *handle) const {
 Item &Handles::get_item(void const *item) const {
   auto const found = items_by_address_.find(item);
   if (found == items_by_address_.end()) {
-    give_up("item", item);
+    refuse_address("item", item);
   }
   return *found->second;
 }

@@ -38,7 +38,7 @@ std::filesystem::path absolute(std::filesystem::path const &named) {
   return file;
 }
 
-// Asked for by a test that wants to know what it forgot to give back.
+// Asked for by a test that wants to know what it forgot to release.
 void report_ledger(Ledger const &ledger) {
   char const *const asked = std::getenv("SIMHOST_LEDGER");
   if (asked != nullptr && std::string_view(asked) == "1" && ledger.count() > 0) {

@@ -1,4 +1,4 @@
-// Recording what is given out, and catching what comes back wrongly.
+// Recording what is allocated, and catching what is released wrongly.
 #include "abi/ledger.h"
 
 #include <fmt/format.h>

@@ -1,4 +1,4 @@
-// What the host has given out to its callers and not got back: memory, and lists.
+// What the host has allocated for its callers and they have not released: memory, and lists.
 #pragma once
 
 #include <cstddef>
@@ -13,13 +13,13 @@
 
 namespace simhost {
 
-/// Owns the blocks until they are given back. Names of calls are literals and are not copied.
+/// Owns the blocks until they are released. Names of calls are literals and are not copied.
 class Ledger {
  public:
-  /// Gives out `size` bytes of zeros in the name of `call`. Throws std::bad_alloc.
+  /// Allocates `size` bytes of zeros in the name of `call`. Throws std::bad_alloc.
   SIMHOST_API void *allocate(std::size_t size, char const *call);
-  /// Frees what was given out, whichever call gave it; null does nothing. Throws Trapped for a
-  /// pointer that was never given out, or is back already.
+  /// Frees what was allocated, whichever call did it; null does nothing. Throws Trapped for a
+  /// pointer that was never allocated, or is released already.
   SIMHOST_API void release(void *memory, char const *call);
 
   /// Notes that something of `size` bytes at `address` is out which is not the ledger's memory, and

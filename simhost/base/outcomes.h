@@ -43,7 +43,7 @@ class Refused : public std::runtime_error {
   KIND(type_error, TypeError)                      \
   KIND(value_error, ValueError)
 
-/// The exception types with which the host gives up: by itself with the first two.
+/// The exception types with which calls trap: by themselves with the first two.
 enum class TrapKind {
 #define SIMHOST_KIND(kind, type) kind,
   SIMHOST_TRAP_KINDS(SIMHOST_KIND)
@@ -58,7 +58,7 @@ std::string trap_types();
 /// Whether the trap's text begins with the name of the call.
 enum class TrapText { after_call, verbatim };
 
-/// The host gives up on the call: the call trap springs with what().
+/// The call traps with what().
 class Trapped : public std::runtime_error {
  public:
   Trapped(TrapKind kind, std::string const &message, TrapText text = TrapText::after_call)

@@ -18,7 +18,7 @@ using storage::WaitingFault;
 inline constexpr std::chrono::milliseconds kLongestDelay = std::chrono::hours(1);
 
 /// Refuses a function that the host does not have (QEX_NOT_FOUND); Panic, and a status for a call
-/// that answers none (QEX_NOT_SUPPORTED); an unknown exception, both a status and an exception, no
+/// that returns none (QEX_NOT_SUPPORTED); an unknown exception, both a status and an exception, no
 /// effect at all, calls that are none, and a delay that is negative or longer
 /// than kLongestDelay (QEX_BAD_PARAM).
 void add_fault(storage::Transaction &transaction, Fault const &fault);

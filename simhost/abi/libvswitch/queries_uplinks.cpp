@@ -17,7 +17,7 @@ using simhost::running_plane;
 
 namespace {
 
-// Answers `ask` about an uplink of a switch as a link state.
+// Stores what `ask` returns of an uplink of a switch as a link state.
 template <typename Ask>
 void link_state(ReadingCall &call, char const *switch_name, char const *uplink, int *state,
                 Ask const &ask) {
@@ -41,7 +41,7 @@ std::size_t size_of(simhost::Lag const &lag) {
   return sizeof(VSLAGStatus) + (lag.members.size() * sizeof(qex_Name));
 }
 
-// Writes a group and the names of its uplinks; returns what comes behind them.
+// Writes a group and the names of its uplinks; returns where the next one begins.
 std::byte *write_lag(std::byte *at, simhost::Lag const &lag) {
   VSLAGStatus status{};
   status.state = lag.up() ? QEX_LINK_STATE_UP : QEX_LINK_STATE_DOWN;

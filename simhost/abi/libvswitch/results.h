@@ -12,13 +12,13 @@
 
 namespace simhost {
 
-/// A record of zeros with room for `trailing` bytes behind it.
+/// A record of zeros with room for `trailing` bytes after it.
 template <typename Record>
 Record *allocate_record(Call &call, std::size_t trailing = 0) {
   return static_cast<Record *>(call.ledger().allocate(sizeof(Record) + trailing, call.name()));
 }
 
-/// A record that counts its entries and has them right behind it.
+/// A record that counts its entries and has them right after it.
 template <typename Record>
 Record *allocate_counted(Call &call, std::span<std::byte const> entries, std::size_t count) {
   auto *const record = allocate_record<Record>(call, entries.size());

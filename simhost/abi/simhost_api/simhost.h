@@ -1,7 +1,7 @@
 // What only a simulated host offers: libsimhost.so exports these, so that a program which finds one
 // of them knows that the host it talks to is simulated. For C, C++ and foreign-function interfaces.
 //
-// A function with an int result answers QEX_OK, or the status that says why it did nothing; then
+// A function with an int result returns QEX_OK, or the status that says why it did nothing; then
 // simhost_error() says it in words. None of them springs the call trap. Texts are NUL-terminated
 // UTF-8. Times are milliseconds.
 #ifndef SIMHOST_CONTROL_SIMHOST_H
@@ -95,7 +95,7 @@ int simhost_set_counter(char const *switchName, char const *port, char const *se
  * next; `times` is how many are, 0 for all that follow. Panic and QEX_ReturnStatusToString cannot
  * be hit. */
 
-/** The calls do nothing and answer a status; QEX_NOT_SUPPORTED for a function that answers none. */
+/** The calls do nothing and return a status; QEX_NOT_SUPPORTED for a function that returns none. */
 int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int status);
 
 /** The calls do nothing and spring the trap with an exception type such as "OSError", and a text.
@@ -105,20 +105,20 @@ int simhost_panic_call(char const *function, uint32_t nth, uint32_t times, char 
 
 /**
  * The calls wait so many milliseconds of real time, then do what they do; QEX_BAD_PARAM for more
- * than an hour. A thread that holds the interpreter's lock gives it up while it waits, so that other
- * threads run. A signal handler of the interpreter's runs during the wait, if it is the main thread
- * that waits; what it raises is raised by the call, which then does nothing.
+ * than an hour. A thread that holds the interpreter's lock gives it up while it waits, so that
+ * other threads run. A signal handler of the interpreter's runs during the wait, if it is the main
+ * thread that waits; what it raises is raised by the call, which then does nothing.
  */
 int simhost_delay_call(char const *function, uint32_t nth, uint32_t times, uint32_t milliseconds);
 
 /** Removes the faults of a function, or all for null; QEX_NOT_FOUND for no function of the host. */
 int simhost_clear_faults(char const *function);
 
-/* The ledger: memory and lists that the host gave out in this process. With SIMHOST_LEDGER=1 in the
- * environment, what is still out when the process ends is summed up on standard error. The size of
- * a list is what it takes with all that it holds, in whosever memory. */
+/* The ledger: memory and lists that the host allocated in this process. With SIMHOST_LEDGER=1 in
+ * the environment, what is still out when the process ends is summed up on standard error. The size
+ * of a list is what it takes with all that it holds, in whosever memory. */
 
-/** How many blocks of memory and lists the host has given out in this process and not got back. */
+/** How many blocks of memory and lists the host has allocated in this process and not released. */
 size_t simhost_ledger_count(void);
 
 /**
