@@ -147,3 +147,5 @@ PyObject *record_sizes(void) { return as_dict(sizes_of_records, LENGTH_OF(sizes_
 /* Where arrays lie in their records, as RECORD_field. */
 PyObject *array_offsets(void) { return as_dict(offsets_of_arrays, LENGTH_OF(offsets_of_arrays)); }
 %}
+
+%include "held.i"

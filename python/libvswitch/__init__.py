@@ -16,7 +16,7 @@ from importlib import import_module as _import_module
 from typing import Any as _Any
 from typing import List as _List
 
-_MODULES = ("cells", "doctor")
+_MODULES = ("cells", "checked", "doctor", "enums", "errors", "values")
 _PARTS = ("_constants", "_classes", "_calls")
 _BESIDE = {
     "_records": ("Record", "Table"),

@@ -212,6 +212,8 @@ class Record(_Pointing):
                 raise AttributeError(f"{type(self).__name__} has no field {name!r}")
             object.__setattr__(self, name, value)
 
+        __setattr__ = _pointers.attribute_setter(__setattr__)
+
     def __repr__(self) -> str:
         if not int(self):
             return f"<{type(self).__name__} that is gone>"
