@@ -1,0 +1,121 @@
+"""The layers of the simulated host: each compiles with those below it and with none above."""
+
+import json
+import os
+import re
+import shlex
+import subprocess
+from pathlib import Path
+from typing import Dict, List
+
+import pytest
+
+ROOT = Path(__file__).resolve().parents[3]
+BUILD = Path(os.environ.get("BUILD_DIR", ROOT / "build"))
+
+# A header of each layer, lowest first.
+HEADERS = {
+    "base": "base/outcomes.h",
+    "storage": "storage/store.h",
+    "clock": "clock/clock.h",
+    "faults": "faults/faults.h",
+    "model": "model/plane.h",
+    "planes": "planes/stored/stored_plane.h",
+    "scenario": "scenario/scenario.h",
+    "abi": "abi/host.h",
+    "cli": "cli/commands.h",
+}
+# What each may use.
+BELOW: Dict[str, List[str]] = {
+    "base": [],
+    "storage": ["base"],
+    "clock": ["base", "storage"],
+    "faults": ["base", "storage"],
+    "model": ["base", "storage", "clock"],
+    "planes": ["base", "storage", "clock", "model"],
+    "scenario": ["base", "storage", "clock", "faults", "model"],
+    "abi": ["base", "storage", "clock", "faults", "model", "planes", "scenario"],
+}
+PRIVATE = "storage/query.h"
+MOST_FILES = 25
+
+
+def command_of(layer: str) -> List[str]:
+    """The command that compiles a source of a layer, without the source and what it makes."""
+    # The sources of the host's two libraries stand in folders of their own within the edge.
+    source = re.compile(rf"/simhost/{layer}/(?!libvswitch|libnebPublic).*\.cpp$")
+    commands = json.loads((BUILD / "compile_commands.json").read_text(encoding="utf-8"))
+    entry = next(entry for entry in commands if source.search(entry["file"]))
+    words = shlex.split(entry["command"])
+    return words[: words.index("-o")]
+
+
+def compiled(layer: str, tmp_path: Path, *headers: str) -> "subprocess.CompletedProcess[str]":
+    probe = tmp_path / "probe.cpp"
+    lines = [f'#include "{header}"\n' for header in headers]
+    probe.write_text("".join(lines), encoding="utf-8")
+    command = [*command_of(layer), "-fsyntax-only", str(probe)]
+    return subprocess.run(command, cwd=BUILD, stderr=subprocess.PIPE, text=True, check=False)
+
+
+@pytest.mark.parametrize("layer", BELOW)
+def test_the_layers_below_are_found(layer: str, tmp_path: Path) -> None:
+    headers = [HEADERS[layer], *(HEADERS[below] for below in BELOW[layer])]
+    done = compiled(layer, tmp_path, *headers)
+    assert done.returncode == 0, done.stderr
+
+
+@pytest.mark.parametrize(
+    "layer, other",
+    [
+        (layer, other)
+        for layer, below in BELOW.items()
+        for other in HEADERS
+        if other != layer and other not in below
+    ],
+)
+def test_no_other_layer_is_found(layer: str, other: str, tmp_path: Path) -> None:
+    done = compiled(layer, tmp_path, HEADERS[other])
+    assert done.returncode != 0
+    assert f"{HEADERS[other]}: No such file or directory" in done.stderr
+
+
+def test_queries_are_the_storage_s_own(tmp_path: Path) -> None:
+    assert compiled("storage", tmp_path, PRIVATE).returncode == 0
+    for layer, below in BELOW.items():
+        if "storage" in below:
+            done = compiled(layer, tmp_path, PRIVATE)
+            assert f"{PRIVATE}: No such file or directory" in done.stderr, layer
+
+
+def tracked(*folders: str) -> List[Path]:
+    listed = subprocess.run(
+        ["git", "ls-files", "-z", *folders], cwd=ROOT, stdout=subprocess.PIPE, text=True, check=True
+    ).stdout
+    return [ROOT / name for name in listed.split("\0") if name]
+
+
+def upward_includes(text: str) -> List[str]:
+    return re.findall(r'^\s*#\s*include\s+"\.\.?/.*$', text, re.MULTILINE)
+
+
+def test_nothing_is_included_by_its_place() -> None:
+    """A path from the file itself would lead past the include paths of its layer."""
+    assert upward_includes('#include "../storage/query.h"\n') != []
+    sources = [path for path in tracked("simhost", "helpers", "include") if path.suffix != ".md"]
+    found = {
+        str(path): lines
+        for path in sources
+        if path.suffix in (".h", ".cpp", ".i") and path.exists()
+        for lines in [upward_includes(path.read_text(encoding="utf-8"))]
+        if lines
+    }
+    assert found == {}
+
+
+def test_folders_are_small_enough_to_look_through() -> None:
+    sizes: Dict[Path, int] = {}
+    for path in tracked("simhost"):
+        if path.exists():
+            sizes[path.parent] = sizes.get(path.parent, 0) + 1
+    assert {str(path): size for path, size in sizes.items() if size > MOST_FILES} == {}
