@@ -8,6 +8,7 @@ from stub_text import constants, doc, function
 
 _CLASSES_HEAD = '''"""The records of the host as classes."""
 
+import typing
 from typing import Any, Optional, Tuple, Union
 
 import _libvswitch as _flat
@@ -95,13 +96,30 @@ def _class(types: PythonTypes, record: Record) -> str:
         base = f"_by_hand.{record.base}"
     text = f"\nclass {record.name}({base}, _flat._{record.name}):\n{doc(record.doc, '    ')}"
     arguments = [("self", ""), *((one.name, types.argument(one)) for one in record.constructor)]
-    text += _method("__init__", arguments, "None", "")
+    text += _constructor(types, record) or _method("__init__", arguments, "None", "")
     text += "".join(_property(field, types.member(field)) for field in record.fields)
     methods = [one for one in record.methods if not one.is_by_hand]
     text += "".join(_method_of(types, record, one, element) for one in methods)
     if any(one.name == "__getitem__" for one in record.methods) and not record.count:
         text += "    __iter__: None  # an entry is no sequence\n"
     return text
+
+
+def _constructor(types: PythonTypes, record: Record) -> str:
+    """With a keyword for each field that can be set, where no size is to be given."""
+    written = [one for one in record.fields if one.is_writable]
+    if record.constructor or not written:
+        return ""
+    keywords = [(one.name, f"{_given(types.member(one))} = ...") for one in written]
+    return _method("__init__", [("self", ""), *keywords], "None", "").replace(
+        "self,", "self, *,", 1
+    )
+
+
+def _given(member: str) -> str:
+    """What a field takes from a constructor: of an array, also some elements."""
+    is_array = member.startswith("Array[")
+    return f"typing.Sequence[{member[len('Array['):]}" if is_array else member
 
 
 def _element(types: PythonTypes, record: Record) -> str:

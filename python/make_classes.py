@@ -98,6 +98,9 @@ def _constructor(known: Definitions, record: Record) -> List[str]:
     new = f"flat.new_{record.name}"
     if not names:
         body = [f"_records.attach(self, {new}())"]
+        if any(one.is_writable for one in record.fields):
+            names = ["**fields"]
+            body += ["if fields:", "    self._set(fields)"]
     elif record.count:
         body = _list_constructor(known, record, new)
     else:

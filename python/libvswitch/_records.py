@@ -229,6 +229,36 @@ class Record(_Pointing):
         except ValueError as error:
             return f"<{error}>"
 
+    def _set(self, fields: Dict[str, Any]) -> None:
+        """Sets the fields that a constructor is given; an array may be given its first elements."""
+        for name, value in fields.items():
+            if name not in self._fields:
+                known = ", ".join(self._fields)
+                raise TypeError(f"{type(self).__name__} has no field {name!r}, but {known}")
+            held = getattr(self, name) if isinstance(value, (list, tuple)) else None
+            if isinstance(held, typing.Sequence) and len(value) < len(held):
+                held[: len(value)] = value  # type: ignore[index]  # an Array, and no text
+            else:
+                setattr(self, name, value)
+
+    def asdict(self) -> Dict[str, Any]:
+        """The fields by name as values of Python's own: records as dicts, arrays as lists, bytes.
+
+        Entries of which only the caller knows the kind or the number are left out.
+        """
+        self._require()
+        shown = (name for name in self._fields if name not in self._alternatives)
+        values = ((name, _as_value(getattr(self, name))) for name in shown)
+        return {name: value for name, value in values if value is not _UNKNOWN}
+
+    def same_values(self, other: object) -> bool:
+        """Whether another record of the same class holds the same; == asks for the same memory."""
+        return (
+            isinstance(other, Record)
+            and type(other) is type(self)
+            and self.asdict() == other.asdict()
+        )
+
     def __copy__(self) -> "Record":
         """The same bytes in a record of the caller's own, where these are all of the record."""
         if self._name not in _layout.WHOLE_RECORDS:
@@ -341,3 +371,21 @@ def shown(value: Any) -> str:
     if isinstance(value, (int, str, bytes, _Pointing)) or value is None:
         return repr(value)
     return hex(int(value))
+
+
+_UNKNOWN = object()
+
+
+def _as_value(value: Any) -> Any:
+    if isinstance(value, Record):
+        return value.asdict()
+    if isinstance(value, (int, str, bytes)) or value is None:
+        return value
+    if not isinstance(value, typing.Sequence):
+        return int(value)
+    try:
+        elements = [_as_value(one) for one in value]
+    except TypeError:
+        return _UNKNOWN  # nobody told its length
+    is_bytes = value.__dict__["_element"] == "unsigned char" and not value.__dict__["_inner"]
+    return bytes(elements) if is_bytes else elements
