@@ -5,6 +5,8 @@ from dataclasses import dataclass
 from pathlib import Path
 from typing import Dict, List, Set, Tuple
 
+from libvswitch import _examined
+
 _MACHINES = {
     3: "i386",
     20: "powerpc",
@@ -18,6 +20,7 @@ _MACHINES = {
 _NEEDED, _RPATH, _RUNPATH = 1, 15, 29
 _DYNAMIC, _DYNSYM, _VERSYM = 6, 11, 0x6FFFFFFF
 _WEAK = 2
+_LONGEST_TEXT = 4096
 
 
 class NotElf(ValueError):
@@ -37,8 +40,10 @@ class Elf:
 
 def machine_of(path: Path) -> str:
     """The machine an ELF file is for; NotElf for any other file."""
-    with path.open("rb") as file:
-        head = file.read(20)
+    try:
+        head = _examined.read(path, 20)
+    except _examined.NotExamined as error:
+        raise NotElf(str(error)) from error
     if len(head) < 20 or head[:4] != b"\x7fELF":
         raise NotElf(f"{path} is no ELF file")
     if head[4] == 1:
@@ -51,10 +56,10 @@ def machine_of(path: Path) -> str:
 
 def read(path: Path) -> Elf:
     machine = machine_of(path)
-    held = path.read_bytes()
+    held = _examined.read(path)
     try:
         return _parse(path, machine, held)
-    except (struct.error, IndexError, ValueError) as error:
+    except (struct.error, IndexError, ValueError, OverflowError) as error:
         raise NotElf(f"{path} is damaged: {error}") from error
 
 
@@ -108,4 +113,4 @@ def _sections(held: bytes) -> List[Tuple[int, int, int, int]]:
 
 
 def _text(held: bytes, at: int) -> str:
-    return held[at : held.index(b"\0", at)].decode("ascii", "replace")
+    return held[at : held.index(b"\0", at, at + _LONGEST_TEXT)].decode("ascii", "replace")

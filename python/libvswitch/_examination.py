@@ -11,11 +11,12 @@ import platform
 import subprocess
 import sys
 import sysconfig
+import tempfile
 from importlib.machinery import EXTENSION_SUFFIXES, PathFinder
 from pathlib import Path
 from typing import Any, Dict, List, Optional, Set
 
-from libvswitch import _children, _elf, _loader
+from libvswitch import _children, _elf, _examined, _loader
 
 MODULE = "_libvswitch"
 HOST = ("libvswitch.so", "libnebPublic.so")
@@ -288,22 +289,36 @@ def _simulation(report: Report) -> None:
     report.add(OK, "simulation", f"{_STATE} {kept}")
     report.add(OK, "simulation", f"for a fresh host {_SCENARIO} is {fresh}")
 
-    environment = dict(os.environ)
-    if state and _can_be_made(Path(state)):
-        # A host that is examined in memory is not there afterwards.
-        del environment[_STATE]
     try:
-        done = _children.run(_children.CALLING, environment)
-        why = _children.end(done.returncode, done.stderr.decode("utf-8", "replace"))
-        answers = done.returncode == 0
-    except (OSError, subprocess.SubprocessError) as error:
-        why, answers = str(error), False
-    if answers:
+        with tempfile.TemporaryDirectory() as folder:
+            why = _first_call(state, scenario, Path(folder))
+    except (_examined.NotExamined, OSError, subprocess.SubprocessError) as error:
+        why = str(error)
+    if not why:
         report.add(OK, "simulation", "the host answers a call")
         return
     named = " and ".join(name for name, value in report.simulation.items() if value)
     advice = f"correct what {named} tells the host, or unset it" if named else _BUILD
     report.add(ERROR, "simulation", f"the host answers no call: {why}", advice)
+
+
+def _first_call(state: Optional[str], scenario: Optional[str], folder: Path) -> str:
+    """Why a host that is told so answers no call; empty if it does."""
+    environment = dict(os.environ)
+    if scenario and os.path.exists(scenario) and not os.path.isdir(scenario):
+        _examined.require_plain(Path(scenario))
+    copy = ""
+    if state and _can_be_made(Path(state)):
+        # A host that is examined in memory is not there afterwards.
+        del environment[_STATE]
+    elif state and os.path.exists(state) and not os.path.isdir(state):
+        copy = str(_examined.copy_of_state(Path(state), folder))
+        environment[_STATE] = copy
+    done = _children.run(_children.CALLING, environment)
+    if done.returncode == 0:
+        return ""
+    why = _children.end(done.returncode, done.stderr.decode("utf-8", "replace"))
+    return why.replace(copy, str(state)) if copy else why
 
 
 def _can_be_made(file: Path) -> bool:

@@ -241,6 +241,120 @@ def test_the_doctor_makes_no_host(tmp_path: Path, monkeypatch: pytest.MonkeyPatc
     assert list(tmp_path.iterdir()) == []
 
 
+def files_in(folder: Path) -> Dict[str, Tuple[bytes, int]]:
+    return {
+        str(one): (one.read_bytes(), one.stat().st_mtime_ns)
+        for one in sorted(folder.rglob("*"))
+        if one.is_file()
+    }
+
+
+def simhostctl(state: Path, *words: str) -> str:
+    done = subprocess.run(
+        [SIMHOST / "simhostctl", f"--state={state}", *words],
+        capture_output=True,
+        text=True,
+        check=True,
+    )
+    return done.stdout
+
+
+@pytest.mark.parametrize("held", [b"", b"x", b"no database"])
+def test_no_file_becomes_a_state(
+    tmp_path: Path, monkeypatch: pytest.MonkeyPatch, held: bytes
+) -> None:
+    monkeypatch.delenv("SIMHOST_SCENARIO", raising=False)
+    state = tmp_path / "host.db"
+    state.write_bytes(held)
+    before = files_in(tmp_path)
+    monkeypatch.setenv("SIMHOST_STATE", str(state))
+    found = report(run(FOLDER, "", "--json"))
+    assert files_in(tmp_path) == before
+    for one in found["findings"]:
+        if one["level"] == "error":
+            assert str(state) in one["text"], "the file that was asked about, not its copy"
+
+
+def test_no_fault_is_used_up(tmp_path: Path, monkeypatch: pytest.MonkeyPatch) -> None:
+    monkeypatch.delenv("SIMHOST_SCENARIO", raising=False)
+    state = tmp_path / "host.db"
+    fault = '{"faults": [{"call": "DVSState_SwitchFindByAlias", "exception": "OSError"}]}'
+    document = tmp_path / "faults.json"
+    document.write_text(fault, encoding="ascii")
+    simhostctl(state, "apply", str(document))
+    faults = json.loads(simhostctl(state, "show", "--json"))["faults"]
+    assert [one["call"] for one in faults] == ["DVSState_SwitchFindByAlias"]
+    before = files_in(tmp_path)
+    monkeypatch.setenv("SIMHOST_STATE", str(state))
+    run(FOLDER, "", "--json")
+    assert files_in(tmp_path) == before
+    assert json.loads(simhostctl(state, "show", "--json"))["faults"] == faults
+
+
+def huge(path: Path) -> None:
+    with path.open("wb") as file:
+        file.truncate(1 << 40)
+
+
+def pipe(path: Path) -> None:
+    os.mkfifo(path)
+
+
+def device(path: Path) -> None:
+    path.symlink_to("/dev/zero")
+
+
+ODD = [(huge, "has 1099511627776 bytes"), (pipe, "is no regular"), (device, "is no regular file")]
+
+
+@pytest.mark.parametrize("variable", ["SIMHOST_STATE", "SIMHOST_SCENARIO"])
+@pytest.mark.parametrize("make, why", ODD)
+def test_odd_files_end_in_a_finding(
+    tmp_path: Path, monkeypatch: pytest.MonkeyPatch, variable: str, make: Any, why: str
+) -> None:
+    for name in ("SIMHOST_STATE", "SIMHOST_SCENARIO"):
+        monkeypatch.delenv(name, raising=False)
+    make(tmp_path / "odd")
+    monkeypatch.setenv(variable, str(tmp_path / "odd"))
+    text, _ = simulated_error()
+    assert f"{tmp_path}/odd {why}" in text
+
+
+@pytest.mark.parametrize("make, why", ODD)
+def test_odd_libraries_end_in_a_finding(
+    elsewhere: Path, tmp_path: Path, make: Any, why: str
+) -> None:
+    host = tmp_path / "host"
+    host.mkdir()
+    for name in HOST:
+        make(host / name)
+    if make is not pipe:  # which the loader itself waits for
+        found = report(run(elsewhere, str(host), "--json"))
+        assert errors(found)[:2] == ["host", "host"] and why in text_of(found, "host")
+    with pytest.raises(_elf.NotElf, match=why):
+        _elf.read(host / HOST[0])
+
+
+def test_damaged_libraries_end_in_a_finding(tmp_path: Path) -> None:
+    """Any of its numbers may say anything."""
+    whole = (SIMHOST / HOST[1]).read_bytes()
+    file = tmp_path / HOST[1]
+    table = int.from_bytes(whole[40:48], "little")
+    places = [*range(40, 64, 2), *range(table, min(table + 1024, len(whole) - 8), 8)]
+    found = set()
+    for at in places:
+        for value in (b"\xff" * 8, b"\0" * 8, (1 << 62).to_bytes(8, "little")):
+            held = bytearray(whole)
+            held[at : at + 8] = value
+            file.write_bytes(held)
+            try:
+                _elf.read(file)
+                found.add("read")
+            except _elf.NotElf:
+                found.add("refused")
+    assert found == {"read", "refused"}
+
+
 def test_a_reader_that_leaves_early() -> None:
     environment = {**os.environ, "PYTHONPATH": str(FOLDER)}
     command = [sys.executable, "-m", "libvswitch.doctor"]
