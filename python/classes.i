@@ -4,6 +4,7 @@
 //
 //   %base(RECORD, Class)          the base of the record's class, in libvswitch/_by_hand.py
 //   %by_hand(METHOD)              the base has the method
+//   %helper(METHOD, function)     the function of helpers/ that the method is
 //   %within(METHOD, array)        its index is one of the array's
 //   %table(RECORD, count)         a record that is a sequence, and how many elements it has: a field
 //                                 or a number
@@ -19,6 +20,10 @@
 
 %define %by_hand(METHOD)
 %feature("by_hand", "1") METHOD;
+%enddef
+
+%define %helper(METHOD, FUNCTION)
+%feature("helper", "FUNCTION") METHOD;
 %enddef
 
 %define %within(METHOD, ARRAY)
@@ -121,5 +126,42 @@
 %feature("docstring") DVSAliasToPortsetName
 "Writes the name of the set of ports of the switch with an alias: a status and the text. With an
 array of the caller's as well, only the status.";
+
+// Which function of helpers/ a method is, where it is said what it does.
+%helper(qex_Name::__repr__, name_text)
+%helper(VSMACEntry::__getitem__, mac_entry_at)
+%helper(VSMACEntry::set_mac_address, mac_entry_set_address)
+%helper(VSMcastFilters::get_mac_entry, mcast_filters_mac_at)
+%helper(VSMcastFilters::get_ip_entry, mcast_filters_ipv4_at)
+%helper(VSMcastFilters::get_ipv6_entry, mcast_filters_ipv6_at)
+%helper(VSMcastFilterStats::get_ip_entry, mcast_filter_stats_ipv4_at)
+%helper(VSMcastFilterStats::get_ipv6_entry, mcast_filter_stats_ipv6_at)
+%helper(VSRuntimeOptionHeader::get_option_name, runtime_option_name)
+%helper(VSRuntimeOptionHeader::get_option_value, runtime_option_value)
+%helper(VSRuntimeOptions::add_int_option, runtime_options_add_int)
+%helper(VSRuntimeOptions::add_str_option, runtime_options_add_text)
+%helper(VSRuntimeOptions::set_options_length, runtime_options_set_length)
+%helper(VSRuntimeOptions::get_first_option, runtime_options_first)
+%helper(VSRuntimeOptions::get_next_option, runtime_options_next)
+%helper(DVMirrorEntity::next, mirror_next_entity)
+%helper(DVMirrorEntity::get_entity, mirror_entity_text)
+%helper(DVMirrorEntity::set_entity, mirror_set_entity_text)
+%helper(DVMirrorSessionTable::get_first_session, mirror_first_session)
+%helper(DVMirrorSessionTable::__getitem__, mirror_session_at)
+%helper(DVMirrorSessionTable::__setitem__, mirror_set_session_at)
+%helper(DVMirrorSessionTable::get_first_session_entity, mirror_entity_at)
+%helper(VSDVMirrorSessionIDs::__getitem__, mirror_session_ids_at)
+%helper(VSPromiscSessionActiveDsts::__getitem__, promisc_destination_at)
+%helper(VSPromiscSessionActiveDsts::__setitem__, promisc_set_destination_at)
+%helper(VSPvlanMapEntry::__getitem__, pvlan_entry_at)
+%helper(VSPortVlanPolicy::get_vid_range, vlan_policy_range_at)
+%helper(VSTeamPolicy::__getitem__, team_policy_name_at)
+%helper(VSTeamPolicy::__setitem__, team_policy_set_name_at)
+%helper(VSUplinks::__getitem__, uplinks_name_at)
+%helper(VSUplinks::__setitem__, uplinks_set_name_at)
+%helper(VSUplinkPorts::__getitem__, uplink_ports_name_at)
+%helper(VSUplinkPorts::__setitem__, uplink_ports_set_name_at)
+%helper(VSUplinkPortIds::__getitem__, uplink_port_ids_id_at)
+%helper(VSUplinkPortIds::__setitem__, uplink_port_ids_set_id_at)
 
 %include "libvswitch.i"

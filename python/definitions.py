@@ -81,7 +81,7 @@ class Function:
     answers: str = ""  # in Python, where the C type says nothing
     owns_elements: bool = False  # answers a new array
     null: str = ""  # when it answers null: "never", only on "failure", or in the course of things
-    body: str = ""  # of a method, in C
+    helper: str = ""  # of a method: the function of helpers/ that it is
     c_result: str = ""
     family: str = ""  # of a call of the host, as interface/calls names it
     is_by_hand: bool = False  # in the class's base
@@ -266,7 +266,7 @@ def _function(node: ET.Element, seen: _Attributes) -> Function:
         answers=seen.get("feature_answers", ""),
         owns_elements=seen.get("feature_new") == "1",
         null=seen.get("feature_null", ""),
-        body=seen.get("code", ""),
+        helper=seen.get("feature_helper", ""),
         c_result=_spelled_in_c(result),
         family=seen.get("feature_family", ""),
         is_by_hand=seen.get("feature_by_hand") == "1",

@@ -122,9 +122,8 @@ class Entries:
         raise KeyError(f"no header says anything of {name}")
 
     def of_method(self, record: Record, one: Function) -> Call:
-        called = re.search(r"(\w+)\(\$self", one.body)
-        if called is not None:
-            _, comment = self._said_of(called[1], None)
+        if one.helper:
+            _, comment = self._said_of(one.helper, None)
         elif one.name == "__len__":
             comment = comments.parted("How many entries the record says it has.")
         else:
