@@ -8,7 +8,8 @@
 #   --quick   a short run, to see that all works: its figures are rough, and it leaves out what is
 #             measured of whole modules
 #
-# Prints tables of ratios, and what the simulated host does in a second; leaves results.json,
+# Prints tables of ratios, of checked calls to checks by hand too, and what the simulated host does in
+# a second; leaves results.json,
 # calls.svg, host.json and host_curve.svg in build/bench/. bench/README.md says how it measures and
 # how to read it. On a machine with other work to do it takes longer, and ratios stay ratios.
 cmd_bench() {
@@ -26,6 +27,8 @@ cmd_bench() {
   build_peers ${full:+"$full"}
   step "Measuring the module and its peers"
   "$python" bench/run.py ${quick:+"$quick"} "$folder"
+  step "Measuring the checked calls"
+  PYTHONPATH=$root/$folder/python "$python" bench/checked.py ${quick:+"$quick"}
   step "Measuring the simulated host"
   "$python" bench/host_curve.py ${quick:+"$quick"} "$folder"
 }
