@@ -1,6 +1,7 @@
 // One row of the state says all about the clock.
 #include "clock/clock.h"
 
+#include <algorithm>
 #include <cstdint>
 
 #include "base/outcomes.h"
@@ -16,8 +17,9 @@ ClockTime real_time() {
   return std::chrono::duration_cast<ClockTime>(std::chrono::system_clock::now().time_since_epoch());
 }
 
+// At its end a clock stands, and before its beginning: it shows nothing that cannot be set.
 ClockTime shown_by(storage::ClockRow const &row) {
-  return row.stopped ? row.value : real_time() + row.value;
+  return std::clamp(row.stopped ? row.value : real_time() + row.value, ClockTime::zero(), kEnd);
 }
 
 }  // namespace

@@ -77,7 +77,7 @@ storage::Port get_port(storage::Transaction &transaction, storage::SwitchKey swi
 
 storage::Port get_running_port(storage::Transaction &transaction, storage::PortNumber number) {
   auto port = storage::find_port(transaction, number);
-  if (port && !storage::find_switch(transaction, port->switch_key).value().row.associated) {
+  if (port && !storage::get_switch_row(transaction, port->switch_key).row.associated) {
     port.reset();
   }
   return known(std::move(port), kNumbered, text_of(number));

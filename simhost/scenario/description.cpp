@@ -55,7 +55,7 @@ Json uplink_to_json(Transaction &transaction, storage::Uplink const &uplink) {
   if (uplink.port) {
     auto const port = get_port(transaction, *uplink.port);
     described["observed"] = {
-        {"switch", storage::find_switch(transaction, port.switch_key)->row.alias},
+        {"switch", storage::get_switch_row(transaction, port.switch_key).row.alias},
         {"port", port.identifier}};
   }
   return described;

@@ -70,6 +70,15 @@ std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key, Po
   return port && port->switch_key == switch_key ? std::move(port) : std::nullopt;
 }
 
+Port get_port_row(Transaction &transaction, PortNumber number) {
+  auto port = find_port(transaction, number);
+  if (!port) {
+    transaction.refuse("it has no port " + std::to_string(static_cast<std::uint32_t>(number)) +
+                       ", which is referred to");
+  }
+  return std::move(*port);
+}
+
 std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey switch_key,
                                              std::string_view external_id) {
   Query select(transaction, SELECT_PORT " WHERE switch = ? AND external_id = ?");

@@ -34,6 +34,8 @@ std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key,
 std::optional<Port> find_port(Transaction &transaction, PortNumber number);
 /// Likewise, of one switch only.
 std::optional<Port> find_port(Transaction &transaction, SwitchKey switch_key, PortNumber number);
+/// The port that another row says is there. Throws UnusableState if it is not.
+Port get_port_row(Transaction &transaction, PortNumber number);
 /// The port of a switch that another system knows by `external_id`.
 std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey switch_key,
                                              std::string_view external_id);

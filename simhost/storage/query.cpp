@@ -80,6 +80,11 @@ std::int64_t Query::integer(int column, std::int64_t least, std::int64_t greates
   return value;
 }
 
+std::chrono::milliseconds Query::time(int column) const {
+  constexpr std::int64_t kFarthest = std::int64_t{3} << 60;
+  return std::chrono::milliseconds(integer(column, -kFarthest, kFarthest));
+}
+
 std::string Query::text(int column) const {
   auto const value = statement_.getColumn(column);
   if (!value.isText()) {

@@ -3,6 +3,7 @@
 
 #include <SQLiteCpp/Statement.h>
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <limits>
@@ -60,6 +61,13 @@ class Query {
   }
   /// 0 or 1.
   [[nodiscard]] bool flag(int column) const { return integer(column, 0, 1) != 0; }
+  /// Of the host's clock: no sum or difference of two of them overflows.
+  [[nodiscard]] std::chrono::milliseconds time(int column) const;
+  /// One of an enumeration whose values are 0 to `last`.
+  template <typename Enum>
+  [[nodiscard]] Enum choice(int column, Enum last) const {
+    return static_cast<Enum>(integer(column, 0, static_cast<std::int64_t>(last)));
+  }
   /// Without a NUL in it.
   [[nodiscard]] std::string text(int column) const;
   [[nodiscard]] std::vector<std::byte> bytes(int column) const;

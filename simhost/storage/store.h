@@ -57,6 +57,8 @@ class Transaction {
 
   [[nodiscard]] Access access() const { return access_; }
   void commit();
+  /// Throws UnusableState, which names the file.
+  [[noreturn]] void refuse(std::string const &why) const { store_.refuse(why); }
 
   /// The key of the row that was inserted last.
   [[nodiscard]] std::int64_t last_key() const;

@@ -1,6 +1,8 @@
 // Switch rows in SQL.
 #include "storage/switches.h"
 
+#include <utility>
+
 #include "storage/query.h"
 
 namespace simhost::storage {
@@ -57,6 +59,15 @@ std::optional<FoundSwitch> find_switch(Transaction &transaction, SwitchName kind
 std::optional<FoundSwitch> find_switch(Transaction &transaction, SwitchKey key) {
   Query select(transaction, SELECT_SWITCH " WHERE key = ?");
   return select.with(key).first(switch_at);
+}
+
+FoundSwitch get_switch_row(Transaction &transaction, SwitchKey key) {
+  auto found = find_switch(transaction, key);
+  if (!found) {
+    transaction.refuse("it has no switch " + std::to_string(static_cast<std::int64_t>(key)) +
+                       ", which is referred to");
+  }
+  return std::move(*found);
 }
 
 std::optional<FoundSwitch> next_switch(Transaction &transaction, SwitchKey key) {

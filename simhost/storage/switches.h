@@ -37,6 +37,8 @@ std::optional<SwitchKey> add_switch(Transaction &transaction, Switch const &row)
 std::optional<FoundSwitch> find_switch(Transaction &transaction, SwitchName kind,
                                        std::string_view name);
 std::optional<FoundSwitch> find_switch(Transaction &transaction, SwitchKey key);
+/// The switch that another row says is there. Throws UnusableState if it is not.
+FoundSwitch get_switch_row(Transaction &transaction, SwitchKey key);
 /// The first switch that was added after `key`; SwitchKey{} comes before all.
 std::optional<FoundSwitch> next_switch(Transaction &transaction, SwitchKey key);
 /// All switches of the host, in the order in which they were added.

@@ -140,7 +140,7 @@ storage::Port add_client_port(storage::Transaction &transaction, storage::Switch
                               std::string_view identifier) {
   auto port = added_port(transaction, switch_key, identifier, storage::PortKind::client);
   auto const count = storage::count_ports(transaction, switch_key, storage::PortKind::client);
-  if (count > storage::find_switch(transaction, switch_key).value().row.max_ports) {
+  if (count > storage::get_switch_row(transaction, switch_key).row.max_ports) {
     throw Refused(QEX_LIMIT_EXCEEDED);
   }
   return port;
@@ -225,8 +225,7 @@ std::vector<UplinkPort> named_uplink_ports(storage::Transaction &transaction,
 
 void check_port_alias(Setting const &setting) {
   auto const alias = text_of(setting.value);
-  auto const port =
-      storage::find_port(setting.transaction, setting.owner.port_number.value()).value();
+  auto const port = storage::get_port_row(setting.transaction, setting.owner.port_number.value());
   if (port.kind != storage::PortKind::uplink) {
     return;
   }
@@ -274,7 +273,7 @@ void remove_uplink_port(storage::Transaction &transaction, storage::SwitchKey sw
                         std::string_view uplink) {
   auto const found = storage::find_uplink(transaction, uplink);
   if (!found || !found->port ||
-      storage::find_port(transaction, *found->port).value().switch_key != switch_key) {
+      storage::get_port_row(transaction, *found->port).switch_key != switch_key) {
     throw Refused(QEX_NOT_FOUND);
   }
   storage::remove_port(transaction, *found->port);

@@ -14,7 +14,7 @@ namespace simhost {
 namespace {
 
 storage::Port get_port_key(storage::Transaction &transaction, storage::PropertyOwner const &owner) {
-  return storage::find_port(transaction, owner.port_number.value()).value();
+  return storage::get_port_row(transaction, owner.port_number.value());
 }
 
 // What is at the port, and whether the link between the two is up.

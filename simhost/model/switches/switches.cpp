@@ -94,7 +94,7 @@ void attach_free_uplinks(storage::Transaction &transaction, storage::SwitchKey k
 }
 
 storage::Switch get_row(storage::Transaction &transaction, storage::SwitchKey key) {
-  return storage::find_switch(transaction, key).value().row;
+  return storage::get_switch_row(transaction, key).row;
 }
 
 }  // namespace

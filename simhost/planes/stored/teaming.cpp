@@ -63,7 +63,8 @@ std::optional<storage::SwitchKey> switch_running_over(storage::Transaction &tran
     return std::nullopt;
   }
   auto const key = storage::find_port(transaction, *at->port)->switch_key;
-  return storage::find_switch(transaction, key)->row.associated ? std::optional(key) : std::nullopt;
+  return storage::get_switch_row(transaction, key).row.associated ? std::optional(key)
+                                                                  : std::nullopt;
 }
 
 void announce(storage::Transaction &transaction, storage::SwitchKey key, std::uint64_t sent) {

@@ -16,6 +16,9 @@ static_assert(VS_MAC_ADDR_TYPE_LEARNED == 2, "the tables count what is of this t
 // What the table of counts has instead of a port for all places of a switch.
 constexpr std::int64_t kEverywhere = -1;
 
+constexpr std::int64_t kGreatestVlan = 4094;
+constexpr std::int64_t kGreatestNetwork = 0xFFFFFF;
+
 // 0 stands for the team in the index as well: no port has that number.
 PortNumber port_or_none(Place const &place) {
   return place.port.value_or(PortNumber{});
@@ -26,15 +29,16 @@ void bind_name(Query &query, AddressName const &name) {
 }
 
 VSMACAddrType type_at(Query const &row, int column) {
-  return static_cast<VSMACAddrType>(row.integer(column, 0, VS_MAC_ADDR_TYPE_LEARNED));
+  return row.choice(column, VS_MAC_ADDR_TYPE_LEARNED);
 }
 
 Address address_at(Query const &row) {
-  Address address{
-      .name = {.mac = {}, .vid = row.number<std::uint16_t>(1), .vni = row.number<std::uint32_t>(2)},
-      .type = type_at(row, 3),
-      .ages = row.flag(4),
-      .seen = std::chrono::milliseconds(row.integer(5))};
+  Address address{.name = {.mac = {},
+                           .vid = static_cast<std::uint16_t>(row.integer(1, 0, kGreatestVlan)),
+                           .vni = static_cast<std::uint32_t>(row.integer(2, 0, kGreatestNetwork))},
+                  .type = type_at(row, 3),
+                  .ages = row.flag(4),
+                  .seen = row.time(5)};
   std::ranges::copy(row.bytes(0, address.name.mac.size()), address.name.mac.begin());
   return address;
 }
@@ -50,7 +54,7 @@ FoundAddress found_at(Query const &row) {
 
 std::int64_t count_at(Transaction &transaction, SwitchKey key, std::int64_t place) {
   Query select(transaction, "SELECT addresses FROM learned WHERE switch = ? AND place = ?");
-  return select.with(key).with(place).next() ? select.integer(0) : 0;
+  return select.with(key).with(place).next() ? select.number<std::uint32_t>(0) : 0;
 }
 
 }  // namespace

@@ -8,7 +8,7 @@ namespace simhost::storage {
 ClockRow get_clock(Transaction &transaction) {
   Query select(transaction, "SELECT stopped, value FROM clock");
   select.require_row();
-  return {.stopped = select.flag(0), .value = std::chrono::milliseconds(select.integer(1))};
+  return {.stopped = select.flag(0), .value = select.time(1)};
 }
 
 void put_clock(Transaction &transaction, ClockRow const &row) {

@@ -1,6 +1,7 @@
 // Fault rows in SQL.
 #include "storage/running/faults.h"
 
+#include "base/outcomes.h"
 #include "storage/query.h"
 
 namespace simhost::storage {
@@ -10,16 +11,26 @@ namespace {
 #define FAULT_COLUMNS "function, first, last, seen, delay, status, exception, message"
 #define SELECT_FAULT "SELECT " FAULT_COLUMNS " FROM fault"
 
+// Empty for none.
+std::string exception_at(Query const &row, int column) {
+  auto type = row.text(column);
+  if (!type.empty() && !find_trap_kind(type)) {
+    row.refuse(column, "'" + type + "'");
+  }
+  return type;
+}
+
 // Of a row that SELECT_FAULT finds.
 WaitingFault fault_at(Query const &row) {
+  auto const first = row.integer(1, 1, Fault::kForever);
   return {.fault = {.function = row.text(0),
-                    .first = row.integer(1),
-                    .last = row.integer(2),
-                    .delay = std::chrono::milliseconds(row.integer(4)),
+                    .first = first,
+                    .last = row.integer(2, first, Fault::kForever),
+                    .delay = std::chrono::milliseconds(row.integer(4, 0, Fault::kForever)),
                     .status = static_cast<QEX_ReturnStatus>(row.number<std::uint32_t>(5)),
-                    .exception = row.text(6),
+                    .exception = exception_at(row, 6),
                     .message = row.text(7)},
-          .seen = row.integer(3)};
+          .seen = row.integer(3, 0, Fault::kForever)};
 }
 
 }  // namespace

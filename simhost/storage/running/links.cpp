@@ -10,6 +10,8 @@ namespace {
 #define LINK_COLUMNS \
   "carrier, admin, partner, speed, full_duplex, beacons, errors, driver, up_since"
 
+constexpr std::int64_t kGreatestPercent = 100;
+
 Link link_at(Query const &row) {
   return {.carrier = row.flag(0),
           .admin = row.flag(1),
@@ -17,9 +19,9 @@ Link link_at(Query const &row) {
           .speed = row.number<std::uint32_t>(3),
           .full_duplex = row.flag(4),
           .beacons = row.flag(5),
-          .error_percent = row.number<std::uint32_t>(6),
+          .error_percent = static_cast<std::uint32_t>(row.integer(6, 0, kGreatestPercent)),
           .driver = row.flag(7),
-          .up_since = std::chrono::milliseconds(row.integer(8))};
+          .up_since = row.time(8)};
 }
 
 LagId lag_id_at(Query const &row) {
