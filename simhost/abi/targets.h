@@ -52,23 +52,24 @@ inline storage::PropertyOwner owner_of(storage::Transaction &transaction, NamedP
   return owner_of(get_target(transaction, target));
 }
 
-template <typename Target, typename Record>
-Record read(ReadingCall &call, Target const &target, RecordProperty<Record> const &property) {
+/// What most typed calls are: one setting of a target is read, set or cleared.
+template <typename Target, typename Value>
+Value get(ReadingCall &call, Target const &target, Property<Value> const &property) {
   auto &transaction = call.transaction();
-  return read(transaction, owner_of(transaction, target), property);
+  return effective(transaction, property, owner_of(transaction, target));
 }
 
-template <typename Target, typename Record>
-void write(ChangingCall &call, Target const &target, RecordProperty<Record> const &property,
-           Record const &record) {
+template <typename Target, typename Value>
+void set(ChangingCall &call, Target const &target, Property<Value> const &property,
+         std::type_identity_t<Value> const &value) {
   auto &transaction = call.transaction();
-  write(transaction, owner_of(transaction, target), property, record);
+  set(transaction, property, owner_of(transaction, target), value);
 }
 
 template <typename Target>
-void reset(ChangingCall &call, Target const &target, std::string_view key) {
+void clear(ChangingCall &call, Target const &target, Descriptor const &descriptor) {
   auto &transaction = call.transaction();
-  reset_property(transaction, owner_of(transaction, target), key);
+  clear(transaction, descriptor, owner_of(transaction, target));
 }
 
 /// Memory for the caller with a copy of the bytes.

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "memory_state.h"
+#include "model/switches/properties.h"
 #include "model/switches/switches.h"
 #include "storage/switches.h"
 #include "vswitch/properties.h"
@@ -40,11 +41,11 @@ TEST_F(Properties, RawBytesAreWhatTheTypedCallReads) {
   std::uint32_t const mtu = 9000;
   set_property(transaction, owner, VSPROP_MTU, std::as_bytes(std::span(&mtu, 1)),
                PropertyType::config);
-  EXPECT_EQ(simhost::mtu_of(transaction, "first"), 9000U);
+  EXPECT_EQ(simhost::effective(transaction, simhost::switches::mtu, owner), 9000U);
 }
 
 TEST_F(Properties, TheTypedCallWritesTheRawBytes) {
-  simhost::set_mtu(transaction, "first", 0x1234);
+  simhost::set(transaction, simhost::switches::mtu, owner, 0x1234);
   auto const property = simhost::storage::find_property(transaction, owner, VSPROP_MTU);
   EXPECT_EQ(property.value().value,
             (std::vector{std::byte{0x34}, std::byte{0x12}, std::byte{0}, std::byte{0}}));

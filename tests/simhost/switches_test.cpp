@@ -1,6 +1,10 @@
 // Switches: what is accepted and refused, at each bound and one past it.
 #include "model/switches/switches.h"
 
+#include "model/lookup.h"
+#include "model/properties/properties.h"
+#include "model/switches/properties.h"
+
 #include <gmock/gmock.h>
 
 #include <algorithm>
@@ -29,7 +33,9 @@ struct Switches : MemoryState {
   QEX_ReturnStatus set_mtu(std::string_view alias, std::uint32_t mtu) {
     return status_of([&] {
       Transaction transaction(store, Access::write);
-      simhost::set_mtu(transaction, alias, mtu);
+      auto const key = simhost::get_switch(transaction, alias).key;
+      simhost::set(transaction, simhost::switches::mtu,
+                   simhost::storage::PropertyOwner::global(key), mtu);
       transaction.commit();
     });
   }

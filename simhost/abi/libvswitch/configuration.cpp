@@ -7,8 +7,9 @@
 #include "abi/ledger.h"
 #include "abi/targets.h"
 #include "model/ports/ports.h"
+#include "model/ports/properties.h"
+#include "model/switches/properties.h"
 #include "model/switches/switches.h"
-#include "qexapi/switch_properties.h"
 
 using simhost::Call;
 using simhost::changing;
@@ -68,8 +69,7 @@ QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_u
     auto &transaction = call.transaction();
     auto const added = simhost::add_client_port(
         transaction, simhost::get_target(transaction, target.owner), target.identifier);
-    simhost::set_property(transaction, simhost::owner_of(added), QEX_NEBPROP_PORT_CONNECTID,
-                          simhost::bytes_of(connectId));
+    simhost::set(transaction, simhost::ports::connection, simhost::owner_of(added), connectId);
   });
 }
 
@@ -119,15 +119,13 @@ QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *aliasB
 
 QEX_ReturnStatus VSDVS_GetMTU(char const *switchName, qex_uint32 *mtu) {
   return reading(__func__, [&](ReadingCall &call) {
-    auto const alias = require_text(switchName);
-    require(mtu) = simhost::mtu_of(call.transaction(), alias);
+    require(mtu) = simhost::get(call, switch_called(switchName), simhost::switches::mtu);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMTU(char const *switchName, qex_uint32 mtu) {
   return changing(__func__, [&](ChangingCall &call) {
-    auto const alias = require_text(switchName);
-    simhost::set_mtu(call.transaction(), alias, mtu);
+    simhost::set(call, switch_called(switchName), simhost::switches::mtu, mtu);
   });
 }
 

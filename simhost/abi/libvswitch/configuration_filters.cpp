@@ -1,56 +1,39 @@
 // VSDVS_*: MAC learning, and which frames ports send and take.
 #include "abi/targets.h"
+#include "model/mac/properties.h"
+#include "model/multicast/properties.h"
+#include "model/security/properties.h"
 #include "vswitch/configuration.h"
-#include "vswitch/properties.h"
 
 using simhost::changing;
 using simhost::ChangingCall;
 using simhost::port_of;
 using simhost::reading;
 using simhost::ReadingCall;
-using simhost::RecordProperty;
 using simhost::require;
 using simhost::switch_called;
 
-namespace {
-
-constexpr RecordProperty<VSMACLearning> kLearning{
-    .key = VSPROP_SWITCH_MAC_LEARNING,
-    .unset = {.agingTime = VS_MAC_LEARNING_AGING_TIME_DEFAULT,
-              .learnStatic = VS_MAC_LEARNING_LEARN_STATIC_DEFAULT,
-              .reserved = 0,
-              .macLimit = VS_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT}};
-constexpr RecordProperty<VSPMACManagement> kManagement{
-    .key = VSPROP_PORT_MAC_MANAGEMENT,
-    .unset = {.macChangeAllowed = 0,
-              .portMACLearning = {.learning = 0,
-                                  .flooding = 0,
-                                  .macLimit = VSPORT_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT,
-                                  .macLimitPolicy = VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW}}};
-constexpr RecordProperty<VSPropSecurity> kSecurity{.key = VSPROP_PORT_SECURITY, .unset = {}};
-constexpr RecordProperty<VSExtraEthFilter> kFilter{.key = VSPROP_PORT_EXTRA_ETH_FRP, .unset = {}};
-constexpr RecordProperty<qex_uint32> kFilterMode{.key = VSPROP_MULTICAST_FILTER,
-                                                 .unset = VS_MCAST_FILTER_MODE_LEGACY};
-
-}  // namespace
+namespace mac = simhost::mac;
+namespace multicast = simhost::multicast;
+namespace security = simhost::security;
 
 extern "C" {
 
 QEX_ReturnStatus VSDVS_GetMACLearning(char const *switchName, VSMACLearning *learning) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(learning) = simhost::read(call, switch_called(switchName), kLearning);
+    require(learning) = simhost::get(call, switch_called(switchName), mac::learning);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMACLearning(char const *switchName, VSMACLearning const *learning) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::write(call, switch_called(switchName), kLearning, require(learning));
+    simhost::set(call, switch_called(switchName), mac::learning, require(learning));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearMACLearning(char const *switchName) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::reset(call, switch_called(switchName), VSPROP_SWITCH_MAC_LEARNING);
+    simhost::clear(call, switch_called(switchName), mac::learning);
   });
 }
 
@@ -58,7 +41,7 @@ QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *po
                                           VSPMACLearning *learning) {
   return reading(__func__, [&](ReadingCall &call) {
     auto const management =
-        simhost::read(call, port_of(switch_called(switchName), port), kManagement);
+        simhost::get(call, port_of(switch_called(switchName), port), mac::management);
     require(learning) = management.portMACLearning;
   });
 }
@@ -70,50 +53,55 @@ QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *po
     auto const &wanted = require(learning);
     auto &transaction = call.transaction();
     auto const owner = simhost::owner_of(transaction, target);
-    auto management = simhost::read(transaction, owner, kManagement);
+    auto management = simhost::effective(transaction, mac::management, owner);
     management.portMACLearning = wanted;
-    simhost::write(transaction, owner, kManagement, management);
+    simhost::set(transaction, mac::management, owner, management);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity *security) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(security) = simhost::read(call, port_of(switch_called(switchName), port), kSecurity);
+    require(security) =
+        simhost::get(call, port_of(switch_called(switchName), port), security::forbids);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity const *security) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::write(call, port_of(switch_called(switchName), port), kSecurity, require(security));
+    simhost::set(call, port_of(switch_called(switchName), port), security::forbids,
+                 require(security));
   });
 }
 
 QEX_ReturnStatus VSDVS_GetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter *filter) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(filter) = simhost::read(call, port_of(switch_called(switchName), port), kFilter);
+    require(filter) =
+        simhost::get(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter const *filter) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::write(call, port_of(switch_called(switchName), port), kFilter, require(filter));
+    simhost::set(call, port_of(switch_called(switchName), port), mac::ethernet_filter,
+                 require(filter));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearExtraEthFilter(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::reset(call, port_of(switch_called(switchName), port), VSPROP_PORT_EXTRA_ETH_FRP);
+    simhost::clear(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
   });
 }
 
 QEX_ReturnStatus VSDVS_IsSinkPortEnabled(char const *switchName, char const *port,
                                          qex_Bool *enabled) {
   return reading(__func__, [&](ReadingCall &call) {
-    auto const filter = simhost::read(call, port_of(switch_called(switchName), port), kFilter);
+    auto const filter =
+        simhost::get(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
     require(enabled) = static_cast<qex_Bool>((filter.flags & QEX_ETH_FILTER_SINK) != 0);
   });
 }
@@ -124,22 +112,24 @@ QEX_ReturnStatus VSDVS_ConfigureSinkPort(char const *switchName, char const *por
     auto const target = port_of(switch_called(switchName), port);
     auto &transaction = call.transaction();
     auto const owner = simhost::owner_of(transaction, target);
-    auto filter = simhost::read(transaction, owner, kFilter);
+    auto filter = simhost::effective(transaction, mac::ethernet_filter, owner);
     auto const others = filter.flags & ~qex_uint32{QEX_ETH_FILTER_SINK};
     filter.flags = enabled != 0 ? others | QEX_ETH_FILTER_SINK : others;
-    simhost::write(transaction, owner, kFilter, filter);
+    simhost::set(transaction, mac::ethernet_filter, owner, filter);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(mode) = static_cast<int>(simhost::read(call, switch_called(switchName), kFilterMode));
+    require(mode) =
+        static_cast<int>(simhost::get(call, switch_called(switchName), multicast::filter_mode));
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::write(call, switch_called(switchName), kFilterMode, static_cast<qex_uint32>(mode));
+    simhost::set(call, switch_called(switchName), multicast::filter_mode,
+                 static_cast<qex_uint32>(mode));
   });
 }
 

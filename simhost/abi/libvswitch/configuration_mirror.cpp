@@ -2,7 +2,6 @@
 #include "abi/targets.h"
 #include "model/mirror/sessions.h"
 #include "vswitch/configuration.h"
-#include "vswitch/properties.h"
 
 using simhost::changing;
 using simhost::ChangingCall;
@@ -49,7 +48,7 @@ QEX_ReturnStatus VSDVS_RemoveDVMirrorSession(char const *switchName, char const 
 
 QEX_ReturnStatus VSDVS_ClearDVMirrorSessions(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::reset(call, port_of(switch_called(switchName), port), VSPROP_PORT_MIRROR_SESSIONS);
+    simhost::clear(call, port_of(switch_called(switchName), port), simhost::mirror::sessions);
   });
 }
 

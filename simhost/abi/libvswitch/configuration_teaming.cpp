@@ -5,82 +5,62 @@
 #include "abi/targets.h"
 #include "model/teaming/properties.h"
 #include "vswitch/configuration.h"
-#include "vswitch/properties.h"
 
 using simhost::changing;
 using simhost::ChangingCall;
 using simhost::port_of;
 using simhost::reading;
 using simhost::ReadingCall;
-using simhost::RecordProperty;
 using simhost::require;
 using simhost::require_text;
 using simhost::switch_called;
 using simhost::switch_identified;
 
-namespace {
-
-constexpr RecordProperty<VSTeamPolicy> kSwitchTeaming{.key = VSPROP_SWITCH_TEAMING,
-                                                      .unset = simhost::teaming::of_switch.unset};
-constexpr RecordProperty<qex_Bool> kTxUplink{.key = VSPROP_PORT_TX_UPLINK, .unset = 0};
-
-// What a port uses: its own policy, or else its switch's.
-VSTeamPolicy teaming_of(ReadingCall &call, simhost::NamedPort const &target) {
-  auto &transaction = call.transaction();
-  auto const owner = simhost::owner_of(transaction, target);
-  auto const on_switch = simhost::read(
-      transaction, simhost::storage::PropertyOwner::global(owner.switch_key), kSwitchTeaming);
-  return simhost::read(
-      transaction, owner,
-      RecordProperty<VSTeamPolicy>{.key = VSPROP_PORT_TEAMING_POLICY, .unset = on_switch});
-}
-
-}  // namespace
+namespace teaming = simhost::teaming;
 
 extern "C" {
 
 QEX_ReturnStatus VSDVS_GetTeamingPolicy(char const *switchName, VSTeamPolicy *policy) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(policy) = simhost::read(call, switch_called(switchName), kSwitchTeaming);
+    require(policy) = simhost::get(call, switch_called(switchName), teaming::of_switch);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetTeamingPolicyFromDVSID(char const *switchId, VSTeamPolicy *policy) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(policy) = simhost::read(call, switch_identified(switchId), kSwitchTeaming);
+    require(policy) = simhost::get(call, switch_identified(switchId), teaming::of_switch);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetTeamingPolicy(char const *switchName, VSTeamPolicy const *policy) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::write(call, switch_called(switchName), kSwitchTeaming, require(policy));
+    simhost::set(call, switch_called(switchName), teaming::of_switch, require(policy));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearTeamingPolicy(char const *switchName) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::reset(call, switch_called(switchName), VSPROP_SWITCH_TEAMING);
+    simhost::clear(call, switch_called(switchName), teaming::of_switch);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy *policy) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(policy) = teaming_of(call, port_of(switch_called(switchName), port));
+    require(policy) = simhost::get(call, port_of(switch_called(switchName), port), teaming::policy);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy const *policy) {
   return changing(__func__, [&](ChangingCall &call) {
-    constexpr RecordProperty<VSTeamPolicy> kOfPort{.key = VSPROP_PORT_TEAMING_POLICY, .unset = {}};
-    simhost::write(call, port_of(switch_called(switchName), port), kOfPort, require(policy));
+    simhost::set(call, port_of(switch_called(switchName), port), teaming::policy, require(policy));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearPortTeamingPolicy(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::reset(call, port_of(switch_called(switchName), port), VSPROP_PORT_TEAMING_POLICY);
+    simhost::clear(call, port_of(switch_called(switchName), port), teaming::policy);
   });
 }
 
@@ -89,10 +69,7 @@ QEX_ReturnStatus VSDVS_GetPortTeamingOverride(char const *switchName, char const
   return reading(__func__, [&](ReadingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto *const output = &require(overrideBuffer);
-    auto &transaction = call.transaction();
-    auto const property = simhost::get_property(transaction, simhost::owner_of(transaction, target),
-                                                VSPROP_PORT_TEAMING_OVERRIDE);
-    auto const text = property ? simhost::text_of(property->value) : std::string();
+    auto const text = simhost::get(call, target, teaming::bound_uplink);
     *std::copy(text.begin(), text.end(), output) = '\0';
   });
 }
@@ -102,22 +79,21 @@ QEX_ReturnStatus VSDVS_SetPortTeamingOverride(char const *switchName, char const
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto const name = require_text(overrideName);
-    auto &transaction = call.transaction();
-    simhost::set_property(transaction, simhost::owner_of(transaction, target),
-                          VSPROP_PORT_TEAMING_OVERRIDE, simhost::bytes_of_text(name));
+    simhost::set(call, target, teaming::bound_uplink, std::string(name));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearPortTeamingOverride(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::reset(call, port_of(switch_called(switchName), port), VSPROP_PORT_TEAMING_OVERRIDE);
+    simhost::clear(call, port_of(switch_called(switchName), port), teaming::bound_uplink);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetTxUplinkAlways(char const *switchName, char const *port,
                                          qex_Bool *enabled) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(enabled) = simhost::read(call, port_of(switch_called(switchName), port), kTxUplink);
+    require(enabled) =
+        simhost::get(call, port_of(switch_called(switchName), port), teaming::transmit_uplink);
   });
 }
 
@@ -125,7 +101,7 @@ QEX_ReturnStatus VSDVS_SetTxUplinkAlways(char const *switchName, char const *por
                                          qex_Bool enabled) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const value = static_cast<qex_Bool>(enabled != 0);
-    simhost::write(call, port_of(switch_called(switchName), port), kTxUplink, value);
+    simhost::set(call, port_of(switch_called(switchName), port), teaming::transmit_uplink, value);
   });
 }
 

@@ -4,26 +4,24 @@
 #include "abi/targets.h"
 #include "model/vlans/vlans.h"
 #include "vswitch/configuration.h"
-#include "vswitch/properties.h"
 
 using simhost::changing;
 using simhost::ChangingCall;
 using simhost::port_of;
 using simhost::reading;
 using simhost::ReadingCall;
-using simhost::RecordProperty;
 using simhost::require;
 using simhost::switch_called;
 
-namespace {
+namespace vlans = simhost::vlans;
 
-constexpr RecordProperty<qex_Bool> kNestedTag{.key = VSPROP_PORT_VLAN_NESTEDTAG, .unset = 0};
+namespace {
 
 // An array of the caller; refuses null with a count, and a count that nothing can have, before that
 // much is read (QEX_BAD_PARAM).
 template <typename Entry>
 std::span<Entry const> array(Entry const *first, int count) {
-  if (count < 0 || count > simhost::vlans::kNumbers || (first == nullptr && count != 0)) {
+  if (count < 0 || count > vlans::kNumbers || (first == nullptr && count != 0)) {
     simhost::refuse(QEX_BAD_PARAM);
   }
   return {first, static_cast<std::size_t>(count)};
@@ -41,8 +39,8 @@ QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *por
     auto &priority_output = require(priority);
     auto &transaction = call.transaction();
     auto const owner = simhost::owner_of(transaction, target);
-    auto const bytes = simhost::effective_bytes(transaction, simhost::vlans::of_port, owner);
-    priority_output = simhost::effective(transaction, simhost::vlans::priority, owner);
+    auto const bytes = simhost::effective_bytes(transaction, vlans::of_port, owner);
+    priority_output = simhost::effective(transaction, vlans::priority, owner);
     policy_output = simhost::allocate<VSPortVlanPolicy>(call, bytes);
   });
 }
@@ -54,11 +52,11 @@ QEX_ReturnStatus VSDVS_SetPortVLANPolicy(char const *switchName, char const *por
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto const trunk = array(ranges, numRanges);
-    simhost::vlans::PortVlans const wanted{.vlan = vlanID,
-                                           .priority = priority,
-                                           .guest_tagging = guestTagging != 0,
-                                           .private_vlan = privateVlan != 0,
-                                           .ranges = {trunk.begin(), trunk.end()}};
+    vlans::PortVlans const wanted{.vlan = vlanID,
+                                  .priority = priority,
+                                  .guest_tagging = guestTagging != 0,
+                                  .private_vlan = privateVlan != 0,
+                                  .ranges = {trunk.begin(), trunk.end()}};
     auto &transaction = call.transaction();
     simhost::set_vlans(transaction, simhost::get_target(transaction, target), wanted);
   });
@@ -75,7 +73,8 @@ QEX_ReturnStatus VSDVS_ClearPortVLANPolicy(char const *switchName, char const *p
 QEX_ReturnStatus VSDVS_GetPortNestedVLANTagging(char const *switchName, char const *port,
                                                 qex_Bool *enabled) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(enabled) = simhost::read(call, port_of(switch_called(switchName), port), kNestedTag);
+    require(enabled) =
+        simhost::get(call, port_of(switch_called(switchName), port), vlans::nested_tag);
   });
 }
 
@@ -83,7 +82,7 @@ QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char con
                                                 qex_Bool enabled) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const value = static_cast<qex_Bool>(enabled != 0);
-    simhost::write(call, port_of(switch_called(switchName), port), kNestedTag, value);
+    simhost::set(call, port_of(switch_called(switchName), port), vlans::nested_tag, value);
   });
 }
 
@@ -93,12 +92,10 @@ QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
     auto const target = switch_called(switchName);
     auto &entries_output = require(entries);
     auto &count_output = require(count);
-    auto &transaction = call.transaction();
-    auto const property = simhost::get_property(transaction, simhost::owner_of(transaction, target),
-                                                VSPROP_PVLAN_MAP);
-    auto const bytes = property ? simhost::BytesView(property->value) : simhost::BytesView();
-    count_output = static_cast<int>(bytes.size() / sizeof(VSPvlanMapEntry));
-    entries_output = bytes.empty() ? nullptr : simhost::allocate<VSPvlanMapEntry>(call, bytes);
+    auto const map = simhost::get(call, target, vlans::private_vlans);
+    auto const bytes = std::as_bytes(std::span(map));
+    count_output = static_cast<int>(map.size());
+    entries_output = map.empty() ? nullptr : simhost::allocate<VSPvlanMapEntry>(call, bytes);
   });
 }
 
@@ -107,9 +104,7 @@ QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
     auto const map = array(entries, count);
-    auto &transaction = call.transaction();
-    simhost::set_property(transaction, simhost::owner_of(transaction, target), VSPROP_PVLAN_MAP,
-                          std::as_bytes(map));
+    simhost::set(call, target, vlans::private_vlans, {map.begin(), map.end()});
   });
 }
 

@@ -3,9 +3,9 @@
 
 #include "abi/libvswitch/results.h"
 #include "model/lookup.h"
+#include "model/multicast/properties.h"
 #include "model/plane.h"
 #include "model/properties/properties.h"
-#include "vswitch/properties.h"
 #include "vswitch/queries.h"
 
 using simhost::AddressBytes;
@@ -93,9 +93,8 @@ QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode) {
     auto &transaction = call.transaction();
     auto const owner = simhost::storage::PropertyOwner::global(
         simhost::get_running_switch(transaction, alias).key);
-    simhost::RecordProperty<int> const filter{.key = VSPROP_MULTICAST_FILTER,
-                                              .unset = VS_MCAST_FILTER_MODE_LEGACY};
-    output = simhost::read(transaction, owner, filter);
+    output =
+        static_cast<int>(simhost::effective(transaction, simhost::multicast::filter_mode, owner));
   });
 }
 

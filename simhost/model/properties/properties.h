@@ -86,24 +86,4 @@ inline void clear(storage::Transaction &transaction, Descriptor const &descripto
   reset_property(transaction, owner, descriptor.key);
 }
 
-/// A property that is one record, and what stands for it while it is not set.
-template <typename Record>
-struct RecordProperty {
-  std::string_view key;
-  Record unset;
-};
-
-template <typename Record>
-Record read(storage::Transaction &transaction, storage::PropertyOwner const &owner,
-            RecordProperty<Record> const &property) {
-  auto const found = get_property(transaction, owner, property.key);
-  return found ? record_of<Record>(found->value) : property.unset;
-}
-
-template <typename Record>
-void write(storage::Transaction &transaction, storage::PropertyOwner const &owner,
-           RecordProperty<Record> const &property, Record const &record) {
-  set_property(transaction, owner, property.key, bytes_of(record));
-}
-
 }  // namespace simhost

@@ -5,7 +5,7 @@
 
 #include "model/properties/descriptor.h"
 #include "model/switches/switches.h"
-#include "nebpublic/property_types.h"
+#include "qexapi/switch_ports.h"
 #include "qexapi/switch_properties.h"
 #include "vswitch/properties.h"
 

@@ -141,16 +141,6 @@ void change_max_ports(storage::Transaction &transaction, storage::SwitchKey key,
   storage::set_max_ports(transaction, key, max_ports);
 }
 
-void set_mtu(storage::Transaction &transaction, std::string_view alias, std::uint32_t mtu) {
-  auto const owner = PropertyOwner::global(get_switch(transaction, alias).key);
-  set(transaction, switches::mtu, owner, mtu);
-}
-
-std::uint32_t mtu_of(storage::Transaction &transaction, std::string_view alias) {
-  auto const owner = PropertyOwner::global(get_switch(transaction, alias).key);
-  return effective(transaction, switches::mtu, owner);
-}
-
 VSInfo switch_info(storage::Transaction &transaction, std::string_view alias) {
   auto const [key, row] = get_running_switch(transaction, alias);
   VSInfo info{};

@@ -1,4 +1,4 @@
-// Switches of the host: their life, their names, their MTU, what they tell about themselves.
+// Switches of the host: their life, their names, what they tell about themselves.
 // A function that takes a name of a switch refuses one that no switch has (QEX_NOT_FOUND).
 #pragma once
 
@@ -64,11 +64,6 @@ SIMHOST_API std::string portset_of(storage::Transaction &transaction, std::strin
 SIMHOST_API std::string alias_of_portset(storage::Transaction &transaction,
                                          std::string_view portset);
 
-/// Sets the MTU in bytes; refuses one out of bounds (QEX_BAD_PARAM).
-SIMHOST_API void set_mtu(storage::Transaction &transaction, std::string_view alias,
-                         std::uint32_t mtu);
-/// The MTU in bytes.
-SIMHOST_API std::uint32_t mtu_of(storage::Transaction &transaction, std::string_view alias);
 SIMHOST_API VSInfo switch_info(storage::Transaction &transaction, std::string_view alias);
 /// The uplinks of a switch, in the order of its uplink ports.
 SIMHOST_API std::vector<storage::AttachedUplink> uplinks_of(storage::Transaction &transaction,

@@ -7,13 +7,12 @@
 #include <span>
 
 #include "base/outcomes.h"
+#include "model/mac/properties.h"
 #include "model/options/host_settings.h"
+#include "model/properties/properties.h"
 #include "planes/stored/counters.h"
-#include "planes/stored/policies.h"
 #include "qexapi/protocols.h"
 #include "vswitch/mac_learning.h"
-#include "vswitch/port_mac_policies.h"
-#include "vswitch/properties.h"
 
 namespace simhost::stored {
 namespace {
@@ -42,9 +41,8 @@ void check_source(VSMACEntry const &entry) {
 }
 
 VSMACLearning learning_of(storage::Transaction &transaction, storage::SwitchKey key) {
-  auto const own = policy<VSMACLearning>(transaction, storage::PropertyOwner::global(key),
-                                         VSPROP_SWITCH_MAC_LEARNING);
-  if (own) {
+  auto const owner = storage::PropertyOwner::global(key);
+  if (auto const own = find_value(transaction, mac::learning, owner)) {
     return *own;
   }
   auto const global = global_mac_learning(transaction);
@@ -56,10 +54,8 @@ VSMACLearning learning_of(storage::Transaction &transaction, storage::SwitchKey 
 }
 
 VSPMACLearning port_learning(storage::Transaction &transaction, Place const &place) {
-  auto const own = policy<VSPMACManagement>(
-      transaction, storage::PropertyOwner::port(place.switch_key, *place.port),
-      VSPROP_PORT_MAC_MANAGEMENT);
-  return own ? own->portMACLearning : VSPMACLearning{};
+  auto const owner = storage::PropertyOwner::port(place.switch_key, *place.port);
+  return effective(transaction, mac::management, owner).portMACLearning;
 }
 
 // The last time at which an address that ages may have been seen and be gone now.

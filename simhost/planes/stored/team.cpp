@@ -8,10 +8,9 @@
 #include "model/lookup.h"
 #include "model/options/runtime_options.h"
 #include "model/ports/ports.h"
+#include "model/ports/properties.h"
+#include "model/properties/properties.h"
 #include "model/teaming/properties.h"
-#include "planes/stored/policies.h"
-#include "qexapi/switch_properties.h"
-#include "vswitch/properties.h"
 
 namespace simhost::stored {
 namespace {
@@ -108,17 +107,15 @@ Named named_by(Team const &team, VSTeamPolicy const &policy) {
 }  // namespace
 
 Team team_of(storage::Transaction &transaction, storage::SwitchKey key) {
-  Team team{.uplinks = {},
-            .lags = storage::all_lags(transaction, key),
-            .policy = policy<VSTeamPolicy>(transaction, storage::PropertyOwner::global(key),
-                                           VSPROP_SWITCH_TEAMING)
-                          .value_or(teaming::of_switch.unset),
-            .now = clock_now(transaction),
-            .up_delay = ClockTime(runtime_number(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY))};
+  Team team{
+      .uplinks = {},
+      .lags = storage::all_lags(transaction, key),
+      .policy = effective(transaction, teaming::of_switch, storage::PropertyOwner::global(key)),
+      .now = clock_now(transaction),
+      .up_delay = ClockTime(runtime_number(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY))};
   for (auto const &[name, number] : storage::uplinks_of(transaction, key)) {
     auto const port = get_port(transaction, number);
-    auto const blocked =
-        policy<qex_Bool>(transaction, owner_of(port), QEX_NEBPROP_PORT_BLOCK).value_or(0);
+    auto const blocked = effective(transaction, ports::blocked, owner_of(port));
     team.uplinks.push_back({.name = name,
                             .port = alias_of(transaction, port).value_or(port.identifier),
                             .identifier = port.identifier,

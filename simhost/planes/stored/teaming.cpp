@@ -9,10 +9,10 @@
 #include "base/outcomes.h"
 #include "model/lookup.h"
 #include "model/options/runtime_options.h"
+#include "model/properties/properties.h"
+#include "model/teaming/properties.h"
 #include "planes/stored/counters.h"
 #include "planes/stored/links.h"
-#include "planes/stored/policies.h"
-#include "vswitch/properties.h"
 
 namespace simhost::stored {
 namespace {
@@ -30,9 +30,8 @@ Kept &keep(std::map<storage::SwitchKey, Kept> &all, storage::SwitchKey key, Kept
 
 OwnTeaming own_teaming(storage::Transaction &transaction, storage::Port const &port) {
   auto const owner = owner_of(port);
-  auto const bound = storage::find_property(transaction, owner, VSPROP_PORT_TEAMING_OVERRIDE);
-  return {.policy = policy<VSTeamPolicy>(transaction, owner, VSPROP_PORT_TEAMING_POLICY),
-          .uplink = bound ? std::optional(text_of(bound->value)) : std::nullopt};
+  return {.policy = find_value(transaction, teaming::policy, owner),
+          .uplink = find_value(transaction, teaming::bound_uplink, owner)};
 }
 
 // Where in Team::uplinks the uplink is that a port uses, in whatever it has of its own.
@@ -128,11 +127,11 @@ Teaming::KeptPorts const &Teaming::all_ports(storage::Transaction &transaction,
   if (!ports.plain) {
     ports.own.clear();
     for (auto const &[port, value] :
-         storage::port_properties(transaction, key, VSPROP_PORT_TEAMING_POLICY)) {
-      ports.own[port].policy = record_in<VSTeamPolicy>(value);
+         storage::port_properties(transaction, key, teaming::policy.key)) {
+      ports.own[port].policy = record_of<VSTeamPolicy>(value);
     }
     for (auto const &[port, value] :
-         storage::port_properties(transaction, key, VSPROP_PORT_TEAMING_OVERRIDE)) {
+         storage::port_properties(transaction, key, teaming::bound_uplink.key)) {
       ports.own[port].uplink = text_of(value);
     }
     // What is too short for a policy is none.
