@@ -3,7 +3,9 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <nlohmann/json.hpp>
+#include <set>
 #include <utility>
 #include <vector>
 
@@ -102,6 +104,54 @@ std::string teaming_line(Json const &teaming) {
   return line;
 }
 
+// A setting whose value has no words of its own.
+std::string setting_line(std::string const &name, Json const &value) {
+  auto spaced = name;
+  std::replace(spaced.begin(), spaced.end(), '_', ' ');
+  if (value.is_string()) {
+    return spaced + " " + value.get<std::string>();
+  }
+  bool const are_texts =
+      value.is_array() &&
+      std::all_of(value.begin(), value.end(), [](Json const &item) { return item.is_string(); });
+  return spaced + " " + (are_texts ? joined(value) : value.dump());
+}
+
+using Names = std::set<std::string_view>;
+
+// What is no setting, and the settings that other lines tell.
+Names const kToldOfSwitches{"alias",
+                            "id",
+                            "portset",
+                            "max_ports",
+                            "persistent",
+                            "version",
+                            "running",
+                            "mtu",
+                            "uplink_ports",
+                            "uplinks",
+                            "lags",
+                            "teaming",
+                            "mac_learning",
+                            "ports",
+                            "addresses",
+                            "counters",
+                            "mirror_counters",
+                            "properties",
+                            "host_properties",
+                            "observed"};
+Names const kToldOfPorts{"id",           "external_id", "teaming",         "uplink",
+                         "addresses",    "groups",      "mirror_sessions", "counters",
+                         "mac_learning", "properties",  "observed"};
+
+void add_settings(std::vector<Branch> &branches, Json const &described, Names const &told) {
+  for (auto const &[name, value] : described.items()) {
+    if (!told.contains(name)) {
+      branches.push_back({setting_line(name, value)});
+    }
+  }
+}
+
 void add_counters(std::vector<Branch> &branches, std::string const &what, Json const &counters) {
   for (auto const &[name, value] : counters.items()) {
     branches.push_back({fmt::format("{}{} = {}", what, name, value.get<std::uint64_t>())});
@@ -121,6 +171,7 @@ Branch port_branch(Json const &port) {
   if (port.contains("uplink")) {
     branch.branches.push_back({"bound to " + port["uplink"].get<std::string>()});
   }
+  add_settings(branch.branches, port, kToldOfPorts);
   for (auto const &address : port["addresses"]) {
     branch.branches.push_back(address_branch(address));
   }
@@ -154,9 +205,7 @@ Branch switch_branch(Json const &host_switch) {
   if (host_switch.contains("teaming")) {
     branches.push_back({teaming_line(host_switch["teaming"])});
   }
-  if (host_switch.contains("multicast")) {
-    branches.push_back({"multicast " + host_switch["multicast"].get<std::string>()});
-  }
+  add_settings(branches, host_switch, kToldOfSwitches);
   for (auto const &port : host_switch["ports"]) {
     branches.push_back(port_branch(port));
   }
