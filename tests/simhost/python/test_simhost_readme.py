@@ -1,12 +1,15 @@
 """What the README shows is what its commands write."""
 
 import doctest
+import json
 import os
 import re
 import subprocess
 import sys
 from pathlib import Path
-from typing import Iterator, List, Tuple
+from typing import Any, Dict, Iterator, List, Tuple
+
+import pytest
 
 SIMHOST = Path(__file__).parents[3] / "simhost"
 BUILD = Path(os.environ["BUILD_DIR"])
@@ -67,6 +70,42 @@ def test_interpreters_show_what_expressions_are() -> None:
     example = doctest.DocTestParser().get_doctest(session, {}, "README", "README.md", 0)
     assert len(example.examples) > 3
     assert doctest.DocTestRunner().run(example).failed == 0
+
+
+PROPERTIES = json.loads((BUILD / "simhost" / "properties.json").read_text(encoding="utf-8"))
+PREFIXES = "com.quorix.vswitch.", "com.quorix.common."
+FIRST_CELLS = re.findall(r"^\|([^|\n]*`[^|\n]*)\|(.*)\|$", TEXT, re.MULTILINE)
+
+
+def rows_of(key: str) -> List[str]:
+    """The rows of the tables that are about a key."""
+    short = [key, *(key[len(prefix) :] for prefix in PREFIXES if key.startswith(prefix))]
+    return [rest for cell, rest in FIRST_CELLS if any(f"`{name}`" in cell for name in short)]
+
+
+def told_of(known: Dict[str, Any]) -> List[str]:
+    """What a row has to say of a property."""
+    value = known["value"]
+    full = value.get("greatest") == 2**32 - 1
+    told = []
+    if value["form"] == "number" and not full and not known["computed"]:
+        told.append(f"{value['least']:,} to {value['greatest']:,}")
+    if value["form"] == "text" and known["typed"]:
+        told.append(f"up to {value['most_bytes']} bytes")
+    if value["form"] == "number" and "default" in known:
+        told.append(f"{known['default']:,}")
+    return told
+
+
+@pytest.mark.parametrize(
+    "known",
+    [known for known in PROPERTIES["properties"] if not known["any_bytes"]],
+    ids=lambda known: str(known["key"]),
+)
+def test_a_property_has_a_row_with_its_bounds_and_its_default(known: Dict[str, Any]) -> None:
+    rows = rows_of(known["key"])
+    assert rows
+    assert any(all(told in row for told in told_of(known)) for row in rows), told_of(known)
 
 
 def test_a_wrong_line_would_be_noticed(tmp_path: Path) -> None:
