@@ -5,6 +5,7 @@ from pathlib import Path
 from typing import Any, Callable, Dict, List, Optional, Tuple, Union
 
 import _libvswitch as vs
+import drawn_keys
 import host_calls
 import host_model
 from host_calls import Allocated
@@ -50,8 +51,8 @@ NO_PORT = ""
 Setting = Tuple[str, str]
 """A port, or no port for the switch itself, and a key."""
 
-_keys_of_switch = st.sampled_from([*host_model.OF_SWITCH, host_model.NOTE])
-_keys_of_port = st.sampled_from([*host_model.OF_PORT, host_model.NOTE])
+_keys_of_switch = st.sampled_from([*drawn_keys.of("switch"), host_model.NOTE])
+_keys_of_port = st.sampled_from([*drawn_keys.of("port"), host_model.NOTE])
 settings_of_all = st.one_of(
     st.tuples(st.just(NO_PORT), _keys_of_switch),
     st.tuples(ports, _keys_of_port),
@@ -213,7 +214,9 @@ class HostMachine(RuleBasedStateMachine):
     def add_port(self, alias: str, port: str) -> None:
         refusals = self.model.refusals_to_add_port(alias, port, None)
         if self.call("VSDVS_AddDVPort", refusals, vs.VSDVS_AddDVPort, alias, port, 7) is not None:
-            self.model.switches[alias].ports[port] = Port()
+            added = self.model.switches[alias].ports[port] = Port()
+            connection = host_model.CONNECTION
+            added.properties.all[connection.key] = connection.encoded(7), host_model.CONFIG
 
     @rule(alias=aliases, port=new_ports, external=st.sampled_from(["x1", "x2", "", "x" * 48]))
     def add_opaque_port(self, alias: str, port: str, external: str) -> None:

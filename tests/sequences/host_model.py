@@ -32,27 +32,55 @@ class Property:
     least: int
     most: int
     default: int
+    outside: str = "QEX_BAD_PARAM"
+    """What the host answers for a number out of its bounds."""
 
     def encoded(self, value: int) -> bytes:
         return struct.pack(self.form, value)
 
-    def allows(self, data: bytes) -> bool:
+    def refusals(self, data: bytes) -> Refusals:
         if len(data) != struct.calcsize(self.form):
-            return False
+            return {"QEX_BAD_PARAM"}
         (value,) = struct.unpack(self.form, data)
-        return bool(self.least <= value <= self.most)
+        return set() if self.least <= value <= self.most else {self.outside}
 
 
 _PREFIX = "com.quorix.vswitch."
 MTU = Property(_PREFIX + "mtu", "<I", LEAST_MTU, MOST_MTU, DEFAULT_MTU)
 MULTICAST = Property(_PREFIX + "multicastFilter", "<I", 0, 3, 0)
-OF_SWITCH = {known.key: known for known in (MTU, MULTICAST)}
+DISABLED = Property(_PREFIX + "disabled", "<B", 0, 1, 0)
+OF_SWITCH = {known.key: known for known in (MTU, MULTICAST, DISABLED)}
 
 NESTED = Property(_PREFIX + "port.vlanNestedTag", "<B", 0, 1, 0)
 TX_UPLINK = Property(_PREFIX + "port.txUplink", "<B", 0, 1, 0)
 PRIORITY = Property(_PREFIX + "port.priority", "<i", 0, 7, -1)
 SECURITY = Property(_PREFIX + "port.security", "<I", 0, 7, 0)
-OF_PORT = {known.key: known for known in (NESTED, TX_UPLINK, PRIORITY, SECURITY)}
+_COMMON = "com.quorix.common.port."
+BLOCKED = Property(_COMMON + "block", "<B", 0, 1, 0)
+CONNECTION = Property(_COMMON + "connectid", "<I", 0, 2**32 - 1, 0)
+CLIENT_VLAN = Property(_COMMON + "qexnicVlanID", "<H", 0, MOST_VLAN, 0, "QEX_BAD_VLANID")
+PORT_TYPE = Property(_COMMON + "volatile.type", "<I", 1, 4, 1)
+PERSISTENT = Property(_COMMON + "volatile.persist", "<B", 0, 1, 0)
+PASSTHROUGH = Property(_COMMON + "ptAllowed", "<B", 0, 1, 0)
+PASSTHROUGH_NOW = Property(_COMMON + "ptAllowedRT", "<B", 0, 1, 0)
+UNTIL_READY = Property("com.quorix.port.forward.not.ready.block", "<B", 0, 1, 0)
+OF_PORT = {
+    known.key: known
+    for known in (
+        NESTED,
+        TX_UPLINK,
+        PRIORITY,
+        SECURITY,
+        BLOCKED,
+        CONNECTION,
+        CLIENT_VLAN,
+        PORT_TYPE,
+        PERSISTENT,
+        PASSTHROUGH,
+        PASSTHROUGH_NOW,
+        UNTIL_READY,
+    )
+}
 
 NOTE = "com.example.note"
 """A key without a meaning, which takes any bytes."""
@@ -74,8 +102,9 @@ class Properties:
 
     def refusals_to_set(self, key: str, data: bytes) -> Refusals:
         known = self._known.get(key)
-        fits = key == NOTE or (known is not None and known.allows(data))
-        return set() if fits else {"QEX_BAD_PARAM"}
+        if key == NOTE:
+            return set()
+        return {"QEX_BAD_PARAM"} if known is None else known.refusals(data)
 
     def refusals_to_find(self, key: str) -> Refusals:
         """To read it or to clear it: what cannot be set is not set."""

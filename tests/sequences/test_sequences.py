@@ -2,7 +2,9 @@
 
 from typing import Any, List, Type
 
+import drawn_keys
 import host_calls
+import host_model
 import pytest
 import sequences
 from host_machine import HostMachine
@@ -10,6 +12,11 @@ from host_model import Model
 
 SEED = 20
 SEQUENCES = 50
+
+
+def test_the_model_knows_what_is_drawn() -> None:
+    assert set(drawn_keys.of("switch")) == set(host_model.OF_SWITCH)
+    assert set(drawn_keys.of("port")) == set(host_model.OF_PORT)
 
 
 def test_no_sequence_ends_elsewhere_than_the_model() -> None:
