@@ -7,6 +7,7 @@
 
 #include "base/bytes.h"
 #include "model/properties/registry.h"
+#include "scenario/document.h"
 #include "tests/fuzz/harness.h"
 #include "vswitch/mac_learning.h"
 #include "vswitch/mac_tables.h"
@@ -20,7 +21,8 @@
 inline std::string consume_key(Input &input) {
   auto const known = simhost::descriptors();
   auto const index = input.ConsumeIntegralInRange<std::size_t>(0, known.size());
-  return index < known.size() ? std::string(known[index]->key) : input.ConsumeRandomLengthString(260);
+  return index < known.size() ? std::string(known[index]->key)
+                              : input.ConsumeRandomLengthString(260);
 }
 
 template <typename Record>
@@ -72,6 +74,65 @@ inline simhost::Bytes consume_mirror_table(Input &input) {
     append(bytes, consume_record_bytes<DVMirrorEntity>(input));
   }
   return bytes;
+}
+
+/// A value as documents say one of the form: within its bounds and of its words, mostly.
+inline simhost::scenario::Json consume_said(Input &input, simhost::Form const &form) {
+  using simhost::FormKind;
+  using simhost::scenario::Json;
+  switch (form.kind) {
+    case FormKind::none:
+      return nullptr;
+    case FormKind::number:
+      return input.ConsumeIntegralInRange<std::int64_t>(form.least - 1, form.greatest + 1);
+    case FormKind::boolean:
+      return input.ConsumeBool();
+    case FormKind::choice:
+      return form.words[input.ConsumeIntegralInRange<std::size_t>(0, form.words.size() - 1)].text;
+    case FormKind::bits: {
+      auto words = Json::array();
+      for (auto const &word : form.words) {
+        if (input.ConsumeBool()) {
+          words.push_back(word.text);
+        }
+      }
+      return words;
+    }
+    case FormKind::text:
+      return consume_text(input, form.most + 1);
+    case FormKind::range: {
+      auto const first = input.ConsumeIntegralInRange<std::int64_t>(form.least, form.greatest);
+      auto const last = input.ConsumeIntegralInRange<std::int64_t>(form.least, form.greatest);
+      return input.ConsumeBool() ? Json(first)
+                                 : Json(std::to_string(first) + "-" + std::to_string(last));
+    }
+    case FormKind::mac:
+      return input.ConsumeBool() ? "01:00:5e:00:00:01" : "02:00:00:00:00:01";
+    case FormKind::ip:
+      return input.ConsumeBool() ? "192.0.2.1" : "fe80::1";
+    case FormKind::record: {
+      auto said = Json::object();
+      for (auto const &member : form.members) {
+        if (member.presence == simhost::Presence::required || input.ConsumeBool()) {
+          said[std::string(member.name)] = consume_said(input, member.form);
+        }
+      }
+      return said;
+    }
+    case FormKind::one_of: {
+      auto const index = input.ConsumeIntegralInRange<std::size_t>(0, form.members.size() - 1);
+      auto const &member = form.members[index];
+      return {{std::string(member.name), consume_said(input, member.form)}};
+    }
+    case FormKind::list: {
+      auto list = Json::array();
+      for (auto left = input.ConsumeIntegralInRange(0, 3); left > 0; --left) {
+        list.push_back(consume_said(input, *form.element));
+      }
+      return list;
+    }
+  }
+  return nullptr;
 }
 
 /// Bytes of one of the forms that properties have.
