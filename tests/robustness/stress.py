@@ -21,6 +21,7 @@ from typing import Callable, Iterator, List, NamedTuple, Optional, Tuple, Type
 
 import fuzzing
 import processes
+import state_files
 import test_repeat
 import test_sweep
 
@@ -91,6 +92,11 @@ def killed(seconds: float) -> Outcome:
     return rounds, []
 
 
+def damaged(seed: int, seconds: float) -> Outcome:
+    """Damage state files, and use them."""
+    return state_files.run(seed, seconds=max(1, seconds))
+
+
 def fuzzed(name: str, seed: int, seconds: float) -> Outcome:
     corpus = fuzzing.BUILD / "corpus" / name
     inputs, wrong = fuzzing.run(name, corpus, seed, f"-max_total_time={max(1, int(seconds))}")
@@ -113,8 +119,9 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
         yield Part(f"memory, {kind}", "calls", repeat)
     yield Part("traps, in turns", "calls", whole(program, "traps.py", "in-turns", calls))
     yield Part("traps, in a row", "calls", whole(program, "traps.py", "in-a-row", calls))
+    share = SHARES["fuzzing"] / (len(fuzzing.NAMES) + 1)
+    yield Part("damaged states", "states", partial(damaged, seed), share)
     for name in fuzzing.NAMES:
-        share = SHARES["fuzzing"] / len(fuzzing.NAMES)
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
     yield Part("sequences of calls", "sequences", partial(sequences, seed), SHARES["sequences"])
     yield Part("killed processes", "rounds", killed, SHARES["kills"])
