@@ -1,9 +1,6 @@
 // A call's hold on the host.
 #include "abi/call.h"
 
-#include <SQLiteCpp/Exception.h>
-#include <sqlite3.h>
-
 #include <cstdio>
 #include <cstdlib>
 
@@ -39,8 +36,8 @@ std::vector<Fault> hits_on(std::string_view function) {
 std::vector<Fault> readable_hits_on(std::string_view function) {
   try {
     return hits_on(function);
-  } catch (SQLite::Exception const &error) {
-    if (error.getErrorCode() == SQLITE_BUSY) {
+  } catch (storage::StateFailure const &failure) {
+    if (failure.kind() == storage::FailureKind::busy) {
       throw;
     }
   } catch (std::exception const &) {

@@ -1,9 +1,6 @@
 // A row for each exception that the layers below throw.
 #include "abi/outcome.h"
 
-#include <SQLiteCpp/Exception.h>
-#include <sqlite3.h>
-
 #include <new>
 
 #include "abi/pause.h"
@@ -29,21 +26,20 @@ Outcome traps(TrapKind kind, QEX_ReturnStatus status, std::string reason,
 }
 
 // A status is for what a caller may wait out or put right.
-Outcome outcome_of(SQLite::Exception const &error) {
-  switch (error.getErrorCode()) {
-    case SQLITE_BUSY:
-      return returns(QEX_BUSY, "another process keeps the state file locked", TrapKind::os_error);
-    case SQLITE_FULL:
-      return returns(QEX_NO_SPACE, "there is no room for the state file", TrapKind::os_error);
-    case SQLITE_IOERR:
-      return returns(QEX_IO_ERROR, "the state file cannot be read or written", TrapKind::os_error);
-    case SQLITE_NOMEM:
-      return returns(QEX_NO_MEMORY, "there is no memory left", TrapKind::memory_error);
-    case SQLITE_READONLY:
-      return returns(QEX_READ_ONLY, "the state file cannot be written", TrapKind::os_error);
-    default:
-      return traps(TrapKind::os_error, QEX_IO_ERROR, error.what());
+Outcome outcome_of(storage::StateFailure const &failure) {
+  switch (failure.kind()) {
+    case storage::FailureKind::busy:
+      return returns(QEX_BUSY, failure.what(), TrapKind::os_error);
+    case storage::FailureKind::full:
+      return returns(QEX_NO_SPACE, failure.what(), TrapKind::os_error);
+    case storage::FailureKind::io:
+      return returns(QEX_IO_ERROR, failure.what(), TrapKind::os_error);
+    case storage::FailureKind::memory:
+      return returns(QEX_NO_MEMORY, failure.what(), TrapKind::memory_error);
+    case storage::FailureKind::read_only:
+      return returns(QEX_READ_ONLY, failure.what(), TrapKind::os_error);
   }
+  return traps(TrapKind::os_error, QEX_IO_ERROR, failure.what());
 }
 
 Outcome table() {
@@ -62,8 +58,8 @@ Outcome table() {
     return traps(TrapKind::runtime_error, QEX_BAD_PARAM, error.what());
   } catch (storage::UnusableState const &error) {
     return traps(TrapKind::os_error, QEX_IO_ERROR, error.what());
-  } catch (SQLite::Exception const &error) {
-    return outcome_of(error);
+  } catch (storage::StateFailure const &failure) {
+    return outcome_of(failure);
   } catch (std::bad_alloc const &) {
     return returns(QEX_NO_MEMORY, "there is no memory left", TrapKind::memory_error);
   } catch (std::exception const &error) {

@@ -8,8 +8,6 @@
 #include <limits>
 #include <utility>
 
-#include "storage/patience.h"
-
 namespace simhost::storage {
 namespace {
 
@@ -77,22 +75,40 @@ void Connection::open_file() {
   guarded([&] { database_->exec("PRAGMA cell_size_check = ON"); });
 }
 
+std::filesystem::path Connection::name() const {
+  return file_ ? file_->name() : ":memory:";
+}
+
 void Connection::refuse(std::string const &why) const {
-  refuse_file(file_ ? file_->name() : ":memory:", why);
+  refuse_file(name(), why);
+}
+
+void Connection::fail(FailureKind kind) const {
+  throw StateFailure(kind, name());
 }
 
 void Connection::refuse(SQLite::Exception const &error) const {
   switch (error.getErrorCode()) {
     case SQLITE_BUSY:
+      fail(FailureKind::busy);
     case SQLITE_FULL:
+      fail(FailureKind::full);
     case SQLITE_IOERR:
+      fail(FailureKind::io);
     case SQLITE_NOMEM:
+      fail(FailureKind::memory);
     case SQLITE_READONLY:
-      throw error;
+      fail(FailureKind::read_only);
     case SQLITE_INTERRUPT:
       refuse("it keeps a statement busy without end");
+    case SQLITE_NOTADB:
+      refuse("file is not a database");
+    case SQLITE_CORRUPT:
+      refuse("it is damaged");
+    case SQLITE_CANTOPEN:
+      refuse("it cannot be opened");
     default:
-      refuse(error.what());
+      refuse("SQLite refuses it with its code " + std::to_string(error.getErrorCode()));
   }
 }
 

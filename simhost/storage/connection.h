@@ -5,21 +5,24 @@
 #include <SQLiteCpp/Exception.h>
 #include <SQLiteCpp/Statement.h>
 
+#include <chrono>
 #include <cstdint>
 #include <map>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <thread>
 
+#include "storage/patience.h"
 #include "storage/state_file.h"
 #include "storage/state_format.h"
 
 namespace simhost::storage {
 
 /// The open database, the statements that were prepared on it, and what it is watched for: that the
-/// file stays in place, that its tables stay a state's, that no statement goes on for ever. What
-/// SQLite says is wrong with a file is thrown as UnusableState; but what a caller may wait out or
-/// put right (a lock, a full disk, a medium that can only be read) as SQLite::Exception.
+/// file stays in place, that its tables stay a state's, that no statement goes on for ever. No
+/// exception of SQLite's leaves this layer: what is wrong with a file is thrown as UnusableState,
+/// what a caller may wait out or put right as StateFailure.
 class Connection {
  public:
   /// To the file, or to a database of its own in memory.
@@ -34,6 +37,11 @@ class Connection {
   /// Runs work of SQLite's, and says of which file it is what it throws.
   template <typename Work>
   decltype(auto) guarded(Work const &work) const;
+  /// Likewise, and waits for other processes. Switching a file to write-ahead logging, and
+  /// recovering it after a crash, may return "busy" without asking SQLite's own way to wait; two
+  /// processes that open a new file together run into that.
+  template <typename Work>
+  decltype(auto) patiently(Work const &work) const;
 
   /// Requires the tables to be a state's, and from now on the file and them to stay that.
   void watch();
@@ -53,6 +61,8 @@ class Connection {
   void open_file();
   void require_schema();
   [[nodiscard]] std::uint32_t data_version() const;
+  [[nodiscard]] std::filesystem::path name() const;
+  [[noreturn]] void fail(FailureKind kind) const;
   [[noreturn]] void refuse(SQLite::Exception const &error) const;
 
   std::optional<StateFile> file_;
@@ -72,6 +82,21 @@ decltype(auto) Connection::guarded(Work const &work) const {
     refuse(error);
   } catch (WrongFormat const &error) {
     refuse(error.what());
+  }
+}
+
+template <typename Work>
+decltype(auto) Connection::patiently(Work const &work) const {
+  auto const deadline = std::chrono::steady_clock::now() + kPatience;
+  while (true) {
+    try {
+      return guarded(work);
+    } catch (StateFailure const &failure) {
+      if (failure.kind() != FailureKind::busy || std::chrono::steady_clock::now() >= deadline) {
+        throw;
+      }
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
   }
 }
 

@@ -15,19 +15,19 @@ Query::~Query() {
 }
 
 Query &Query::with(std::int64_t value) {
-  statement_.bind(++bound_, value);
+  connection_.guarded([&] { statement_.bind(++bound_, value); });
   return *this;
 }
 
 Query &Query::with(std::string_view text) {
-  statement_.bind(++bound_, std::string(text));
+  connection_.guarded([&] { statement_.bind(++bound_, std::string(text)); });
   return *this;
 }
 
 Query &Query::with(std::span<std::byte const> bytes) {
   // SQLite takes no bytes at a null address for NULL, which is not the same as no bytes.
   void const *const first = bytes.empty() ? "" : static_cast<void const *>(bytes.data());
-  statement_.bind(++bound_, first, static_cast<int>(bytes.size()));
+  connection_.guarded([&] { statement_.bind(++bound_, first, static_cast<int>(bytes.size())); });
   return *this;
 }
 

@@ -141,11 +141,30 @@ bool is_as_old(struct stat const &left, struct stat const &right) {
          left.st_mtim.tv_nsec == right.st_mtim.tv_nsec && left.st_size == right.st_size;
 }
 
+std::string failure_text(FailureKind kind, std::string const &file) {
+  switch (kind) {
+    case FailureKind::busy:
+      return "another process keeps the state file " + file + " locked";
+    case FailureKind::full:
+      return "there is no room for the state file " + file;
+    case FailureKind::io:
+      return "the state file " + file + " cannot be read or written";
+    case FailureKind::memory:
+      return "there is no memory left for the state file " + file;
+    case FailureKind::read_only:
+      return "the state file " + file + " cannot be written";
+  }
+  return "the state file " + file + " cannot be used";
+}
+
 }  // namespace
 
 void refuse_file(std::filesystem::path const &file, std::string const &why) {
   throw UnusableState("the state file " + file.string() + " cannot be used: " + why);
 }
+
+StateFailure::StateFailure(FailureKind kind, std::filesystem::path const &file)
+    : std::runtime_error(failure_text(kind, file.string())), kind_(kind) {}
 
 struct StateFile::Taken {
   explicit Taken(std::filesystem::path given) : name(std::move(given)) {}

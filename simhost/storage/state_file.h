@@ -14,6 +14,26 @@ class UnusableState : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
+/// What keeps work on a state that can be used from being done now.
+enum class FailureKind {
+  busy,       ///< another process keeps it locked
+  full,       ///< there is no room for it
+  io,         ///< it cannot be read or written
+  memory,     ///< there is no memory left
+  read_only,  ///< it cannot be written
+};
+
+/// Work on a state failed for something that a caller may wait out or put right; what() says of
+/// which file.
+class StateFailure : public std::runtime_error {
+ public:
+  StateFailure(FailureKind kind, std::filesystem::path const &file);
+  [[nodiscard]] FailureKind kind() const { return kind_; }
+
+ private:
+  FailureKind kind_;
+};
+
 /// Throws UnusableState.
 [[noreturn]] void refuse_file(std::filesystem::path const &file, std::string const &why);
 

@@ -4,7 +4,6 @@
 #include <utility>
 
 #include "storage/connection.h"
-#include "storage/patience.h"
 #include "storage/schema.h"
 
 namespace simhost::storage {
@@ -29,7 +28,7 @@ void Store::prepare(Populate const &populate) {
   auto &database = connection_->database();
   auto const &file = connection_->file();
   // Nothing may be written before it is known what is there.
-  auto const version = patiently([&] {
+  auto const version = connection_->patiently([&] {
     // In one transaction, or another process could create the state between two of the questions.
     Transaction const look(*this, Access::read);
     return version_of(database);
@@ -38,16 +37,16 @@ void Store::prepare(Populate const &populate) {
     refuse("it has no state of this version in it, and this program may only look at it");
   }
   if (version == kBlank && file) {
-    patiently([&] { database.exec("PRAGMA journal_mode = WAL"); });
+    connection_->patiently([&] { database.exec("PRAGMA journal_mode = WAL"); });
   }
   if (version != kSchemaVersion) {
-    patiently([&] { create_or_bring_forward(populate); });
+    connection_->patiently([&] { create_or_bring_forward(populate); });
   }
   if (file) {
     // A commit is in the operating system's hands when it returns, so it outlives a killed process;
     // waiting for the disk as well would only guard against a power cut.
     database.exec("PRAGMA synchronous = NORMAL");
-    patiently([&] {
+    connection_->patiently([&] {
       Transaction const look(*this, Access::read);
       connection_->watch();
     });

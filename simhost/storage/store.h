@@ -17,7 +17,7 @@ class Connection;
 
 /// A connection to the state. Not safe for use by several threads at once, nor across a fork. What
 /// is wrong with a file is thrown as UnusableState; but what a caller may wait out or put right (a
-/// lock, a full disk, a medium that can only be read) as SQLite::Exception.
+/// lock, a full disk, a medium that can only be read) as StateFailure.
 class Store {
  public:
   using Populate = std::function<void(Transaction &)>;
@@ -49,7 +49,7 @@ enum class Access { read, write };
 /// goes without a commit. A writer waits for the writers of other processes; a reader never waits.
 class Transaction {
  public:
-  /// Throws SQLite::Exception (SQLITE_BUSY) when the wait for other writers takes too long.
+  /// Throws StateFailure (busy) when the wait for other writers takes too long.
   Transaction(Store &store, Access access);
   ~Transaction();
   Transaction(Transaction const &) = delete;

@@ -2,7 +2,6 @@
 #include "storage/state_file.h"
 
 #include <SQLiteCpp/Database.h>
-#include <SQLiteCpp/Exception.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sqlite3.h>
@@ -232,8 +231,10 @@ TEST_F(StateFileAsRoot, OfRootMayBeLookedAtAndNotChanged) {
     try {
       add(store, "b");
       return false;
-    } catch (SQLite::Exception const &error) {
-      return error.getErrorCode() == SQLITE_READONLY && has(store, "a");
+    } catch (simhost::storage::StateFailure const &failure) {
+      return failure.kind() == simhost::storage::FailureKind::read_only &&
+             failure.what() == "the state file " + file.string() + " cannot be written" &&
+             has(store, "a");
     }
   }));
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(file.parent_path()), {}), 1)
@@ -466,7 +467,7 @@ TEST(StateFile, ThatIsDamagedIsNamed) {
               Store store(file, populate_nothing);
               has(store, "a");
             }),
-            refused(file, "database disk image is malformed"));
+            refused(file, "it is damaged"));
 }
 
 }  // namespace

@@ -2,7 +2,6 @@
 #include "storage/store.h"
 
 #include <SQLiteCpp/Database.h>
-#include <SQLiteCpp/Exception.h>
 #include <gtest/gtest.h>
 
 #include <cstdint>

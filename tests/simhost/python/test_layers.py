@@ -95,6 +95,28 @@ def tracked(*folders: str) -> List[Path]:
     return [ROOT / name for name in listed.split("\0") if name]
 
 
+def outside_storage(path: Path) -> bool:
+    return (ROOT / "simhost" / "storage") not in path.parents
+
+
+def sqlite_includes(text: str) -> List[str]:
+    """The database is the storage's own matter, exceptions and all."""
+    return re.findall(r"^\s*#\s*include\s+<(?:SQLiteCpp/|sqlite3).*$", text, re.MULTILINE)
+
+
+def test_only_the_storage_knows_its_database() -> None:
+    inside = (ROOT / "simhost" / "storage" / "connection.h").read_text(encoding="utf-8")
+    assert sqlite_includes(inside) != []
+    found = {
+        str(path): lines
+        for path in tracked("simhost")
+        if path.suffix in (".h", ".cpp") and path.exists() and outside_storage(path)
+        for lines in [sqlite_includes(path.read_text(encoding="utf-8"))]
+        if lines
+    }
+    assert found == {}
+
+
 def upward_includes(text: str) -> List[str]:
     return re.findall(r'^\s*#\s*include\s+"\.\.?/.*$', text, re.MULTILINE)
 
