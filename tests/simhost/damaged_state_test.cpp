@@ -6,11 +6,13 @@
 #include <filesystem>
 #include <string>
 
+#include "base/outcomes.h"
 #include "faults/faults.h"
 #include "planes/stored/stored_plane.h"
 #include "scenario/scenario.h"
 #include "storage/store.h"
 #include "temporary_folder.h"
+#include "vswitch/teaming.h"
 
 namespace {
 
@@ -108,6 +110,17 @@ TEST(DamagedState, SaysWhatIsWrongWithIt) {
 
 TEST(DamagedState, WithWhatNothingRefersToIsRead) {
   EXPECT_EQ(complaint_after("UPDATE switch SET version = 7"), "");
+}
+
+TEST(DamagedState, HasNoMoreNamesInATeamingPolicyThanThereIsRoomFor) {
+  std::string everything;
+  for (std::size_t byte = 0; byte < sizeof(VSTeamPolicy); ++byte) {
+    everything += "FF";
+  }
+  EXPECT_THROW(complaint_after("INSERT INTO property (switch, scope, name, type, value)"
+                               " VALUES (1, 0, 'com.quorix.vswitch.teaming', 1, x'" +
+                               everything + "')"),
+               simhost::Refused);
 }
 
 TEST(DamagedState, MissesWhatIsReferredTo) {

@@ -91,8 +91,12 @@ struct Named {
 
 Named named_by(Team const &team, VSTeamPolicy const &policy) {
   Named named{.names = {}, .active = policy.numActive};
-  for (auto const &name :
-       std::span(policy.uplinkPortName).first(std::size_t{policy.numActive} + policy.numStandby)) {
+  auto const count = std::size_t{policy.numActive} + policy.numStandby;
+  // Only a state that this host did not write holds more than it accepts.
+  if (count > std::size(policy.uplinkPortName)) {
+    throw Refused(QEX_INVALID_METADATA, "a teaming policy in the state is damaged");
+  }
+  for (auto const &name : std::span(policy.uplinkPortName).first(count)) {
     named.names.push_back(text_in(name));
   }
   if (named.names.empty()) {
