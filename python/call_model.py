@@ -28,7 +28,7 @@ class Direction(enum.Enum):
 
 
 class Ownership(enum.Enum):
-    """Whose memory is behind an argument or a result, once the call has returned."""
+    """Whose memory an argument or a result points to, once the call has returned."""
 
     VALUE = "a value, a text or a handle: nobody has to care for memory"
     CALLER = "the caller's, which the call reads or fills and does not keep"
@@ -196,7 +196,7 @@ def _value(known: Definitions, function: Function, one: Parameter, direction: Di
 
 
 def _is_memory_of_the_caller(known: Definitions, one: Parameter, direction: Direction) -> bool:
-    """Whether more is behind it than a text, a handle, a function or the number of an output."""
+    """Whether it points to more than a text, a handle, a function or the number of an output."""
     type_ = known.resolve(one.type)
     if type_.name in known.records:
         return type_.is_pointer

@@ -74,8 +74,8 @@ def _of_numbers(types: PythonTypes) -> str:
     for name in sorted(NUMBERS):
         spellings.setdefault(types.pointer(Type(("p",), name)), []).append(name)
     for name in known.typedefs:
-        behind = known.resolve(Type((), name))
-        if not behind.layers and behind.name in NUMBERS and " " not in name:
+        original = known.resolve(Type((), name))
+        if not original.layers and original.name in NUMBERS and " " not in name:
             spellings.setdefault(types.pointer(Type(("p",), name)), []).append(name)
     return "".join(
         _form(f"int, {pointer}", names, "_Numbers") for pointer, names in spellings.items()

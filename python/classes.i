@@ -9,7 +9,7 @@
 //   %table(RECORD, count)         a record that is a sequence, and how many elements it has: a field
 //                                 or a number
 //   %counted(RECORD::field, count)  an array without a size, and the field that counts its elements
-//   %answers(METHOD, type)        what a method returns, where the definitions only say an object
+//   %returns(METHOD, type)        what a method returns, where the definitions only say an object
 //   %null(METHOD, when)           that it returns null never, or only on a failure
 
 %module libvswitch
@@ -38,8 +38,8 @@
 %feature("count", "COUNT") FIELD;
 %enddef
 
-%define %answers(METHOD, TYPE...)
-%feature("answers", "TYPE") METHOD;
+%define %returns(METHOD, TYPE...)
+%feature("returns", "TYPE") METHOD;
 %enddef
 
 %define %null(METHOD, WHEN)
@@ -94,14 +94,14 @@
 %counted(VSPortVlanPolicy::vidRanges, numRanges)
 %counted(qex_NEBPortVlanInfo::vidRanges, numRanges)
 
-%answers(VSMcastFilters::get_mac_entry, str)
-%answers(VSMcastFilters::get_ip_entry, str)
-%answers(VSMcastFilters::get_ipv6_entry, str)
-%answers(VSMcastFilterStats::get_ip_entry, str)
-%answers(VSMcastFilterStats::get_ipv6_entry, str)
-%answers(VSRuntimeOptionHeader::get_option_value, Union[int, bytes])
-%answers(DVMirrorEntity::get_entity, str)
-%answers(VSDVMirrorSessionIDs::__getitem__, bytes)
+%returns(VSMcastFilters::get_mac_entry, str)
+%returns(VSMcastFilters::get_ip_entry, str)
+%returns(VSMcastFilters::get_ipv6_entry, str)
+%returns(VSMcastFilterStats::get_ip_entry, str)
+%returns(VSMcastFilterStats::get_ipv6_entry, str)
+%returns(VSRuntimeOptionHeader::get_option_value, Union[int, bytes])
+%returns(DVMirrorEntity::get_entity, str)
+%returns(VSDVMirrorSessionIDs::__getitem__, bytes)
 
 %null(VSUplinks::__getitem__, failure)
 %null(VSUplinkPorts::__getitem__, failure)

@@ -13,13 +13,13 @@ from typing import Dict, Iterator, List, Optional, Tuple
 _Attributes = Dict[str, str]
 
 _SIZES = ("char", "short", "int", "long long")
-# What numbers are behind their other names.
+# What numbers are by their own names.
 NUMBERS = [*_SIZES, *(f"unsigned {size}" for size in _SIZES), "signed char"]
 
 
 @dataclass(frozen=True)
 class Type:
-    """A C type: a name behind pointers ("p."), arrays ("a(3).", "a()."), in the generator's order.
+    """A C type: a name after pointers ("p."), arrays ("a(3).", "a()."), in the generator's order.
 
     Qualifiers are dropped. A function is one word, "f(...)", with its result as the name.
     """
@@ -78,14 +78,14 @@ class Function:
     result: Type
     doc: str
     takes_more: bool = False
-    answers: str = ""  # in Python, where the C type says nothing
-    owns_elements: bool = False  # answers a new array
-    null: str = ""  # when it answers null: "never", only on "failure", or in the course of things
+    returns: str = ""  # in Python, where the C type says nothing
+    owns_elements: bool = False  # returns a new array
+    null: str = ""  # when it returns null: "never", only on "failure", or in the course of things
     helper: str = ""  # of a method: the function of helpers/ that it is
     c_result: str = ""
     family: str = ""  # of a call of the host, as interface/calls names it
     is_by_hand: bool = False  # in the class's base
-    deallocator: str = ""  # of what a call leaves behind pointers, unless `said` names another
+    deallocator: str = ""  # of what a call allocates, unless `said` names another
     said: Dict[Tuple[str, str], str] = field(default_factory=dict, hash=False)
 
     def says(self, kind: str, name: str) -> str:
@@ -144,11 +144,11 @@ class Definitions:
     typedefs: Dict[str, Type] = field(default_factory=dict)
 
     def resolve(self, given: Type) -> Type:
-        """The type behind typedefs; a record keeps its name."""
+        """The type without typedefs; a record keeps its name."""
         layers, name = given.layers, _bare(given.name)
         while name not in self.records and name in self.typedefs:
-            behind = self.typedefs[name]
-            layers, name = layers + behind.layers, _bare(behind.name)
+            original = self.typedefs[name]
+            layers, name = layers + original.layers, _bare(original.name)
         return Type(layers, name)
 
     def forms(self) -> Dict[str, List[Function]]:
@@ -159,9 +159,9 @@ class Definitions:
         return found
 
     def records_behind_pointers(self) -> List[str]:
-        """Records that calls hand out through a pointer to a pointer of the caller's."""
-        behind = (self.resolve(one.type) for call in self.functions for one in call.inputs)
-        names = {one.name for one in behind if one.layers == ("p", "p")}
+        """Records that calls allocate through a pointer to a pointer of the caller's."""
+        original = (self.resolve(one.type) for call in self.functions for one in call.inputs)
+        names = {one.name for one in original if one.layers == ("p", "p")}
         return sorted(names & set(self.records))
 
 
@@ -263,7 +263,7 @@ def _function(node: ET.Element, seen: _Attributes) -> Function:
         _type(result),
         _text(seen),
         takes_more=len(named) != len(parameters),
-        answers=seen.get("feature_answers", ""),
+        returns=seen.get("feature_returns", ""),
         owns_elements=seen.get("feature_new") == "1",
         null=seen.get("feature_null", ""),
         helper=seen.get("feature_helper", ""),

@@ -8,7 +8,7 @@ from stub_text import constants, function
 
 _FLAT_HEAD = '''"""Flat functions over the libraries through which a host controls its switches.
 
-Every function takes its arguments by position. A call with outputs answers a list, the status
+Every function takes its arguments by position. A call with outputs returns a list, the status
 first; lists of a fixed shape are spelled as tuples here, which is the only way to say what is at
 which place. A null pointer is None; where only a failure brings one, the type says
 `Union[..., Any]`, so that whoever has looked at the status need not ask again.

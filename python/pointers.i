@@ -132,7 +132,7 @@ PyObject *write_memory(PyObject *object, size_t offset, PyObject *bytes) {
   return SWIG_Py_Void();
 }
 
-/* A function that answers 1 or 0, as another does by its truth, None being true; what that raises is
+/* A function that returns 1 or 0, as another does by its truth, None being true; what that raises is
    appended to a list, and the answer is 0. There is no frame of Python's in which it could be lost. */
 PyObject *guarded(PyObject *function, PyObject *raised) {
   PyObject *both = Py_BuildValue("OO", function, raised);

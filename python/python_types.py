@@ -62,11 +62,11 @@ class PythonTypes:
     def arguments(self, function: Function) -> List[Tuple[str, str]]:
         """Names and types; where elements are counted or picked, an array is one."""
         found = []
-        for one, behind in zip(function.inputs, [*function.inputs[1:], None]):
+        for one, following in zip(function.inputs, [*function.inputs[1:], None]):
             type_ = self.argument(one)
             target = self.known.resolve(one.type).target.name
             is_array = function.name.endswith(("Array", "Array_getitem", "Array_setitem"))
-            is_counted = behind is not None and behind.name in ("count", "numRanges")
+            is_counted = following is not None and following.name in ("count", "numRanges")
             if self.prefix and target in self.known.records and (is_counted or is_array):
                 if self.known.resolve(one.type).is_pointer:
                     type_ = type_.replace(target, f"Union[{target}, Array[{target}]]")
@@ -93,7 +93,7 @@ class PythonTypes:
         return f"Optional[{found}]" if type_.layers else found
 
     def result(self, function: Function) -> str:
-        """What a function answers."""
+        """What a function returns."""
         first = self._single_result(function)
         if not function.outputs:
             return first
@@ -101,8 +101,8 @@ class PythonTypes:
 
     def _single_result(self, function: Function) -> str:
         type_ = self.known.resolve(function.result)
-        if function.answers:
-            return function.answers
+        if function.returns:
+            return function.returns
         if not type_.layers:
             if type_.name == "void":
                 return "None"
@@ -128,7 +128,7 @@ class PythonTypes:
         return "str" if target.name == "char" and one.type.name == "char" else "int"
 
     def read(self, field: Field) -> str:
-        """What a flat reader answers."""
+        """What a flat reader returns."""
         type_ = self.known.resolve(field.type)
         if field.reads_as_text or (type_.is_array and type_.layers[1:] == () and _is_text(type_)):
             return "str"

@@ -5,7 +5,7 @@ the flat functions of `_libvswitch` in a shape that frees memory, checks bounds 
 Beyond them there are:
 
     Cell      memory of a C type, for calls that fill or read what a pointer points to
-    owned     gives back what the library handed out, at the end of a block
+    owned     releases what the library allocated, at the end of a block
     Callback  a Python function that the library may call
 
 `python3 -m libvswitch.doctor` says what is wrong when this does not load.

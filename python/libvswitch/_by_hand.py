@@ -18,7 +18,7 @@ _HEADER = 4  # bytes before the value of a runtime option, and before the first 
 
 
 class LagTable(_records.Table["_classes.VSLAGStatus"]):
-    """A sequence of groups, which lie one behind the other, each as long as its uplinks make it."""
+    """A sequence of groups, which lie one after the other, each as long as its uplinks make it."""
 
     def __len__(self) -> int:
         self._require()

@@ -8,7 +8,7 @@ from typing import Dict
 
 _TIMEOUT = 60
 
-# Loads the module, and answers which files that brought in and how large records are: as the
+# Loads the module, and tells which files that brought in and how large records are: as the
 # classes know it, and as the room shows that the flat constructors make.
 LOADING = """
 import json, sys

@@ -140,7 +140,7 @@ def _host(report: Report, module: _elf.Elf) -> List[_elf.Elf]:
 
 def _library(report: Report, name: str, module: _elf.Elf) -> Optional[_elf.Elf]:
     """The file that the loader takes: it passes over those that are for other machines or not to
-    be read, and gives up at one that is no library."""
+    be read, and stops at one that is no library."""
     for path in _loader.candidates(name, module):
         try:
             machine = _elf.machine_of(path)
@@ -281,7 +281,7 @@ def _sizes(report: Report, sizes: Dict[str, List[int]]) -> None:
 
 
 def _simulation(report: Report) -> None:
-    """What the simulated host is told by its variables, and whether it answers then."""
+    """What the simulated host is told by its variables, and whether a call succeeds then."""
     state, scenario = (os.environ.get(name) or None for name in (_STATE, _SCENARIO))
     report.simulation = {_STATE: state, _SCENARIO: scenario}
     kept = f"is {state}: the host is kept there" if state else "is not set: the host is in memory"
@@ -295,15 +295,15 @@ def _simulation(report: Report) -> None:
     except (_examined.NotExamined, OSError, subprocess.SubprocessError) as error:
         why = str(error)
     if not why:
-        report.add(OK, "simulation", "the host answers a call")
+        report.add(OK, "simulation", "a call of the host succeeds")
         return
     named = " and ".join(name for name, value in report.simulation.items() if value)
     advice = f"correct what {named} tells the host, or unset it" if named else _BUILD
-    report.add(ERROR, "simulation", f"the host answers no call: {why}", advice)
+    report.add(ERROR, "simulation", f"no call of the host succeeds: {why}", advice)
 
 
 def _first_call(state: Optional[str], scenario: Optional[str], folder: Path) -> str:
-    """Why a host that is told so answers no call; empty if it does."""
+    """Why no call succeeds on a host that is told so; empty if one does."""
     environment = dict(os.environ)
     if scenario and os.path.exists(scenario) and not os.path.isdir(scenario):
         _examined.require_plain(Path(scenario))

@@ -192,7 +192,7 @@ class Cell(_records._Pointing):
         else:
             shown, available = None, _records.room(pointing)
         if available is None:
-            raise ValueError(f"nothing tells how many bytes there are behind this {self.type}")
+            raise ValueError(f"nothing tells how many bytes this {self.type} points to")
         if count > available:
             raise ValueError(f"{count} bytes are more than the {available} that there are")
         return _pointers.read_memory(pointing, 0, count) if shown is None else shown[:count]

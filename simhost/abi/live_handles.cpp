@@ -16,7 +16,7 @@ namespace {
 template <typename Found>
 Found alive(std::optional<Found> found, char const *kind, void const *handle) {
   if (!found) {
-    throw Trapped(TrapKind::runtime_error, std::string("the ") + kind + " behind the handle " +
+    throw Trapped(TrapKind::runtime_error, std::string("the ") + kind + " of the handle " +
                                                text_of_address(handle) + " is gone");
   }
   return *std::move(found);

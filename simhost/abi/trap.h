@@ -1,4 +1,4 @@
-// The call trap: springing it, and keeping where it leads.
+// The call trap: how it is sprung, and where it leads.
 #pragma once
 
 #include <setjmp.h>

@@ -232,7 +232,7 @@ std::string fault_line(Json const &fault) {
     line += fmt::format(": waits {} s", fault["delay"].get<double>());
   }
   if (fault.contains("status")) {
-    line += ": answers " + fault["status"].get<std::string>();
+    line += ": returns " + fault["status"].get<std::string>();
   }
   if (fault.contains("exception")) {
     line += fmt::format(": {}: {}", fault["exception"].get<std::string>(),

@@ -39,7 +39,7 @@ void check_effect(Fault const &fault) {
   bool const status = fault.status != QEX_OK;
   bool const exception = !fault.exception.empty();
   if (status && !get_call(fault.function).answers_status) {
-    throw Refused(QEX_NOT_SUPPORTED, fmt::format("{} answers no status", fault.function));
+    throw Refused(QEX_NOT_SUPPORTED, fmt::format("{} returns no status", fault.function));
   }
   if (status && exception) {
     throw Refused(QEX_BAD_PARAM, "a call has a status or an exception, not both");

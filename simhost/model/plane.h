@@ -109,7 +109,7 @@ class Plane {
   virtual std::vector<std::string> counting_sessions(storage::Transaction &transaction,
                                                      storage::SwitchKey key) = 0;
 
-  // What callers change of what runs.
+  // What callers change of the runtime state.
 
   virtual void set_admin_state(storage::Transaction &transaction, std::string_view uplink,
                                bool up) = 0;

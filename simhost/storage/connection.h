@@ -1,4 +1,4 @@
-// The database behind a state, which this host did not always write. Private to this layer.
+// The database of a state, which this host did not always write. Private to this layer.
 #pragma once
 
 #include <SQLiteCpp/Database.h>

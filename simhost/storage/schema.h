@@ -15,7 +15,7 @@ inline constexpr std::int64_t kOldestSchema = 3;
 
 /// Creates the tables of an empty database.
 extern char const *const kSchema;
-/// Likewise those of what runs on the configuration that the tables of kSchema hold.
+/// Likewise those of the runtime state of the configuration that the tables of kSchema hold.
 extern char const *const kRunningSchema;
 /// Likewise the generations of the switches that are there.
 extern char const *const kGenerationSchema;

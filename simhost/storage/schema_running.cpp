@@ -1,4 +1,5 @@
-// The tables of what runs: what the data plane knows, the clock, the faults that are waiting.
+// The tables of the runtime state: what the data plane knows, the clock, the faults that are
+// waiting.
 #include "storage/schema.h"
 
 namespace simhost::storage {

@@ -25,7 +25,7 @@ def test_a_view_of_an_item_is_read_as_it_was(switch: str, switch_id: str) -> Non
     assert vs.DVSData_Data(item.value, data) == 4
     again = Cell("DVSDataItem")
     assert vs.VSDVS_SetMTU(switch, 9000) == vs.QEX_OK
-    # The item behind the first is another one from here on.
+    # The item after the first is another one from here on.
     assert vs.DVSState_GlobalPropLookup(switch_id, vs.VSPROP_MTU, again) == vs.QEX_OK
     assert data.read(4) == (1500).to_bytes(4, "little")
     with pytest.raises(ValueError, match="^5 bytes are more than the 4 "):

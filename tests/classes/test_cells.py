@@ -103,7 +103,7 @@ def test_lists_and_items(switch_id: str) -> None:
     assert vs.DVSData_Name(item.value) == vs.VSPROP_MTU
     assert vs.DVSData_Data(item.value, data.pointer) == 4
     assert int.from_bytes(data.read(4), "little") == 1500
-    # A look at the state is nobody's to give back.
+    # A look at the state is nobody's to release.
     with pytest.raises(ValueError, match="name the deallocator"):
         vs.owned(item)
 

@@ -20,7 +20,7 @@ NAMES = sorted({one.name for one in functions.read() if one.kind == "call"})
 REFUSED_ALONE = {"DVSQEX_CmdExec"}
 UNTRAPPED = {"Panic", "QEX_ReturnStatusToString"}
 DEALLOCATORS = {"VSDVS_FreeMemory", "VSQEX_FreeMemory", "DVSQEX_DataFree", "DVSData_Free"}
-# What a copy of an item answers by itself.
+# What a copy of an item returns by itself.
 OF_ITEMS = {"DVSData_Name", "DVSData_Data", "DVSData_PropType"}
 WITH_STATUS = sorted(
     {one.name for one in functions.read() if one.kind == "call" and "status" in one.result}
@@ -423,7 +423,7 @@ def test_lists_end_once(host: Host) -> None:
 
 
 def test_a_list_with_an_allocator_of_its_own(host: Host) -> None:
-    """What it allocates goes back to it, and the host's ledger never hears of that."""
+    """What it allocates is released to it, and the host's ledger never hears of that."""
     import ctypes
 
     from libvswitch import _pointers

@@ -193,7 +193,7 @@ def test_a_simulated_host_without_variables(monkeypatch: pytest.MonkeyPatch) -> 
     assert text_of(found, "simulation") == (
         "SIMHOST_STATE is not set: the host is in memory "
         "for a fresh host SIMHOST_SCENARIO is not set: it is the usual one "
-        "the host answers a call"
+        "a call of the host succeeds"
     )
 
 
@@ -211,7 +211,7 @@ def test_a_state_that_cannot_be_used(tmp_path: Path, monkeypatch: pytest.MonkeyP
     for file in (tmp_path / "nowhere" / "host.db", tmp_path):
         monkeypatch.setenv("SIMHOST_STATE", str(file))
         text, advice = simulated_error()
-        assert text.startswith("the host answers no call: OSError: ")
+        assert text.startswith("no call of the host succeeds: OSError: ")
         assert f"the state file {file} cannot be used: " in text
         assert advice == "correct what SIMHOST_STATE tells the host, or unset it"
 

@@ -1,4 +1,4 @@
-"""Memory of the library goes back once, by the right deallocator, and is not used afterwards."""
+"""Memory of the library is released once, by the right deallocator, and is not used afterwards."""
 
 from typing import Any, Callable, List
 
@@ -83,7 +83,7 @@ def test_the_caller_chooses_the_deallocator(switch: str) -> None:
 
 
 def test_the_host_counts_it_once(switch: str) -> None:
-    """Its ledger gives up on the second return, which the flat function would bring about."""
+    """Its ledger traps at the second release, which the flat function would bring about."""
     _, uplinks = vs.VSQEX_GetUplinks(switch)
     memory = vs.Pointer(int(uplinks), "void *", None)
     with vs.owned(uplinks):

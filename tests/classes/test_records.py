@@ -339,7 +339,7 @@ def test_records_are_freed_when_collected() -> None:
 
 
 def test_a_record_that_is_never_freed_would_be_noticed() -> None:
-    """What the test above looks for is there when ownership is given up."""
+    """What the test above looks for is there when ownership is dropped."""
     done = run(
         "import resource, libvswitch as vs\n"
         "def peak(): return resource.getrusage(resource.RUSAGE_SELF).ru_maxrss\n"

@@ -200,7 +200,7 @@ def describe(simhost: Any) -> None:
 
 
 def calls(simhost: Any) -> Dict[str, Callable[[], object]]:
-    """A call of each family, with what goes back to the host given back."""
+    """A call of each family, with what it allocates released."""
     switch, port = "vswitch0", "web-1"
     identifier = "5f0c7a1e-27c4-4b61-9d0e-6a5b8f3d2c10"
 

@@ -12,7 +12,7 @@ import simhost
 
 README = Path(__file__).resolve().parents[2] / "simhost/python/README.md"
 DOCTOR = "python3 -m libvswitch.doctor says which host is loaded, and from where."
-ADVICE = "Give each block back once; libvswitch.owned does at the end of its block of code."
+ADVICE = "Release each block once; libvswitch.owned does at the end of its block of code."
 
 # What the tests within the tests use, with the flat module or with the classes.
 HEADS = {
@@ -441,15 +441,15 @@ except Exception as error:
     print(type(error).__name__)
 """
     file = str(tmp_path / "shared.db")
-    answers = []
+    printed = []
     for asked in ("control.state_file()", ""):
         done = subprocess.run(
             [sys.executable, "-c", code.format(asked=asked, file=file)],
             capture_output=True,
             text=True,
         )
-        answers.append(done.stdout.split())
-    assert answers == [["None"], [file, "HostRefused"]]
+        printed.append(done.stdout.split())
+    assert printed == [["None"], [file, "HostRefused"]]
     assert not Path(file).exists()
 
 

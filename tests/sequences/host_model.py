@@ -33,7 +33,7 @@ class Property:
     most: int
     default: int
     outside: str = "QEX_BAD_PARAM"
-    """What the host answers for a number out of its bounds."""
+    """What the host returns for a number out of its bounds."""
 
     def encoded(self, value: int) -> bytes:
         return struct.pack(self.form, value)

@@ -164,7 +164,7 @@ TEST_F(Boundary, MemoryGivenBackTwiceSpringsTheTrap) {
   auto *const list = uplinks();
   VSQEX_FreeMemory(list);
   EXPECT_EQ(raised_by([=] { VSQEX_FreeMemory(list); }),
-            gave_up_with("VSQEX_FreeMemory: the memory at " + text_of(list) +
+            trapped_with("VSQEX_FreeMemory: the memory at " + text_of(list) +
                          " is given back twice: VSQEX_GetUplinks gave it out, "
                          "VSQEX_FreeMemory took it back"));
   EXPECT_EQ(exception_status, 1);
@@ -174,7 +174,7 @@ TEST_F(Boundary, TheOtherDoorKnowsItToo) {
   auto *const list = uplinks();
   VSQEX_FreeMemory(list);
   EXPECT_EQ(raised_by([=] { VSDVS_FreeMemory(list); }),
-            gave_up_with("VSDVS_FreeMemory: the memory at " + text_of(list) +
+            trapped_with("VSDVS_FreeMemory: the memory at " + text_of(list) +
                          " is given back twice: VSQEX_GetUplinks gave it out, "
                          "VSQEX_FreeMemory took it back"));
 }
@@ -184,7 +184,7 @@ TEST_F(Boundary, TheThirdDoorTakesMemoryBackToo) {
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }), std::nullopt);
   EXPECT_EQ(simhost_ledger_count(), 0U);
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }),
-            gave_up_with("DVSQEX_DataFree: the memory at " + text_of(list) +
+            trapped_with("DVSQEX_DataFree: the memory at " + text_of(list) +
                          " is given back twice: VSQEX_GetUplinks gave it out, "
                          "DVSQEX_DataFree took it back"));
 }
@@ -193,7 +193,7 @@ TEST_F(Boundary, MemoryOfTheCallerSpringsTheTrap) {
   VSInfo info{};
   EXPECT_EQ(
       raised_by([&] { VSQEX_FreeMemory(&info); }),
-      gave_up_with("VSQEX_FreeMemory: the host never gave out the memory at " + text_of(&info)));
+      trapped_with("VSQEX_FreeMemory: the host never gave out the memory at " + text_of(&info)));
 }
 
 TEST_F(Boundary, AfterTheTrapTheHostGoesOn) {

@@ -47,7 +47,7 @@ inline Bytes operator+(Bytes left, Bytes const &right) {
   return left;
 }
 
-/// What a raw property call hands out, given back at once.
+/// What a raw call allocates, released at once.
 inline Bytes taken(void *data, int length) {
   auto const *const first = static_cast<unsigned char const *>(data);
   Bytes bytes(first, first + length);

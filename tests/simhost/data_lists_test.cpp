@@ -55,7 +55,7 @@ TEST_F(DataLists, UseTheCallersAllocator) {
   EXPECT_EQ(raised_by([=] { DVSData_Free(list); }), std::nullopt);
   EXPECT_EQ(blocks_out, 0);
   EXPECT_EQ(raised_by([=] { DVSData_Free(list); }),
-            gave_up_with("DVSData_Free: the list " + text_of(list) + " is freed already"));
+            trapped_with("DVSData_Free: the list " + text_of(list) + " is freed already"));
 }
 
 TEST_F(DataLists, AnAllocatorMayRunDry) {
@@ -146,7 +146,7 @@ TEST_F(MeddlingAllocator, MayFreeTheListThatItAllocatesFor) {
   meddle = [] { DVSData_Free(meddled_with); };
   EXPECT_EQ(
       raised_by([] { update_meddled_with("n"); }),
-      gave_up_with("DVSData_Update: the list " + text_of(meddled_with) + " is freed already"));
+      trapped_with("DVSData_Update: the list " + text_of(meddled_with) + " is freed already"));
   EXPECT_EQ(std::exchange(blocks_out, 0), 1) << "what it allocated for a list that was gone";
 }
 
@@ -181,7 +181,7 @@ TEST_F(DataLists, InTheHostsMemory) {
   DVSData_Free(list);
 }
 
-// The serialised form of a list that a call makes; it tells lists apart and goes back at once.
+// The serialised form of a list that a call makes; it tells lists apart and is released at once.
 std::string listed(QEX_ReturnStatus status, DVSDataHandle list) {
   if (status != QEX_OK) {
     return "";
@@ -296,7 +296,7 @@ TEST_F(DataLists, OfPropertiesAreInTheLedgerByTheCallThatMadeThem) {
     EXPECT_EQ(only_one_out().call, call);
     DVSData_Free(list);
     EXPECT_EQ(make(&list, 0), QEX_BAD_PARAM);
-    EXPECT_EQ(simhost_ledger_count(), 0U) << "a refused call hands nothing out";
+    EXPECT_EQ(simhost_ledger_count(), 0U) << "a refused call allocates nothing";
   }
 }
 
@@ -304,14 +304,14 @@ TEST_F(DataLists, GoBackThroughTheirOwnDoorOnly) {
   DVSDataHandle list = nullptr;
   ASSERT_EQ(DVSData_Alloc(&list, nullptr, nullptr), QEX_OK);
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }),
-            gave_up_with("DVSQEX_DataFree: DVSData_Alloc gave out what is at " + text_of(list) +
+            trapped_with("DVSQEX_DataFree: DVSData_Alloc gave out what is at " + text_of(list) +
                          ", and DVSData_Free takes it back"));
   EXPECT_EQ(simhost_ledger_count(), 1U);
   void *bytes = nullptr;
   qex_uint32 length = 0;
   ASSERT_EQ(DVSData_Serialize(list, &bytes, &length, 200), QEX_OK);
   EXPECT_EQ(raised_by([=] { DVSData_Free(bytes); }),
-            gave_up_with("DVSData_Free: the host never gave out the list " + text_of(bytes)));
+            trapped_with("DVSData_Free: the host never gave out the list " + text_of(bytes)));
   DVSQEX_DataFree(bytes);
   DVSData_Free(list);
 }

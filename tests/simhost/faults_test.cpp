@@ -66,7 +66,7 @@ TEST_F(Faults, AreChecked) {
   EXPECT_STREQ(simhost_error(), "no fault can hit Panic (QEX_NOT_SUPPORTED)");
   EXPECT_EQ(simhost_fail_call("VSQEX_FreeMemory", 1, 1, QEX_BUSY), QEX_NOT_SUPPORTED)
       << "it has no status";
-  EXPECT_STREQ(simhost_error(), "VSQEX_FreeMemory answers no status (QEX_NOT_SUPPORTED)");
+  EXPECT_STREQ(simhost_error(), "VSQEX_FreeMemory returns no status (QEX_NOT_SUPPORTED)");
   EXPECT_EQ(simhost_fail_call("VSDVS_SetMTU", 0, 1, QEX_BUSY), QEX_BAD_PARAM);
   EXPECT_STREQ(simhost_error(), "the first call that is hit is 1 or later (QEX_BAD_PARAM)");
   EXPECT_EQ(simhost_fail_call("VSDVS_SetMTU", 1, 1, QEX_OK), QEX_BAD_PARAM);

@@ -81,7 +81,7 @@ TEST(Ledger, NamesBothCallsWhenMemoryComesBackTwice) {
 }
 
 TEST(Ledger, NamesTheLastLifeOfAnAddressThatCameBackToLife) {
-  // An allocator hands addresses out again sooner or later; a sanitizer's waits for many megabytes.
+  // An allocator uses addresses again sooner or later; a sanitizer's waits for many megabytes.
   constexpr std::size_t kSize = 1U << 20U;
   Ledger ledger;
   std::set<void *> first_lives;

@@ -32,55 +32,55 @@ class FarPlane : public simhost::Plane {
   std::vector<std::string> told;
 
   bool link_is_up(Transaction & /*transaction*/, std::string_view /*uplink*/) override {
-    return answered(true);
+    return told_or_refused(true);
   }
   bool lacp_is_up(Transaction & /*transaction*/, std::string_view /*uplink*/) override {
-    return answered(false);
+    return told_or_refused(false);
   }
   std::string team_uplink(Transaction & /*transaction*/,
                           simhost::storage::Port const & /*port*/) override {
-    return answered(std::string("nic0"));
+    return told_or_refused(std::string("nic0"));
   }
   std::vector<VSMACEntry> addresses(Transaction & /*transaction*/, Place const & /*place*/,
                                     VSMACAddrType /*type*/) override {
-    return answered(std::vector<VSMACEntry>());
+    return told_or_refused(std::vector<VSMACEntry>());
   }
   VSPMACLearningStats learning_stats(Transaction & /*transaction*/,
                                      Place const & /*place*/) override {
-    return answered(VSPMACLearningStats{});
+    return told_or_refused(VSPMACLearningStats{});
   }
   std::vector<AddressBytes> groups(Transaction & /*transaction*/,
                                    simhost::storage::PortNumber /*port*/,
                                    std::size_t /*length*/) override {
-    return answered(std::vector<AddressBytes>());
+    return told_or_refused(std::vector<AddressBytes>());
   }
   std::optional<simhost::McastGroup> group(Transaction & /*transaction*/,
                                            simhost::storage::PortNumber /*port*/,
                                            AddressBytes const & /*address*/) override {
-    return answered(std::optional<simhost::McastGroup>());
+    return told_or_refused(std::optional<simhost::McastGroup>());
   }
   simhost::Counters counters(Transaction & /*transaction*/,
                              simhost::CounterOwner const & /*owner*/) override {
-    return answered(simhost::Counters());
+    return told_or_refused(simhost::Counters());
   }
   std::vector<std::string> counting_sessions(Transaction & /*transaction*/,
                                              simhost::storage::SwitchKey /*key*/) override {
-    return answered(std::vector<std::string>());
+    return told_or_refused(std::vector<std::string>());
   }
   void set_admin_state(Transaction & /*transaction*/, std::string_view /*uplink*/,
                        bool /*up*/) override {
-    told.push_back(answered(std::string("admin")));
+    told.push_back(told_or_refused(std::string("admin")));
   }
   void put_address(Transaction & /*transaction*/, Place const & /*place*/,
                    VSMACEntry const & /*entry*/) override {
-    told.push_back(answered(std::string("address")));
+    told.push_back(told_or_refused(std::string("address")));
   }
   void remove_address(Transaction & /*transaction*/, Place const & /*place*/,
                       VSMACEntry const & /*entry*/) override {
-    told.push_back(answered(std::string("no address")));
+    told.push_back(told_or_refused(std::string("no address")));
   }
   void restart(Transaction & /*transaction*/) override {
-    told.push_back(answered(std::string("restart")));
+    told.push_back(told_or_refused(std::string("restart")));
   }
   void prepare(Transaction &transaction) override {
     if (!can_run) {
@@ -95,9 +95,9 @@ class FarPlane : public simhost::Plane {
 
  private:
   template <typename Answer>
-  Answer answered(Answer answer) const {
+  Answer told_or_refused(Answer answer) const {
     if (!reachable) {
-      throw Refused(QEX_TIMEOUT, "the plane does not answer");
+      throw Refused(QEX_TIMEOUT, "the plane says nothing");
     }
     return answer;
   }

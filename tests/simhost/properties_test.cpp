@@ -1,4 +1,4 @@
-// The property layer: one room with as many doors as there will be calls.
+// The property layer: one way to the bytes for all calls.
 #include "model/properties/properties.h"
 
 #include <cstdint>

@@ -1,4 +1,4 @@
-// A host that is asked what runs: what a scenario document describes.
+// A host that is asked for its runtime state: what a scenario document describes.
 #pragma once
 
 #include <gtest/gtest.h>

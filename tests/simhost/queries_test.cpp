@@ -21,9 +21,9 @@ VSMACEntry entry(unsigned char last, VSMACAddrType type = VS_MAC_ADDR_TYPE_USER)
   return made;
 }
 
-// What lies behind a record; its arrays are declared without room.
+// What trails a record; its arrays are declared without room.
 template <typename Entry, typename Record>
-Entry const *behind(Record const *record) {
+Entry const *trailing(Record const *record) {
   return reinterpret_cast<Entry const *>(reinterpret_cast<std::byte const *>(record) +
                                          sizeof *record);
 }
@@ -31,7 +31,7 @@ Entry const *behind(Record const *record) {
 std::vector<int> lasts(VSMACTable *table) {
   std::vector<int> all;
   for (qex_uint32 at = 0; at < table->numEntries; ++at) {
-    all.push_back(behind<VSMACEntry>(table)[at].macAddress[5]);
+    all.push_back(trailing<VSMACEntry>(table)[at].macAddress[5]);
   }
   EXPECT_EQ(table->totalEntries, table->numEntries);
   VSQEX_FreeMemory(table);
@@ -66,7 +66,7 @@ TEST_F(Queries, LearnedAddressesAgeOnTheHostsClock) {
   ASSERT_EQ(simhost_clock_step(59999), QEX_OK);
   VSMACTable *table = nullptr;
   ASSERT_EQ(VSQEX_GetPortMACTable("s", "p1", VS_MAC_ADDR_TYPE_ALL, &table), QEX_OK);
-  EXPECT_EQ(qex_uint32{behind<VSMACEntry>(table)->elapsed}, 59U);
+  EXPECT_EQ(qex_uint32{trailing<VSMACEntry>(table)->elapsed}, 59U);
   EXPECT_THAT(lasts(table), testing::ElementsAre(2));
   ASSERT_EQ(simhost_clock_step(1), QEX_OK);
   ASSERT_EQ(VSQEX_GetPortMACTable("s", "p1", VS_MAC_ADDR_TYPE_ALL, &table), QEX_OK);
@@ -175,16 +175,16 @@ TEST_F(Queries, MulticastFiltersInTheFormOfEachMode) {
   ASSERT_EQ(VSQEX_GetMcastFilters("s", number("p1"), VS_MCAST_FILTER_MODE_LEGACY, &filters),
             QEX_OK);
   ASSERT_EQ(qex_uint32{filters->numEntries}, 2U);
-  EXPECT_EQ(behind<qex_EthAddress>(filters)[1][5], 2);
+  EXPECT_EQ(trailing<qex_EthAddress>(filters)[1][5], 2);
   VSQEX_FreeMemory(filters);
   ASSERT_EQ(VSQEX_GetMcastFilters("s", number("p1"), VS_MCAST_FILTER_MODE_IGMP, &filters), QEX_OK);
   ASSERT_EQ(qex_uint32{filters->totalEntries}, 1U);
   std::array<unsigned char, 4> const ipv4{239, 1, 1, 1};
-  EXPECT_EQ(std::memcmp(behind<qex_IPv4Address>(filters), ipv4.data(), 4), 0);
+  EXPECT_EQ(std::memcmp(trailing<qex_IPv4Address>(filters), ipv4.data(), 4), 0);
   VSQEX_FreeMemory(filters);
   ASSERT_EQ(VSQEX_GetMcastFilters("s", number("p1"), VS_MCAST_FILTER_MODE_MLD, &filters), QEX_OK);
   ASSERT_EQ(qex_uint32{filters->numEntries}, 1U);
-  EXPECT_EQ(behind<qex_IPv6Address>(filters)[0][15], 9);
+  EXPECT_EQ(trailing<qex_IPv6Address>(filters)[0][15], 9);
   VSQEX_FreeMemory(filters);
   EXPECT_EQ(VSQEX_GetMcastFilters("s", number("p1"), VS_MCAST_FILTER_MODE_SNOOPING, &filters),
             QEX_BAD_PARAM);
@@ -202,7 +202,7 @@ TEST_F(Queries, MulticastFiltersInTheFormOfEachMode) {
   EXPECT_EQ(qex_uint32{stats->vni}, 77U);
   ASSERT_EQ(qex_uint32{stats->numEntries}, 2U);
   std::array<unsigned char, 8> const sources{10, 0, 0, 1, 10, 0, 0, 2};
-  EXPECT_EQ(std::memcmp(behind<qex_IPv4Address>(stats), sources.data(), sources.size()), 0);
+  EXPECT_EQ(std::memcmp(trailing<qex_IPv4Address>(stats), sources.data(), sources.size()), 0);
   VSQEX_FreeMemory(stats);
   std::array<unsigned char, 6> const mac{1, 0, 0x5E, 1, 1, 1};
   ASSERT_EQ(
@@ -229,8 +229,8 @@ TEST_F(Queries, MirrorSessionsAsTheyRun) {
   VSDVMirrorSessionIDs *ids = nullptr;
   ASSERT_EQ(VSQEX_GetDVMirrorSessionIDs("s", &ids), QEX_OK);
   ASSERT_EQ(qex_uint32{ids->numEntries}, 2U);
-  EXPECT_STREQ(behind<DVMirrorSID>(ids)[0], "audit");
-  EXPECT_STREQ(behind<DVMirrorSID>(ids)[1], "more");
+  EXPECT_STREQ(trailing<DVMirrorSID>(ids)[0], "audit");
+  EXPECT_STREQ(trailing<DVMirrorSID>(ids)[1], "more");
   VSQEX_FreeMemory(ids);
   VSDVMirrorSessionStats stats{};
   ASSERT_EQ(VSQEX_GetDVMirrorSessionStats("s", "audit", &stats), QEX_OK);
@@ -259,8 +259,8 @@ TEST_F(Queries, PortsThatSeeFramesInPromiscuousMode) {
   VSPromiscSessionActiveDsts *ports = nullptr;
   ASSERT_EQ(VSQEX_GetPromiscSessionActiveDsts("s", &ports), QEX_OK);
   ASSERT_EQ(qex_uint32{ports->numEntries}, 2U);
-  EXPECT_EQ(behind<qex_SwitchPortID>(ports)[0], number("p2"));
-  EXPECT_EQ(behind<qex_SwitchPortID>(ports)[1], number("p3"));
+  EXPECT_EQ(trailing<qex_SwitchPortID>(ports)[0], number("p2"));
+  EXPECT_EQ(trailing<qex_SwitchPortID>(ports)[1], number("p3"));
   VSQEX_FreeMemory(ports);
   VSPropSecurity const security{.flags = VSPORT_SECURITY_DISALLOW_PROMISC};
   ASSERT_EQ(VSDVS_SetPortSecurity("s", "p2", &security), QEX_OK);

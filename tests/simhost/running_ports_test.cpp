@@ -1,4 +1,4 @@
-// What runs at a port, through the raw door: the data plane's values and nothing that was stored.
+// The runtime state of a port by the raw calls: the plane's values and nothing that was stored.
 #include <gmock/gmock.h>
 
 #include <string>

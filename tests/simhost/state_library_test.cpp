@@ -72,18 +72,18 @@ TEST_F(StateLibrary, AHandleOfNothingSpringsTheTrap) {
   static int mine = 0;
   auto const address = text_of(&mine);
   EXPECT_EQ(raised_by([] { DVS_SwitchId(&mine); }),
-            gave_up_with("DVS_SwitchId: the host never gave out the switch handle " + address));
+            trapped_with("DVS_SwitchId: the host never gave out the switch handle " + address));
   EXPECT_EQ(raised_by([] { DVS_PortAlias(&mine); }),
-            gave_up_with("DVS_PortAlias: the host never gave out the port handle " + address));
+            trapped_with("DVS_PortAlias: the host never gave out the port handle " + address));
   EXPECT_EQ(raised_by([] { DVSData_Name(&mine); }),
-            gave_up_with("DVSData_Name: the host never gave out the item " + address));
+            trapped_with("DVSData_Name: the host never gave out the item " + address));
   EXPECT_EQ(raised_by([] { DVSData_Free(&mine); }),
-            gave_up_with("DVSData_Free: the host never gave out the list " + address));
+            trapped_with("DVSData_Free: the host never gave out the list " + address));
   EXPECT_EQ(raised_by([] { DVSData_Update(&mine, "n", nullptr, 0, CONFIG_PROP_TYPE); }),
-            gave_up_with("DVSData_Update: the host never gave out the list " + address));
+            trapped_with("DVSData_Update: the host never gave out the list " + address));
   auto *const port = DVSState_PortFind("s-id", "p");
   EXPECT_EQ(raised_by([=] { DVS_Version(port); }),
-            gave_up_with("DVS_Version: the host never gave out the switch handle " + text_of(port)))
+            trapped_with("DVS_Version: the host never gave out the switch handle " + text_of(port)))
       << "a port is no switch";
 }
 
@@ -93,9 +93,9 @@ TEST_F(StateLibrary, AHandleOfWhatIsGoneSpringsTheTrap) {
   ASSERT_EQ(DVSQEX_StateCleanup(), QEX_OK);
   EXPECT_EQ(
       raised_by([=] { DVS_SwitchName(handle); }),
-      gave_up_with("DVS_SwitchName: the switch behind the handle " + text_of(handle) + " is gone"));
+      trapped_with("DVS_SwitchName: the switch of the handle " + text_of(handle) + " is gone"));
   EXPECT_EQ(raised_by([=] { DVS_PortId(port); }),
-            gave_up_with("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
+            trapped_with("DVS_PortId: the port of the handle " + text_of(port) + " is gone"));
 }
 
 TEST_F(StateLibrary, AHandleFromBeforeAResetIsOfNoPortWithItsNumber) {
@@ -109,7 +109,7 @@ TEST_F(StateLibrary, AHandleFromBeforeAResetIsOfNoPortWithItsNumber) {
   ASSERT_EQ(VSDVS_DvPortIDToPortIDFromDVSID(id, "web-1", &again), QEX_OK);
   EXPECT_EQ(again, number);
   EXPECT_EQ(raised_by([=] { DVS_PortId(port); }),
-            gave_up_with("DVS_PortId: the port behind the handle " + text_of(port) + " is gone"));
+            trapped_with("DVS_PortId: the port of the handle " + text_of(port) + " is gone"));
   EXPECT_STREQ(DVS_PortId(DVSState_PortFind(id, "web-1")), "web-1");
 }
 

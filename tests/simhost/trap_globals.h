@@ -23,8 +23,8 @@ struct Raised {
   }
 };
 
-/// What the host raises when it gives up on what it was handed.
-inline Raised gave_up_with(std::string const &message) {
+/// What a call raises that traps because of what it was given.
+inline Raised trapped_with(std::string const &message) {
   return {.type = "RuntimeError", .message = message};
 }
 

@@ -55,7 +55,7 @@ QEX_ReturnStatus set_map(std::vector<VSPvlanMapEntry> const &map) {
   for (auto const &one : map) {
     bytes = bytes + bytes_of(one);
   }
-  EXPECT_EQ(Validation::set_global(VSPROP_PVLAN_MAP, bytes), status) << "the doors agree";
+  EXPECT_EQ(Validation::set_global(VSPROP_PVLAN_MAP, bytes), status) << "the calls agree";
   return status;
 }
 
@@ -99,7 +99,7 @@ TEST_F(Validation, APrivateVlanOfAPortIsInTheMap) {
   EXPECT_EQ(set_vlan(11, -1, true, {{1, 2}}), QEX_BAD_PARAM);
 }
 
-// Both doors refuse the record, each with that status, and neither stores anything.
+// The typed and the raw call refuse the record, each with that status, and neither stores anything.
 template <typename Record, typename Set>
 void expect_refused(char const *key, Record const &record, Set set, QEX_ReturnStatus status) {
   auto const of_port = std::string_view(key).find(".port.") != std::string_view::npos;

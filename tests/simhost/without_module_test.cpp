@@ -1,4 +1,4 @@
-// The host in a process without the module: nothing can be raised, so giving up ends the process.
+// The host in a process without the module: nothing can be raised, so a trap ends the process.
 #include <gtest/gtest.h>
 
 #include <csignal>

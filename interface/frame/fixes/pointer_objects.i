@@ -1,9 +1,9 @@
 // Pointer objects and the classes that shadow them, where the runtime trusts what a program may hand
-// it: it looks behind every `this` without end, and takes any object for a pointer object, any
+// it: it follows every `this` without end, and takes any object for a pointer object, any
 // attribute for a destructor, any chain of pointers for a short one.
 // Stands before the typemaps, which convert through this.
 
-// Before the runtime, which calls these; they are defined behind it.
+// Before the runtime, which calls these; they are defined after it.
 %begin %{
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
@@ -25,11 +25,11 @@ static int is_pointer_object(PyObject *object) {
   return SwigPyObject_Check(object) && !PyType_HasFeature(Py_TYPE(object), Py_TPFLAGS_BASETYPE);
 }
 
-/* How many `this` may stand behind each other; instances of shadow classes have one. */
+/* How many `this` may follow each other; instances of shadow classes have one. */
 enum { kMostSteps = 16 };
 
 /* The pointer object that an object is or stands for, a new reference; null, with no error, if there
-   is none. Nothing else may be keeping what `this` answers. */
+   is none. Nothing else may be keeping what `this` returns. */
 static PyObject *pointer_object_behind(PyObject *object) {
   int steps = 0;
   Py_INCREF(object);
@@ -66,7 +66,7 @@ static PyObject *compare_pointers(PyObject *left, PyObject *right, int operation
   return SwigPyObject_richcompare((SwigPyObject *)left, (SwigPyObject *)right, operation);
 }
 
-/* A truth that cannot be told must not leave its error behind a result. */
+/* A truth that cannot be told must not leave its error beside a result. */
 static PyObject *own_pointer(PyObject *self, PyObject *args) {
   SwigPyObject *pointer = (SwigPyObject *)self;
   PyObject *owned = NULL;
@@ -83,7 +83,7 @@ static PyObject *own_pointer(PyObject *self, PyObject *args) {
 static PyObject *append_pointer(PyObject *self, PyObject *added) {
   SwigPyObject *first = (SwigPyObject *)self;
   SwigPyObject *next = (SwigPyObject *)added;
-  PyObject *behind = NULL;
+  PyObject *rest = NULL;
   PyObject *link = self;
   if (!is_pointer_object(added)) {
     return PyErr_Format(PyExc_TypeError, "Attempt to append a non SwigPyObject");
@@ -93,11 +93,11 @@ static PyObject *append_pointer(PyObject *self, PyObject *added) {
       return PyErr_Format(PyExc_ValueError, "the pointer object is in this chain already");
     }
   }
-  behind = next->next;
+  rest = next->next;
   next->next = first->next;
   first->next = added;
   Py_INCREF(added);
-  Py_XDECREF(behind);
+  Py_XDECREF(rest);
   Py_RETURN_NONE;
 }
 
@@ -132,10 +132,10 @@ OUT_OF_LINE void drop_owner_or_chain(PyObject *self) {
   ((SwigPyObject *)self)->next = NULL;
   SwigPyObject_dealloc(self);
   while (link && Py_REFCNT(link) == 1) {
-    PyObject *behind = ((SwigPyObject *)link)->next;
+    PyObject *rest = ((SwigPyObject *)link)->next;
     ((SwigPyObject *)link)->next = NULL;
     Py_DECREF(link);
-    link = behind;
+    link = rest;
   }
   Py_XDECREF(link);
 }

@@ -2,7 +2,7 @@
 // functions do the rest: classes, casts between modules, interpreters without the fast paths.
 // Stands before everything that generates a wrapper.
 
-// Pointer objects come and go with every record that a call answers, so a few are kept.
+// Pointer objects come and go with every record that a call returns, so a few are kept.
 %begin %{
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>

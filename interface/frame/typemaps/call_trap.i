@@ -1,4 +1,4 @@
-// The call trap: a library that gives up jumps back into the wrapper that called it, which raises
+// The call trap: a call that traps jumps back into the wrapper that called it, which raises
 // the exception that the library named. Readers and writers of fields call nothing and arm nothing.
 // Stands before every function that arms it.
 
@@ -7,7 +7,7 @@
 %}
 
 // What the sprung trap leaves behind is deliberate: copies of text arguments may have been handed on
-// by the library that gave up, so nobody knows whether they are still in use.
+// by the library whose call trapped, so nobody knows whether they are still in use.
 %exception {
   exception_status = setjmp(exception_buffer);
   if (exception_status != 0) return raise_sprung_trap();

@@ -26,7 +26,7 @@ SWIGINTERN int array_text_from_object(PyObject *object, size_t capacity, ArrayTe
   return kind == kConverted ? array_text_from_chars(pointer, capacity, text) : kind;
 }
 
-/* The text of an argument; a short one is in `room`, with zeros behind it. */
+/* The text of an argument; a short one is in `room`, with trailing zeros. */
 OUT_OF_LINE bool read_array_text(PyObject *object, size_t capacity, char room[2 * kShortText],
                                  ArrayText *text, char const *method, int position,
                                  char const *type) {

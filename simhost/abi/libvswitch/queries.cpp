@@ -1,4 +1,4 @@
-// VSQEX_*: asking the running switches about themselves, and giving back what they answered with.
+// VSQEX_*: asking the running switches about themselves, and releasing what they returned.
 #include "vswitch/queries.h"
 
 #include <algorithm>

@@ -105,7 +105,7 @@ inline constexpr std::array kEncapsulationMembers{
 };
 
 inline constexpr std::array kSessionMembers{
-    form::required("sid", form::text<TextField<&DVMirrorSession::sid>>(), "its identifier"),
+    form::required_member("sid", form::text<TextField<&DVMirrorSession::sid>>(), "its identifier"),
     form::member("name", form::text<TextField<&DVMirrorSession::dname>>(), "its name"),
     form::member("type", form::choice<Field<&DVMirrorSession::type>>(kTypes), "what kind it is"),
     form::member("snap_length", form::number<Field<&DVMirrorSession::snapLen>>(0, UINT32_MAX),

@@ -1,4 +1,4 @@
-// What runs at a port, as properties of it: the values that the data plane has, not stored ones.
+// The runtime state of a port, as properties of it: the values that the plane has, not stored ones.
 #pragma once
 
 #include "base/api.h"

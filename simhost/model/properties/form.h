@@ -292,8 +292,8 @@ constexpr Member member(std::string_view name, FormOf<Object> const &form, std::
 }
 /// One that must be given.
 template <typename Object>
-constexpr Member required(std::string_view name, FormOf<Object> const &form,
-                          std::string_view says) {
+constexpr Member required_member(std::string_view name, FormOf<Object> const &form,
+                                 std::string_view says) {
   return {.name = name, .says = says, .form = form, .presence = Presence::required};
 }
 /// One that is left out while it is `absent`, a list or a text while it is empty, a record while

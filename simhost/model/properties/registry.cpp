@@ -42,7 +42,7 @@ constexpr KeyConstant kConstants[] = {
 #undef PROPERTY_CONSTANT
 };
 
-constexpr Descriptor const *found(std::string_view key) {
+constexpr Descriptor const *descriptor_with(std::string_view key) {
   auto const *const at =
       std::find_if(kDescriptors.begin(), kDescriptors.end(),
                    [&](Descriptor const *descriptor) { return descriptor->key == key; });
@@ -59,9 +59,9 @@ constexpr bool needs_descriptor(std::string_view text) {
   return std::find(kNoKeys.begin(), kNoKeys.end(), text) == kNoKeys.end();
 }
 
-#define PROPERTY_CONSTANT(family, name)                                  \
-  static_assert(!needs_descriptor(name) || found(name) != nullptr, #name \
-                " has no descriptor: declare one in the folder "         \
+#define PROPERTY_CONSTANT(family, name)                                            \
+  static_assert(!needs_descriptor(name) || descriptor_with(name) != nullptr, #name \
+                " has no descriptor: declare one in the folder "                   \
                 "of its domain and list it there");
 #include "property_constants.inc"
 #undef PROPERTY_CONSTANT
@@ -73,7 +73,7 @@ constexpr bool each(Holds const &holds) {
 
 static_assert(each([](auto const *one) { return constant(one->key) != nullptr; }),
               "a descriptor's key is no constant of the headers");
-static_assert(each([](auto const *one) { return found(one->key) == one; }),
+static_assert(each([](auto const *one) { return descriptor_with(one->key) == one; }),
               "two descriptors have one key");
 static_assert(each([](auto const *one) {
                 return one->check_value != nullptr && one->make != nullptr && !one->words.empty();
@@ -98,7 +98,7 @@ std::span<Descriptor const *const> descriptors() {
 }
 
 Descriptor const *find_descriptor(std::string_view key) {
-  return found(key);
+  return descriptor_with(key);
 }
 
 KeyConstant const &constant_of(Descriptor const &descriptor) {
@@ -106,7 +106,7 @@ KeyConstant const &constant_of(Descriptor const &descriptor) {
 }
 
 KeyFamily family_of(std::string_view key) {
-  return found(key) == nullptr ? KeyFamily::extra : constant(key)->family;
+  return descriptor_with(key) == nullptr ? KeyFamily::extra : constant(key)->family;
 }
 
 }  // namespace simhost

@@ -126,12 +126,13 @@ inline constexpr std::array<Word, 3> kTypes{{{"promiscuous", VSPORT_PVLAN_TYPE_P
                                              {"isolated", VSPORT_PVLAN_TYPE_ISOLATED},
                                              {"community", VSPORT_PVLAN_TYPE_COMMUNITY}}};
 inline constexpr std::array kEntryMembers{
-    form::required("primary", form::number<&VSPvlanMapEntry::primaryVID>(kLeast, kGreatest),
-                   "the VLAN that others see"),
-    form::required("secondary", form::number<&VSPvlanMapEntry::secondaryVID>(kLeast, kGreatest),
-                   "the VLAN inside it, of a promiscuous entry the same"),
-    form::required("type", form::choice<&VSPvlanMapEntry::pvlanType>(kTypes),
-                   "what the ports of the secondary VLAN may reach"),
+    form::required_member("primary", form::number<&VSPvlanMapEntry::primaryVID>(kLeast, kGreatest),
+                          "the VLAN that others see"),
+    form::required_member("secondary",
+                          form::number<&VSPvlanMapEntry::secondaryVID>(kLeast, kGreatest),
+                          "the VLAN inside it, of a promiscuous entry the same"),
+    form::required_member("type", form::choice<&VSPvlanMapEntry::pvlanType>(kTypes),
+                          "what the ports of the secondary VLAN may reach"),
 };
 inline constexpr auto kEntry = form::record<VSPvlanMapEntry>(kEntryMembers);
 

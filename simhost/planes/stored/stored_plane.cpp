@@ -102,7 +102,7 @@ class StoredPlane : public Plane {
     storage::remove_counters(transaction);
   }
 
-  // The state is what runs: whatever it says, it says to whoever asks next.
+  // The state is all that is running: whatever it says, it says to whoever asks next.
   void prepare(storage::Transaction & /*transaction*/) override {}
   void committed() noexcept override {}
 

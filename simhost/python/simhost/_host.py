@@ -201,7 +201,7 @@ class SimulatedHost:
     ) -> None:
         """Lets the nth call of a function from now on fail, or wait.
 
-        The call answers `status`, a number or a name; or the host gives up on it, which raises the
+        The call returns `status`, a number or a name; or it traps, which raises the
         exception that `panic` names, with its text; or it takes so many seconds longer, alone or
         before that. `times` calls are hit, with 0 all that follow.
 

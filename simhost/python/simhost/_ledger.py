@@ -3,7 +3,7 @@
 import re
 from typing import Iterable, List, NamedTuple, Tuple
 
-_ADVICE = "Give each block back once; libvswitch.owned does at the end of its block of code."
+_ADVICE = "Release each block once; libvswitch.owned does at the end of its block of code."
 
 
 class Block(NamedTuple):

@@ -16,7 +16,7 @@ namespace simhost::storage {
 struct Link {
   bool carrier = true;          ///< the cable is plugged in
   bool admin = true;            ///< the host has not switched it off
-  bool partner = true;          ///< the other end answers link aggregation
+  bool partner = true;          ///< the other end takes part in link aggregation
   std::uint32_t speed = 10000;  ///< Mbit/s
   bool full_duplex = true;
   bool beacons = true;              ///< the beacons of the other uplinks arrive

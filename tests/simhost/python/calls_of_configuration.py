@@ -6,7 +6,7 @@ from typing import Any, Dict
 
 import libvswitch as vs
 
-from witness import ID, LAB, NEBPUBLIC, PORT, SIMHOST, call, cell, filled, handed_out
+from witness import ID, LAB, NEBPUBLIC, PORT, SIMHOST, call, cell, filled, allocated
 
 
 def names_and_switches() -> None:
@@ -63,8 +63,8 @@ def ports() -> None:
         handle = vs.DVSState_PortFind(ID, identifier)
         call("DVS_PortId", handle)
         call("DVS_PortAlias", handle)
-        handed_out("DVSQEX_PortStateGet", ID, identifier)
-        handed_out("DVSQEX_PersistentPortStateGet", ID, identifier, 200)
+        allocated("DVSQEX_PortStateGet", ID, identifier)
+        allocated("DVSQEX_PersistentPortStateGet", ID, identifier, 200)
         alias = vs.Cell("qex_uint8", list(b"alias\0"))
         vs.DVSQEX_PortDataSet(
             ID, identifier, vs.QEX_NEBPROP_PORT_ALIAS, alias.pointer, 6, vs.CONFIG_PROP_TYPE

@@ -1,4 +1,4 @@
-"""Every call that asks what runs, seen to do what it does."""
+"""Every call that asks for the runtime state, seen to do what it does."""
 
 import json
 from typing import Any, Dict

@@ -2,7 +2,7 @@
 
 import libvswitch as vs
 
-from witness import ID, LAB, PORT, call, cell, handed_out, listing, walk
+from witness import ID, LAB, PORT, call, cell, allocated, listing, walk
 
 
 def kernel_switches() -> None:
@@ -22,7 +22,7 @@ def properties() -> None:
     for target, where in (("GlobalProp", (ID,)), ("HostProp", (ID,)), ("PortData", (ID, PORT))):
         for length in (3, 2):
             call(f"DVSQEX_{target}Set", *where, key, data, length, vs.CONFIG_PROP_TYPE)
-            handed_out(f"DVSQEX_{target}Get", *where, key)
+            allocated(f"DVSQEX_{target}Get", *where, key)
     looked_up = cell("DVSDataItem")
     view = cell("void *")
     for length, kind in ((3, vs.CONFIG_PROP_TYPE), (1, vs.POLICY_PROP_TYPE)):
@@ -40,7 +40,7 @@ def properties() -> None:
     number = vs.VSDVS_DvPortIDToPortID(LAB, "uplink1")[1]
     for length in (3, 2):
         call("DVSQEX_UplinkDataSet", ID, key, number, data, length, vs.CONFIG_PROP_TYPE)
-        handed_out("DVSQEX_UplinkDataGet", ID, key, number)
+        allocated("DVSQEX_UplinkDataGet", ID, key, number)
 
 
 def lists() -> None:
@@ -90,11 +90,11 @@ def clears() -> None:
 
 def images() -> None:
     """The state as a whole; what it was is gone when this ends."""
-    whole = handed_out("DVSQEX_StateGet")
-    kept = handed_out("DVSQEX_PersistentStateGet")
+    whole = allocated("DVSQEX_StateGet")
+    kept = allocated("DVSQEX_PersistentStateGet")
     call("DVSState_ConfigReset")
-    handed_out("DVSQEX_StateGet")
-    handed_out("DVSQEX_PersistentStateGet")
+    allocated("DVSQEX_StateGet")
+    allocated("DVSQEX_PersistentStateGet")
     call("DVSState_ConfigDeserialize", vs.Cell("qex_uint8", list(kept)), len(kept))
     data = vs.Cell("int", vs.DVSPORT_TYPE_ZOMBIE)
     vs.DVSQEX_PortDataSet(ID, PORT, vs.QEX_NEBPROP_PORT_TYPE, data.pointer, 4, vs.CONFIG_PROP_TYPE)

@@ -27,7 +27,7 @@ MEANT = {
 
 
 @pytest.fixture(scope="module")
-def answers() -> Dict[Tuple[str, str], str]:
+def results() -> Dict[Tuple[str, str], str]:
     clean = {name: value for name, value in os.environ.items() if not name.startswith("SIMHOST_")}
     done = subprocess.run([sys.executable, str(SCRIPT)], env=clean, capture_output=True, text=True)
     assert (done.returncode, done.stderr) == (0, "")
@@ -35,8 +35,8 @@ def answers() -> Dict[Tuple[str, str], str]:
     return {(call, parameter): answer for call, parameter, answer in rows}
 
 
-def test_a_status_says_that_null_is_no_argument(answers: Dict[Tuple[str, str], str]) -> None:
-    statuses = {key: int(answer) for key, answer in answers.items() if answer[0] != "("}
+def test_a_status_says_that_null_is_no_argument(results: Dict[Tuple[str, str], str]) -> None:
+    statuses = {key: int(answer) for key, answer in results.items() if answer[0] != "("}
     wrong = {
         key: vs.QEX_ReturnStatusToString(status)
         for key, status in statuses.items()
@@ -45,13 +45,13 @@ def test_a_status_says_that_null_is_no_argument(answers: Dict[Tuple[str, str], s
     assert wrong == {}
 
 
-def test_calls_without_a_status_answer_nothing(answers: Dict[Tuple[str, str], str]) -> None:
-    others = {key: answer for key, answer in answers.items() if answer[0] == "("}
+def test_calls_without_a_status_answer_nothing(results: Dict[Tuple[str, str], str]) -> None:
+    others = {key: answer for key, answer in results.items() if answer[0] == "("}
     assert {key: answer for key, answer in others.items() if answer.lower() != "(none)"} == {}
     assert ("DVS_SwitchId", "handle") in others
 
 
-def test_every_call_with_a_pointer_was_made(answers: Dict[Tuple[str, str], str]) -> None:
+def test_every_call_with_a_pointer_was_made(results: Dict[Tuple[str, str], str]) -> None:
     surface = SCRIPT.parents[2] / "surface" / "functions.txt"
     bound = set(re.findall(r"^call +(\w+)\(", surface.read_text(encoding="ascii"), re.MULTILINE))
     without = {
@@ -61,4 +61,4 @@ def test_every_call_with_a_pointer_was_made(answers: Dict[Tuple[str, str], str])
         "QEX_ReturnStatusToString",
         "Panic",
     }
-    assert {call for call, _ in answers} == bound - without
+    assert {call for call, _ in results} == bound - without

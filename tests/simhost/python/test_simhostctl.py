@@ -212,7 +212,7 @@ def test_faults_hit_other_processes(host: Host) -> None:
         "fault", "add", "VSDVS_SetMTU", "--nth", "3", "--exception", "KeyError", "--message", "lost"
     )
     assert host.ctl("fault", "list").splitlines() == [
-        "VSDVS_SetMTU from call 2 on, 1 x: answers QEX_BUSY; 0 made",
+        "VSDVS_SetMTU from call 2 on, 1 x: returns QEX_BUSY; 0 made",
         "VSDVS_SetMTU from call 3 on, 1 x: KeyError: lost; 0 made",
     ]
     call = 'print(vs.VSDVS_SetMTU("vswitch0", 2000))\n'

@@ -1,4 +1,4 @@
-"""What a call of the host was seen to do: whether it changed the host, and its different answers.
+"""What a call of the host was seen to do: whether it changed the host, and its different results.
 
 Works on the host of its own process, whose clock stands, so that nothing changes by itself.
 """
@@ -32,7 +32,7 @@ IN_LEDGER = {
 
 
 def _text(call: Any) -> bytes:
-    """What a function writes that takes room and its size, and answers how much it wants."""
+    """What a function writes that takes room and its size, and returns how much it wants."""
     room = ctypes.create_string_buffer(call(None, ctypes.c_size_t(0)) + 1)
     call(room, ctypes.c_size_t(len(room)))
     return room.value
@@ -63,7 +63,7 @@ class Witness:
     def __init__(self) -> None:
         assert SIMHOST.simhost_clock_stop() == 0
         self.changed: Set[str] = set()
-        self.answers: DefaultDict[str, Set[str]] = defaultdict(set)
+        self.results: DefaultDict[str, Set[str]] = defaultdict(set)
 
     def __call__(self, name: str, *given: Any, outputs: Any = ()) -> Any:
         """Calls a function. `outputs` are the cells and records that it fills."""
@@ -82,11 +82,11 @@ class Witness:
         following = [*outputs[1:], None]
         seen = [_shown(one) for one in [status, *shown]]
         seen += [_shown(one, after) for one, after in zip(outputs, following)]
-        self.answers[name].add(repr(seen))
+        self.results[name].add(repr(seen))
 
     def succeeded(self) -> Set[str]:
         """The calls that were made with success."""
-        return set(self.answers)
+        return set(self.results)
 
     def panic(self, text: str) -> None:
         """Panic, whose answer goes to standard error."""
@@ -97,11 +97,11 @@ class Witness:
             os.dup2(kept, 2)
             os.close(kept)
             written.seek(0)
-            self.answers["Panic"].add(written.read().decode())
+            self.results["Panic"].add(written.read().decode())
 
     def modelled(self) -> Set[str]:
         """The calls that were seen to do something."""
-        return self.changed | {name for name, seen in self.answers.items() if len(seen) > 1}
+        return self.changed | {name for name, seen in self.results.items() if len(seen) > 1}
 
     @staticmethod
     def _state(name: str) -> bytes:
@@ -128,12 +128,12 @@ def cell(kind: Any) -> Any:
     return vs.Cell(kind)
 
 
-def handed_out(name: str, *given: Any, door: str = "DVSQEX_DataFree") -> bytes:
-    """A call that hands out bytes; they go back."""
+def allocated(name: str, *given: Any, deallocator: str = "DVSQEX_DataFree") -> bytes:
+    """A call that allocates bytes; they are released."""
     data, length = cell("void *"), cell("int")
     assert call(name, *given, data, length, outputs=(data, length)) == vs.QEX_OK, name
     image: bytes = data.read(length.value)
-    call(door, data.value)
+    call(deallocator, data.value)
     return image
 
 

@@ -1,5 +1,4 @@
-// Typed calls and raw property calls are doors to the same bytes, in both directions, for every
-// key.
+// Typed calls and raw calls read and write the same bytes, in both directions, for every key.
 #include <gmock/gmock.h>
 
 #include <algorithm>
@@ -69,7 +68,7 @@ Bytes vlan_policy(qex_uint16 flags, qex_uint16 vlan,
 }
 
 // One key: two values, a typed set of each, and a typed get in the form of the raw bytes.
-struct Doors {
+struct CallsOfKey {
   char const *key;
   bool of_port;
   std::array<Bytes, 2> values;
@@ -94,9 +93,9 @@ std::function<QEX_ReturnStatus(Bytes const &)> setter(Set set) {
   };
 }
 
-// A typed get that hands out a record of varying size.
+// A typed get that allocates a record of varying size.
 template <typename Record, typename Get, typename SizeOf>
-std::function<Bytes()> handed_out(Get get, SizeOf size_of) {
+std::function<Bytes()> allocated(Get get, SizeOf size_of) {
   return [get, size_of] {
     Record *record = nullptr;
     EXPECT_EQ(get(&record), QEX_OK);
@@ -122,7 +121,7 @@ auto by_address(Call call) {
   return [call](auto const &record) { return call(&record); };
 }
 
-Doors learning_doors() {
+CallsOfKey learning_calls() {
   VSMACLearning learning{};
   learning.agingTime = 60;
   learning.macLimit = 10;
@@ -135,7 +134,7 @@ Doors learning_doors() {
           getter<VSMACLearning>(on_switch(VSDVS_GetMACLearning))};
 }
 
-Doors private_vlan_doors() {
+CallsOfKey private_vlan_calls() {
   VSPvlanMapEntry const promiscuous{
       .primaryVID = 10, .secondaryVID = 10, .pvlanType = VSPORT_PVLAN_TYPE_PROMISC, .pad = {}};
   VSPvlanMapEntry const isolated{
@@ -160,7 +159,7 @@ Doors private_vlan_doors() {
           get};
 }
 
-Doors security_doors() {
+CallsOfKey security_calls() {
   VSPropSecurity const security{.flags = VSPORT_SECURITY_DISALLOW_PROMISC};
   VSPropSecurity const other{.flags = VSPORT_SECURITY_DISALLOW_FORGED_SRC};
   return {VSPROP_PORT_SECURITY,
@@ -170,7 +169,7 @@ Doors security_doors() {
           getter<VSPropSecurity>(on_port(VSDVS_GetPortSecurity))};
 }
 
-Doors override_doors() {
+CallsOfKey override_calls() {
   auto const set = [](Bytes const &bytes) {
     return VSDVS_SetPortTeamingOverride("s", "p", reinterpret_cast<char const *>(bytes.data()));
   };
@@ -186,7 +185,7 @@ Doors override_doors() {
           get};
 }
 
-Doors vlan_doors() {
+CallsOfKey vlan_calls() {
   auto const set = [](Bytes const &bytes) {
     Bytes copy = bytes;
     auto *const policy = reinterpret_cast<VSPortVlanPolicy *>(copy.data());
@@ -197,7 +196,7 @@ Doors vlan_doors() {
                                    has(VSPORT_VLAN_PVLAN_ENABLED), policy->vidRanges,
                                    policy->numRanges);
   };
-  auto const get = handed_out<VSPortVlanPolicy>(
+  auto const get = allocated<VSPortVlanPolicy>(
       [](VSPortVlanPolicy **policy) {
         int priority = 0;
         return VSDVS_GetPortVLANPolicy("s", "p", policy, &priority);
@@ -212,7 +211,7 @@ Doors vlan_doors() {
           get};
 }
 
-Doors priority_doors() {
+CallsOfKey priority_calls() {
   auto const set = [](Bytes const &bytes) {
     return VSDVS_SetPortVLANPolicy("s", "p", 3, as<int>(bytes), 0, 0, nullptr, 0);
   };
@@ -226,14 +225,14 @@ Doors priority_doors() {
   return {VSPROP_PORT_PRIORITY, true, {bytes_of(7), bytes_of(0)}, set, get};
 }
 
-Doors mirror_doors() {
+CallsOfKey mirror_calls() {
   auto const set = [](Bytes const &bytes) {
     Bytes copy = bytes;
     EXPECT_EQ(VSDVS_ClearDVMirrorSessions("s", "p"), QEX_OK);
     return VSDVS_AppendDVMirrorSessions("s", "p",
                                         reinterpret_cast<DVMirrorSessionTable *>(copy.data()));
   };
-  auto const get = handed_out<DVMirrorSessionTable>(
+  auto const get = allocated<DVMirrorSessionTable>(
       on_port(VSDVS_GetDVMirrorSessions), [](DVMirrorSessionTable const &table) {
         return sizeof table + (table.numSessions * sizeof(DVMirrorSession)) +
                (table.numEntities * sizeof(DVMirrorEntity));
@@ -241,7 +240,7 @@ Doors mirror_doors() {
   return {VSPROP_PORT_MIRROR_SESSIONS, true, {mirror_table("one"), mirror_table("two")}, set, get};
 }
 
-Doors port_learning_doors() {
+CallsOfKey port_learning_calls() {
   VSPMACManagement management{};
   management.portMACLearning.learning = 1;
   management.portMACLearning.macLimit = 8;
@@ -261,7 +260,7 @@ Doors port_learning_doors() {
   return {VSPROP_PORT_MAC_MANAGEMENT, true, {bytes_of(management), bytes_of(other)}, set, get};
 }
 
-std::vector<Doors> doors_of_switch() {
+std::vector<CallsOfKey> keys_of_switch() {
   return {
       {VSPROP_MTU,
        false,
@@ -279,8 +278,8 @@ std::vector<Doors> doors_of_switch() {
        setter<VSTeamPolicy>(by_address(on_switch(VSDVS_SetTeamingPolicy))),
        getter<VSTeamPolicy>(
            [](VSTeamPolicy *policy) { return VSDVS_GetTeamingPolicyFromDVSID("s-id", policy); })},
-      learning_doors(),
-      private_vlan_doors(),
+      learning_calls(),
+      private_vlan_calls(),
       {VSPROP_MULTICAST_FILTER,
        false,
        {bytes_of(1), bytes_of(2)},
@@ -289,17 +288,17 @@ std::vector<Doors> doors_of_switch() {
   };
 }
 
-std::vector<Doors> doors_of_port() {
+std::vector<CallsOfKey> keys_of_port() {
   return {
-      security_doors(),
+      security_calls(),
       {VSPROP_PORT_TEAMING_POLICY,
        true,
        {bytes_of(teaming(1)), bytes_of(teaming(4))},
        setter<VSTeamPolicy>(by_address(on_port(VSDVS_SetPortTeamingPolicy))),
        getter<VSTeamPolicy>(on_port(VSDVS_GetPortTeamingPolicy))},
-      override_doors(),
-      vlan_doors(),
-      priority_doors(),
+      override_calls(),
+      vlan_calls(),
+      priority_calls(),
       {VSPROP_PORT_TX_UPLINK,
        true,
        {bytes_of(qex_Bool{1}), bytes_of(qex_Bool{0})},
@@ -315,79 +314,79 @@ std::vector<Doors> doors_of_port() {
        {bytes_of(filter(QEX_ETH_FILTER_ALLMULTI)), bytes_of(filter(QEX_ETH_FILTER_SINK))},
        setter<VSExtraEthFilter>(by_address(on_port(VSDVS_SetExtraEthFilter))),
        getter<VSExtraEthFilter>(on_port(VSDVS_GetExtraEthFilter))},
-      mirror_doors(),
-      port_learning_doors(),
+      mirror_calls(),
+      port_learning_calls(),
   };
 }
 
-std::vector<Doors> all_doors() {
-  auto all = doors_of_switch();
-  for (auto const &doors : doors_of_port()) {
-    all.push_back(doors);
+std::vector<CallsOfKey> all_keys() {
+  auto all = keys_of_switch();
+  for (auto const &calls : keys_of_port()) {
+    all.push_back(calls);
   }
   return all;
 }
 
-using TwoDoors = ConfiguredSwitch;
+using TypedAndRaw = ConfiguredSwitch;
 
-std::optional<Bytes> raw(Doors const &doors) {
-  return doors.of_port ? TwoDoors::port(doors.key) : TwoDoors::global(doors.key);
+std::optional<Bytes> raw(CallsOfKey const &calls) {
+  return calls.of_port ? TypedAndRaw::port(calls.key) : TypedAndRaw::global(calls.key);
 }
 
-QEX_ReturnStatus set_raw(Doors const &doors, Bytes const &value) {
-  return doors.of_port ? TwoDoors::set_port(doors.key, value)
-                       : TwoDoors::set_global(doors.key, value);
+QEX_ReturnStatus set_raw(CallsOfKey const &calls, Bytes const &value) {
+  return calls.of_port ? TypedAndRaw::set_port(calls.key, value)
+                       : TypedAndRaw::set_global(calls.key, value);
 }
 
-TEST_F(TwoDoors, WhatATypedCallWritesTheRawCallReads) {
-  for (auto const &doors : all_doors()) {
-    for (auto const &value : doors.values) {
-      EXPECT_EQ(doors.typed_set(value), QEX_OK) << doors.key;
-      EXPECT_EQ(raw(doors), value) << doors.key;
+TEST_F(TypedAndRaw, WhatATypedCallWritesTheRawCallReads) {
+  for (auto const &calls : all_keys()) {
+    for (auto const &value : calls.values) {
+      EXPECT_EQ(calls.typed_set(value), QEX_OK) << calls.key;
+      EXPECT_EQ(raw(calls), value) << calls.key;
     }
   }
 }
 
-TEST_F(TwoDoors, WhatTheRawCallWritesATypedCallReads) {
-  for (auto const &doors : all_doors()) {
-    for (auto const &value : doors.values) {
-      EXPECT_EQ(set_raw(doors, value), QEX_OK) << doors.key;
-      EXPECT_EQ(doors.typed_get(), value) << doors.key;
+TEST_F(TypedAndRaw, WhatTheRawCallWritesATypedCallReads) {
+  for (auto const &calls : all_keys()) {
+    for (auto const &value : calls.values) {
+      EXPECT_EQ(set_raw(calls, value), QEX_OK) << calls.key;
+      EXPECT_EQ(calls.typed_get(), value) << calls.key;
     }
   }
 }
 
-TEST_F(TwoDoors, TheRawDoorTakesNoOtherSize) {
-  for (auto const &doors : all_doors()) {
-    auto const &value = doors.values[0];
-    ASSERT_EQ(set_raw(doors, value), QEX_OK) << doors.key;
+TEST_F(TypedAndRaw, TheRawDoorTakesNoOtherSize) {
+  for (auto const &calls : all_keys()) {
+    auto const &value = calls.values[0];
+    ASSERT_EQ(set_raw(calls, value), QEX_OK) << calls.key;
     auto const longer = value + Bytes{0};
     auto const shorter = Bytes(value.begin(), value.end() - 1);
-    EXPECT_EQ(set_raw(doors, longer), QEX_BAD_PARAM) << doors.key;
-    EXPECT_EQ(set_raw(doors, shorter), QEX_BAD_PARAM) << doors.key;
-    EXPECT_EQ(raw(doors), value) << doors.key << " after refused calls";
+    EXPECT_EQ(set_raw(calls, longer), QEX_BAD_PARAM) << calls.key;
+    EXPECT_EQ(set_raw(calls, shorter), QEX_BAD_PARAM) << calls.key;
+    EXPECT_EQ(raw(calls), value) << calls.key << " after refused calls";
   }
 }
 
-TEST_F(TwoDoors, AClearedPropertyReadsAsItsDefault) {
-  for (auto const &doors : all_doors()) {
+TEST_F(TypedAndRaw, AClearedPropertyReadsAsItsDefault) {
+  for (auto const &calls : all_keys()) {
     auto const clear = [&] {
-      return doors.of_port ? DVSQEX_PortDataClear("s-id", "p", doors.key)
-                           : DVSQEX_GlobalPropClear("s-id", doors.key);
+      return calls.of_port ? DVSQEX_PortDataClear("s-id", "p", calls.key)
+                           : DVSQEX_GlobalPropClear("s-id", calls.key);
     };
     clear();
-    auto const unset = doors.typed_get();
-    EXPECT_EQ(clear(), QEX_NOT_FOUND) << doors.key;
-    for (auto const &value : doors.values) {
-      ASSERT_EQ(doors.typed_set(value), QEX_OK) << doors.key;
+    auto const unset = calls.typed_get();
+    EXPECT_EQ(clear(), QEX_NOT_FOUND) << calls.key;
+    for (auto const &value : calls.values) {
+      ASSERT_EQ(calls.typed_set(value), QEX_OK) << calls.key;
     }
-    EXPECT_EQ(clear(), QEX_OK) << doors.key;
-    EXPECT_EQ(raw(doors), std::nullopt) << doors.key;
-    EXPECT_EQ(doors.typed_get(), unset) << doors.key;
+    EXPECT_EQ(clear(), QEX_OK) << calls.key;
+    EXPECT_EQ(raw(calls), std::nullopt) << calls.key;
+    EXPECT_EQ(calls.typed_get(), unset) << calls.key;
   }
 }
 
-TEST_F(TwoDoors, AKeyThatCannotBeSetIsNotThere) {
+TEST_F(TypedAndRaw, AKeyThatCannotBeSetIsNotThere) {
   auto const too_long = std::string(256, 'k');
   struct {
     char const *key;
@@ -419,7 +418,7 @@ TEST_F(TwoDoors, AKeyThatCannotBeSetIsNotThere) {
   EXPECT_EQ(mtu, 9000U) << "of the switch itself";
 }
 
-TEST_F(TwoDoors, TypedClearsAreRawClears) {
+TEST_F(TypedAndRaw, TypedClearsAreRawClears) {
   struct {
     char const *key;
     bool of_port;
@@ -434,12 +433,12 @@ TEST_F(TwoDoors, TypedClearsAreRawClears) {
       {VSPROP_PORT_EXTRA_ETH_FRP, true, [] { return VSDVS_ClearExtraEthFilter("s", "p"); }},
       {VSPROP_PORT_MIRROR_SESSIONS, true, [] { return VSDVS_ClearDVMirrorSessions("s", "p"); }},
   };
-  auto const doors = all_doors();
+  auto const calls = all_keys();
   for (auto const &[key, of_port, clear] : clears) {
     auto const found =
-        std::find_if(doors.begin(), doors.end(),
+        std::find_if(calls.begin(), calls.end(),
                      [key = std::string_view(key)](auto const &d) { return d.key == key; });
-    ASSERT_NE(found, doors.end()) << key;
+    ASSERT_NE(found, calls.end()) << key;
     ASSERT_EQ(found->typed_set(found->values[0]), QEX_OK) << key;
     ASSERT_TRUE((of_port ? port(key) : global(key)).has_value()) << key;
     EXPECT_EQ(clear(), QEX_OK) << key;
@@ -448,7 +447,7 @@ TEST_F(TwoDoors, TypedClearsAreRawClears) {
   }
 }
 
-TEST_F(TwoDoors, TheSinkPortIsABitOfTheFilter) {
+TEST_F(TypedAndRaw, TheSinkPortIsABitOfTheFilter) {
   ASSERT_EQ(set_port(VSPROP_PORT_EXTRA_ETH_FRP, bytes_of(filter(QEX_ETH_FILTER_ALLMULTI))), QEX_OK);
   qex_Bool sink = 1;
   EXPECT_EQ(VSDVS_IsSinkPortEnabled("s", "p", &sink), QEX_OK);
@@ -462,7 +461,7 @@ TEST_F(TwoDoors, TheSinkPortIsABitOfTheFilter) {
   EXPECT_EQ(port(VSPROP_PORT_EXTRA_ETH_FRP), bytes_of(filter(QEX_ETH_FILTER_ALLMULTI)));
 }
 
-TEST_F(TwoDoors, MacLearningLeavesTheRestOfTheManagementAlone) {
+TEST_F(TypedAndRaw, MacLearningLeavesTheRestOfTheManagementAlone) {
   VSPMACManagement management{};
   management.macChangeAllowed = 1;
   ASSERT_EQ(set_port(VSPROP_PORT_MAC_MANAGEMENT, bytes_of(management)), QEX_OK);
@@ -473,7 +472,7 @@ TEST_F(TwoDoors, MacLearningLeavesTheRestOfTheManagementAlone) {
   EXPECT_EQ(port(VSPROP_PORT_MAC_MANAGEMENT), bytes_of(management));
 }
 
-TEST_F(TwoDoors, APortWithoutTeamingHasItsSwitchs) {
+TEST_F(TypedAndRaw, APortWithoutTeamingHasItsSwitchs) {
   auto const policy = teaming(TEAM_FRP_TYPE_FO_EXPLICIT);
   ASSERT_EQ(VSDVS_SetTeamingPolicy("s", &policy), QEX_OK);
   VSTeamPolicy read{};
@@ -481,7 +480,7 @@ TEST_F(TwoDoors, APortWithoutTeamingHasItsSwitchs) {
   EXPECT_EQ(bytes_of(read), bytes_of(policy));
 }
 
-TEST_F(TwoDoors, TheVlanInfoFollowsTheVlanPolicy) {
+TEST_F(TypedAndRaw, TheVlanInfoFollowsTheVlanPolicy) {
   ASSERT_EQ(set_port(VSPROP_PORT_VLAN, vlan_policy(0, 5, {{7, 9}})), QEX_OK);
   EXPECT_EQ(port(QEX_NEBPROP_PORT_VLAN), (Bytes{5, 0, 1, 0, 7, 0, 9, 0}));
   EXPECT_EQ(set_port(QEX_NEBPROP_PORT_VLAN, {5, 0, 0, 0}), QEX_READ_ONLY);
