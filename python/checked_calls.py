@@ -73,18 +73,21 @@ if TYPE_CHECKING:
 
 _TAIL = """
 
-def __getattr__(name: str) -> object:
-    # Values are made when somebody wants them.
-    if name in _enums.__all__:
-        found: object = getattr(_enums, name)
-    elif name in _VALUES:
-        from libvswitch import values
+# A type checker that saw this would let every name pass.
+if not TYPE_CHECKING:
 
-        found = getattr(values, name)
-    else:
-        raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
-    globals()[name] = found
-    return found
+    def __getattr__(name: str) -> object:
+        # Values are made when somebody wants them.
+        if name in _enums.__all__:
+            found: object = getattr(_enums, name)
+        elif name in _VALUES:
+            from libvswitch import values
+
+            found = getattr(values, name)
+        else:
+            raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
+        globals()[name] = found
+        return found
 """
 
 _IMPORT = ["from libvswitch import values as _values", ""]

@@ -27,14 +27,17 @@ if TYPE_CHECKING:
 
 _ENUMS_TAIL = """
 
-def __getattr__(name: str) -> object:
-    # There are so many statuses that their members are made when somebody wants them.
-    if name != "Status":
-        raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
-    from libvswitch._status import Status
+# A type checker that saw this would let every name pass.
+if not TYPE_CHECKING:
 
-    globals()[name] = Status
-    return Status
+    def __getattr__(name: str) -> object:
+        # There are so many statuses that their members are made when somebody wants them.
+        if name != "Status":
+            raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
+        from libvswitch._status import Status
+
+        globals()[name] = Status
+        return Status
 """
 
 _STATUS_HEAD = '''"""Statuses. Written by python/make_enums.py."""

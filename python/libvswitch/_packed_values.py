@@ -279,9 +279,10 @@ def packed_sessions(name: str, values: Any) -> Any:
     try:
         table.version = _flat.VS_DVMIRROR_VERSION_V3
         _write_sessions(name, table, sessions)
-        first = table.get_first_session_entity(0)
-        for record, entity in zip(records_at(first, "DVMirrorEntity", len(entities)), entities):
-            _write_entity(name, record, entity)
+        if entities:
+            first = table.get_first_session_entity(0)
+            for record, entity in zip(records_at(first, "DVMirrorEntity", len(entities)), entities):
+                _write_entity(name, record, entity)
     except BaseException:
         _vs.free_dvmirror_session_table(table)
         raise

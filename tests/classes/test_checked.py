@@ -341,6 +341,14 @@ def test_entities_of_every_kind_come_back(host: Host) -> None:
     assert checked.VSDVS_GetDVMirrorSessions(SWITCH, PORT) == sessions
 
 
+def test_sessions_without_entities(host: Host) -> None:
+    sessions = (checked.DVMirrorSession("one"), checked.DVMirrorSession("two"))
+    checked.VSDVS_AppendDVMirrorSessions(SWITCH, PORT, sessions)
+    assert checked.VSDVS_GetDVMirrorSessions(SWITCH, PORT) == sessions
+    checked.VSDVS_AppendDVMirrorSessions(SWITCH, PORT, [])
+    assert checked.VSDVS_GetDVMirrorSessions(SWITCH, "web-2") == ()
+
+
 # Memory
 
 INTERRUPTED = sorted(set(NAMES) - REFUSED_ALONE)
