@@ -81,8 +81,10 @@ Transaction::~Transaction() {
 void Transaction::commit() {
   connection().guarded([&] { connection().database().exec("COMMIT"); });
   open_ = false;
-  // Into a file that is gone it was written for nobody.
-  connection().require_in_place();
+  if (access_ == Access::write) {
+    // Into a file that is gone it was written for nobody.
+    connection().require_in_place();
+  }
 }
 
 std::int64_t Transaction::last_key() const {
