@@ -8,6 +8,7 @@
 #include <cstring>
 #include <span>
 
+#include "base/utf8.h"
 #include "vswitch/call_trap.h"
 
 // Weak: the module and the interpreter provide these when they are in the process. Without them a
@@ -47,35 +48,6 @@ _object *exception_type(TrapKind kind) {
 
 bool trap_is_there() {
   return &exception_buffer != nullptr && &exceptionType != nullptr && &exceptionMsg != nullptr;
-}
-
-// How many bytes the well-formed UTF-8 character at the start of `text` takes; 0 if there is none.
-std::size_t character_length(std::string_view text) {
-  auto const byte = [&](std::size_t at) { return static_cast<unsigned char>(text[at]); };
-  auto const lead = byte(0);
-  if (lead < 0x80) {
-    return 1;
-  }
-  std::size_t const length = lead < 0xC2   ? 0
-                             : lead < 0xE0 ? 2
-                             : lead < 0xF0 ? 3
-                             : lead < 0xF5 ? 4
-                                           : 0;
-  if (length == 0 || length > text.size()) {
-    return 0;
-  }
-  // The second byte is where overlong forms, surrogates and values past the last one differ.
-  unsigned const low = lead == 0xE0 ? 0xA0 : lead == 0xF0 ? 0x90 : 0x80;
-  unsigned const high = lead == 0xED ? 0x9F : lead == 0xF4 ? 0x8F : 0xBF;
-  if (byte(1) < low || byte(1) > high) {
-    return 0;
-  }
-  for (std::size_t at = 2; at < length; ++at) {
-    if ((byte(at) & 0xC0U) != 0x80U) {
-      return 0;
-    }
-  }
-  return length;
 }
 
 // Appends what fits of `text` to the `used` bytes of `target`; returns the bytes used then.

@@ -7,6 +7,7 @@
 #include <array>
 
 #include "base/outcomes.h"
+#include "base/utf8.h"
 
 namespace simhost {
 namespace {
@@ -62,6 +63,7 @@ void check_effect(Fault const &fault) {
 void check(Fault const &fault) {
   get_call(fault.function);
   check_effect(fault);
+  require_utf8(fault.message);
   if (fault.first < 1 || fault.last < fault.first) {
     throw Refused(QEX_BAD_PARAM, "the first call that is hit is 1 or later");
   }

@@ -21,8 +21,8 @@ void apply(storage::Transaction &transaction, std::string_view document);
 /// "observed" with what follows from the rest, which apply() passes over.
 Json host_to_json(storage::Transaction &transaction);
 
-/// Likewise, as text. JSON holds UTF-8 only: bytes of a name that are none, which raw calls and
-/// images can set, are shown as U+FFFD.
+/// Likewise, as text. Names are UTF-8, as JSON is; of a value that is none, which its bytes under
+/// "properties" say whole, the other bytes are shown as U+FFFD.
 std::string description(storage::Transaction &transaction);
 
 }  // namespace simhost::scenario

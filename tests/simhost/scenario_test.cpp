@@ -1,6 +1,5 @@
 // Scenario documents: what they make of a host, what is refused and how it is told.
 #include "scenario/scenario.h"
-#include "planes/stored/stored_plane.h"
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
@@ -13,9 +12,12 @@
 #include <string>
 
 #include "abi/fresh_host.h"
+#include "faults/faults.h"
 #include "model/lookup.h"
+#include "model/ports/ports.h"
 #include "model/properties/properties.h"
 #include "model/switches/switches.h"
+#include "planes/stored/stored_plane.h"
 #include "qexapi/switch_properties.h"
 #include "scenario/lifecycle.h"
 #include "storage/store.h"
@@ -468,10 +470,39 @@ TEST_F(Scenario, WhatANamedFormCannotBeIsToldByItsPath) {
             "switches[0].ports[0].alias: has more than 80 bytes");
 }
 
-TEST_F(Scenario, NamesThatAreNoUtf8AreDescribedByAReplacement) {
+// Nothing gets a name that no document could say.
+TEST_F(Scenario, NamesAreUtf8) {
   Transaction transaction(store, Access::write);
-  simhost::create_switch(transaction, {.alias = "dvs\xFF"});
-  EXPECT_THAT(simhost::scenario::description(transaction), testing::HasSubstr("\"dvs\uFFFD\""));
+  std::string const name = "\xC3";
+  auto const refused = [](auto const &change) {
+    try {
+      change();
+      return false;
+    } catch (simhost::Refused const &refusal) {
+      return refusal.status() == QEX_INVALID_NAME;
+    }
+  };
+  EXPECT_TRUE(refused([&] { simhost::create_switch(transaction, {.alias = name}); }));
+  EXPECT_TRUE(
+      refused([&] { simhost::create_switch(transaction, {.alias = "s", .identifier = name}); }));
+  EXPECT_TRUE(
+      refused([&] { simhost::create_switch(transaction, {.alias = "s", .portset = name}); }));
+  auto const key = simhost::create_switch(transaction, {.alias = "\xC3\xA4"});
+  EXPECT_TRUE(refused([&] { simhost::add_client_port(transaction, key, name); }));
+  auto const port = simhost::add_client_port(transaction, key, "\xE2\x82\xAC");
+  EXPECT_TRUE(refused([&] { simhost::set_external_id(transaction, port, name); }));
+  auto const owner = simhost::storage::PropertyOwner::global(key);
+  EXPECT_TRUE(refused([&] {
+    simhost::set_property(transaction, owner, "com.example." + name, {},
+                          simhost::storage::PropertyType::config);
+  }));
+  EXPECT_TRUE(refused([&] {
+    simhost::add_fault(transaction,
+                       {.function = "VSDVS_GetMTU", .exception = "OSError", .message = name});
+  }));
+  auto const described = simhost::scenario::description(transaction);
+  EXPECT_THAT(described, testing::HasSubstr("\xC3\xA4"));
+  EXPECT_THAT(described, testing::HasSubstr("\xE2\x82\xAC"));
 }
 
 TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {

@@ -12,6 +12,7 @@
 #include "abi/outcome.h"
 #include "base/api.h"
 #include "base/outcomes.h"
+#include "base/utf8.h"
 #include "clock/clock.h"
 #include "faults/faults.h"
 #include "model/counters/counters.h"
@@ -249,6 +250,7 @@ SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, ch
     simhost::CounterOwner const owner{.switch_key = place.switch_key,
                                       .port = place.port,
                                       .session = session == nullptr ? "" : session};
+    simhost::require_utf8(owner.session);
     simhost::set_counter(transaction, owner, given(name), value);
   });
 }

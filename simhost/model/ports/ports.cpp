@@ -7,6 +7,7 @@
 #include <set>
 
 #include "base/outcomes.h"
+#include "base/utf8.h"
 #include "model/lookup.h"
 #include "model/ports/properties.h"
 #include "model/properties/properties.h"
@@ -29,6 +30,7 @@ void check_name(std::string_view name, std::size_t longest) {
   if (name.size() > longest) {
     throw Refused(QEX_NAME_TOO_LONG);
   }
+  require_utf8(name);
 }
 
 storage::Port added_port(storage::Transaction &transaction, storage::SwitchKey switch_key,

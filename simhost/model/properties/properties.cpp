@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "base/outcomes.h"
+#include "base/utf8.h"
 #include "storage/store.h"
 
 namespace simhost {
@@ -25,6 +26,7 @@ void check_key(storage::PropertyOwner const &owner, std::string_view name) {
   if (name.size() > kLongestKey) {
     throw Refused(QEX_NAME_TOO_LONG);
   }
+  require_utf8(name);
   auto const *const known = find_descriptor(name);
   if (known != nullptr && known->scope != owner.scope) {
     throw Refused(QEX_BAD_PARAM);

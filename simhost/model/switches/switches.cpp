@@ -8,6 +8,7 @@
 #include <string>
 
 #include "base/outcomes.h"
+#include "base/utf8.h"
 #include "model/lookup.h"
 #include "model/ports/ports.h"
 #include "model/properties/properties.h"
@@ -26,14 +27,15 @@ using storage::SwitchName;
 
 constexpr std::uint32_t kDefaultVersion = VS_YKT_NEB_VERSION_20;
 
-void check_length(std::string_view name, std::size_t longest) {
+void check_name(std::string_view name, std::size_t longest) {
   if (name.size() > longest) {
     throw Refused(QEX_NAME_TOO_LONG);
   }
+  require_utf8(name);
 }
 
 void check_alias(std::string_view alias) {
-  check_length(alias, kLongestAlias);
+  check_name(alias, kLongestAlias);
   if (alias.empty()) {
     throw Refused(QEX_BAD_PARAM);
   }
@@ -67,8 +69,8 @@ std::string fresh_portset(storage::Transaction &transaction) {
 
 storage::Switch row_of(storage::Transaction &transaction, SwitchSpec const &spec) {
   check_alias(spec.alias);
-  check_length(spec.identifier, kLongestSwitchIdentifier);
-  check_length(spec.portset, kLongestPortset);
+  check_name(spec.identifier, kLongestSwitchIdentifier);
+  check_name(spec.portset, kLongestPortset);
   auto const max_ports = or_default(spec.max_ports, kDefaultMaxPorts);
   if (max_ports > kGreatestMaxPorts) {
     throw Refused(QEX_BAD_PARAM);
