@@ -1,5 +1,5 @@
-// A state file of schema version 3 with the switch "old", as SQL that makes one: what the host has to
-// read for as long as there are such files. It is written out here and changes with nothing.
+// A state file of schema version 3 with the switch "old", as SQL that makes one: what the host has
+// to read for as long as there are such files. It is written out here and changes with nothing.
 #pragma once
 
 inline constexpr char const *kSchema3 = R"sql(
