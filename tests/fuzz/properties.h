@@ -21,8 +21,7 @@
 inline std::string consume_key(Input &input) {
   auto const known = simhost::descriptors();
   auto const index = input.ConsumeIntegralInRange<std::size_t>(0, known.size());
-  return index < known.size() ? std::string(known[index]->key)
-                              : input.ConsumeRandomLengthString(260);
+  return index < known.size() ? std::string(known[index]->key) : consume_text(input, 260);
 }
 
 template <typename Record>

@@ -100,7 +100,8 @@ struct ClassOf<Field Class::*> {
   using Value = Field;
 };
 
-/// A number in a field of a record, wherever the record is; packed records align nothing.
+/// A number in a field of a record, wherever the record is; packed records align nothing, so that
+/// no reference may be bound to the field.
 template <auto kField>
 struct NumberField {
   using Object = typename ClassOf<decltype(kField)>::Object;
@@ -114,14 +115,14 @@ struct NumberField {
   }
   static void store(Object &object, std::int64_t number) {
     auto const value = static_cast<Value>(number);
-    std::memcpy(std::addressof(object.*kField), &value, sizeof value);
+    std::memcpy(&(object.*kField), &value, sizeof value);
   }
 
  private:
   template <typename Number>
   static Number copy(Object const &object) {
     Number number;
-    std::memcpy(&number, std::addressof(object.*kField), sizeof number);
+    std::memcpy(&number, &(object.*kField), sizeof number);
     return number;
   }
 };
