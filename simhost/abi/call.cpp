@@ -15,17 +15,17 @@ namespace {
 constinit thread_local bool call_runs = false;
 
 // The faults that hit the call of a function that is being made now.
-std::vector<Fault> hits_on(std::string_view function) {
+std::vector<Fault> hits_on(std::string_view function, storage::Patience &patience) {
   auto &host = this_host();
   std::scoped_lock const held(host.lock());
   auto &state = host.state();
   {
-    storage::ReadingTransaction look(state);
+    storage::ReadingTransaction look(state, patience);
     if (!any_fault_waits(look, function)) {
       return {};
     }
   }
-  storage::ChangingTransaction transaction(state);
+  storage::ChangingTransaction transaction(state, patience);
   auto hits = count_call(transaction, function);
   transaction.commit();
   return hits;
@@ -33,9 +33,9 @@ std::vector<Fault> hits_on(std::string_view function) {
 
 // Likewise; a state that cannot be read has no faults, and a call that needs it will say so itself.
 // But one that is only busy may have some.
-std::vector<Fault> readable_hits_on(std::string_view function) {
+std::vector<Fault> readable_hits_on(std::string_view function, storage::Patience &patience) {
   try {
-    return hits_on(function);
+    return hits_on(function, patience);
   } catch (storage::StateFailure const &failure) {
     if (failure.kind() == storage::FailureKind::busy) {
       throw;
@@ -45,8 +45,8 @@ std::vector<Fault> readable_hits_on(std::string_view function) {
   return {};
 }
 
-void inject_faults(std::string_view function) {
-  auto const hits = readable_hits_on(function);
+void inject_faults(std::string_view function, storage::Patience &patience) {
+  auto const hits = readable_hits_on(function, patience);
   pause(delay_of(hits));
   inject(hits);
 }
@@ -62,7 +62,7 @@ void commit_any(std::unique_ptr<Transaction> const &transaction) {
 
 Call::Call(CallName const &name) : name_(name.text) {
   if (!name.is_resumed) {
-    inject_faults(name.text);
+    inject_faults(name.text, patience_);
   }
   this_host().lock().lock();
   call_runs = true;
@@ -97,7 +97,7 @@ ReadingCall::~ReadingCall() = default;
 
 storage::ReadingTransaction &ReadingCall::transaction() {
   if (!transaction_) {
-    transaction_ = std::make_unique<storage::ReadingTransaction>(this_host().state());
+    transaction_ = std::make_unique<storage::ReadingTransaction>(this_host().state(), patience_);
   }
   return *transaction_;
 }
@@ -111,7 +111,7 @@ ChangingCall::~ChangingCall() = default;
 
 storage::ChangingTransaction &ChangingCall::transaction() {
   if (!transaction_) {
-    transaction_ = std::make_unique<storage::ChangingTransaction>(this_host().state());
+    transaction_ = std::make_unique<storage::ChangingTransaction>(this_host().state(), patience_);
   }
   return *transaction_;
 }

@@ -39,12 +39,17 @@ class SIMHOST_API Call {
   Call &operator=(Call const &) = delete;
 
   [[nodiscard]] char const *name() const { return name_; }
+  /// How long it goes on waiting for other processes, faults and state together.
+  [[nodiscard]] storage::Patience const &patience() const { return patience_; }
   Ledger &ledger();
   Handles &handles();
   DataLists &lists();
 
  private:
   char const *name_;
+
+ protected:
+  storage::Patience patience_;
 };
 
 /// Ends the process with a message while a call runs in this thread: its lock is held.

@@ -6,6 +6,7 @@
 #include <cctype>
 #include <chrono>
 #include <limits>
+#include <stdexcept>
 #include <utility>
 
 namespace simhost::storage {
@@ -142,13 +143,42 @@ void Connection::require_schema_of_now() {
   seen_ = version;
 }
 
-SQLite::Statement &Connection::prepared(std::string_view sql) {
+void Connection::begin(char const *sql, std::chrono::nanoseconds longest_wait) {
+  using std::chrono::milliseconds;
+  guarded([&] {
+    database_->setBusyTimeout(
+        static_cast<int>(std::chrono::duration_cast<milliseconds>(longest_wait).count()));
+    database_->exec(sql);
+  });
+}
+
+SQLite::Statement &Connection::prepared(std::string_view sql, bool may_change) {
+  auto &prepared = kept(sql);
+  if (prepared.changes && !may_change) {
+    throw std::logic_error("a call that only reads the state was about to change it");
+  }
+  return prepared.statement;
+}
+
+Connection::Prepared &Connection::kept(std::string_view sql) {
   if (auto const found = statements_.find(sql); found != statements_.end()) {
     return found->second;
   }
-  return guarded([&]() -> SQLite::Statement & {
-    return statements_.try_emplace(sql, *database_, std::string(sql)).first->second;
+  return guarded([&]() -> Prepared & {
+    SQLite::Statement statement(*database_, std::string(sql));
+    bool const writes = changes(statement);
+    return statements_.try_emplace(sql, Prepared{std::move(statement), writes}).first->second;
   });
+}
+
+// The statement keeps its handle to itself, so it is looked for among those of the database.
+bool Connection::changes(SQLite::Statement const &statement) const {
+  auto *const database = database_->getHandle();
+  auto *handle = sqlite3_next_stmt(database, nullptr);
+  while (handle != nullptr && statement.getQuery() != sqlite3_sql(handle)) {
+    handle = sqlite3_next_stmt(database, handle);
+  }
+  return handle == nullptr || sqlite3_stmt_readonly(handle) == 0;
 }
 
 std::uint32_t Connection::data_version() const {

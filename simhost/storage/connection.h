@@ -49,16 +49,26 @@ class Connection {
   /// Costs little while nobody writes to the file.
   void require_schema_of_now();
 
-  /// `sql` is a literal: the statement prepared from it is kept.
-  SQLite::Statement &prepared(std::string_view sql);
+  /// Begins a transaction, which waits for other processes no longer than that.
+  void begin(char const *sql, std::chrono::nanoseconds longest_wait);
+  /// `sql` is a literal: the statement prepared from it is kept. Throws std::logic_error for one
+  /// that changes the state where none may.
+  SQLite::Statement &prepared(std::string_view sql, bool may_change);
   /// Begins to count the steps of a statement anew.
   void start_statement() { rounds_ = 0; }
   /// What a statement may come to: what is free, and that much for each byte of the file.
   [[nodiscard]] std::uint64_t allowance(std::uint64_t free, std::uint64_t per_byte) const;
 
  private:
+  struct Prepared {
+    SQLite::Statement statement;
+    bool changes;  // the state
+  };
+
   static int stop_if_endless(void *connection);
   void open_file();
+  Prepared &kept(std::string_view sql);
+  [[nodiscard]] bool changes(SQLite::Statement const &statement) const;
   void require_schema();
   [[nodiscard]] std::uint32_t data_version() const;
   [[nodiscard]] std::filesystem::path name() const;
@@ -67,7 +77,7 @@ class Connection {
 
   std::optional<StateFile> file_;
   std::optional<SQLite::Database> database_;
-  std::map<std::string_view, SQLite::Statement> statements_;
+  std::map<std::string_view, Prepared> statements_;
   std::uint64_t rounds_ = 0;
   bool watching_ = false;
   std::uint32_t seen_ = 0;   // the version of the data whose schema is known

@@ -25,7 +25,8 @@ class Query {
  public:
   /// `sql` is a literal: the statement prepared from it is kept.
   Query(Transaction &transaction, std::string_view sql)
-      : connection_(transaction.connection()), statement_(connection_.prepared(sql)) {
+      : connection_(transaction.connection()),
+        statement_(connection_.prepared(sql, transaction.access() == Access::write)) {
     connection_.start_statement();
   }
   ~Query();

@@ -65,10 +65,14 @@ void Store::create_or_bring_forward(Populate const &populate) {
   transaction.commit();
 }
 
+Transaction::Transaction(Store &store, Access access, Patience &patience)
+    : store_(store), access_(access) {
+  begin(patience);
+}
+
 Transaction::Transaction(Store &store, Access access) : store_(store), access_(access) {
-  connection().require_in_place();
-  connection().guarded(
-      [&] { connection().database().exec(access == Access::write ? "BEGIN IMMEDIATE" : "BEGIN"); });
+  Patience patience;
+  begin(patience);
 }
 
 Transaction::~Transaction() {
@@ -76,6 +80,13 @@ Transaction::~Transaction() {
     // It fails when SQLite has rolled back by itself, and then there is nothing left to undo.
     connection().database().tryExec("ROLLBACK");
   }
+}
+
+void Transaction::begin(Patience &patience) {
+  connection().require_in_place();
+  patience.spend([&](std::chrono::nanoseconds left) {
+    connection().begin(access_ == Access::write ? "BEGIN IMMEDIATE" : "BEGIN", left);
+  });
 }
 
 void Transaction::commit() {

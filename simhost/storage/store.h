@@ -7,6 +7,7 @@
 #include <optional>
 #include <string>
 
+#include "storage/patience.h"
 #include "storage/state_file.h"
 
 namespace simhost::storage {
@@ -50,6 +51,8 @@ enum class Access { read, write };
 class Transaction {
  public:
   /// Throws StateFailure (busy) when the wait for other writers takes too long.
+  Transaction(Store &store, Access access, Patience &patience);
+  /// Likewise, waiting as long as one call does.
   Transaction(Store &store, Access access);
   ~Transaction();
   Transaction(Transaction const &) = delete;
@@ -66,6 +69,7 @@ class Transaction {
  private:
   friend class Query;
 
+  void begin(Patience &patience);
   [[nodiscard]] Connection &connection() const { return *store_.connection_; }
 
   Store &store_;
@@ -73,16 +77,20 @@ class Transaction {
   bool open_ = true;
 };
 
-/// A transaction that only reads the state.
+/// A transaction that only reads the state: what would change it throws std::logic_error.
 class ReadingTransaction : public Transaction {
  public:
   explicit ReadingTransaction(Store &store) : Transaction(store, Access::read) {}
+  ReadingTransaction(Store &store, Patience &patience)
+      : Transaction(store, Access::read, patience) {}
 };
 
 /// A transaction that changes the state: what changes it takes one of these.
 class ChangingTransaction : public Transaction {
  public:
   explicit ChangingTransaction(Store &store) : Transaction(store, Access::write) {}
+  ChangingTransaction(Store &store, Patience &patience)
+      : Transaction(store, Access::write, patience) {}
 };
 
 }  // namespace simhost::storage

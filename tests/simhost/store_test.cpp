@@ -4,6 +4,7 @@
 #include <SQLiteCpp/Database.h>
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <fstream>
@@ -115,6 +116,29 @@ TEST(Store, AReaderDoesNotWaitForAWriterAndSeesTheStateBefore) {
   EXPECT_FALSE(has(reader, "a"));
   transaction.commit();
   EXPECT_TRUE(has(reader, "a"));
+}
+
+TEST(Store, AWriterWaitsForWhatIsLeftOfItsPatience) {
+  TemporaryFolder const folder;
+  Store holder(folder.file("host.db"), populate_nothing);
+  Store waiter(folder.file("host.db"), populate_nothing);
+  Transaction const held(holder, Access::write);
+  simhost::storage::Patience patience(std::chrono::milliseconds(1));
+  for (int time = 0; time < 2; ++time) {
+    try {
+      Transaction const transaction(waiter, Access::write, patience);
+      ADD_FAILURE() << "two write at once";
+    } catch (simhost::storage::StateFailure const &failure) {
+      EXPECT_EQ(failure.kind(), simhost::storage::FailureKind::busy);
+      EXPECT_EQ(failure.what(), "another process keeps the state file " +
+                                    folder.file("host.db").string() + " locked");
+    }
+    EXPECT_EQ(patience.left(), std::chrono::nanoseconds::zero());
+  }
+  Transaction transaction(waiter, Access::read, patience);
+  simhost::storage::Query query(transaction, "PRAGMA busy_timeout");
+  query.require_row();
+  EXPECT_EQ(query.integer(0), 0) << "SQLite waits longer";
 }
 
 TEST(Store, ATransactionSeesOneStateThroughout) {
