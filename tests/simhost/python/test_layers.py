@@ -35,7 +35,10 @@ BELOW: Dict[str, List[str]] = {
     "planes": ["base", "storage", "clock", "model"],
     "scenario": ["base", "storage", "clock", "faults", "model"],
     "abi": ["base", "storage", "clock", "faults", "model", "planes", "scenario"],
+    # Of the layers below, only what any program may use.
+    "cli": [],
 }
+API = "abi/simhost_api/simhost.h"
 PRIVATE = "storage/query.h"
 MOST_FILES = 25
 
@@ -78,6 +81,10 @@ def test_no_other_layer_is_found(layer: str, other: str, tmp_path: Path) -> None
     done = compiled(layer, tmp_path, HEADERS[other])
     assert done.returncode != 0
     assert f"{HEADERS[other]}: No such file or directory" in done.stderr
+
+
+def test_the_command_finds_what_any_program_does(tmp_path: Path) -> None:
+    assert compiled("cli", tmp_path, API).returncode == 0
 
 
 def test_queries_are_the_storage_s_own(tmp_path: Path) -> None:
