@@ -1,4 +1,4 @@
-// Numbers on the command line, read as scenario documents read theirs.
+// Words on the command line: numbers are read as scenario documents read theirs.
 #include "cli/commands.h"
 
 #include <fmt/format.h>
@@ -49,6 +49,15 @@ std::function<std::string(std::string const &)> decimal_number() {
     return text.substr(0, point).size() > kDigits
                ? fmt::format("{} has more than {} digits", text, kDigits)
                : "";
+  };
+}
+
+std::function<std::string(std::string const &)> one_of(std::string const &one,
+                                                       std::string const &other) {
+  return [one, other](std::string const &word) -> std::string {
+    return word == one || word == other
+               ? ""
+               : fmt::format("'{}' is neither {} nor {}", word, one, other);
   };
 }
 

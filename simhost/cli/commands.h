@@ -42,6 +42,10 @@ std::function<std::string(std::string const &)> whole_number(
 /// Likewise for a number of up to twelve digits and three decimals.
 std::function<std::string(std::string const &)> decimal_number();
 
+/// Likewise for one of two words.
+std::function<std::string(std::string const &)> one_of(std::string const &one,
+                                                       std::string const &other);
+
 /// What a command was given, which lives as long as the app does whose callbacks keep it.
 template <typename Words>
 std::shared_ptr<Words> words_of_command() {

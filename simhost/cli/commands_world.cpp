@@ -63,9 +63,7 @@ void add_link(CLI::App &app) {
   auto *const link = app.add_subcommand("link", "Plug the cable of an uplink in, or pull it");
   auto const given = words_of_command<LinkWords>();
   link->add_option("uplink", given->uplink, "its name, such as nic0")->required();
-  link->add_option("state", given->state, "up or down")
-      ->required()
-      ->check(CLI::IsMember({"up", "down"}));
+  link->add_option("state", given->state, "up or down")->required()->check(one_of("up", "down"));
   link->footer("The teams of its switch follow at once:\n  simhostctl link nic4 down");
   link->callback(
       [given] { check(simhost_set_link(given->uplink.c_str(), given->state == "up" ? 1 : 0)); });
@@ -79,7 +77,7 @@ void add_up_or_down(CLI::App &command, UplinkWords const &given, std::string con
   command
       .add_option_function<std::string>(
           "--" + key, [given, key](std::string const &state) { (*given)[key] = state; }, what)
-      ->check(CLI::IsMember({"up", "down"}));
+      ->check(one_of("up", "down"));
 }
 
 // The document has its own bounds.
@@ -110,9 +108,11 @@ void add_uplink(CLI::App &app) {
       "full or half");
   add_number(*uplink, given, "error-percent", "error_percent",
              "how many of its frames are damaged, of 100");
-  uplink->add_option_function<bool>(
-      "--driver", [given](bool loaded) { (*given)["driver"] = loaded; },
-      "whether the driver of the card is loaded: true or false");
+  uplink
+      ->add_option_function<bool>(
+          "--driver", [given](bool loaded) { (*given)["driver"] = loaded; },
+          "whether the driver of the card is loaded: true or false")
+      ->check(one_of("true", "false"));
   uplink->footer(
       "Teams whose criteria look at it follow at once:\n"
       "  simhostctl uplink nic4 --beacons down --error-percent 12");

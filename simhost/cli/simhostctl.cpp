@@ -1,9 +1,11 @@
 // simhostctl: looking at a simulated host and changing it, from a shell.
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
 #include <string>
+#include <string_view>
 
 #include "cli/commands.h"
 
@@ -35,13 +37,44 @@ bool lacks_command(CLI::App const &app) {
   return chosen.empty() ? app.get_require_subcommand_min() > 0 : lacks_command(*chosen.back());
 }
 
+// The parser says only in its text which option it is about, and says it first.
+std::string option_of(CLI::ParseError const &error) {
+  std::string const text = error.what();
+  return "'" + text.substr(0, text.find_first_of(": ")) + "'";
+}
+
+// The parser's errors in words of our own.
+std::string wrong_option(CLI::ParseError const &error) {
+  if (dynamic_cast<CLI::RequiredError const *>(&error) != nullptr) {
+    return option_of(error) + " is missing";
+  }
+  if (dynamic_cast<CLI::ExcludesError const *>(&error) != nullptr) {
+    std::string const text = error.what();
+    return option_of(error) + " does not go with '" + text.substr(text.rfind(' ') + 1) + "'";
+  }
+  if (dynamic_cast<CLI::ArgumentMismatch const *>(&error) != nullptr) {
+    bool const lacks_value = std::string_view(error.what()).ends_with("missing");
+    return option_of(error) + (lacks_value ? " needs a value" : " takes one value, once");
+  }
+  if (dynamic_cast<CLI::ConversionError const *>(&error) != nullptr) {
+    // The checks let through only what can be read, so it is a flag.
+    std::string const text = error.what();
+    auto const name = text.substr(std::min(text.find("--"), text.size()));
+    return "'" + name.substr(0, name.find(' ')) + "' takes no value";
+  }
+  if (dynamic_cast<CLI::ValidationError const *>(&error) != nullptr) {
+    return error.what();  // what a check of ours said, after the option
+  }
+  return "the words cannot be understood";
+}
+
 // The parser asks for a command that is missing before it looks at the words that it did not know.
 std::string complaint(CLI::App const &app, CLI::ParseError const &error) {
   bool const lacks = dynamic_cast<CLI::RequiredError const *>(&error) != nullptr;
   bool const has_more = dynamic_cast<CLI::ExtrasError const *>(&error) != nullptr;
   auto const unknown = app.remaining(true);
   if (unknown.empty() || !(lacks || has_more)) {
-    return lacks && lacks_command(app) ? "a command is missing" : error.what();
+    return lacks && lacks_command(app) ? "a command is missing" : wrong_option(error);
   }
   auto const &word = unknown.front();
   auto const *const what = word.starts_with('-') ? "there is no option"
