@@ -42,7 +42,7 @@ TEST_F(Faults, MayHitAllCallsUntilTheyAreCleared) {
 }
 
 TEST_F(Faults, PanicWithTypeAndText) {
-  ASSERT_EQ(simhost_panic_call("VSQEX_FreeMemory", 1, 1, "ValueError", "out of %s"), QEX_OK);
+  ASSERT_EQ(simhost_trap_call("VSQEX_FreeMemory", 1, 1, "ValueError", "out of %s"), QEX_OK);
   EXPECT_EQ(raised_by([] { VSQEX_FreeMemory(nullptr); }),
             (Raised{.type = "ValueError", .message = "out of %s"}));
   EXPECT_EQ(raised_by([] { VSQEX_FreeMemory(nullptr); }), std::nullopt);
@@ -61,7 +61,7 @@ TEST_F(Faults, AreChecked) {
   EXPECT_EQ(simhost_clear_faults("VSDVS_Nothing"), QEX_NOT_FOUND);
   EXPECT_STREQ(simhost_error(), "there is no call 'VSDVS_Nothing' (QEX_NOT_FOUND)");
   EXPECT_EQ(simhost_fail_call("Panic", 1, 1, QEX_BUSY), QEX_NOT_SUPPORTED);
-  EXPECT_EQ(simhost_panic_call("Panic", 1, 1, "OSError", ""), QEX_NOT_SUPPORTED);
+  EXPECT_EQ(simhost_trap_call("Panic", 1, 1, "OSError", ""), QEX_NOT_SUPPORTED);
   EXPECT_EQ(simhost_delay_call("Panic", 1, 1, 1), QEX_NOT_SUPPORTED);
   EXPECT_STREQ(simhost_error(), "no fault can hit Panic (QEX_NOT_SUPPORTED)");
   EXPECT_EQ(simhost_fail_call("VSQEX_FreeMemory", 1, 1, QEX_BUSY), QEX_NOT_SUPPORTED)
@@ -73,7 +73,7 @@ TEST_F(Faults, AreChecked) {
   EXPECT_STREQ(simhost_error(), "a fault needs a status, an exception or a delay (QEX_BAD_PARAM)");
   EXPECT_EQ(simhost_delay_call("VSDVS_SetMTU", 1, 1, 3600001), QEX_BAD_PARAM);
   EXPECT_STREQ(simhost_error(), "a delay is an hour at most (QEX_BAD_PARAM)");
-  EXPECT_EQ(simhost_panic_call("VSDVS_SetMTU", 1, 1, "NoError", ""), QEX_BAD_PARAM);
+  EXPECT_EQ(simhost_trap_call("VSDVS_SetMTU", 1, 1, "NoError", ""), QEX_BAD_PARAM);
   EXPECT_STREQ(simhost_error(),
                "'NoError' is none of the exception types RuntimeError, OSError, ConnectionError, "
                "IndexError, KeyError, MemoryError, NotImplementedError, PermissionError, "

@@ -261,7 +261,7 @@ TEST_F(StateLibrary, ACallbackMayTrap) {
 // What a call raises that a fault waits for.
 template <typename Walk>
 std::optional<Raised> trapped_by(char const *name, Walk const &walk) {
-  EXPECT_EQ(simhost_panic_call(name, 1, 1, "OSError", "gone"), QEX_OK);
+  EXPECT_EQ(simhost_trap_call(name, 1, 1, "OSError", "gone"), QEX_OK);
   auto raised = raised_by(walk);
   EXPECT_EQ(simhost_clear_faults(name), QEX_OK);
   return raised;

@@ -261,8 +261,8 @@ SIMHOST_API int simhost_fail_call(char const *function, uint32_t nth, uint32_t t
   });
 }
 
-SIMHOST_API int simhost_panic_call(char const *function, uint32_t nth, uint32_t times,
-                                   char const *exception, char const *message) {
+SIMHOST_API int simhost_trap_call(char const *function, uint32_t nth, uint32_t times,
+                                  char const *exception, char const *message) {
   return add_fault(function, nth, times, [&](simhost::Fault &fault) {
     fault.exception = given(exception);
     fault.message = given(message);

@@ -100,8 +100,8 @@ int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int st
 
 /** The calls do nothing and spring the trap with an exception type such as "OSError", and a text.
  */
-int simhost_panic_call(char const *function, uint32_t nth, uint32_t times, char const *exception,
-                       char const *message);
+int simhost_trap_call(char const *function, uint32_t nth, uint32_t times, char const *exception,
+                      char const *message);
 
 /**
  * The calls wait so many milliseconds of real time, then do what they do; QEX_BAD_PARAM for more
