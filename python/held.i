@@ -22,8 +22,8 @@ static PyObject *left_at(PyObject *result, PyObject *place) {
     Py_XINCREF(output);
     return output;
   }
-  SwigPyObject *const raw = SWIG_Python_GetSwigThis(place);
-  if (!raw) return PyErr_Format(PyExc_TypeError, "a place is an index or a pointer object");
+  SwigPyObject *const raw = raw_pointer(place);
+  if (!raw) return NULL;
   void *const left = *(void **)raw->ptr;
   return left ? SwigPyObject_New(left, SWIG_TypeQuery("void *"), 0) : SWIG_Py_Void();
 }
@@ -48,21 +48,6 @@ static int release_places(PyObject *result, PyObject *deallocator, PyObject *pla
   }
   return refused ? -1 : 0;
 }
-
-static PyObject *set_attribute(PyObject *set, PyObject *arguments) {
-  PyObject *record = NULL, *name = NULL, *value = NULL;
-  if (!PyArg_ParseTuple(arguments, "OOO", &record, &name, &value)) return NULL;
-  if (PyUnicode_Check(name) && PyUnicode_Compare(name, SWIG_This()) == 0) {
-    PyObject *held = PyObject_GenericGetDict(record, NULL);
-    int const is_set = held ? PyDict_Contains(held, name) : -1;
-    Py_XDECREF(held);
-    if (is_set < 0) return NULL;
-    if (!is_set) return PyObject_GenericSetAttr(record, name, value) < 0 ? NULL : SWIG_Py_Void();
-  }
-  return PyObject_CallObject(set, arguments);
-}
-
-static PyMethodDef set_attribute_method = {"__setattr__", set_attribute, METH_VARARGS, NULL};
 %}
 
 %inline %{
@@ -95,14 +80,5 @@ PyObject *read_and_release(PyObject *call, PyObject *arguments, PyObject *read,
   Py_XDECREF(value);
   Py_DECREF(result);
   return both;
-}
-
-/* A __setattr__ that lets the runtime set `this` of a new record without a frame of Python's, in which
-   a signal could raise: the wrapper would lose what the library allocated. */
-PyObject *attribute_setter(PyObject *set) {
-  PyObject *function = PyCFunction_New(&set_attribute_method, set);
-  PyObject *method = function ? PyInstanceMethod_New(function) : NULL;
-  Py_XDECREF(function);
-  return method;
 }
 %}

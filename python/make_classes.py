@@ -16,7 +16,7 @@ from python_source import documentation, function
 _HEAD = '''"""The records of the host as classes. Written by python/make_classes.py."""
 
 import _libvswitch as flat
-from libvswitch import _arrays, _by_hand, _checks, _memory, _records
+from libvswitch import _arrays, _by_hand, _checks, _memory, _pointers, _records
 '''
 
 
@@ -96,11 +96,10 @@ def _size(known: Definitions, field: Field) -> str:
 def _constructor(known: Definitions, record: Record) -> List[str]:
     names = [one.name for one in record.constructor]
     new = f"flat.new_{record.name}"
+    if not names and any(one.is_writable for one in record.fields):
+        return ["", f"    _new = {new}"]
     if not names:
-        body = [f"_records.attach(self, {new}())"]
-        if any(one.is_writable for one in record.fields):
-            names = ["**fields"]
-            body += ["if fields:", "    self._set(fields)"]
+        body = [f"_pointers.attach(self, {new}())"]
     elif record.count:
         body = _list_constructor(known, record, new)
     else:
@@ -129,9 +128,12 @@ def _list_constructor(known: Definitions, record: Record, new: str) -> List[str]
 def _field(known: Definitions, record: Record, field: Field) -> List[str]:
     getter, setter = accessors(known, record, field)
     flat = f"flat.{record.name}_{field.name}"
-    if getter == [f"return {flat}_get(self)"] and setter in ([], [f"{flat}_set(self, value)"]):
-        lines = ["", f"    {field.name} = {_property(flat, field)}"]
-        return lines
+    where = f'"{record.name}.{field.name}"'
+    is_checked = setter == [f"{flat}_set(self, _checks.text({where}, value))"]
+    is_plain = is_checked or setter in ([], [f"{flat}_set(self, value)"])
+    if is_plain and getter == [f"return {flat}_get(self)"]:
+        check = f"_checks.text, {where}" if is_checked else ""
+        return ["", f"    {field.name} = {_property(flat, field, check)}"]
     lines = ["", "    @property", *function(field.name, ["self"], field.doc, getter, "    ")]
     if setter:
         lines += ["", f"    @{field.name}.setter"]
@@ -139,11 +141,16 @@ def _field(known: Definitions, record: Record, field: Field) -> List[str]:
     return lines
 
 
-def _property(flat: str, field: Field) -> str:
+def _property(flat: str, field: Field, check: str) -> str:
     write = f"{flat}_set" if field.is_writable else "None"
     text = "\n".join(documentation(field.doc, "        ")).strip()
-    doc = f", None, {text}" if text else ""
-    return f"property({flat}_get, {write}{doc})"
+    given = [f"{flat}_get", write]
+    if text or check:
+        given.append(text or "None")
+    if not check:
+        return f"_pointers.Field({', '.join(given)})"
+    lines = "".join(f"\n        {one}," for one in [*given, check])
+    return f"_pointers.Field({lines}\n    )"
 
 
 def accessors(known: Definitions, record: Record, field: Field) -> Tuple[List[str], List[str]]:

@@ -4,15 +4,10 @@
 
 %module _pointers
 
+%include "fields.i"
+
 %{
 #include "record_sizes.h"
-
-/* What a class wraps, or the object itself; a TypeError for anything else. */
-static SwigPyObject *raw_pointer(PyObject *object) {
-  SwigPyObject *raw = SWIG_Python_GetSwigThis(object);
-  if (!raw) PyErr_SetString(PyExc_TypeError, "neither a pointer object nor a record");
-  return raw;
-}
 
 #define LENGTH_OF(array) (sizeof(array) / sizeof *(array))
 

@@ -144,7 +144,8 @@ class Array(_records._Pointing, typing.Sequence[T]):
 def made(pointer: Any, element: str, count: Optional[int], inner: int = 0) -> "Array[Any]":
     """The array at a pointer: its elements, how many, and the bytes of one that is an array."""
     array: Array[Any] = Array.__new__(Array)
-    array.__dict__.update(this=pointer, _element=element, _count=count, _inner=inner)
+    _pointers.attach(array, pointer)
+    array.__dict__.update(_element=element, _count=count, _inner=inner)
     return array
 
 

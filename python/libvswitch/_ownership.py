@@ -67,7 +67,8 @@ def release(given: Any, deallocator: Callable[[Any], Any]) -> None:
         memory = taken[0].pointer
         if not isinstance(deallocator, types.BuiltinFunctionType):
             memory = object.__new__(type(given))
-            memory.__dict__.update(given.__dict__, this=taken[0].pointer, _views={}, _cells=())
+            _pointers.attach(memory, taken[0].pointer)
+            memory.__dict__.update(given.__dict__, _views={}, _cells=())
         try:
             _pointers.release(deallocator, memory)
         except BaseException:

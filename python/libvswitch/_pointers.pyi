@@ -1,8 +1,23 @@
 """Pointer objects of the wrapper runtime: see python/pointers.i."""
 
-from typing import Any, Callable, Dict, List, Tuple, TypeVar, Union
+from typing import Any, Callable, Dict, List, Optional, Tuple, TypeVar, Union, final
 
 _T = TypeVar("_T")
+
+class Pointing:
+    this: Any
+    def __init__(self, *args: Any, **kwargs: Any) -> None: ...
+
+@final
+class Field(property):
+    def __init__(
+        self,
+        read: Callable[[Any], Any],
+        write: Optional[Callable[[Any, Any], Any]],
+        doc: Optional[str] = None,
+        check: Optional[Callable[[str, Any], Any]] = None,
+        where: str = "",
+    ) -> None: ...
 
 def pointer_object(address: int, spelling: str) -> Any: ...
 def clear(object: Any) -> None: ...
@@ -24,4 +39,4 @@ def read_and_release(
     places: Tuple[Any, ...],
     keeps: bool,
 ) -> Tuple[Union[int, BaseException], _T]: ...
-def attribute_setter(set: Callable[..., None]) -> Any: ...
+def attach(object: Any, pointer: Any) -> None: ...

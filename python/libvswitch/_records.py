@@ -22,16 +22,14 @@ T = TypeVar("T")
 CLASSES: Dict[str, Type["Record"]] = {}
 
 
-class _Pointing:
-    """An object that the wrapper runtime takes for the pointer object in its `this`.
+class _Pointing(_pointers.Pointing):
+    """An object that the wrapper runtime takes for the pointer object that is its `this`.
 
-    The runtime looks for `this` in the object's dictionary and nowhere else. Beside it is what
-    the object needs to know of its memory: `_owner`, in which it lies, and `_kept`, the pointer
-    objects that keep that, whatever becomes of the owner; `_end`, where the memory ends;
-    `_deallocator`; `_views` into it and `_cells` that hold it.
+    That is set once, and no other attribute can be set: see python/fields.i. The object's
+    dictionary has what it needs to know of its memory: `_owner`, in which it lies, and `_kept`,
+    the pointer objects that keep that, whatever becomes of the owner; `_end`, where the memory
+    ends; `_deallocator`; `_views` into it and `_cells` that hold it.
     """
-
-    this: Any
 
     def __int__(self) -> int:
         return _pointers.address_of(self)
@@ -44,17 +42,6 @@ class _Pointing:
 
     def __hash__(self) -> int:
         return hash(int(self))
-
-    # A type checker that saw these would let every name pass.
-    if not typing.TYPE_CHECKING:
-
-        def __setattr__(self, name: str, value: Any) -> None:
-            if name != "this" or "this" in self.__dict__:
-                raise AttributeError(f"the attribute {name!r} of {_a(self)} cannot be set")
-            self.__dict__["this"] = value  # the runtime's, on interpreters that it does not know
-
-        def __delattr__(self, name: str) -> None:
-            raise AttributeError(f"the attribute {name!r} of {_a(self)} cannot be deleted")
 
     def __copy__(self) -> Any:
         raise TypeError(
@@ -90,7 +77,7 @@ def place_in(owner: Any, view: Any) -> Any:
         views: Dict[int, Any] = owner.__dict__.setdefault("_views", {})
         key = id(view)
         views[key] = weakref.ref(view, lambda _: views.pop(key, None))
-        kept = owner.__dict__.get("this"), owner.__dict__.get("_kept")
+        kept = getattr(owner, "this", None), owner.__dict__.get("_kept")
         view.__dict__.update(_owner=owner, _kept=kept)
         if not _pointers.address_of(owner):
             _pointers.clear(view)
@@ -199,20 +186,6 @@ class Record(_Pointing):
             place, count, element = own._trailing
             size = max(size, _memory.ARRAY_OFFSETS[place] + count(record) * element)
         return int(record) + size
-
-    # A type checker that saw this would let every name pass.
-    if not typing.TYPE_CHECKING:
-
-        def __setattr__(self, name: str, value: Any) -> None:
-            if name in self._fields:
-                self._require()
-            elif name != "thisown":
-                if name == "this":
-                    return super().__setattr__(name, value)
-                raise AttributeError(f"{type(self).__name__} has no field {name!r}")
-            object.__setattr__(self, name, value)
-
-        __setattr__ = _pointers.attribute_setter(__setattr__)
 
     def __repr__(self) -> str:
         if not int(self):
@@ -333,17 +306,9 @@ def register(cls: Type[Record], registered: Any) -> None:
     CLASSES[cls._name] = cls
 
 
-def attach(record: Any, pointer: Any) -> None:
-    """What the constructor of a class does with the pointer object that the flat one made."""
-    if pointer is None:
-        raise MemoryError(f"no memory for {_a(record)}")
-    if record.__dict__.setdefault("this", pointer) is not pointer:
-        raise TypeError(f"this {type(record).__name__} has its memory already")
-
-
 def attach_bytes(record: Any, pointer: Any, size: int) -> None:
-    """Likewise of a record that is as large as its caller says, which starts as zeros."""
-    attach(record, pointer)
+    """Gives a new record memory that is as large as its caller says, and starts as zeros."""
+    _pointers.attach(record, pointer)
     _pointers.write_memory(record, 0, bytes(size))
     record.__dict__["_end"] = int(record) + size
 
@@ -355,7 +320,7 @@ def record_at(name: str, address: int) -> Record:
 
 def wrap(name: str, pointer: Any) -> Record:
     made = CLASSES[name].__new__(CLASSES[name])
-    made.__dict__["this"] = pointer
+    _pointers.attach(made, pointer)
     return made
 
 

@@ -13,7 +13,7 @@ class Pointer(_records._Pointing):
 
     def __init__(self, address: int, spelling: str, owner: object) -> None:
         pointer = _pointers.pointer_object(address, spelling)
-        _records.attach(self, pointer)
+        _pointers.attach(self, pointer)
         self.__dict__["_owner"] = owner
 
     def __repr__(self) -> str:
@@ -40,7 +40,7 @@ class Cell(_records._Pointing):
     ) -> None:
         if not isinstance(type, str):
             raise TypeError(f"a cell's type is a str, not {type.__class__.__name__}")
-        if "this" in self.__dict__:
+        if hasattr(self, "this"):
             raise TypeError("this Cell has its memory already")
         held = self.__dict__
         held["_type"] = type.strip()
@@ -63,7 +63,7 @@ class Cell(_records._Pointing):
         held["_end"] = address + len(bytes(self._memory))
         held["_pointer"] = Pointer(address, spelling, self)
         # The runtime then takes a cell for its pointer.
-        held["this"] = self.pointer.this
+        _pointers.attach(self, self.pointer.this)
         for index, one in enumerate(values):
             if one is not None:
                 self[index] = one
@@ -289,7 +289,7 @@ class Callback(_records._Pointing):
     def __init__(self, function: Callable[[Any, Any], Any]) -> None:
         if not callable(function):
             raise TypeError(f"a callback is a function, not {type(function).__name__}")
-        if "this" in self.__dict__:
+        if hasattr(self, "this"):
             raise TypeError("this Callback has its function already")
         # Through here nothing of what the function raises is lost, even before its first line.
         raised: List[BaseException] = []
@@ -299,7 +299,7 @@ class Callback(_records._Pointing):
         self.__dict__.update(
             _function=function, _raised=raised, _contexts=[], _thunk=thunk, _pointer=pointer
         )
-        self.__dict__["this"] = pointer.this
+        _pointers.attach(self, pointer.this)
 
     @property
     def pointer(self) -> Pointer:
