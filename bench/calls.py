@@ -71,7 +71,7 @@ class Worker:
 
 def folders_of(peer: str, build: Path) -> List[Path]:
     """Return where the modules of a peer are."""
-    if peer == "ours":
+    if peer in ("ours", "classes"):
         return [build / "python"]
     if peer == "twin":
         return [build / "bench" / "twin"]

@@ -4,7 +4,9 @@ A figure is an expression that is timed, with everything that it names bound bef
 two forms of it. In the form of functions each peer is a module that could take the measured one's
 place: the same names, arguments and results, compiled where the peer compiles. In its own form a
 peer is used as its documentation has it: attributes and methods of classes, compiled functions
-called directly, texts encoded and decoded where it takes bytes.
+called directly, texts encoded and decoded where it takes bytes. The classes of libvswitch stand
+beside those of a peer in a third table, in a process without the flat module's figures: once they
+are loaded, the flat functions answer instances of them.
 """
 
 import importlib
@@ -353,10 +355,11 @@ Builder = Callable[[Any], Dict[str, Figure]]
 
 @dataclass(frozen=True)
 class Peer:
-    """A binding of the measured calls: its module of functions, and its own form if it has one."""
+    """A binding of the measured calls: its module of functions, if any, and its own form if it has
+    one."""
 
     title: str
-    functions: str
+    functions: Optional[str]
     build: Builder = flat
     own: Optional[str] = None
     build_own: Optional[Builder] = None
@@ -372,19 +375,25 @@ PEERS: Dict[str, Peer] = {
     "cffi": Peer("cffi", "cffi_functions", flat, "cffi_peer", cffi_api),
     "ctypes": Peer("ctypes", "ctypes_functions", flat, "ctypes_peer", ctypes_declared),
     "cython": Peer("Cython", "cython_peer", flat, "cython_peer", classes),
+    "classes": Peer("libvswitch", None, flat, "libvswitch", classes),
 }
 
 FORMS: Dict[str, List[str]] = {
-    "functions": list(PEERS),
-    "own": [key for key, peer in PEERS.items() if peer.own],
+    "functions": [key for key, peer in PEERS.items() if peer.functions],
+    "own": [key for key, peer in PEERS.items() if peer.functions and peer.own],
+    "classes": ["classes", "pybind11"],
 }
 """The peers of each form."""
+
+MEASURED = {"functions": "ours", "own": "ours", "classes": "classes"}
+"""What the peers of each form are compared with."""
 
 
 def figures_of(key: str, form: str) -> Dict[str, Figure]:
     """The figures of a peer in one form; the host's libraries must be there."""
     peer = PEERS[key]
     if form == "functions":
+        assert peer.functions is not None
         return peer.build(importlib.import_module(peer.functions))
     assert peer.own is not None and peer.build_own is not None
     return peer.build_own(importlib.import_module(peer.own))

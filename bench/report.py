@@ -23,6 +23,7 @@ def table(
     medians: Medians,
     ratios: Ratios,
     targets: Ratios,
+    ours: str = "ours",
 ) -> Iterator[str]:
     """The lines of a table: for each figure our value, and its ratio to that of each peer."""
     measured = {peer for row in ratios.values() for peer in row}
@@ -36,7 +37,7 @@ def table(
             f"{_cell(ratios[figure].get(peer), targets.get(figure, {}).get(peer)):>13}"
             for peer in peers
         )
-        yield f"{titles[figure]:{width}}  {_number(row['ours']):>9}  {cells}"
+        yield f"{titles[figure]:{width}}  {_number(row[ours]):>9}  {cells}"
 
 
 def _number(value: float) -> str:
@@ -80,7 +81,7 @@ def _dots(y: int, forms: Medians, across: Callable[[float], float]) -> Iterator[
             x = across(row[peer])
             if form == "functions":
                 yield f'<circle cx="{x:.1f}" cy="{y}" r="5" fill="{colour}" fill-opacity="0.85"/>'
-            elif peer != "ours":
+            elif form == "own" and peer != "ours":
                 yield (
                     f'<circle cx="{x:.1f}" cy="{y}" r="5" fill="none" stroke="{colour}"'
                     ' stroke-width="2"/>'

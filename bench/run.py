@@ -21,7 +21,7 @@ import calls
 import modules
 import report
 import targets
-from figures import EXPECTED, FIGURES, FORMS, PEERS
+from figures import EXPECTED, FIGURES, FORMS, MEASURED, PEERS
 
 
 class Progress:
@@ -86,24 +86,27 @@ def middle_of(rows: Mapping[str, Mapping[str, List[float]]]) -> Dict[str, Dict[s
     }
 
 
-def ratios_to(rows: Mapping[str, Mapping[str, List[float]]]) -> Dict[str, Dict[str, float]]:
+def ratios_to(
+    rows: Mapping[str, Mapping[str, List[float]]], measured: str = "ours"
+) -> Dict[str, Dict[str, float]]:
     """Our value to that of each peer: the median of the ratios of what stood side by side."""
     return {
         figure: {
-            peer: statistics.median(map(operator.truediv, row["ours"], values))
+            peer: statistics.median(map(operator.truediv, row[measured], values))
             for peer, values in row.items()
-            if peer != "ours"
+            if peer != measured
         }
         for figure, row in rows.items()
     }
 
 
 def verdicts(
-    ratios: Mapping[str, Mapping[str, float]], goals: Mapping[str, Mapping[str, float]]
+    table: str, ratios: Mapping[str, Mapping[str, float]], goals: Mapping[str, Mapping[str, float]]
 ) -> List[Dict[str, Any]]:
     """How each target fares."""
     return [
         {
+            "table": table,
             "figure": figure,
             "peer": peer,
             "ratio": ratios[figure][peer],
@@ -124,6 +127,13 @@ def machine() -> Dict[str, str]:
         "system": platform.platform(),
         "python": platform.python_version(),
     }
+
+
+TABLES = {
+    "functions": "As functions",
+    "own": "In the peer's own form",
+    "classes": "Classes",
+}
 
 
 def main() -> None:
@@ -149,18 +159,20 @@ def main() -> None:
     progress = Progress()
     times = calls.measure(build, core, **settings, progress=progress)
     middle = {form: middle_of(rows) for form, rows in times.items()}
-    ratios = {form: ratios_to(rows) for form, rows in times.items()}
-    judged = verdicts(ratios["functions"], targets.CALLS)
+    ratios = {form: ratios_to(rows, MEASURED[form]) for form, rows in times.items()}
+    judged = verdicts("functions", ratios["functions"], targets.CALLS)
+    judged += verdicts("classes", ratios["classes"], targets.CLASSES)
     whole: modules.Values = {}
     if not arguments.quick:
         whole = modules.measure(build, processes=21, compilations=5, progress=progress)
-        judged += verdicts(ratios_to(whole), targets.MODULES)
+        judged += verdicts("modules", ratios_to(whole), targets.MODULES)
     progress.clear()
 
     print("\n".join(report.legend()), end="\n\n")
-    for form, title in (("functions", "As functions"), ("own", "In the peer's own form")):
-        goals = targets.CALLS if form == "functions" else {}
-        lines = report.table(title, "ns", FIGURES, middle[form], ratios[form], goals)
+    for form, title in TABLES.items():
+        goals = {"functions": targets.CALLS, "classes": targets.CLASSES}.get(form, {})
+        ours = MEASURED[form]
+        lines = report.table(title, "ns", FIGURES, middle[form], ratios[form], goals, ours)
         print("\n".join(lines), end="\n\n")
     if whole:
         titles, goals = modules.TITLES, targets.MODULES

@@ -64,6 +64,13 @@ CALLS: Dict[str, Dict[str, float]] = {
 }
 """For each figure and peer, in the form of functions."""
 
+CLASSES: Dict[str, Dict[str, float]] = {
+    "read": {"pybind11": 0.30},
+    "write": {"pybind11": 0.35},
+    "lifetime": {"pybind11": 0.55},
+}
+"""For each figure and peer, of classes."""
+
 MODULES: Dict[str, Dict[str, float]] = {
     "import": {"handwritten": 1.4, "ctypes": 0.25},
     "memory": {"handwritten": 1.6},

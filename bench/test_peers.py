@@ -152,8 +152,14 @@ def test_every_figure_of_every_peer_is_measured(quick: Dict[str, Any]) -> None:
 
 
 def test_every_target_is_judged(quick: Dict[str, Any]) -> None:
-    judged = {(verdict["figure"], verdict["peer"]) for verdict in quick["targets"]}
-    assert judged == {(row, peer) for row, peers in targets.CALLS.items() for peer in peers}
+    judged = {(one["table"], one["figure"], one["peer"]) for one in quick["targets"]}
+    goals = {"functions": targets.CALLS, "classes": targets.CLASSES}
+    assert judged == {
+        (table, row, peer)
+        for table, rows in goals.items()
+        for row, peers in rows.items()
+        for peer in peers
+    }
     assert f"of {len(judged)} targets met" in quick["table"]
 
 
