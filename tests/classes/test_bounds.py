@@ -34,7 +34,9 @@ def test_a_view_of_an_item_is_read_as_it_was(switch: str, switch_id: str) -> Non
 
 def test_what_has_no_known_length_is_not_read(switch: str) -> None:
     handle: Any = Cell("DVSwitchHandle", vs.Pointer(int(vs.VSInfo()), "void *", None))
-    with pytest.raises(ValueError, match="^nothing tells how many bytes .* this DVSwitchHandle$"):
+    with pytest.raises(
+        ValueError, match="^nothing tells how many bytes this DVSwitchHandle points to$"
+    ):
         handle.read(1)
 
 
