@@ -13,7 +13,7 @@ SET = "VSDVS_SetPortVLANPolicy('vswitch0', 'web-1')"
 
 # Runs the tool while another hand sets the port's VLAN to 99 before each read-back.
 MEDDLE = """
-import runpy, sys
+import os, runpy, sys
 import libvswitch as vs
 
 read, reads = vs.VSDVS_GetPortVLANPolicy, 0
@@ -27,6 +27,7 @@ def meddle(switch, port):
 
 vs.VSDVS_GetPortVLANPolicy = meddle
 sys.argv = {words!r}
+sys.path.insert(0, os.path.dirname(sys.argv[0]))
 runpy.run_path(sys.argv[0], run_name="__main__")
 """
 
