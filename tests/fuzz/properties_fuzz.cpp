@@ -52,11 +52,11 @@ void set_and_get(Input &input, Transaction &transaction) {
   };
   auto const value = consume_value(input);
   if (set(value)) {
-    auto const found = simhost::get_property(transaction, owner, key);
+    auto const found = simhost::find_property(transaction, owner, key);
     require(found.has_value(), "what is set is there");
     require(!is_kept_as_bytes(key) || found->value == value, "what is set is read byte for byte");
     require(set(found->value), "what is read can be set");
-    require(simhost::get_property(transaction, owner, key)->value == found->value,
+    require(simhost::find_property(transaction, owner, key)->value == found->value,
             "what was read and is set is read byte for byte");
   }
   if (input.ConsumeBool()) {

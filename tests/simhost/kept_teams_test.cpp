@@ -153,9 +153,9 @@ class Changes {
 
   static bool announces(Transaction &transaction, PropertyOwner const &switch_owner,
                         PropertyOwner const &port) {
-    auto property = simhost::get_property(transaction, port, VSPROP_PORT_TEAMING_POLICY);
+    auto property = simhost::find_property(transaction, port, VSPROP_PORT_TEAMING_POLICY);
     if (!property) {
-      property = simhost::get_property(transaction, switch_owner, VSPROP_SWITCH_TEAMING);
+      property = simhost::find_property(transaction, switch_owner, VSPROP_SWITCH_TEAMING);
     }
     // Out of the box, moves are announced.
     return !property || (simhost::record_of<VSTeamPolicy>(property->value).flags &

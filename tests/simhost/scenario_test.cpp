@@ -249,7 +249,7 @@ TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
         simhost::get_port(transaction, simhost::get_switch(transaction, "s").key, "p"));
   };
   auto const property = [&](char const *key) {
-    return simhost::get_property(transaction, owner_of_p(), key).value();
+    return simhost::find_property(transaction, owner_of_p(), key).value();
   };
   auto table = property(VSPROP_PORT_MIRROR_SESSIONS).value;
   // Padding, for which documents have no word.

@@ -48,7 +48,7 @@ void get(ReadingCall &call, Target const &target, char const *key, void **data, 
   auto const name = require_text(key);
   auto const output = simhost::output_at(data, length);
   auto &transaction = call.transaction();
-  auto const property = simhost::get_property(transaction, owner_of(transaction, target), name);
+  auto const property = simhost::find_property(transaction, owner_of(transaction, target), name);
   if (!property) {
     simhost::refuse(QEX_NOT_FOUND);
   }

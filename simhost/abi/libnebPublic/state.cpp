@@ -83,7 +83,7 @@ QEX_ReturnStatus look_up(char const *name, char const *switch_id, char const *ke
     auto &output = simhost::require(item);
     auto &transaction = call.transaction();
     auto const owner = owner_of(simhost::get_target(transaction, target));
-    auto property = simhost::get_property(transaction, owner, wanted);
+    auto property = simhost::find_property(transaction, owner, wanted);
     if (!property) {
       simhost::refuse(QEX_NOT_FOUND);
     }

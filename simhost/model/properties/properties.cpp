@@ -90,7 +90,7 @@ void set_property(storage::Transaction &transaction, storage::PropertyOwner cons
   set_property(transaction, owner, key, value, known->type);
 }
 
-std::optional<storage::Property> get_property(storage::Transaction &transaction,
+std::optional<storage::Property> find_property(storage::Transaction &transaction,
                                               storage::PropertyOwner const &owner,
                                               std::string_view key) {
   auto const *const known = find_meant(owner, key);

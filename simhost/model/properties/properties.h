@@ -28,7 +28,7 @@ SIMHOST_API void set_property(storage::Transaction &transaction,
                               BytesView value);
 
 /// The property as callers read it; nothing if it is not set.
-SIMHOST_API std::optional<storage::Property> get_property(storage::Transaction &transaction,
+SIMHOST_API std::optional<storage::Property> find_property(storage::Transaction &transaction,
                                                           storage::PropertyOwner const &owner,
                                                           std::string_view key);
 /// All of them, in the order of their names.
