@@ -91,8 +91,8 @@ void set_property(storage::Transaction &transaction, storage::PropertyOwner cons
 }
 
 std::optional<storage::Property> find_property(storage::Transaction &transaction,
-                                              storage::PropertyOwner const &owner,
-                                              std::string_view key) {
+                                               storage::PropertyOwner const &owner,
+                                               std::string_view key) {
   auto const *const known = find_meant(owner, key);
   if (known != nullptr && known->is_computed()) {
     return computed(transaction, owner, *known);

@@ -29,8 +29,8 @@ SIMHOST_API void set_property(storage::Transaction &transaction,
 
 /// The property as callers read it; nothing if it is not set.
 SIMHOST_API std::optional<storage::Property> find_property(storage::Transaction &transaction,
-                                                          storage::PropertyOwner const &owner,
-                                                          std::string_view key);
+                                                           storage::PropertyOwner const &owner,
+                                                           std::string_view key);
 /// All of them, in the order of their names.
 SIMHOST_API std::vector<storage::NamedProperty> list_properties(
     storage::Transaction &transaction, storage::PropertyOwner const &owner);

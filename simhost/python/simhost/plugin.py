@@ -88,16 +88,17 @@ def _refuse_shared_state() -> None:
     """The library has fixed its file when it was first used; the environment may say another."""
     try:
         file = LoadedControl().state_file()
-    except NotSimulated as error:
-        pytest.fail(str(error), pytrace=False)
-    except HostRefused as error:
-        pytest.fail(f"the host of this process cannot be used: {error}", pytrace=False)
-    if file is not None:
-        pytest.fail(
+        if file is None:
+            return
+        why = (
             f"the host of this process is kept in {file}, which the test would make anew:"
-            " SIMHOST_STATE named it when the host was first used, before this test.",
-            pytrace=False,
+            " SIMHOST_STATE named it when the host was first used, before this test."
         )
+    except NotSimulated as error:
+        why = str(error)
+    except HostRefused as error:
+        why = f"the host of this process cannot be used: {error}"
+    pytest.fail(why, pytrace=False)
 
 
 @pytest.fixture
