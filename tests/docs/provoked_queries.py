@@ -31,8 +31,10 @@ def address(text: bytes, kind: int = vs.VS_MAC_ADDR_TYPE_STATIC, vid: int = 0) -
 def options(kind: int, value: Any) -> Any:
     listed = vs.VSRuntimeOptions(256)
     first = listed.get_first_option()
-    add = listed.add_int_option if isinstance(value, int) else listed.add_str_option
-    following = add(first, "", kind, value)
+    if isinstance(value, int):
+        following = listed.add_int_option(first, "", kind, value)
+    else:
+        following = listed.add_str_option(first, "", kind, value)
     assert following is not None
     listed.set_options_length(int(following) - int(first))
     return listed

@@ -3,6 +3,8 @@
 
     state_files.py [--seconds N | --mutations N] [--seed N]
 
+Prints what is wrong and, last, how many states it tried.
+
 A damaged state is described and called on, in a process of its own, by a call of each family. All
 of them have to end in a result, a status or an OSError that names the file. What is not tried: a
 fault that waits, which is right to; and files that change while they are read.
@@ -374,9 +376,9 @@ def main() -> int:
     parser.add_argument("--seed", type=int, default=random.randrange(1, 2**31))
     parser.add_argument("--most", type=int, default=3, help="stop after so many findings")
     given = parser.parse_args()
-    print(f"seed {given.seed}", flush=True)
+    print(f"seed {given.seed}", file=sys.stderr)
     done = run(given.seed, given.mutations, given.seconds, most=given.most)
-    print(f"{done.inputs:,} states", *done.wrong, sep="\n")
+    print(*done.wrong, done.inputs, sep="\n")
     return 1 if done.wrong else 0
 
 
