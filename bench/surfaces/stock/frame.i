@@ -34,7 +34,6 @@
 
 %define %array_argument(PARAMETER...)
 %enddef
-#define %bad_argument(kind, type) %argument_fail(SWIG_TypeError, type, $symname, $argnum)
 
 // Results.
 
@@ -66,4 +65,8 @@
 }
 %enddef
 %define %untrapped(NAME)
+%enddef
+%define %overloaded(NAME)
+%enddef
+%define %called_by_tuple(NAME)
 %enddef

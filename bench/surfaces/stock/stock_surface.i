@@ -4,6 +4,7 @@
 %module stock_surface
 
 %include "frame.i"
+%include "calls/facts.i"
 
 %include "records/types.i"
 %include "records/kernel.i"
