@@ -5,7 +5,9 @@
 
 #include "helpers/mirror.h"
 #include "model/lookup.h"
+#include "model/mirror/properties.h"
 #include "model/mirror/sessions.h"
+#include "model/properties/properties.h"
 #include "tests/fuzz/harness.h"
 #include "tests/fuzz/host.h"
 
@@ -93,18 +95,19 @@ void offer(Table const &table) {
   auto const key = simhost::get_switch(transaction, "s").key;
   auto const port = simhost::get_port(transaction, key, "p1");
   auto const taken = is_accepted([&] {
-    simhost::append_mirror_sessions(transaction, port, simhost::mirror_table_bytes(*table));
+    simhost::mirror::append_sessions(transaction, port, simhost::mirror::table_bytes(*table));
   });
   require(!taken || table->numSessions == 0 || !is_accepted([&] {
-    simhost::append_mirror_sessions(transaction, port, bytes_of(table));
+    simhost::mirror::append_sessions(transaction, port, bytes_of(table));
   }),
           "a session is not added twice");
-  auto const kept = Block::of(simhost::mirror_sessions_of(transaction, port));
+  auto const kept = Block::of(
+      simhost::effective_bytes(transaction, simhost::mirror::sessions, simhost::owner_of(port)));
   require(!taken || kept.as<DVMirrorSessionTable>()->numSessions == table->numSessions,
           "the host keeps the sessions that it takes");
   for (qex_uint32 index = 0; taken && index < table->numSessions; ++index) {
-    simhost::remove_mirror_session(transaction, port,
-                                   mirror_session_at(table.get(), static_cast<int>(index))->sid);
+    simhost::mirror::remove_session(transaction, port,
+                                    mirror_session_at(table.get(), static_cast<int>(index))->sid);
   }
 }
 

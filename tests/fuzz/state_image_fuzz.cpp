@@ -148,18 +148,17 @@ void load_into_port(Bytes const &image) {
 
 /// Lists are only written; what was put in must be there to be read.
 void write_list(Input &input) {
-  auto *const list = simhost::DataList::make(nullptr, nullptr);
+  auto list = simhost::make_list_of_host();
   std::vector<std::pair<std::string, Bytes>> items;
   while (input.remaining_bytes() > 0) {
     auto const name = consume_key(input);
     auto const value = consume_value(input);
-    if (is_accepted([&] { list->update(name, value, simhost::storage::PropertyType::runtime); })) {
-      std::erase_if(items, [&](auto const &item) { return item.first == name; });
-      items.emplace_back(name, value);
-    }
+    simhost::add_item(*list, name, value, simhost::storage::PropertyType::runtime);
+    std::erase_if(items, [&](auto const &item) { return item.first == name; });
+    items.emplace_back(name, value);
   }
   auto const block = list->serialized(200);
-  simhost::DataList::destroy(list);
+  list.reset();
   simhost::Reader reader(block);
   require(reader.number() == items.size(), "a list has the items that it was given");
   for (std::size_t index = 0; index < items.size(); ++index) {
