@@ -19,7 +19,7 @@ import time
 from pathlib import Path
 from typing import Any, Callable, Dict, List
 
-from host_report import Curves, picture, tables
+from host_report import Curves, picture, tables, verdicts
 
 SIZES = [10, 100, 1_000, 10_000]
 PLACES = ("memory", "a file")
@@ -164,7 +164,7 @@ def main() -> None:
         for size in SIZES:
             for name, value in measured_apart(build, place, size, given.quick).items():
                 curves.setdefault(place, {}).setdefault(name, {})[size] = value
-    print("\n".join(tables(curves)))
+    print("\n".join([*tables(curves), "", *verdicts(curves)]))
     folder = build / "bench"
     folder.mkdir(exist_ok=True)
     (folder / "host.json").write_text(json.dumps(curves, indent=2) + "\n", encoding="utf-8")

@@ -4,6 +4,8 @@ import math
 from typing import Dict, Iterator, List, Tuple
 from xml.sax.saxutils import escape
 
+from targets import HOST, met
+
 Curves = Dict[str, Dict[str, Dict[int, float]]]
 """For each place of the state, figure, and number of ports: microseconds of one call."""
 
@@ -37,6 +39,24 @@ def tables(curves: Curves) -> Iterator[str]:
         for name, curve in figures.items():
             cells = "".join(f"{_number(curve[size]):>12}" for size in sizes)
             yield f"{name:{width}}  {1e6 / curve[sizes[-1]]:>10,.0f}  {cells}"
+
+
+def verdicts(curves: Curves) -> Iterator[str]:
+    """How each target fares in each place."""
+    for place, figures in curves.items():
+        link, uplink = figures["change a link"], figures["ask for a port's uplink"]
+        least, most = min(link), max(link)
+        ratios = {
+            "change a link": (link[most] / link[least], f"{most:,} ports to {least:,}"),
+            "ask for a port's uplink": (
+                uplink[most] / figures["look up a port"][most],
+                "to a look-up of the port",
+            ),
+        }
+        for name, target in HOST.items():
+            ratio, compared = ratios[name]
+            verdict = "met" if met(ratio, target) else "missed"
+            yield f"state in {place}: {name}, {compared}: {ratio:.2f}, at most {target}: {verdict}"
 
 
 def _number(value: float) -> str:

@@ -80,6 +80,9 @@ MODULES: Dict[str, Dict[str, float]] = {
 }
 """For what is measured of whole modules."""
 
+HOST: Dict[str, float] = {"change a link": 4.0, "ask for a port's uplink": 1.5}
+"""For a figure of the simulated host: to the same with ten ports, and to a look-up of the port."""
+
 
 def met(ratio: float, target: float) -> bool:
     """Whether a ratio reaches its target, noise allowed for."""

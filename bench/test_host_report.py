@@ -1,8 +1,9 @@
 """The curves of the simulated host as text and as a picture."""
 
+from typing import List
 from xml.etree import ElementTree
 
-from host_report import Curves, picture, tables
+from host_report import Curves, picture, tables, verdicts
 
 CURVES: Curves = {
     "memory": {"look up": {10: 2.0, 1_000: 4.0}, "change": {10: 20.0, 1_000: 2_500.0}},
@@ -27,3 +28,18 @@ def test_the_picture_has_a_line_for_each_figure_and_place() -> None:
         assert 0 <= min(xs) < max(xs) <= 900
         assert 420 >= max(ys) > min(ys) >= 0, "what takes longer is higher up"
         assert ys[0] > ys[-1]
+
+
+def test_a_target_is_missed_by_more_than_noise() -> None:
+    steady = {10: 10.0, 10_000: 10.0}
+
+    def said(**others: float) -> List[str]:
+        figures = {"look up a port": steady, "change a link": steady}
+        figures["ask for a port's uplink"] = {10: 1.0, 10_000: others.get("uplink", 10.0)}
+        figures["change a link"] = {10: 10.0, 10_000: others.get("link", 10.0)}
+        return [line.rpartition(" ")[2] for line in verdicts({"memory": figures})]
+
+    assert said() == ["met", "met"]
+    assert said(link=40 * 1.04, uplink=15 * 1.04) == ["met", "met"]
+    assert said(link=40 * 1.06) == ["missed", "met"]
+    assert said(uplink=15 * 1.06) == ["met", "missed"]
