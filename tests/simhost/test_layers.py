@@ -10,7 +10,7 @@ from typing import Dict, List
 
 import pytest
 
-ROOT = Path(__file__).resolve().parents[3]
+ROOT = Path(__file__).resolve().parents[2]
 BUILD = Path(os.environ.get("BUILD_DIR", ROOT / "build"))
 
 # A header of each layer, lowest first.
