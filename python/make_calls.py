@@ -81,6 +81,8 @@ class _Writer:
             found = [f"_checks.cell({where}, {one.name}, {_POINTER})"]
         elif one.name == "handle" and self._is_walk():
             found = [f"_checks.walked({where}, {one.name})"]
+        elif one.name == "callback":
+            found = [f"_checks.function({where}, {one.name})"]
         return found
 
     def _room(self, one: Argument) -> str:

@@ -57,7 +57,8 @@ class PythonTypes:
         if not type_.layers and type_.name in self.known.records:
             return self.pointer(Type(("p",), type_.name))
         found = self.value(type_)
-        return found if one.is_required else self._or_none(type_, found)
+        is_required = one.is_required or (type_ == CALLBACK and self.prefix)
+        return found if is_required else self._or_none(type_, found)
 
     def arguments(self, function: Function) -> List[Tuple[str, str]]:
         """Names and types; where elements are counted or picked, an array is one."""

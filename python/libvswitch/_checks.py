@@ -59,6 +59,12 @@ def cell(where: str, given: Any, size: int) -> None:
         raise ValueError(f"{where} has no element for the call to fill")
 
 
+def function(where: str, given: Any) -> None:
+    """A function, or a pointer to one. Without any, a walk would visit nothing and say nothing."""
+    if given is None:
+        raise TypeError(f"{where} is a function, not None")
+
+
 def walked(where: str, given: Any) -> None:
     if given is None:
         raise ValueError(

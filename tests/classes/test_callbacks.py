@@ -127,3 +127,26 @@ def test_a_walk_over_what_is_not_there_says_so(call: str) -> None:
     nothing = vs.DVSState_SwitchFindByAlias("no such switch")
     with pytest.raises(ValueError, match=f"^{call}: handle is None, .*nothing to walk over$"):
         getattr(vs, call)(nothing, lambda item, context: None, None)
+
+
+@pytest.mark.parametrize(
+    "call",
+    [
+        "DVSState_SwitchForEach",
+        "DVSState_PortForEach",
+        "DVSState_GlobalPropForEach",
+        "DVSState_HostPropForEach",
+        "DVSState_PortDataForEach",
+    ],
+)
+def test_a_walk_without_a_function_says_so(call: str, many: Any) -> None:
+    walked = [] if call == "DVSState_SwitchForEach" else [many]
+    with pytest.raises(TypeError, match=f"^{call}: callback is a function, not None$"):
+        getattr(vs, call)(*walked, None, None)
+
+
+def test_a_pointer_to_a_function_is_one(many: Any) -> None:
+    seen: List[Any] = []
+    callback = vs.Callback(lambda port, context: seen.append(vs.DVS_PortId(port)))
+    vs.DVSState_PortForEach(many, callback.pointer, None)
+    assert {f"port-{number}" for number in range(40)} <= set(seen)

@@ -121,6 +121,7 @@ WRONG = [
     'vs.VSInfo().mtu = "9000"',
     'x: str = vs.VSQEX_GetVSInfo("a", vs.VSInfo())',
     'vs.Cell("nothing")',
+    "vs.DVSState_SwitchForEach(None, None)",
     "for entry in vs.VSMACEntry(): pass",
     "flat.VSInfo_mtu_get(flat.new_VSStats())",
     "flat.VSInfo_mtu_get(None)",
