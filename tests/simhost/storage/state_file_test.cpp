@@ -4,16 +4,14 @@
 #include <SQLiteCpp/Database.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sqlite3.h>
 #include <sys/stat.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <filesystem>
 #include <fstream>
 #include <string>
 
 #include "schema_3.h"
+#include "state_files.h"
 #include "storage/query.h"
 #include "storage/running/clock.h"
 #include "storage/running/generations.h"
@@ -28,101 +26,17 @@ namespace {
 using simhost::storage::Access;
 using simhost::storage::StateFile;
 using simhost::storage::Store;
-using simhost::storage::Switch;
-using simhost::storage::SwitchName;
 using simhost::storage::Transaction;
-using simhost::storage::UnusableState;
 using testing::HasSubstr;
-
-constexpr uid_t kSomebody = 12345;
-
-void populate_nothing(Transaction &) {}
-
-// What `work` says is wrong with a state; empty if nothing is.
-template <typename Work>
-std::string refusal_by(Work const &work) {
-  try {
-    work();
-    return "";
-  } catch (UnusableState const &error) {
-    return error.what();
-  }
-}
-
-std::string refusal_of(StateFile const &file) {
-  return refusal_by([&] { Store const store(file, populate_nothing); });
-}
-
-std::string refused(std::filesystem::path const &file, std::string const &why) {
-  return "the state file " + file.string() + " cannot be used: " + why;
-}
 
 std::string content(std::filesystem::path const &file) {
   std::ifstream stream(file, std::ios::binary);
   return {std::istreambuf_iterator<char>(stream), {}};
 }
 
-void write(std::filesystem::path const &file, std::string const &text) {
-  std::ofstream(file, std::ios::binary) << text;
-}
-
-void add(Store &store, std::string const &name) {
-  Transaction transaction(store, Access::write);
-  simhost::storage::add_switch(transaction, {.alias = name,
-                                             .identifier = name,
-                                             .portset = name,
-                                             .max_ports = 1,
-                                             .version = 1,
-                                             .persistent = true});
-  transaction.commit();
-}
-
-bool has(Store &store, std::string const &name) {
-  Transaction transaction(store, Access::read);
-  return simhost::storage::find_switch(transaction, SwitchName::alias, name).has_value();
-}
-
-/// A state with the switch "a", closed.
-std::filesystem::path made(TemporaryFolder const &folder) {
-  auto file = folder.file("host.db");
-  Store store(file, populate_nothing);
-  add(store, "a");
-  return file;
-}
-
 void execute(std::filesystem::path const &file, std::string const &sql) {
   SQLite::Database(file.string(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(sql);
 }
-
-std::string of_somebody(uid_t us) {
-  return "belongs to the user 12345, and this program runs as the user " + std::to_string(us) +
-         ": all programs on one state run as one user";
-}
-
-/// Tests that give files away, which only root can do.
-struct StateFileAsRoot : testing::Test {
-  void SetUp() override {
-    if (geteuid() != 0) {
-      GTEST_SKIP() << "only root can make files of other users; run these as root as well";
-    }
-  }
-
-  static void give_away(std::filesystem::path const &file) {
-    ASSERT_EQ(lchown(file.c_str(), kSomebody, kSomebody), 0);
-  }
-
-  /// Whether `work` comes true in a child that is another user.
-  template <typename Work>
-  static bool true_for_somebody(Work const &work) {
-    auto const child = fork();
-    if (child == 0) {
-      _exit(setegid(kSomebody) == 0 && seteuid(kSomebody) == 0 && work() ? 0 : 1);
-    }
-    int status = 0;
-    waitpid(child, &status, 0);
-    return WIFEXITED(status) && WEXITSTATUS(status) == 0;
-  }
-};
 
 TEST(StateFile, IsMadeForItsUserAlone) {
   TemporaryFolder const folder;
@@ -152,7 +66,7 @@ TEST(StateFile, OfLessThanADatabaseIsRefused) {
   TemporaryFolder const folder;
   auto const file = folder.file("host.db");
   for (std::string const &text : {std::string("x"), std::string(511, '\0')}) {
-    write(file, text);
+    write_file(file, text);
     EXPECT_EQ(refusal_of(file), refused(file, "file is not a database"));
     EXPECT_EQ(content(file), text) << "it is left as it was";
   }
@@ -177,105 +91,13 @@ TEST(StateFile, IsNotMadeThroughALinkToNothing) {
 TEST(StateFile, WithALinkBesideItIsRefused) {
   TemporaryFolder const folder;
   auto const file = made(folder);
-  write(folder.file("precious"), "mine");
+  write_file(folder.file("precious"), "mine");
   for (auto const *name : {"host.db-wal", "host.db-shm", "host.db-journal"}) {
     std::filesystem::create_symlink("precious", folder.file(name));
     EXPECT_EQ(refusal_of(file), refused(file, std::string(name) + " beside it is no regular file"));
     std::filesystem::remove(folder.file(name));
   }
   EXPECT_EQ(content(folder.file("precious")), "mine");
-}
-
-TEST_F(StateFileAsRoot, OfAnotherUserIsRefused) {
-  TemporaryFolder const folder;
-  auto const file = made(folder);
-  give_away(file);
-  EXPECT_EQ(refusal_of(file), refused(file, "it " + of_somebody(0)));
-  EXPECT_FALSE(std::filesystem::exists(folder.file("host.db-shm")));
-}
-
-TEST_F(StateFileAsRoot, OfAnotherUserIsRefusedBehindALinkToo) {
-  TemporaryFolder const folder;
-  give_away(made(folder));
-  std::filesystem::create_symlink("host.db", folder.file("link"));
-  EXPECT_EQ(refusal_of(folder.file("link")), refused(folder.file("link"), "it " + of_somebody(0)));
-}
-
-TEST_F(StateFileAsRoot, IsNotFoundByALinkOfAnotherUser) {
-  TemporaryFolder const folder;
-  made(folder);
-  std::filesystem::create_symlink("host.db", folder.file("link"));
-  give_away(folder.file("link"));
-  EXPECT_EQ(refusal_of(folder.file("link")),
-            refused(folder.file("link"), "it is a symbolic link that " + of_somebody(0)));
-}
-
-TEST_F(StateFileAsRoot, WithAFileOfAnotherUserBesideItIsRefused) {
-  TemporaryFolder const folder;
-  auto const file = made(folder);
-  for (auto const *name : {"host.db-wal", "host.db-shm", "host.db-journal"}) {
-    write(folder.file(name), "");
-    give_away(folder.file(name));
-    EXPECT_EQ(refusal_of(file), refused(file, std::string(name) + " beside it " + of_somebody(0)));
-    std::filesystem::remove(folder.file(name));
-  }
-}
-
-TEST_F(StateFileAsRoot, OfRootMayBeLookedAtAndNotChanged) {
-  TemporaryFolder const folder;
-  auto const file = made(folder);
-  std::filesystem::permissions(file.parent_path(), std::filesystem::perms::all);
-  std::filesystem::permissions(file, std::filesystem::perms(0666));
-  EXPECT_TRUE(true_for_somebody([&] {
-    Store store(file, populate_nothing);
-    try {
-      add(store, "b");
-      return false;
-    } catch (simhost::storage::StateFailure const &failure) {
-      return failure.kind() == simhost::storage::FailureKind::read_only &&
-             failure.what() == "the state file " + file.string() + " cannot be written" &&
-             has(store, "a");
-    }
-  }));
-  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(file.parent_path()), {}), 1)
-      << "who looks leaves nothing beside it";
-}
-
-TEST_F(StateFileAsRoot, OfRootIsNotLookedAtWhileItIsInUse) {
-  TemporaryFolder const folder;
-  auto const file = made(folder);
-  std::filesystem::permissions(file.parent_path(), std::filesystem::perms::all);
-  std::filesystem::permissions(file, std::filesystem::perms(0666));
-  Store const user(file, populate_nothing);
-  EXPECT_TRUE(true_for_somebody([&] {
-    return refusal_of(file) == refused(file,
-                                       "host.db-wal beside it holds changes, and this program may "
-                                       "only look at the state");
-  }));
-}
-
-TEST_F(StateFileAsRoot, InAFolderThatCannotBeWrittenMayBeLookedAt) {
-  TemporaryFolder const folder;
-  auto const file = made(folder);
-  give_away(file);
-  std::filesystem::permissions(file.parent_path(), std::filesystem::perms(0755));
-  EXPECT_TRUE(true_for_somebody([&] {
-    Store store(file, populate_nothing);
-    return has(store, "a");
-  }));
-}
-
-TEST_F(StateFileAsRoot, ThatIsOnlyLookedAtIsToBeOpenedAgainWhenItChanges) {
-  TemporaryFolder const folder;
-  auto const file = made(folder);
-  give_away(file);
-  std::filesystem::permissions(file.parent_path(), std::filesystem::perms(0755));
-  EXPECT_TRUE(true_for_somebody([&] {
-    Store const store(file, populate_nothing);
-    bool const before = store.is_current();
-    std::filesystem::last_write_time(file, std::filesystem::file_time_type::clock::now());
-    return before && !store.is_current();
-  }));
 }
 
 TEST(StateFile, ThatWasRemovedIsToldOfAndNotMadeAgain) {
@@ -323,7 +145,7 @@ TEST(StateFile, ThatWasEmptiedIsToldOf) {
   TemporaryFolder const folder;
   auto const file = made(folder);
   Store store(file, populate_nothing);
-  write(file, "");
+  write_file(file, "");
   EXPECT_EQ(refusal_by([&] { has(store, "a"); }),
             refused(file, "it was emptied after this program had opened it"));
 }
@@ -462,7 +284,7 @@ TEST(StateFile, ThatIsDamagedIsNamed) {
   for (std::size_t page = 1; page * 4096 < bytes.size(); ++page) {
     bytes.replace(page * 4096, 8, 8, '\xFF');
   }
-  write(file, bytes);
+  write_file(file, bytes);
   EXPECT_EQ(refusal_by([&] {
               Store store(file, populate_nothing);
               has(store, "a");
