@@ -13,14 +13,7 @@
 #include "abi/targets.h"
 #include "model/properties/properties.h"
 
-using simhost::Call;
-using simhost::DataList;
-using simhost::ListMemory;
-using simhost::require;
-using simhost::require_text;
-using simhost::stateless;
-using simhost::stateless_or_trap;
-
+namespace simhost {
 namespace {
 
 // Memory that a call needs of a list's kind.
@@ -33,15 +26,14 @@ struct BlockRequest {
 // not needed, which is released: null, the block, or another one.
 template <typename Use>
 QEX_ReturnStatus with_block(char const *name, BlockRequest const &request, Use const &use) {
-  void *const block = simhost::allocate_block(request.memory, request.size);
+  void *const block = allocate_block(request.memory, request.size);
   if (block == nullptr) {
     return QEX_NO_MEMORY;
   }
   void *unused = block;
-  auto const status =
-      stateless(simhost::resumed(name), [&](Call &call) { unused = use(call, block); });
+  auto const status = stateless(resumed(name), [&](Call &call) { unused = use(call, block); });
   if (unused != nullptr) {
-    simhost::release_block(request.memory, unused);
+    release_block(request.memory, unused);
   }
   return status;
 }
@@ -56,7 +48,7 @@ QEX_ReturnStatus DVSData_Alloc(DVSDataHandle *list, DVSData_MemAlloc alloc,
   auto const status = stateless(__func__, [&](Call &) {
     require(list);
     if ((alloc == nullptr) != (release == nullptr)) {
-      simhost::refuse(QEX_BAD_PARAM);
+      refuse(QEX_BAD_PARAM);
     }
   });
   if (status != QEX_OK) {
@@ -83,12 +75,12 @@ QEX_ReturnStatus DVSData_Update(DVSDataHandle list, char const *name, void *data
                                 qex_uint32 propertyType) {
   BlockRequest request{};
   auto const status = stateless(__func__, [&](Call &call) {
-    auto const &updated = call.lists().get_list(simhost::require_handle(list));
+    auto const &updated = call.lists().get_list(require_handle(list));
     auto const item = require_text(name);
-    auto const value = simhost::argument_bytes(data, length);
-    simhost::property_type(propertyType);
+    auto const value = argument_bytes(data, length);
+    property_type(propertyType);
     if (item.empty()) {
-      simhost::refuse(QEX_BAD_PARAM);
+      refuse(QEX_BAD_PARAM);
     }
     request = {.memory = updated.memory(), .size = DataList::item_size(item, value)};
   });
@@ -97,8 +89,8 @@ QEX_ReturnStatus DVSData_Update(DVSDataHandle list, char const *name, void *data
   }
   return with_block(__func__, request, [&](Call &call, void *block) {
     auto &updated = call.lists().get_list(list);
-    auto *const replaced = updated.put(block, name, simhost::argument_bytes(data, length),
-                                       simhost::property_type(propertyType));
+    auto *const replaced =
+        updated.put(block, name, argument_bytes(data, length), property_type(propertyType));
     call.lists().changed(updated);
     return replaced;
   });
@@ -108,13 +100,13 @@ QEX_ReturnStatus DVSData_Serialize(DVSDataHandle list, void **bytes, qex_uint32 
                                    NEBVersion version) {
   BlockRequest request{};
   auto const status = stateless(__func__, [&](Call &call) {
-    auto const &serialized = call.lists().get_list(simhost::require_handle(list));
+    auto const &serialized = call.lists().get_list(require_handle(list));
     require(bytes);
     require(length);
     auto const block = serialized.serialized(version);
     request = {.memory = serialized.memory(), .size = block.size()};
     if (request.memory.is_hosts()) {
-      *bytes = simhost::allocate<void>(call, block);
+      *bytes = allocate<void>(call, block);
       *length = static_cast<qex_uint32>(block.size());
     }
   });
@@ -124,7 +116,7 @@ QEX_ReturnStatus DVSData_Serialize(DVSDataHandle list, void **bytes, qex_uint32 
   return with_block(__func__, request, [&](Call &call, void *block) {
     auto const content = call.lists().get_list(list).serialized(version);
     if (content.size() != request.size) {
-      simhost::refuse(QEX_BUSY);  // the allocator, or another thread, has changed the list
+      refuse(QEX_BUSY);  // the allocator, or another thread, has changed the list
     }
     std::copy(content.begin(), content.end(), static_cast<std::byte *>(block));
     *bytes = block;
@@ -161,3 +153,4 @@ qex_uint32 DVSData_PropType(DVSDataItem item) {
 }
 
 }  // extern "C"
+}  // namespace simhost

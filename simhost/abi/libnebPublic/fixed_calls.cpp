@@ -4,17 +4,18 @@
 #include "abi/targets.h"
 #include "nebpublic/kernel_state.h"
 
-// No switch here has commands of its own.
-using simhost::reading;
-using simhost::ReadingCall;
+namespace simhost {
 
+// No switch here has commands of its own.
 extern "C" QEX_ReturnStatus DVSQEX_CmdExec(char const *switchId, char const *command,
                                            void * /*input*/, int /*inputLength*/,
                                            void ** /*output*/, int * /*outputLength*/) {
   return reading(__func__, [&](ReadingCall &call) {
-    auto const target = simhost::switch_identified(switchId);
-    simhost::require_text(command);
-    simhost::get_target(call.transaction(), target);
-    simhost::refuse(QEX_NOT_SUPPORTED);
+    auto const target = switch_identified(switchId);
+    require_text(command);
+    get_target(call.transaction(), target);
+    refuse(QEX_NOT_SUPPORTED);
   });
 }
+
+}  // namespace simhost

@@ -9,27 +9,17 @@
 #include "storage/store.h"
 #include "vswitch/mirror.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::Extent;
-using simhost::port_of;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::switch_identified;
-
+namespace simhost {
 namespace {
 
 QEX_ReturnStatus return_port(char const *name, char const *switch_id, char const *port,
                              Extent extent, NEBVersion version, void **state, int *length) {
   return reading(name, [&](ReadingCall &call) {
     auto const target = port_of(switch_identified(switch_id), port);
-    auto const output = simhost::output_at(state, length);
+    auto const output = output_at(state, length);
     auto &transaction = call.transaction();
-    auto const image =
-        simhost::port_image(transaction, simhost::get_target(transaction, target), extent, version);
-    simhost::allocate_copy(call, output, image);
+    auto const image = port_image(transaction, get_target(transaction, target), extent, version);
+    allocate_copy(call, output, image);
   });
 }
 
@@ -41,12 +31,12 @@ QEX_ReturnStatus DVSQEX_PortAdd(char const *switchId, char const *port, void *st
                                 int stateLength) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_identified(switchId), port);
-    auto const image = simhost::argument_bytes(state, stateLength);
+    auto const image = argument_bytes(state, stateLength);
     auto &transaction = call.transaction();
-    auto const added = simhost::add_client_port(
-        transaction, simhost::get_target(transaction, target.owner), target.identifier);
+    auto const added =
+        add_client_port(transaction, get_target(transaction, target.owner), target.identifier);
     if (state != nullptr) {
-      simhost::load_port(transaction, added, image);
+      load_port(transaction, added, image);
     }
   });
 }
@@ -55,14 +45,14 @@ QEX_ReturnStatus DVSQEX_PortRemove(char const *switchId, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_identified(switchId), port);
     auto &transaction = call.transaction();
-    simhost::remove_port(transaction, simhost::get_target(transaction, target));
+    remove_port(transaction, get_target(transaction, target));
   });
 }
 
 QEX_ReturnStatus DVSQEX_PortFind(char const *switchId, char const *port) {
   return reading(__func__, [&](ReadingCall &call) {
     auto const target = port_of(switch_identified(switchId), port);
-    simhost::get_target(call.transaction(), target);
+    get_target(call.transaction(), target);
   });
 }
 
@@ -73,12 +63,11 @@ QEX_ReturnStatus DVSQEX_PortGetByExternalId(char const *switchId, char const *ex
     auto const external = require_text(externalId);
     auto &output = require(port);
     auto &transaction = call.transaction();
-    auto const found =
-        simhost::get_external_port(transaction, simhost::get_target(transaction, target), external);
+    auto const found = get_external_port(transaction, get_target(transaction, target), external);
     OpaqueDVPortData data{};
-    simhost::put_text(data.dvPortId, found.identifier);
-    simhost::put_text(data.externalId, external);
-    output = simhost::allocate<OpaqueDVPortData>(call, simhost::bytes_of(data));
+    put_text(data.dvPortId, found.identifier);
+    put_text(data.externalId, external);
+    output = allocate<OpaqueDVPortData>(call, bytes_of(data));
   });
 }
 
@@ -93,3 +82,4 @@ QEX_ReturnStatus DVSQEX_PersistentPortStateGet(char const *switchId, char const 
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -11,65 +11,54 @@
 #include "nebpublic/kernel_state.h"
 #include "storage/store.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::KeyFamily;
-using simhost::port_of;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::switch_identified;
-using simhost::storage::PropertyOwner;
-using simhost::storage::Transaction;
-
+namespace simhost {
 namespace {
 
 // The owners that are neither a whole switch nor a port by its identifier.
 struct HostPart {
-  simhost::NamedSwitch owner;
+  NamedSwitch owner;
 };
-struct UplinkPort {
-  simhost::NamedSwitch owner;
+struct NumberedUplinkPort {
+  NamedSwitch owner;
   qex_uint32 number;
 };
 
-PropertyOwner owner_of(Transaction &transaction, HostPart const &target) {
-  return PropertyOwner::host(simhost::get_target(transaction, target.owner));
+storage::PropertyOwner owner_of(storage::Transaction &transaction, HostPart const &target) {
+  return storage::PropertyOwner::host(get_target(transaction, target.owner));
 }
-PropertyOwner owner_of(Transaction &transaction, UplinkPort const &target) {
-  auto const key = simhost::get_target(transaction, target.owner);
-  return simhost::owner_of(simhost::get_uplink_port(transaction, key, target.number));
+storage::PropertyOwner owner_of(storage::Transaction &transaction,
+                                NumberedUplinkPort const &target) {
+  auto const key = get_target(transaction, target.owner);
+  return simhost::owner_of(get_uplink_port(transaction, key, target.number));
 }
-using simhost::owner_of;
 
 template <typename Target>
 void get(ReadingCall &call, Target const &target, char const *key, void **data, int *length) {
   auto const name = require_text(key);
-  auto const output = simhost::output_at(data, length);
+  auto const output = output_at(data, length);
   auto &transaction = call.transaction();
   auto const property = simhost::find_property(transaction, owner_of(transaction, target), name);
   if (!property) {
-    simhost::refuse(QEX_NOT_FOUND);
+    refuse(QEX_NOT_FOUND);
   }
-  simhost::allocate_copy(call, output, property->value);
+  allocate_copy(call, output, property->value);
 }
 
 template <typename Target>
 void set(ChangingCall &call, Target const &target, char const *key, void const *data, int length,
          qex_uint32 type) {
   auto const name = require_text(key);
-  auto const value = simhost::argument_bytes(data, length);
-  auto const get_type = simhost::property_type(type);
+  auto const value = argument_bytes(data, length);
+  auto const wanted_type = property_type(type);
   auto &transaction = call.transaction();
-  simhost::set_property(transaction, owner_of(transaction, target), name, value, get_type);
+  set_property(transaction, owner_of(transaction, target), name, value, wanted_type);
 }
 
 template <typename Target>
 void clear(ChangingCall &call, Target const &target, char const *key) {
   auto const name = require_text(key);
   auto &transaction = call.transaction();
-  simhost::clear_property(transaction, owner_of(transaction, target), name);
+  clear_property(transaction, owner_of(transaction, target), name);
 }
 
 // Which properties a list is to have.
@@ -78,12 +67,12 @@ struct Choice {
   qex_uint32 types;
 };
 
-void add_chosen(simhost::DataList &list, Transaction &transaction, PropertyOwner const &owner,
-                Choice const &choice) {
-  for (auto const &[name, property] : simhost::list_properties(transaction, owner)) {
-    if (simhost::family_of(name) == choice.family &&
+void add_chosen(DataList &list, storage::Transaction &transaction,
+                storage::PropertyOwner const &owner, Choice const &choice) {
+  for (auto const &[name, property] : list_properties(transaction, owner)) {
+    if (family_of(name) == choice.family &&
         (static_cast<qex_uint32>(property.type) & choice.types) != 0) {
-      simhost::add_item(list, name, property.value, property.type);
+      add_item(list, name, property.value, property.type);
     }
   }
 }
@@ -94,11 +83,11 @@ void make_list(ReadingCall &call, DVSDataHandle *output, Choice const &choice,
                Targets const &...targets) {
   auto &handle = require(output);
   if (choice.types == 0 || (choice.types & ~qex_uint32{ALL_PROP_TYPE}) != 0) {
-    simhost::refuse(QEX_BAD_PARAM);
+    refuse(QEX_BAD_PARAM);
   }
   auto &transaction = call.transaction();
   std::array const owners{owner_of(transaction, targets)...};
-  auto made = simhost::make_list_of_host();
+  auto made = make_list_of_host();
   for (auto const &owner : owners) {
     add_chosen(*made, transaction, owner, choice);
   }
@@ -172,14 +161,15 @@ QEX_ReturnStatus DVSQEX_PortDataClear(char const *switchId, char const *port, ch
 QEX_ReturnStatus DVSQEX_UplinkDataGet(char const *switchId, char const *key, qex_uint32 portID,
                                       void **data, int *length) {
   return reading(__func__, [&](ReadingCall &call) {
-    get(call, UplinkPort{switch_identified(switchId), portID}, key, data, length);
+    get(call, NumberedUplinkPort{switch_identified(switchId), portID}, key, data, length);
   });
 }
 
 QEX_ReturnStatus DVSQEX_UplinkDataSet(char const *switchId, char const *key, qex_uint32 portID,
                                       void *data, int length, qex_uint32 propertyType) {
   return changing(__func__, [&](ChangingCall &call) {
-    set(call, UplinkPort{switch_identified(switchId), portID}, key, data, length, propertyType);
+    set(call, NumberedUplinkPort{switch_identified(switchId), portID}, key, data, length,
+        propertyType);
   });
 }
 
@@ -223,3 +213,4 @@ QEX_ReturnStatus DVSQEX_ExtraConfigPortPropList(char const *switchId, char const
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -5,20 +5,13 @@
 #include "abi/libnebPublic/arguments.h"
 #include "model/state/images.h"
 
-using simhost::Call;
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::Extent;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::stateless_or_trap;
-
+namespace simhost {
 namespace {
 
 QEX_ReturnStatus return_state(char const *name, Extent extent, void **state, int *length) {
   return reading(name, [&](ReadingCall &call) {
-    auto const output = simhost::output_at(state, length);
-    simhost::allocate_copy(call, output, simhost::state_image(call.transaction(), extent));
+    auto const output = output_at(state, length);
+    allocate_copy(call, output, state_image(call.transaction(), extent));
   });
 }
 
@@ -28,11 +21,11 @@ extern "C" {
 
 QEX_ReturnStatus DVSQEX_StateInit(void *state, int length) {
   return changing(__func__, [&](ChangingCall &call) {
-    auto const image = simhost::argument_bytes(state, length);
+    auto const image = argument_bytes(state, length);
     if (state == nullptr) {
-      simhost::clear_state(call.transaction());
+      clear_state(call.transaction());
     } else {
-      simhost::load_state(call.transaction(), image, Extent::whole);
+      load_state(call.transaction(), image, Extent::whole);
     }
   });
 }
@@ -46,12 +39,11 @@ QEX_ReturnStatus DVSQEX_PersistentStateGet(void **state, int *length) {
 }
 
 QEX_ReturnStatus DVSQEX_StateSanitize(void) {
-  return changing(__func__,
-                  [&](ChangingCall &call) { simhost::sanitize_state(call.transaction()); });
+  return changing(__func__, [&](ChangingCall &call) { sanitize_state(call.transaction()); });
 }
 
 QEX_ReturnStatus DVSQEX_StateCleanup(void) {
-  return changing(__func__, [&](ChangingCall &call) { simhost::clear_state(call.transaction()); });
+  return changing(__func__, [&](ChangingCall &call) { clear_state(call.transaction()); });
 }
 
 void DVSQEX_DataFree(void *data) {
@@ -59,3 +51,4 @@ void DVSQEX_DataFree(void *data) {
 }
 
 }  // extern "C"
+}  // namespace simhost

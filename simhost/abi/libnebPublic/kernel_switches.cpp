@@ -9,14 +9,7 @@
 #include "nebpublic/kernel_state.h"
 #include "storage/store.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::switch_identified;
-
+namespace simhost {
 namespace {
 
 // Does `work` to the switch with an identifier.
@@ -25,12 +18,9 @@ QEX_ReturnStatus change(char const *name, char const *switch_id, Work const &wor
   return changing(name, [&](ChangingCall &call) {
     auto const target = switch_identified(switch_id);
     auto &transaction = call.transaction();
-    work(transaction, simhost::get_target(transaction, target));
+    work(transaction, get_target(transaction, target));
   });
 }
-
-using simhost::storage::SwitchKey;
-using simhost::storage::Transaction;
 
 }  // namespace
 
@@ -39,46 +29,46 @@ extern "C" {
 QEX_ReturnStatus DVSQEX_SwitchAdd(char const *switchId, char const *alias, qex_uint32 maxPorts,
                                   NEBVersion version) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::SwitchSpec const spec{.alias = require_text(alias),
-                                   .identifier = require_text(switchId),
-                                   .max_ports = maxPorts,
-                                   .persistent = true,
-                                   .version = version,
-                                   .associated = false};
+    SwitchSpec const spec{.alias = require_text(alias),
+                          .identifier = require_text(switchId),
+                          .max_ports = maxPorts,
+                          .persistent = true,
+                          .version = version,
+                          .associated = false};
     if (spec.identifier.empty()) {
-      simhost::refuse(QEX_BAD_PARAM);
+      refuse(QEX_BAD_PARAM);
     }
-    simhost::create_switch(call.transaction(), spec);
+    create_switch(call.transaction(), spec);
   });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchRemove(char const *switchId) {
-  return change(__func__, switchId, [](Transaction &transaction, SwitchKey key) {
-    simhost::destroy_switch(transaction, key);
+  return change(__func__, switchId, [](storage::Transaction &transaction, storage::SwitchKey key) {
+    destroy_switch(transaction, key);
   });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchAssociate(char const *switchId) {
-  return change(__func__, switchId, [](Transaction &transaction, SwitchKey key) {
-    simhost::change_running(transaction, key, true);
+  return change(__func__, switchId, [](storage::Transaction &transaction, storage::SwitchKey key) {
+    change_running(transaction, key, true);
   });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchDissociate(char const *switchId) {
-  return change(__func__, switchId, [](Transaction &transaction, SwitchKey key) {
-    simhost::change_running(transaction, key, false);
+  return change(__func__, switchId, [](storage::Transaction &transaction, storage::SwitchKey key) {
+    change_running(transaction, key, false);
   });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion version) {
-  return change(__func__, switchId, [&](Transaction &transaction, SwitchKey key) {
-    simhost::change_version(transaction, key, version);
+  return change(__func__, switchId, [&](storage::Transaction &transaction, storage::SwitchKey key) {
+    change_version(transaction, key, version);
   });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts) {
-  return change(__func__, switchId, [&](Transaction &transaction, SwitchKey key) {
-    simhost::change_max_ports(transaction, key, maxPorts);
+  return change(__func__, switchId, [&](storage::Transaction &transaction, storage::SwitchKey key) {
+    change_max_ports(transaction, key, maxPorts);
   });
 }
 
@@ -88,11 +78,10 @@ QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports,
     auto &output = require(ports);
     auto const number = static_cast<int>(type);
     if (number < DVSPORT_TYPE_ACTIVE || number > DVSPORT_TYPE_LOCALCACHE) {
-      simhost::refuse(QEX_BAD_PARAM);
+      refuse(QEX_BAD_PARAM);
     }
     auto &transaction = call.transaction();
-    auto const entries =
-        simhost::ports_of_type(transaction, simhost::get_target(transaction, target), type);
+    auto const entries = ports_of_type(transaction, get_target(transaction, target), type);
     auto const beyond_first = std::max<std::size_t>(entries.size(), 1) - 1;
     auto const size = sizeof(DVPortList) + (beyond_first * sizeof(DVPortData));
     auto *const list = static_cast<DVPortList *>(call.ledger().allocate(size, call.name()));
@@ -104,3 +93,4 @@ QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports,
 }
 
 }  // extern "C"
+}  // namespace simhost

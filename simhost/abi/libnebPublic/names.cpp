@@ -8,13 +8,7 @@
 #include "model/lookup.h"
 #include "model/switches/switches.h"
 
-using simhost::reading;
-using simhost::reading_or_trap;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::storage::SwitchName;
-
+namespace simhost {
 namespace {
 
 // Every name that the host accepts fits the field that the caller has for its kind.
@@ -30,7 +24,7 @@ QEX_ReturnStatus DVSAliasToSwitchId(char const *alias, char switchId[64]) {
   return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(alias);
     auto *const output = &require(switchId);
-    copy_text(simhost::identifier_of(call.transaction(), name), output);
+    copy_text(identifier_of(call.transaction(), name), output);
   });
 }
 
@@ -38,7 +32,7 @@ QEX_ReturnStatus DVSPortsetNameToAlias(char const *portsetName, char alias[128])
   return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(portsetName);
     auto *const output = &require(alias);
-    copy_text(simhost::alias_of_portset(call.transaction(), name), output);
+    copy_text(alias_of_portset(call.transaction(), name), output);
   });
 }
 
@@ -46,7 +40,7 @@ QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char *portsetBuffer) {
   return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(alias);
     auto *const output = &require(portsetBuffer);
-    copy_text(simhost::portset_of(call.transaction(), name), output);
+    copy_text(portset_of(call.transaction(), name), output);
   });
 }
 
@@ -54,8 +48,9 @@ char DVPortExist(char const *switchId, char const *port) {
   return reading_or_trap(__func__, [&](ReadingCall &call) {
     return static_cast<char>(
         switchId != nullptr && port != nullptr &&
-        simhost::find_port(call.transaction(), SwitchName::identifier, switchId, port).has_value());
+        find_port(call.transaction(), storage::SwitchName::identifier, switchId, port).has_value());
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -11,28 +11,17 @@
 #include "model/switches/properties.h"
 #include "model/switches/switches.h"
 
-using simhost::Call;
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::optional_text;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::stateless_or_trap;
-using simhost::switch_called;
-using simhost::switch_identified;
-
+namespace simhost {
 namespace {
 
 // The number of a port; a switch that does not run has given its ports none.
-int running_number(ReadingCall &call, simhost::NamedPort const &target) {
+int running_number(ReadingCall &call, NamedPort const &target) {
   auto &transaction = call.transaction();
-  auto const [key, row] = simhost::get_switch(transaction, target.owner.name, target.owner.kind);
+  auto const [key, row] = get_switch(transaction, target.owner.name, target.owner.kind);
   if (!row.associated) {
-    simhost::refuse(QEX_NOT_FOUND);
+    refuse(QEX_NOT_FOUND);
   }
-  return static_cast<int>(simhost::get_port(transaction, key, target.identifier).number);
+  return static_cast<int>(get_port(transaction, key, target.identifier).number);
 }
 
 }  // namespace
@@ -44,58 +33,58 @@ QEX_ReturnStatus VSDVS_CreateVSwitch(char const *alias, char const *switchId,
                                      qex_Bool persistent, qex_uint32 version, qex_uint32 mtu,
                                      qex_uint32 uplinkCount) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::SwitchSpec const spec{.alias = require_text(alias),
-                                   .identifier = optional_text(switchId),
-                                   .portset = optional_text(portsetName),
-                                   .max_ports = maxPorts,
-                                   .persistent = persistent != 0,
-                                   .version = version,
-                                   .mtu = mtu,
-                                   .uplink_count = uplinkCount};
-    simhost::create_switch(call.transaction(), spec);
+    SwitchSpec const spec{.alias = require_text(alias),
+                          .identifier = optional_text(switchId),
+                          .portset = optional_text(portsetName),
+                          .max_ports = maxPorts,
+                          .persistent = persistent != 0,
+                          .version = version,
+                          .mtu = mtu,
+                          .uplink_count = uplinkCount};
+    create_switch(call.transaction(), spec);
   });
 }
 
 QEX_ReturnStatus VSDVS_DestroyVSwitch(char const *switchName) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const alias = require_text(switchName);
-    simhost::destroy_switch(call.transaction(), alias);
+    destroy_switch(call.transaction(), alias);
   });
 }
 
 QEX_ReturnStatus VSDVS_AddDVPort(char const *switchName, char const *port, qex_uint32 connectId) {
   return changing(__func__, [&](ChangingCall &call) {
-    auto const target = simhost::port_of(switch_called(switchName), port);
+    auto const target = port_of(switch_called(switchName), port);
     auto &transaction = call.transaction();
-    auto const added = simhost::add_client_port(
-        transaction, simhost::get_target(transaction, target.owner), target.identifier);
-    simhost::set(transaction, simhost::ports::connection, simhost::owner_of(added), connectId);
+    auto const added =
+        add_client_port(transaction, get_target(transaction, target.owner), target.identifier);
+    set(transaction, ports::connection, owner_of(added), connectId);
   });
 }
 
 QEX_ReturnStatus VSDVS_AddOpaqueDVPort(char const *switchName, char const *port,
                                        char const *externalId) {
   return changing(__func__, [&](ChangingCall &call) {
-    auto const target = simhost::port_of(switch_called(switchName), port);
+    auto const target = port_of(switch_called(switchName), port);
     auto const external = require_text(externalId);
     auto &transaction = call.transaction();
-    auto const added = simhost::add_client_port(
-        transaction, simhost::get_target(transaction, target.owner), target.identifier);
-    simhost::set_external_id(transaction, added, external);
+    auto const added =
+        add_client_port(transaction, get_target(transaction, target.owner), target.identifier);
+    set_external_id(transaction, added, external);
   });
 }
 
 QEX_ReturnStatus VSDVS_RemoveDVPort(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    auto const target = simhost::port_of(switch_called(switchName), port);
+    auto const target = port_of(switch_called(switchName), port);
     auto &transaction = call.transaction();
-    simhost::remove_port(transaction, simhost::get_target(transaction, target));
+    remove_port(transaction, get_target(transaction, target));
   });
 }
 
 QEX_ReturnStatus VSDVS_DvPortIDToPortID(char const *switchName, char const *port, int *portID) {
   return reading(__func__, [&](ReadingCall &call) {
-    auto const target = simhost::port_of(switch_called(switchName), port);
+    auto const target = port_of(switch_called(switchName), port);
     require(portID) = running_number(call, target);
   });
 }
@@ -103,7 +92,7 @@ QEX_ReturnStatus VSDVS_DvPortIDToPortID(char const *switchName, char const *port
 QEX_ReturnStatus VSDVS_DvPortIDToPortIDFromDVSID(char const *switchId, char const *port,
                                                  int *portID) {
   return reading(__func__, [&](ReadingCall &call) {
-    auto const target = simhost::port_of(switch_identified(switchId), port);
+    auto const target = port_of(switch_identified(switchId), port);
     require(portID) = running_number(call, target);
   });
 }
@@ -112,20 +101,20 @@ QEX_ReturnStatus VSDVS_GetAliasFromPortset(char const *portsetName, char *aliasB
   return reading(__func__, [&](ReadingCall &call) {
     auto const name = require_text(portsetName);
     auto *const output = &require(aliasBuffer);
-    auto const alias = simhost::alias_of_portset(call.transaction(), name);
+    auto const alias = alias_of_portset(call.transaction(), name);
     *std::copy(alias.begin(), alias.end(), output) = '\0';
   });
 }
 
 QEX_ReturnStatus VSDVS_GetMTU(char const *switchName, qex_uint32 *mtu) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(mtu) = simhost::get(call, switch_called(switchName), simhost::switches::mtu);
+    require(mtu) = get(call, switch_called(switchName), switches::mtu);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMTU(char const *switchName, qex_uint32 mtu) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::set(call, switch_called(switchName), simhost::switches::mtu, mtu);
+    set(call, switch_called(switchName), switches::mtu, mtu);
   });
 }
 
@@ -134,3 +123,4 @@ void VSDVS_FreeMemory(void *memory) {
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -5,43 +5,30 @@
 #include "model/security/properties.h"
 #include "vswitch/configuration.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::port_of;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::switch_called;
-
-namespace mac = simhost::mac;
-namespace multicast = simhost::multicast;
-namespace security = simhost::security;
-
+namespace simhost {
 extern "C" {
 
 QEX_ReturnStatus VSDVS_GetMACLearning(char const *switchName, VSMACLearning *learning) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(learning) = simhost::get(call, switch_called(switchName), mac::learning);
+    require(learning) = get(call, switch_called(switchName), mac::learning);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMACLearning(char const *switchName, VSMACLearning const *learning) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::set(call, switch_called(switchName), mac::learning, require(learning));
+    set(call, switch_called(switchName), mac::learning, require(learning));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearMACLearning(char const *switchName) {
-  return changing(__func__, [&](ChangingCall &call) {
-    simhost::clear(call, switch_called(switchName), mac::learning);
-  });
+  return changing(
+      __func__, [&](ChangingCall &call) { clear(call, switch_called(switchName), mac::learning); });
 }
 
 QEX_ReturnStatus VSDVS_GetPortMACLearning(char const *switchName, char const *port,
                                           VSPMACLearning *learning) {
   return reading(__func__, [&](ReadingCall &call) {
-    auto const management =
-        simhost::get(call, port_of(switch_called(switchName), port), mac::management);
+    auto const management = get(call, port_of(switch_called(switchName), port), mac::management);
     require(learning) = management.portMACLearning;
   });
 }
@@ -52,56 +39,51 @@ QEX_ReturnStatus VSDVS_SetPortMACLearning(char const *switchName, char const *po
     auto const target = port_of(switch_called(switchName), port);
     auto const &wanted = require(learning);
     auto &transaction = call.transaction();
-    auto const owner = simhost::owner_of(transaction, target);
-    auto management = simhost::effective(transaction, mac::management, owner);
+    auto const owner = owner_of(transaction, target);
+    auto management = effective(transaction, mac::management, owner);
     management.portMACLearning = wanted;
-    simhost::set(transaction, mac::management, owner, management);
+    set(transaction, mac::management, owner, management);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity *security) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(security) =
-        simhost::get(call, port_of(switch_called(switchName), port), security::forbids);
+    require(security) = get(call, port_of(switch_called(switchName), port), security::forbids);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetPortSecurity(char const *switchName, char const *port,
                                        VSPropSecurity const *security) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::set(call, port_of(switch_called(switchName), port), security::forbids,
-                 require(security));
+    set(call, port_of(switch_called(switchName), port), security::forbids, require(security));
   });
 }
 
 QEX_ReturnStatus VSDVS_GetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter *filter) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(filter) =
-        simhost::get(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
+    require(filter) = get(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetExtraEthFilter(char const *switchName, char const *port,
                                          VSExtraEthFilter const *filter) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::set(call, port_of(switch_called(switchName), port), mac::ethernet_filter,
-                 require(filter));
+    set(call, port_of(switch_called(switchName), port), mac::ethernet_filter, require(filter));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearExtraEthFilter(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::clear(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
+    clear(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
   });
 }
 
 QEX_ReturnStatus VSDVS_IsSinkPortEnabled(char const *switchName, char const *port,
                                          qex_Bool *enabled) {
   return reading(__func__, [&](ReadingCall &call) {
-    auto const filter =
-        simhost::get(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
+    auto const filter = get(call, port_of(switch_called(switchName), port), mac::ethernet_filter);
     require(enabled) = static_cast<qex_Bool>((filter.flags & QEX_ETH_FILTER_SINK) != 0);
   });
 }
@@ -111,26 +93,25 @@ QEX_ReturnStatus VSDVS_ConfigureSinkPort(char const *switchName, char const *por
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto &transaction = call.transaction();
-    auto const owner = simhost::owner_of(transaction, target);
-    auto filter = simhost::effective(transaction, mac::ethernet_filter, owner);
+    auto const owner = owner_of(transaction, target);
+    auto filter = effective(transaction, mac::ethernet_filter, owner);
     auto const others = filter.flags & ~qex_uint32{QEX_ETH_FILTER_SINK};
     filter.flags = enabled != 0 ? others | QEX_ETH_FILTER_SINK : others;
-    simhost::set(transaction, mac::ethernet_filter, owner, filter);
+    set(transaction, mac::ethernet_filter, owner, filter);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetMcastFilterMode(char const *switchName, int *mode) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(mode) =
-        static_cast<int>(simhost::get(call, switch_called(switchName), multicast::filter_mode));
+    require(mode) = static_cast<int>(get(call, switch_called(switchName), multicast::filter_mode));
   });
 }
 
 QEX_ReturnStatus VSDVS_SetMcastFilterMode(char const *switchName, VSMcastFilterMode mode) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::set(call, switch_called(switchName), multicast::filter_mode,
-                 static_cast<qex_uint32>(mode));
+    set(call, switch_called(switchName), multicast::filter_mode, static_cast<qex_uint32>(mode));
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

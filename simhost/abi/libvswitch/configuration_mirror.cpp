@@ -3,15 +3,7 @@
 #include "model/mirror/sessions.h"
 #include "vswitch/configuration.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::port_of;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::switch_called;
-
+namespace simhost {
 extern "C" {
 
 QEX_ReturnStatus VSDVS_GetDVMirrorSessions(char const *switchName, char const *port,
@@ -20,9 +12,9 @@ QEX_ReturnStatus VSDVS_GetDVMirrorSessions(char const *switchName, char const *p
     auto const target = port_of(switch_called(switchName), port);
     auto &output = require(table);
     auto &transaction = call.transaction();
-    auto const bytes = simhost::effective_bytes(transaction, simhost::mirror::sessions,
-                                                simhost::owner_of(transaction, target));
-    output = simhost::allocate<DVMirrorSessionTable>(call, bytes);
+    auto const bytes =
+        effective_bytes(transaction, mirror::sessions, owner_of(transaction, target));
+    output = allocate<DVMirrorSessionTable>(call, bytes);
   });
 }
 
@@ -30,9 +22,9 @@ QEX_ReturnStatus VSDVS_AppendDVMirrorSessions(char const *switchName, char const
                                               DVMirrorSessionTable *table) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
-    auto const bytes = simhost::mirror::table_bytes(require(table));
+    auto const bytes = mirror::table_bytes(require(table));
     auto &transaction = call.transaction();
-    simhost::mirror::append_sessions(transaction, simhost::get_target(transaction, target), bytes);
+    mirror::append_sessions(transaction, get_target(transaction, target), bytes);
   });
 }
 
@@ -42,14 +34,15 @@ QEX_ReturnStatus VSDVS_RemoveDVMirrorSession(char const *switchName, char const 
     auto const target = port_of(switch_called(switchName), port);
     auto const name = require_text(sid);
     auto &transaction = call.transaction();
-    simhost::mirror::remove_session(transaction, simhost::get_target(transaction, target), name);
+    mirror::remove_session(transaction, get_target(transaction, target), name);
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearDVMirrorSessions(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::clear(call, port_of(switch_called(switchName), port), simhost::mirror::sessions);
+    clear(call, port_of(switch_called(switchName), port), mirror::sessions);
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -6,61 +6,50 @@
 #include "model/teaming/properties.h"
 #include "vswitch/configuration.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::port_of;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::switch_called;
-using simhost::switch_identified;
-
-namespace teaming = simhost::teaming;
-
+namespace simhost {
 extern "C" {
 
 QEX_ReturnStatus VSDVS_GetTeamingPolicy(char const *switchName, VSTeamPolicy *policy) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(policy) = simhost::get(call, switch_called(switchName), teaming::of_switch);
+    require(policy) = get(call, switch_called(switchName), teaming::of_switch);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetTeamingPolicyFromDVSID(char const *switchId, VSTeamPolicy *policy) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(policy) = simhost::get(call, switch_identified(switchId), teaming::of_switch);
+    require(policy) = get(call, switch_identified(switchId), teaming::of_switch);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetTeamingPolicy(char const *switchName, VSTeamPolicy const *policy) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::set(call, switch_called(switchName), teaming::of_switch, require(policy));
+    set(call, switch_called(switchName), teaming::of_switch, require(policy));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearTeamingPolicy(char const *switchName) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::clear(call, switch_called(switchName), teaming::of_switch);
+    clear(call, switch_called(switchName), teaming::of_switch);
   });
 }
 
 QEX_ReturnStatus VSDVS_GetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy *policy) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(policy) = simhost::get(call, port_of(switch_called(switchName), port), teaming::policy);
+    require(policy) = get(call, port_of(switch_called(switchName), port), teaming::policy);
   });
 }
 
 QEX_ReturnStatus VSDVS_SetPortTeamingPolicy(char const *switchName, char const *port,
                                             VSTeamPolicy const *policy) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::set(call, port_of(switch_called(switchName), port), teaming::policy, require(policy));
+    set(call, port_of(switch_called(switchName), port), teaming::policy, require(policy));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearPortTeamingPolicy(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::clear(call, port_of(switch_called(switchName), port), teaming::policy);
+    clear(call, port_of(switch_called(switchName), port), teaming::policy);
   });
 }
 
@@ -69,7 +58,7 @@ QEX_ReturnStatus VSDVS_GetPortTeamingOverride(char const *switchName, char const
   return reading(__func__, [&](ReadingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto *const output = &require(overrideBuffer);
-    auto const text = simhost::get(call, target, teaming::bound_uplink);
+    auto const text = get(call, target, teaming::bound_uplink);
     *std::copy(text.begin(), text.end(), output) = '\0';
   });
 }
@@ -79,13 +68,13 @@ QEX_ReturnStatus VSDVS_SetPortTeamingOverride(char const *switchName, char const
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto const name = require_text(overrideName);
-    simhost::set(call, target, teaming::bound_uplink, std::string(name));
+    set(call, target, teaming::bound_uplink, std::string(name));
   });
 }
 
 QEX_ReturnStatus VSDVS_ClearPortTeamingOverride(char const *switchName, char const *port) {
   return changing(__func__, [&](ChangingCall &call) {
-    simhost::clear(call, port_of(switch_called(switchName), port), teaming::bound_uplink);
+    clear(call, port_of(switch_called(switchName), port), teaming::bound_uplink);
   });
 }
 
@@ -93,7 +82,7 @@ QEX_ReturnStatus VSDVS_GetTxUplinkAlways(char const *switchName, char const *por
                                          qex_Bool *enabled) {
   return reading(__func__, [&](ReadingCall &call) {
     require(enabled) =
-        simhost::get(call, port_of(switch_called(switchName), port), teaming::transmit_uplink);
+        get(call, port_of(switch_called(switchName), port), teaming::transmit_uplink);
   });
 }
 
@@ -101,8 +90,9 @@ QEX_ReturnStatus VSDVS_SetTxUplinkAlways(char const *switchName, char const *por
                                          qex_Bool enabled) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const value = static_cast<qex_Bool>(enabled != 0);
-    simhost::set(call, port_of(switch_called(switchName), port), teaming::transmit_uplink, value);
+    set(call, port_of(switch_called(switchName), port), teaming::transmit_uplink, value);
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -5,22 +5,14 @@
 #include "vswitch/configuration.h"
 #include "vswitch/teaming.h"
 
-using simhost::BytesView;
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::switch_called;
-
+namespace simhost {
 namespace {
 
 // A caller's list of `count` texts, whose size only its count tells.
 template <typename List>
 BytesView list_bytes(List const &list, std::size_t width) {
   if (list.nUplinkPorts > QEX_TEAM_MAX_UPLINKS) {
-    simhost::refuse(QEX_LIMIT_EXCEEDED);
+    refuse(QEX_LIMIT_EXCEEDED);
   }
   return {reinterpret_cast<std::byte const *>(&list), sizeof list + (list.nUplinkPorts * width)};
 }
@@ -36,11 +28,11 @@ QEX_ReturnStatus VSDVS_GetSwitchUplinkPorts(char const *switchName, VSUplinkPort
     auto &names_output = require(names);
     auto &ids_output = require(ids);
     auto &transaction = call.transaction();
-    auto const owner = simhost::owner_of(transaction, target);
-    auto const name_list = simhost::read_uplink_names(transaction, owner);
-    auto const id_list = simhost::read_uplink_ids(transaction, owner);
-    names_output = simhost::allocate<VSUplinkPorts>(call, name_list);
-    ids_output = simhost::allocate<VSUplinkPortIds>(call, id_list);
+    auto const owner = owner_of(transaction, target);
+    auto const name_list = read_uplink_names(transaction, owner);
+    auto const id_list = read_uplink_ids(transaction, owner);
+    names_output = allocate<VSUplinkPorts>(call, name_list);
+    ids_output = allocate<VSUplinkPortIds>(call, id_list);
   });
 }
 
@@ -48,10 +40,10 @@ QEX_ReturnStatus VSDVS_SetSwitchUplinkPorts(char const *switchName, VSUplinkPort
                                             VSUplinkPortIds const *ids) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
-    auto const ports = simhost::uplink_ports_in(list_bytes(require(names), QEX_NEB_NAME_MAX_LEN),
-                                                list_bytes(require(ids), QEX_NEB_PORT_ID_MAX_LEN));
+    auto const ports = uplink_ports_in(list_bytes(require(names), QEX_NEB_NAME_MAX_LEN),
+                                       list_bytes(require(ids), QEX_NEB_PORT_ID_MAX_LEN));
     auto &transaction = call.transaction();
-    simhost::set_uplink_ports(transaction, simhost::get_target(transaction, target), ports);
+    set_uplink_ports(transaction, get_target(transaction, target), ports);
   });
 }
 
@@ -60,7 +52,7 @@ QEX_ReturnStatus VSDVS_AddSwitchUplinkPort(char const *switchName, char const *u
     auto const target = switch_called(switchName);
     auto const name = require_text(uplink);
     auto &transaction = call.transaction();
-    simhost::add_uplink_port(transaction, simhost::get_target(transaction, target), name);
+    add_uplink_port(transaction, get_target(transaction, target), name);
   });
 }
 
@@ -69,7 +61,7 @@ QEX_ReturnStatus VSDVS_RemoveSwitchUplinkPort(char const *switchName, char const
     auto const target = switch_called(switchName);
     auto const name = require_text(uplink);
     auto &transaction = call.transaction();
-    simhost::remove_uplink_port(transaction, simhost::get_target(transaction, target), name);
+    remove_uplink_port(transaction, get_target(transaction, target), name);
   });
 }
 
@@ -77,8 +69,9 @@ QEX_ReturnStatus VSDVS_ClearSwitchUplinkPorts(char const *switchName) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
     auto &transaction = call.transaction();
-    simhost::set_uplink_ports(transaction, simhost::get_target(transaction, target), {});
+    set_uplink_ports(transaction, get_target(transaction, target), {});
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

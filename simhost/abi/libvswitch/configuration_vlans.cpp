@@ -5,16 +5,7 @@
 #include "model/vlans/vlans.h"
 #include "vswitch/configuration.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::port_of;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::switch_called;
-
-namespace vlans = simhost::vlans;
-
+namespace simhost {
 namespace {
 
 // An array of the caller; refuses null with a count, and a count that nothing can have, before that
@@ -22,7 +13,7 @@ namespace {
 template <typename Entry>
 std::span<Entry const> array(Entry const *first, int count) {
   if (count < 0 || count > vlans::kNumbers || (first == nullptr && count != 0)) {
-    simhost::refuse(QEX_BAD_PARAM);
+    refuse(QEX_BAD_PARAM);
   }
   return {first, static_cast<std::size_t>(count)};
 }
@@ -38,10 +29,10 @@ QEX_ReturnStatus VSDVS_GetPortVLANPolicy(char const *switchName, char const *por
     auto &policy_output = require(policy);
     auto &priority_output = require(priority);
     auto &transaction = call.transaction();
-    auto const owner = simhost::owner_of(transaction, target);
-    auto const bytes = simhost::effective_bytes(transaction, vlans::of_port, owner);
-    priority_output = simhost::effective(transaction, vlans::priority, owner);
-    policy_output = simhost::allocate<VSPortVlanPolicy>(call, bytes);
+    auto const owner = owner_of(transaction, target);
+    auto const bytes = effective_bytes(transaction, vlans::of_port, owner);
+    priority_output = effective(transaction, vlans::priority, owner);
+    policy_output = allocate<VSPortVlanPolicy>(call, bytes);
   });
 }
 
@@ -58,7 +49,7 @@ QEX_ReturnStatus VSDVS_SetPortVLANPolicy(char const *switchName, char const *por
                                   .private_vlan = privateVlan != 0,
                                   .ranges = {trunk.begin(), trunk.end()}};
     auto &transaction = call.transaction();
-    simhost::set_vlans(transaction, simhost::get_target(transaction, target), wanted);
+    set_vlans(transaction, get_target(transaction, target), wanted);
   });
 }
 
@@ -66,15 +57,14 @@ QEX_ReturnStatus VSDVS_ClearPortVLANPolicy(char const *switchName, char const *p
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = port_of(switch_called(switchName), port);
     auto &transaction = call.transaction();
-    simhost::clear_vlans(transaction, simhost::get_target(transaction, target));
+    clear_vlans(transaction, get_target(transaction, target));
   });
 }
 
 QEX_ReturnStatus VSDVS_GetPortNestedVLANTagging(char const *switchName, char const *port,
                                                 qex_Bool *enabled) {
   return reading(__func__, [&](ReadingCall &call) {
-    require(enabled) =
-        simhost::get(call, port_of(switch_called(switchName), port), vlans::nested_tag);
+    require(enabled) = get(call, port_of(switch_called(switchName), port), vlans::nested_tag);
   });
 }
 
@@ -82,7 +72,7 @@ QEX_ReturnStatus VSDVS_SetPortNestedVLANTagging(char const *switchName, char con
                                                 qex_Bool enabled) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const value = static_cast<qex_Bool>(enabled != 0);
-    simhost::set(call, port_of(switch_called(switchName), port), vlans::nested_tag, value);
+    set(call, port_of(switch_called(switchName), port), vlans::nested_tag, value);
   });
 }
 
@@ -92,10 +82,10 @@ QEX_ReturnStatus VSDVS_GetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
     auto const target = switch_called(switchName);
     auto &entries_output = require(entries);
     auto &count_output = require(count);
-    auto const map = simhost::get(call, target, vlans::private_vlans);
+    auto const map = get(call, target, vlans::private_vlans);
     auto const bytes = std::as_bytes(std::span(map));
     count_output = static_cast<int>(map.size());
-    entries_output = map.empty() ? nullptr : simhost::allocate<VSPvlanMapEntry>(call, bytes);
+    entries_output = map.empty() ? nullptr : allocate<VSPvlanMapEntry>(call, bytes);
   });
 }
 
@@ -104,8 +94,9 @@ QEX_ReturnStatus VSDVS_SetPrivateVLANMap(char const *switchName, VSPvlanMapEntry
   return changing(__func__, [&](ChangingCall &call) {
     auto const target = switch_called(switchName);
     auto const map = array(entries, count);
-    simhost::set(call, target, vlans::private_vlans, {map.begin(), map.end()});
+    set(call, target, vlans::private_vlans, {map.begin(), map.end()});
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -8,18 +8,12 @@
 #include "model/lookup.h"
 #include "model/switches/switches.h"
 
-using simhost::Call;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::stateless_or_trap;
-
+namespace simhost {
 namespace {
 
-VSUplinks_entries entry_of(simhost::storage::AttachedUplink const &uplink) {
+VSUplinks_entries entry_of(storage::AttachedUplink const &uplink) {
   VSUplinks_entries entry{};
-  entry.name = simhost::name_of(uplink.name);
+  entry.name = name_of(uplink.name);
   entry.portID = static_cast<qex_SwitchPortID>(uplink.port);
   return entry;
 }
@@ -31,7 +25,7 @@ extern "C" {
 QEX_ReturnStatus VSQEX_GetVSInfo(char const *switchName, VSInfo *info) {
   return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
-    require(info) = simhost::switch_info(call.transaction(), alias);
+    require(info) = switch_info(call.transaction(), alias);
   });
 }
 
@@ -39,10 +33,10 @@ QEX_ReturnStatus VSQEX_GetUplinks(char const *switchName, VSUplinks **uplinks) {
   return reading(__func__, [&](ReadingCall &call) {
     auto const alias = require_text(switchName);
     auto &output = require(uplinks);
-    auto const attached = simhost::uplinks_of(call.transaction(), alias);
+    auto const attached = uplinks_of(call.transaction(), alias);
     std::vector<VSUplinks_entries> entries(attached.size());
     std::transform(attached.begin(), attached.end(), entries.begin(), entry_of);
-    output = simhost::allocate_list<VSUplinks>(call, entries);
+    output = allocate_list<VSUplinks>(call, entries);
   });
 }
 
@@ -51,11 +45,11 @@ QEX_ReturnStatus VSQEX_GetUplinkDVPortID(char const *uplink, char *portBuffer) {
     auto const name = require_text(uplink);
     auto *const output = &require(portBuffer);
     auto &state = call.transaction();
-    auto const found = simhost::get_uplink(state, name);
+    auto const found = get_uplink(state, name);
     if (!found.port) {
-      simhost::refuse(QEX_IS_DISCONNECTED);
+      refuse(QEX_IS_DISCONNECTED);
     }
-    auto const identifier = simhost::get_port(state, *found.port).identifier;
+    auto const identifier = get_port(state, *found.port).identifier;
     output[identifier.copy(output, 48)] = '\0';
   });
 }
@@ -65,3 +59,4 @@ void VSQEX_FreeMemory(void *memory) {
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -5,32 +5,24 @@
 #include "model/plane.h"
 #include "vswitch/queries.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::Place;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::running_plane;
-using simhost::storage::Transaction;
-
+namespace simhost {
 namespace {
 
 VSMACAddrType checked(VSMACAddrType type) {
   if (static_cast<unsigned>(type) > VS_MAC_ADDR_TYPE_ALL) {
-    simhost::refuse(QEX_BAD_PARAM);
+    refuse(QEX_BAD_PARAM);
   }
   return type;
 }
 
-Place team(Transaction &transaction, std::string_view alias) {
-  return {.switch_key = simhost::get_running_switch(transaction, alias).key, .port = std::nullopt};
+Place team(storage::Transaction &transaction, std::string_view alias) {
+  return {.switch_key = get_running_switch(transaction, alias).key, .port = std::nullopt};
 }
 
-Place port_of(Transaction &transaction, std::string_view alias, std::string_view identifier) {
-  auto const key = simhost::get_running_switch(transaction, alias).key;
-  return {.switch_key = key, .port = simhost::get_port(transaction, key, identifier).number};
+Place port_of(storage::Transaction &transaction, std::string_view alias,
+              std::string_view identifier) {
+  auto const key = get_running_switch(transaction, alias).key;
+  return {.switch_key = key, .port = get_port(transaction, key, identifier).number};
 }
 
 // Lets `change` work with an entry on the table of a port.
@@ -56,7 +48,7 @@ QEX_ReturnStatus VSQEX_GetTeamMACTable(char const *switchName, VSMACAddrType typ
     auto const wanted = checked(type);
     auto &transaction = call.transaction();
     auto const entries = running_plane().addresses(transaction, team(transaction, alias), wanted);
-    output = simhost::allocate_list<VSMACTable>(call, entries);
+    output = allocate_list<VSMACTable>(call, entries);
   });
 }
 
@@ -70,27 +62,29 @@ QEX_ReturnStatus VSQEX_GetPortMACTable(char const *switchName, char const *port,
     auto &transaction = call.transaction();
     auto const entries =
         running_plane().addresses(transaction, port_of(transaction, alias, identifier), wanted);
-    output = simhost::allocate_list<VSMACTable>(call, entries);
+    output = allocate_list<VSMACTable>(call, entries);
   });
 }
 
 QEX_ReturnStatus VSQEX_SetPortMACTable(char const *switchName, char const *port,
                                        VSMACEntry const *entry) {
   return changing(__func__, [&](ChangingCall &call) {
-    change_table(call, switchName, port, entry,
-                 [](Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
-                   running_plane().put_address(transaction, place, wanted);
-                 });
+    change_table(
+        call, switchName, port, entry,
+        [](storage::Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
+          running_plane().put_address(transaction, place, wanted);
+        });
   });
 }
 
 QEX_ReturnStatus VSQEX_ClearPortMACTable(char const *switchName, char const *port,
                                          VSMACEntry const *entry) {
   return changing(__func__, [&](ChangingCall &call) {
-    change_table(call, switchName, port, entry,
-                 [](Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
-                   running_plane().remove_address(transaction, place, wanted);
-                 });
+    change_table(
+        call, switchName, port, entry,
+        [](storage::Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
+          running_plane().remove_address(transaction, place, wanted);
+        });
   });
 }
 
@@ -108,15 +102,16 @@ QEX_ReturnStatus VSQEX_GetPortMACLearningStats(char const *switchName, char cons
 QEX_ReturnStatus VSQEX_GetGlobalMACLearningProps(VSMACLearningGlobalProps *props) {
   return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(props);
-    output = simhost::global_mac_learning(call.transaction());
+    output = global_mac_learning(call.transaction());
   });
 }
 
 QEX_ReturnStatus VSQEX_SetGlobalMACLearningProps(VSMACLearningGlobalProps *props) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const &wanted = require(props);
-    simhost::set_global_mac_learning(call.transaction(), wanted);
+    set_global_mac_learning(call.transaction(), wanted);
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -12,17 +12,12 @@
 #include "model/plane.h"
 #include "vswitch/queries.h"
 
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::running_plane;
-
+namespace simhost {
 namespace {
 
 using Sid = std::array<char, sizeof(DVMirrorSID)>;
 
-Sid sid_of(simhost::MirrorSession const &session) {
+Sid sid_of(MirrorSession const &session) {
   Sid sid{};
   session.sid().copy(sid.data(), sid.size());
   return sid;
@@ -37,15 +32,15 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionIDs(char const *switchName, VSDVMirrorS
     auto const alias = require_text(switchName);
     auto &output = require(ids);
     auto &transaction = call.transaction();
-    auto const key = simhost::get_running_switch(transaction, alias).key;
+    auto const key = get_running_switch(transaction, alias).key;
     std::vector<Sid> running;
-    for (auto const &session : simhost::mirrors_of(transaction, key)) {
+    for (auto const &session : mirrors_of(transaction, key)) {
       auto const sid = sid_of(session);
       if (session.runs() && std::find(running.begin(), running.end(), sid) == running.end()) {
         running.push_back(sid);
       }
     }
-    output = simhost::allocate_list<VSDVMirrorSessionIDs>(call, running);
+    output = allocate_list<VSDVMirrorSessionIDs>(call, running);
   });
 }
 
@@ -57,22 +52,21 @@ QEX_ReturnStatus VSQEX_GetDVMirrorSessionStats(char const *switchName, char cons
     std::string const wanted(first, strnlen(first, sizeof(DVMirrorSID)));
     auto &output = require(stats);
     auto &transaction = call.transaction();
-    auto const key = simhost::get_running_switch(transaction, alias).key;
-    auto sessions = simhost::mirrors_of(transaction, key);
+    auto const key = get_running_switch(transaction, alias).key;
+    auto sessions = mirrors_of(transaction, key);
     std::erase_if(sessions, [&](auto const &session) { return session.sid() != wanted; });
     if (sessions.empty()) {
-      simhost::refuse(QEX_NOT_FOUND);
+      refuse(QEX_NOT_FOUND);
     }
     // Two ports may have a session of that name, one of them a disabled one.
     auto const found = std::find_if(sessions.begin(), sessions.end(),
                                     [](auto const &session) { return session.runs(); });
-    if (found == sessions.end() ||
-        simhost::runtime_number(transaction, VS_RT_OPT_ALLOW_MIRROR_STATS) == 0) {
-      simhost::refuse(QEX_IS_DISABLED);
+    if (found == sessions.end() || runtime_number(transaction, VS_RT_OPT_ALLOW_MIRROR_STATS) == 0) {
+      refuse(QEX_IS_DISABLED);
     }
     auto const counters =
         running_plane().counters(transaction, {.switch_key = key, .session = wanted});
-    simhost::show(counters, output);
+    show(counters, output);
     static_assert(sizeof output.name == sizeof found->record.dname);
     std::memcpy(output.name, found->record.dname, sizeof output.name);
   });
@@ -84,10 +78,10 @@ QEX_ReturnStatus VSQEX_GetPromiscSessionActiveDsts(char const *switchName,
     auto const alias = require_text(switchName);
     auto &output = require(ports);
     auto &transaction = call.transaction();
-    auto const active = simhost::promiscuous_ports(
-        transaction, simhost::get_running_switch(transaction, alias).key);
-    output = simhost::allocate_list<VSPromiscSessionActiveDsts>(call, active);
+    auto const active = promiscuous_ports(transaction, get_running_switch(transaction, alias).key);
+    output = allocate_list<VSPromiscSessionActiveDsts>(call, active);
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

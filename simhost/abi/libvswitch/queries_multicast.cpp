@@ -8,13 +8,7 @@
 #include "model/properties/properties.h"
 #include "vswitch/queries.h"
 
-using simhost::AddressBytes;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::running_plane;
-
+namespace simhost {
 namespace {
 
 // The bytes of a group's address in the form of a mode. Snooping is not the form of one protocol.
@@ -27,14 +21,14 @@ std::size_t address_length(VSMcastFilterMode mode) {
     case VS_MCAST_FILTER_MODE_MLD:
       return sizeof(qex_IPv6Address);
     default:
-      simhost::refuse(QEX_BAD_PARAM);
+      refuse(QEX_BAD_PARAM);
   }
 }
 
-simhost::storage::PortNumber port_of(simhost::storage::Transaction &transaction,
-                                     std::string_view alias, qex_SwitchPortID port) {
-  auto const key = simhost::get_running_switch(transaction, alias).key;
-  return simhost::get_port(transaction, key, simhost::storage::PortNumber{port}).number;
+storage::PortNumber port_of(storage::Transaction &transaction, std::string_view alias,
+                            qex_SwitchPortID port) {
+  auto const key = get_running_switch(transaction, alias).key;
+  return get_port(transaction, key, storage::PortNumber{port}).number;
 }
 
 std::vector<std::byte> joined(std::vector<AddressBytes> const &addresses) {
@@ -58,7 +52,7 @@ QEX_ReturnStatus VSQEX_GetMcastFilters(char const *switchName, qex_SwitchPortID 
     auto &transaction = call.transaction();
     auto const groups =
         running_plane().groups(transaction, port_of(transaction, alias, port), length);
-    output = simhost::allocate_counted<VSMcastFilters>(call, joined(groups), groups.size());
+    output = allocate_counted<VSMcastFilters>(call, joined(groups), groups.size());
   });
 }
 
@@ -74,10 +68,10 @@ QEX_ReturnStatus VSQEX_GetMcastFilterStats(char const *switchName, qex_SwitchPor
     auto const found =
         running_plane().group(transaction, port_of(transaction, alias, port), address);
     if (!found) {
-      simhost::refuse(QEX_NOT_FOUND);
+      refuse(QEX_NOT_FOUND);
     }
-    auto *const record = simhost::allocate_counted<VSMcastFilterStats>(call, joined(found->sources),
-                                                                       found->sources.size());
+    auto *const record =
+        allocate_counted<VSMcastFilterStats>(call, joined(found->sources), found->sources.size());
     record->version = found->version;
     record->srcIPFilterMode = found->source_mode;
     record->updateTime = static_cast<qex_uint64>(found->updated / std::chrono::seconds(1));
@@ -91,11 +85,10 @@ QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode) {
     auto const alias = require_text(switchName);
     auto &output = require(mode);
     auto &transaction = call.transaction();
-    auto const owner = simhost::storage::PropertyOwner::global(
-        simhost::get_running_switch(transaction, alias).key);
-    output =
-        static_cast<int>(simhost::effective(transaction, simhost::multicast::filter_mode, owner));
+    auto const owner = storage::PropertyOwner::global(get_running_switch(transaction, alias).key);
+    output = static_cast<int>(effective(transaction, multicast::filter_mode, owner));
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -7,12 +7,7 @@
 #include "model/options/runtime_options.h"
 #include "vswitch/queries.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-
+namespace simhost {
 namespace {
 
 std::vector<qex_uint16> wanted_types(qex_uint16 const *ids, qex_uint16 count) {
@@ -34,7 +29,7 @@ QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count
   return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(options);
     auto const types = wanted_types(ids, count);
-    auto const list = simhost::packed_runtime_options(call.transaction(), types);
+    auto const list = packed_runtime_options(call.transaction(), types);
     auto *const memory = call.ledger().allocate(list.size(), call.name());
     std::memcpy(memory, list.data(), list.size());
     output = static_cast<VSRuntimeOptions *>(memory);
@@ -44,8 +39,9 @@ QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count
 QEX_ReturnStatus VSQEX_SetRuntimeOptions(VSRuntimeOptions *options) {
   return changing(__func__, [&](ChangingCall &call) {
     auto const &list = require(options);
-    simhost::set_runtime_options(call.transaction(), list);
+    set_runtime_options(call.transaction(), list);
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -7,14 +7,7 @@
 #include "model/uplinks/lags.h"
 #include "vswitch/queries.h"
 
-using simhost::changing;
-using simhost::ChangingCall;
-using simhost::reading;
-using simhost::ReadingCall;
-using simhost::require;
-using simhost::require_text;
-using simhost::running_plane;
-
+namespace simhost {
 namespace {
 
 // Stores what `ask` returns of an uplink of a switch as a link state.
@@ -25,24 +18,24 @@ void link_state(ReadingCall &call, char const *switch_name, char const *uplink, 
   auto const name = require_text(uplink);
   auto &output = require(state);
   auto &transaction = call.transaction();
-  auto const key = simhost::get_running_switch(transaction, alias).key;
-  bool const up = ask(transaction, simhost::get_uplink(transaction, key, name).name);
+  auto const key = get_running_switch(transaction, alias).key;
+  bool const up = ask(transaction, get_uplink(transaction, key, name).name);
   output = up ? QEX_LINK_STATE_UP : QEX_LINK_STATE_DOWN;
 }
 
-simhost::Counters switch_counters(ReadingCall &call, char const *switch_name) {
+Counters switch_counters(ReadingCall &call, char const *switch_name) {
   auto const alias = require_text(switch_name);
   auto &transaction = call.transaction();
-  return running_plane().counters(
-      transaction, {.switch_key = simhost::get_running_switch(transaction, alias).key});
+  return running_plane().counters(transaction,
+                                  {.switch_key = get_running_switch(transaction, alias).key});
 }
 
-std::size_t size_of(simhost::Lag const &lag) {
+std::size_t size_of(Lag const &lag) {
   return sizeof(VSLAGStatus) + (lag.members.size() * sizeof(qex_Name));
 }
 
 // Writes a group and the names of its uplinks; returns where the next one begins.
-std::byte *write_lag(std::byte *at, simhost::Lag const &lag) {
+std::byte *write_lag(std::byte *at, Lag const &lag) {
   VSLAGStatus status{};
   status.state = lag.up() ? QEX_LINK_STATE_UP : QEX_LINK_STATE_DOWN;
   status.id = lag.id;
@@ -52,7 +45,7 @@ std::byte *write_lag(std::byte *at, simhost::Lag const &lag) {
   for (std::size_t number = 0; number < lag.members.size(); ++number) {
     auto const &member = lag.members[number];
     status.uplinkLinkupBitmap |= qex_uint64{member.up} << number;
-    auto const written = simhost::name_of(member.uplink);
+    auto const written = name_of(member.uplink);
     std::memcpy(name, &written, sizeof written);
     name += sizeof written;
   }
@@ -87,11 +80,11 @@ QEX_ReturnStatus VSQEX_SetUplinkAdminLinkState(char const *switchName, char cons
     auto const alias = require_text(switchName);
     auto const name = require_text(uplink);
     if (state != QEX_LINK_STATE_UP && state != QEX_LINK_STATE_DOWN) {
-      simhost::refuse(QEX_BAD_PARAM);
+      refuse(QEX_BAD_PARAM);
     }
     auto &transaction = call.transaction();
-    auto const key = simhost::get_running_switch(transaction, alias).key;
-    auto const known = simhost::get_uplink(transaction, key, name);
+    auto const key = get_running_switch(transaction, alias).key;
+    auto const known = get_uplink(transaction, key, name);
     running_plane().set_admin_state(transaction, known.name, state == QEX_LINK_STATE_UP);
   });
 }
@@ -101,13 +94,12 @@ QEX_ReturnStatus VSQEX_GetLAGTable(char const *switchName, VSLAGTable **table) {
     auto const alias = require_text(switchName);
     auto &output = require(table);
     auto &transaction = call.transaction();
-    auto const lags =
-        simhost::lags_of(transaction, simhost::get_running_switch(transaction, alias).key);
+    auto const lags = lags_of(transaction, get_running_switch(transaction, alias).key);
     std::size_t trailing = 0;
     for (auto const &lag : lags) {
       trailing += size_of(lag);
     }
-    auto *const record = simhost::allocate_record<VSLAGTable>(call, trailing);
+    auto *const record = allocate_record<VSLAGTable>(call, trailing);
     record->numLAGs = static_cast<qex_uint32>(lags.size());
     auto *at = reinterpret_cast<std::byte *>(record + 1);
     for (auto const &lag : lags) {
@@ -121,15 +113,15 @@ QEX_ReturnStatus VSQEX_PortGetTeamUplinkHint(qex_SwitchPortID port, qex_Name *na
   return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(name);
     auto &transaction = call.transaction();
-    auto const known = simhost::get_running_port(transaction, simhost::storage::PortNumber{port});
-    output = simhost::name_of(running_plane().team_uplink(transaction, known));
+    auto const known = get_running_port(transaction, storage::PortNumber{port});
+    output = name_of(running_plane().team_uplink(transaction, known));
   });
 }
 
 QEX_ReturnStatus VSQEX_GetRARPStats(char const *switchName, VSRARPStats *stats) {
   return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(stats);
-    simhost::show(switch_counters(call, switchName), output);
+    show(switch_counters(call, switchName), output);
   });
 }
 
@@ -137,8 +129,9 @@ QEX_ReturnStatus VSQEX_GetServicePortTeamingStats(char const *switchName,
                                                   VSServicePortTeamingStats *stats) {
   return reading(__func__, [&](ReadingCall &call) {
     auto &output = require(stats);
-    simhost::show(switch_counters(call, switchName), output);
+    show(switch_counters(call, switchName), output);
   });
 }
 
 }  // extern "C"
+}  // namespace simhost

@@ -22,17 +22,14 @@
 #include "scenario/scenario.h"
 #include "scenario/texts.h"
 
+namespace simhost {
 namespace {
-
-using simhost::Refused;
-using simhost::storage::ChangingTransaction;
-using simhost::storage::Transaction;
 
 thread_local std::string last_error;
 
 // Keeps the reason of the exception being handled; returns its status.
 int failure() noexcept {
-  auto outcome = simhost::current_outcome();
+  auto outcome = current_outcome();
   last_error = std::move(outcome.reason);
   return outcome.status;
 }
@@ -42,11 +39,11 @@ template <typename Kind, typename Work>
 int on_state(Work const &work) noexcept {
   last_error.clear();
   try {
-    auto &host = simhost::this_host();
+    auto &host = this_host();
     std::scoped_lock const held(host.lock());
     Kind transaction(host.state());
     work(transaction);
-    simhost::commit(transaction);
+    commit(transaction);
     return QEX_OK;
   } catch (...) {
     return failure();
@@ -55,12 +52,12 @@ int on_state(Work const &work) noexcept {
 
 template <typename Work>
 int reading(Work const &work) noexcept {
-  return on_state<simhost::storage::ReadingTransaction>(work);
+  return on_state<storage::ReadingTransaction>(work);
 }
 
 template <typename Work>
 int changing(Work const &work) noexcept {
-  return on_state<simhost::storage::ChangingTransaction>(work);
+  return on_state<storage::ChangingTransaction>(work);
 }
 
 std::string given(char const *text) {
@@ -78,17 +75,16 @@ size_t copy_out(std::string const &all, char *text, size_t size) {
   return all.size();
 }
 
-simhost::Place place_of(Transaction &transaction, char const *switch_name, char const *port) {
-  auto const key = simhost::get_switch(transaction, given(switch_name)).key;
+Place place_of(storage::Transaction &transaction, char const *switch_name, char const *port) {
+  auto const key = get_switch(transaction, given(switch_name)).key;
   if (port == nullptr) {
     return {.switch_key = key, .port = std::nullopt};
   }
-  return {.switch_key = key, .port = simhost::get_port(transaction, key, port).number};
+  return {.switch_key = key, .port = get_port(transaction, key, port).number};
 }
 
 // What a frame's sender learns of what became of its address.
-void refuse_unlearned(simhost::Sighting sighting) {
-  using simhost::Sighting;
+void refuse_unlearned(Sighting sighting) {
   switch (sighting) {
     case Sighting::learning_off:
       throw Refused(QEX_IS_DISABLED, "the port does not learn");
@@ -105,7 +101,7 @@ void refuse_unlearned(simhost::Sighting sighting) {
 }
 
 VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
-  auto const bytes = simhost::scenario::mac_from(mac);
+  auto const bytes = scenario::mac_from(mac);
   if (!bytes) {
     throw Refused(QEX_INVALID_ADDRESS, "'" + mac + "' is no address such as 02:00:00:00:00:01");
   }
@@ -116,21 +112,22 @@ VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
   return source;
 }
 
-simhost::Fault fault_on(char const *function, uint32_t nth, uint32_t times) {
-  simhost::Fault fault;
+Fault fault_on(char const *function, uint32_t nth, uint32_t times) {
+  Fault fault;
   fault.function = given(function);
   fault.first = nth;
-  fault.last = times == 0 ? simhost::Fault::kForever : std::int64_t{nth} + times - 1;
+  fault.last = times == 0 ? Fault::kForever : std::int64_t{nth} + times - 1;
   return fault;
 }
 
-// What the calls that are hit do, `outcome` puts into the fault.
-template <typename Outcome>
-int add_fault(char const *function, uint32_t nth, uint32_t times, Outcome const &outcome) noexcept {
-  return changing([&](ChangingTransaction &transaction) {
+// What the calls that are hit do, `effect` puts into the fault.
+template <typename Effect>
+int add_fault_on(char const *function, uint32_t nth, uint32_t times,
+                 Effect const &effect) noexcept {
+  return changing([&](storage::ChangingTransaction &transaction) {
     auto fault = fault_on(function, nth, times);
-    outcome(fault);
-    simhost::add_fault(transaction, fault);
+    effect(fault);
+    add_fault(transaction, fault);
   });
 }
 
@@ -149,7 +146,7 @@ SIMHOST_API char const *simhost_error() {
 SIMHOST_API size_t simhost_state_file(char *text, size_t size) {
   last_error.clear();
   try {
-    auto &host = simhost::this_host();
+    auto &host = this_host();
     std::scoped_lock const held(host.lock());
     auto const &file = host.state_file();
     return copy_out(file ? file->name().string() : std::string(), text, size);
@@ -160,60 +157,60 @@ SIMHOST_API size_t simhost_state_file(char *text, size_t size) {
 }
 
 SIMHOST_API int simhost_apply(char const *document) {
-  return changing([&](ChangingTransaction &transaction) {
-    simhost::scenario::apply(transaction, given(document));
+  return changing([&](storage::ChangingTransaction &transaction) {
+    scenario::apply(transaction, given(document));
   });
 }
 
 SIMHOST_API size_t simhost_describe(char *text, size_t size) {
   size_t length = 0;
-  reading([&](Transaction &transaction) {
-    length = copy_out(simhost::scenario::description(transaction), text, size);
+  reading([&](storage::Transaction &transaction) {
+    length = copy_out(scenario::description(transaction), text, size);
   });
   return length;
 }
 
 SIMHOST_API int simhost_restart() {
-  return changing([](Transaction &transaction) { simhost::scenario::restart_host(transaction); });
+  return changing([](storage::Transaction &transaction) { scenario::restart_host(transaction); });
 }
 
 SIMHOST_API int simhost_reset() {
-  return changing([](ChangingTransaction &transaction) {
-    simhost::scenario::empty_host(transaction);
-    simhost::populate_fresh_host(transaction);
+  return changing([](storage::ChangingTransaction &transaction) {
+    scenario::empty_host(transaction);
+    populate_fresh_host(transaction);
   });
 }
 
 SIMHOST_API int64_t simhost_clock_now() {
   int64_t now = -1;
-  reading([&](Transaction &transaction) { now = simhost::clock_now(transaction).count(); });
+  reading([&](storage::Transaction &transaction) { now = clock_now(transaction).count(); });
   return now;
 }
 
 SIMHOST_API int simhost_clock_stop() {
-  return changing([](Transaction &transaction) { simhost::stop_clock(transaction); });
+  return changing([](storage::Transaction &transaction) { stop_clock(transaction); });
 }
 
 SIMHOST_API int simhost_clock_run() {
-  return changing([](ChangingTransaction &transaction) { simhost::run_clock(transaction); });
+  return changing([](storage::ChangingTransaction &transaction) { run_clock(transaction); });
 }
 
 SIMHOST_API int simhost_clock_step(int64_t milliseconds) {
-  return changing([&](ChangingTransaction &transaction) {
-    simhost::step_clock(transaction, simhost::ClockTime(milliseconds));
+  return changing([&](storage::ChangingTransaction &transaction) {
+    step_clock(transaction, ClockTime(milliseconds));
   });
 }
 
 SIMHOST_API int simhost_clock_set(int64_t milliseconds) {
-  return changing([&](ChangingTransaction &transaction) {
-    simhost::set_clock(transaction, simhost::ClockTime(milliseconds));
+  return changing([&](storage::ChangingTransaction &transaction) {
+    set_clock(transaction, ClockTime(milliseconds));
   });
 }
 
 SIMHOST_API int simhost_set_link(char const *uplink, int up) {
-  return changing([&](ChangingTransaction &transaction) {
-    auto const name = simhost::get_uplink(transaction, given(uplink)).name;
-    auto &wires = simhost::get_wires();
+  return changing([&](storage::ChangingTransaction &transaction) {
+    auto const name = get_uplink(transaction, given(uplink)).name;
+    auto &wires = get_wires();
     auto link = wires.link_of(transaction, name);
     link.carrier = up != 0;
     wires.change_link(transaction, name, link);
@@ -222,11 +219,11 @@ SIMHOST_API int simhost_set_link(char const *uplink, int up) {
 
 SIMHOST_API int simhost_learn(char const *switchName, char const *port, char const *mac,
                               uint16_t vlan, uint32_t vni) {
-  auto sighting = simhost::Sighting::learned;
-  auto const status = changing([&](ChangingTransaction &transaction) {
-    simhost::get_running_switch(transaction, given(switchName));
-    sighting = simhost::get_wires().learn(transaction, place_of(transaction, switchName, port),
-                                          source_of(given(mac), vlan, vni));
+  auto sighting = Sighting::learned;
+  auto const status = changing([&](storage::ChangingTransaction &transaction) {
+    get_running_switch(transaction, given(switchName));
+    sighting = get_wires().learn(transaction, place_of(transaction, switchName, port),
+                                 source_of(given(mac), vlan, vni));
   });
   if (status != QEX_OK) {
     return status;
@@ -242,28 +239,27 @@ SIMHOST_API int simhost_learn(char const *switchName, char const *port, char con
 
 SIMHOST_API int simhost_set_counter(char const *switchName, char const *port, char const *session,
                                     char const *name, uint64_t value) {
-  return changing([&](ChangingTransaction &transaction) {
+  return changing([&](storage::ChangingTransaction &transaction) {
     if (port != nullptr && session != nullptr) {
       throw Refused(QEX_BAD_PARAM, "a counter is of a port or of a session, not of both");
     }
     auto const place = place_of(transaction, switchName, port);
-    simhost::CounterOwner const owner{.switch_key = place.switch_key,
-                                      .port = place.port,
-                                      .session = session == nullptr ? "" : session};
-    simhost::require_utf8(owner.session);
-    simhost::set_counter(transaction, owner, given(name), value);
+    CounterOwner const owner{.switch_key = place.switch_key,
+                             .port = place.port,
+                             .session = session == nullptr ? "" : session};
+    require_utf8(owner.session);
+    set_counter(transaction, owner, given(name), value);
   });
 }
 
 SIMHOST_API int simhost_fail_call(char const *function, uint32_t nth, uint32_t times, int status) {
-  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
-    fault.status = static_cast<QEX_ReturnStatus>(status);
-  });
+  return add_fault_on(function, nth, times,
+                      [&](Fault &fault) { fault.status = static_cast<QEX_ReturnStatus>(status); });
 }
 
 SIMHOST_API int simhost_trap_call(char const *function, uint32_t nth, uint32_t times,
                                   char const *exception, char const *message) {
-  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
+  return add_fault_on(function, nth, times, [&](Fault &fault) {
     fault.exception = given(exception);
     fault.message = given(message);
   });
@@ -271,33 +267,33 @@ SIMHOST_API int simhost_trap_call(char const *function, uint32_t nth, uint32_t t
 
 SIMHOST_API int simhost_delay_call(char const *function, uint32_t nth, uint32_t times,
                                    uint32_t milliseconds) {
-  return add_fault(function, nth, times, [&](simhost::Fault &fault) {
-    fault.delay = std::chrono::milliseconds(milliseconds);
-  });
+  return add_fault_on(function, nth, times,
+                      [&](Fault &fault) { fault.delay = std::chrono::milliseconds(milliseconds); });
 }
 
 SIMHOST_API int simhost_clear_faults(char const *function) {
-  return changing([&](ChangingTransaction &transaction) {
-    simhost::clear_faults(transaction, function == nullptr ? "" : function);
+  return changing([&](storage::ChangingTransaction &transaction) {
+    clear_faults(transaction, function == nullptr ? "" : function);
   });
 }
 
 SIMHOST_API size_t simhost_ledger_count() {
-  auto &host = simhost::this_host();
+  auto &host = this_host();
   std::scoped_lock const held(host.lock());
   return host.ledger().count();
 }
 
 SIMHOST_API size_t simhost_ledger_report(char *text, size_t size) {
-  auto &host = simhost::this_host();
+  auto &host = this_host();
   std::scoped_lock const held(host.lock());
   return host.ledger().report(std::span(text, size));
 }
 
 SIMHOST_API size_t simhost_ledger_summary(char *text, size_t size) {
-  auto &host = simhost::this_host();
+  auto &host = this_host();
   std::scoped_lock const held(host.lock());
   return copy_out(host.ledger().summary(), text, size);
 }
 
 }  // extern "C"
+}  // namespace simhost
