@@ -109,9 +109,9 @@ inline constexpr std::array kCountersIn<VSDVMirrorSessionStats>{
 /// none does not compile.
 template <typename Record, typename Number>
 consteval Counter counter_in(Number Record::*field) {
+  decltype(CounterField<Record>::field) const wanted = field;
   for (auto const &known : kCountersIn<Record>) {
-    auto const *const same = std::get_if<Number Record::*>(&known.field);
-    if (same != nullptr && *same == field) {
+    if (known.field == wanted) {
       return known.counter;
     }
   }
