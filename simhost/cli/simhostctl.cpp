@@ -1,17 +1,20 @@
 // simhostctl: looking at a simulated host and changing it, from a shell.
+#include <fmt/format.h>
+
 #include <CLI/CLI.hpp>
-#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "cli/commands.h"
 
 namespace {
 
 void add_commands(CLI::App &app) {
+  app.option_defaults()->disable_flag_override();
   // The environment is read at the first call, which is made by a subcommand.
   app.add_option_function<std::string>(
       "--state", [](std::string const &file) { setenv("SIMHOST_STATE", file.c_str(), 1); },
@@ -53,14 +56,12 @@ std::string wrong_option(CLI::ParseError const &error) {
     return option_of(error) + " does not go with '" + text.substr(text.rfind(' ') + 1) + "'";
   }
   if (dynamic_cast<CLI::ArgumentMismatch const *>(&error) != nullptr) {
-    bool const lacks_value = std::string_view(error.what()).ends_with("missing");
-    return option_of(error) + (lacks_value ? " needs a value" : " takes one value, once");
-  }
-  if (dynamic_cast<CLI::ConversionError const *>(&error) != nullptr) {
-    // The checks let through only what can be read, so it is a flag.
-    std::string const text = error.what();
-    auto const name = text.substr(std::min(text.find("--"), text.size()));
-    return "'" + name.substr(0, name.find(' ')) + "' takes no value";
+    std::string_view const text = error.what();
+    if (text.ends_with("flag override")) {
+      return fmt::format("'--{}' takes no value", text.substr(0, text.find(' ')));
+    }
+    return option_of(error) +
+           (text.ends_with("missing") ? " needs a value" : " takes one value, once");
   }
   if (dynamic_cast<CLI::ValidationError const *>(&error) != nullptr) {
     return error.what();  // what a check of ours said, after the option
@@ -72,14 +73,17 @@ std::string wrong_option(CLI::ParseError const &error) {
 std::string complaint(CLI::App const &app, CLI::ParseError const &error) {
   bool const lacks = dynamic_cast<CLI::RequiredError const *>(&error) != nullptr;
   bool const has_more = dynamic_cast<CLI::ExtrasError const *>(&error) != nullptr;
-  auto const unknown = app.remaining(true);
+  auto unknown = app.remaining(true);
+  // It ends the options, and is understood.
+  bool const options_ended = !unknown.empty() && unknown.front() == "--";
+  std::erase(unknown, "--");
   if (unknown.empty() || !(lacks || has_more)) {
     return lacks && lacks_command(app) ? "a command is missing" : wrong_option(error);
   }
   auto const &word = unknown.front();
-  auto const *const what = word.starts_with('-') ? "there is no option"
-                           : lacks_command(app)  ? "there is no command"
-                                                 : "there is no use for";
+  auto const *const what = word.starts_with('-') && !options_ended ? "there is no option"
+                           : lacks_command(app)                    ? "there is no command"
+                                                                   : "there is no use for";
   return std::string(what) + " '" + word + "'";
 }
 
