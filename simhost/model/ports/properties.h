@@ -18,7 +18,7 @@ inline constexpr auto alias = property<std::string>(QEX_NEBPROP_PORT_ALIAS)
                                   .config()
                                   .up_to(kLongestName)
                                   .defaults_to("")
-                                  .obeys<check_port_alias>()
+                                  .fits(check_port_alias)
                                   .json("alias")
                                   .json_of_uplink_port("name")
                                   .says(

@@ -25,10 +25,10 @@ void check_text(Descriptor const &descriptor, std::string_view text) {
   }
 }
 
-void check_bytes(Descriptor const &descriptor, Setting const &setting) {
-  descriptor.check_value(descriptor, setting);
-  if (descriptor.check_rules != nullptr) {
-    descriptor.check_rules(setting);
+void check_setting(Descriptor const &descriptor, Setting const &setting) {
+  descriptor.check_value(descriptor, setting.value);
+  if (descriptor.check_place != nullptr) {
+    descriptor.check_place(setting);
   }
 }
 

@@ -58,10 +58,12 @@ struct Descriptor {
   bool is_typed = false;  ///< has typed calls
   bool is_any_bytes = false;
 
-  /// Refuses bytes that are no value.
-  void (*check_value)(Descriptor const &descriptor, Setting const &setting) = nullptr;
-  /// Refuses values by further rules; null if there are none.
-  void (*check_rules)(Setting const &setting) = nullptr;
+  /// Refuses bytes that are no value, whatever else the host has.
+  void (*check_value)(Descriptor const &descriptor, BytesView bytes) = nullptr;
+  /// A further rule for that; null if there is none.
+  void (*check_rule)(void const *value) = nullptr;
+  /// Refuses values that do not go with what else the host has; null if all do.
+  void (*check_place)(Setting const &setting) = nullptr;
   /// If the value is computed, that is, not what is stored under the key: reads it.
   Bytes (*read)(storage::Transaction &, storage::PropertyOwner const &) = nullptr;
   /// Likewise: writes it; null if callers may only read it.
@@ -93,8 +95,8 @@ struct Descriptor {
   }
 };
 
-/// Refuses bytes that a property may not have.
-SIMHOST_API void check_bytes(Descriptor const &descriptor, Setting const &setting);
+/// Refuses bytes that a property may not have there.
+SIMHOST_API void check_setting(Descriptor const &descriptor, Setting const &setting);
 /// Refuses a number that its form does not say.
 SIMHOST_API void check_number(Descriptor const &descriptor, std::int64_t number);
 /// Refuses bits that no word of its form stands for (QEX_BAD_PARAM).
@@ -177,15 +179,17 @@ struct Property : Descriptor {
     made.form.most = most;
     return made;
   }
-  /// A rule for values, or for bytes and their owner; it refuses what is against it.
+  /// A rule for values by themselves; it refuses what is against it.
   template <auto kRule>
   [[nodiscard]] constexpr Property obeys() const {
     auto made = *this;
-    if constexpr (std::invocable<decltype(kRule), Setting const &>) {
-      made.check_rules = kRule;
-    } else {
-      made.check_rules = [](Setting const &setting) { kRule(Codec<Value>::value(setting.value)); };
-    }
+    made.check_rule = [](void const *value) { kRule(*static_cast<Value const *>(value)); };
+    return made;
+  }
+  /// Likewise for values and what else the host has, which may change while they stay.
+  [[nodiscard]] constexpr Property fits(void (*rule)(Setting const &setting)) const {
+    auto made = *this;
+    made.check_place = rule;
     return made;
   }
   [[nodiscard]] constexpr Property computed_by(Bytes (*reader)(storage::Transaction &,
@@ -324,14 +328,17 @@ constexpr Property<Value> property(std::string_view key) {
   made.key = key;
   made.form = usual_form<Value>();
   made.bytes = BytesName<Value>::kName;
-  made.check_value = [](Descriptor const &descriptor, Setting const &setting) {
-    [[maybe_unused]] auto const value = Codec<Value>::value(setting.value);
+  made.check_value = [](Descriptor const &descriptor, BytesView bytes) {
+    auto const value = Codec<Value>::value(bytes);
     if constexpr (std::integral<Value>) {
       check_number(descriptor, value);
     } else if constexpr (std::same_as<Value, std::string>) {
       check_text(descriptor, value);
     } else if (descriptor.form.kind == FormKind::bits) {
       check_bits(descriptor, descriptor.form.load(&value));
+    }
+    if (descriptor.check_rule != nullptr) {
+      descriptor.check_rule(&value);
     }
   };
   made.make = [](Descriptor const &descriptor, Use const &change) {

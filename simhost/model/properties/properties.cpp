@@ -44,7 +44,7 @@ void put(storage::Transaction &transaction, Descriptor const &descriptor,
     throw Refused(QEX_READ_ONLY);
   }
   Setting const setting{.transaction = transaction, .owner = owner, .value = value};
-  check_bytes(descriptor, setting);
+  check_setting(descriptor, setting);
   if (descriptor.is_computed()) {
     descriptor.write(setting);
   } else {

@@ -36,15 +36,6 @@ void check_ranges(std::span<qex_NEBPortVIDRange const> ranges) {
   }
 }
 
-void check_is_private(Setting const &setting, qex_uint16 vlan) {
-  auto const map = effective(setting.transaction, private_vlans,
-                             storage::PropertyOwner::global(setting.owner.switch_key));
-  if (std::none_of(map.begin(), map.end(),
-                   [&](VSPvlanMapEntry const &entry) { return entry.secondaryVID == vlan; })) {
-    throw Refused(QEX_BAD_VLANID);
-  }
-}
-
 void check_entry(VSPvlanMapEntry const &entry) {
   for (auto const vlan : {entry.primaryVID, entry.secondaryVID}) {
     if (vlan < kLeast) {
@@ -90,15 +81,24 @@ PortVlans PortVlans::from(BytesView bytes) {
           .ranges = std::move(ranges)};
 }
 
-void check_port_vlans(Setting const &setting) {
-  auto const port = PortVlans::from(setting.value);
+void check_port_vlans(PortVlans const &port) {
   if (port.private_vlan && !port.ranges.empty()) {
     throw Refused(QEX_BAD_PARAM);
   }
   check_vlan(port.vlan);
   check_ranges(port.ranges);
-  if (port.private_vlan) {
-    check_is_private(setting, port.vlan);
+}
+
+void check_is_in_map(Setting const &setting) {
+  auto const port = PortVlans::from(setting.value);
+  if (!port.private_vlan) {
+    return;
+  }
+  auto const map = effective(setting.transaction, private_vlans,
+                             storage::PropertyOwner::global(setting.owner.switch_key));
+  if (std::none_of(map.begin(), map.end(),
+                   [&](VSPvlanMapEntry const &entry) { return entry.secondaryVID == port.vlan; })) {
+    throw Refused(QEX_BAD_VLANID);
   }
 }
 

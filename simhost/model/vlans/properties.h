@@ -48,10 +48,12 @@ struct SIMHOST_API PortVlans {
   void join_priority(std::int32_t other) { priority = other; }
 };
 
-/// The rules of a port's VLANs: refuses VLANs past the greatest (QEX_BAD_VLANID), a private VLAN
-/// that is not in the switch's map (QEX_BAD_VLANID), ranges whose ends or which themselves are not
-/// in rising order or that share a VLAN, ranges beside a private VLAN (QEX_BAD_PARAM).
-SIMHOST_API void check_port_vlans(Setting const &setting);
+/// The rules of a port's VLANs: refuses VLANs past the greatest (QEX_BAD_VLANID), ranges whose ends
+/// or which themselves are not in rising order or that share a VLAN, ranges beside a private VLAN
+/// (QEX_BAD_PARAM).
+SIMHOST_API void check_port_vlans(PortVlans const &port);
+/// Refuses a private VLAN that is not in the switch's map (QEX_BAD_VLANID).
+SIMHOST_API void check_is_in_map(Setting const &setting);
 
 using PrivateVlans = std::vector<VSPvlanMapEntry>;
 
@@ -93,6 +95,7 @@ inline constexpr auto of_port =
         .of_port()
         .typed()
         .obeys<check_port_vlans>()
+        .fits(check_is_in_map)
         .json("vlan", form::record_or_first<PortVlans>(kMembers))
         .together_with<std::int32_t, &PortVlans::priority_if_any, &PortVlans::join_priority>(
             priority, "priority")
