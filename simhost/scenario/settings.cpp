@@ -228,7 +228,7 @@ void describe_raw(Json &described, Transaction &transaction, PropertyOwner const
                   SettingOwner kind, std::string_view under) {
   auto const said = said_by(described, kind);
   Json list = Json::object();
-  for (auto const &stored : storage::properties_of(transaction, owner)) {
+  for (auto const &stored : list_stored(transaction, owner)) {
     if (!round_trips(said, stored)) {
       list[stored.name] = {{"type", type_to_json(stored.property.type)},
                            {"hex", hex_text(stored.property.value)}};

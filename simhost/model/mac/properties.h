@@ -1,9 +1,9 @@
 // Settings of MAC addresses: what switches and ports learn, and which frames a port takes.
 #pragma once
 
-#include <algorithm>
 #include <array>
 #include <cstddef>
+#include <cstring>
 
 #include "model/ports/runtime_state.h"
 #include "model/properties/descriptor.h"
@@ -122,10 +122,7 @@ inline constexpr auto kEthernetAddress = form::address<EthernetAddress>(FormKind
 
 struct FilterAddresses {
   using Object = VSExtraEthFilter;
-  // A damaged filter may claim more than there is room for.
-  static std::size_t count(VSExtraEthFilter const &filter) {
-    return std::min<std::size_t>(filter.numMulticastAddrs, VSWITCH_ETH_MAX_EXACT_MULTICAST_ADDRS);
-  }
+  static std::size_t count(VSExtraEthFilter const &filter) { return filter.numMulticastAddrs; }
   static void const *at(VSExtraEthFilter const &filter, std::size_t index) {
     return &filter.multicastAddrs[index];
   }

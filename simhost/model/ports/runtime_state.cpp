@@ -31,7 +31,7 @@ Attached attached_to(storage::Transaction &transaction, storage::Port const &por
   }
   auto const owner = owner_of(port);
   bool const client = find_value(transaction, ports::client, owner).has_value();
-  auto const side = storage::find_property(transaction, owner, ports::link.key);
+  auto const side = find_stored(transaction, owner, ports::link.key);
   bool const side_up = !side || record_of<qex_uint32>(side->value) == QEX_LINK_STATE_UP;
   return {.in_use = client, .link_up = client && side_up};
 }

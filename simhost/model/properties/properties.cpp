@@ -1,6 +1,8 @@
 // What is stored under a key and what the host keeps elsewhere, as one set of properties.
 #include "model/properties/properties.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <utility>
 
@@ -17,6 +19,28 @@ constexpr std::size_t kLongestKey = 255;
 Descriptor const *find_meant(storage::PropertyOwner const &owner, std::string_view name) {
   auto const *const key = find_descriptor(name);
   return key != nullptr && key->scope == owner.scope ? key : nullptr;
+}
+
+// Anybody may have written the state. Any bytes do for a key without a meaning.
+void check_stored(storage::Transaction &transaction, Descriptor const *known, BytesView value) {
+  if (known == nullptr) {
+    return;
+  }
+  try {
+    known->check_value(*known, value);
+  } catch (Refused const &) {
+    transaction.refuse(fmt::format("the property '{}' holds what is no value of it", known->key));
+  }
+}
+
+std::optional<storage::Property> find_checked(storage::Transaction &transaction,
+                                              storage::PropertyOwner const &owner,
+                                              std::string_view key, Descriptor const *known) {
+  auto property = storage::find_property(transaction, owner, key);
+  if (property) {
+    check_stored(transaction, known, property->value);
+  }
+  return property;
 }
 
 void check_key(storage::PropertyOwner const &owner, std::string_view name) {
@@ -97,12 +121,37 @@ std::optional<storage::Property> find_property(storage::Transaction &transaction
   if (known != nullptr && known->is_computed()) {
     return computed(transaction, owner, *known);
   }
-  return storage::find_property(transaction, owner, key);
+  return find_checked(transaction, owner, key, known);
+}
+
+std::optional<storage::Property> find_stored(storage::Transaction &transaction,
+                                             storage::PropertyOwner const &owner,
+                                             std::string_view key) {
+  return find_checked(transaction, owner, key, find_meant(owner, key));
+}
+
+std::vector<storage::NamedProperty> list_stored(storage::Transaction &transaction,
+                                                storage::PropertyOwner const &owner) {
+  auto all = storage::properties_of(transaction, owner);
+  for (auto const &[name, property] : all) {
+    check_stored(transaction, find_meant(owner, name), property.value);
+  }
+  return all;
+}
+
+std::vector<storage::PortProperty> list_stored_at_ports(storage::Transaction &transaction,
+                                                        Descriptor const &descriptor,
+                                                        storage::SwitchKey key) {
+  auto all = storage::port_properties(transaction, key, descriptor.key);
+  for (auto const &[port, value] : all) {
+    check_stored(transaction, &descriptor, value);
+  }
+  return all;
 }
 
 std::vector<storage::NamedProperty> list_properties(storage::Transaction &transaction,
                                                     storage::PropertyOwner const &owner) {
-  auto all = storage::properties_of(transaction, owner);
+  auto all = list_stored(transaction, owner);
   // Of a key that is read elsewhere, what is stored is only a part of the value.
   std::erase_if(all, [&](storage::NamedProperty const &property) {
     auto const *const key = find_meant(owner, property.name);
@@ -152,7 +201,7 @@ std::optional<Bytes> find_bytes(storage::Transaction &transaction, Descriptor co
   if (descriptor.is_computed()) {
     return descriptor.read(transaction, owner);
   }
-  auto property = storage::find_property(transaction, owner, descriptor.key);
+  auto property = find_checked(transaction, owner, descriptor.key, &descriptor);
   return property ? std::optional(std::move(property->value)) : std::nullopt;
 }
 

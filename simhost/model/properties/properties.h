@@ -39,6 +39,17 @@ SIMHOST_API std::optional<storage::NamedProperty> next_property(storage::Transac
                                                                 storage::PropertyOwner const &owner,
                                                                 std::string_view name);
 
+/// What is stored, the part of a computed property that is under its key included. Throws
+/// UnusableState for what is no value of its setting, here and wherever a property is read.
+SIMHOST_API std::optional<storage::Property> find_stored(storage::Transaction &transaction,
+                                                         storage::PropertyOwner const &owner,
+                                                         std::string_view key);
+SIMHOST_API std::vector<storage::NamedProperty> list_stored(storage::Transaction &transaction,
+                                                            storage::PropertyOwner const &owner);
+/// Of every port of a switch that has the setting.
+SIMHOST_API std::vector<storage::PortProperty> list_stored_at_ports(
+    storage::Transaction &transaction, Descriptor const &descriptor, storage::SwitchKey key);
+
 /// Clears a property. Refuses one that is not set, which whatever cannot be set never is
 /// (QEX_NOT_FOUND), and one that the host keeps elsewhere (QEX_READ_ONLY).
 SIMHOST_API void clear_property(storage::Transaction &transaction,

@@ -26,7 +26,7 @@ bool belongs(storage::PropertyType type, Extent extent) {
 
 void write_properties(Writer &writer, storage::Transaction &transaction, PropertyOwner const &owner,
                       Extent extent) {
-  auto all = storage::properties_of(transaction, owner);
+  auto all = list_stored(transaction, owner);
   std::erase_if(all, [&](storage::NamedProperty const &named) {
     return !belongs(named.property.type, extent);
   });

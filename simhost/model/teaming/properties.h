@@ -1,7 +1,6 @@
 // Settings of teaming: which uplinks switches and ports use.
 #pragma once
 
-#include <algorithm>
 #include <array>
 #include <cstddef>
 
@@ -38,13 +37,10 @@ inline constexpr std::array<Word, 9> kFlags{{{"all_available", TEAM_FRP_FLAG_ALL
                                              {"lst", TEAM_FRP_FLAG_LST}}};
 inline constexpr int kMostPercent = 100;
 
-/// The two runs of names in a policy; the active ones come first, and are said first. A damaged
-/// policy may claim more names than there is room for: those that are there count.
+/// The two runs of names in a policy; the active ones come first, and are said first.
 struct ActiveNames {
   using Object = VSTeamPolicy;
-  static std::size_t count(VSTeamPolicy const &policy) {
-    return std::min<std::size_t>(policy.numActive, QEX_TEAM_MAX_UPLINKS);
-  }
+  static std::size_t count(VSTeamPolicy const &policy) { return policy.numActive; }
   static void const *at(VSTeamPolicy const &policy, std::size_t index) {
     return &policy.uplinkPortName[index];
   }
@@ -55,10 +51,7 @@ struct ActiveNames {
 };
 struct StandbyNames {
   using Object = VSTeamPolicy;
-  static std::size_t count(VSTeamPolicy const &policy) {
-    return std::min<std::size_t>(policy.numStandby,
-                                 QEX_TEAM_MAX_UPLINKS - ActiveNames::count(policy));
-  }
+  static std::size_t count(VSTeamPolicy const &policy) { return policy.numStandby; }
   static void const *at(VSTeamPolicy const &policy, std::size_t index) {
     return &policy.uplinkPortName[policy.numActive + index];
   }

@@ -126,16 +126,13 @@ Teaming::KeptPorts const &Teaming::all_ports(storage::Transaction &transaction,
   auto &ports = ports_of_switch(key, generations);
   if (!ports.plain) {
     ports.own.clear();
-    for (auto const &[port, value] :
-         storage::port_properties(transaction, key, teaming::policy.key)) {
+    for (auto const &[port, value] : list_stored_at_ports(transaction, teaming::policy, key)) {
       ports.own[port].policy = record_of<VSTeamPolicy>(value);
     }
     for (auto const &[port, value] :
-         storage::port_properties(transaction, key, teaming::bound_uplink.key)) {
+         list_stored_at_ports(transaction, teaming::bound_uplink, key)) {
       ports.own[port].uplink = text_of(value);
     }
-    // What is too short for a policy is none.
-    std::erase_if(ports.own, [](auto const &own) { return own.second.is_nothing(); });
     auto numbers = storage::client_numbers(transaction, key);
     std::erase_if(numbers, [&](auto number) { return ports.own.contains(number); });
     ports.plain = std::move(numbers);

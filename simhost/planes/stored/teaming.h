@@ -28,8 +28,6 @@ namespace simhost::stored {
 struct OwnTeaming {
   std::optional<VSTeamPolicy> policy;
   std::optional<std::string> uplink;  ///< the one that it is bound to
-
-  [[nodiscard]] bool is_nothing() const { return !policy && !uplink; }
 };
 
 /// The teams of a host. What was worked out of the state is kept until something changes there on

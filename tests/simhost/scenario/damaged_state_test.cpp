@@ -4,25 +4,36 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <filesystem>
 #include <span>
 #include <string>
 
-#include "base/outcomes.h"
 #include "faults/faults.h"
+#include "model/lookup.h"
+#include "model/plane.h"
+#include "model/properties/properties.h"
+#include "model/state/images.h"
+#include "model/switches/properties.h"
 #include "nebpublic/property_types.h"
 #include "planes/stored/stored_plane.h"
 #include "scenario/scenario.h"
 #include "scenario/texts.h"
 #include "storage/store.h"
 #include "temporary_folder.h"
+#include "vswitch/mac_learning.h"
+#include "vswitch/port_mac_policies.h"
+#include "vswitch/port_policies.h"
+#include "vswitch/private_vlans.h"
 #include "vswitch/properties.h"
 #include "vswitch/teaming.h"
 
 namespace {
 
 using simhost::storage::Access;
+using simhost::storage::PropertyOwner;
 using simhost::storage::Store;
 using simhost::storage::Transaction;
 using simhost::storage::UnusableState;
@@ -54,8 +65,9 @@ void damage(std::filesystem::path const &file, std::string const &sql) {
   ASSERT_NE(database.getTotalChanges(), 0) << sql;
 }
 
-/// What is wrong with the host once `sql` has been at it; empty if nothing is.
-std::string complaint_after(std::string const &sql) {
+/// What a question finds wrong with the host once `sql` has been at it; empty if nothing is.
+template <typename Ask>
+std::string complaint_after(std::string const &sql, Ask const &ask) {
   TemporaryFolder const folder;
   auto const file = folder.file("host.db");
   {
@@ -64,14 +76,19 @@ std::string complaint_after(std::string const &sql) {
   damage(file, sql);
   Store store(file, [](auto &) {});
   try {
-    Transaction transaction(store, Access::read);
-    simhost::scenario::description(transaction);
+    Transaction transaction(store, Access::write);
+    ask(transaction);
     return "";
   } catch (UnusableState const &error) {
     auto const named = "the state file " + file.string() + " cannot be used: ";
     EXPECT_THAT(error.what(), testing::StartsWith(named));
     return std::string(error.what()).substr(named.size());
   }
+}
+
+std::string complaint_after(std::string const &sql) {
+  return complaint_after(
+      sql, [](Transaction &transaction) { simhost::scenario::description(transaction); });
 }
 
 struct Damage {
@@ -118,23 +135,156 @@ TEST(DamagedState, WithWhatNothingRefersToIsRead) {
   EXPECT_EQ(complaint_after("UPDATE switch SET version = 7"), "");
 }
 
-// Sets a property of the switch, or of its port, past all checks.
-template <typename Record>
-std::string set_to(char const *owner, char const *key, Record const &record) {
-  auto const bytes = std::as_bytes(std::span(&record, 1));
+// Whose property: its scope and its port.
+constexpr char const *kOfSwitch = "0, NULL";
+constexpr char const *kOfHost = "1, NULL";
+constexpr char const *kOfPort = "2, (SELECT number FROM port WHERE identifier = 'p')";
+
+// Sets a property past all checks.
+std::string set_to(char const *owner, char const *key, std::string const &hex) {
   return fmt::format(
-      "INSERT INTO property (switch, {}, name, type, value) VALUES (1, {}, '{}', {}, x'{}')",
-      "scope", owner, key, static_cast<int>(CONFIG_PROP_TYPE), simhost::scenario::hex_text(bytes));
+      "INSERT OR REPLACE INTO property (switch, scope, port, name, type, value)"
+      " VALUES (1, {}, '{}', {}, x'{}')",
+      owner, key, static_cast<int>(CONFIG_PROP_TYPE), hex);
 }
 
-// A count that a record claims is believed as far as the record has room.
-TEST(DamagedState, HasNoMoreNamesInATeamingPolicyThanThereIsRoomFor) {
+template <typename Record>
+std::string hex_of(Record const &record) {
+  return simhost::scenario::hex_text(std::as_bytes(std::span(&record, 1)));
+}
+
+std::string no_value(char const *key) {
+  return fmt::format("the property '{}' holds what is no value of it", key);
+}
+
+VSTeamPolicy policy_of_more_names_than_there_is_room_for() {
   VSTeamPolicy policy{};
   policy.numActive = policy.numStandby = UINT32_MAX;
   for (std::size_t at = 0; at < std::size(policy.uplinkPortName); ++at) {
     fmt::format_to(&policy.uplinkPortName[at][0], "uplink{}", at);
   }
-  EXPECT_EQ(complaint_after(set_to("0", VSPROP_SWITCH_TEAMING, policy)), "");
+  return policy;
+}
+
+VSTeamPolicy policy_of_a_name_without_end() {
+  VSTeamPolicy policy{};
+  policy.numActive = 1;
+  std::memset(&policy.uplinkPortName[0][0], 'u', sizeof policy.uplinkPortName[0]);
+  return policy;
+}
+
+VSExtraEthFilter filter_of_more_addresses_than_there_is_room_for() {
+  VSExtraEthFilter filter{};
+  filter.numMulticastAddrs = UINT16_MAX;
+  std::memset(&filter.multicastAddrs, 1, sizeof filter.multicastAddrs);
+  return filter;
+}
+
+VSPvlanMapEntry entry_of_no_vlan() {
+  VSPvlanMapEntry entry{};
+  entry.primaryVID = entry.secondaryVID = 4095;
+  entry.pvlanType = VSPORT_PVLAN_TYPE_PROMISC;
+  return entry;
+}
+
+VSPortVlanPolicy policy_of_a_range_that_is_not_there() {
+  VSPortVlanPolicy policy{};
+  policy.numRanges = 1;
+  return policy;
+}
+
+TEST(DamagedState, SaysWhichPropertyHoldsNoValue) {
+  VSMACLearning learning{};
+  learning.reserved = 1;
+  VSPMACManagement management{};
+  management.portMACLearning.macLimit = VSPORT_MAC_LEARNING_LIMIT_ENTRIES_MAX + 1;
+  struct Planted {
+    char const *owner;
+    char const *key;
+    std::string hex;
+  };
+  for (auto const &[owner, key, hex] : {
+           Planted{kOfSwitch, VSPROP_MTU, "DC"},
+           {kOfSwitch, VSPROP_MTU, "FF040000"},
+           {kOfSwitch, VSPROP_MULTICAST_FILTER, "04000000"},
+           {kOfSwitch, VSPROP_SWITCH_FORWARDING_DISABLED, "02"},
+           {kOfSwitch, VSPROP_SWITCH_MAC_LEARNING, hex_of(learning)},
+           {kOfSwitch, VSPROP_SWITCH_TEAMING,
+            hex_of(policy_of_more_names_than_there_is_room_for())},
+           {kOfSwitch, VSPROP_SWITCH_UPLINK_MIRROR_SESSIONS, "00"},
+           {kOfSwitch, VSPROP_PVLAN_MAP, hex_of(entry_of_no_vlan())},
+           {kOfHost, QEX_NEBPROP_HOST_STATUS, "03000000"},
+           {kOfPort, VSPROP_PORT_SECURITY, "000000FF"},
+           {kOfPort, VSPROP_PORT_TEAMING_POLICY, hex_of(policy_of_a_name_without_end())},
+           {kOfPort, VSPROP_PORT_TEAMING_OVERRIDE, "75"},
+           {kOfPort, VSPROP_PORT_VLAN, hex_of(policy_of_a_range_that_is_not_there())},
+           {kOfPort, VSPROP_PORT_PRIORITY, "08000000"},
+           {kOfPort, VSPROP_PORT_EXTRA_ETH_FRP,
+            hex_of(filter_of_more_addresses_than_there_is_room_for())},
+           {kOfPort, VSPROP_PORT_MAC_MANAGEMENT, hex_of(management)},
+           {kOfPort, QEX_NEBPROP_PORT_ALIAS, std::string(std::size_t{2} * 81, '7') + "00"},
+           {kOfPort, QEX_NEBPROP_PORT_QEXNIC_VLANID, "FF0F"},
+           {kOfPort, QEX_NEBPROP_PORT_LINK_STATUS, "02000000"},
+       }) {
+    EXPECT_EQ(complaint_after(set_to(owner, key, hex)), no_value(key)) << hex;
+  }
+}
+
+TEST(DamagedState, KeepsBytesThatAreAnyAndKeysWithoutAMeaning) {
+  for (auto const *const key : {QEX_NEBPROP_PORT_PORTGROUP, "com.example.note"}) {
+    EXPECT_EQ(complaint_after(set_to(kOfPort, key, "00FF")), "") << key;
+  }
+}
+
+// A map may lose an entry while ports are in its private VLANs.
+TEST(DamagedState, IsNoneForAValueThatNoLongerGoesWithTheRest) {
+  VSPortVlanPolicy policy{};
+  policy.flags = VSPORT_VLAN_PVLAN_ENABLED;
+  policy.vlanID = 100;
+  EXPECT_EQ(complaint_after(set_to(kOfPort, VSPROP_PORT_VLAN, hex_of(policy))), "");
+}
+
+TEST(DamagedState, IsFoundByEveryWayToReadAProperty) {
+  auto const of_switch = [](Transaction &transaction) {
+    return PropertyOwner::global(simhost::get_switch(transaction, "s").key);
+  };
+  auto const of_mtu = set_to(kOfSwitch, VSPROP_MTU, "DC");
+  EXPECT_EQ(complaint_after(of_mtu,
+                            [&](Transaction &transaction) {
+                              simhost::effective(transaction, simhost::switches::mtu,
+                                                 of_switch(transaction));
+                            }),
+            no_value(VSPROP_MTU));
+  EXPECT_EQ(complaint_after(of_mtu,
+                            [&](Transaction &transaction) {
+                              simhost::find_property(transaction, of_switch(transaction),
+                                                     VSPROP_MTU);
+                            }),
+            no_value(VSPROP_MTU));
+  EXPECT_EQ(complaint_after(of_mtu,
+                            [&](Transaction &transaction) {
+                              simhost::list_properties(transaction, of_switch(transaction));
+                            }),
+            no_value(VSPROP_MTU));
+  EXPECT_EQ(complaint_after(of_mtu,
+                            [](Transaction &transaction) {
+                              simhost::state_image(transaction, simhost::Extent::whole);
+                            }),
+            no_value(VSPROP_MTU));
+  EXPECT_EQ(complaint_after(of_mtu,
+                            [&](Transaction &transaction) {
+                              simhost::clear(transaction, simhost::switches::mtu,
+                                             of_switch(transaction));
+                            }),
+            "")
+      << "what is damaged can be cleared";
+  // A link that changes moves ports, which are all looked at.
+  EXPECT_EQ(complaint_after(set_to(kOfPort, VSPROP_PORT_TEAMING_OVERRIDE, "75"),
+                            [](Transaction &transaction) {
+                              simhost::get_wires().change_link(transaction, "nic0",
+                                                               {.carrier = false});
+                            }),
+            no_value(VSPROP_PORT_TEAMING_OVERRIDE));
 }
 
 TEST(DamagedState, MissesWhatIsReferredTo) {
