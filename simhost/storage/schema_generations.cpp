@@ -11,6 +11,13 @@ namespace simhost::storage {
 #define OF_TEAM \
   "('" VSPROP_SWITCH_TEAMING "', '" QEX_NEBPROP_PORT_BLOCK "', '" QEX_NEBPROP_PORT_ALIAS "')"
 #define OF_PORT "('" VSPROP_PORT_TEAMING_POLICY "', '" VSPROP_PORT_TEAMING_OVERRIDE "')"
+// What follows when a property is set or goes, which is then the `row` "new" or "old".
+#define NEW_GENERATION(column, row, names)                                              \
+  " UPDATE generation SET " column " = random() WHERE switch = " row ".switch AND " row \
+  ".name IN " names ";"
+#define BY_PROPERTY(row)                                         \
+  "WHEN " row ".name IN " OF_TEAM " OR " row ".name IN " OF_PORT \
+  " BEGIN" NEW_GENERATION("team", row, OF_TEAM) NEW_GENERATION("ports", row, OF_PORT) " END"
 
 char const *const kGenerationSchema = R"sql(
   CREATE TABLE generation (
@@ -55,26 +62,11 @@ char const *const kGenerationSchema = R"sql(
   END;
 
   CREATE TRIGGER generation_by_set_property AFTER INSERT ON property
-    WHEN new.name IN )sql" OF_TEAM R"sql( OR new.name IN )sql" OF_PORT R"sql( BEGIN
-    UPDATE generation SET team = random()
-      WHERE switch = new.switch AND new.name IN )sql" OF_TEAM R"sql(;
-    UPDATE generation SET ports = random()
-      WHERE switch = new.switch AND new.name IN )sql" OF_PORT R"sql(;
-  END;
+    )sql" BY_PROPERTY("new") R"sql(;
   CREATE TRIGGER generation_by_changed_property AFTER UPDATE ON property
-    WHEN new.name IN )sql" OF_TEAM R"sql( OR new.name IN )sql" OF_PORT R"sql( BEGIN
-    UPDATE generation SET team = random()
-      WHERE switch = new.switch AND new.name IN )sql" OF_TEAM R"sql(;
-    UPDATE generation SET ports = random()
-      WHERE switch = new.switch AND new.name IN )sql" OF_PORT R"sql(;
-  END;
+    )sql" BY_PROPERTY("new") R"sql(;
   CREATE TRIGGER generation_by_removed_property AFTER DELETE ON property
-    WHEN old.name IN )sql" OF_TEAM R"sql( OR old.name IN )sql" OF_PORT R"sql( BEGIN
-    UPDATE generation SET team = random()
-      WHERE switch = old.switch AND old.name IN )sql" OF_TEAM R"sql(;
-    UPDATE generation SET ports = random()
-      WHERE switch = old.switch AND old.name IN )sql" OF_PORT R"sql(;
-  END;
+    )sql" BY_PROPERTY("old") R"sql(;
 
   CREATE TRIGGER generation_by_added_setting AFTER INSERT ON host_setting BEGIN
     UPDATE generation SET team = random();
