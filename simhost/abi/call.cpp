@@ -51,13 +51,6 @@ void inject_faults(std::string_view function, storage::Patience &patience) {
   inject(hits);
 }
 
-template <typename Transaction>
-void commit_any(std::unique_ptr<Transaction> const &transaction) {
-  if (transaction) {
-    commit(*transaction);
-  }
-}
-
 }  // namespace
 
 Call::Call(CallName const &name) : name_(name.text) {
@@ -92,32 +85,25 @@ void require_no_call() noexcept {
   }
 }
 
-ReadingCall::ReadingCall(CallName const &name) : Call(name) {}
-ReadingCall::~ReadingCall() = default;
+template <typename Transaction>
+CallOnState<Transaction>::CallOnState(CallName const &name) : Call(name) {}
 
-storage::ReadingTransaction &ReadingCall::transaction() {
-  if (!transaction_) {
-    transaction_ = std::make_unique<storage::ReadingTransaction>(this_host().state(), patience_);
+template <typename Transaction>
+CallOnState<Transaction>::~CallOnState() = default;
+
+template <typename Transaction>
+Transaction &CallOnState<Transaction>::transaction() {
+  return transaction_ ? *transaction_ : transaction_.emplace(this_host().state(), patience_);
+}
+
+template <typename Transaction>
+void CallOnState<Transaction>::complete() {
+  if (transaction_) {
+    commit(*transaction_);
   }
-  return *transaction_;
 }
 
-void ReadingCall::complete() {
-  commit_any(transaction_);
-}
-
-ChangingCall::ChangingCall(CallName const &name) : Call(name) {}
-ChangingCall::~ChangingCall() = default;
-
-storage::ChangingTransaction &ChangingCall::transaction() {
-  if (!transaction_) {
-    transaction_ = std::make_unique<storage::ChangingTransaction>(this_host().state(), patience_);
-  }
-  return *transaction_;
-}
-
-void ChangingCall::complete() {
-  commit_any(transaction_);
-}
+template class CallOnState<storage::ReadingTransaction>;
+template class CallOnState<storage::ChangingTransaction>;
 
 }  // namespace simhost

@@ -2,7 +2,7 @@
 // changes it, or one that does neither.
 #pragma once
 
-#include <memory>
+#include <optional>
 
 #include "base/api.h"
 #include "storage/store.h"
@@ -62,36 +62,28 @@ class StatelessCall : public Call {
   void complete() {}
 };
 
-/// A call that reads the state.
-class SIMHOST_API ReadingCall : public Call {
+/// A call on the state; what it changed is undone when it goes without complete().
+template <typename Transaction>
+class CallOnState : public Call {
  public:
-  explicit ReadingCall(CallName const &name);
-  ~ReadingCall();
-  ReadingCall(ReadingCall const &) = delete;
-  ReadingCall &operator=(ReadingCall const &) = delete;
+  explicit CallOnState(CallName const &name);
+  ~CallOnState();
+  CallOnState(CallOnState const &) = delete;
+  CallOnState &operator=(CallOnState const &) = delete;
 
   /// The one transaction of the call, which begins when it is first asked for.
-  storage::ReadingTransaction &transaction();
+  Transaction &transaction();
   void complete();
 
  private:
-  std::unique_ptr<storage::ReadingTransaction> transaction_;
+  std::optional<Transaction> transaction_;
 };
 
-/// A call that changes the state; what it changed is undone when it goes without complete().
-class SIMHOST_API ChangingCall : public Call {
- public:
-  explicit ChangingCall(CallName const &name);
-  ~ChangingCall();
-  ChangingCall(ChangingCall const &) = delete;
-  ChangingCall &operator=(ChangingCall const &) = delete;
+extern template class SIMHOST_API CallOnState<storage::ReadingTransaction>;
+extern template class SIMHOST_API CallOnState<storage::ChangingTransaction>;
 
-  /// The one transaction of the call, which begins when it is first asked for.
-  storage::ChangingTransaction &transaction();
-  void complete();
-
- private:
-  std::unique_ptr<storage::ChangingTransaction> transaction_;
-};
+/// A call that reads the state, and one that changes it.
+using ReadingCall = CallOnState<storage::ReadingTransaction>;
+using ChangingCall = CallOnState<storage::ChangingTransaction>;
 
 }  // namespace simhost
