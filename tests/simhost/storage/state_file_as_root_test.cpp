@@ -1,5 +1,7 @@
-// What the host makes of files of other users, which only root can make.
+// What the host makes of files of other users and of a read-only medium, which only root can make.
 #include <gtest/gtest.h>
+#include <sched.h>
+#include <sys/mount.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -28,18 +30,53 @@ struct StateFileAsRoot : testing::Test {
     ASSERT_EQ(lchown(file.c_str(), kSomebody, kSomebody), 0);
   }
 
-  /// Whether `work` comes true in a child that is another user.
   template <typename Work>
-  static bool true_for_somebody(Work const &work) {
+  static bool true_in_a_child(Work const &work) {
     auto const child = fork();
     if (child == 0) {
-      _exit(setegid(kSomebody) == 0 && seteuid(kSomebody) == 0 && work() ? 0 : 1);
+      _exit(work() ? 0 : 1);
     }
     int status = 0;
     waitpid(child, &status, 0);
     return WIFEXITED(status) && WEXITSTATUS(status) == 0;
   }
+
+  /// Whether `work` comes true in a child that is another user.
+  template <typename Work>
+  static bool true_for_somebody(Work const &work) {
+    return true_in_a_child(
+        [&] { return setegid(kSomebody) == 0 && seteuid(kSomebody) == 0 && work(); });
+  }
+
+  /// Whether `work` comes true in a child for which a folder is a medium that, once `fill` has put
+  /// on it what there is, can only be read.
+  template <typename Fill, typename Work>
+  static bool true_on_a_read_only_medium(TemporaryFolder const &folder, Fill const &fill,
+                                         Work const &work) {
+    auto const path = folder.file("").string();
+    return true_in_a_child([&] {
+      if (unshare(CLONE_NEWNS) != 0 || mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) ||
+          mount("medium", path.c_str(), "tmpfs", 0, nullptr) != 0) {
+        return false;
+      }
+      fill();
+      return mount(nullptr, path.c_str(), nullptr, MS_REMOUNT | MS_RDONLY, nullptr) == 0 && work();
+    });
+  }
 };
+
+/// Whether a state has the switch of made() and refuses another as one that cannot be written.
+bool may_only_be_looked_at(std::filesystem::path const &file) {
+  Store store(file, populate_nothing);
+  try {
+    add(store, "b");
+    return false;
+  } catch (simhost::storage::StateFailure const &failure) {
+    return failure.kind() == simhost::storage::FailureKind::read_only &&
+           failure.what() == "the state file " + file.string() + " cannot be written" &&
+           has(store, "a");
+  }
+}
 
 TEST_F(StateFileAsRoot, OfAnotherUserIsRefused) {
   TemporaryFolder const folder;
@@ -81,17 +118,7 @@ TEST_F(StateFileAsRoot, OfRootMayBeLookedAtAndNotChanged) {
   auto const file = made(folder);
   std::filesystem::permissions(file.parent_path(), std::filesystem::perms::all);
   std::filesystem::permissions(file, std::filesystem::perms(0666));
-  EXPECT_TRUE(true_for_somebody([&] {
-    Store store(file, populate_nothing);
-    try {
-      add(store, "b");
-      return false;
-    } catch (simhost::storage::StateFailure const &failure) {
-      return failure.kind() == simhost::storage::FailureKind::read_only &&
-             failure.what() == "the state file " + file.string() + " cannot be written" &&
-             has(store, "a");
-    }
-  }));
+  EXPECT_TRUE(true_for_somebody([&] { return may_only_be_looked_at(file); }));
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(file.parent_path()), {}), 1)
       << "who looks leaves nothing beside it";
 }
@@ -118,6 +145,37 @@ TEST_F(StateFileAsRoot, InAFolderThatCannotBeWrittenMayBeLookedAt) {
     Store store(file, populate_nothing);
     return has(store, "a");
   }));
+}
+
+TEST_F(StateFileAsRoot, OnAReadOnlyMediumMayBeLookedAtAndNotChanged) {
+  TemporaryFolder const folder;
+  EXPECT_TRUE(true_on_a_read_only_medium(
+      folder, [&] { made(folder); },
+      [&] { return may_only_be_looked_at(folder.file("host.db")); }));
+}
+
+TEST_F(StateFileAsRoot, OnAReadOnlyMediumIsRefusedWithTheChangesOfAKilledProcessBesideIt) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.db");
+  EXPECT_TRUE(true_on_a_read_only_medium(
+      folder,
+      [&] {
+        made(folder);
+        write_file(folder.file("host.db-wal"), "");
+      },
+      [&] {
+        return refusal_of(file) ==
+               refused(file,
+                       "host.db-wal beside it holds changes, and this program may only look at the "
+                       "state");
+      }));
+}
+
+TEST_F(StateFileAsRoot, OnAReadOnlyMediumIsNotMade) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.db");
+  EXPECT_TRUE(true_on_a_read_only_medium(
+      folder, [] {}, [&] { return refusal_of(file) == refused(file, "Read-only file system"); }));
 }
 
 TEST_F(StateFileAsRoot, ThatIsOnlyLookedAtIsToBeOpenedAgainWhenItChanges) {
