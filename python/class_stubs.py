@@ -2,6 +2,7 @@
 
 from typing import List, Tuple
 
+import families
 from definitions import Definitions, Field, Function, Record
 from python_types import PythonTypes, not_null
 from stub_text import constants, doc, function
@@ -12,7 +13,7 @@ import typing
 from typing import Any, Optional, Tuple, Union
 
 import _libvswitch as _flat
-from libvswitch import _by_hand
+from libvswitch import _by_hand, _constants as _numbers
 from libvswitch._arrays import Array
 from libvswitch._records import Record, Table
 
@@ -23,15 +24,29 @@ _CALLS_HEAD = '''"""The calls of the host, and what the module adds to them."""
 from typing import Any, Callable, Optional, Tuple, Union, overload
 
 import _libvswitch as _flat
+from libvswitch import _constants as _numbers
 from libvswitch._arrays import Array
 from libvswitch._classes import (
 {classes})
 
 '''
 
-_CONSTANTS_HEAD = '''"""The constants of the host."""
+_CONSTANTS_HEAD = '''"""The constants of the host.
 
-from typing import Final
+Those of a family have a type of their own, so that no other can be given in their place. It exists
+in stubs only, as the underscore says; at run time there is an `int`, no member of the enumeration.
+"""
+
+from typing import Final, TypeVar, Union
+
+from libvswitch import enums as _enums
+
+_Some = TypeVar("_Some", bound="_Bits")
+
+class _Bits(int):
+    def __and__(self: _Some, other: int) -> _Some: ...
+    def __or__(self: _Some, other: int) -> _Some: ...
+    def __xor__(self: _Some, other: int) -> _Some: ...
 
 '''
 
@@ -69,7 +84,16 @@ def calls(types: PythonTypes) -> str:
 
 
 def constants_of(known: Definitions) -> str:
-    return f"{_CONSTANTS_HEAD}{constants(known)}"
+    numbers = "".join(_number(one.name, one.is_set) for one in families.FAMILIES)
+    types = {name: f"_{family}Number" for name, family in families.of_constants(known).items()}
+    return f"{_CONSTANTS_HEAD}{numbers}\n{constants(known, types)}"
+
+
+def _number(family: str, is_set: bool) -> str:
+    return (
+        f"class _{family}Number({'_Bits' if is_set else 'int'}): ...\n\n"
+        f"_{family} = Union[_enums.{family}, _{family}Number]\n\n"
+    )
 
 
 def package(known: Definitions) -> str:
@@ -97,7 +121,7 @@ def _class(types: PythonTypes, record: Record) -> str:
     text = f"\nclass {record.name}({base}, _flat._{record.name}):\n{doc(record.doc, '    ')}"
     arguments = [("self", ""), *((one.name, types.argument(one)) for one in record.constructor)]
     text += _constructor(types, record) or _method("__init__", arguments, "None", "")
-    text += "".join(_property(field, types.member(field)) for field in record.fields)
+    text += "".join(_property(field, types.property(record, field)) for field in record.fields)
     methods = [one for one in record.methods if not one.is_by_hand]
     text += "".join(_method_of(types, record, one, element) for one in methods)
     if any(one.name == "__getitem__" for one in record.methods) and not record.count:
@@ -110,7 +134,7 @@ def _constructor(types: PythonTypes, record: Record) -> str:
     written = [one for one in record.fields if one.is_writable]
     if record.constructor or not written:
         return ""
-    keywords = [(one.name, f"{_given(types.member(one))} = ...") for one in written]
+    keywords = [(one.name, f"{_given(types.property(record, one))} = ...") for one in written]
     return _method("__init__", [("self", ""), *keywords], "None", "").replace(
         "self,", "self, *,", 1
     )

@@ -142,6 +142,11 @@ def of_output(call: str, name: str) -> str:
     return _OUTPUTS.get((call, name), "")
 
 
+def of_constants(known: Definitions) -> Dict[str, str]:
+    """The families, by the names of their constants; all but that of statuses."""
+    return {one.name: family.name for family in FAMILIES for _, one in members(known, family)}
+
+
 def members(known: Definitions, family: Family) -> List[Tuple[str, Constant]]:
     """The members and their constants; ValueError where the headers have others."""
     found = {

@@ -7,7 +7,8 @@ start with an underscore, because they exist in stubs only.
 
 from typing import List, Set, Tuple
 
-from definitions import Definitions, Field, Function, Parameter, Type
+import families
+from definitions import Definitions, Field, Function, Parameter, Record, Type
 
 CALLBACK = Type(("p", "f(p.void,p.void)"), "char")
 
@@ -56,7 +57,7 @@ class PythonTypes:
             return "Union[bytes, bytearray, memoryview]"
         if not type_.layers and type_.name in self.known.records:
             return self.pointer(Type(("p",), type_.name))
-        found = self.value(type_)
+        found = self._of_family(families.of_type(one.type)) or self.value(type_)
         is_required = one.is_required or (type_ == CALLBACK and self.prefix)
         return found if is_required else self._or_none(type_, found)
 
@@ -81,7 +82,8 @@ class PythonTypes:
     def value(self, type_: Type) -> str:
         """What stands for a value that goes in."""
         if not type_.layers:
-            return "Union[int, str]" if type_.name == "char" else "int"
+            # The classes take no text as a boolean.
+            return "Union[int, str]" if type_.name == "char" and not self.prefix else "int"
         if type_.name == "char" and len(type_.layers) == 1:
             return f"Union[str, {self.pointer(Type(('p',), 'char'))}]"
         if type_ == Type(("p",), "void"):
@@ -98,7 +100,8 @@ class PythonTypes:
         first = self._single_result(function)
         if not function.outputs:
             return first
-        return f"Tuple[{', '.join([first, *map(self._output, function.outputs)])}]"
+        outputs = [self._output(function, one) for one in function.outputs]
+        return f"Tuple[{', '.join([first, *outputs])}]"
 
     def _single_result(self, function: Function) -> str:
         type_ = self.known.resolve(function.result)
@@ -119,14 +122,24 @@ class PythonTypes:
             return found
         return f"Union[{found}, Any]" if function.null == "failure" else f"Optional[{found}]"
 
-    def _output(self, one: Parameter) -> str:
+    def _of_family(self, family: str) -> str:
+        """What a number of a family is given as: a constant, or a member of the enumeration."""
+        return f"_numbers._{family}" if family and self.prefix else ""
+
+    def _number(self, family: str) -> str:
+        """What a number is returned as."""
+        return f"_numbers._{family}Number" if family and self.prefix else "int"
+
+    def _output(self, function: Function, one: Parameter) -> str:
         target = self.known.resolve(one.type).target
         if target.is_pointer:
             if self.prefix and target.name == "VSPvlanMapEntry":
                 return f"Union[Array[{target.name}], Any]"
             record = one.output_record or target.name
             return f"Union[{self.pointer(Type(('p',), record))}, Any]"
-        return "str" if target.name == "char" and one.type.name == "char" else "int"
+        if target.name == "char" and one.type.name == "char":
+            return "str"
+        return self._number(families.of_output(function.name, one.name))
 
     def read(self, field: Field) -> str:
         """What a flat reader returns."""
@@ -151,8 +164,12 @@ class PythonTypes:
             return self.value(type_) if not type_.layers else f"Optional[{self.value(type_)}]"
         return "Optional[_Pointer]" if found == "Optional[_VoidPointer]" else found
 
+    def property(self, record: Record, field: Field) -> str:
+        """What a property of a class reads as, and takes: of a family, also a member."""
+        return self._of_family(families.of_field(record.name, field)) or self.member(field)
+
     def member(self, field: Field) -> str:
-        """What a property of a class reads as, and takes."""
+        """What a property of a class reads as."""
         type_ = self.known.resolve(field.type)
         if field.type == Type((), "qex_Bool"):
             return "bool"

@@ -1,7 +1,7 @@
 """The text of stubs: functions, constants, and what documents them."""
 
 import textwrap
-from typing import Iterable, Tuple
+from typing import Iterable, Mapping, Tuple
 
 from definitions import Definitions
 
@@ -32,9 +32,11 @@ def function(
     return f"{head}\n{body}" if body else f"{head} ...\n"
 
 
-def constants(known: Definitions) -> str:
+def constants(known: Definitions, types: Mapping[str, str] = {}) -> str:
+    """All constants; `types` has those that are more than a number, by name."""
     lines = []
     for one in known.constants:
-        lines.append(f"{one.name}: Final[{'str' if one.is_text else 'int'}]\n")
+        type_ = types.get(one.name, "str" if one.is_text else "int")
+        lines.append(f"{one.name}: Final[{type_}]\n")
         lines.append(doc(one.doc, ""))
     return "".join(lines)

@@ -14,6 +14,9 @@ def _spelled(node: Any, records: Collection[str]) -> str:
     if isinstance(node, ast.Constant):
         return str(node.value)
     if isinstance(node, ast.Attribute):
+        if getattr(node.value, "id", "") == "_numbers":
+            # Of a family of constants; a type checker alone tells the numbers of two.
+            return "int" if node.attr.endswith("Number") else f"{node.attr[1:]} or int"
         return _named(node.attr, records)
     if isinstance(node, ast.Name):
         return _named(node.id, records)

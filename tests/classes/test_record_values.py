@@ -36,7 +36,7 @@ def test_what_a_field_refuses_a_constructor_refuses() -> None:
 
 
 def test_the_fields_as_a_dict() -> None:
-    policy = vs.VSTeamPolicy(loadBalance=3, uplinkPortName=["left"])
+    policy = vs.VSTeamPolicy(loadBalance=vs.TEAM_FRP_TYPE_LB_SRCID, uplinkPortName=["left"])
     assert policy.asdict() == {
         "loadBalance": 3,
         "linkCriteria": 0,

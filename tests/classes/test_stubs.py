@@ -5,15 +5,18 @@ import re
 import subprocess
 import sys
 from pathlib import Path
-from typing import List
+from typing import Dict, List
 
 import libvswitch as vs
 import pytest
+from libvswitch import enums
 
 ROOT = Path(__file__).resolve().parents[2]
 FOLDER = Path(os.environ["BUILD_DIR"], "python")
 # Where Debian keeps mypy, whatever interpreter the module is built for.
 PYTHON = "/usr/bin/python3"
+CLASSES = "libvswitch", "libvswitch._classes"
+CONSTANTS = "libvswitch", "libvswitch._constants"
 
 
 def run(arguments: List[str], tmp_path: Path) -> "subprocess.CompletedProcess[str]":
@@ -34,13 +37,29 @@ def made_in_c() -> List[str]:
     return [name for name in dir(vs) if "_new" in getattr(getattr(vs, name), "__dict__", {})]
 
 
+def of_families() -> Dict[str, str]:
+    """The families of constants whose type is one that only stubs know."""
+    text = (FOLDER / "libvswitch" / "_constants.pyi").read_text(encoding="utf-8")
+    return dict(re.findall(r"^(\w+): Final\[_(\w+)Number\]$", text, re.M))
+
+
+def test_the_type_of_a_constant_is_that_of_its_family() -> None:
+    found: Dict[str, List[int]] = {name: [] for name in enums.__all__ if name != "Status"}
+    for name, family in of_families().items():
+        assert type(getattr(vs, name)) is int
+        found[family].append(getattr(vs, name))
+    for family, numbers in found.items():
+        assert sorted(numbers) == sorted(getattr(enums, family).__members__.values())
+
+
 @pytest.mark.parametrize("module", ["_libvswitch", "libvswitch"])
 def test_stubs_and_modules_have_no_difference(module: str, tmp_path: Path) -> None:
     # What is listed and has no difference is one, too.
-    listed = made_in_c() if module == "libvswitch" else []
-    places = "libvswitch", "libvswitch._classes"
-    names = "".join(f"{place}.{name}.__init__\n" for place in places for name in listed)
-    (tmp_path / "listed").write_text(names, encoding="ascii")
+    listed = []
+    if module == "libvswitch":
+        listed = [f"{place}.{name}.__init__" for place in CLASSES for name in made_in_c()]
+        listed += [f"{place}.{name}" for place in CONSTANTS for name in of_families()]
+    (tmp_path / "listed").write_text("\n".join(listed), encoding="ascii")
     command = [sys.executable, "-m", "mypy.stubtest", module, "--allowlist", "listed"]
     done = run(command, tmp_path)
     assert done.returncode == 0, done.stdout + done.stderr
@@ -84,6 +103,7 @@ PRECISE = """
 from typing import List, Optional, Tuple
 import _libvswitch as flat
 import libvswitch as vs
+from libvswitch import enums
 
 status, uplinks = vs.VSQEX_GetUplinks("a")
 names: List[str] = [*uplinks]
@@ -94,7 +114,8 @@ value: int = mtu.value
 ok: int = vs.VSDVS_GetMTU("a", mtu.pointer)
 lags = vs.Cell("VSLAGTable *")
 table: Optional[vs.VSLAGTable] = lags.value
-entries: List[str] = [one.macAddress for one in vs.VSQEX_GetTeamMACTable("a", 3)[1]]
+learned = vs.VSQEX_GetTeamMACTable("a", vs.VS_MAC_ADDR_TYPE_LEARNED)[1]
+entries: List[str] = [one.macAddress for one in learned]
 several = vs.Cell("VSLAGTable *", [vs.VSLAGTable(), None])
 one: Optional[vs.VSLAGTable] = several[0]
 bits: List[int] = vs.VSVLANBitmap().bits[0:3]
@@ -103,6 +124,19 @@ with vs.owned(vs.VSQEX_GetUplinks("a")) as (_, found):
     first: str = found[0]
 flat.VSInfo_mtu_set(vs.VSInfo(), 9000)
 vs.DVSState_SwitchForEach(lambda handle, context: True, None)
+
+vs.VSQEX_SetUplinkAdminLinkState("a", "b", vs.QEX_LINK_STATE_DOWN)
+vs.VSQEX_SetUplinkAdminLinkState("a", "b", enums.LinkState.DOWN)
+vs.VSQEX_SetUplinkAdminLinkState("a", "b", vs.VSQEX_GetUplinkLinkState("a", "b")[1])
+vs.VSDVS_SetMcastFilterMode("a", vs.VSDVS_GetMcastFilterMode("b")[1])
+policy = vs.VSTeamPolicy(loadBalance=enums.Balance.IP, flags=vs.TEAM_FRP_FLAG_REVERSE)
+policy.flags = policy.flags | enums.TeamFlags.ROLLING & ~vs.TEAM_FRP_FLAG_REVERSE
+policy.flags |= vs.TEAM_FRP_FLAG_BEST_EFFORT
+policy.loadBalance = enums.Balance(7)
+policy.linkCriteria = vs.VSTeamPolicy().linkCriteria
+balance: enums.Balance = enums.Balance(policy.loadBalance)
+number: int = policy.loadBalance
+text: Optional[str] = vs.QEX_ReturnStatusToString(enums.Status.BUSY)
 """
 
 
@@ -130,15 +164,28 @@ WRONG = [
     'vs.VSVLANBitmap().bits[0] = "1"',
     'vs.Cell("VSLAGTable *", vs.VSInfo())',
     'vs.Cell("VSLAGTable *", [vs.VSInfo()])',
+    'vs.VSDVS_SetTxUplinkAlways("a", "b", "yes")',
     "vs.VSMACEntry().nonsense = 3",
     "vs.VSUplinks(1).nonsense = 3",
     "vs.VSVLANBitmap().bits.nonsense = 3",
     "vs.Cell('int').nonsense = 3",
+    'vs.VSQEX_SetUplinkAdminLinkState("a", "b", vs.VS_MAC_ADDR_TYPE_USER)',
+    'vs.VSQEX_SetUplinkAdminLinkState("a", "b", enums.MacType.USER)',
+    'vs.VSQEX_SetUplinkAdminLinkState("a", "b", vs.QEX_TRUE)',
+    'vs.VSQEX_SetUplinkAdminLinkState("a", "b", vs.VSDVS_GetMcastFilterMode("a")[1])',
+    "vs.VSTeamPolicy(loadBalance=vs.TEAM_FRP_FLAG_REVERSE)",
+    "vs.VSTeamPolicy().linkCriteria = vs.VSTeamPolicy().flags",
+    "vs.VSPropSecurity().flags = enums.EthernetFilter.PROMISCUOUS",
+    "vs.VSPropSecurity().flags |= 'promiscuous'",
+    "vs.VSTeamPolicy().loadBalance.name",
+    "vs.QEX_LINK_STATE_UP.name",
 ]
+
+HEAD = "import _libvswitch as flat, libvswitch as vs; from libvswitch import enums"
 
 
 def test_what_is_wrong_is_found(tmp_path: Path) -> None:
-    done = check("\n".join(["import _libvswitch as flat, libvswitch as vs", *WRONG, ""]), tmp_path)
+    done = check("\n".join([HEAD, *WRONG, ""]), tmp_path)
     found = {int(number) for number in re.findall(r"program\.py:(\d+): error: ", done.stdout)}
     assert found == set(range(2, len(WRONG) + 2)), done.stdout
 

@@ -4,6 +4,7 @@ from typing import Any, Callable, Dict, List, Tuple
 
 import libvswitch as vs
 from asking import PORT, SWITCH, Act, create, fill, made, mirror
+from libvswitch.enums import Multicast
 from simhost import Host
 
 
@@ -143,7 +144,7 @@ PROVOKED: Dict[str, Dict[str, Act]] = {
         ),
     },
     "VSDVS_SetMcastFilterMode": {
-        "QEX_BAD_PARAM": lambda host: vs.VSDVS_SetMcastFilterMode(SWITCH, 4)
+        "QEX_BAD_PARAM": lambda host: vs.VSDVS_SetMcastFilterMode(SWITCH, Multicast(4))
     },
     "VSDVS_SetPortVLANPolicy": {
         "QEX_BAD_VLANID": lambda host: vlan((0, 4095)),

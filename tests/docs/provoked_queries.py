@@ -15,6 +15,7 @@ from asking import (
     number,
     uplink_number,
 )
+from libvswitch.enums import LinkState
 from simhost import Host
 
 
@@ -90,7 +91,7 @@ PROVOKED: Dict[str, Dict[str, Act]] = {
         )
     },
     "VSQEX_SetUplinkAdminLinkState": {
-        "QEX_BAD_PARAM": lambda host: vs.VSQEX_SetUplinkAdminLinkState(SWITCH, "nic4", 2)
+        "QEX_BAD_PARAM": lambda host: vs.VSQEX_SetUplinkAdminLinkState(SWITCH, "nic4", LinkState(2))
     },
     "VSQEX_GetUplinkDVPortID": {
         "QEX_IS_DISCONNECTED": lambda host: status_of(vs.VSQEX_GetUplinkDVPortID, "nic0")

@@ -62,6 +62,8 @@ def test_ownership_follows_from_what_is_declared(catalogue: Catalogue) -> None:
             "function or function pointer",
         ),
         ("Optional[_flat._Pointer]", "any pointer or None"),
+        ("_numbers._LinkState", "LinkState or int"),
+        ("Tuple[int, _numbers._LinkStateNumber]", "[int, int]"),
     ],
 )
 def test_types_in_words(hint: str, words: str) -> None:

@@ -65,7 +65,7 @@ def arguments(call: Call) -> Dict[str, Any]:
             found[one.name] = texts.get(one.name, "name")
         elif plain == "int" and one.name == "port":
             found[one.name] = number()
-        elif plain in ("int", "int or str"):
+        elif plain == "int" or plain.endswith(" or int"):  # of a family
             found[one.name] = numbers.get(one.name, 0)
         elif plain == "bytes":
             found[one.name] = bytes(16)

@@ -26,6 +26,7 @@ from pathlib import Path
 from typing import Any, Callable, Dict, List, NamedTuple, Tuple
 
 import libvswitch as vs
+from libvswitch.enums import Multicast
 
 BUILD = Path(os.environ["BUILD_DIR"])
 PATIENCE = 30
@@ -229,7 +230,7 @@ def calls(simhost: Any) -> Dict[str, Callable[[], object]]:
     every = vs.VS_MAC_ADDR_TYPE_ALL
 
     def filters() -> None:
-        for mode in range(4):
+        for mode in Multicast:
             freed(vs.VSQEX_GetMcastFilters(switch, number(), mode))
 
     return {

@@ -19,6 +19,7 @@ from pathlib import Path
 from typing import Any, Callable, Counter, Dict, List, Tuple
 
 import libvswitch as vs
+from libvswitch.enums import Balance, Forbid
 
 SIMHOST = ctypes.CDLL(str(Path(os.environ["BUILD_DIR"]) / "simhost" / "libsimhost.so"))
 DEFAULT_HOST = Path(__file__).parents[3] / "simhost" / "scenario" / "default_host.json"
@@ -107,7 +108,7 @@ def set_mtu(chance: random.Random) -> Any:
 @change
 def set_teaming(chance: random.Random) -> Any:
     policy = vs.VSTeamPolicy()
-    policy.loadBalance = chance.randrange(6)
+    policy.loadBalance = Balance(chance.randrange(6))
     policy.linkCriteria = vs.TEAM_FRP_CRIT_LINK_STATE
     policy.flags = vs.TEAM_FRP_FLAG_NOTIFY_SWITCH
     policy.numActive = 1
@@ -131,7 +132,7 @@ def set_vlan(chance: random.Random) -> Any:
 @change
 def set_security(chance: random.Random) -> Any:
     security = vs.VSPropSecurity()
-    security.flags = chance.randrange(8)
+    security.flags = Forbid(chance.randrange(8))
     return vs.VSDVS_SetPortSecurity(switch(chance), port(chance), security)
 
 
