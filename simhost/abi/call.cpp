@@ -14,17 +14,16 @@ namespace {
 
 constinit thread_local bool call_runs = false;
 
-// The faults that hit the call of a function that is being made now.
-std::vector<Fault> hits_on(std::string_view function, storage::Patience &patience) {
-  auto &host = this_host();
-  std::scoped_lock const held(host.lock());
-  auto &state = host.state();
-  {
-    storage::ReadingTransaction look(state, patience);
-    if (!any_fault_waits(look, function)) {
-      return {};
-    }
+using Look = std::optional<storage::ReadingTransaction>;
+
+// The faults that hit the call of a function that is being made now. If none waits for it, the
+// transaction that found none stays open as `look`.
+std::vector<Fault> hits_on(std::string_view function, Look &look, storage::Patience &patience) {
+  auto &state = this_host().state();
+  if (!any_fault_waits(look.emplace(state, patience), function)) {
+    return {};
   }
+  look.reset();
   storage::ChangingTransaction transaction(state, patience);
   auto hits = count_call(transaction, function);
   transaction.commit();
@@ -33,37 +32,41 @@ std::vector<Fault> hits_on(std::string_view function, storage::Patience &patienc
 
 // Likewise; a state that cannot be read has no faults, and a call that needs it will say so itself.
 // But one that is only busy may have some.
-std::vector<Fault> readable_hits_on(std::string_view function, storage::Patience &patience) {
+std::vector<Fault> readable_hits_on(std::string_view function, Look &look,
+                                    storage::Patience &patience) {
   try {
-    return hits_on(function, patience);
+    return hits_on(function, look, patience);
   } catch (storage::StateFailure const &failure) {
     if (failure.kind() == storage::FailureKind::busy) {
       throw;
     }
   } catch (std::exception const &) {
   }
+  look.reset();
   return {};
-}
-
-void inject_faults(std::string_view function, storage::Patience &patience) {
-  auto const hits = readable_hits_on(function, patience);
-  pause(delay_of(hits));
-  inject(hits);
 }
 
 }  // namespace
 
-Call::Call(CallName const &name) : name_(name.text) {
+Call::Call(CallName const &name) : held_(this_host().lock()), name_(name.text) {
   if (!name.is_resumed) {
-    inject_faults(name.text, patience_);
+    auto const hits = readable_hits_on(name.text, look_, patience_);
+    if (!hits.empty()) {
+      held_.unlock();
+      pause(delay_of(hits));
+      inject(hits);
+      held_.lock();
+    }
   }
-  this_host().lock().lock();
   call_runs = true;
 }
 
 Call::~Call() {
   call_runs = false;
-  this_host().lock().unlock();
+}
+
+void Call::end_look() {
+  look_.reset();
 }
 
 Ledger &Call::ledger() {
@@ -85,25 +88,35 @@ void require_no_call() noexcept {
   }
 }
 
-template <typename Transaction>
-CallOnState<Transaction>::CallOnState(CallName const &name) : Call(name) {}
-
-template <typename Transaction>
-CallOnState<Transaction>::~CallOnState() = default;
-
-template <typename Transaction>
-Transaction &CallOnState<Transaction>::transaction() {
-  return transaction_ ? *transaction_ : transaction_.emplace(this_host().state(), patience_);
+StatelessCall::StatelessCall(CallName const &name) : Call(name) {
+  end_look();
 }
 
-template <typename Transaction>
-void CallOnState<Transaction>::complete() {
+storage::ReadingTransaction &ReadingCall::transaction() {
+  return look_ ? *look_ : look_.emplace(this_host().state(), patience_);
+}
+
+void ReadingCall::complete() {
+  if (look_) {
+    commit(*look_);
+  }
+}
+
+ChangingCall::ChangingCall(CallName const &name) : Call(name) {}
+ChangingCall::~ChangingCall() = default;
+
+storage::ChangingTransaction &ChangingCall::transaction() {
+  if (!transaction_) {
+    end_look();
+    transaction_.emplace(this_host().state(), patience_);
+  }
+  return *transaction_;
+}
+
+void ChangingCall::complete() {
   if (transaction_) {
     commit(*transaction_);
   }
 }
-
-template class CallOnState<storage::ReadingTransaction>;
-template class CallOnState<storage::ChangingTransaction>;
 
 }  // namespace simhost

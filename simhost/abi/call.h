@@ -2,6 +2,7 @@
 // changes it, or one that does neither.
 #pragma once
 
+#include <mutex>
 #include <optional>
 
 #include "base/api.h"
@@ -45,45 +46,53 @@ class SIMHOST_API Call {
   Handles &handles();
   DataLists &lists();
 
+ protected:
+  // Ends the transaction in which the call looked for faults.
+  void end_look();
+
+  std::unique_lock<std::mutex> held_;
+  storage::Patience patience_;
+  // Goes on as the transaction of a call that reads: most calls do, and no fault waits for most.
+  std::optional<storage::ReadingTransaction> look_;
+
  private:
   char const *name_;
-
- protected:
-  storage::Patience patience_;
 };
 
 /// Ends the process with a message while a call runs in this thread: its lock is held.
 SIMHOST_API void require_no_call() noexcept;
 
 /// A call that does not look at the state.
-class StatelessCall : public Call {
+class SIMHOST_API StatelessCall : public Call {
  public:
-  using Call::Call;
+  explicit StatelessCall(CallName const &name);
   void complete() {}
 };
 
-/// A call on the state; what it changed is undone when it goes without complete().
-template <typename Transaction>
-class CallOnState : public Call {
+/// A call that reads the state.
+class SIMHOST_API ReadingCall : public Call {
  public:
-  explicit CallOnState(CallName const &name);
-  ~CallOnState();
-  CallOnState(CallOnState const &) = delete;
-  CallOnState &operator=(CallOnState const &) = delete;
+  using Call::Call;
+
+  /// The one transaction of the call.
+  storage::ReadingTransaction &transaction();
+  void complete();
+};
+
+/// A call that changes the state; what it changed is undone when it goes without complete().
+class SIMHOST_API ChangingCall : public Call {
+ public:
+  explicit ChangingCall(CallName const &name);
+  ~ChangingCall();
+  ChangingCall(ChangingCall const &) = delete;
+  ChangingCall &operator=(ChangingCall const &) = delete;
 
   /// The one transaction of the call, which begins when it is first asked for.
-  Transaction &transaction();
+  storage::ChangingTransaction &transaction();
   void complete();
 
  private:
-  std::optional<Transaction> transaction_;
+  std::optional<storage::ChangingTransaction> transaction_;
 };
-
-extern template class SIMHOST_API CallOnState<storage::ReadingTransaction>;
-extern template class SIMHOST_API CallOnState<storage::ChangingTransaction>;
-
-/// A call that reads the state, and one that changes it.
-using ReadingCall = CallOnState<storage::ReadingTransaction>;
-using ChangingCall = CallOnState<storage::ChangingTransaction>;
 
 }  // namespace simhost
