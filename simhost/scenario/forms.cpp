@@ -217,6 +217,9 @@ Json members_to_json(Form const &form, void const *defaults) {
                !is_absent(member, defaults)) {
       said["default"] = to_json(member.form, defaults);
     }
+    if (member.presence == Presence::always) {
+      said["always"] = true;
+    }
     said["words"] = member.says;
     members.push_back(std::move(said));
   }
