@@ -1,0 +1,30 @@
+"""Makes vswitch/_properties.py from the reference of the properties.
+
+usage: make_property_module.py PROPERTIES.JSON _PROPERTIES.PY
+"""
+
+import json
+import pprint
+import sys
+
+HEAD = '''"""The settings of switches and ports, and the host's runtime options.
+
+Written by python/make_property_module.py.
+"""
+'''
+
+
+def main() -> None:
+    """Reads one and writes the other."""
+    source, target = sys.argv[1:]
+    with open(source, encoding="utf-8") as file:
+        reference = json.load(file)
+    with open(target, "w", encoding="utf-8") as file:
+        file.write(HEAD)
+        for name in ("properties", "runtime_options"):
+            held = pprint.pformat(tuple(reference[name]), width=100, sort_dicts=False)
+            file.write(f"\n{name.upper()} = {held}\n")
+
+
+if __name__ == "__main__":
+    main()

@@ -1,0 +1,109 @@
+"""The host's virtual switches as objects.
+
+    >>> from vswitch import Host
+    >>> port = Host().switches["lab"].ports["web-1"]
+    >>> port.vlan = 7
+
+A setting is an attribute: read, assigned, cleared by `del`; `is_set` tells what is unset from what
+is the default. Collections are mappings of what is there now. What the host refuses is an exception
+that says what was asked of what, and why not.
+"""
+
+from libvswitch.enums import (
+    Balance,
+    Criteria,
+    EthernetFilter,
+    Forbid,
+    LinkState,
+    MacType,
+    Multicast,
+    TeamFlags,
+)
+from libvswitch.errors import (
+    BadParameter,
+    Busy,
+    Disconnected,
+    Exists,
+    HostError,
+    LimitExceeded,
+    NotFound,
+    NotRestored,
+    NotSupported,
+    NoUplink,
+    RolledBack,
+    Trapped,
+)
+from vswitch.host import Host
+from vswitch.mirroring import Mirroring
+from vswitch.port import Port, UplinkPort
+from vswitch.switch import Switch
+from vswitch.transaction import Transaction
+from vswitch.uplink import Uplink
+from vswitch.values import (
+    Change,
+    Encapsulation,
+    Event,
+    FrameFilter,
+    Group,
+    Lag,
+    MacEntry,
+    MacLearning,
+    Mirror,
+    MirrorEnd,
+    MirrorStats,
+    PortMacLearning,
+    PortStats,
+    PrivateVlan,
+    SwitchStats,
+    Teaming,
+    Vlan,
+)
+from vswitch.words import DocumentError
+
+__all__ = [
+    "BadParameter",
+    "Balance",
+    "Busy",
+    "Change",
+    "Criteria",
+    "Disconnected",
+    "DocumentError",
+    "Encapsulation",
+    "EthernetFilter",
+    "Event",
+    "Exists",
+    "Forbid",
+    "FrameFilter",
+    "Group",
+    "Host",
+    "HostError",
+    "Lag",
+    "LimitExceeded",
+    "LinkState",
+    "MacEntry",
+    "MacLearning",
+    "MacType",
+    "Mirror",
+    "MirrorEnd",
+    "MirrorStats",
+    "Mirroring",
+    "Multicast",
+    "NoUplink",
+    "NotFound",
+    "NotRestored",
+    "NotSupported",
+    "Port",
+    "PortMacLearning",
+    "PortStats",
+    "PrivateVlan",
+    "RolledBack",
+    "Switch",
+    "SwitchStats",
+    "TeamFlags",
+    "Teaming",
+    "Transaction",
+    "Trapped",
+    "Uplink",
+    "UplinkPort",
+    "Vlan",
+]

@@ -1,0 +1,153 @@
+"""From the host to the words of documents.
+
+A description has what is set, with the names of scenario documents, and under `observed` what
+nobody sets. A setting whose property type is not the usual one is repeated under `properties` byte
+for byte, where the bytes win.
+"""
+
+import struct
+import typing
+from typing import Dict, List, Optional, Tuple
+
+from libvswitch import checked
+from libvswitch.enums import MacType
+from libvswitch.errors import NoUplink
+from vswitch import _settings, _table
+from vswitch._thing import Item, Thing
+from vswitch.values import MacEntry, MirrorStats, PortStats, Words
+
+if typing.TYPE_CHECKING:
+    from vswitch.host import Host
+    from vswitch.port import Port, UplinkPort
+    from vswitch.switch import Switch
+
+_TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
+_COUNTERS = tuple(PortStats.__dataclass_fields__)[:16]
+
+
+def mac_entry(told: checked.VSMACEntry, switch: str, port: Optional[str]) -> MacEntry:
+    where = told.vid, told.elapsed, switch, port, told.vni
+    return MacEntry(told.macAddress, told.macAddrType, *where, told.aging)
+
+
+def statistics(data: bytes) -> Dict[str, int]:
+    """The counters of a port, by their names."""
+    return dict(zip(_COUNTERS, struct.unpack(f"={len(_COUNTERS)}Q", data)))
+
+
+def mirror_stats(switch: str, sid: str) -> MirrorStats:
+    told = checked.VSQEX_GetDVMirrorSessionStats(switch, sid).asdict()
+    return MirrorStats(**{name: told[name] for name in MirrorStats.__dataclass_fields__})
+
+
+def host_state(host: "Host") -> Dict[str, Words]:
+    switches = [switch_state(one) for one in host.switches.values()]
+    return {
+        "uplinks": uplinks_state(host),
+        "runtime_options": dict(host.options),
+        "mac_learning": host.mac_learning.words(),
+        "switches": switches,
+    }
+
+
+def uplinks_state(host: "Host") -> List[Dict[str, Words]]:
+    return [
+        {
+            "name": uplink.name,
+            "observed": {
+                "link": str(uplink.link),
+                "lacp": str(uplink.lacp),
+                "switch": uplink.switch.alias,
+                "port": uplink.port,
+            },
+        }
+        for uplink in host.uplinks.values()
+    ]
+
+
+def switch_state(switch: "Switch") -> Dict[str, Words]:
+    handle = switch._handle()
+    held = switch.properties()
+    running = switch.running
+    uplinks = tuple(switch.uplinks) if running else ()
+    said: Dict[str, Words] = {
+        "alias": switch.alias,
+        "id": switch.identifier,
+        "portset": switch.portset,
+        "max_ports": checked.DVS_GetMaxPorts(handle),
+        "version": checked.DVS_Version(handle),
+        "running": running,
+        "uplink_ports": [uplink_port_state(one, uplinks) for one in switch.uplink_ports.values()],
+        "uplinks": list(uplinks),
+        "lags": [
+            {"name": lag.name, "uplinks": list(lag.uplinks), "observed": {"link": str(lag.link)}}
+            for lag in (switch.lags if running else ())
+        ],
+    }
+    said.update(settings_state(switch, switch._settings, held))
+    said["ports"] = [port_state(one, running) for one in switch.ports.values()]
+    if running:
+        table = checked.VSQEX_GetTeamMACTable(switch.alias, MacType.ALL)
+        said["addresses"] = [mac_entry(one, switch.alias, None).words() for one in table]
+    said["properties"] = other_properties(switch._settings, held)
+    said["host_properties"] = other_properties({}, switch.host_part.properties())
+    return said
+
+
+def uplink_port_state(port: "UplinkPort", uplinks: Tuple[str, ...]) -> Dict[str, Words]:
+    held = port.properties()
+    said: Dict[str, Words] = {"id": port.id}
+    said.update(settings_state(port, port._settings, held))
+    for name in uplinks:
+        if checked.VSQEX_GetUplinkDVPortID(name) == port.id:
+            said["uplink"] = name
+    said["properties"] = other_properties(port._settings, held)
+    return said
+
+
+def port_state(port: "Port", running: Optional[bool] = None) -> Dict[str, Words]:
+    held = port.properties()
+    said: Dict[str, Words] = {"id": port.id}
+    if port.external_id is not None:
+        said["external_id"] = port.external_id
+    said.update(settings_state(port, port._settings, held))
+    observed: Dict[str, Words] = {}
+    if port.switch.running if running is None else running:
+        said["addresses"] = [one.words() for one in port.macs]
+        number = port.number
+        observed = {"number": number, "uplink": carrier_name(number)}
+    said["properties"] = other_properties(port._settings, held)
+    said["observed"] = observed
+    return said
+
+
+def carrier_name(number: int) -> Optional[str]:
+    try:
+        return checked.VSQEX_PortGetTeamUplinkHint(number)
+    except NoUplink:
+        return None
+
+
+def settings_state(
+    thing: Thing, known: Dict[str, _table.Property], held: Dict[str, Item]
+) -> Dict[str, Words]:
+    """The settings that are set, by their names."""
+    said = {}
+    for name, one in known.items():
+        if any(key in held for key in one.keys):
+            said[name] = _settings.words_of(one, _settings.read(thing, one, held.get(one.key)))
+    return said
+
+
+def other_properties(
+    known: Dict[str, _table.Property], held: Dict[str, Item]
+) -> Dict[str, Dict[str, str]]:
+    """What no name says whole, byte for byte."""
+    usual: Dict[str, int] = {}
+    for one in known.values():
+        usual.update(dict.fromkeys(one.keys, one.type))
+    return {
+        key: {"type": _TYPES.get(item.propertyType, str(item.propertyType)), "hex": item.data.hex()}
+        for key, item in sorted(held.items())
+        if key not in _table.COMPUTED and usual.get(key) != item.propertyType
+    }

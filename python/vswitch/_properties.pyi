@@ -1,0 +1,6 @@
+"""The settings and options that there are: see python/make_property_module.py."""
+
+from typing import Any, Dict, Tuple
+
+PROPERTIES: Tuple[Dict[str, Any], ...]
+RUNTIME_OPTIONS: Tuple[Dict[str, Any], ...]

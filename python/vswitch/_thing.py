@@ -1,0 +1,79 @@
+"""What switches and ports have in common: properties, which hold exact bytes, and a path.
+
+Settings are read and written through typed calls where there are such. What is set, and with which
+bytes and property type, only raw calls and walks tell.
+"""
+
+import abc
+import typing
+from typing import Dict, Optional
+
+from libvswitch import checked
+from vswitch import _table
+
+if typing.TYPE_CHECKING:
+    from vswitch.host import Host
+
+Item = checked.DVSDataItem
+
+
+class Thing(abc.ABC):
+    """A switch, the host's part of one, or a port."""
+
+    _settings: typing.ClassVar[Dict[str, _table.Property]] = {}
+    host: "Host"
+
+    @property
+    @abc.abstractmethod
+    def path(self) -> str:
+        """How changes and events call it."""
+
+    @property
+    @abc.abstractmethod
+    def owner(self) -> "typing.Tuple[str, ...]":
+        """The arguments by which typed calls know it."""
+
+    @abc.abstractmethod
+    def exists(self) -> bool:
+        """Whether the host has it."""
+
+    @abc.abstractmethod
+    def properties(self) -> Dict[str, Item]:
+        """All properties that are set, by their keys."""
+
+    @abc.abstractmethod
+    def get_property(self, key: str) -> bytes:
+        """The bytes of a property; NotFound if it is not set."""
+
+    @abc.abstractmethod
+    def write_property(self, key: str, data: bytes, type_: int) -> None:
+        """Sets a property, and notes nothing."""
+
+    @abc.abstractmethod
+    def erase_property(self, key: str) -> None:
+        """Clears a property that is set, and notes nothing."""
+
+    def set_property(self, key: str, data: bytes, type_: int) -> None:
+        """Sets a property that has no name, by its bytes and its property type."""
+        self.host._note_properties(self, (key,))
+        self.write_property(key, data, type_)
+
+    def clear_property(self, key: str) -> None:
+        """Clears a property; one that is not set stays so."""
+        if key in self.properties():
+            self.host._note_properties(self, (key,))
+            self.erase_property(key)
+
+    def is_set(self, name: str) -> bool:
+        """Whether a setting has a value of its own, even if that is the default."""
+        known = self._settings.get(name)
+        if known is None:
+            names = ", ".join(sorted(self._settings))
+            raise AttributeError(f"{type(self).__name__} has no setting {name!r} (it has {names})")
+        held = self.properties()
+        return any(key in held for key in known.keys)
+
+
+def find_item(thing: Thing, key: str) -> Optional[Item]:
+    """A property of a thing, None if it is not set."""
+    return thing.properties().get(key)

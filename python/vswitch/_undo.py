@@ -1,0 +1,399 @@
+"""What a transaction notes before each write, and how it puts that back.
+
+A step reads what it needs when it is made, before the write. `undo` brings back what was there and
+nothing else; `left` says in words what is not as it was.
+"""
+
+import abc
+import typing
+from typing import Dict, Iterable, List, Optional, Tuple
+
+from libvswitch import checked
+from libvswitch.enums import LinkState, MacType
+from vswitch import _settings, _table
+from vswitch._thing import Item, Thing
+from vswitch.values import MacLearning
+
+if typing.TYPE_CHECKING:
+    from vswitch.host import Host
+    from vswitch.port import Port
+    from vswitch.switch import Switch
+    from vswitch.uplink import Uplink
+
+Before = Dict[str, Optional[Item]]
+_WAIT = 5
+
+
+class Step(abc.ABC):
+    """A write, and what was before it."""
+
+    @abc.abstractmethod
+    def undo(self) -> None:
+        ...
+
+    @abc.abstractmethod
+    def left(self) -> List[str]:
+        ...
+
+    @abc.abstractmethod
+    def what(self) -> str:
+        """What it is about, for when nobody can tell what is left."""
+
+    def is_whole(self) -> bool:
+        """Whether it undoes all that became of a switch or a port."""
+        return False
+
+    def has(self, what: str) -> bool:
+        """Whether that is about its switch or port, or a part of it."""
+        return (what + "/").startswith((f"{self.what()}:", f"{self.what()}/"))
+
+
+# Properties
+
+
+def noted(thing: Thing, keys: Iterable[str]) -> Before:
+    held = thing.properties()
+    return {key: held.get(key) for key in keys}
+
+
+def restore(thing: Thing, before: Before) -> None:
+    """Puts bytes and property types back, and takes away what was not there."""
+    held = thing.properties()
+    if all(held.get(key) == item for key, item in before.items()):
+        return
+    _restore_whole(thing, before)
+    held = thing.properties()
+    for key, item in before.items():
+        now = held.get(key)
+        if now == item:
+            continue
+        if item is None:
+            thing.erase_property(key)
+        else:
+            thing.write_property(key, item.data, item.propertyType)
+
+
+def _restore_whole(thing: Thing, before: Before) -> None:
+    """A setting of several properties in one call, so that none is seen without the others."""
+    if len(before) > 1 and all(item is None for item in before.values()):
+        for known in thing._settings.values():
+            clear = _settings.crossing(known).clear
+            if set(known.keys) == set(before) and clear is not None:
+                clear(*thing.owner)
+
+
+def differences(thing: Thing, before: Before) -> List[str]:
+    held = thing.properties()
+    return [
+        f"{thing.path}: {_name_of(thing, key)}"
+        for key, item in before.items()
+        if held.get(key) != item
+    ]
+
+
+def _name_of(thing: Thing, key: str) -> str:
+    for name, known in thing._settings.items():
+        if key in known.keys:
+            return name if key == known.key else f"{name} ({key})"
+    return key
+
+
+class Properties(Step):
+    """Properties of a thing that are set or cleared."""
+
+    def __init__(self, thing: Thing, keys: Tuple[str, ...]) -> None:
+        self._thing = thing
+        self._before = noted(thing, keys)
+
+    def undo(self) -> None:
+        restore(self._thing, self._before)
+
+    def left(self) -> List[str]:
+        return differences(self._thing, self._before)
+
+    def what(self) -> str:
+        names = ", ".join(_name_of(self._thing, key) for key in self._before)
+        return f"{self._thing.path}: {names}"
+
+
+# Of the host
+
+
+class Options(Step):
+    """Runtime options of the host."""
+
+    def __init__(self, types: Tuple[int, ...]) -> None:
+        self._before = checked.VSQEX_GetRuntimeOptions(types)
+
+    def undo(self) -> None:
+        checked.VSQEX_SetRuntimeOptions(self._before)
+
+    def left(self) -> List[str]:
+        now = checked.VSQEX_GetRuntimeOptions([one.type for one in self._before])
+        return [
+            f"options: {was.name}" for was, is_ in zip(self._before, now) if was.value != is_.value
+        ]
+
+    def what(self) -> str:
+        return "options: " + ", ".join(one.name for one in self._before)
+
+
+class HostLearning(Step):
+    """The MAC learning of the host."""
+
+    def __init__(self, host: "Host") -> None:
+        self._host = host
+        self._before: MacLearning = host.mac_learning
+
+    def undo(self) -> None:
+        if self._host.mac_learning != self._before:
+            self._host._set_mac_learning(self._before)
+
+    def left(self) -> List[str]:
+        return [] if self._host.mac_learning == self._before else [self.what()]
+
+    def what(self) -> str:
+        return "mac_learning"
+
+
+class Link(Step):
+    """Whether an uplink is up. While its cable is out, no call tells what was set."""
+
+    def __init__(self, uplink: "Uplink") -> None:
+        self._uplink = uplink
+        self._before = uplink.link
+
+    def undo(self) -> None:
+        if self._before is LinkState.UP or self._uplink.link is LinkState.UP:
+            self._uplink._set(self._before)
+            self._uplink.wait(self._before, _WAIT)
+
+    def left(self) -> List[str]:
+        return [] if self._uplink.link is self._before else [self.what()]
+
+    def what(self) -> str:
+        return f"{self._uplink.path}: link"
+
+
+class Running(Step):
+    """Whether a switch runs on this host."""
+
+    def __init__(self, switch: "Switch") -> None:
+        self._switch = switch
+        self._before = switch.running
+
+    def undo(self) -> None:
+        self._switch._run(self._before)
+
+    def left(self) -> List[str]:
+        return [] if self._switch.running is self._before else [self.what()]
+
+    def what(self) -> str:
+        return f"{self._switch.path}: running"
+
+
+# Switches, ports and uplinks that come and go
+
+
+class Added(Step):
+    """A switch or a port that is added, unless it was there."""
+
+    def __init__(self, thing: "typing.Union[Switch, Port]") -> None:
+        self._thing = thing
+        self._was_there = thing.exists()
+
+    def undo(self) -> None:
+        if not self._was_there and self._thing.exists():
+            self._thing._erase()
+
+    def left(self) -> List[str]:
+        return [] if self._thing.exists() == self._was_there else [self.what()]
+
+    def is_whole(self) -> bool:
+        return not self._was_there
+
+    def what(self) -> str:
+        return self._thing.path
+
+
+class UplinkPorts(Step):
+    """The uplink ports of a switch, with what they are called, what is at them and what they have
+    set."""
+
+    def __init__(self, switch: "Switch") -> None:
+        self._switch = switch
+        self._before = _uplink_ports(switch)
+        self._numbers = {id_: switch.uplink_ports[id_].number for id_ in self._before}
+
+    def undo(self) -> None:
+        if _uplink_ports(self._switch) == self._before:
+            return
+        self._detach()
+        self._attach()
+        names = [one.name for one in self._before.values()]
+        checked.VSDVS_SetSwitchUplinkPorts(self._switch.alias, names, list(self._before))
+        for id_, one in self._before.items():
+            now = self._switch.uplink_ports[id_]
+            keys = {*one.properties, *_own(now)}
+            restore(now, {key: one.properties.get(key) for key in keys})
+
+    def _detach(self) -> None:
+        """What was not there, or elsewhere."""
+        wanted = {one.uplink: id_ for id_, one in self._before.items()}
+        for id_, one in _uplink_ports(self._switch).items():
+            if one.uplink is not None and wanted.get(one.uplink) != id_:
+                checked.VSDVS_RemoveSwitchUplinkPort(self._switch.alias, one.uplink)
+
+    def _attach(self) -> None:
+        """An uplink goes to a port without one: there is no more than the right one meanwhile."""
+        alias = self._switch.alias
+        here = [id_ for id_, one in _uplink_ports(self._switch).items() if one.uplink is not None]
+        for id_, one in self._before.items():
+            if one.uplink is not None and id_ not in here:
+                here.append(id_)
+                # Names may be those of other ports meanwhile: identifiers cannot.
+                checked.VSDVS_SetSwitchUplinkPorts(alias, here, here)
+                checked.VSDVS_AddSwitchUplinkPort(alias, one.uplink)
+
+    def left(self) -> List[str]:
+        now = _uplink_ports(self._switch)
+        left = [f"{self._switch.path}/{id_}" for id_ in now if now[id_] != self._before.get(id_)]
+        left += [f"{self._switch.path}/{id_}" for id_ in self._before if id_ not in now]
+        for id_, number in self._numbers.items():
+            if id_ in now and self._switch.uplink_ports[id_].number != number:
+                again = self._switch.uplink_ports[id_].number
+                left.append(f"{self._switch.path}/{id_}: its number was {number} and is {again}")
+        return left
+
+    def what(self) -> str:
+        return f"{self._switch.path}: uplink ports"
+
+
+class _UplinkPort(typing.NamedTuple):
+    name: str
+    uplink: Optional[str]
+    properties: Dict[str, Item]
+
+
+def _uplink_ports(switch: "Switch") -> Dict[str, _UplinkPort]:
+    told = checked.VSDVS_GetSwitchUplinkPorts(switch.alias)
+    at = {checked.VSQEX_GetUplinkDVPortID(name): name for name in switch.uplinks}
+    return {
+        id_: _UplinkPort(name, at.get(id_), _own(switch.uplink_ports[id_]))
+        for name, id_ in zip(told.names, told.ids)
+    }
+
+
+def _own(thing: Thing) -> Dict[str, Item]:
+    """The properties that somebody has set."""
+    held = thing.properties()
+    return {key: item for key, item in held.items() if key not in _table.COMPUTED}
+
+
+class RemovedPort(Step):
+    """A port that is removed. Added again it is a new one, which has all that was set."""
+
+    def __init__(self, port: "Port") -> None:
+        self._port = port
+        self._properties = _own(port)
+        self._number = port.number
+        self._external_id = port.external_id
+        self._macs = port.macs if port.switch.running else ()
+
+    def undo(self) -> None:
+        if not self._port.exists():
+            self._add()
+        restore(self._port, dict(self._properties))
+        for entry in self._macs:
+            if entry.type in (MacType.STATIC, MacType.USER) and entry not in self._port.macs:
+                self._put(entry.mac, entry.type, entry.vlan, entry.vni)
+
+    def _add(self) -> None:
+        if self._external_id is not None:
+            checked.VSDVS_AddOpaqueDVPort(*self._port.owner, self._external_id)
+        else:
+            checked.DVSQEX_PortAdd(self._port.switch.identifier, self._port.id)
+
+    def _put(self, mac: str, type_: MacType, vlan: int, vni: int) -> None:
+        entry = checked.VSMACEntry(mac, type_, False, vlan, vni)
+        checked.VSQEX_SetPortMACTable(*self._port.owner, entry)
+
+    def left(self) -> List[str]:
+        path = self._port.path
+        if not self._port.exists():
+            return [path]
+        number = self._port.number
+        if number == self._number:
+            return differences(self._port, dict(self._properties))
+        return [
+            f"{path}: it was removed and added again: its number was {self._number} and is"
+            f" {number}; what it learned and counted is gone, and so is what another system"
+            " called it",
+            *differences(self._port, dict(self._properties)),
+        ]
+
+    def is_whole(self) -> bool:
+        return True
+
+    def what(self) -> str:
+        return self._port.path
+
+
+class RemovedSwitch(Step):
+    """A switch that is removed. Added again it is a new one, which has all that was set."""
+
+    def __init__(self, switch: "Switch") -> None:
+        self._switch = switch
+        self._made = switch.identifier, switch.portset, switch.max_ports
+        self._was_made = False
+        self._version = switch.version
+        self._things: List[Tuple[Thing, Dict[str, Item]]] = [
+            (switch, _own(switch)),
+            (switch.host_part, _own(switch.host_part)),
+        ]
+        self._running = switch.running
+        self._uplinks = UplinkPorts(switch) if self._running else None
+        self._lags = switch.lags if self._running else ()
+        self._ports = [RemovedPort(port) for port in switch.ports.values()]
+
+    def undo(self) -> None:
+        switch = self._switch
+        if switch.exists() and switch.identifier == self._made[0]:
+            return
+        self._was_made = True
+        identifier, portset, max_ports = self._made
+        checked.VSDVS_CreateVSwitch(
+            switch.alias, identifier, portset, max_ports, True, self._version, 0, 0
+        )
+        if self._uplinks is not None:
+            self._uplinks.undo()
+        for thing, before in self._things:
+            keys = {*before, *_own(thing)}
+            restore(thing, {key: before.get(key) for key in keys})
+        for port in self._ports:
+            port.undo()
+        switch._run(self._running)
+
+    def left(self) -> List[str]:
+        switch = self._switch
+        if not switch.exists():
+            return [switch.path]
+        again = f"{switch.path}: it was removed and added again, and outlasts a restart now"
+        left = [again] if self._was_made else []
+        left += [
+            line for thing, before in self._things for line in differences(thing, dict(before))
+        ]
+        left += [line for port in self._ports for line in port.left()]
+        if self._uplinks is not None:
+            left += self._uplinks.left()
+        if switch.running is not self._running:
+            left.append(f"{switch.path}: running")
+        elif self._running and switch.lags != self._lags:
+            left.append(f"{switch.path}: lags")
+        return left
+
+    def is_whole(self) -> bool:
+        return True
+
+    def what(self) -> str:
+        return self._switch.path

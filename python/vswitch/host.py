@@ -1,0 +1,225 @@
+"""The host, and what it has."""
+
+import ctypes
+import threading
+import typing
+from typing import Any, Callable, Dict, Iterable, Iterator, Mapping, Optional, Tuple, Union
+
+import _libvswitch as _flat
+import libvswitch as _vs
+from libvswitch import checked
+from libvswitch.errors import HostError, NotFound
+from vswitch import _describing, _records, _table, _undo, words as _words
+from vswitch._mapping import Live
+from vswitch._properties import RUNTIME_OPTIONS
+from vswitch._thing import Thing
+from vswitch.port import Port
+from vswitch.switch import Switch
+from vswitch.transaction import Transaction
+from vswitch.uplink import Uplink, find_port_of
+from vswitch.values import MacEntry, MacLearning, Words, to_words
+
+Option = Union[int, str]
+
+
+class Options(typing.MutableMapping[str, Option]):
+    """The runtime options of the host, by their names; to delete one sets its default."""
+
+    def __init__(self, host: "Host") -> None:
+        self._host = host
+
+    def _all(self) -> Dict[str, checked.VSRuntimeOption]:
+        return {one.name: one for one in checked.VSQEX_GetRuntimeOptions()}
+
+    def _get(self, name: str) -> checked.VSRuntimeOption:
+        known = self._all()
+        if name not in known:
+            raise NotFound(f"no runtime option {name!r} (there are {', '.join(sorted(known))})")
+        return known[name]
+
+    def __getitem__(self, name: str) -> Option:
+        return self._get(name).value
+
+    def __setitem__(self, name: str, value: Option) -> None:
+        type_ = self._get(name).type
+        held = read_option(name, value, name)
+        self._host._note(_undo.Options, (type_,))
+        checked.VSQEX_SetRuntimeOptions([checked.VSRuntimeOption(type_, held)])
+
+    def __delitem__(self, name: str) -> None:
+        self[name] = _option(name)["default"]
+
+    def __contains__(self, name: object) -> bool:
+        return name in self._all()
+
+    def __iter__(self) -> Iterator[str]:
+        return iter(self._all())
+
+    def __len__(self) -> int:
+        return len(self._all())
+
+    def __repr__(self) -> str:
+        return f"Options({dict(self)!r})"
+
+
+def _option(name: str) -> Dict[str, Any]:
+    return next((one for one in RUNTIME_OPTIONS if one["name"] == name), {})
+
+
+def read_option(name: str, value: object, path: str) -> Option:
+    """The value of a runtime option, checked."""
+    known = _option(name)
+    if "least" in known:
+        return _words.number(value, path, known["least"], known["greatest"])
+    return _words.address(value, path) if known else value  # type: ignore[return-value]
+
+
+class Host:
+    """The host of this process.
+
+    `simulated=False` refuses a simulated host, `simulated=True` demands one.
+    """
+
+    def __init__(self, simulated: Optional[bool] = None) -> None:
+        self._here = threading.local()
+        if simulated is not None and self.simulated is not simulated:
+            raise HostError(
+                "this host is simulated, and a real one is wanted"
+                if self.simulated
+                else "this host is a real one, and a simulated one is wanted"
+            )
+
+    @property
+    def simulated(self) -> bool:
+        """Whether the libraries that are loaded only simulate a host."""
+        return hasattr(ctypes.CDLL(_flat.__file__), "simhost_error")
+
+    # What it has
+
+    @property
+    def switches(self) -> "Mapping[str, Switch]":
+        """Its switches, by their aliases."""
+        return Live(self._aliases, self._get_switch, "switches")
+
+    def _aliases(self) -> Iterator[str]:
+        for handle in checked.DVSState_SwitchForEach():
+            alias = checked.DVS_SwitchName(handle)
+            if alias is not None:
+                yield alias
+
+    def _get_switch(self, alias: str) -> Switch:
+        checked.DVSAliasToSwitchId(alias)
+        return Switch(self, alias)
+
+    @property
+    def uplinks(self) -> "Mapping[str, Uplink]":
+        """The uplinks that its switches have, by their names; of others no call tells."""
+        return Live(lambda: self._uplinks(), self._get_uplink, "uplinks")
+
+    def _uplinks(self) -> Dict[str, Uplink]:
+        running = [one for one in self.switches.values() if one.running]
+        return {name: uplink for switch in running for name, uplink in switch.uplinks.items()}
+
+    def _get_uplink(self, name: str) -> Uplink:
+        if find_port_of(name) is None:
+            raise NotFound(f"the uplink {name!r} is at no switch")
+        return self._uplinks()[name]
+
+    def ports(self) -> Iterator[Port]:
+        """All ports for clients, of all switches."""
+        for switch in self.switches.values():
+            yield from switch.ports.values()
+
+    def find_mac(self, mac: str) -> Tuple[MacEntry, ...]:
+        """Where an address is, in any spelling: the entries of all tables that have it."""
+        wanted = _words.mac(mac)
+        running = (one for one in self.switches.values() if one.running)
+        return tuple(entry for one in running for entry in one.macs if entry.mac == wanted)
+
+    def state(self) -> Dict[str, Words]:
+        """The host as a document: ready for JSON, in the words of scenario documents."""
+        return _describing.host_state(self)
+
+    # Its own settings
+
+    @property
+    def options(self) -> Options:
+        """Its runtime options, by their names."""
+        return Options(self)
+
+    @property
+    def mac_learning(self) -> MacLearning:
+        """MAC learning of the switches that have no setting of their own."""
+        return _records.learning_from(checked.VSQEX_GetGlobalMACLearningProps())
+
+    @mac_learning.setter
+    def mac_learning(self, given: MacLearning) -> None:
+        known = _table.SWITCH["mac_learning"]
+        held = _words.read(known.form, to_words(known.form, given), "mac_learning")
+        self._note(_undo.HostLearning, self)
+        self._set_mac_learning(MacLearning.from_words(held))
+
+    def _set_mac_learning(self, learning: MacLearning) -> None:
+        checked.VSQEX_SetGlobalMACLearningProps(
+            _vs.VSMACLearningGlobalProps(
+                agingTime=learning.aging_time,
+                macLimit=learning.limit,
+                learnStatic=learning.learn_static,
+            )
+        )
+
+    # What can be done with it
+
+    def add_switch(
+        self,
+        alias: str,
+        *,
+        identifier: Optional[str] = None,
+        portset: Optional[str] = None,
+        max_ports: int = 0,
+        persistent: bool = True,
+        version: int = 0,
+        mtu: int = 0,
+        uplinks: Iterable[str] = (),
+    ) -> Switch:
+        """Adds a switch, with uplinks of the host. The host chooses what is not given."""
+        switch = Switch(self, alias)
+        named = _words.items(uplinks, "uplinks")
+        with self._whole():
+            self._note(_undo.Added, switch)
+            checked.VSDVS_CreateVSwitch(
+                alias, identifier, portset, max_ports, persistent, version, mtu, 0
+            )
+            for name in named:
+                switch.add_uplink(name)
+        return switch
+
+    def transaction(self) -> Transaction:
+        """A block that changes everything or nothing; see Transaction."""
+        return Transaction(self)
+
+    def _whole(self) -> Transaction:
+        """Several writes that are one to the caller, who gets what they raise."""
+        return Transaction(self, raises=False)
+
+    # What transactions are told
+
+    @property
+    def _transaction(self) -> Optional[Transaction]:
+        found: Optional[Transaction] = getattr(self._here, "transaction", None)
+        return found
+
+    @_transaction.setter
+    def _transaction(self, current: Optional[Transaction]) -> None:
+        self._here.transaction = current
+
+    def _note(self, step: Callable[..., _undo.Step], *about: Any) -> None:
+        """Before a write: a transaction notes what is there."""
+        if self._transaction is not None:
+            self._transaction.note(step(*about))
+
+    def _note_properties(self, thing: Thing, keys: Tuple[str, ...]) -> None:
+        self._note(_undo.Properties, thing, keys)
+
+    def __repr__(self) -> str:
+        return f"<Host{' (simulated)' if self.simulated else ''}: {', '.join(self.switches)}>"

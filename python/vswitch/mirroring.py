@@ -1,0 +1,92 @@
+"""A mirror session for the time of a block."""
+
+import itertools
+import os
+import time
+import typing
+from types import TracebackType
+from typing import Any, Dict, Iterator, Optional, Type, Union
+
+from libvswitch import checked
+from libvswitch.errors import HostError, NotFound, NotRestored
+from vswitch import _describing, _records
+from vswitch.uplink import Uplink
+from vswitch.values import Mirror, MirrorEnd, MirrorStats
+
+if typing.TYPE_CHECKING:
+    from vswitch.port import Port
+
+__all__ = ["Mirroring"]
+
+_counted = itertools.count(1)
+
+
+class Mirroring:
+    """What `Port.mirrored` begins: what the port receives and sends goes to another, too.
+
+    `to` is a port or an uplink; a text is the identifier of a port. Further settings are those of a
+    Mirror. The session is there when the block begins, and is removed whatever happens; NotRestored
+    says that it could not be.
+    """
+
+    def __init__(
+        self, port: "Port", to: "Union[Port, Uplink, MirrorEnd, str]", settings: Dict[str, Any]
+    ) -> None:
+        source = MirrorEnd(port=port.id)
+        held: Dict[str, Any] = {"received_by": (source,), "sent_by": (source,), **settings}
+        # One of each block: two tools may mirror the same port.
+        held.setdefault("sid", f"vswitch-{os.getpid()}-{next(_counted)}")
+        self.port = port
+        self.mirror = Mirror(to=(_end(to),), **held)
+
+    @property
+    def stats(self) -> MirrorStats:
+        """What the session counted up to now."""
+        return _describing.mirror_stats(self.port.switch.alias, self.mirror.sid)
+
+    def sample(self, seconds: float, every: float = 1.0) -> Iterator[MirrorStats]:
+        """What it counted: now, every so many seconds, and when they are over."""
+        end = time.monotonic() + seconds
+        while True:
+            yield self.stats
+            left = end - time.monotonic()
+            if left <= 0:
+                return
+            time.sleep(min(every, left))
+
+    def __enter__(self) -> "Mirroring":
+        sessions = [_records.session_of(self.mirror)]
+        try:
+            checked.VSDVS_AppendDVMirrorSessions(*self.port.owner, sessions)
+        except HostError as error:
+            # What is refused is not there; what traps may be.
+            if error.status is None:
+                self._remove()
+            raise
+        return self
+
+    def __exit__(
+        self,
+        kind: Optional[Type[BaseException]],
+        raised: Optional[BaseException],
+        trace: Optional[TracebackType],
+    ) -> None:
+        self._remove()
+
+    def _remove(self) -> None:
+        sid = self.mirror.sid
+        try:
+            checked.VSDVS_RemoveDVMirrorSession(*self.port.owner, sid)
+        except NotFound:
+            return
+        except HostError as error:
+            left = f"{self.port.path}: mirror session {sid}"
+            raise NotRestored(f"{left} is still there: {error}", left=(left,)) from error
+
+
+def _end(to: "Union[Port, Uplink, MirrorEnd, str]") -> MirrorEnd:
+    if isinstance(to, MirrorEnd):
+        return to
+    if isinstance(to, Uplink):
+        return MirrorEnd(uplink=to.name)
+    return MirrorEnd(port=to if isinstance(to, str) else to.id)

@@ -1,0 +1,84 @@
+"""A block of changes that is undone when it does not end well."""
+
+import typing
+from types import TracebackType
+from typing import Dict, List, Optional, Type
+
+from libvswitch.errors import HostError, NotRestored, RolledBack
+from vswitch._undo import Step
+
+if typing.TYPE_CHECKING:
+    from vswitch.host import Host
+
+__all__ = ["Transaction"]
+
+
+class Transaction:
+    """What `Host.transaction` begins.
+
+    Before each first write it notes what is there: of a property the exact bytes and the property
+    type, or that it is not set. When the block raises, that is put back, the last write first:
+    RolledBack, with what was raised as its cause. NotRestored names what could not be put back.
+    Transactions may lie in one another. Only what is done through the same Host, in the same
+    thread, is noted.
+    """
+
+    def __init__(self, host: "Host", raises: bool = True) -> None:
+        self._host = host
+        self._raises = raises
+        self._steps: List[Step] = []
+        self._outer: Optional[Transaction] = None
+
+    def __enter__(self) -> "Transaction":
+        self._outer = self._host._transaction
+        self._host._transaction = self
+        return self
+
+    def note(self, step: Step) -> None:
+        self._steps.append(step)
+
+    def __exit__(
+        self,
+        kind: Optional[Type[BaseException]],
+        raised: Optional[BaseException],
+        trace: Optional[TracebackType],
+    ) -> None:
+        self._host._transaction = self._outer
+        if raised is None:
+            if self._outer is not None:
+                self._outer._steps += self._steps
+            return
+        # The words of an error name what the host has when they are made: now.
+        words = str(raised) or type(raised).__name__
+        left = self._roll_back()
+        if left:
+            raise NotRestored(f"{words}; not as it was: {'; '.join(left)}", left=left) from raised
+        # What ends a program goes on doing so, and so does what is raised in `_whole`.
+        if self._raises and isinstance(raised, Exception):
+            raise RolledBack(f"{words}; everything is as it was before") from raised
+
+    def _roll_back(self) -> List[str]:
+        """Undoes all steps, and says what is left.
+
+        After each it is as it was before that write, if all is well. What one could not put back,
+        an earlier one about the same may have.
+        """
+        left: Dict[str, List[str]] = {}
+        for step in reversed(self._steps):
+            found = _undone(step)
+            if not found and step.is_whole():
+                left = {what: lines for what, lines in left.items() if not step.has(what)}
+            left[step.what()] = found
+        return [line for lines in reversed(list(left.values())) for line in lines]
+
+
+def _undone(step: Step) -> List[str]:
+    """Undoes a step; what is left of it."""
+    try:
+        step.undo()
+    except HostError:
+        pass  # what is there now says more
+    try:
+        return step.left()
+    except HostError as error:
+        return [f"{step.what()} (nobody knows: {error})"]

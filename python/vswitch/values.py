@@ -1,0 +1,442 @@
+"""Values of settings, and of what the host tells: frozen, compared by what they hold.
+
+A value of a setting takes the words of documents as well as members of the enums, is checked when
+it is made, and says itself in words with `words()`.
+"""
+
+import dataclasses
+from dataclasses import dataclass
+from typing import Any, Callable, ClassVar, Dict, List, Optional, Tuple, Type, TypeVar, Union
+
+from libvswitch.enums import (
+    Balance,
+    Criteria,
+    EthernetFilter,
+    LinkState,
+    MacType,
+    TeamFlags,
+)
+from vswitch import _table, words as _words
+from vswitch._table import Form
+
+__all__ = [
+    "Change",
+    "Encapsulation",
+    "Event",
+    "FrameFilter",
+    "Group",
+    "Lag",
+    "MacEntry",
+    "MacLearning",
+    "Mirror",
+    "MirrorEnd",
+    "MirrorStats",
+    "PortMacLearning",
+    "PortStats",
+    "PrivateVlan",
+    "SwitchStats",
+    "Teaming",
+    "Vlan",
+]
+
+V = TypeVar("V", bound="SettingValue")
+Words = Any
+"""A value as JSON has it."""
+
+
+def to_words(form: Form, value: object) -> Words:
+    """What a value is in the words of documents; what is no value of the kind stays as it is."""
+    kind = form["form"]
+    if kind == "choice" and isinstance(value, int):
+        return next((word for word, one in form["choices"].items() if one == value), str(value))
+    if kind == "bits":
+        if isinstance(value, int):
+            return [word for word, bit in form["choices"].items() if value & bit]
+        if isinstance(value, str):
+            return value.split(",") if value else []
+        return list(value) if isinstance(value, (tuple, set, frozenset)) else value
+    if isinstance(value, SettingValue):
+        return value.words()
+    if kind == "list" and form["element"]["form"] == "range":
+        return value if value is not None else []
+    if kind == "list" and isinstance(value, (list, tuple)):
+        return [to_words(form["element"], one) for one in value]
+    return value
+
+
+@dataclass(frozen=True)
+class SettingValue:
+    """What the values of settings have in common: their form in the table of settings."""
+
+    _form: ClassVar[Form]
+    _types: ClassVar[Dict[str, Callable[[Any], Any]]] = {}
+
+    def __post_init__(self) -> None:
+        given = {}
+        for one in self._form["members"]:
+            value = getattr(self, one["name"])
+            if value is not None:
+                given[one["name"]] = to_words(one, value)
+        held = _words.read(self._form, given, type(self).__name__)
+        for name, value in held.items():
+            object.__setattr__(self, name, self._natural(name, value))
+
+    @classmethod
+    def known(cls: Type[V], **fields: Any) -> V:
+        """What the host told, which nothing has to check, nor to know."""
+        made = cls.__new__(cls)
+        for one in dataclasses.fields(cls):
+            object.__setattr__(made, one.name, fields.get(one.name, one.default))
+        return made
+
+    @classmethod
+    def from_words(cls: Type[V], held: Words) -> V:
+        """From what `words.read` made of a document."""
+        fields = {name: cls._natural(name, value) for name, value in held.items()}
+        return cls.known(**fields)
+
+    @classmethod
+    def _natural(cls, name: str, held: Words) -> Any:
+        """The value of a member that is said in words."""
+        form = _table.member(cls._form, name)
+        assert form is not None
+        return natural(form, held, cls._types.get(name))
+
+    def words(self) -> Words:
+        """The value as JSON has it, and documents say it."""
+        said = {}
+        for one in self._form["members"]:
+            name = one["name"]
+            value = getattr(self, name)
+            if value is None:
+                continue
+            if "always" in one or "required" in one or not self._is_absent(name, value):
+                said[name] = to_words(one, _trunk_words(value) if name == "trunk" else value)
+        alone = self._form.get("alone")
+        if alone and set(said) <= {alone}:
+            return getattr(self, alone)
+        return said
+
+    @classmethod
+    def _is_absent(cls, name: str, value: object) -> bool:
+        default: object = next(one.default for one in dataclasses.fields(cls) if one.name == name)
+        return value == default
+
+
+def natural(form: Form, held: Words, kind: Optional[Callable[[Any], Any]] = None) -> Any:
+    """The value that words say, of the kind that is its own."""
+    what = form["form"]
+    if what == "choice":
+        return kind(form["choices"][held]) if kind else held
+    if what == "bits":
+        return kind(sum(form["choices"][word] for word in held)) if kind else tuple(held)
+    if what == "list" and form["element"]["form"] == "range":
+        return ",".join(str(one) for one in held) or None
+    if what == "list":
+        return tuple(natural(form["element"], one, kind) for one in held)
+    if what in ("record", "one_of") and kind:
+        return kind(held)
+    return held
+
+
+def _trunk_words(trunk: Optional[str]) -> List[Union[int, str]]:
+    parts = trunk.split(",") if trunk else []
+    return [part if "-" in part else int(part) for part in parts]
+
+
+@dataclass(frozen=True)
+class Vlan(SettingValue):
+    """The VLANs of a port, all of them.
+
+    `trunk` are those that its client tags itself, as "10-12,20"; a list of numbers and ranges is
+    taken, too. `priority` is that of its frames. With `private`, `id` is the secondary VLAN of one
+    of the switch's private VLANs.
+    """
+
+    id: int = 0
+    trunk: Optional[str] = None
+    priority: Optional[int] = None
+    private: bool = False
+    guest_tagging: bool = False
+
+    _form: ClassVar[Form] = _table.PORT["vlan"].form
+
+
+@dataclass(frozen=True)
+class Teaming(SettingValue):
+    """Which uplinks carry what ports send. None named means all of the switch."""
+
+    balance: Balance = Balance.PORT
+    active: Tuple[str, ...] = ()
+    standby: Tuple[str, ...] = ()
+    flags: TeamFlags = TeamFlags.ALL_AVAILABLE | TeamFlags.NOTIFY
+    criteria: Criteria = Criteria.LINK
+    speed: int = 0
+    full_duplex: bool = False
+    error_percent: int = 0
+
+    _form: ClassVar[Form] = _table.SWITCH["teaming"].form
+    _types: ClassVar[Dict[str, Callable[[Any], Any]]] = {
+        "balance": Balance,
+        "flags": TeamFlags,
+        "criteria": Criteria,
+    }
+
+
+@dataclass(frozen=True)
+class MacLearning(SettingValue):
+    """MAC learning of the host or of a switch; the time in seconds."""
+
+    aging_time: int = 300
+    limit: int = 65536
+    learn_static: bool = False
+
+    _form: ClassVar[Form] = _table.SWITCH["mac_learning"].form
+
+
+@dataclass(frozen=True)
+class PortMacLearning(SettingValue):
+    """MAC learning of a port; `limit_policy` is `allow` or `drop`."""
+
+    learning: bool = False
+    flooding: bool = False
+    limit: int = 4096
+    limit_policy: str = "allow"
+    mac_change: bool = False
+
+    _form: ClassVar[Form] = _table.PORT["mac_learning"].form
+
+
+@dataclass(frozen=True)
+class FrameFilter(SettingValue):
+    """Frames that a port takes beside those for its client, and multicast addresses."""
+
+    frames: EthernetFilter = EthernetFilter(0)
+    addresses: Tuple[str, ...] = ()
+
+    _form: ClassVar[Form] = _table.PORT["ethernet_filter"].form
+    _types: ClassVar[Dict[str, Callable[[Any], Any]]] = {"frames": EthernetFilter}
+
+
+@dataclass(frozen=True)
+class PrivateVlan(SettingValue):
+    """A private VLAN of a switch; `type` is `promiscuous`, `isolated` or `community`."""
+
+    primary: int
+    secondary: int
+    type: str
+
+    _form: ClassVar[Form] = _table.SWITCH["private_vlans"].form["element"]
+
+
+_SESSION = _table.PORT["mirror_sessions"].form["element"]
+
+
+def _in_session(name: str) -> Form:
+    form = _table.member(_SESSION, name)
+    assert form is not None
+    return form
+
+
+@dataclass(frozen=True)
+class Encapsulation(SettingValue):
+    """How mirrored frames are wrapped."""
+
+    type: str = "gre"
+    key: int = 0
+    vlan: int = 0
+    id: int = 0
+    cos: int = 0
+    granularity: int = 0
+
+    _form: ClassVar[Form] = _in_session("encapsulation")
+
+
+@dataclass(frozen=True)
+class MirrorEnd(SettingValue):
+    """What a session mirrors to or from: one of these."""
+
+    port: Optional[str] = None
+    uplink: Optional[str] = None
+    vlan: Optional[int] = None
+    ip: Optional[str] = None
+    number: Optional[int] = None
+
+    _form: ClassVar[Form] = _in_session("to")["element"]
+
+
+def _end(held: Words) -> MirrorEnd:
+    return MirrorEnd.from_words(held)
+
+
+@dataclass(frozen=True)
+class Mirror(SettingValue):
+    """A mirror session of a port."""
+
+    sid: str
+    name: str = ""
+    type: str = "port"
+    snap_length: int = 0
+    sampling_rate: int = 0
+    disabled: bool = False
+    promiscuous: bool = False
+    to: Tuple[MirrorEnd, ...] = ()
+    received_by: Tuple[MirrorEnd, ...] = ()
+    sent_by: Tuple[MirrorEnd, ...] = ()
+    encapsulation: Encapsulation = Encapsulation()
+    encapsulates: bool = False
+    keeps_vlan: bool = False
+    no_output: bool = False
+    no_input: bool = False
+    mirrors_uplinks: bool = False
+    uplink_filter: str = "none"
+    received_from: Tuple[str, ...] = ()
+    sent_from: Tuple[str, ...] = ()
+    stack: bool = False
+
+    _form: ClassVar[Form] = _SESSION
+    _types: ClassVar[Dict[str, Callable[[Any], Any]]] = {
+        "to": _end,
+        "received_by": _end,
+        "sent_by": _end,
+        "encapsulation": Encapsulation.from_words,
+    }
+
+
+# What the host tells
+
+
+@dataclass(frozen=True)
+class MacEntry:
+    """An address, where it is, and for how many seconds it has not been seen.
+
+    Without a port it is beyond the uplinks.
+    """
+
+    mac: str
+    type: MacType
+    vlan: int
+    age: int
+    switch: str
+    port: Optional[str] = None
+    vni: int = 0
+    ages: bool = False
+
+    def words(self) -> Dict[str, Words]:
+        """The entry as documents say it in the place where it is."""
+        said = {"mac": self.mac, "vlan": self.vlan, "vni": self.vni, "type": str(self.type)}
+        return {**said, "ages": self.ages, "age": self.age}
+
+
+@dataclass(frozen=True)
+class Group:
+    """A multicast group that a port has joined, and its sources."""
+
+    address: str
+    version: int = 0
+    source_mode: str = "none"
+    sources: Tuple[str, ...] = ()
+    vni: int = 0
+
+
+@dataclass(frozen=True)
+class Lag:
+    """A link-aggregation group of a switch."""
+
+    name: str
+    link: LinkState
+    uplinks: Tuple[str, ...]
+
+
+@dataclass(frozen=True)
+class Change:
+    """What changes: where, and both values in the words of documents; None is what is not there."""
+
+    path: str
+    before: Words
+    after: Words
+
+    def __str__(self) -> str:
+        return f"{self.path}: {shown(self.before)} -> {shown(self.after)}"
+
+
+@dataclass(frozen=True)
+class Event:
+    """What changed on the host: when, in seconds since 1970, and what kind of thing."""
+
+    at: float
+    kind: str
+    path: str
+    before: Words
+    after: Words
+
+    def __str__(self) -> str:
+        return f"{self.path}: {shown(self.before)} -> {shown(self.after)}"
+
+
+def shown(value: Words) -> str:
+    """A value in the words of documents, for people."""
+    if value is None:
+        return "absent"
+    if isinstance(value, bool):
+        return "true" if value else "false"
+    if isinstance(value, dict):
+        return " ".join(f"{name}={shown(one)}" for name, one in value.items()) or "none"
+    if isinstance(value, (list, tuple)):
+        return ",".join(shown(one) for one in value) or "none"
+    return str(value)
+
+
+# What is counted has the names that documents have for counters.
+
+
+@dataclass(frozen=True)
+class MirrorStats:
+    """What a running mirror session counted."""
+
+    mirrorPktCnt: int = 0
+    mirrorPktFailCnt: int = 0
+    mirroredPkts: int = 0
+    discardedPkts: int = 0
+    failedPkts: int = 0
+
+
+@dataclass(frozen=True)
+class PortStats:
+    """What a port and its MAC learning counted."""
+
+    pktsInUnicast: int = 0
+    bytesInUnicast: int = 0
+    pktsInMulticast: int = 0
+    bytesInMulticast: int = 0
+    pktsInBroadcast: int = 0
+    bytesInBroadcast: int = 0
+    pktsOutUnicast: int = 0
+    bytesOutUnicast: int = 0
+    pktsOutMulticast: int = 0
+    bytesOutMulticast: int = 0
+    pktsOutBroadcast: int = 0
+    bytesOutBroadcast: int = 0
+    pktsInDropped: int = 0
+    pktsOutDropped: int = 0
+    pktsInException: int = 0
+    pktsOutException: int = 0
+    numMACsLearned: int = 0
+    noLearningAllowedPkts: int = 0
+    noLearningDroppedPkts: int = 0
+    numMACsMoved: int = 0
+
+
+@dataclass(frozen=True)
+class SwitchStats:
+    """What the team of a switch counted."""
+
+    rarpPktsSent: int = 0
+    maxRARPTime: int = 0
+    rarpTime: int = 0
+    txFromSrvPort: int = 0
+    txUsingSrvPortFRP: int = 0
+    txUsingPktSrcPortFRP: int = 0
+    txErrors: int = 0
+    rxToSrvPort: int = 0
+    rxRpfOverride: int = 0
