@@ -1,9 +1,8 @@
 // VSQEX_*: the runtime options of the host.
-#include <cstring>
 #include <numeric>
 #include <vector>
 
-#include "abi/libvswitch/results.h"
+#include "abi/targets.h"
 #include "model/options/runtime_options.h"
 #include "vswitch/queries.h"
 
@@ -30,9 +29,7 @@ QEX_ReturnStatus VSQEX_GetRuntimeOptions(qex_uint16 const *ids, qex_uint16 count
     auto &output = require(options);
     auto const types = wanted_types(ids, count);
     auto const list = packed_runtime_options(call.transaction(), types);
-    auto *const memory = call.ledger().allocate(list.size(), call.name());
-    std::memcpy(memory, list.data(), list.size());
-    output = static_cast<VSRuntimeOptions *>(memory);
+    output = allocate<VSRuntimeOptions>(call, list);
   });
 }
 
