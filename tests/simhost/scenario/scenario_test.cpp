@@ -434,7 +434,7 @@ TEST_F(Scenario, AnEncapsulatedSessionIsSaidWhole) {
                          .value;
   auto const session = simhost::record_at<DVMirrorSession>(
       simhost::BytesView(table).subspan(sizeof(DVMirrorSessionTable)));
-  EXPECT_EQ(session.encapType, DVMIRROR_ENCAP_ERSPAN2);
+  EXPECT_EQ(DVMirrorEncapType{session.encapType}, DVMIRROR_ENCAP_ERSPAN2);
   EXPECT_EQ(qex_uint32{session.greKey}, 9U);
   EXPECT_EQ(qex_uint16{session.encapVlan}, 30);
   EXPECT_EQ(qex_uint16{session.erspanID}, 4);
