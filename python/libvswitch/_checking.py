@@ -5,12 +5,11 @@ it, a text for a truth, null where nothing allows it, an integer that C has no r
 """
 
 import ctypes
-import socket
 import typing
-from typing import Any, Callable, Dict, List, Tuple, TypeVar, Union
+from typing import Any, Callable, List, Tuple, TypeVar, Union
 
 import _libvswitch as _flat
-from libvswitch import _pointers, _records, cells, errors
+from libvswitch import _checks, _pointers, _records, cells, errors
 
 T = TypeVar("T")
 Problem = Union[int, BaseException]
@@ -145,33 +144,29 @@ def names(name: str, values: typing.Iterable[str], make: Callable[[int], Any]) -
     return made
 
 
-_FORMS: Dict[int, Tuple[int, int]] = {
-    _flat.VS_MCAST_FILTER_MODE_IGMP: (socket.AF_INET, 4),
-    _flat.VS_MCAST_FILTER_MODE_MLD: (socket.AF_INET6, 16),
-}
-
-
 def group(mode: int, address: Union[str, bytes]) -> bytes:
     """The bytes of a group's address in the form of a mode."""
-    family, size = _FORMS.get(mode, (0, 6))
-    held = address
-    if isinstance(address, str):
-        try:
-            by_form = bytes.fromhex(address.replace(":", " ").replace("-", " "))
-            held = by_form if not family else b""
-        except ValueError:
-            held = b""
-        if family:
-            try:
-                held = socket.inet_pton(family, address)
-            except OSError:
-                held = b""
-    elif not isinstance(address, bytes):
+    if not isinstance(address, (str, bytes)):
         raise TypeError(f"group is an address, not {type(address).__name__}")
+    size = _checks.FORMS.get(mode, 6)
+    held = address if isinstance(address, bytes) else _parsed(mode, address)
     if len(held) != size:
         raise ValueError(f"group is an address of {size} bytes for this mode, not {address!r}")
-    assert isinstance(held, bytes)
     return held
+
+
+def _parsed(mode: int, address: str) -> bytes:
+    """The bytes of an address that is written in the form of a mode, or none."""
+    import socket  # takes a tenth of the time to import this module, and few programs need it
+
+    try:
+        if mode == _flat.VS_MCAST_FILTER_MODE_IGMP:
+            return socket.inet_pton(socket.AF_INET, address)
+        if mode == _flat.VS_MCAST_FILTER_MODE_MLD:
+            return socket.inet_pton(socket.AF_INET6, address)
+        return bytes.fromhex(address.replace(":", " ").replace("-", " "))
+    except (OSError, ValueError):
+        return b""
 
 
 # Outputs

@@ -2,7 +2,10 @@
 
 import gc
 import pickle
+import re
 import signal
+import subprocess
+import sys
 import threading
 from types import FrameType
 from typing import Any, Callable, List, Optional, Type, Union
@@ -523,3 +526,27 @@ def test_groups_of_every_form(host: Host) -> None:
         assert stats.entries == ()
     stats = checked.VSQEX_GetMcastFilterStats(SWITCH, web_2, Multicast.MLD, "ff02::fb")
     assert stats.version == 2
+
+
+@pytest.mark.parametrize(
+    "mode, address, size",
+    [
+        (Multicast.LEGACY, "01:00:5e:01:01", 6),
+        (Multicast.LEGACY, "somewhere", 6),
+        (Multicast.IGMP, "ff02::fb", 4),
+        (Multicast.IGMP, "224.0.0.1\0", 4),
+        (Multicast.MLD, "224.0.0.1", 16),
+        (Multicast.MLD, bytes(4), 16),
+    ],
+)
+def test_a_group_that_is_no_address_of_its_form(
+    host: Host, mode: Multicast, address: Union[str, bytes], size: int
+) -> None:
+    message = f"group is an address of {size} bytes for this mode, not {address!r}"
+    with pytest.raises(ValueError, match=f"^{re.escape(message)}$"):
+        checked.VSQEX_GetMcastFilterStats(SWITCH, number(), mode, address)
+
+
+def test_what_few_programs_need_is_imported_late() -> None:
+    program = "import sys, libvswitch.checked; print({'socket', 'inspect'} & {*sys.modules})"
+    assert subprocess.check_output([sys.executable, "-c", program], text=True) == "set()\n"
