@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <string_view>
 
 #include "abi/boundary.h"
@@ -60,6 +61,13 @@ TEST(Calls, WaitForFaultsAndTheStateTogether) {
   EXPECT_LT(after_faults, simhost::storage::kPatience);
   call.transaction();
   EXPECT_LT(call.patience().left(), after_faults);
+}
+
+TEST(Calls, AreDelayedAnHourAtMostByAllTheirFaults) {
+  using std::chrono::minutes;
+  simhost::Fault const fault{.function = kCall, .delay = minutes(40), .status = QEX_OK};
+  EXPECT_EQ(simhost::delay_of({fault}), minutes(40));
+  EXPECT_EQ(simhost::delay_of({fault, fault}), minutes(60));
 }
 
 void run_within_a_call() {

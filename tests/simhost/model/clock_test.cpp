@@ -2,9 +2,11 @@
 #include "clock/clock.h"
 
 #include <chrono>
+#include <cstdint>
 #include <thread>
 
 #include "memory_state.h"
+#include "storage/running/clock.h"
 
 namespace {
 
@@ -61,11 +63,24 @@ TEST_F(Clock, RunsOnFromWhatItShows) {
   EXPECT_LE(shown, seconds(7) + (real_time() - before) + milliseconds(1));
 }
 
-TEST_F(Clock, NeverGoesBackByAStep) {
+TEST_F(Clock, NeverStepsBack) {
   EXPECT_EQ(status_of([&] { simhost::step_clock(transaction, milliseconds(-1)); }), QEX_BAD_PARAM);
   EXPECT_EQ(status_of([&] { simhost::step_clock(transaction, ClockTime::max()); }), QEX_BAD_PARAM);
   EXPECT_EQ(status_of([&] { simhost::set_clock(transaction, milliseconds(-1)); }), QEX_BAD_PARAM);
   EXPECT_EQ(status_of([&] { simhost::set_clock(transaction, ClockTime::max()); }), QEX_BAD_PARAM);
+}
+
+TEST_F(Clock, ShowsNothingThatCannotBeSet) {
+  using simhost::storage::put_clock;
+  constexpr std::chrono::hours kLong{24 * 365 * 1000};
+  for (bool const stopped : {false, true}) {
+    put_clock(transaction, {.stopped = stopped, .value = -kLong});
+    EXPECT_EQ(simhost::clock_now(transaction), ClockTime::zero());
+    put_clock(transaction, {.stopped = stopped, .value = ClockTime(std::int64_t{3} << 60)});
+    auto const end = simhost::clock_now(transaction);
+    EXPECT_EQ(status_of([&] { simhost::set_clock(transaction, end); }), QEX_OK);
+    EXPECT_EQ(status_of([&] { simhost::step_clock(transaction, milliseconds(1)); }), QEX_BAD_PARAM);
+  }
 }
 
 }  // namespace

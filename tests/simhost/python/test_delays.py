@@ -26,6 +26,24 @@ print(vs.VSDVS_SetMTU("vswitch0", 3000))
     assert written.split() == ["interrupted", "0"]
 
 
+def test_a_signal_that_reaches_another_thread_ends_it_too(run: Callable[[str], str]) -> None:
+    """The system then interrupts nothing in the thread that waits."""
+    written = run(
+        HOUR
+        + """
+def send():
+    signal.pthread_kill(threading.get_ident(), signal.SIGINT)
+
+threading.Timer(0.1, send).start()
+try:
+    print(vs.VSDVS_SetMTU("vswitch0", 2000))
+except KeyboardInterrupt:
+    print("interrupted")
+"""
+    )
+    assert written == "interrupted\n"
+
+
 def test_a_handler_that_raises_nothing_ends_no_delay(run: Callable[[str], str]) -> None:
     written = run(
         """
