@@ -6,7 +6,7 @@ place: the same names, arguments and results, compiled where the peer compiles. 
 peer is used as its documentation has it: attributes and methods of classes, compiled functions
 called directly, texts encoded and decoded where it takes bytes. The classes of libvswitch stand
 beside those of a peer in a third table, in a process without the flat module's figures: once they
-are loaded, the flat functions answer instances of them.
+are loaded, the flat functions return instances of them.
 """
 
 import importlib

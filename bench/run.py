@@ -155,7 +155,7 @@ def main() -> None:
     make_twin(build)
     returned = ask_all(build, core)
     if mistakes := list(wrong(returned)):
-        sys.exit("bench: these peers answer something else:\n" + "\n".join(mistakes))
+        sys.exit("bench: these peers return something else:\n" + "\n".join(mistakes))
     progress = Progress()
     times = calls.measure(build, core, **settings, progress=progress)
     middle = {form: middle_of(rows) for form, rows in times.items()}

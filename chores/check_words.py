@@ -8,7 +8,7 @@ word to take instead. The status is 1 if there is one.
 import re
 import sys
 from pathlib import Path
-from typing import Iterator, List, NamedTuple, Pattern
+from typing import Iterator, List, NamedTuple, Pattern, Tuple
 
 SUFFIXES = {".c", ".cpp", ".h", ".i", ".inc", ".py", ".pyi", ".sh", ".md", ".rst", ".txt", ".cmake"}
 SUFFIXES |= {".in", ".toml", ".json", ".svg", ".css", ".js"}
@@ -31,12 +31,20 @@ class Rule(NamedTuple):
     instead: str
     allowed: Pattern[str]
     why: str
-    # Identifiers of the simulated host; elsewhere the same word may be plain English.
-    only_below: str = ""
+    # Elsewhere the same word may be plain English.
+    only_below: Tuple[str, ...] = ("",)
+
+
+HOST = ("simhost",)
+PRODUCT = (*HOST, "docs", "examples", "helpers", "include", "interface", "python")
 
 
 def rule(
-    unwanted: str, instead: str, allowed: str = r"(?!)", why: str = "", below: str = ""
+    unwanted: str,
+    instead: str,
+    allowed: str = r"(?!)",
+    why: str = "",
+    below: Tuple[str, ...] = ("",),
 ) -> Rule:
     return Rule(
         re.compile(unwanted, re.IGNORECASE), instead, re.compile(allowed, re.IGNORECASE), why, below
@@ -65,6 +73,13 @@ RULES = [
         r"\banswer(?:s|ed|ing)\b|\b(?:to|can|cannot|may|must|will|would|not|should) answer\b",
         "returns",
     ),
+    rule(
+        r"\banswer\b",
+        "result, status",
+        r"[\"']answer[\"']|\| Answer \|",
+        "a column of calls.json and calls.md, which programs read",
+        below=PRODUCT,
+    ),
     rule(r"\bhand(?:s|ed|ing)? (?:\w+ )?out\b", "allocates (memory), returns (values)"),
     rule(
         r"\b(?:giv(?:e|es|en|ing)|gave|goes|go|went) (?:\w+ ){0,2}back\b",
@@ -85,17 +100,17 @@ RULES = [
         "a plane does",
     ),
     rule(r"\bfurnish\w*\b|\bmeet_faults\b", "populate, inject"),
-    rule(r"\bstrikes?\(|\baside\(", "apply, unlocked", below="simhost"),
+    rule(r"\bstrikes?\(|\baside\(", "apply, unlocked", below=HOST),
     rule(
         r"\bknown_\w+\(|(?<!> )(?<![>.:])\b(?:found|required)\(",
         "find_*, get_*, require_*",
-        below="simhost",
+        below=HOST,
     ),
-    rule(r"\bTransaction (?:const )?&work\b|\bwork\.", "transaction", below="simhost"),
+    rule(r"\bTransaction (?:const )?&work\b|\bwork\.", "transaction", below=HOST),
     rule(
         r"\bdescribed\(|\bis_said_whole\b|\bkept_elsewhere\b",
         "to_json, round_trips, computed",
-        below="simhost",
+        below=HOST,
     ),
 ]
 
@@ -123,18 +138,27 @@ def texts(root: Path, left_out: List[str]) -> Iterator[Path]:
             yield path
 
 
+def spoken(line: str) -> str:
+    """The line with the words of its identifiers apart."""
+    return re.sub(r"_|(?<=[a-z0-9])(?=[A-Z])", " ", line)
+
+
+def unwanted(one: Rule, line: str) -> Iterator[str]:
+    right = [found.span() for found in one.allowed.finditer(line)]
+    for found in one.unwanted.finditer(line):
+        if not any(start <= found.start() and found.end() <= end for start, end in right):
+            yield found[0]
+
+
 def findings(root: Path, left_out: List[str]) -> Iterator[Finding]:
     for path in texts(root, left_out):
         place = str(path.relative_to(root))
         rules = [one for one in RULES if place.startswith(one.only_below)]
         for number, line in enumerate(path.read_text(encoding="utf-8").splitlines(), start=1):
             for one in rules:
-                right = [found.span() for found in one.allowed.finditer(line)]
-                for found in one.unwanted.finditer(line):
-                    if not any(
-                        start <= found.start() and found.end() <= end for start, end in right
-                    ):
-                        yield Finding(place, number, found[0], one.instead)
+                # Some rules are of identifiers as they are written.
+                found = [*unwanted(one, line)] or [*unwanted(one, spoken(line))]
+                yield from (Finding(place, number, said, one.instead) for said in found)
 
 
 def main(root: Path) -> int:

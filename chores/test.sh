@@ -23,7 +23,7 @@
 # The Python tests find the module, and those that exist for the tests alone, through PYTHONPATH,
 # and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
 # where LD_LIBRARY_PATH puts the recording host in place of the simulated one; so do those of
-# tests/classes and tests/vswitch, for once the classes are loaded the flat functions answer instances
+# tests/classes and tests/vswitch, for once the classes are loaded the flat functions return instances
 # of them. By hand:
 #   export BUILD_DIR=$PWD/build PYTHONPATH=$PWD/build/python:$PWD/build/tests/python
 #   /usr/bin/python3 -m pytest tests --ignore=tests/contract --ignore=tests/classes \

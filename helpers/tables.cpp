@@ -1,4 +1,4 @@
-// Bodies of the methods of tables that queries answer; see tables.h.
+// Bodies of the methods of tables that queries return; see tables.h.
 
 #include "helpers/tables.h"
 

@@ -1,5 +1,5 @@
 /**
- * Methods of the tables that queries answer: multicast filters, MAC tables, mirror session
+ * Methods of the tables that queries return: multicast filters, MAC tables, mirror session
  * identifiers, destinations of promiscuous sessions.
  *
  * Warning: where no check is mentioned there is none; bound the index by the record's `numEntries`.

@@ -19,7 +19,7 @@ _RESETS = {
     "DVSQEX_StateInit",
 }
 
-# The flat module discards what these write; another call has the same answer.
+# The flat module discards what these write; another call has the same outputs.
 _ASKED_ELSEWHERE = {
     "DVSAliasToSwitchId": "DVS_SwitchId({state}DVSState_SwitchFindByAlias({given}))",
     "DVSPortsetNameToAlias": "VSDVS_GetAliasFromPortset({given})[1]",
@@ -536,7 +536,7 @@ class _Writer:
         return [
             "try:",
             f'    status = _flat.{self._call.name}({given}, "")',
-            "    # The flat module discards what that writes; another call has the same answer.",
+            "    # The flat module discards what that writes; another call has the same outputs.",
             f"    result = _flat.{asked} if status == 0 else None",
             *self._caught(),
             *self._failed("status != 0 or result is None"),

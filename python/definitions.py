@@ -158,7 +158,7 @@ class Definitions:
             found.setdefault(one.name, []).append(one)
         return found
 
-    def records_behind_pointers(self) -> List[str]:
+    def pointee_records(self) -> List[str]:
         """Records that calls allocate through a pointer to a pointer of the caller's."""
         original = (self.resolve(one.type) for call in self.functions for one in call.inputs)
         names = {one.name for one in original if one.layers == ("p", "p")}

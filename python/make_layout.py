@@ -52,7 +52,7 @@ def of_types(known: Definitions) -> Dict[str, Any]:
             for resolved in [known.resolve(type_)]
             if not resolved.layers and resolved.name in NUMBERS and " " not in name
         },
-        "RECORDS_BEHIND_POINTERS": known.records_behind_pointers(),
+        "POINTEE_RECORDS": known.pointee_records(),
         "POINTERS": sorted(
             name
             for name, type_ in known.typedefs.items()

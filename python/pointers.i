@@ -34,13 +34,13 @@ static void keep_exception(PyObject *raised) {
 }
 
 static PyObject *call_guarded(PyObject *both, PyObject *arguments) {
-  PyObject *answer = PyObject_CallObject(PyTuple_GET_ITEM(both, 0), arguments);
-  int truth = !answer ? -1 : answer == Py_None ? 1 : PyObject_IsTrue(answer);
+  PyObject *result = PyObject_CallObject(PyTuple_GET_ITEM(both, 0), arguments);
+  int truth = !result ? -1 : result == Py_None ? 1 : PyObject_IsTrue(result);
   if (truth < 0) {
     keep_exception(PyTuple_GET_ITEM(both, 1));
     truth = 0;
   }
-  Py_XDECREF(answer);
+  Py_XDECREF(result);
   return PyLong_FromLong(truth);
 }
 
@@ -128,7 +128,7 @@ PyObject *write_memory(PyObject *object, size_t offset, PyObject *bytes) {
 }
 
 /* A function that returns 1 or 0, as another does by its truth, None being true; what that raises is
-   appended to a list, and the answer is 0. There is no frame of Python's in which it could be lost. */
+   appended to a list, and it returns 0. There is no frame of Python's in which it could be lost. */
 PyObject *guarded(PyObject *function, PyObject *raised) {
   PyObject *both = Py_BuildValue("OO", function, raised);
   PyObject *guard = both ? PyCFunction_New(&call_guarded_method, both) : NULL;

@@ -60,8 +60,8 @@ def row(name: str, library: str, fixed: Dict[str, str]) -> Row:
 def markdown(rows: List[Row]) -> str:
     lines = ["| Call | Library | Answer |", "|---|---|---|"]
     for entry in rows:
-        answer = entry["answer"] + (f": `{entry['status']}`" if "status" in entry else "")
-        lines.append(f"| `{entry['call']}` | {entry['library']} | {answer} |")
+        told = entry["answer"] + (f": `{entry['status']}`" if "status" in entry else "")
+        lines.append(f"| `{entry['call']}` | {entry['library']} | {told} |")
     return "\n".join(lines) + "\n"
 
 

@@ -1,4 +1,4 @@
-// libvswitch.so of the null host. The calls that are measured with an output answer the same every
+// libvswitch.so of the null host. The calls that are measured with an output return the same every
 // time, so that whoever called them can be asked what came back.
 
 #include "vswitch/configuration.h"

@@ -226,7 +226,7 @@ def lifetime(function: surface.Function) -> Iterator[str]:
     for number, spelled in enumerate(function.arguments, start=1):
         add_argument(body, function.name, number, spelled, required=False)
     if kind == "delete":
-        body.checks[0] = body.checks[0].replace("pointer_from", "pointer_given_up")
+        body.checks[0] = body.checks[0].replace("pointer_from", "pointer_disowned")
         return emit(function.name, body, ["free(a1);", "Py_RETURN_NONE;"], trapped=True)
     make = f"calloc(1, sizeof({record}))"
     if function.arguments == ("size_t",):

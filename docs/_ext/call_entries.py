@@ -193,7 +193,7 @@ class Entries:
         if plain == "unsigned int * pointer":
             plain = "int"  # the classes read it
         if function.outputs:
-            plain = f"({plain[1:-1]})"  # a tuple; the flat answer is a list
+            plain = f"({plain[1:-1]})"  # a tuple; the flat result is a list
         return plain, self._in_words(self._python_types[1].result(function))
 
 

@@ -32,7 +32,7 @@ class Functions(Described):
             yield self.labelled("In C", [self.words.code(call.prototype.rstrip(";"), call.name)])
         if call.arguments:
             yield self._parameters(call)
-        yield self.labelled("Returns", self._answer(call))
+        yield self.labelled("Returns", self._returns(call))
         if call.ownership:
             yield self.labelled("Ownership", self._joined(call.ownership))
         if call.statuses:
@@ -60,7 +60,7 @@ class Functions(Described):
             rows.append(((name, types, [self.words.code(one.c_type)], meaning), ()))
         return table(("Parameter", "Python", "C", ""), rows, "parameters")
 
-    def _answer(self, call: Call) -> Iterable[nodes.Node]:
+    def _returns(self, call: Call) -> Iterable[nodes.Node]:
         plain, flat = call.results
         if call.statuses and not call.shape:
             yield nodes.Text("a status, ")
@@ -83,11 +83,11 @@ class Functions(Described):
             yield nodes.list_item("", text)
 
     def _simulated(self, call: Call) -> Iterable[nodes.Node]:
-        answer = self.catalogue.simulated.get(call.name)
-        if answer is None:
+        told = self.catalogue.simulated.get(call.name)
+        if told is None:
             yield nodes.Text("not built beside this site, which is of another host.")
         else:
-            yield from self.words.inline(f"{answer}.")
+            yield from self.words.inline(f"{told}.")
 
 
 class Calls(Functions):

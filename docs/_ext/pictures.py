@@ -40,7 +40,7 @@ def picture(name: str, shapes: Sequence[Shape], size: int) -> str:
         top += ROW
     for shape in shapes:
         if shape.is_trailing:
-            body.extend(_behind(shape, top))
+            body.extend(_trailing(shape, top))
             top += ROW
     for segment in parts:
         if segment.shapes and not segment.is_alone:
@@ -122,7 +122,7 @@ def _ticks(piece: _Piece, x: float, top: float) -> Iterator[str]:
             )
 
 
-def _behind(shape: Shape, top: float) -> Iterator[str]:
+def _trailing(shape: Shape, top: float) -> Iterator[str]:
     yield _ruler(str(shape.place.offset), top)
     yield _box(shape.kind + " trailing", GUTTER, top, BYTES * CELL, ROW)
     said = f"{shape.count} of {shape.element} {'bytes' if shape.element > 1 else 'byte'} each"

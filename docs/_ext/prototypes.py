@@ -4,7 +4,7 @@ import re
 from typing import List
 
 
-def answers_status(prototype: str) -> bool:
+def returns_status(prototype: str) -> bool:
     return prototype.startswith("QEX_ReturnStatus ")
 
 

@@ -7,14 +7,14 @@ import re
 from typing import Collection, Dict, Iterator, List, Tuple
 
 from comments import Comment, Header
-from prototypes import answers_status, has_parameter, texts
+from prototypes import returns_status, has_parameter, texts
 
 _CONCERNED = re.compile(r" \((`\w+`(?:, `\w+`)*)\)$")
 
 
 def of_call(name: str, header: Header) -> Dict[str, str]:
     """The statuses of a call; none if it returns something else."""
-    if not answers_status(header.prototypes[name]):
+    if not returns_status(header.prototypes[name]):
         return {}
     found = {"QEX_OK": "done", **header.comments[name].statuses}
     for status, text in header.text.statuses.items():
@@ -85,7 +85,7 @@ def _refused_of_call(
 ) -> Iterator[str]:
     prototype = header.prototypes[name]
     yield from _misplaced(name, comment, statuses)
-    if comment.statuses and not answers_status(prototype):
+    if comment.statuses and not returns_status(prototype):
         yield f"{name}: lists statuses, but returns none"
     for parameter in comment.parameters:
         if not has_parameter(prototype, parameter):

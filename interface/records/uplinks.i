@@ -1,5 +1,5 @@
 // Uplinks: the physical links of a switch and its uplink ports. The library allocates the lists that
-// calls answer, and takes them back; the caller makes and frees its own.
+// calls return, and releases them; the caller makes and frees its own.
 
 %record(VSUplinks_entries)
 %sized_record(VSUplinks, uplinks_new)

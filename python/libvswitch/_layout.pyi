@@ -5,5 +5,5 @@ from typing import Dict, List
 WHOLE_RECORDS: List[str]
 DEALLOCATORS: List[str]
 SCALARS: Dict[str, str]
-RECORDS_BEHIND_POINTERS: List[str]
+POINTEE_RECORDS: List[str]
 POINTERS: List[str]

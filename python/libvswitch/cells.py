@@ -244,16 +244,16 @@ class Cell(_records._Pointing):
         """How the runtime spells a pointer to this type: without the names that are one in C."""
         if self._is_scalar:
             return f"{_layout.SCALARS.get(self.type, self.type)} *"
-        if self._target() in ("void", *_layout.RECORDS_BEHIND_POINTERS):
+        if self._target() in ("void", *_layout.POINTEE_RECORDS):
             return f"{self._target()} **"
-        records = ", ".join(f"{name} *" for name in _layout.RECORDS_BEHIND_POINTERS)
+        records = ", ".join(f"{name} *" for name in _layout.POINTEE_RECORDS)
         raise TypeError(
             f"no cell can hold a {self.type!r}; it holds an integer such as int or qex_uint32, "
             f"void *, {', '.join(_layout.POINTERS)}, {records}"
         )
 
 
-def cell_behind(argument: Any) -> Optional[Cell]:
+def cell_of(argument: Any) -> Optional[Cell]:
     """The cell that an argument is or points to."""
     if isinstance(argument, Pointer):
         argument = argument.__dict__["_owner"]
@@ -264,9 +264,9 @@ def filled(
     argument: Any, deallocator: Optional[str], length: Any = None, is_view: bool = False
 ) -> None:
     """Notes what a call left in the cell of an argument; its length may be in a cell, too."""
-    cell = cell_behind(argument)
+    cell = cell_of(argument)
     if cell is not None:
-        size = length if length is None or isinstance(length, int) else cell_behind(length)
+        size = length if length is None or isinstance(length, int) else cell_of(length)
         cell._filled(deallocator, size.value if isinstance(size, Cell) else size, is_view)
 
 

@@ -31,7 +31,7 @@ __all__ = [
 class HostError(Exception):
     """The host did not do what was asked of it.
 
-    `call` and `arguments` are what was asked, `status` is the answer, None where there was none,
+    `call` and `arguments` are what was asked, `status` is the result, None where there was none,
     and `what` says in words what was asked of what, and why not. The words that a refused call has
     are made when somebody first asks for them, and name what the host has then.
     """

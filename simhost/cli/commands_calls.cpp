@@ -53,12 +53,12 @@ void add_fault(CLI::App &app) {
 
 void show_calls() {
   for (auto const &call : nlohmann::json::parse(kCallTable)) {
-    auto answer = call["answer"].get<std::string>();
+    auto told = call["answer"].get<std::string>();
     if (call.contains("status")) {
-      answer += ": " + call["status"].get<std::string>();
+      told += ": " + call["status"].get<std::string>();
     }
     std::cout << fmt::format("{:<36} {:<16} {}\n", call["call"].get<std::string>(),
-                             call["library"].get<std::string>(), answer);
+                             call["library"].get<std::string>(), told);
   }
 }
 

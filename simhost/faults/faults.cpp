@@ -14,11 +14,11 @@ namespace {
 
 struct HostCall {
   std::string_view name;
-  bool answers_status;
+  bool returns_status;
 };
 
 constexpr std::array kCalls{
-#define CALL(name, answers_status) HostCall{#name, answers_status},
+#define CALL(name, returns_status) HostCall{#name, returns_status},
 #include "call_names.inc"
 #undef CALL
 };
@@ -39,7 +39,7 @@ HostCall get_call(std::string_view function) {
 void check_effect(Fault const &fault) {
   bool const status = fault.status != QEX_OK;
   bool const exception = !fault.exception.empty();
-  if (status && !get_call(fault.function).answers_status) {
+  if (status && !get_call(fault.function).returns_status) {
     throw Refused(QEX_NOT_SUPPORTED, fmt::format("{} returns no status", fault.function));
   }
   if (status && exception) {

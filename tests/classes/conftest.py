@@ -1,7 +1,7 @@
 """What the tests of the classes share: a clean environment, a switch on the simulated host.
 
 They run in a process of their own: loading the classes registers them, and from then on the flat
-functions of that process answer instances of them.
+functions of that process return instances of them.
 """
 
 import os

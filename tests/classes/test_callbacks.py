@@ -93,7 +93,7 @@ def constant(answer: Any) -> Any:
     return lambda item, context: answer
 
 
-def test_a_callback_without_python_answers_what_it_should(many: Any) -> None:
+def test_a_callback_without_python_returns_what_it_should(many: Any) -> None:
     """What the library gets is 0 or 1, as the thunk itself returns."""
     for answer, expected in ((None, 1), (0, 0), (7, 1), ("", 0), ([0], 1)):
         given: Any = vs.Callback(constant(answer))

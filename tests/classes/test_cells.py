@@ -63,7 +63,7 @@ def test_a_property_by_the_raw_call(switch: str, switch_id: str) -> None:
     assert mtu.value == 2000
 
 
-def test_a_record_behind_a_pointer(switch: str, switch_id: str) -> None:
+def test_a_record_that_a_pointer_points_to(switch: str, switch_id: str) -> None:
     lags = Cell("VSLAGTable *")
     assert [*lags] == [None]
     assert vs.VSQEX_GetLAGTable(switch, lags.pointer) == vs.QEX_OK

@@ -22,7 +22,7 @@ def uses(uplinks: Any) -> List[Callable[[], Any]]:
     ]
 
 
-def test_what_went_back_raises_when_used(switch: str) -> None:
+def test_what_was_released_raises_when_used(switch: str) -> None:
     with vs.owned(vs.VSQEX_GetUplinks(switch)) as (_, uplinks):
         entries = uplinks.entries
         first = entries[0]
@@ -42,7 +42,7 @@ def test_what_went_back_raises_when_used(switch: str) -> None:
     assert repr(uplinks) == "<VSUplinks that is gone>"
 
 
-def test_it_goes_back_when_the_block_raises(switch: str) -> None:
+def test_it_is_released_when_the_block_raises(switch: str) -> None:
     with pytest.raises(KeyError):
         with vs.owned(vs.VSQEX_GetUplinks(switch)) as (_, uplinks):
             raise KeyError
@@ -50,14 +50,14 @@ def test_it_goes_back_when_the_block_raises(switch: str) -> None:
         uplinks[0]
 
 
-def test_it_goes_back_once(switch: str) -> None:
+def test_it_is_released_once(switch: str) -> None:
     with vs.owned(vs.VSQEX_GetUplinks(switch)) as (_, uplinks):
         vs.VSQEX_FreeMemory(uplinks)
         with pytest.raises(ValueError):
             vs.VSQEX_FreeMemory(uplinks)
 
 
-def test_lists_of_the_configuration_go_back(switch: str) -> None:
+def test_lists_of_the_configuration_are_released(switch: str) -> None:
     with vs.owned(vs.VSDVS_GetSwitchUplinkPorts(switch)) as (_, names, identifiers):
         assert list(names) == list(identifiers) == ["uplink1", "uplink2"]
     with vs.owned(vs.VSDVS_GetPortVLANPolicy(switch, "web")) as (_, policy, _priority):
@@ -146,7 +146,7 @@ def test_a_wrong_deallocator_leaves_the_callers_table(switch: str) -> None:
         vs.free_dvmirror_session_table(table)
 
 
-def test_what_lies_in_a_record_does_not_go_back_alone(switch: str) -> None:
+def test_what_lies_in_a_record_is_not_released_alone(switch: str) -> None:
     """The first field lies where its record does: the host could not tell them apart."""
     with vs.owned(vs.VSDVS_GetPortVLANPolicy(switch, "web")) as (_, policy, _priority):
         for view in (policy.vidRanges, vs.Cell("int").pointer):
@@ -209,7 +209,7 @@ def test_a_cell_of_numbers_holds_no_memory() -> None:
             take(vs.Cell("int", 5))
 
 
-def test_null_is_nothing_to_give_back(switch: str) -> None:
+def test_null_is_nothing_to_release(switch: str) -> None:
     with vs.owned(None) as nothing:
         assert nothing is None
     with vs.owned(vs.Cell("VSLAGTable *")) as cell:
@@ -219,7 +219,7 @@ def test_null_is_nothing_to_give_back(switch: str) -> None:
         assert (status, mode) == (vs.QEX_OK, vs.VS_MCAST_FILTER_MODE_LEGACY)
 
 
-def test_all_pointers_of_a_cell_go_back(switch: str) -> None:
+def test_all_pointers_of_a_cell_are_released(switch: str) -> None:
     lags = vs.Cell("VSLAGTable *", [None, None])
     # A call fills the first of them.
     for index in (1, 0):

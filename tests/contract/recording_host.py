@@ -1,6 +1,6 @@
 """The recording host from Python: what the module called, and what the host returns.
 
-The host's two libraries note each call and answer with zeros and nulls unless told otherwise:
+The host's two libraries note each call and return zeros and nulls unless told otherwise:
 
     host.answer("VSDVS_GetMTU", result=0, outputs={2: 9000})
     assert _libvswitch.VSDVS_GetMTU("dvs0", mtu) == 0

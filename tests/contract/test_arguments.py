@@ -119,15 +119,15 @@ def test_a_str_is_copied_and_a_char_pointer_is_not(
 
 
 @calls.each_argument(lambda kind: isinstance(kind, PointerKind) and " const " not in kind.type)
-@pytest.mark.parametrize("gives_up", [False, True])
+@pytest.mark.parametrize("traps", [False, True])
 def test_what_the_host_writes_where_a_pointer_leads_is_there(
-    host: RecordingHost, call: Call, position: int, gives_up: bool
+    host: RecordingHost, call: Call, position: int, traps: bool
 ) -> None:
     sample = call.kind(position).plain(position)
     assert sample.memory
     written = bytes(reversed(sample.memory))
     host.answer(call.name, outputs={position: written})
-    if gives_up:
+    if traps:
         host.spring(call.name, RuntimeError, "late", after_outputs=True)
         reports.raises(RuntimeError, "late", call, *call.given())
     else:

@@ -89,7 +89,7 @@ def test_a_group_is_passed_where_it_lies(host: RecordingHost) -> None:
     assert call.values[3] == contents_of(GROUP)
 
 
-def test_what_a_call_answers_can_be_passed_on(host: RecordingHost) -> None:
+def test_what_a_call_returns_can_be_passed_on(host: RecordingHost) -> None:
     host.answer("DVSState_SwitchFindByAlias", 0x1000)
     host.answer("VSQEX_GetMcastFilters", outputs={4: 0x2000})
     vs.DVS_SwitchName(vs.DVSState_SwitchFindByAlias("alias"))

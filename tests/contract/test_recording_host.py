@@ -53,7 +53,7 @@ def test_rules_hold_for_the_nth_call_or_for_every_other(host: RecordingHost) -> 
     assert host.calls() == [("VSDVS_SetMTU", (b"a", 5))]
 
 
-def test_calls_without_notes_are_answered_and_counted(host: RecordingHost) -> None:
+def test_calls_without_notes_are_served_and_counted(host: RecordingHost) -> None:
     host.answer("VSDVS_SetMTU", 20, nth=2)
     host.take_no_notes()
     assert [vs.VSDVS_SetMTU("a", 1), vs.VSDVS_SetMTU("a", 2)] == [0, 20]

@@ -18,7 +18,7 @@ class HostExit(BaseException):
     """One that is no Exception."""
 
 
-GIVING_UP = [
+TRAPS = [
     (RuntimeError, "the call trapped: größe 100%s%n", 1),
     (ValueError, "", -1),
     (MemoryError, "x" * 5000, 2**31 - 1),
@@ -37,7 +37,7 @@ def answer_something(host: RecordingHost, call: Call) -> None:
 def test_a_sprung_trap_raises_what_the_host_names_and_the_next_call_works(
     host: RecordingHost, call: Call
 ) -> None:
-    for exception, text, value in GIVING_UP:
+    for exception, text, value in TRAPS:
         for after_outputs in (False, True):
             host.reset()
             answer_something(host, call)

@@ -132,6 +132,6 @@ def test_long_fields_are_cut_and_say_how_long_they_are(catalogue: Catalogue) -> 
     assert picture.count(" cut") == 1
 
 
-def test_what_lies_behind_says_how_often(catalogue: Catalogue) -> None:
+def test_what_trails_says_how_often(catalogue: Catalogue) -> None:
     picture = drawn(catalogue, "DVMirrorSessionTable")
     assert re.search(r"numSessions of 2\d\d bytes each", picture)

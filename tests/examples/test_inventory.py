@@ -71,6 +71,6 @@ def test_a_query_that_is_refused(shared_host: SharedHost, example: Callable[...,
     assert example("inventory") == (1, [], errors)
 
 
-def test_a_host_that_gives_up(shared_host: SharedHost, example: Callable[..., Any]) -> None:
+def test_a_call_that_traps(shared_host: SharedHost, example: Callable[..., Any]) -> None:
     shared_host.fault("VSQEX_GetUplinks", panic=(OSError, "the device is gone"))
     assert example("inventory") == (1, [], "inventory: the device is gone\n")

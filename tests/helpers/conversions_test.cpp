@@ -161,7 +161,7 @@ TEST(Text, IsACopyThatCountsItsNul) {
   std::free(text);
 }
 
-TEST(Text, KeepsWhatStandsBehindAnEmbeddedNul) {
+TEST(Text, KeepsWhatFollowsAnEmbeddedNul) {
   char *text = nullptr;
   size_t size = 0;
   ASSERT_EQ(kConverted, text_from_str(python("'a\\0b'").get(), &text, &size));

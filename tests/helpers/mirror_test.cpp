@@ -76,7 +76,7 @@ class Sessions : public testing::Test {
   Table const table_{alloc_dvmirror_session_table(2, 3)};
 };
 
-TEST_F(Sessions, LieBehindTheHeader) {
+TEST_F(Sessions, FollowTheHeader) {
   EXPECT_EQ(static_cast<void *>(byte(20)), mirror_first_session(table_.get()));
   EXPECT_EQ(static_cast<void *>(byte(20)), mirror_session_at(table_.get(), 0));
   EXPECT_EQ(static_cast<void *>(byte(252)), mirror_session_at(table_.get(), 1));

@@ -95,7 +95,7 @@ TEST(PvlanEntry, IsACopyOfAnyElement) {
   }
 }
 
-TEST(VlanRange, IsACopyOfAnyOfTheRangesBehindThePolicy) {
+TEST(VlanRange, IsACopyOfAnyOfTheRangesAfterThePolicy) {
   Block<VSPortVlanPolicy> policy(3 * sizeof(qex_NEBPortVIDRange));
   policy.put(0,
              "\1\0\2\0\3\0\4\0"

@@ -102,7 +102,7 @@ class OptionList : public testing::Test {
   Block<VSRuntimeOptions> list_{kRoom, kFilling};
 };
 
-TEST_F(OptionList, StartsBehindItsLength) {
+TEST_F(OptionList, StartsAfterItsLength) {
   EXPECT_EQ(at(4), runtime_options_first(list_.get()));
   list_->totalLength = 0;
   EXPECT_EQ(at(4), runtime_options_first(list_.get()));
@@ -143,7 +143,7 @@ TEST_F(OptionList, IgnoresTheNameOfAnOption) {
   EXPECT_EQ(13, at(4)->type);
 }
 
-TEST_F(OptionList, KeepsOneByteFreeBehindAnInteger) {
+TEST_F(OptionList, KeepsOneByteFreeAfterAnInteger) {
   std::string before = list_.bytes();
   list_->totalLength = 12;
   before.replace(0, 4, "\x0c\0\0\0"s);
@@ -153,7 +153,7 @@ TEST_F(OptionList, KeepsOneByteFreeBehindAnInteger) {
   EXPECT_EQ(at(12), add(at(4), 0, 5));
 }
 
-TEST_F(OptionList, KeepsOneByteFreeBehindAText) {
+TEST_F(OptionList, KeepsOneByteFreeAfterAText) {
   std::string before = list_.bytes();
   list_->totalLength = 17;
   before.replace(0, 4, "\x11\0\0\0"s);
@@ -174,7 +174,7 @@ TEST_F(OptionList, TakesATextOf127BytesAndNoLongerOne) {
   EXPECT_EQ(expected, list_.bytes());
 }
 
-TEST_F(OptionList, EndsBehindTheBytesThatWereUsed) {
+TEST_F(OptionList, EndsAfterTheBytesThatWereUsed) {
   for (int const used : {0, 16, 4092}) {
     runtime_options_set_length(list_.get(), used);
     EXPECT_EQ(static_cast<qex_uint32>(used) + 4, list_->totalLength);

@@ -1,4 +1,4 @@
-// Methods of the tables that queries answer.
+// Methods of the tables that queries return.
 
 #include "helpers/tables.h"
 

@@ -98,7 +98,7 @@ TYPED_TEST(UplinkList, ReadsTheTextsOfItsEntries) {
   }
 }
 
-TYPED_TEST(UplinkList, ReadsOnBehindASlotWithoutATerminator) {
+TYPED_TEST(UplinkList, ReadsOnAfterASlotWithoutATerminator) {
   this->put(0, std::string(TypeParam::kSlot, 'x') + "yz" + '\0');
   EXPECT_EQ(std::string(TypeParam::kSlot, 'x') + "yz", TypeParam::get(this->list_.get(), 0));
 }

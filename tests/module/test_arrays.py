@@ -97,7 +97,7 @@ def test_elements_are_read_as_copies_that_python_owns(array: Array) -> None:
     assert block.bytes == array.distinct(6)
 
 
-def test_elements_behind_the_end_are_read_without_a_check(capfd: Any, array: Array) -> None:
+def test_elements_past_the_end_are_read_without_a_check(capfd: Any, array: Array) -> None:
     two_of_six = methods.Block(f"{array.element} *", array.distinct(6))
     copy, out = methods.said(capfd, array.get, two_of_six.record, 5)
     with methods.owned(copy, array.delete_element):

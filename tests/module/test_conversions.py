@@ -77,7 +77,7 @@ def test_a_char_pointer_is_a_text_argument_without_a_copy() -> None:
     assert vs.VSDVS_DestroyVSwitch(pointer) == vs.QEX_NOT_FOUND
 
 
-def test_no_text_is_null_and_the_host_answers_with_a_status() -> None:
+def test_no_text_is_null_and_the_host_returns_a_status() -> None:
     assert vs.VSDVS_DestroyVSwitch(None) == vs.QEX_BAD_PARAM
 
 

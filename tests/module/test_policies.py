@@ -158,7 +158,7 @@ def test_the_last_two_bytes_of_a_filter_follow_all_addresses() -> None:
         reports.raises(ValueError, text, vs.VSExtraEthFilter_multicastAddrs_set, extra, None)
 
 
-def test_ranges_are_written_behind_a_policy_and_not_through_its_field() -> None:
+def test_ranges_are_written_after_a_policy_and_not_through_its_field() -> None:
     policy = methods.Block("VSPortVlanPolicy *", bytes(16))
     ranges = methods.Block("qex_NEBPortVIDRange *", b"\1\2\3\4")
     assert int(vs.VSPortVlanPolicy_vidRanges_get(policy.record)) == policy.address + 8

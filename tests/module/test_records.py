@@ -433,7 +433,7 @@ def test_pointers_are_stored_as_they_are(case: Case, made: Any) -> None:
 
 
 @each(of_kind("pointer"))
-def test_a_stored_pointer_gives_up_its_memory(case: Case, made: Any) -> None:
+def test_a_stored_pointer_disowns_its_memory(case: Case, made: Any) -> None:
     target = ctypes.create_string_buffer(64)
     given = pointer(target, case.field.type)
     given.acquire()
@@ -455,7 +455,7 @@ def test_pointers_of_another_type_are_refused(case: Case, made: Any) -> None:
 
 
 @each_record
-def test_registered_classes_wrap_what_readers_answer(record: records.Record) -> None:
+def test_registered_classes_wrap_what_readers_return(record: records.Record) -> None:
     """In a process of its own for each record: a registration lasts."""
     program = f"""
 import sys

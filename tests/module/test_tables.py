@@ -1,4 +1,4 @@
-"""Tables that queries answer: filters, MAC tables, mirror session identifiers, destinations."""
+"""Tables that queries return: filters, MAC tables, mirror session identifiers, destinations."""
 
 import ctypes
 import sys
@@ -114,7 +114,7 @@ def test_six_bytes_are_taken_whatever_the_length(entry: methods.Block) -> None:
         assert entry.bytes[:6] == whole
 
 
-def test_a_buffer_is_given_back(entry: methods.Block) -> None:
+def test_a_buffer_is_released(entry: methods.Block) -> None:
     address = bytearray(6)
     vs.VSMACEntry_set_mac_address(entry.record, address)
     address.append(0)  # a BufferError while somebody holds the bytes

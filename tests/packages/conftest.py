@@ -37,7 +37,7 @@ def wheel() -> Path:
 
 @pytest.fixture(scope="session")
 def real_host(tmp_path_factory: pytest.TempPathFactory) -> Path:
-    """A folder with libraries that bear the names of a host's and answer every call with 4242."""
+    """A folder with libraries that bear the names of a host's and return 4242 from every call."""
     built = FOLDER / "source" / "debian" / "python3-libvswitch"
     (module,) = built.glob("usr/lib/python3/dist-packages/_libvswitch.*.so")
     said = subprocess.run(["nm", "-D", "-u", module], check=True, capture_output=True, text=True)

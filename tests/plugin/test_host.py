@@ -134,23 +134,23 @@ def test_a_document_changes_the_host(this: SimulatedHost) -> None:
 @both
 @pytest.mark.parametrize("turn", [1, 2])
 def test_ports_have_the_same_numbers_each_time(this: SimulatedHost, run: Run, turn: int) -> None:
-    behind_two_uplink_ports = ["[0, 3]"]
-    assert run(NUMBER) == behind_two_uplink_ports
+    after_two_uplink_ports = ["[0, 3]"]
+    assert run(NUMBER) == after_two_uplink_ports
     this.apply({"switches": [{"alias": "lab", "ports": [{"id": "desk"}]}]})
     this.reset()
-    assert run(NUMBER) == behind_two_uplink_ports
+    assert run(NUMBER) == after_two_uplink_ports
 
 
 @both
 @pytest.mark.parametrize("status", [vs.QEX_BUSY, "QEX_BUSY"])
-def test_the_nth_call_answers_a_status(this: SimulatedHost, run: Run, status: Any) -> None:
+def test_the_nth_call_returns_a_status(this: SimulatedHost, run: Run, status: Any) -> None:
     this.fault("VSDVS_SetMTU", nth=2, status=status)
     assert run(SET_MTU + SET_MTU + SET_MTU) == ["0", str(vs.QEX_BUSY), "0"]
 
 
 @both
 @pytest.mark.parametrize("error", [OSError, "OSError"])
-def test_the_host_gives_up(this: SimulatedHost, run: Run, error: Any) -> None:
+def test_the_call_traps(this: SimulatedHost, run: Run, error: Any) -> None:
     this.fault("VSDVS_SetMTU", times=2, panic=(error, "the device is gone"))
     raised = "OSError('the device is gone')"
     assert run(SET_MTU + SET_MTU + SET_MTU) == [raised, raised, "0"]
@@ -293,7 +293,7 @@ def test_what_is_no_command(shared_host: SharedHost, command: Any, error: Except
 
 
 @both
-def test_the_clock_does_not_go_back(this: SimulatedHost) -> None:
+def test_the_clock_is_not_set_back(this: SimulatedHost) -> None:
     with pytest.raises(HostRefused):
         this.clock.step(-0.001)
     with pytest.raises(HostRefused):

@@ -206,7 +206,7 @@ def test_a_test_that_leaves_memory_out_fails(pytester: pytest.Pytester, head: st
                 take(), take()
                 vs.VSQEX_GetPortMACTable("vswitch0", "web-1", vs.VS_MAC_ADDR_TYPE_LEARNED)
 
-            def test_gives_back(host):
+            def test_releases(host):
                 vs.VSQEX_FreeMemory(take())
 
             def test_asks_late_for_the_host(request):
@@ -230,7 +230,7 @@ def test_memory_of_fixtures(pytester: pytest.Pytester, head: str) -> None:
         + dedented(
             """
             @pytest.fixture
-            def given_back(host):
+            def released(host):
                 uplinks = take()
                 yield uplinks
                 vs.VSQEX_FreeMemory(uplinks)
@@ -245,13 +245,13 @@ def test_memory_of_fixtures(pytester: pytest.Pytester, head: str) -> None:
                 yield
                 vs.VSQEX_FreeMemory(uplinks)
 
-            def test_good(given_back):
-                assert given_back is not None
+            def test_good(released):
+                assert released is not None
 
             def test_bad(left_out):
                 assert left_out is not None
 
-            def test_both(given_back):
+            def test_both(released):
                 take()
             """
         ),

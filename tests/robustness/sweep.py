@@ -266,7 +266,7 @@ def variables(values: List[Value]) -> Iterator[Optional[Trial]]:
 
 def planted() -> Iterator[Optional[Trial]]:
     """What a sweep must find, between calls that are as they should be."""
-    for name in ("nothing", "leave_an_error", "crash", "nothing", "hang", "fail", "give_up"):
+    for name in ("nothing", "leave_an_error", "crash", "nothing", "hang", "fail", "end_by_abort"):
         yield Trial(f"faulty.{name}()", getattr(faulty, name))
 
 

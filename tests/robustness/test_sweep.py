@@ -38,7 +38,7 @@ def test_what_is_planted_is_found(tmp_path: Path) -> None:
     left = "faulty.leave_an_error()"
     # To a debug interpreter this too is the end.
     fatal = [f"{left}: status -6"] if DEBUG_INTERPRETER else []
-    assert ends == [*fatal, crashed, "faulty.give_up(): status -6"]
+    assert ends == [*fatal, crashed, "faulty.end_by_abort(): status -6"]
     assert "faulty.hang(): hangs" in problems
     assert any(problem.startswith(left) for problem in problems)
     assert calls == 7

@@ -114,7 +114,7 @@ SHARED bool record_from(PyObject *object, RecordType const *type, void **pointer
 }
 
 /** A pointer that its object no longer owns, to be freed. */
-SHARED bool pointer_given_up(PyObject *object, RecordType const *type, void **pointer,
+SHARED bool pointer_disowned(PyObject *object, RecordType const *type, void **pointer,
                              Place place) {
   if (!pointer_from(object, type, pointer, place)) return false;
   if (*pointer) ((PointerObject *)object)->owned = false;

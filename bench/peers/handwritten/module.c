@@ -28,7 +28,7 @@ static PyObject *delete_VSInfo(PyObject *self, PyObject *args) {
   void *info;
   (void)self;
   EXPECT_ARGUMENTS(1, "O:delete_VSInfo");
-  if (!pointer_given_up(PyTuple_GET_ITEM(args, 0), &vs_info, &info,
+  if (!pointer_disowned(PyTuple_GET_ITEM(args, 0), &vs_info, &info,
                         (Place){"delete_VSInfo", 1, "struct VSInfo *"})) {
     return NULL;
   }

@@ -30,7 +30,7 @@ enum { kMostSteps = 16 };
 
 /* The pointer object that an object is or stands for, a new reference; null, with no error, if there
    is none. Nothing else may be keeping what `this` returns. */
-static PyObject *pointer_object_behind(PyObject *object) {
+static PyObject *pointer_object_of(PyObject *object) {
   int steps = 0;
   Py_INCREF(object);
   while (!is_pointer_object(object)) {
@@ -50,7 +50,7 @@ static int convert_pointer(PyObject *object, void **pointer, swig_type_info *typ
   PyObject *found = NULL;
   int kind = SWIG_ERROR;
   if (object == Py_None) return SWIG_Python_ConvertPtr(object, pointer, type, flags);
-  found = pointer_object_behind(object);
+  found = pointer_object_of(object);
   if (found) kind = SWIG_Python_ConvertPtr(found, pointer, type, flags);
   Py_XDECREF(found);
   return kind;

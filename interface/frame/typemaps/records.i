@@ -10,7 +10,7 @@
 //
 // Stands before the headers; each line before the header of its record.
 
-// Constructors answer the raw pointer object, whatever class is registered: the class wraps it.
+// Constructors return the raw pointer object, whatever class is registered: the class wraps it.
 %define %raw_result_of_constructor(NAME, TYPE)
 %typemap(out, noblock=1) TYPE *NAME {
   %set_output(new_record($1, $descriptor));
@@ -30,7 +30,7 @@
 }
 %enddef
 
-// The class that shadows a record: pointers that calls and readers answer become its instances.
+// The class that shadows a record: pointers that calls and readers return become its instances.
 %define %class_registration(NAME)
 %wrapper %{
 SWIGINTERN PyObject *_wrap_##NAME##_swigregister(PyObject *self, PyObject *args) {

@@ -17,8 +17,7 @@ void set_link(storage::Transaction &transaction, std::string_view uplink, Link c
 }
 
 bool lacp_is_up(storage::Transaction &transaction, std::string_view uplink) {
-  return answers_aggregation(link_of(transaction, uplink)) &&
-         storage::is_in_lag(transaction, uplink);
+  return would_aggregate(link_of(transaction, uplink)) && storage::is_in_lag(transaction, uplink);
 }
 
 }  // namespace simhost::stored

@@ -12,7 +12,7 @@ Link link_of(storage::Transaction &transaction, std::string_view uplink);
 void set_link(storage::Transaction &transaction, std::string_view uplink, Link const &link);
 
 /// Whether the other end would aggregate the link with others.
-inline bool answers_aggregation(Link const &link) {
+inline bool would_aggregate(Link const &link) {
   return link.up() && link.partner;
 }
 

@@ -58,7 +58,7 @@ std::vector<std::size_t> places_in_group(Team const &team, std::string_view name
   if (lag != team.lags.end()) {
     for (auto const &uplink : lag->uplinks) {
       if (auto const place = place_of(team, uplink);
-          place && answers_aggregation(team.uplinks[*place].link)) {
+          place && would_aggregate(team.uplinks[*place].link)) {
         places.push_back(*place);
       }
     }

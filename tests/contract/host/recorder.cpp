@@ -100,7 +100,7 @@ std::string described(Parameter const &parameter, std::uint64_t bits, std::size_
 }
 
 /** A defect of the recorder's own: a test that goes on would prove nothing. */
-[[noreturn]] void give_up(char const *reason) {
+[[noreturn]] void abort_because(char const *reason) {
   std::fputs(reason, stderr);
   std::abort();
 }
@@ -187,7 +187,7 @@ Answer record(std::string_view name, std::span<Argument const> arguments) noexce
 
 void spring() noexcept {
   if (recorder_has_trap() == 0) {
-    give_up("recording host: told to spring the trap of a module that did not load it\n");
+    abort_because("recording host: told to spring the trap of a module that did not load it\n");
   }
   exceptionType = state().sprung.type;
   exceptionMsg = state().sprung.message.data();

@@ -27,7 +27,7 @@ static PyObject *crash(PyObject *self, PyObject *none) {
   return PyLong_FromLong(*nowhere);
 }
 
-static PyObject *give_up(PyObject *self, PyObject *none) {
+static PyObject *end_by_abort(PyObject *self, PyObject *none) {
   (void)self, (void)none;
   abort();
 }
@@ -82,7 +82,7 @@ static PyMethodDef methods[] = {
     {"fail", fail, METH_NOARGS, NULL},
     {"leave_an_error", leave_an_error, METH_NOARGS, NULL},
     {"crash", crash, METH_NOARGS, NULL},
-    {"give_up", give_up, METH_NOARGS, NULL},
+    {"end_by_abort", end_by_abort, METH_NOARGS, NULL},
     {"hang", hang, METH_NOARGS, NULL},
     {"leak_a_reference", leak_a_reference, METH_O, NULL},
     {"leak_an_object", leak_an_object, METH_NOARGS, NULL},

@@ -122,7 +122,7 @@ TEST_F(Boundary, TranslateNames) {
   EXPECT_EQ(DVSPortsetNameToAlias("s", name.data()), QEX_NOT_FOUND);
 }
 
-TEST_F(Boundary, HandOutTheUplinks) {
+TEST_F(Boundary, AllocateTheUplinks) {
   auto *const list = uplinks();
   EXPECT_EQ(list->totalEntries, 2U);
   ASSERT_EQ(list->numEntries, 2U);
@@ -133,7 +133,7 @@ TEST_F(Boundary, HandOutTheUplinks) {
   EXPECT_EQ(raised_by([=] { VSQEX_FreeMemory(list); }), std::nullopt);
 }
 
-TEST_F(Boundary, HandOutAnEmptyListOfUplinks) {
+TEST_F(Boundary, AllocateAnEmptyListOfUplinks) {
   ASSERT_EQ(create("bare"), QEX_OK);
   VSUplinks *list = nullptr;
   EXPECT_EQ(VSQEX_GetUplinks("bare", &list), QEX_OK);
@@ -155,7 +155,7 @@ TEST_F(Boundary, TheLedgerKnowsWhatIsOut) {
   EXPECT_EQ(simhost_ledger_count(), 0U);
 }
 
-TEST_F(Boundary, NullIsGivenBackForNothing) {
+TEST_F(Boundary, NullIsReleasedForNothing) {
   EXPECT_EQ(raised_by([] { VSQEX_FreeMemory(nullptr); }), std::nullopt);
   EXPECT_EQ(raised_by([] { VSDVS_FreeMemory(nullptr); }), std::nullopt);
 }
@@ -170,7 +170,7 @@ TEST_F(Boundary, MemoryGivenBackTwiceSpringsTheTrap) {
   EXPECT_EQ(exception_status, 1);
 }
 
-TEST_F(Boundary, TheOtherDoorKnowsItToo) {
+TEST_F(Boundary, TheOtherDeallocatorKnowsItToo) {
   auto *const list = uplinks();
   VSQEX_FreeMemory(list);
   EXPECT_EQ(raised_by([=] { VSDVS_FreeMemory(list); }),
@@ -179,7 +179,7 @@ TEST_F(Boundary, TheOtherDoorKnowsItToo) {
                          "VSQEX_FreeMemory took it back"));
 }
 
-TEST_F(Boundary, TheThirdDoorTakesMemoryBackToo) {
+TEST_F(Boundary, TheThirdDeallocatorReleasesMemoryToo) {
   auto *const list = uplinks();
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }), std::nullopt);
   EXPECT_EQ(simhost_ledger_count(), 0U);

@@ -300,7 +300,7 @@ TEST_F(DataLists, OfPropertiesAreInTheLedgerByTheCallThatMadeThem) {
   }
 }
 
-TEST_F(DataLists, GoBackThroughTheirOwnDoorOnly) {
+TEST_F(DataLists, AreReleasedByTheirOwnDeallocatorOnly) {
   DVSDataHandle list = nullptr;
   ASSERT_EQ(DVSData_Alloc(&list, nullptr, nullptr), QEX_OK);
   EXPECT_EQ(raised_by([=] { DVSQEX_DataFree(list); }),

@@ -18,7 +18,7 @@ struct Faults : Queries {
   Faults &operator=(Faults const &) = delete;
 };
 
-TEST_F(Faults, TheNthCallAnswersAStatus) {
+TEST_F(Faults, TheNthCallReturnsAStatus) {
   ASSERT_EQ(simhost_fail_call("VSDVS_SetMTU", 2, 2, QEX_NO_MEMORY), QEX_OK);
   EXPECT_EQ(VSDVS_SetMTU("s", 2000), QEX_OK);
   EXPECT_EQ(VSDVS_SetMTU("s", 3000), QEX_NO_MEMORY);

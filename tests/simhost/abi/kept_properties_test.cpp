@@ -92,7 +92,7 @@ TEST_F(KeptProperties, TheUplinkPortsArePropertiesOfTheSwitchAndOfTheHost) {
   VSDVS_FreeMemory(ids);
 }
 
-TEST_F(KeptProperties, AnUplinkPortHasAThirdDoor) {
+TEST_F(KeptProperties, AnUplinkPortHasAThirdCall) {
   int number = 0;
   ASSERT_EQ(VSDVS_DvPortIDToPortID("s", "uplink2", &number), QEX_OK);
   auto const id = static_cast<qex_uint32>(number);

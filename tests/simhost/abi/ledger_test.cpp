@@ -18,7 +18,7 @@ using simhost::Ledger;
 using simhost::TrapKind;
 using simhost::Trapped;
 
-std::string panic_of(Ledger &ledger, void *memory) {
+std::string trap_of(Ledger &ledger, void *memory) {
   try {
     ledger.release(memory, "Taker");
     return "";
@@ -61,13 +61,13 @@ TEST(Ledger, TakesNullForNothing) {
 TEST(Ledger, RefusesMemoryOfOthers) {
   Ledger ledger;
   int mine = 0;
-  EXPECT_EQ(panic_of(ledger, &mine), "the host never gave out the memory at " + text_of(&mine));
+  EXPECT_EQ(trap_of(ledger, &mine), "the host never gave out the memory at " + text_of(&mine));
 }
 
 TEST(Ledger, RefusesTheInsideOfABlock) {
   Ledger ledger;
   auto *const inside = static_cast<char *>(ledger.allocate(8, "Giver")) + 4;
-  EXPECT_EQ(panic_of(ledger, inside), "the host never gave out the memory at " + text_of(inside));
+  EXPECT_EQ(trap_of(ledger, inside), "the host never gave out the memory at " + text_of(inside));
   EXPECT_EQ(ledger.count(), 1U);
 }
 
@@ -75,9 +75,9 @@ TEST(Ledger, NamesBothCallsWhenMemoryComesBackTwice) {
   Ledger ledger;
   auto *const block = ledger.allocate(8, "Giver");
   ledger.release(block, "FirstTaker");
-  EXPECT_EQ(panic_of(ledger, block), "the memory at " + text_of(block) +
-                                         " is given back twice: Giver gave it out, FirstTaker "
-                                         "took it back");
+  EXPECT_EQ(trap_of(ledger, block), "the memory at " + text_of(block) +
+                                        " is given back twice: Giver gave it out, FirstTaker "
+                                        "took it back");
 }
 
 TEST(Ledger, NamesTheLastLifeOfAnAddressThatCameBackToLife) {
@@ -96,7 +96,7 @@ TEST(Ledger, NamesTheLastLifeOfAnAddressThatCameBackToLife) {
     again = ledger.allocate(kSize, "SecondGiver");
     ledger.release(again, "SecondTaker");
   }
-  EXPECT_THAT(panic_of(ledger, again),
+  EXPECT_THAT(trap_of(ledger, again),
               testing::EndsWith("SecondGiver gave it out, SecondTaker took it back"));
 }
 
@@ -118,12 +118,12 @@ TEST(Ledger, NotesWhatIsNotItsMemory) {
   ledger.resize(&noted, 20);
   EXPECT_EQ(ledger.summary(), "1 x 20 bytes from Giver\n");
   EXPECT_EQ(report_of(ledger), text_of(&noted) + " 20 bytes from Giver\n");
-  EXPECT_EQ(panic_of(ledger, &noted),
+  EXPECT_EQ(trap_of(ledger, &noted),
             "Giver gave out what is at " + text_of(&noted) + ", and ItsTaker takes it back");
   EXPECT_EQ(ledger.count(), 1U);
   ledger.forget(&noted);
   EXPECT_EQ(ledger.count(), 0U);
-  EXPECT_EQ(panic_of(ledger, &noted), "the host never gave out the memory at " + text_of(&noted));
+  EXPECT_EQ(trap_of(ledger, &noted), "the host never gave out the memory at " + text_of(&noted));
 }
 
 TEST(Ledger, ReportsNothingWhenNothingIsOut) {

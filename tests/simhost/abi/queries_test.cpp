@@ -131,7 +131,7 @@ TEST_F(Queries, TheHintFollowsTheLinks) {
   EXPECT_EQ(VSQEX_PortGetTeamUplinkHint(0xFFFFFF, &hint), QEX_NOT_FOUND);
 }
 
-TEST_F(Queries, GroupsOfLinksLieBehindTheirTable) {
+TEST_F(Queries, GroupsOfLinksFollowTheirTable) {
   apply(R"({"switches": [{"alias": "s", "lags": [
             {"name": "lag-a", "uplinks": ["nic0", "nic1"]}, {"name": "lag-b", "uplinks": []}]}]})");
   ASSERT_EQ(simhost_set_link("nic0", 0), QEX_OK);

@@ -356,7 +356,7 @@ TEST_F(TypedAndRaw, WhatTheRawCallWritesATypedCallReads) {
   }
 }
 
-TEST_F(TypedAndRaw, TheRawDoorTakesNoOtherSize) {
+TEST_F(TypedAndRaw, TheRawCallTakesNoOtherSize) {
   for (auto const &calls : all_keys()) {
     auto const &value = calls.values[0];
     ASSERT_EQ(set_raw(calls, value), QEX_OK) << calls.key;

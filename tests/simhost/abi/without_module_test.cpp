@@ -24,7 +24,7 @@ TEST_F(WithoutModule, CallsWork) {
   EXPECT_EQ(VSDVS_DestroyVSwitch("s"), QEX_OK);
 }
 
-TEST_F(WithoutModuleDeathTest, GivingUpAborts) {
+TEST_F(WithoutModuleDeathTest, ATrapAborts) {
   EXPECT_EXIT(
       {
         int mine = 0;

@@ -191,7 +191,7 @@ TEST_F(Switches, AFreshHostKeepsTwoUplinksFree) {
   EXPECT_GE(free_uplinks(), 2U);
 }
 
-TEST_F(Switches, UplinksAreSharedOutAndGivenBack) {
+TEST_F(Switches, UplinksAreSharedOutAndReleased) {
   ASSERT_EQ(create({.alias = "a", .uplink_count = 1}), QEX_OK);
   ASSERT_EQ(create({.alias = "b", .uplink_count = 3}), QEX_OK);
   EXPECT_THAT(uplinks("b"), testing::ElementsAre("nic1", "nic2", "nic3"));

@@ -162,7 +162,7 @@ TEST_F(APlaneElsewhere, IsConfiguredByDocumentsAllTheSame) {
   EXPECT_EQ(known["ports"][0]["observed"]["uplink"], "nic0");
 }
 
-TEST_F(APlaneElsewhere, ThatDoesNotAnswerIsTheReasonThatCallersGet) {
+TEST_F(APlaneElsewhere, ThatCannotBeAskedIsTheReasonThatCallersGet) {
   Transaction transaction(store, Access::write);
   simhost::create_switch(transaction, {.alias = "s", .uplink_count = 1});
   auto const key = simhost::get_switch(transaction, "s").key;

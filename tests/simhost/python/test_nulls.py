@@ -45,7 +45,7 @@ def test_a_status_says_that_null_is_no_argument(results: Dict[Tuple[str, str], s
     assert wrong == {}
 
 
-def test_calls_without_a_status_answer_nothing(results: Dict[Tuple[str, str], str]) -> None:
+def test_calls_without_a_status_return_nothing(results: Dict[Tuple[str, str], str]) -> None:
     others = {key: answer for key, answer in results.items() if answer[0] == "("}
     assert {key: answer for key, answer in others.items() if answer.lower() != "(none)"} == {}
     assert ("DVS_SwitchId", "handle") in others

@@ -18,8 +18,8 @@ FOLDER = Path(os.environ["BUILD_DIR"]) / "simhost"
 SIMHOST = ctypes.CDLL(str(FOLDER / "libsimhost.so"))
 NEBPUBLIC = ctypes.CDLL(str(FOLDER / "libnebPublic.so"))
 
-# The numbers that these answer are no statuses, or a status is all that they have to show.
-ANSWERS_NUMBERS = {"DVS_GetMaxPorts", "DVS_Version", "DVSData_PropType", "DVSQEX_PortFind"}
+# The numbers that these return are no statuses, or a status is all that they have to show.
+RETURN_NUMBERS = {"DVS_GetMaxPorts", "DVS_Version", "DVSData_PropType", "DVSQEX_PortFind"}
 # What these do shows in the ledger only: in what is out and how large it is.
 IN_LEDGER = {
     "DVSData_Alloc",
@@ -77,7 +77,7 @@ class Witness:
     def note(self, name: str, result: Any, outputs: Any = ()) -> None:
         """Notes an answer; one that is no success says nothing of what the call does."""
         status, *shown = result if isinstance(result, (list, tuple)) else [result]
-        if name not in ANSWERS_NUMBERS and type(status) is int and status != vs.QEX_OK:
+        if name not in RETURN_NUMBERS and type(status) is int and status != vs.QEX_OK:
             return
         following = [*outputs[1:], None]
         seen = [_shown(one) for one in [status, *shown]]

@@ -83,7 +83,7 @@ TEST(Store, AClosedFileIsTheWholeState) {
   EXPECT_TRUE(has(copy, "a"));
 }
 
-TEST(Store, OnlyANewStateIsFurnished) {
+TEST(Store, OnlyANewStateIsPopulated) {
   TemporaryFolder const folder;
   int times = 0;
   auto const populate = [&](Transaction &transaction) {
