@@ -35,6 +35,7 @@ from libvswitch.errors import (
 )
 from vswitch.host import Host
 from vswitch.mirroring import Mirroring
+from vswitch.plan import Plan
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
 from vswitch.transaction import Transaction
@@ -92,6 +93,7 @@ __all__ = [
     "NotFound",
     "NotRestored",
     "NotSupported",
+    "Plan",
     "Port",
     "PortMacLearning",
     "PortStats",

@@ -14,6 +14,7 @@ from libvswitch.enums import MacType
 from libvswitch.errors import NoUplink
 from vswitch import _settings, _table
 from vswitch._thing import Item, Thing
+from vswitch.words import ABSENT
 from vswitch.values import MacEntry, MirrorStats, PortStats, Words
 
 if typing.TYPE_CHECKING:
@@ -22,6 +23,8 @@ if typing.TYPE_CHECKING:
     from vswitch.switch import Switch
 
 _TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
+# As a text in a document it would clear the setting.
+_ABSENT = ABSENT.encode() + b"\0"
 _COUNTERS = tuple(PortStats.__dataclass_fields__)[:16]
 
 
@@ -44,7 +47,7 @@ def host_state(host: "Host") -> Dict[str, Words]:
     switches = [switch_state(one) for one in host.switches.values()]
     return {
         "uplinks": uplinks_state(host),
-        "runtime_options": dict(host.options),
+        "runtime_options": host.options.all(),
         "mac_learning": host.mac_learning.words(),
         "switches": switches,
     }
@@ -149,5 +152,6 @@ def other_properties(
     return {
         key: {"type": _TYPES.get(item.propertyType, str(item.propertyType)), "hex": item.data.hex()}
         for key, item in sorted(held.items())
-        if key not in _table.COMPUTED and usual.get(key) != item.propertyType
+        if key not in _table.COMPUTED
+        and (usual.get(key) != item.propertyType or item.data == _ABSENT)
     }

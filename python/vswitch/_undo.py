@@ -290,6 +290,46 @@ def _own(thing: Thing) -> Dict[str, Item]:
     return {key: item for key, item in held.items() if key not in _table.COMPUTED}
 
 
+class Macs(Step):
+    """The addresses in the table of a port that somebody put there."""
+
+    def __init__(self, port: "Port") -> None:
+        self._port = port
+        self._before = kept_macs(port)
+
+    def undo(self) -> None:
+        now = kept_macs(self._port)
+        for (mac, vlan), entry in now.items():
+            if self._before.get((mac, vlan)) != entry:
+                self._port._take_mac(mac, vlan)
+        for key, kept in self._before.items():
+            if now.get(key) != kept:
+                put_mac(self._port, key, kept)
+
+    def left(self) -> List[str]:
+        return [] if kept_macs(self._port) == self._before else [self.what()]
+
+    def what(self) -> str:
+        return f"{self._port.path}: macs"
+
+
+_Key = Tuple[str, int]
+_Kept = Tuple[MacType, int]
+
+
+def kept_macs(port: "Port") -> Dict[_Key, _Kept]:
+    """Static addresses and those of users, with their types and networks."""
+    if not port.switch.running:
+        return {}
+    kept = [one for one in port.macs if one.type in (MacType.STATIC, MacType.USER)]
+    return {(one.mac, one.vlan): (one.type, one.vni) for one in kept}
+
+
+def put_mac(port: "Port", key: _Key, kept: _Kept) -> None:
+    (mac, vlan), (type_, vni) = key, kept
+    checked.VSQEX_SetPortMACTable(*port.owner, checked.VSMACEntry(mac, type_, False, vlan, vni))
+
+
 class RemovedPort(Step):
     """A port that is removed. Added again it is a new one, which has all that was set."""
 
@@ -298,25 +338,22 @@ class RemovedPort(Step):
         self._properties = _own(port)
         self._number = port.number
         self._external_id = port.external_id
-        self._macs = port.macs if port.switch.running else ()
+        self._macs = kept_macs(port)
 
     def undo(self) -> None:
         if not self._port.exists():
             self._add()
         restore(self._port, dict(self._properties))
-        for entry in self._macs:
-            if entry.type in (MacType.STATIC, MacType.USER) and entry not in self._port.macs:
-                self._put(entry.mac, entry.type, entry.vlan, entry.vni)
+        now = kept_macs(self._port)
+        for key, kept in self._macs.items():
+            if now.get(key) != kept:
+                put_mac(self._port, key, kept)
 
     def _add(self) -> None:
         if self._external_id is not None:
             checked.VSDVS_AddOpaqueDVPort(*self._port.owner, self._external_id)
         else:
             checked.DVSQEX_PortAdd(self._port.switch.identifier, self._port.id)
-
-    def _put(self, mac: str, type_: MacType, vlan: int, vni: int) -> None:
-        entry = checked.VSMACEntry(mac, type_, False, vlan, vni)
-        checked.VSQEX_SetPortMACTable(*self._port.owner, entry)
 
     def left(self) -> List[str]:
         path = self._port.path

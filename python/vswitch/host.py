@@ -2,8 +2,7 @@
 
 import ctypes
 import threading
-import typing
-from typing import Any, Callable, Dict, Iterable, Iterator, Mapping, Optional, Tuple, Union
+from typing import Any, Callable, Dict, Iterable, Iterator, Mapping, Optional, Tuple
 
 import _libvswitch as _flat
 import libvswitch as _vs
@@ -11,67 +10,15 @@ from libvswitch import checked
 from libvswitch.errors import HostError, NotFound
 from vswitch import _describing, _records, _table, _undo, words as _words
 from vswitch._mapping import Live
-from vswitch._properties import RUNTIME_OPTIONS
 from vswitch._thing import Thing
+from vswitch.documents import Document
+from vswitch.options import Options
+from vswitch.plan import Plan
 from vswitch.port import Port
 from vswitch.switch import Switch
 from vswitch.transaction import Transaction
 from vswitch.uplink import Uplink, find_port_of
 from vswitch.values import MacEntry, MacLearning, Words, to_words
-
-Option = Union[int, str]
-
-
-class Options(typing.MutableMapping[str, Option]):
-    """The runtime options of the host, by their names; to delete one sets its default."""
-
-    def __init__(self, host: "Host") -> None:
-        self._host = host
-
-    def _all(self) -> Dict[str, checked.VSRuntimeOption]:
-        return {one.name: one for one in checked.VSQEX_GetRuntimeOptions()}
-
-    def _get(self, name: str) -> checked.VSRuntimeOption:
-        known = self._all()
-        if name not in known:
-            raise NotFound(f"no runtime option {name!r} (there are {', '.join(sorted(known))})")
-        return known[name]
-
-    def __getitem__(self, name: str) -> Option:
-        return self._get(name).value
-
-    def __setitem__(self, name: str, value: Option) -> None:
-        type_ = self._get(name).type
-        held = read_option(name, value, name)
-        self._host._note(_undo.Options, (type_,))
-        checked.VSQEX_SetRuntimeOptions([checked.VSRuntimeOption(type_, held)])
-
-    def __delitem__(self, name: str) -> None:
-        self[name] = _option(name)["default"]
-
-    def __contains__(self, name: object) -> bool:
-        return name in self._all()
-
-    def __iter__(self) -> Iterator[str]:
-        return iter(self._all())
-
-    def __len__(self) -> int:
-        return len(self._all())
-
-    def __repr__(self) -> str:
-        return f"Options({dict(self)!r})"
-
-
-def _option(name: str) -> Dict[str, Any]:
-    return next((one for one in RUNTIME_OPTIONS if one["name"] == name), {})
-
-
-def read_option(name: str, value: object, path: str) -> Option:
-    """The value of a runtime option, checked."""
-    known = _option(name)
-    if "least" in known:
-        return _words.number(value, path, known["least"], known["greatest"])
-    return _words.address(value, path) if known else value  # type: ignore[return-value]
 
 
 class Host:
@@ -193,6 +140,10 @@ class Host:
             for name in named:
                 switch.add_uplink(name)
         return switch
+
+    def plan(self, document: Document) -> Plan:
+        """What a document would change; see Plan."""
+        return Plan(self, document)
 
     def transaction(self) -> Transaction:
         """A block that changes everything or nothing; see Transaction."""

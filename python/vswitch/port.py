@@ -7,7 +7,7 @@ import libvswitch as _vs
 from libvswitch import checked
 from libvswitch.enums import Forbid, LinkState, MacType, Multicast
 from libvswitch.errors import NotFound, NoUplink
-from vswitch import _describing, _table, _undo
+from vswitch import _describing, _table, _undo, words as _words
 from vswitch.mirroring import Mirroring
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
@@ -195,6 +195,23 @@ class Port(AnyPort):
         learned = checked.VSQEX_GetPortMACLearningStats(self.switch.alias, self.id).asdict()
         counted = _describing.statistics(self.get_property(_vs.QEX_NEBPROP_PORT_STATISTICS))
         return PortStats(**counted, **learned)
+
+    def add_mac(
+        self, mac: str, *, type: MacType = MacType.STATIC, vlan: int = 0, vni: int = 0
+    ) -> None:
+        """Puts an address into its table, static or a user's."""
+        entry = checked.VSMACEntry(_words.mac(mac), type, False, vlan, vni)
+        self.host._note(_undo.Macs, self)
+        checked.VSQEX_SetPortMACTable(*self.owner, entry)
+
+    def remove_mac(self, mac: str, *, vlan: int = 0) -> None:
+        """Takes an address out of its table, whatever its type."""
+        self.host._note(_undo.Macs, self)
+        self._take_mac(_words.mac(mac), vlan)
+
+    def _take_mac(self, mac: str, vlan: int) -> None:
+        entry = checked.VSMACEntry(mac, MacType.ALL, False, vlan)
+        checked.VSQEX_ClearPortMACTable(*self.owner, entry)
 
     def mirrored(self, to: "Union[Port, Uplink, str]", **settings: Any) -> Mirroring:
         """Mirrors the port for the time of a block; see Mirroring."""

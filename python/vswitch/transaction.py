@@ -4,7 +4,7 @@ import typing
 from types import TracebackType
 from typing import Dict, List, Optional, Type
 
-from libvswitch.errors import HostError, NotRestored, RolledBack
+from libvswitch.errors import NotRestored, RolledBack
 from vswitch._undo import Step
 
 if typing.TYPE_CHECKING:
@@ -76,9 +76,9 @@ def _undone(step: Step) -> List[str]:
     """Undoes a step; what is left of it."""
     try:
         step.undo()
-    except HostError:
+    except Exception:
         pass  # what is there now says more
     try:
         return step.left()
-    except HostError as error:
+    except Exception as error:
         return [f"{step.what()} (nobody knows: {error})"]

@@ -1,0 +1,72 @@
+"""The runtime options of the host."""
+
+import typing
+from typing import Any, Dict, Iterator, Union
+
+from libvswitch import checked
+from libvswitch.errors import NotFound
+from vswitch import _undo, words as _words
+from vswitch._properties import RUNTIME_OPTIONS
+
+if typing.TYPE_CHECKING:
+    from vswitch.host import Host
+
+__all__ = ["Options", "read_option"]
+
+Option = Union[int, str]
+
+
+class Options(typing.MutableMapping[str, Option]):
+    """The runtime options of the host, by their names; to delete one sets its default."""
+
+    def __init__(self, host: "Host") -> None:
+        self._host = host
+
+    def all(self) -> Dict[str, Option]:
+        """All of them, asked for at once."""
+        return {name: one.value for name, one in self._all().items()}
+
+    def _all(self) -> Dict[str, checked.VSRuntimeOption]:
+        return {one.name: one for one in checked.VSQEX_GetRuntimeOptions()}
+
+    def _get(self, name: str) -> checked.VSRuntimeOption:
+        known = self._all()
+        if name not in known:
+            raise NotFound(f"no runtime option {name!r} (there are {', '.join(sorted(known))})")
+        return known[name]
+
+    def __getitem__(self, name: str) -> Option:
+        return self._get(name).value
+
+    def __setitem__(self, name: str, value: Option) -> None:
+        type_ = self._get(name).type
+        held = read_option(name, value, name)
+        self._host._note(_undo.Options, (type_,))
+        checked.VSQEX_SetRuntimeOptions([checked.VSRuntimeOption(type_, held)])
+
+    def __delitem__(self, name: str) -> None:
+        self[name] = _option(name)["default"]
+
+    def __contains__(self, name: object) -> bool:
+        return name in self._all()
+
+    def __iter__(self) -> Iterator[str]:
+        return iter(self._all())
+
+    def __len__(self) -> int:
+        return len(self._all())
+
+    def __repr__(self) -> str:
+        return f"Options({self.all()!r})"
+
+
+def _option(name: str) -> Dict[str, Any]:
+    return next((one for one in RUNTIME_OPTIONS if one["name"] == name), {})
+
+
+def read_option(name: str, value: object, path: str) -> Option:
+    """The value of a runtime option, checked."""
+    known = _option(name)
+    if "least" in known:
+        return _words.number(value, path, known["least"], known["greatest"])
+    return _words.address(value, path)
