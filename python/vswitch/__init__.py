@@ -33,6 +33,7 @@ from libvswitch.errors import (
     RolledBack,
     Trapped,
 )
+from vswitch.exits import exits
 from vswitch.host import Host
 from vswitch.mirroring import Mirroring
 from vswitch.plan import Plan
@@ -108,4 +109,5 @@ __all__ = [
     "Uplink",
     "UplinkPort",
     "Vlan",
+    "exits",
 ]

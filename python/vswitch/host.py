@@ -2,13 +2,24 @@
 
 import ctypes
 import threading
-from typing import Any, Callable, Dict, Iterable, Iterator, Mapping, Optional, Tuple
+from typing import (
+    Any,
+    AsyncIterator,
+    Callable,
+    Collection,
+    Dict,
+    Iterable,
+    Iterator,
+    Mapping,
+    Optional,
+    Tuple,
+)
 
 import _libvswitch as _flat
 import libvswitch as _vs
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound
-from vswitch import _describing, _records, _table, _undo, words as _words
+from vswitch import _describing, _records, _table, _undo, watch as watching, words as _words
 from vswitch._mapping import Live
 from vswitch._thing import Thing
 from vswitch.documents import Document
@@ -18,7 +29,7 @@ from vswitch.port import Port
 from vswitch.switch import Switch
 from vswitch.transaction import Transaction
 from vswitch.uplink import Uplink, find_port_of
-from vswitch.values import MacEntry, MacLearning, Words, to_words
+from vswitch.values import Event, MacEntry, MacLearning, Words, to_words
 
 
 class Host:
@@ -152,6 +163,27 @@ class Host:
     def _whole(self) -> Transaction:
         """Several writes that are one to the caller, who gets what they raise."""
         return Transaction(self, raises=False)
+
+    def watch(
+        self,
+        every: float = 1.0,
+        seconds: Optional[float] = None,
+        kinds: Optional[Collection[str]] = None,
+    ) -> Iterator[Event]:
+        """What changes from now on, looked for every so many seconds, until so many are over.
+
+        `kinds` are some of watch.KINDS.
+        """
+        return watching.watch(self, every, seconds, kinds)
+
+    def awatch(
+        self,
+        every: float = 1.0,
+        seconds: Optional[float] = None,
+        kinds: Optional[Collection[str]] = None,
+    ) -> AsyncIterator[Event]:
+        """The same for `async for`; others go on meanwhile."""
+        return watching.awatch(self, every, seconds, kinds)
 
     # What transactions are told
 

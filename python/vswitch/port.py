@@ -17,6 +17,7 @@ from vswitch.values import (
     Group,
     MacEntry,
     Mirror,
+    MirrorEnd,
     PortMacLearning,
     PortStats,
     Teaming,
@@ -213,7 +214,7 @@ class Port(AnyPort):
         entry = checked.VSMACEntry(mac, MacType.ALL, False, vlan)
         checked.VSQEX_ClearPortMACTable(*self.owner, entry)
 
-    def mirrored(self, to: "Union[Port, Uplink, str]", **settings: Any) -> Mirroring:
+    def mirrored(self, to: "Union[Port, Uplink, MirrorEnd, str]", **settings: Any) -> Mirroring:
         """Mirrors the port for the time of a block; see Mirroring."""
         return Mirroring(self, to, settings)
 

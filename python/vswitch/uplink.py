@@ -72,6 +72,8 @@ class Uplink:
 
         Each way it waits for the link. NotRestored says that it did not come up again.
         """
+        if self.link is not LinkState.UP:
+            raise HostError(f"{self.path} is down already")
         try:
             self._set(LinkState.DOWN)
             self.wait(LinkState.DOWN, timeout)

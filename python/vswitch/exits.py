@@ -1,0 +1,80 @@
+"""How a tool ends: errors in words, and a status that scripts can trust."""
+
+import contextlib
+import os
+import sys
+from types import TracebackType
+from typing import Optional, Type
+
+from libvswitch.errors import HostError, NotRestored
+from vswitch.words import DocumentError
+
+__all__ = ["exits"]
+
+REFUSED = 1
+CHANGED = 3
+INTERRUPTED = 130
+
+
+class exits(contextlib.ContextDecorator):
+    """Ends a tool: `with exits("tool"): main()`, or as a decorator of its main function.
+
+    What the host or the system refuses, and what is wrong with a document, is told on standard
+    error, and the status is 1; 3 when something is left changed that should not be. A reader who
+    closes the pipe has seen enough: that is no error. What else is raised is a mistake in the tool,
+    and keeps its traceback.
+    """
+
+    def __init__(self, tool: str) -> None:
+        self._tool = tool
+
+    def __enter__(self) -> "exits":
+        return self
+
+    def __exit__(
+        self,
+        kind: Optional[Type[BaseException]],
+        raised: Optional[BaseException],
+        trace: Optional[TracebackType],
+    ) -> None:
+        if raised is None:
+            raised = _flushed()
+        if raised is None or isinstance(raised, SystemExit):
+            return
+        if isinstance(raised, BrokenPipeError):
+            _close_output()
+            sys.exit(0)
+        status = _status(raised)
+        if status is not None:
+            self._tell(raised)
+            _flushed()
+            sys.exit(status)
+
+    def _tell(self, raised: BaseException) -> None:
+        words = "interrupted" if isinstance(raised, KeyboardInterrupt) else str(raised)
+        with contextlib.suppress(OSError):
+            print(f"{self._tool}: {words}", file=sys.stderr, flush=True)
+
+
+def _status(raised: BaseException) -> Optional[int]:
+    if isinstance(raised, NotRestored):
+        return CHANGED
+    if isinstance(raised, (HostError, DocumentError, OSError)):
+        return REFUSED
+    return INTERRUPTED if isinstance(raised, KeyboardInterrupt) else None
+
+
+def _flushed() -> Optional[OSError]:
+    """Writes what is still to be written, while there is somebody to tell that it cannot be."""
+    try:
+        sys.stdout.flush()
+    except OSError as error:
+        _close_output()
+        return error
+    return None
+
+
+def _close_output() -> None:
+    """What is left goes nowhere: the interpreter would complain of it when it ends."""
+    with contextlib.suppress(OSError, ValueError):
+        os.dup2(os.open(os.devnull, os.O_WRONLY), sys.stdout.fileno())

@@ -1,0 +1,104 @@
+"""How tools end: what they print where, and their status."""
+
+import subprocess
+import sys
+from pathlib import Path
+from typing import Optional
+
+import pytest
+
+PROGRAM = """
+import sys
+import vswitch
+from vswitch import exits
+
+def main():
+{body}
+
+if __name__ == "__main__":
+    with exits("tool"):
+        main()
+"""
+
+
+def run(
+    body: str, tmp_path: Path, stdout: Optional[int] = subprocess.PIPE
+) -> "subprocess.CompletedProcess[str]":
+    program = tmp_path / "tool.py"
+    lines = "".join(f"    {line}\n" for line in body.splitlines())
+    program.write_text(PROGRAM.format(body=lines))
+    return subprocess.run(
+        [sys.executable, str(program)], stdout=stdout, stderr=subprocess.PIPE, text=True
+    )
+
+
+@pytest.mark.parametrize(
+    "body, status, stderr",
+    [
+        ("print('done')", 0, ""),
+        (
+            "print('done'); vswitch.Host().switches['nope']",
+            1,
+            "tool: no switch 'nope' (there are vswitch0)\n",
+        ),
+        (
+            "print('done'); vswitch.Host().plan({'x': 1})",
+            1,
+            "tool: x: unknown key; there are mac_learning, observed, options,"
+            " runtime_options, switches, uplinks\n",
+        ),
+        (
+            "print('done'); open('/nowhere/file')",
+            1,
+            "tool: [Errno 2] No such file or directory: '/nowhere/file'\n",
+        ),
+        (
+            "print('done'); raise vswitch.NotRestored('the link is down', left=['lab/nic0'])",
+            3,
+            "tool: the link is down\n",
+        ),
+        ("print('done'); raise KeyboardInterrupt", 130, "tool: interrupted\n"),
+        ("print('done'); sys.exit(2)", 2, ""),
+        ("print('done'); sys.exit('said already')", 1, "said already\n"),
+    ],
+)
+def test_how_a_tool_ends(body: str, status: int, stderr: str, tmp_path: Path) -> None:
+    done = run(body, tmp_path)
+    assert (done.stderr, done.stdout, done.returncode) == (stderr, "done\n", status)
+
+
+def test_a_mistake_in_the_tool_keeps_its_traceback(tmp_path: Path) -> None:
+    done = run("None.name", tmp_path)
+    assert done.returncode == 1 and done.stderr.startswith("Traceback")
+    assert "AttributeError: 'NoneType' object has no attribute 'name'" in done.stderr
+
+
+@pytest.mark.parametrize("body", ["print('x' * 2**20)", "print('x')"])
+def test_a_closed_pipe_is_no_error(body: str, tmp_path: Path) -> None:
+    """Whether the pipe is found closed while the tool writes, or when it ends."""
+    program = tmp_path / "tool.py"
+    program.write_text(PROGRAM.format(body=f"    {body}\n"))
+    # The reader is gone before the tool begins.
+    shell = f'"{sys.executable}" "{program}" 2>"{tmp_path}/stderr"; echo $? >"{tmp_path}/status"'
+    subprocess.run(["sh", "-c", f"({shell}) | true"], check=True)
+    assert (tmp_path / "stderr").read_text() == ""
+    assert (tmp_path / "status").read_text() == "0\n"
+
+
+@pytest.mark.parametrize("body", ["print('x' * 2**20)", "print('x')"])
+def test_what_cannot_be_written_is_an_error(body: str, tmp_path: Path) -> None:
+    with open("/dev/full", "w") as full:
+        done = run(body, tmp_path, full.fileno())
+    assert (done.stderr, done.returncode) == ("tool: [Errno 28] No space left on device\n", 1)
+
+
+def test_as_a_decorator() -> None:
+    from vswitch import HostError, exits
+
+    @exits("tool")
+    def main() -> None:
+        raise HostError("no")
+
+    with pytest.raises(SystemExit) as raised:
+        main()
+    assert raised.value.code == 1
