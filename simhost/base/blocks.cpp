@@ -83,7 +83,11 @@ BytesView Reader::bytes() {
 
 std::string Reader::text() {
   auto const raw = bytes();
-  return {reinterpret_cast<char const *>(raw.data()), raw.size()};
+  std::string_view const text(reinterpret_cast<char const *>(raw.data()), raw.size());
+  if (text.find('\0') != std::string_view::npos) {
+    throw Refused(QEX_INVALID_METADATA);
+  }
+  return std::string(text);
 }
 
 void Reader::end() const {

@@ -43,6 +43,7 @@ class Reader {
   [[nodiscard]] BlockKind kind() const { return kind_; }
   std::uint32_t number();
   BytesView bytes();
+  /// Without a NUL: callers could not say such a text, nor read it whole.
   std::string text();
   /// Refuses if something is left.
   void end() const;
