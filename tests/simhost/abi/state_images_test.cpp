@@ -3,8 +3,11 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <cstddef>
 #include <cstring>
+#include <string_view>
+#include <vector>
 
 #include "configured_switch.h"
 #include "vswitch/properties.h"
@@ -22,6 +25,30 @@ Bytes image(QEX_ReturnStatus (*get)(void **, int *)) {
 
 QEX_ReturnStatus deserialize(Bytes bytes) {
   return DVSState_ConfigDeserialize(bytes.data(), static_cast<int>(bytes.size()));
+}
+
+constexpr std::size_t kHeader = 24;
+
+// The sum is the last field of the header.
+Bytes with_sum(Bytes bytes) {
+  qex_uint32 sum = 2166136261U;
+  for (std::size_t at = kHeader; at < bytes.size(); ++at) {
+    sum = (sum ^ bytes[at]) * 16777619U;
+  }
+  std::memcpy(&bytes[kHeader - sizeof sum], &sum, sizeof sum);
+  return bytes;
+}
+
+// For each place where an image has the text, the image with a NUL inside of it.
+std::vector<Bytes> with_a_nul_in(std::string_view text, Bytes const &image) {
+  std::vector<Bytes> images;
+  auto at = image.begin();
+  while ((at = std::search(at, image.end(), text.begin(), text.end())) != image.end()) {
+    auto bad = image;
+    bad[static_cast<std::size_t>(++at - image.begin())] = 0;
+    images.push_back(with_sum(bad));
+  }
+  return images;
 }
 
 TEST_F(StateImages, TheConfigurationComesBackFromItsImage) {
@@ -104,18 +131,9 @@ TEST_F(StateImages, DamagedImagesAreRefusedAndChangeNothing) {
   EXPECT_EQ(image(DVSQEX_PersistentStateGet), good);
 }
 
-// Past the checksum: what it covers may still be anything. The sum is the last field of the header.
+// Past the checksum: what it covers may still be anything.
 TEST_F(StateImages, ImagesWithARightChecksumAreReadWithCareToo) {
-  constexpr std::size_t kHeader = 24;
   auto const good = image(DVSQEX_PersistentStateGet);
-  auto const with_sum = [](Bytes bytes) {
-    qex_uint32 sum = 2166136261U;
-    for (std::size_t at = kHeader; at < bytes.size(); ++at) {
-      sum = (sum ^ bytes[at]) * 16777619U;
-    }
-    std::memcpy(&bytes[kHeader - sizeof sum], &sum, sizeof sum);
-    return bytes;
-  };
   ASSERT_EQ(with_sum(good), good) << "this test computes the sum as the host does";
   int refused = 0;
   for (std::size_t at = kHeader; at < good.size(); ++at) {
@@ -128,6 +146,30 @@ TEST_F(StateImages, ImagesWithARightChecksumAreReadWithCareToo) {
   EXPECT_GT(refused, 100) << "most of these are no state";
   EXPECT_EQ(deserialize(good), QEX_OK);
   EXPECT_EQ(image(DVSQEX_PersistentStateGet), good);
+}
+
+// No caller could say such a name, and none could read the state any more.
+TEST_F(StateImages, ATextWithANulInItIsRefusedAndChangesNothing) {
+  ASSERT_EQ(VSDVS_CreateVSwitch("alias", "identifier", "portset", 0, 1, 0, 0, 0), QEX_OK);
+  ASSERT_EQ(VSDVS_AddOpaqueDVPort("alias", "client", "external"), QEX_OK);
+  ASSERT_EQ(set_port("com.example.key", {1}, "p", POLICY_PROP_TYPE), QEX_OK);
+  auto const persistent = image(DVSQEX_PersistentStateGet);
+  auto const whole = image(DVSQEX_StateGet);
+  for (auto const *text :
+       {"alias", "identifier", "portset", "client", "external", "nic0", "com.example.key"}) {
+    auto const configurations = with_a_nul_in(text, persistent);
+    EXPECT_FALSE(configurations.empty()) << text;
+    for (auto const &bad : configurations) {
+      ASSERT_EQ(deserialize(bad), QEX_INVALID_METADATA) << text;
+    }
+    auto const states = with_a_nul_in(text, whole);
+    EXPECT_FALSE(states.empty()) << text;
+    for (auto bad : states) {
+      ASSERT_EQ(DVSQEX_StateInit(bad.data(), static_cast<int>(bad.size())), QEX_INVALID_METADATA)
+          << text;
+    }
+  }
+  EXPECT_EQ(image(DVSQEX_StateGet), whole);
 }
 
 }  // namespace
