@@ -2,6 +2,7 @@
 #include "storage/query.h"
 
 #include <SQLiteCpp/Exception.h>
+#include <fmt/format.h>
 
 namespace simhost::storage {
 
@@ -37,6 +38,11 @@ bool Query::next() {
   connection_.require_schema_of_now();
   take(kRow);
   return found;
+}
+
+Query &Query::of_setting(std::string_view name) {
+  setting_ = name;
+  return *this;
 }
 
 void Query::require_row() {
@@ -122,8 +128,10 @@ bool Query::is_null(int column) const {
 }
 
 void Query::refuse(int column, std::string const &what) const {
-  connection_.refuse(std::string("the column '") + statement_.getColumn(column).getName() +
-                     "' holds " + what);
+  auto const holder = setting_.empty()
+                          ? fmt::format("column '{}'", statement_.getColumn(column).getName())
+                          : fmt::format("setting '{}'", setting_);
+  connection_.refuse(fmt::format("the {} holds {}", holder, what));
 }
 
 }  // namespace simhost::storage

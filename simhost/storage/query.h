@@ -43,6 +43,9 @@ class Query {
     return with(static_cast<std::int64_t>(value));
   }
 
+  /// Lets refusals name the setting whose value it is, not the column. The name must outlive this.
+  Query &of_setting(std::string_view name);
+
   /// Steps to the next row; false when there is none.
   bool next();
   /// Steps to the row that every state has; throws UnusableState without one.
@@ -75,7 +78,7 @@ class Query {
   /// Of that length.
   [[nodiscard]] std::vector<std::byte> bytes(int column, std::size_t length) const;
   [[nodiscard]] bool is_null(int column) const;
-  /// Throws UnusableState, which says that the column holds `what`.
+  /// Throws UnusableState, which says that the column, or the setting, holds `what`.
   [[noreturn]] void refuse(int column, std::string const &what) const;
 
   /// What `read` makes of the first row; nothing without one.
@@ -103,6 +106,7 @@ class Query {
   Connection &connection_;
   SQLite::Statement &statement_;
   int bound_ = 0;
+  std::string_view setting_;
   mutable std::uint64_t taken_ = 0;
   mutable std::uint64_t allowed_ = kFree;
 };

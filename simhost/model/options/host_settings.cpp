@@ -1,40 +1,44 @@
-// The global MAC learning: its names, defaults and bounds.
+// The global MAC learning: each member is a number under a name of its own.
 #include "model/options/host_settings.h"
+
+#include <string_view>
 
 #include "base/outcomes.h"
 #include "storage/running/host_settings.h"
-#include "vswitch/mac_learning.h"
 
 namespace simhost {
 namespace {
 
-constexpr std::string_view kAgingTime = "macLearning.agingTime";
-constexpr std::string_view kMacLimit = "macLearning.macLimit";
-constexpr std::string_view kLearnStatic = "macLearning.learnStatic";
+// In the order of the members.
+constexpr std::array<std::string_view, kGlobalLearningMembers.size()> kNames{
+    "macLearning.agingTime", "macLearning.macLimit", "macLearning.learnStatic"};
 
 }  // namespace
 
 VSMACLearningGlobalProps global_mac_learning(storage::Transaction &transaction) {
-  auto const number = [&](std::string_view name, std::int64_t otherwise) {
-    return storage::find_host_number(transaction, name).value_or(otherwise);
-  };
-  VSMACLearningGlobalProps props{};
-  props.agingTime = static_cast<qex_uint32>(number(kAgingTime, VS_MAC_LEARNING_AGING_TIME_DEFAULT));
-  props.macLimit =
-      static_cast<qex_uint32>(number(kMacLimit, VS_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT));
-  props.learnStatic =
-      static_cast<qex_Bool>(number(kLearnStatic, VS_MAC_LEARNING_LEARN_STATIC_DEFAULT) != 0);
+  auto props = kGlobalLearning;
+  for (std::size_t at = 0; at < kNames.size(); ++at) {
+    auto const &form = kGlobalLearningMembers[at].form;
+    if (auto const number =
+            storage::find_host_number(transaction, kNames[at], form.least, form.greatest)) {
+      form.store(&props, *number);
+    }
+  }
   return props;
 }
 
 void set_global_mac_learning(storage::Transaction &transaction,
-                             VSMACLearningGlobalProps const &props) {
-  if (props.agingTime == 0 || props.agingTime > VS_MAC_LEARNING_AGING_TIME_MAX) {
-    throw Refused(QEX_BAD_PARAM);
+                             VSMACLearningGlobalProps const &given) {
+  auto props = given;
+  props.learnStatic = given.learnStatic != 0 ? 1 : 0;
+  for (std::size_t at = 0; at < kNames.size(); ++at) {
+    auto const &form = kGlobalLearningMembers[at].form;
+    auto const number = form.load(&props);
+    if (number < form.least || number > form.greatest) {
+      throw Refused(QEX_BAD_PARAM);
+    }
+    storage::put_host_number(transaction, kNames[at], number);
   }
-  storage::put_host_number(transaction, kAgingTime, props.agingTime);
-  storage::put_host_number(transaction, kMacLimit, props.macLimit);
-  storage::put_host_number(transaction, kLearnStatic, props.learnStatic != 0 ? 1 : 0);
 }
 
 }  // namespace simhost

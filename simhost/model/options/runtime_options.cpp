@@ -12,6 +12,12 @@
 namespace simhost {
 namespace {
 
+template <int kFamily>
+bool is_address_of(std::string const &text) {
+  std::array<std::byte, sizeof(in6_addr)> address{};
+  return inet_pton(kFamily, text.c_str(), address.data()) == 1;
+}
+
 // Seconds and milliseconds as their names say; a switch is 0 or 1.
 constexpr std::array<RuntimeOption, VS_NUM_RT_OPT> kOptions{{
     {.name = "IGMPQueryInterval", .initial = 125, .least = 1, .greatest = 31744},  // seconds
@@ -27,8 +33,8 @@ constexpr std::array<RuntimeOption, VS_NUM_RT_OPT> kOptions{{
     {.name = "AllowFastPath", .initial = 1, .least = 0, .greatest = 1},
     {.name = "TeamPolicyUpDelay", .initial = 0, .least = 0, .greatest = 3600000},  // milliseconds
     {.name = "AllowMirrorStats", .initial = 1, .least = 0, .greatest = 1},
-    {.name = "IGMPRouterIP", .initial = "0.0.0.0"},
-    {.name = "MLDRouterIP", .initial = "::"},
+    {.name = "IGMPRouterIP", .initial = "0.0.0.0", .is_address = is_address_of<AF_INET>},
+    {.name = "MLDRouterIP", .initial = "::", .is_address = is_address_of<AF_INET6>},
 }};
 
 RuntimeOption const &get_option(unsigned type) {
@@ -44,10 +50,8 @@ void check_number(RuntimeOption const &option, std::int32_t number) {
   }
 }
 
-void check_address(unsigned type, std::string const &text) {
-  std::array<std::byte, sizeof(in6_addr)> address{};
-  auto const family = type == VS_RT_OPT_MLD_ROUTER_IP ? AF_INET6 : AF_INET;
-  if (inet_pton(family, text.c_str(), address.data()) != 1) {
+void check_address(RuntimeOption const &option, std::string const &text) {
+  if (!option.is_address(text)) {
     throw Refused(QEX_INVALID_ADDRESS);
   }
 }
@@ -109,10 +113,11 @@ std::span<RuntimeOption const, VS_NUM_RT_OPT> runtime_options() {
 RuntimeValue runtime_option(storage::Transaction &transaction, unsigned type) {
   auto const &option = get_option(type);
   if (option.is_number()) {
-    return static_cast<std::int32_t>(storage::find_host_number(transaction, option.name)
-                                         .value_or(std::get<std::int32_t>(option.initial)));
+    return static_cast<std::int32_t>(
+        storage::find_host_number(transaction, option.name, option.least, option.greatest)
+            .value_or(std::get<std::int32_t>(option.initial)));
   }
-  return storage::find_host_text(transaction, option.name)
+  return storage::find_host_text(transaction, option.name, option.is_address)
       .value_or(std::string(std::get<std::string_view>(option.initial)));
 }
 
@@ -130,7 +135,7 @@ void set_runtime_option(storage::Transaction &transaction, unsigned type,
     check_number(option, *number);
     storage::put_host_number(transaction, option.name, *number);
   } else {
-    check_address(type, std::get<std::string>(value));
+    check_address(option, std::get<std::string>(value));
     storage::put_host_text(transaction, option.name, std::get<std::string>(value));
   }
 }

@@ -25,8 +25,9 @@ using RuntimeValue = std::variant<std::int32_t, std::string>;
 struct RuntimeOption {
   std::string_view name;
   std::variant<std::int32_t, std::string_view> initial;
-  std::int32_t least = 0;     ///< of a number
-  std::int32_t greatest = 0;  ///< of a number
+  std::int32_t least = 0;                                 ///< of a number
+  std::int32_t greatest = 0;                              ///< of a number
+  bool (*is_address)(std::string const &text) = nullptr;  ///< of a text: whether it is a value
 
   [[nodiscard]] bool is_number() const { return std::holds_alternative<std::int32_t>(initial); }
 };

@@ -1,6 +1,8 @@
 // Host settings in SQL.
 #include "storage/running/host_settings.h"
 
+#include <fmt/format.h>
+
 #include "storage/query.h"
 
 namespace simhost::storage {
@@ -18,17 +20,29 @@ void put_value(Transaction &transaction, std::string_view name, Value const &val
 
 template <typename Read>
 auto find_value(Transaction &transaction, std::string_view name, Read const &read) {
-  return Query(transaction, "SELECT value FROM host_setting WHERE name = ?").with(name).first(read);
+  return Query(transaction, "SELECT value FROM host_setting WHERE name = ?")
+      .with(name)
+      .of_setting(name)
+      .first(read);
 }
 
 }  // namespace
 
-std::optional<std::int64_t> find_host_number(Transaction &transaction, std::string_view name) {
-  return find_value(transaction, name, [](Query const &row) { return row.integer(0); });
+std::optional<std::int64_t> find_host_number(Transaction &transaction, std::string_view name,
+                                             std::int64_t least, std::int64_t greatest) {
+  return find_value(transaction, name,
+                    [&](Query const &row) { return row.integer(0, least, greatest); });
 }
 
-std::optional<std::string> find_host_text(Transaction &transaction, std::string_view name) {
-  return find_value(transaction, name, [](Query const &row) { return row.text(0); });
+std::optional<std::string> find_host_text(Transaction &transaction, std::string_view name,
+                                          bool (*is_one)(std::string const &text)) {
+  return find_value(transaction, name, [&](Query const &row) {
+    auto text = row.text(0);
+    if (!is_one(text)) {
+      row.refuse(0, fmt::format("'{}'", text));
+    }
+    return text;
+  });
 }
 
 void put_host_number(Transaction &transaction, std::string_view name, std::int64_t value) {

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
@@ -128,6 +129,26 @@ TEST(DamagedState, SaysWhatIsWrongWithIt) {
            {"UPDATE switch SET max_ports = -1", "the column 'max_ports' holds -1"},
        }) {
     EXPECT_EQ(complaint_after(sql), complaint) << sql;
+  }
+}
+
+TEST(DamagedState, SaysWhichSettingOfTheHostNoCallCouldHaveSet) {
+  for (auto const &[name, value, holds] : {
+           std::array{"IGMPVersion", "4", "4"},
+           {"IGMPVersion", "4294967297", "4294967297"},
+           {"IGMPVersion", "'3'", "no integer"},
+           {"IGMPQueryInterval", "0", "0"},
+           {"IGMPRouterIP", "'::1'", "'::1'"},
+           {"IGMPRouterIP", "x'7F000001'", "no text"},
+           {"MLDRouterIP", "'192.0.2.1'", "'192.0.2.1'"},
+           {"macLearning.agingTime", "0", "0"},
+           {"macLearning.agingTime", "1000001", "1000001"},
+           {"macLearning.macLimit", "-1", "-1"},
+           {"macLearning.learnStatic", "2", "2"},
+       }) {
+    EXPECT_EQ(
+        complaint_after(fmt::format("INSERT INTO host_setting VALUES ('{}', {})", name, value)),
+        fmt::format("the setting '{}' holds {}", name, holds));
   }
 }
 
