@@ -1,4 +1,5 @@
 // From the host to a document.
+#include <span>
 #include <string>
 #include <utility>
 
@@ -11,10 +12,11 @@
 #include "model/plane.h"
 #include "model/switches/switches.h"
 #include "model/uplinks/lags.h"
+#include "scenario/forms.h"
+#include "scenario/members.h"
 #include "scenario/scenario.h"
 #include "scenario/settings.h"
 #include "scenario/texts.h"
-#include "scenario/words.h"
 #include "storage/store.h"
 
 namespace simhost::scenario {
@@ -36,44 +38,33 @@ double seconds(ClockTime time) {
   return static_cast<double>(time.count()) / 1000;
 }
 
-void describe_link(Json &described, Link const &link) {
-  described["link"] = word_to_json(link.carrier, kUpDown);
-  described["admin"] = word_to_json(link.admin, kUpDown);
-  described["lacp"] = word_to_json(link.partner, kUpDown);
-  described["speed"] = link.speed;
-  described["duplex"] = word_to_json(link.full_duplex, kDuplex);
-  described["beacons"] = word_to_json(link.beacons, kUpDown);
-  described["error_percent"] = link.error_percent;
-  described["driver"] = link.driver;
-}
-
 Json uplink_to_json(Transaction &transaction, storage::Uplink const &uplink) {
-  Json described{{"name", uplink.name}};
+  Json described{{kName, uplink.name}};
   if (auto *const wires = running_plane().find_wires()) {
-    describe_link(described, wires->link_of(transaction, uplink.name));
+    auto const link = wires->link_of(transaction, uplink.name);
+    add_members(described, kLinkMembers, &link);
   }
   if (uplink.port) {
     auto const port = get_port(transaction, *uplink.port);
-    described["observed"] = {
+    described[std::string(kObserved)] = {
         {"switch", storage::get_switch_row(transaction, port.switch_key).row.alias},
         {"port", port.identifier}};
   }
   return described;
 }
 
-Json address_to_json(VSMACEntry const &entry) {
-  VSMACAddrType const type = entry.macAddrType;
-  return {{"mac", mac_text(std::as_bytes(std::span(entry.macAddress)))},
-          {"vlan", qex_VlanID{entry.vid}},
-          {"vni", qex_uint32{entry.vni}},
-          {"type", word_to_json(type, kAddressTypes)},
-          {"ages", entry.aging != 0},
-          {"age", qex_uint32{entry.elapsed}}};
+// What the members of an object say.
+template <typename Object>
+Json object_to_json(std::span<Member const> members, Object const &object) {
+  Json said = Json::object();
+  add_members(said, members, &object);
+  return said;
 }
 
 Json addresses_to_json(Transaction &transaction, Place const &place) {
-  return each_to_json(running_plane().addresses(transaction, place, VS_MAC_ADDR_TYPE_ALL),
-                      address_to_json);
+  return each_to_json(
+      running_plane().addresses(transaction, place, VS_MAC_ADDR_TYPE_ALL),
+      [](VSMACEntry const &entry) { return object_to_json(kAddressMembers, entry); });
 }
 
 Json groups_to_json(Transaction &transaction, storage::PortNumber port) {
@@ -82,12 +73,9 @@ Json groups_to_json(Transaction &transaction, storage::PortNumber port) {
     for (auto const &address :
          running_plane().groups(transaction, port, static_cast<std::size_t>(length))) {
       auto const group = *running_plane().group(transaction, port, address);
-      list.push_back({{"address", address_text(address)},
-                      {"version", group.version},
-                      {"source_mode", word_to_json(group.source_mode, kSourceModes)},
-                      {"sources", each_to_json(group.sources, address_text)},
-                      {"vni", group.vni},
-                      {"observed", {{"updated", seconds(group.updated)}}}});
+      auto described = object_to_json(kGroupMembers, group);
+      described[std::string(kObserved)] = {{"updated", seconds(group.updated)}};
+      list.push_back(std::move(described));
     }
   }
   return list;
@@ -121,7 +109,7 @@ Json port_to_json(Transaction &transaction, storage::Port const &port) {
     observed["uplink"] = nullptr;
     observed["why"] = refusal_text(refused);
   }
-  described["observed"] = std::move(observed);
+  described[std::string(kObserved)] = std::move(observed);
   return described;
 }
 
@@ -143,9 +131,13 @@ Json uplink_ports_to_json(Transaction &transaction, storage::SwitchKey key) {
 }
 
 Json lag_to_json(Lag const &lag) {
-  return {{"name", lag.name},
-          {"uplinks", each_to_json(lag.members, [](auto const &member) { return member.uplink; })},
-          {"observed", {{"id", lag.id}, {"up", lag.up()}}}};
+  LagMembers members{.name = lag.name, .uplinks = {}};
+  for (auto const &member : lag.members) {
+    members.uplinks.push_back(member.uplink);
+  }
+  auto described = object_to_json(kLagMembers, members);
+  described[std::string(kObserved)] = {{"id", lag.id}, {"up", lag.up()}};
+  return described;
 }
 
 Json ports_to_json(Transaction &transaction, storage::SwitchKey key) {
@@ -192,20 +184,16 @@ Json switch_to_json(Transaction &transaction, storage::FoundSwitch const &known)
 
 Json fault_to_json(WaitingFault const &waiting) {
   auto const &fault = waiting.fault;
-  Json described{{"call", fault.function},
-                 {"nth", fault.first},
-                 {"times", fault.last == Fault::kForever ? 0 : fault.last - fault.first + 1}};
-  if (fault.status != QEX_OK) {
-    described["status"] = status_name(fault.status);
-  }
-  if (!fault.exception.empty()) {
-    described["exception"] = fault.exception;
-    described["message"] = fault.message;
-  }
-  if (fault.delay.count() > 0) {
-    described["delay"] = seconds(fault.delay);
-  }
-  described["observed"] = {{"calls", waiting.seen}};
+  auto described = object_to_json(
+      kFaultMembers,
+      FaultMembers{.call = fault.function,
+                   .nth = fault.first,
+                   .times = fault.last == Fault::kForever ? 0 : fault.last - fault.first + 1,
+                   .status = fault.status == QEX_OK ? "" : status_name(fault.status),
+                   .exception = fault.exception,
+                   .message = fault.message,
+                   .delay = fault.delay.count()});
+  described[std::string(kObserved)] = {{"calls", waiting.seen}};
   return described;
 }
 
@@ -222,17 +210,12 @@ Json runtime_options_to_json(Transaction &transaction) {
 }  // namespace
 
 Json host_to_json(Transaction &transaction) {
-  Json host{
-      {"clock",
-       {{"stopped", clock_is_stopped(transaction)}, {"now", seconds(clock_now(transaction))}}}};
+  Json host{{"clock", object_to_json(kClockMembers, clock_members(transaction))}};
   host["uplinks"] = each_to_json(
       storage::all_uplinks(transaction),
       [&](storage::Uplink const &uplink) { return uplink_to_json(transaction, uplink); });
   host["runtime_options"] = runtime_options_to_json(transaction);
-  auto const learning = global_mac_learning(transaction);
-  host["mac_learning"] = {{"aging_time", qex_uint32{learning.agingTime}},
-                          {"limit", qex_uint32{learning.macLimit}},
-                          {"learn_static", learning.learnStatic != 0}};
+  host["mac_learning"] = object_to_json(kGlobalLearningMembers, global_mac_learning(transaction));
   host["switches"] = each_to_json(
       storage::all_switches(transaction),
       [&](storage::FoundSwitch const &known) { return switch_to_json(transaction, known); });

@@ -11,18 +11,11 @@
 #include <utility>
 #include <vector>
 
+#include "scenario/members.h"
 #include "scenario/texts.h"
 
 namespace simhost::scenario {
 namespace {
-
-std::vector<std::string_view> names_of(std::span<Member const> members) {
-  std::vector<std::string_view> names;
-  for (auto const &member : members) {
-    names.push_back(member.name);
-  }
-  return names;
-}
 
 Member const *find_member(std::span<Member const> members, std::string_view name) {
   auto const found = std::find_if(members.begin(), members.end(),
@@ -89,11 +82,16 @@ Json range_to_json(std::int64_t first, std::int64_t last) {
 }
 
 Bytes address_from(Form const &form, Node const &node) {
-  bool const is_mac = form.kind == FormKind::mac;
   auto address = scenario::address_from(node.text());
-  if (!address || (address->size() == kMacBytes) != is_mac) {
-    node.fail(is_mac ? "must be six bytes such as 02:00:00:00:00:01"
-                     : "must be an IPv4 or IPv6 address");
+  bool const is_mac = address && address->size() == kMacBytes;
+  if (form.kind == FormKind::mac && !is_mac) {
+    node.fail("must be six bytes such as 02:00:00:00:00:01");
+  }
+  if (form.kind == FormKind::ip && (!address || is_mac)) {
+    node.fail("must be an IPv4 or IPv6 address");
+  }
+  if (!address) {
+    node.fail("must be an address of Ethernet, IPv4 or IPv6");
   }
   return *std::move(address);
 }
@@ -104,13 +102,7 @@ void read_record(Form const &form, Node const &node, void *object) {
     return;
   }
   node.only(names_of(form.members));
-  for (auto const &member : form.members) {
-    if (auto const given = node.find(member.name)) {
-      read(member.form, *given, object);
-    } else if (member.presence == Presence::required) {
-      node.fail(fmt::format("'{}' is missing", member.name));
-    }
-  }
+  read_members(form.members, node, object);
 }
 
 void read_one_of(Form const &form, Node const &node, void *object) {
@@ -156,11 +148,7 @@ bool is_absent(Member const &member, void const *object) {
 
 Json record_to_json(Form const &form, void const *object) {
   Json said = Json::object();
-  for (auto const &member : form.members) {
-    if (!is_absent(member, object)) {
-      said[std::string(member.name)] = to_json(member.form, object);
-    }
-  }
+  add_members(said, form.members, object);
   auto const &first = form.members.front();
   bool const is_first_alone =
       said.empty() || (said.size() == 1 && said.contains(std::string(first.name)));
@@ -181,6 +169,8 @@ std::string_view name_of(FormKind kind) {
       return "none";
     case FormKind::number:
       return "number";
+    case FormKind::seconds:
+      return "seconds";
     case FormKind::boolean:
       return "boolean";
     case FormKind::choice:
@@ -195,6 +185,8 @@ std::string_view name_of(FormKind kind) {
       return "mac";
     case FormKind::ip:
       return "ip";
+    case FormKind::address:
+      return "address";
     case FormKind::record:
       return "record";
     case FormKind::one_of:
@@ -226,7 +218,39 @@ Json members_to_json(Form const &form, void const *defaults) {
   return members;
 }
 
+void add_bound(Json &said, std::string_view name, std::size_t most) {
+  if (most != kUnbounded) {
+    said[std::string(name)] = most;
+  }
+}
+
 }  // namespace
+
+std::vector<std::string_view> names_of(std::span<Member const> members) {
+  std::vector<std::string_view> names;
+  for (auto const &member : members) {
+    names.push_back(member.name);
+  }
+  return names;
+}
+
+void read_members(std::span<Member const> members, Node const &node, void *object) {
+  for (auto const &member : members) {
+    if (auto const given = node.find(member.name)) {
+      read(member.form, *given, object);
+    } else if (member.presence == Presence::required) {
+      node.fail(fmt::format("'{}' is missing", member.name));
+    }
+  }
+}
+
+void add_members(Json &said, std::span<Member const> members, void const *object) {
+  for (auto const &member : members) {
+    if (!is_absent(member, object)) {
+      said[std::string(member.name)] = to_json(member.form, object);
+    }
+  }
+}
 
 void read(Form const &form, Node const &node, void *object) {
   switch (form.kind) {
@@ -234,6 +258,9 @@ void read(Form const &form, Node const &node, void *object) {
       node.fail("can be said by its bytes only");
     case FormKind::number:
       form.store(object, node.integer(form.least, form.greatest));
+      break;
+    case FormKind::seconds:
+      form.store(object, node.milliseconds());
       break;
     case FormKind::boolean:
       form.store(object, node.flag() ? 1 : 0);
@@ -255,6 +282,7 @@ void read(Form const &form, Node const &node, void *object) {
     }
     case FormKind::mac:
     case FormKind::ip:
+    case FormKind::address:
       form.put_bytes(object, address_from(form, node));
       break;
     case FormKind::record:
@@ -275,6 +303,8 @@ Json to_json(Form const &form, void const *object) {
       return {};
     case FormKind::number:
       return form.load(object);
+    case FormKind::seconds:
+      return static_cast<double>(form.load(object)) / 1000;
     case FormKind::boolean:
       return form.load(object) != 0;
     case FormKind::choice:
@@ -287,6 +317,7 @@ Json to_json(Form const &form, void const *object) {
       return range_to_json(form.load(object), form.load_end(object));
     case FormKind::mac:
     case FormKind::ip:
+    case FormKind::address:
       return address_text(form.bytes(object));
     case FormKind::record:
       return record_to_json(form, object);
@@ -317,7 +348,7 @@ Json form_to_json(Form const &form, void const *defaults) {
       break;
     }
     case FormKind::text:
-      said["most_bytes"] = form.most;
+      add_bound(said, "most_bytes", form.most);
       break;
     case FormKind::record:
     case FormKind::one_of:
@@ -327,7 +358,7 @@ Json form_to_json(Form const &form, void const *defaults) {
       }
       break;
     case FormKind::list:
-      said["most"] = form.most;
+      add_bound(said, "most", form.most);
       said["element"] = form_to_json(*form.element, nullptr);
       break;
     default:

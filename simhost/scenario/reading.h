@@ -8,16 +8,11 @@
 
 #include "base/outcomes.h"
 #include "scenario/document.h"
+#include "scenario/forms.h"
+#include "scenario/members.h"
 #include "scenario/texts.h"
-#include "scenario/words.h"
 
 namespace simhost::scenario {
-
-inline constexpr std::int64_t k32Bits = 0xFFFFFFFF;
-
-inline bool up_or_down(Node const &node) {
-  return node.choice(kUpDown) != 0;
-}
 
 inline std::string text_of_node(Node const &node) {
   return node.text();
@@ -25,6 +20,17 @@ inline std::string text_of_node(Node const &node) {
 
 inline std::uint32_t number_of_32_bits(Node const &node) {
   return static_cast<std::uint32_t>(node.integer(0, k32Bits));
+}
+
+/// Makes of the object what a document says of its members. The document may also have what a
+/// description adds.
+template <typename Object>
+Object read_object(std::span<Member const> members, Node const &node, Object object) {
+  auto keys = names_of(members);
+  keys.push_back(kObserved);
+  node.only(keys);
+  read_members(members, node, &object);
+  return object;
 }
 
 /// Does `work`; what the host refuses is told with the path of `node`.

@@ -1,9 +1,11 @@
 // One object for each descriptor; what does not apply to a property is left out of its object.
 #include "scenario/reference.h"
 
+#include "model/options/host_settings.h"
 #include "model/options/runtime_options.h"
 #include "model/properties/registry.h"
 #include "scenario/forms.h"
+#include "scenario/members.h"
 #include "scenario/settings.h"
 
 namespace simhost::scenario {
@@ -88,10 +90,38 @@ Json option_to_json(RuntimeOption const &option) {
   return said;
 }
 
+// The members of an object that is no setting, with the values that a new one has.
+template <typename Object>
+Json object_to_json(std::span<Member const> members, Object const *unless_given) {
+  return form_to_json(form::record<Object>(members), unless_given)["members"];
+}
+
+Json objects_to_json() {
+  Link const link;
+  auto const address = new_address();
+  McastGroup const group{};
+  FaultMembers const fault;
+  return {{"clock", object_to_json<ClockMembers>(kClockMembers, nullptr)},
+          {"uplinks", object_to_json(kLinkMembers, &link)},
+          {"mac_learning", object_to_json(kGlobalLearningMembers, &kGlobalLearning)},
+          {"lags", object_to_json<LagMembers>(kLagMembers, nullptr)},
+          {"addresses", object_to_json(kAddressMembers, &address)},
+          {"groups", object_to_json(kGroupMembers, &group)},
+          {"faults", object_to_json(kFaultMembers, &fault)}};
+}
+
 }  // namespace
 
 std::string reference() {
-  Json all{{"properties", Json::array()}, {"runtime_options", Json::array()}};
+  Json all{{"properties", Json::array()},
+           {"runtime_options", Json::array()},
+           {"objects", objects_to_json()},
+           {"keys",
+            {{"document", kDocumentKeys},
+             {"switches", kSwitchKeys},
+             {"ports", kPortKeys},
+             {"uplink_ports", kUplinkPortKeys},
+             {"uplinks", {kName, kObserved}}}}};
   for (auto const *const descriptor : descriptors()) {
     all["properties"].push_back(property_to_json(*descriptor));
   }

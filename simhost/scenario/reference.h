@@ -7,7 +7,8 @@
 
 namespace simhost::scenario {
 
-/// All properties and runtime options with their forms, bounds, defaults and words, in JSON.
+/// All properties, runtime options and objects of documents that are no settings, with their forms,
+/// bounds, defaults and words, in JSON.
 SIMHOST_API std::string reference();
 
 }  // namespace simhost::scenario

@@ -2,7 +2,7 @@
 #include "scenario/scenario.h"
 
 #include <algorithm>
-#include <array>
+#include <chrono>
 #include <string>
 
 #include "clock/clock.h"
@@ -14,7 +14,6 @@
 #include "scenario/reading.h"
 #include "scenario/scenario_switches.h"
 #include "storage/store.h"
-#include "vswitch/mac_learning.h"
 
 namespace simhost::scenario {
 namespace {
@@ -22,55 +21,36 @@ namespace {
 using storage::Transaction;
 
 void apply_clock(Transaction &transaction, Node const &node) {
-  node.only({"stopped", "now"});
-  if (auto const stopped = node.find("stopped")) {
-    if (stopped->flag()) {
-      stop_clock(transaction);
-    } else {
-      run_clock(transaction);
-    }
+  auto const before = clock_members(transaction);
+  auto const after = read_object(kClockMembers, node, before);
+  if (after.stopped != before.stopped) {
+    after.stopped ? stop_clock(transaction) : run_clock(transaction);
   }
-  if_there(node, "now",
-           [&](Node const &now) { set_clock(transaction, ClockTime(now.milliseconds())); });
-}
-
-constexpr std::array kLinkKeys{"link",   "admin",   "lacp",          "speed",
-                               "duplex", "beacons", "error_percent", "driver"};
-
-bool has_link(Node const &node) {
-  return std::ranges::any_of(kLinkKeys,
-                             [&](auto const *key) { return node.find(key).has_value(); });
+  // A clock that runs has gone on meanwhile.
+  if (node.find(kNow)) {
+    set_clock(transaction, ClockTime(after.now));
+  }
 }
 
 void apply_link(Transaction &transaction, std::string const &name, Node const &node) {
-  auto &wires = get_wires();
-  auto const before = wires.link_of(transaction, name);
-  auto link = before;
-  link.carrier = node.get("link", before.carrier, up_or_down);
-  link.admin = node.get("admin", before.admin, up_or_down);
-  link.partner = node.get("lacp", before.partner, up_or_down);
-  link.speed =
-      node.get("speed", before.speed, [](Node const &speed) { return speed.integer(1, 1000000); });
-  link.full_duplex = node.get("duplex", before.full_duplex,
-                              [](Node const &duplex) { return duplex.choice(kDuplex) != 0; });
-  link.beacons = node.get("beacons", before.beacons, up_or_down);
-  link.error_percent = node.get("error_percent", before.error_percent,
-                                [](Node const &percent) { return percent.integer(0, 100); });
-  link.driver = node.get("driver", before.driver, [](Node const &driver) { return driver.flag(); });
-  wires.change_link(transaction, name, link);
+  auto link = get_wires().link_of(transaction, name);
+  read_members(kLinkMembers, node, &link);
+  get_wires().change_link(transaction, name, link);
 }
 
 void apply_uplink(Transaction &transaction, Node const &node) {
-  node.only({"name", "link", "admin", "lacp", "speed", "duplex", "beacons", "error_percent",
-             "driver", "observed"});
-  auto const name = node.at("name").text();
+  auto const link_keys = names_of(kLinkMembers);
+  auto keys = link_keys;
+  keys.insert(keys.end(), {kName, kObserved});
+  node.only(keys);
+  auto const name = node.at(kName).text();
   if (name.empty() || name.size() >= QEX_MISC_NAME_MAX) {
-    node.at("name").fail("must have 1 to 31 bytes");
+    node.at(kName).fail("must have 1 to 31 bytes");
   }
   if (!storage::find_uplink(transaction, name)) {
     storage::add_uplink(transaction, name);
   }
-  if (has_link(node)) {
+  if (std::ranges::any_of(link_keys, [&](auto key) { return node.find(key).has_value(); })) {
     apply_link(transaction, name, node);
   }
 }
@@ -92,13 +72,8 @@ void apply_runtime_option(Transaction &transaction, std::string const &name, Nod
 }
 
 void apply_global_learning(Transaction &transaction, Node const &node) {
-  node.only({"aging_time", "limit", "learn_static"});
   auto props = global_mac_learning(transaction);
-  props.agingTime = node.get("aging_time", qex_uint32{props.agingTime}, [](Node const &given) {
-    return given.integer(1, VS_MAC_LEARNING_AGING_TIME_MAX);
-  });
-  props.macLimit = node.get("limit", qex_uint32{props.macLimit}, number_of_32_bits);
-  props.learnStatic = node.get("learn_static", props.learnStatic, &Node::flag_of);
+  read(form::record<VSMACLearningGlobalProps>(kGlobalLearningMembers), node, &props);
   set_global_mac_learning(transaction, props);
 }
 
@@ -111,20 +86,14 @@ QEX_ReturnStatus status_from(Node const &node) {
 }
 
 void apply_fault(Transaction &transaction, Node const &node) {
-  node.only({"call", "nth", "times", "status", "exception", "message", "delay", "observed"});
-  Fault fault;
-  fault.function = node.at("call").text();
-  fault.first =
-      node.get("nth", std::int64_t{1}, [](Node const &given) { return given.integer(1, k32Bits); });
-  auto const times = node.get("times", std::int64_t{1},
-                              [](Node const &given) { return given.integer(0, k32Bits); });
-  fault.last = times == 0 ? Fault::kForever : fault.first + times - 1;
-  fault.status = node.get("status", QEX_OK, status_from);
-  fault.exception = node.get("exception", std::string(), text_of_node);
-  fault.message = node.get("message", std::string(), text_of_node);
-  fault.delay = std::chrono::milliseconds(
-      node.get("delay", std::int64_t{0}, [](Node const &given) { return given.milliseconds(); }));
-  add_fault(transaction, fault);
+  auto const said = read_object(kFaultMembers, node, FaultMembers());
+  add_fault(transaction, {.function = said.call,
+                          .first = said.nth,
+                          .last = said.times == 0 ? Fault::kForever : said.nth + said.times - 1,
+                          .delay = std::chrono::milliseconds(said.delay),
+                          .status = node.get(kStatus, QEX_OK, status_from),
+                          .exception = said.exception,
+                          .message = said.message});
 }
 
 }  // namespace
@@ -132,7 +101,7 @@ void apply_fault(Transaction &transaction, Node const &node) {
 void apply(Transaction &transaction, std::string_view document) {
   auto const json = parsed(document);
   Node const node(json);
-  node.only({"clock", "uplinks", "runtime_options", "mac_learning", "switches", "faults"});
+  node.only(kDocumentKeys);
   if_there(node, "clock", [&](Node const &clock) { apply_clock(transaction, clock); });
   for_each_in(node, "uplinks", [&](Node const &item) { apply_uplink(transaction, item); });
   if_there(node, "runtime_options", [&](Node const &options) {

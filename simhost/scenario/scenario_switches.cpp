@@ -3,7 +3,7 @@
 
 #include <algorithm>
 #include <cstring>
-#include <initializer_list>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -26,9 +26,9 @@ using storage::PropertyOwner;
 using storage::Transaction;
 
 // The object must have no other keys than these and those of its settings.
-void only(Node const &node, SettingOwner kind, std::initializer_list<std::string_view> keys) {
+void only(Node const &node, SettingOwner kind, std::span<std::string_view const> keys) {
   auto all = setting_names(kind);
-  all.insert(all.end(), keys);
+  all.insert(all.end(), keys.begin(), keys.end());
   node.only(all);
 }
 
@@ -43,62 +43,15 @@ void apply_counters(Transaction &transaction, CounterOwner const &owner, Node co
            [&](Node const &counters) { set_counters(transaction, owner, counters); });
 }
 
-VSMACEntry address_entry_from(Node const &node) {
-  node.only({"mac", "vlan", "vni", "type", "ages", "age"});
-  VSMACEntry entry{};
-  auto const mac = mac_from(node.at("mac").text());
-  if (!mac) {
-    node.at("mac").fail("must be six bytes such as 02:00:00:00:00:01");
-  }
-  std::memcpy(entry.macAddress, mac->data(), mac->size());
-  auto const type = node.get("type", VS_MAC_ADDR_TYPE_LEARNED,
-                             [](Node const &given) { return given.choice(kAddressTypes); });
-  entry.macAddrType = type;
-  entry.vid = node.get("vlan", qex_VlanID{0},
-                       [](Node const &given) { return given.integer(0, vlans::kGreatest); });
-  entry.vni = node.get("vni", qex_uint32{0}, [](Node const &given) {
-    return given.integer(0, QEX_VIRTUAL_NETWORK_ID_MAX);
-  });
-  entry.aging =
-      node.get("ages", static_cast<qex_Bool>(type == VS_MAC_ADDR_TYPE_LEARNED), &Node::flag_of);
-  entry.elapsed = node.get("age", qex_uint32{0}, number_of_32_bits);
-  return entry;
-}
-
 void apply_addresses(Transaction &transaction, Place const &place, Node const &node) {
   for_each_in(node, "addresses", [&](Node const &item) {
-    get_wires().describe_address(transaction, place, address_entry_from(item));
+    get_wires().describe_address(transaction, place,
+                                 read_object(kAddressMembers, item, new_address()));
   });
-}
-
-McastGroup group_from(Node const &node) {
-  node.only({"address", "version", "sources", "source_mode", "vni", "observed"});
-  auto const address = [](Node const &given) {
-    auto const bytes = address_from(given.text());
-    if (!bytes) {
-      given.fail("must be an address of Ethernet, IPv4 or IPv6");
-    }
-    return *bytes;
-  };
-  McastGroup group{
-      .address = address(node.at("address")),
-      .version = node.get("version", 0U, number_of_32_bits),
-      .source_mode =
-          node.get("source_mode", 0U, [](Node const &given) { return given.choice(kSourceModes); }),
-      .vni = node.get("vni", 0U, number_of_32_bits),
-      .updated = {},
-      .sources = {}};
-  if (auto const sources = node.find("sources")) {
-    for (auto const &source : sources->items()) {
-      group.sources.push_back(address(source));
-    }
-  }
-  return group;
 }
 
 void apply_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
-  only(node, SettingOwner::of_port,
-       {"id", "external_id", "addresses", "groups", "counters", "properties", "observed"});
+  only(node, SettingOwner::of_port, kPortKeys);
   auto const identifier = node.at("id").text();
   auto const found = storage::find_port(transaction, key, identifier);
   auto const port = found ? *found : add_client_port(transaction, key, identifier);
@@ -108,7 +61,7 @@ void apply_port(Transaction &transaction, storage::SwitchKey key, Node const &no
   apply_settings(transaction, owner, SettingOwner::of_port, node);
   apply_addresses(transaction, {.switch_key = key, .port = port.number}, node);
   for_each_in(node, "groups", [&](Node const &item) {
-    get_wires().join(transaction, port.number, group_from(item));
+    get_wires().join(transaction, port.number, read_object(kGroupMembers, item, McastGroup()));
   });
   apply_counters(transaction, {.switch_key = key, .port = port.number}, node);
 }
@@ -161,7 +114,7 @@ void attach_to(Transaction &transaction, storage::Port const &port, std::string 
 }
 
 void apply_uplink_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
-  only(node, SettingOwner::of_uplink_port, {"id", "uplink", "properties"});
+  only(node, SettingOwner::of_uplink_port, kUplinkPortKeys);
   auto const identifier = node.at("id").text();
   auto const found = storage::find_port(transaction, key, identifier);
   auto const port = found ? *found : add_vacant_uplink_port(transaction, key, identifier);
@@ -187,12 +140,8 @@ void attach_uplinks(Transaction &transaction, storage::SwitchKey key, Node const
 }
 
 void apply_lag(Transaction &transaction, storage::SwitchKey key, Node const &node) {
-  node.only({"name", "uplinks", "observed"});
-  std::vector<std::string> uplinks;
-  for (auto const &uplink : node.at("uplinks").items()) {
-    uplinks.push_back(uplink.text());
-  }
-  put_lag(transaction, key, node.at("name").text(), uplinks);
+  auto const lag = read_object(kLagMembers, node, LagMembers());
+  put_lag(transaction, key, lag.name, lag.uplinks);
 }
 
 void apply_session_counters(Transaction &transaction, storage::SwitchKey key, Node const &node) {
@@ -206,10 +155,7 @@ void apply_session_counters(Transaction &transaction, storage::SwitchKey key, No
 }  // namespace
 
 void apply_switch(Transaction &transaction, Node const &node) {
-  only(node, SettingOwner::of_switch,
-       {"alias", "id", "portset", "max_ports", "persistent", "version", "running", "uplink_ports",
-        "uplinks", "lags", "addresses", "counters", "mirror_counters", "properties",
-        "host_properties", "ports", "observed"});
+  only(node, SettingOwner::of_switch, kSwitchKeys);
   auto const alias = node.at("alias").text();
   auto const known = storage::find_switch(transaction, storage::SwitchName::alias, alias);
   auto const key = known ? changed_switch(*known, node) : made_switch(transaction, alias, node);

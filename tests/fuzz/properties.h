@@ -84,6 +84,8 @@ inline simhost::scenario::Json consume_said(Input &input, simhost::Form const &f
       return nullptr;
     case FormKind::number:
       return input.ConsumeIntegralInRange<std::int64_t>(form.least - 1, form.greatest + 1);
+    case FormKind::seconds:
+      return input.ConsumeIntegralInRange<std::int64_t>(-1, 4'000'000) / 1000.0;
     case FormKind::boolean:
       return input.ConsumeBool();
     case FormKind::choice:
@@ -105,6 +107,7 @@ inline simhost::scenario::Json consume_said(Input &input, simhost::Form const &f
       return input.ConsumeBool() ? Json(first)
                                  : Json(std::to_string(first) + "-" + std::to_string(last));
     }
+    case FormKind::address:
     case FormKind::mac:
       return input.ConsumeBool() ? "01:00:5e:00:00:01" : "02:00:00:00:00:01";
     case FormKind::ip:

@@ -27,6 +27,7 @@ struct Word {
 enum class FormKind {
   none,     ///< nothing says it but its bytes
   number,   ///< least to greatest
+  seconds,  ///< a number of milliseconds, said with up to three decimals
   boolean,  ///< 0 or 1
   choice,   ///< one of the words
   bits,     ///< any of the words, each a bit
@@ -34,6 +35,7 @@ enum class FormKind {
   range,    ///< two numbers, or one that is both: "10-12", 20
   mac,      ///< an address of Ethernet
   ip,       ///< an address of IPv4 or IPv6
+  address,  ///< either, or one of Ethernet
   record,   ///< members of names
   one_of,   ///< one of the members, by its name
   list,     ///< elements in their order
@@ -157,6 +159,11 @@ constexpr auto number(std::int64_t least, std::int64_t greatest) {
 template <auto kField>
 constexpr auto number(std::int64_t least, std::int64_t greatest) {
   return number<NumberField<kField>>(least, greatest);
+}
+
+template <typename Access>
+constexpr auto seconds() {
+  return number_of<Access>(FormKind::seconds);
 }
 
 template <typename Access>

@@ -13,25 +13,20 @@ from simulated_host import Host
 SIMHOST = Path(__file__).parents[3] / "simhost"
 TEXT = (SIMHOST / "SCENARIOS.md").read_text(encoding="utf-8")
 EXAMPLES = re.findall(r"^```json\n(.*?)^```", TEXT, re.MULTILINE | re.DOTALL)
-SOURCES = [SIMHOST / "scenario" / name for name in ("scenario.cpp", "scenario_switches.cpp")]
-REFERENCE = Path(os.environ["BUILD_DIR"]) / "simhost" / "properties.json"
-NAMED: List[Dict[str, Any]] = [
-    known
-    for known in json.loads(REFERENCE.read_text(encoding="utf-8"))["properties"]
-    if "name" in known
-]
+REFERENCE = json.loads(
+    (Path(os.environ["BUILD_DIR"]) / "simhost" / "properties.json").read_text(encoding="utf-8")
+)
+OBJECTS: Dict[str, List[Dict[str, Any]]] = REFERENCE["objects"]
+NAMED: List[Dict[str, Any]] = [known for known in REFERENCE["properties"] if "name" in known]
 IDS = [f"{known['scope']}.{known['name']}" for known in NAMED]
 
 
 def keys_of_structure() -> Iterator[str]:
-    """The keys that are no settings, as the reader's own lists of them say."""
-    for source in SOURCES:
-        for keys in re.findall(
-            r"\bonly\((?:node, SettingOwner::\w+,\s*)?\{(.*?)\}\)",
-            source.read_text(encoding="utf-8"),
-            re.DOTALL,
-        ):
-            yield from re.findall(r'"(\w+)"', keys)
+    """The keys that are no settings."""
+    for keys in REFERENCE["keys"].values():
+        yield from keys
+    for members in OBJECTS.values():
+        yield from (member["name"] for member in members)
 
 
 def forms_in(form: Dict[str, Any]) -> Iterator[Tuple[str, Dict[str, Any]]]:
@@ -91,9 +86,19 @@ def numbers_in(form: Dict[str, Any]) -> List[str]:
         return [f"{form['least']:,} to {form['greatest']:,}"]
     if form["form"] in ("choice", "bits"):
         return [f"`{word}`" for word in form["choices"]]
-    if form["form"] == "text":
+    if form["form"] == "text" and "most_bytes" in form:
         return [f"up to {form['most_bytes']} bytes"]
     return []
+
+
+ALL_32_BITS = f"{0xFFFFFFFF:,}"
+
+
+def bounds_in(member: Dict[str, Any]) -> List[str]:
+    """Likewise, for a member of an object: all that 32 bits hold is no bound."""
+    if member["form"] == "list":
+        return [f"up to {member['most']}"] if "most" in member else []
+    return [bound for bound in numbers_in(member) if not bound.endswith(ALL_32_BITS)]
 
 
 def told_default(row: str) -> str:
@@ -140,6 +145,17 @@ def test_a_member_has_a_row_with_its_bounds_and_its_default(known: Dict[str, Any
         if known["name"] != "mac_learning" or known["scope"] == "port":
             missing = [number for number in numbers_in(member) if number not in row]
             assert missing == [], member["name"]
+        if "default" in member:
+            assert told_default(row) in default_of(member["default"]), member["name"]
+
+
+@pytest.mark.parametrize("name", OBJECTS)
+def test_a_member_of_an_object_has_a_row_with_its_bounds_and_its_default(name: str) -> None:
+    assert OBJECTS[name]
+    for member in OBJECTS[name]:
+        row = row_of(section(name), member["name"])
+        assert row, member["name"]
+        assert [bound for bound in bounds_in(member) if bound not in row] == [], member["name"]
         if "default" in member:
             assert told_default(row) in default_of(member["default"]), member["name"]
 
