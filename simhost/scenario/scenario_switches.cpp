@@ -1,6 +1,8 @@
 // From a document to the host: switches, their ports, and what is known of them.
 #include "scenario/scenario_switches.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <cstring>
 #include <span>
@@ -30,6 +32,26 @@ void only(Node const &node, SettingOwner kind, std::span<std::string_view const>
   auto all = setting_names(kind);
   all.insert(all.end(), keys.begin(), keys.end());
   node.only(all);
+}
+
+// What other ports have and an uplink port has not is a mistake of another kind than a typing
+// error.
+void only_of_uplink_port(Node const &node) {
+  auto const has = [](auto const &keys, std::string_view key) {
+    return std::find(keys.begin(), keys.end(), key) != keys.end();
+  };
+  auto const own = setting_names(SettingOwner::of_uplink_port);
+  auto const of_others = setting_names(SettingOwner::of_port);
+  for (auto const &[key, value] : node.members()) {
+    bool const is_others = has(of_others, key) || has(kPortKeys, key);
+    if (has(own, key) || has(kUplinkPortKeys, key) || !is_others) {
+      continue;
+    }
+    auto const name = name_at_uplink_port(key);
+    value.fail(name.empty() ? "uplink ports have none"
+                            : fmt::format("uplink ports call it '{}'", name));
+  }
+  only(node, SettingOwner::of_uplink_port, kUplinkPortKeys);
 }
 
 void set_counters(Transaction &transaction, CounterOwner const &owner, Node const &counters) {
@@ -114,7 +136,7 @@ void attach_to(Transaction &transaction, storage::Port const &port, std::string 
 }
 
 void apply_uplink_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
-  only(node, SettingOwner::of_uplink_port, kUplinkPortKeys);
+  only_of_uplink_port(node);
   auto const identifier = node.at("id").text();
   auto const found = storage::find_port(transaction, key, identifier);
   auto const port = found ? *found : add_vacant_uplink_port(transaction, key, identifier);

@@ -189,6 +189,16 @@ std::vector<std::string_view> setting_names(SettingOwner kind) {
   return names;
 }
 
+std::string_view name_at_uplink_port(std::string_view name) {
+  std::string_view found;
+  for_each_named(SettingOwner::of_port, [&](Descriptor const &descriptor, std::string_view own) {
+    if (own == name) {
+      found = descriptor.uplink_port_name;
+    }
+  });
+  return found;
+}
+
 void apply_raw(Transaction &transaction, PropertyOwner const &owner, SettingOwner kind,
                Node const &node, std::string_view under) {
   apply_bytes(transaction, owner, node, under,

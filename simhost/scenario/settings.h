@@ -12,7 +12,7 @@
 
 namespace simhost::scenario {
 
-/// Whose settings; uplink ports have names of their own for few.
+/// Whose settings; uplink ports have few, and names of their own for them.
 enum class SettingOwner { of_switch, of_host, of_port, of_uplink_port };
 
 /// What documents call a type.
@@ -20,6 +20,10 @@ Json type_to_json(storage::PropertyType type);
 
 /// The members that such an owner has for its settings.
 std::vector<std::string_view> setting_names(SettingOwner kind);
+
+/// What an uplink port calls the setting that other ports have under that name; empty if it has
+/// none.
+std::string_view name_at_uplink_port(std::string_view name);
 
 /// Sets what has no name but its key.
 void apply_raw(storage::Transaction &transaction, storage::PropertyOwner const &owner,

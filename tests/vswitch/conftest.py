@@ -26,7 +26,14 @@ LAB: Dict[str, Any] = {
             "max_ports": 64,
             "mtu": 9000,
             "uplink_ports": [
-                {"id": "left", "name": "Left", "uplink": "nic0"},
+                {
+                    "id": "left",
+                    "name": "Left",
+                    "uplink": "nic0",
+                    "blocked": True,
+                    "vlan": {"id": 5, "trunk": ["10-12"], "guest_tagging": True},
+                    "nested_tag": True,
+                },
                 {"id": "spare", "properties": {"com.example.a": {"type": "config", "hex": "01"}}},
             ],
             "uplinks": ["nic1"],

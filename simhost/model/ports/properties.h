@@ -37,6 +37,7 @@ inline constexpr auto blocked =
         .of_port()
         .defaults_to(0)
         .json("blocked")
+        .json_of_uplink_port("blocked")
         .says("whether the port is blocked; frames do not go here, but its status says so");
 
 inline constexpr auto type = property<qex_uint32>(QEX_NEBPROP_PORT_TYPE)

@@ -97,6 +97,7 @@ inline constexpr auto of_port =
         .obeys<check_port_vlans>()
         .fits(check_is_in_map)
         .json("vlan", form::record_or_first<PortVlans>(kMembers))
+        .json_of_uplink_port("vlan")
         .together_with<std::int32_t, &PortVlans::priority_if_any, &PortVlans::join_priority>(
             priority, "priority")
         .says("the VLANs of the port, all of them; a number is the `id` alone");
@@ -106,6 +107,7 @@ inline constexpr auto nested_tag = property<qex_Bool>(VSPROP_PORT_VLAN_NESTEDTAG
                                        .typed()
                                        .defaults_to(0)
                                        .json("nested_tag")
+                                       .json_of_uplink_port("nested_tag")
                                        .says(
                                            "whether frames of the port may have two tags; kept "
                                            "without effect");

@@ -160,6 +160,16 @@ def test_a_member_of_an_object_has_a_row_with_its_bounds_and_its_default(name: s
             assert told_default(row) in default_of(member["default"]), member["name"]
 
 
+def test_a_setting_of_uplink_ports_has_a_row() -> None:
+    names = [
+        known["uplink_port_name"]
+        for known in REFERENCE["properties"]
+        if "uplink_port_name" in known
+    ]
+    assert {"name", "blocked"} <= set(names)
+    assert [name for name in names if not row_of(section("uplink_ports"), name)] == []
+
+
 def test_a_wrong_bound_or_default_would_be_noticed() -> None:
     row = "| `mtu` | 1,280 to 9,000 | 1501 |"
     (bounds,) = numbers_in({"form": "number", "least": 1280, "greatest": 9190})

@@ -204,9 +204,8 @@ constexpr char const *kEverything = R"({
      "running": false,
      "properties": {"com.example.note": {"type": "policy", "hex": "00ff"}},
      "host_properties": {"com.example.here": {"type": "config", "hex": "07"}},
-     "uplink_ports": [{"id": "left", "name": "Left", "uplink": "nic0",
-                       "properties": {"com.quorix.common.port.block": {"type": "policy",
-                                                                       "hex": "01"}}},
+     "uplink_ports": [{"id": "left", "name": "Left", "uplink": "nic0", "blocked": true,
+                       "properties": {"com.example.wire": {"type": "policy", "hex": "01"}}},
                       {"id": "vacant"}],
      "ports": [
        {"id": "p", "external_id": "theirs", "uplink": "uplink2",
@@ -237,6 +236,46 @@ TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
   simhost::scenario::apply(transaction, first.dump());
   EXPECT_EQ(simhost::scenario::host_to_json(transaction), first)
       << "with the numbers of ports and groups";
+}
+
+TEST_F(Scenario, AnUplinkPortIsSetAndDescribedByNames) {
+  Transaction transaction(store, Access::write);
+  auto const document = nlohmann::ordered_json::parse(R"({"clock": {"stopped": true}, "switches": [{
+      "alias": "s", "uplink_ports": [{
+        "id": "left", "name": "Left", "blocked": true, "nested_tag": true,
+        "vlan": {"id": 5, "trunk": ["10-12", 20], "priority": 3,
+                 "guest_tagging": true}}]}]})");
+  simhost::scenario::apply(transaction, document.dump());
+  auto const port =
+      simhost::get_port(transaction, simhost::get_switch(transaction, "s").key, "left");
+  auto const owner = simhost::owner_of(port);
+  EXPECT_EQ(simhost::find_property(transaction, owner, QEX_NEBPROP_PORT_BLOCK).value().value,
+            simhost::Bytes{std::byte{1}});
+  auto const described = simhost::scenario::host_to_json(transaction);
+  auto const &said = described["switches"][0]["uplink_ports"][0];
+  for (auto const &[name, value] : document["switches"][0]["uplink_ports"][0].items()) {
+    EXPECT_EQ(said[name], value) << name;
+  }
+  EXPECT_TRUE(said["properties"].empty()) << said["properties"];
+  simhost::scenario::empty_host(transaction);
+  simhost::scenario::apply(transaction, described.dump());
+  EXPECT_EQ(simhost::scenario::host_to_json(transaction), described);
+}
+
+TEST_F(Scenario, AnUplinkPortHasNotWhatOtherPortsHave) {
+  auto const refusal_in_uplink_port = [&](std::string const &member) {
+    return refusal_in_switch(R"("uplink_ports": [{"id": "left", )" + member + "}]");
+  };
+  for (auto const *const member :
+       {"teaming", "mac_learning", "forbids", "ethernet_filter", "mirror_sessions", "connection",
+        "transmit_uplink", "addresses", "groups", "counters", "external_id"}) {
+    EXPECT_EQ(refusal_in_uplink_port(fmt::format(R"("{}": null)", member)),
+              fmt::format("switches[0].uplink_ports[0].{}: uplink ports have none", member));
+  }
+  EXPECT_EQ(refusal_in_uplink_port(R"("alias": "Left")"),
+            "switches[0].uplink_ports[0].alias: uplink ports call it 'name'");
+  EXPECT_EQ(refusal_in_uplink_port(R"("blockd": true)"),
+            "switches[0].uplink_ports[0].blockd: unknown key");
 }
 
 TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
