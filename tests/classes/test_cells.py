@@ -382,3 +382,32 @@ def test_a_length_is_a_number() -> None:
         data.read("4")
     with pytest.raises(ValueError, match="^a length is not negative$"):
         data.read(-1)
+
+
+def test_neither_a_cell_nor_a_callback_is_made_twice() -> None:
+    cell, callback = Cell("int", 5), vs.Callback(lambda item, context: None)
+    places = [int(cell), int(callback)]
+    with pytest.raises(TypeError, match="^this Cell has its memory already$"):
+        cell.__init__("int", 6)  # type: ignore[misc]
+    with pytest.raises(TypeError, match="^this Callback has its function already$"):
+        callback.__init__(print)  # type: ignore[misc]
+    assert [int(cell), int(callback)] == places and cell.value == 5
+
+
+def test_what_goes_while_it_is_put_in_is_refused(
+    switch: str, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    """As another thread may release it."""
+    _, uplinks = vs.VSQEX_GetUplinks(switch)
+    kind: Any = Cell
+    see = kind._see
+
+    def release_and_see(cell: Any, index: int, pointing: Any) -> None:
+        vs.VSQEX_FreeMemory(uplinks)
+        see(cell, index, pointing)
+
+    monkeypatch.setattr(kind, "_see", release_and_see)
+    cell = Cell("void *")
+    with pytest.raises(ValueError, match="^this Pointer is gone: its memory was released$"):
+        cell.value = uplinks
+    assert cell.value is None and bytes(cell) == bytes(8)
