@@ -265,6 +265,16 @@ std::string refusal_of_query(char const *sql) {
   });
 }
 
+TEST(StateFile, HasASchemaThatNoStatementWrites) {
+  TemporaryFolder const folder;
+  Store store(folder.file("host.db"), populate_nothing);
+  Transaction transaction(store, Access::write);
+  simhost::storage::Query(transaction, "PRAGMA writable_schema = ON").next();
+  EXPECT_THAT(
+      refusal_by([&] { simhost::storage::Query(transaction, "DELETE FROM sqlite_schema").run(); }),
+      HasSubstr("cannot be used: SQLite refuses it"));
+}
+
 TEST(StateFile, KeepsNoStatementBusyForEver) {
   EXPECT_THAT(refusal_of_query("WITH RECURSIVE n(x) AS (SELECT 1 UNION ALL SELECT x + 1 FROM n)"
                                " SELECT count(*) FROM n"),
