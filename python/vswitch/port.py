@@ -7,7 +7,7 @@ import libvswitch as _vs
 from libvswitch import checked
 from libvswitch.enums import Forbid, LinkState, MacType, Multicast
 from libvswitch.errors import NotFound, NoUplink
-from vswitch import _describing, _table, _undo, words as _words
+from vswitch import _describing, _settings, _table, _undo, words as _words
 from vswitch.mirroring import Mirroring
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
@@ -101,6 +101,10 @@ class UplinkPort(AnyPort):
 
     _settings = _table.UPLINK_PORT
 
+    blocked: Setting[bool, bool] = Setting(_table.UPLINK_PORT, "blocked")
+    vlan: Setting[Vlan, Union[Vlan, int]] = Setting(_table.UPLINK_PORT, "vlan")
+    nested_tag: Setting[bool, bool] = Setting(_table.UPLINK_PORT, "nested_tag")
+
     @property
     def name(self) -> str:
         """What policies call it; its identifier unless it has a name of its own."""
@@ -108,6 +112,15 @@ class UplinkPort(AnyPort):
             if id_ == self.id:
                 return name
         raise NotFound(f"no uplink port {self.id!r} of switch {self.switch.alias!r}")
+
+    @name.setter
+    def name(self, given: str) -> None:
+        known = _table.UPLINK_PORT["name"]
+        _settings.write(self, known, _settings.parse(known, given, "name"))
+
+    @name.deleter
+    def name(self) -> None:
+        _settings.clear(self, _table.UPLINK_PORT["name"])
 
     @property
     def uplink(self) -> Optional[Uplink]:

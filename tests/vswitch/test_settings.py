@@ -161,6 +161,32 @@ def test_what_was_read_can_be_assigned(host: simhost.Host, desk: Port, name: str
     assert described(host, desk) == before
 
 
+UPLINK_PORT: Dict[str, Any] = {
+    "name": "Links",
+    "blocked": True,
+    "vlan": Vlan(7, priority=3),
+    "nested_tag": True,
+}
+
+
+@pytest.mark.parametrize("name", _table.UPLINK_PORT)
+@pytest.mark.parametrize("where", ["left", "spare"])
+def test_a_setting_of_an_uplink_port(
+    host: simhost.Host, lab: Switch, name: str, where: str
+) -> None:
+    port, value = lab.uplink_ports[where], UPLINK_PORT[name]
+    delattr(port, name)
+    assert not port.is_set(name)
+    setattr(port, name, value)
+    assert getattr(port, name) == value and port.is_set(name)
+    (switch,) = [one for one in host.describe()["switches"] if one["alias"] == "lab"]
+    (described,) = [one for one in switch["uplink_ports"] if one["id"] == where]
+    words = getattr(value, "words", lambda: value)()
+    assert described[name] == words
+    delattr(port, name)
+    assert not port.is_set(name) and getattr(port, name) != value
+
+
 def test_what_is_not_set_is_the_default(lab: Switch, bare: Port) -> None:
     assert bare.vlan == Vlan() and bare.forbids == Forbid(0) and bare.uplink == ""
     assert bare.mac_learning == PortMacLearning() and bare.ethernet_filter == FrameFilter()
