@@ -9,6 +9,8 @@ is the default. Collections are mappings of what is there now. What the host ref
 that says what was asked of what, and why not.
 """
 
+import typing
+
 from libvswitch.enums import (
     Balance,
     Criteria,
@@ -36,7 +38,6 @@ from libvswitch.errors import (
 from vswitch.exits import exits
 from vswitch.host import Host
 from vswitch.mirroring import Mirroring
-from vswitch.plan import Plan
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
 from vswitch.transaction import Transaction
@@ -61,6 +62,19 @@ from vswitch.values import (
     Vlan,
 )
 from vswitch.words import DocumentError
+
+if typing.TYPE_CHECKING:
+    from vswitch.plan import Plan
+else:
+
+    def __getattr__(name: str) -> object:
+        # Only those who plan pay for plans.
+        if name != "Plan":
+            raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
+        from vswitch.plan import Plan
+
+        return Plan
+
 
 __all__ = [
     "BadParameter",

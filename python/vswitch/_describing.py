@@ -5,6 +5,8 @@ nobody sets. A setting whose property type is not the usual one is repeated unde
 for byte, where the bytes win.
 """
 
+from __future__ import annotations
+
 import struct
 import typing
 from typing import Dict, List, Optional, Tuple

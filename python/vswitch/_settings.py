@@ -4,6 +4,8 @@ How a value crosses, a row of CROSSINGS says: through typed calls, or else as th
 property.
 """
 
+from __future__ import annotations
+
 import typing
 from typing import Any, Callable, Dict, Generic, Optional, Tuple, Type, TypeVar, Union, overload
 
@@ -78,7 +80,19 @@ def _choices(form: _table.Form, name: str) -> Dict[str, int]:
     return choices
 
 
-_MIRRORS = Crossing(Mirror.from_words, read=_records.mirrors_from, write=_records.mirror_bytes)
+def _mirrors(data: bytes) -> Tuple[Mirror, ...]:
+    from vswitch import _sessions
+
+    return _sessions.mirrors_from(data)
+
+
+def _mirror_bytes(mirrors: Tuple[Mirror, ...]) -> bytes:
+    from vswitch import _sessions
+
+    return _sessions.mirror_bytes(mirrors)
+
+
+_MIRRORS = Crossing(Mirror.from_words, read=_mirrors, write=_mirror_bytes)
 
 CROSSINGS: Dict[str, Crossing] = {
     _vs.VSPROP_MTU: Crossing(None, checked.VSDVS_GetMTU, checked.VSDVS_SetMTU),

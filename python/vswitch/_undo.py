@@ -4,6 +4,8 @@ A step reads what it needs when it is made, before the write. `undo` brings back
 nothing else; `left` says in words what is not as it was.
 """
 
+from __future__ import annotations
+
 import abc
 import typing
 from typing import Dict, Iterable, List, Optional, Tuple

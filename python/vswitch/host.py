@@ -2,6 +2,7 @@
 
 import ctypes
 import threading
+import typing
 from typing import (
     Any,
     AsyncIterator,
@@ -22,14 +23,17 @@ from libvswitch.errors import HostError, NotFound
 from vswitch import _describing, _records, _table, _undo, watch as watching, words as _words
 from vswitch._mapping import Live
 from vswitch._thing import Thing
-from vswitch.documents import Document
 from vswitch.options import Options
-from vswitch.plan import Plan
 from vswitch.port import Port
 from vswitch.switch import Switch
 from vswitch.transaction import Transaction
 from vswitch.uplink import Uplink, find_port_of
 from vswitch.values import Event, MacEntry, MacLearning, Words, to_words
+
+
+if typing.TYPE_CHECKING:
+    from vswitch.documents import Document
+    from vswitch.plan import Plan
 
 
 class Host:
@@ -152,8 +156,10 @@ class Host:
                 switch.add_uplink(name)
         return switch
 
-    def plan(self, document: Document) -> Plan:
+    def plan(self, document: "Document") -> "Plan":
         """What a document would change; see Plan."""
+        from vswitch.plan import Plan
+
         return Plan(self, document)
 
     def transaction(self) -> Transaction:

@@ -9,7 +9,7 @@ from typing import Any, Dict, Iterator, Optional, Type, Union
 
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound, NotRestored
-from vswitch import _describing, _records
+from vswitch import _describing
 from vswitch.uplink import Uplink
 from vswitch.values import Mirror, MirrorEnd, MirrorStats
 
@@ -55,7 +55,9 @@ class Mirroring:
             time.sleep(min(every, left))
 
     def __enter__(self) -> "Mirroring":
-        sessions = [_records.session_of(self.mirror)]
+        from vswitch import _sessions
+
+        sessions = [_sessions.session_of(self.mirror)]
         try:
             checked.VSDVS_AppendDVMirrorSessions(*self.port.owner, sessions)
         except HostError as error:

@@ -1,5 +1,7 @@
 """The runtime options of the host."""
 
+from __future__ import annotations
+
 import typing
 from typing import Any, Dict, Iterator, Union
 

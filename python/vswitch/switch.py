@@ -6,7 +6,7 @@ from typing import Dict, Iterator, Mapping, Optional, Sequence, Tuple, Union
 from libvswitch import checked
 from libvswitch.enums import MacType, Multicast
 from libvswitch.errors import NotFound
-from vswitch import _describing, _lags, _table, _undo
+from vswitch import _describing, _table, _undo
 from vswitch._mapping import Live
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
@@ -187,6 +187,8 @@ class Switch(Thing):
     @property
     def lags(self) -> Tuple[Lag, ...]:
         """Its link-aggregation groups."""
+        from vswitch import _lags
+
         return _lags.of_switch(self.alias)
 
     @property

@@ -64,8 +64,36 @@ def to_words(form: Form, value: object) -> Words:
     return value
 
 
-@dataclass(frozen=True)
-class SettingValue:
+_FIELDS: Dict[type, Tuple["dataclasses.Field[Any]", ...]] = {}
+
+
+def _fields(kind: type) -> Tuple["dataclasses.Field[Any]", ...]:
+    found = _FIELDS.get(kind)
+    if found is None:
+        found = _FIELDS[kind] = dataclasses.fields(kind)
+    return found
+
+
+class Value:
+    """What frozen values have in common, once: a dataclass would write it for each of them when it
+    is imported."""
+
+    def __eq__(self, other: object) -> bool:
+        if type(other) is not type(self):
+            return NotImplemented
+        assert isinstance(other, Value)
+        return self.__dict__ == other.__dict__
+
+    def __hash__(self) -> int:
+        return hash(tuple(getattr(self, one.name) for one in _fields(type(self))))
+
+    def __repr__(self) -> str:
+        held = (f"{one.name}={getattr(self, one.name)!r}" for one in _fields(type(self)))
+        return f"{type(self).__name__}({', '.join(held)})"
+
+
+@dataclass(frozen=True, eq=False, repr=False)
+class SettingValue(Value):
     """What the values of settings have in common: their form in the table of settings."""
 
     _form: ClassVar[Form]
@@ -85,7 +113,7 @@ class SettingValue:
     def known(cls: Type[V], **fields: Any) -> V:
         """What the host told, which nothing has to check, nor to know."""
         made = cls.__new__(cls)
-        for one in dataclasses.fields(cls):
+        for one in _fields(cls):
             object.__setattr__(made, one.name, fields.get(one.name, one.default))
         return made
 
@@ -119,7 +147,7 @@ class SettingValue:
 
     @classmethod
     def _is_absent(cls, name: str, value: object) -> bool:
-        default: object = next(one.default for one in dataclasses.fields(cls) if one.name == name)
+        default: object = next(one.default for one in _fields(cls) if one.name == name)
         return value == default
 
 
@@ -144,7 +172,7 @@ def _trunk_words(trunk: Optional[str]) -> List[Union[int, str]]:
     return [part if "-" in part else int(part) for part in parts]
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class Vlan(SettingValue):
     """The VLANs of a port, all of them.
 
@@ -162,7 +190,7 @@ class Vlan(SettingValue):
     _form: ClassVar[Form] = _table.PORT["vlan"].form
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class Teaming(SettingValue):
     """Which uplinks carry what ports send. None named means all of the switch."""
 
@@ -183,7 +211,7 @@ class Teaming(SettingValue):
     }
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class MacLearning(SettingValue):
     """MAC learning of the host or of a switch; the time in seconds."""
 
@@ -194,7 +222,7 @@ class MacLearning(SettingValue):
     _form: ClassVar[Form] = _table.SWITCH["mac_learning"].form
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class PortMacLearning(SettingValue):
     """MAC learning of a port; `limit_policy` is `allow` or `drop`."""
 
@@ -207,7 +235,7 @@ class PortMacLearning(SettingValue):
     _form: ClassVar[Form] = _table.PORT["mac_learning"].form
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class FrameFilter(SettingValue):
     """Frames that a port takes beside those for its client, and multicast addresses."""
 
@@ -218,7 +246,7 @@ class FrameFilter(SettingValue):
     _types: ClassVar[Dict[str, Callable[[Any], Any]]] = {"frames": EthernetFilter}
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class PrivateVlan(SettingValue):
     """A private VLAN of a switch; `type` is `promiscuous`, `isolated` or `community`."""
 
@@ -238,7 +266,7 @@ def _in_session(name: str) -> Form:
     return form
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class Encapsulation(SettingValue):
     """How mirrored frames are wrapped."""
 
@@ -252,7 +280,7 @@ class Encapsulation(SettingValue):
     _form: ClassVar[Form] = _in_session("encapsulation")
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class MirrorEnd(SettingValue):
     """What a session mirrors to or from: one of these."""
 
@@ -269,7 +297,7 @@ def _end(held: Words) -> MirrorEnd:
     return MirrorEnd.from_words(held)
 
 
-@dataclass(frozen=True)
+@dataclass(frozen=True, eq=False, repr=False)
 class Mirror(SettingValue):
     """A mirror session of a port."""
 
@@ -306,8 +334,8 @@ class Mirror(SettingValue):
 # What the host tells
 
 
-@dataclass(frozen=True)
-class MacEntry:
+@dataclass(frozen=True, eq=False, repr=False)
+class MacEntry(Value):
     """An address, where it is, and for how many seconds it has not been seen.
 
     Without a port it is beyond the uplinks.
@@ -328,8 +356,8 @@ class MacEntry:
         return {**said, "ages": self.ages, "age": self.age}
 
 
-@dataclass(frozen=True)
-class Group:
+@dataclass(frozen=True, eq=False, repr=False)
+class Group(Value):
     """A multicast group that a port has joined, and its sources."""
 
     address: str
@@ -339,8 +367,8 @@ class Group:
     vni: int = 0
 
 
-@dataclass(frozen=True)
-class Lag:
+@dataclass(frozen=True, eq=False, repr=False)
+class Lag(Value):
     """A link-aggregation group of a switch."""
 
     name: str
@@ -348,8 +376,8 @@ class Lag:
     uplinks: Tuple[str, ...]
 
 
-@dataclass(frozen=True)
-class Change:
+@dataclass(frozen=True, eq=False, repr=False)
+class Change(Value):
     """What changes: where, and both values in the words of documents; None is what is not there."""
 
     path: str
@@ -360,8 +388,8 @@ class Change:
         return f"{self.path}: {shown(self.before)} -> {shown(self.after)}"
 
 
-@dataclass(frozen=True)
-class Event:
+@dataclass(frozen=True, eq=False, repr=False)
+class Event(Value):
     """What changed on the host: when, in seconds since 1970, and what kind of thing."""
 
     at: float
@@ -390,8 +418,8 @@ def shown(value: Words) -> str:
 # What is counted has the names that documents have for counters.
 
 
-@dataclass(frozen=True)
-class MirrorStats:
+@dataclass(frozen=True, eq=False, repr=False)
+class MirrorStats(Value):
     """What a running mirror session counted."""
 
     mirrorPktCnt: int = 0
@@ -401,8 +429,8 @@ class MirrorStats:
     failedPkts: int = 0
 
 
-@dataclass(frozen=True)
-class PortStats:
+@dataclass(frozen=True, eq=False, repr=False)
+class PortStats(Value):
     """What a port and its MAC learning counted."""
 
     pktsInUnicast: int = 0
@@ -427,8 +455,8 @@ class PortStats:
     numMACsMoved: int = 0
 
 
-@dataclass(frozen=True)
-class SwitchStats:
+@dataclass(frozen=True, eq=False, repr=False)
+class SwitchStats(Value):
     """What the team of a switch counted."""
 
     rarpPktsSent: int = 0

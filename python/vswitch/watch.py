@@ -1,6 +1,5 @@
 """What changes on a host: one state after the other, compared."""
 
-import asyncio
 import time
 import typing
 from typing import AsyncIterator, Collection, Dict, Iterator, List, Optional, Tuple
@@ -49,6 +48,9 @@ def _events(watching: "_Watching") -> Iterator[Event]:
 
 
 async def _events_meanwhile(watching: "_Watching") -> AsyncIterator[Event]:
+    # Half of what this package would cost to import, for those who have it imported already.
+    import asyncio
+
     loop = asyncio.get_running_loop()
     while True:
         # A large host takes a while to tell all, in which others go on.

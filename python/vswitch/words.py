@@ -5,7 +5,6 @@ table of properties. What is read comes out in one spelling, whole: members that
 their defaults.
 """
 
-import ipaddress
 import re
 from typing import Any, Callable, Dict, Iterable, List, Optional, Tuple
 
@@ -104,6 +103,8 @@ def mac(given: object, path: str = "mac") -> str:
 
 
 def address(given: object, path: str) -> str:
+    import ipaddress
+
     try:
         if not isinstance(given, str):
             raise ValueError
