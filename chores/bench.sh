@@ -8,10 +8,9 @@
 #   --quick   a short run, to see that all works: its figures are rough, and it leaves out what is
 #             measured of whole modules
 #
-# Prints tables of ratios, of checked calls to checks by hand too, and what the simulated host does in
-# a second; leaves results.json,
-# calls.svg, host.json and host_curve.svg in build/bench/. bench/README.md says how it measures and
-# how to read it. On a machine with other work to do it takes longer, and ratios stay ratios.
+# Prints tables of ratios, of checked calls to checks by hand and of objects to flat calls too, and
+# what the simulated host does in a second; leaves results.json, calls.svg, host.json and
+# host_curve.svg in build/bench/. bench/README.md says how it measures and how to read it. On a machine with other work to do it takes longer, and ratios stay ratios.
 cmd_bench() {
   quick='' full=surfaces
   case ${1-} in
@@ -29,6 +28,8 @@ cmd_bench() {
   "$python" bench/run.py ${quick:+"$quick"} "$folder"
   step "Measuring the checked calls"
   PYTHONPATH=$root/$folder/python "$python" bench/checked.py ${quick:+"$quick"}
+  step "Measuring the objects"
+  PYTHONPATH=$root/$folder/python "$python" bench/objects.py ${quick:+"$quick"}
   step "Measuring the simulated host"
   "$python" bench/host_curve.py ${quick:+"$quick"} "$folder"
 }

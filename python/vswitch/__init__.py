@@ -43,21 +43,13 @@ from vswitch.switch import Switch
 from vswitch.transaction import Transaction
 from vswitch.uplink import Uplink
 from vswitch.values import (
-    Change,
     Encapsulation,
-    Event,
     FrameFilter,
-    Group,
-    Lag,
-    MacEntry,
     MacLearning,
     Mirror,
     MirrorEnd,
-    MirrorStats,
     PortMacLearning,
-    PortStats,
     PrivateVlan,
-    SwitchStats,
     Teaming,
     Vlan,
 )
@@ -65,15 +57,25 @@ from vswitch.words import DocumentError
 
 if typing.TYPE_CHECKING:
     from vswitch.plan import Plan
+    from vswitch.told import (
+        Change,
+        Event,
+        Group,
+        Lag,
+        MacEntry,
+        MirrorStats,
+        PortStats,
+        SwitchStats,
+    )
 else:
 
     def __getattr__(name: str) -> object:
-        # Only those who plan pay for plans.
-        if name != "Plan":
-            raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
-        from vswitch.plan import Plan
+        # Only those who use them pay for them.
+        from importlib import import_module
 
-        return Plan
+        if name not in __all__:
+            raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
+        return getattr(import_module("vswitch.plan" if name == "Plan" else "vswitch.told"), name)
 
 
 __all__ = [

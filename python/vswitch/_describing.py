@@ -7,7 +7,6 @@ for byte, where the bytes win.
 
 from __future__ import annotations
 
-import struct
 import typing
 from typing import Dict, List, Optional, Tuple
 
@@ -17,7 +16,7 @@ from libvswitch.errors import NoUplink
 from vswitch import _settings, _table
 from vswitch._thing import Item, Thing
 from vswitch.words import ABSENT
-from vswitch.values import MacEntry, MirrorStats, PortStats, Words
+from vswitch.values import Words
 
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
@@ -27,22 +26,12 @@ if typing.TYPE_CHECKING:
 _TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
 # As a text in a document it would clear the setting.
 _ABSENT = ABSENT.encode() + b"\0"
-_COUNTERS = tuple(PortStats.__dataclass_fields__)[:16]
 
 
-def mac_entry(told: checked.VSMACEntry, switch: str, port: Optional[str]) -> MacEntry:
-    where = told.vid, told.elapsed, switch, port, told.vni
-    return MacEntry(told.macAddress, told.macAddrType, *where, told.aging)
-
-
-def statistics(data: bytes) -> Dict[str, int]:
-    """The counters of a port, by their names."""
-    return dict(zip(_COUNTERS, struct.unpack(f"={len(_COUNTERS)}Q", data)))
-
-
-def mirror_stats(switch: str, sid: str) -> MirrorStats:
-    told = checked.VSQEX_GetDVMirrorSessionStats(switch, sid).asdict()
-    return MirrorStats(**{name: told[name] for name in MirrorStats.__dataclass_fields__})
+def mac_words(told: checked.VSMACEntry) -> Dict[str, Words]:
+    """An address in the place where it is."""
+    said = {"mac": told.macAddress, "vlan": told.vid, "vni": told.vni}
+    return {**said, "type": str(told.macAddrType), "ages": told.aging, "age": told.elapsed}
 
 
 def host_state(host: "Host") -> Dict[str, Words]:
@@ -93,7 +82,7 @@ def switch_state(switch: "Switch") -> Dict[str, Words]:
     said["ports"] = [port_state(one, running) for one in switch.ports.values()]
     if running:
         table = checked.VSQEX_GetTeamMACTable(switch.alias, MacType.ALL)
-        said["addresses"] = [mac_entry(one, switch.alias, None).words() for one in table]
+        said["addresses"] = [mac_words(one) for one in table]
     said["properties"] = other_properties(switch._settings, held)
     said["host_properties"] = other_properties({}, switch.host_part.properties())
     return said
@@ -118,7 +107,8 @@ def port_state(port: "Port", running: Optional[bool] = None) -> Dict[str, Words]
     said.update(settings_state(port, port._settings, held))
     observed: Dict[str, Words] = {}
     if port.switch.running if running is None else running:
-        said["addresses"] = [one.words() for one in port.macs]
+        table = checked.VSQEX_GetPortMACTable(*port.owner, MacType.ALL)
+        said["addresses"] = [mac_words(one) for one in table]
         number = port.number
         observed = {"number": number, "uplink": carrier_name(number)}
     said["properties"] = other_properties(port._settings, held)

@@ -6,7 +6,7 @@ import _libvswitch as _flat
 import libvswitch as _vs
 from libvswitch import _checking, _packed_values, _pointers
 from libvswitch.enums import LinkState
-from vswitch.values import Lag
+from vswitch.told import Lag
 
 _SIZES = _pointers.record_sizes()
 

@@ -1,5 +1,7 @@
 """Live mappings: what the host has now, looked up and walked over when somebody asks."""
 
+from __future__ import annotations
+
 import typing
 from typing import Callable, Iterable, Iterator, TypeVar
 

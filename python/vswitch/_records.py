@@ -9,13 +9,7 @@ import libvswitch as _vs
 from libvswitch import _pointers, checked
 from libvswitch.enums import Balance, Criteria, EthernetFilter, TeamFlags
 from vswitch import _table
-from vswitch.values import (
-    FrameFilter,
-    MacLearning,
-    PortMacLearning,
-    Teaming,
-    Vlan,
-)
+from vswitch.values import FrameFilter, MacLearning, PortMacLearning, Teaming, Vlan
 
 _SIZES = _pointers.record_sizes()
 

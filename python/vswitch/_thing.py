@@ -4,6 +4,8 @@ Settings are read and written through typed calls where there are such. What is 
 bytes and property type, only raw calls and walks tell.
 """
 
+from __future__ import annotations
+
 import abc
 import typing
 from typing import Dict, Optional

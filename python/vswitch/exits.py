@@ -1,5 +1,7 @@
 """How a tool ends: errors in words, and a status that scripts can trust."""
 
+from __future__ import annotations
+
 import contextlib
 import os
 import sys

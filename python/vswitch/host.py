@@ -1,5 +1,7 @@
 """The host, and what it has."""
 
+from __future__ import annotations
+
 import ctypes
 import threading
 import typing
@@ -20,7 +22,7 @@ import _libvswitch as _flat
 import libvswitch as _vs
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound
-from vswitch import _describing, _records, _table, _undo, watch as watching, words as _words
+from vswitch import _describing, _records, _table, _undo, words as _words
 from vswitch._mapping import Live
 from vswitch._thing import Thing
 from vswitch.options import Options
@@ -28,12 +30,13 @@ from vswitch.port import Port
 from vswitch.switch import Switch
 from vswitch.transaction import Transaction
 from vswitch.uplink import Uplink, find_port_of
-from vswitch.values import Event, MacEntry, MacLearning, Words, to_words
+from vswitch.values import MacLearning, Words, to_words
 
 
 if typing.TYPE_CHECKING:
     from vswitch.documents import Document
     from vswitch.plan import Plan
+    from vswitch.told import Event, MacEntry
 
 
 class Host:
@@ -180,7 +183,9 @@ class Host:
 
         `kinds` are some of watch.KINDS.
         """
-        return watching.watch(self, every, seconds, kinds)
+        from vswitch import watch
+
+        return watch.watch(self, every, seconds, kinds)
 
     def awatch(
         self,
@@ -189,7 +194,9 @@ class Host:
         kinds: Optional[Collection[str]] = None,
     ) -> AsyncIterator[Event]:
         """The same for `async for`; others go on meanwhile."""
-        return watching.awatch(self, every, seconds, kinds)
+        from vswitch import watch
+
+        return watch.awatch(self, every, seconds, kinds)
 
     # What transactions are told
 

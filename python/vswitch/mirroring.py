@@ -1,5 +1,7 @@
 """A mirror session for the time of a block."""
 
+from __future__ import annotations
+
 import itertools
 import os
 import time
@@ -9,11 +11,11 @@ from typing import Any, Dict, Iterator, Optional, Type, Union
 
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound, NotRestored
-from vswitch import _describing
 from vswitch.uplink import Uplink
-from vswitch.values import Mirror, MirrorEnd, MirrorStats
+from vswitch.values import Mirror, MirrorEnd
 
 if typing.TYPE_CHECKING:
+    from vswitch.told import MirrorStats
     from vswitch.port import Port
 
 __all__ = ["Mirroring"]
@@ -42,7 +44,9 @@ class Mirroring:
     @property
     def stats(self) -> MirrorStats:
         """What the session counted up to now."""
-        return _describing.mirror_stats(self.port.switch.alias, self.mirror.sid)
+        from vswitch import _telling
+
+        return _telling.mirror_stats(self.port.switch.alias, self.mirror.sid)
 
     def sample(self, seconds: float, every: float = 1.0) -> Iterator[MirrorStats]:
         """What it counted: now, every so many seconds, and when they are over."""

@@ -1,7 +1,9 @@
 """From a document to changes, and back if they do not arrive."""
 
+from __future__ import annotations
+
 import typing
-from typing import Any, Callable, Dict, List, Optional, Set, Tuple
+from typing import Any, Callable, Dict, List, Optional, Set, Tuple, Union
 
 from libvswitch import checked
 
@@ -23,7 +25,8 @@ from vswitch.documents import (
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
 from vswitch.uplink import find_port_of
-from vswitch.values import Change, Words
+from vswitch.told import Change, MacEntry
+from vswitch.values import Words
 from vswitch.words import ABSENT, DocumentError
 
 if typing.TYPE_CHECKING:
@@ -331,16 +334,15 @@ class _Difference:
             same = [one for one in entries if (one.mac, one.vlan) == (wish.mac, wish.vlan)]
             path = f"{port.path}/macs/{wish.mac}"
             path += f"/{wish.vlan}" if wish.vlan else ""
-            before = same[0].words() if same else None
+            before = _mac_said(same[0]) if same else None
             if wish.absent:
                 if same:
                     do = _setter(port.remove_mac, wish.mac, vlan=wish.vlan)
                     self._removals.append(Action(Change(path, before, None), do))
             elif not same or (same[0].type, same[0].vni) != (wish.type, wish.vni):
-                after = {"mac": wish.mac, "vlan": wish.vlan, "vni": wish.vni}
                 more = {"type": wish.type, "vlan": wish.vlan, "vni": wish.vni}
                 do = _setter(port.add_mac, wish.mac, **more)
-                self._add(path, before, {**after, "type": str(wish.type)}, do)
+                self._add(path, before, _mac_said(wish), do)
 
     # What switches and ports have set
 
@@ -376,6 +378,11 @@ class _Difference:
 
 def _is_absent(wanted: object) -> bool:
     return isinstance(wanted, str) and wanted == ABSENT
+
+
+def _mac_said(entry: Union[MacEntry, MacWish]) -> Dict[str, Words]:
+    said = {"mac": entry.mac, "vlan": entry.vlan, "vni": entry.vni}
+    return {**said, "type": str(entry.type)}
 
 
 def _said(data: bytes, type_: int) -> Dict[str, str]:

@@ -1,40 +1,25 @@
 """Ports of switches, for clients and for uplinks."""
 
+from __future__ import annotations
+
 import typing
 from typing import Any, Dict, Iterable, Optional, Sequence, Tuple, Union
 
 import libvswitch as _vs
 from libvswitch import checked
-from libvswitch.enums import Forbid, LinkState, MacType, Multicast
+from libvswitch.enums import Forbid, LinkState, MacType
 from libvswitch.errors import NotFound, NoUplink
 from vswitch import _describing, _settings, _table, _undo, words as _words
 from vswitch.mirroring import Mirroring
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
 from vswitch.uplink import Uplink, find_port_of
-from vswitch.values import (
-    FrameFilter,
-    Group,
-    MacEntry,
-    Mirror,
-    MirrorEnd,
-    PortMacLearning,
-    PortStats,
-    Teaming,
-    Vlan,
-    Words,
-)
+from vswitch.values import FrameFilter, Mirror, MirrorEnd, PortMacLearning, Teaming, Vlan, Words
 
 if typing.TYPE_CHECKING:
+    from vswitch.told import Group, MacEntry, PortStats
     from vswitch.host import Host
     from vswitch.switch import Switch
-
-_SOURCE_MODES = {
-    _vs.VS_MCAST_SRC_IP_FILTER_MODE_NONE: "none",
-    _vs.VS_MCAST_SRC_IP_FILTER_MODE_INCLUDE: "include",
-    _vs.VS_MCAST_SRC_IP_FILTER_MODE_EXCLUDE: "exclude",
-}
-_GROUP_FORMS = (Multicast.LEGACY, Multicast.IGMP, Multicast.MLD)
 
 
 class AnyPort(Thing):
@@ -185,30 +170,23 @@ class Port(AnyPort):
     @property
     def macs(self) -> Tuple[MacEntry, ...]:
         """The addresses in its table."""
-        table = checked.VSQEX_GetPortMACTable(self.switch.alias, self.id, MacType.ALL)
-        return tuple(_describing.mac_entry(one, self.switch.alias, self.id) for one in table)
+        from vswitch import _telling
+
+        return _telling.macs_of_port(self)
 
     @property
     def groups(self) -> Tuple[Group, ...]:
         """The multicast groups that it has joined."""
-        alias, number = self.switch.alias, self.number
-        found = []
-        for mode in _GROUP_FORMS:
-            for address in checked.VSQEX_GetMcastFilters(alias, number, mode):
-                try:
-                    told = checked.VSQEX_GetMcastFilterStats(alias, number, mode, address)
-                except NotFound:
-                    continue  # it has left it since
-                source_mode = _SOURCE_MODES.get(told.srcIPFilterMode, str(told.srcIPFilterMode))
-                found.append(Group(address, told.version, source_mode, told.entries, told.vni))
-        return tuple(found)
+        from vswitch import _telling
+
+        return _telling.groups(self)
 
     @property
     def stats(self) -> PortStats:
         """What it and its MAC learning counted."""
-        learned = checked.VSQEX_GetPortMACLearningStats(self.switch.alias, self.id).asdict()
-        counted = _describing.statistics(self.get_property(_vs.QEX_NEBPROP_PORT_STATISTICS))
-        return PortStats(**counted, **learned)
+        from vswitch import _telling
+
+        return _telling.port_stats(self)
 
     def add_mac(
         self, mac: str, *, type: MacType = MacType.STATIC, vlan: int = 0, vni: int = 0

@@ -1,10 +1,12 @@
 """Switches of the host."""
 
+from __future__ import annotations
+
 import typing
 from typing import Dict, Iterator, Mapping, Optional, Sequence, Tuple, Union
 
 from libvswitch import checked
-from libvswitch.enums import MacType, Multicast
+from libvswitch.enums import Multicast
 from libvswitch.errors import NotFound
 from vswitch import _describing, _table, _undo
 from vswitch._mapping import Live
@@ -12,19 +14,10 @@ from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
 from vswitch.port import Port, UplinkPort
 from vswitch.uplink import Uplink
-from vswitch.values import (
-    Lag,
-    MacEntry,
-    MacLearning,
-    Mirror,
-    MirrorStats,
-    PrivateVlan,
-    SwitchStats,
-    Teaming,
-    Words,
-)
+from vswitch.values import MacLearning, Mirror, PrivateVlan, Teaming, Words
 
 if typing.TYPE_CHECKING:
+    from vswitch.told import Lag, MacEntry, MirrorStats, SwitchStats
     from vswitch.host import Host
 
 
@@ -194,25 +187,28 @@ class Switch(Thing):
     @property
     def macs(self) -> Tuple[MacEntry, ...]:
         """The addresses that it knows: beyond its uplinks, and of its ports."""
-        table = checked.VSQEX_GetTeamMACTable(self.alias, MacType.ALL)
-        beyond = tuple(_describing.mac_entry(one, self.alias, None) for one in table)
-        return beyond + tuple(entry for port in self.ports.values() for entry in port.macs)
+        from vswitch import _telling
+
+        ports = self.ports.values()
+        return _telling.macs_beyond(self) + tuple(entry for port in ports for entry in port.macs)
 
     @property
     def mirrors(self) -> "Mapping[str, MirrorStats]":
         """What its running mirror sessions counted, by their identifiers."""
+        from vswitch import _telling
+
         return Live(
             lambda: checked.VSQEX_GetDVMirrorSessionIDs(self.alias),
-            lambda sid: _describing.mirror_stats(self.alias, sid),
+            lambda sid: _telling.mirror_stats(self.alias, sid),
             f"running mirror sessions of {self.alias}",
         )
 
     @property
     def stats(self) -> SwitchStats:
         """What its team counted."""
-        rarp = checked.VSQEX_GetRARPStats(self.alias).asdict()
-        team = checked.VSQEX_GetServicePortTeamingStats(self.alias).asdict()
-        return SwitchStats(**rarp, **team)
+        from vswitch import _telling
+
+        return _telling.switch_stats(self)
 
     def carriers(self) -> Dict[str, Optional[Uplink]]:
         """The uplink that carries each port now, None where none does."""

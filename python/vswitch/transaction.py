@@ -1,5 +1,7 @@
 """A block of changes that is undone when it does not end well."""
 
+from __future__ import annotations
+
 import typing
 from types import TracebackType
 from typing import Dict, List, Optional, Type

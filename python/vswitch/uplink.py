@@ -1,5 +1,7 @@
 """Uplinks of the host, at the switches that have them."""
 
+from __future__ import annotations
+
 import contextlib
 import time
 import typing

@@ -1,11 +1,14 @@
 """What changes on a host: one state after the other, compared."""
 
+from __future__ import annotations
+
 import time
 import typing
 from typing import AsyncIterator, Collection, Dict, Iterator, List, Optional, Tuple
 
 from vswitch import _table, words as _words
-from vswitch.values import Event, Words
+from vswitch.told import Event
+from vswitch.values import Words
 
 if typing.TYPE_CHECKING:
     from vswitch.host import Host

@@ -5,6 +5,8 @@ table of properties. What is read comes out in one spelling, whole: members that
 their defaults.
 """
 
+from __future__ import annotations
+
 import re
 from typing import Any, Callable, Dict, Iterable, List, Optional, Tuple
 

@@ -1,0 +1,71 @@
+"""From what calls return to the values that objects tell."""
+
+import struct
+import typing
+from typing import Optional, Tuple
+
+import libvswitch as _vs
+from libvswitch import checked
+from libvswitch.enums import MacType, Multicast
+from libvswitch.errors import NotFound
+from vswitch.told import Group, MacEntry, MirrorStats, PortStats, SwitchStats
+
+if typing.TYPE_CHECKING:
+    from vswitch.port import Port
+    from vswitch.switch import Switch
+
+_SOURCE_MODES = {
+    _vs.VS_MCAST_SRC_IP_FILTER_MODE_NONE: "none",
+    _vs.VS_MCAST_SRC_IP_FILTER_MODE_INCLUDE: "include",
+    _vs.VS_MCAST_SRC_IP_FILTER_MODE_EXCLUDE: "exclude",
+}
+_GROUP_FORMS = (Multicast.LEGACY, Multicast.IGMP, Multicast.MLD)
+_COUNTERS = tuple(PortStats.__dataclass_fields__)[:16]
+
+
+def macs_of_port(port: "Port") -> Tuple[MacEntry, ...]:
+    table = checked.VSQEX_GetPortMACTable(*port.owner, MacType.ALL)
+    return tuple(_mac_entry(one, port.switch.alias, port.id) for one in table)
+
+
+def macs_beyond(switch: "Switch") -> Tuple[MacEntry, ...]:
+    """The addresses beyond the uplinks of a switch."""
+    table = checked.VSQEX_GetTeamMACTable(switch.alias, MacType.ALL)
+    return tuple(_mac_entry(one, switch.alias, None) for one in table)
+
+
+def _mac_entry(told: checked.VSMACEntry, switch: str, port: Optional[str]) -> MacEntry:
+    where = told.vid, told.elapsed, switch, port, told.vni
+    return MacEntry(told.macAddress, told.macAddrType, *where, told.aging)
+
+
+def groups(port: "Port") -> Tuple[Group, ...]:
+    alias, number = port.switch.alias, port.number
+    found = []
+    for mode in _GROUP_FORMS:
+        for address in checked.VSQEX_GetMcastFilters(alias, number, mode):
+            try:
+                told = checked.VSQEX_GetMcastFilterStats(alias, number, mode, address)
+            except NotFound:
+                continue  # it has left it since
+            source_mode = _SOURCE_MODES.get(told.srcIPFilterMode, str(told.srcIPFilterMode))
+            found.append(Group(address, told.version, source_mode, told.entries, told.vni))
+    return tuple(found)
+
+
+def port_stats(port: "Port") -> PortStats:
+    learned = checked.VSQEX_GetPortMACLearningStats(*port.owner).asdict()
+    data = port.get_property(_vs.QEX_NEBPROP_PORT_STATISTICS)
+    counted = dict(zip(_COUNTERS, struct.unpack(f"={len(_COUNTERS)}Q", data)))
+    return PortStats(**counted, **learned)
+
+
+def switch_stats(switch: "Switch") -> SwitchStats:
+    rarp = checked.VSQEX_GetRARPStats(switch.alias).asdict()
+    team = checked.VSQEX_GetServicePortTeamingStats(switch.alias).asdict()
+    return SwitchStats(**rarp, **team)
+
+
+def mirror_stats(switch: str, sid: str) -> MirrorStats:
+    told = checked.VSQEX_GetDVMirrorSessionStats(switch, sid).asdict()
+    return MirrorStats(**{name: told[name] for name in MirrorStats.__dataclass_fields__})
