@@ -8,20 +8,21 @@ for byte, where the bytes win.
 from __future__ import annotations
 
 import typing
-from typing import Dict, List, Optional, Tuple
+from typing import Callable, Dict, Iterable, List, Optional, Tuple, TypeVar
 
 from libvswitch import checked
 from libvswitch.enums import MacType
-from libvswitch.errors import NoUplink
+from libvswitch.errors import Disconnected, NotFound, NoUplink
 from vswitch import _settings, _table
 from vswitch._thing import Item, Thing
-from vswitch.words import ABSENT
 from vswitch.values import Words
+from vswitch.words import ABSENT
 
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
     from vswitch.port import Port, UplinkPort
     from vswitch.switch import Switch
+    from vswitch.uplink import Uplink
 
 _TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
 # As a text in a document it would clear the setting.
@@ -34,8 +35,25 @@ def mac_words(told: checked.VSMACEntry) -> Dict[str, Words]:
     return {**said, "type": str(told.macAddrType), "ages": told.aging, "age": told.elapsed}
 
 
+Described = TypeVar("Described", bound=Thing)
+
+
+def each_state(
+    things: Iterable[Described], state: Callable[[Described], Dict[str, Words]]
+) -> List[Dict[str, Words]]:
+    """The states of things, but of those that somebody removes meanwhile."""
+    found = []
+    for thing in things:
+        try:
+            found.append(state(thing))
+        except NotFound:
+            if thing.exists():
+                raise
+    return found
+
+
 def host_state(host: "Host") -> Dict[str, Words]:
-    switches = [switch_state(one) for one in host.switches.values()]
+    switches = each_state(host.switches.values(), switch_state)
     return {
         "uplinks": uplinks_state(host),
         "runtime_options": host.options.all(),
@@ -45,18 +63,19 @@ def host_state(host: "Host") -> Dict[str, Words]:
 
 
 def uplinks_state(host: "Host") -> List[Dict[str, Words]]:
-    return [
-        {
-            "name": uplink.name,
-            "observed": {
-                "link": str(uplink.link),
-                "lacp": str(uplink.lacp),
-                "switch": uplink.switch.alias,
-                "port": uplink.port,
-            },
-        }
-        for uplink in host.uplinks.values()
-    ]
+    found = []
+    for uplink in host.uplinks.values():
+        try:
+            found.append({"name": uplink.name, "observed": _observed(uplink)})
+        except (NotFound, Disconnected):
+            if uplink.name in host.uplinks:
+                raise
+    return found
+
+
+def _observed(uplink: "Uplink") -> Dict[str, Words]:
+    links = {"link": str(uplink.link), "lacp": str(uplink.lacp)}
+    return {**links, "switch": uplink.switch.alias, "port": uplink.port}
 
 
 def switch_state(switch: "Switch") -> Dict[str, Words]:
@@ -71,7 +90,9 @@ def switch_state(switch: "Switch") -> Dict[str, Words]:
         "max_ports": checked.DVS_GetMaxPorts(handle),
         "version": checked.DVS_Version(handle),
         "running": running,
-        "uplink_ports": [uplink_port_state(one, uplinks) for one in switch.uplink_ports.values()],
+        "uplink_ports": each_state(
+            switch.uplink_ports.values(), lambda one: uplink_port_state(one, uplinks)
+        ),
         "uplinks": list(uplinks),
         "lags": [
             {"name": lag.name, "uplinks": list(lag.uplinks), "observed": {"link": str(lag.link)}}
@@ -79,7 +100,7 @@ def switch_state(switch: "Switch") -> Dict[str, Words]:
         ],
     }
     said.update(settings_state(switch, switch._settings, held))
-    said["ports"] = [port_state(one, running) for one in switch.ports.values()]
+    said["ports"] = each_state(switch.ports.values(), lambda one: port_state(one, running))
     if running:
         table = checked.VSQEX_GetTeamMACTable(switch.alias, MacType.ALL)
         said["addresses"] = [mac_words(one) for one in table]

@@ -180,12 +180,13 @@ def value_of(known: Property, held: Words) -> Any:
 
 def parse(known: Property, given: object, path: str) -> Any:
     """The value that words or values say; DocumentError if they say none."""
-    return value_of(known, _words.read(known.form, to_words(known.form, given), path))
+    held = to_words(known.form, given, crossing(known).kind)
+    return value_of(known, _words.read(known.form, held, path))
 
 
 def words_of(known: Property, value: Any) -> Words:
     """A value in the words of documents."""
-    return to_words(known.form, value)
+    return to_words(known.form, value, crossing(known).kind)
 
 
 def read(thing: Thing, known: Property, item: Optional[Item] = None) -> Any:

@@ -8,10 +8,11 @@ from __future__ import annotations
 
 import abc
 import typing
-from typing import Dict, Optional
+from typing import Dict
 
 from libvswitch import checked
 from vswitch import _table
+from vswitch.words import SYNONYMS
 
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
@@ -68,14 +69,9 @@ class Thing(abc.ABC):
 
     def is_set(self, name: str) -> bool:
         """Whether a setting has a value of its own, even if that is the default."""
-        known = self._settings.get(name)
+        known = self._settings.get(SYNONYMS.get(name, name))
         if known is None:
             names = ", ".join(sorted(self._settings))
             raise AttributeError(f"{type(self).__name__} has no setting {name!r} (it has {names})")
         held = self.properties()
         return any(key in held for key in known.keys)
-
-
-def find_item(thing: Thing, key: str) -> Optional[Item]:
-    """A property of a thing, None if it is not set."""
-    return thing.properties().get(key)

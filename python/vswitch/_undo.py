@@ -7,11 +7,13 @@ nothing else; `left` says in words what is not as it was.
 from __future__ import annotations
 
 import abc
+import contextlib
 import typing
-from typing import Dict, Iterable, List, Optional, Tuple
+from typing import Callable, Dict, Iterable, List, Optional, Tuple
 
 from libvswitch import checked
 from libvswitch.enums import LinkState, MacType
+from libvswitch.errors import HostError
 from vswitch import _settings, _table
 from vswitch._thing import Item, Thing
 from vswitch.values import MacLearning
@@ -63,8 +65,6 @@ def restore(thing: Thing, before: Before) -> None:
     held = thing.properties()
     if all(held.get(key) == item for key, item in before.items()):
         return
-    _restore_whole(thing, before)
-    held = thing.properties()
     for key, item in before.items():
         now = held.get(key)
         if now == item:
@@ -73,15 +73,6 @@ def restore(thing: Thing, before: Before) -> None:
             thing.erase_property(key)
         else:
             thing.write_property(key, item.data, item.propertyType)
-
-
-def _restore_whole(thing: Thing, before: Before) -> None:
-    """A setting of several properties in one call, so that none is seen without the others."""
-    if len(before) > 1 and all(item is None for item in before.values()):
-        for known in thing._settings.values():
-            clear = _settings.crossing(known).clear
-            if set(known.keys) == set(before) and clear is not None:
-                clear(*thing.owner)
 
 
 def differences(thing: Thing, before: Before) -> List[str]:
@@ -106,8 +97,24 @@ class Properties(Step):
     def __init__(self, thing: Thing, keys: Tuple[str, ...]) -> None:
         self._thing = thing
         self._before = noted(thing, keys)
+        self._whole = self._setting(keys) if len(keys) > 1 else None
+
+    def _setting(self, keys: Tuple[str, ...]) -> Callable[[], None]:
+        """How a setting of several properties comes back in one call, so that nobody sees one
+        without the others."""
+        thing = self._thing
+        known = next(one for one in thing._settings.values() if one.keys == keys)
+        how = _settings.crossing(known)
+        if any(self._before.values()):
+            value = _settings.read(thing, known)
+            return lambda: how.set(*thing.owner, value) if how.set else None
+        return lambda: how.clear(*thing.owner) if how.clear else None
 
     def undo(self) -> None:
+        if self._whole is not None and differences(self._thing, self._before):
+            # What no typed call says of it, the bytes say afterwards.
+            with contextlib.suppress(HostError):
+                self._whole()
         restore(self._thing, self._before)
 
     def left(self) -> List[str]:

@@ -17,17 +17,10 @@ from vswitch._properties import RUNTIME_OPTIONS
 from vswitch.options import read_option
 from vswitch.uplink import link_state
 from vswitch.values import MacLearning
-from vswitch.words import ABSENT, DocumentError, under
+from vswitch.words import ABSENT, SYNONYMS, DocumentError, under
 
 Document = typing.Mapping[str, Any]
 
-# What else a document may call something.
-_SYNONYMS = {
-    "options": "runtime_options",
-    "identifier": "id",
-    "macs": "addresses",
-    "mirrors": "mirror_sessions",
-}
 # What scenario documents tell a simulated host, and no call tells any.
 _NO_CALL = {"clock", "faults", "groups", "counters", "mirror_counters", "stats"}
 _FIXED = ("id", "portset", "max_ports", "version")
@@ -130,14 +123,14 @@ class _Object:
         names = {*known, "observed"}
         held = given if isinstance(given, dict) else {}
         for name in held:
-            if name in _NO_CALL and _SYNONYMS.get(name, name) not in names:
+            if name in _NO_CALL and SYNONYMS.get(name, name) not in names:
                 raise DocumentError(under(path, name), "no call of the host sets it")
-        shorter = {one for one, long in _SYNONYMS.items() if long in names}
+        shorter = {one for one, long in SYNONYMS.items() if long in names}
         held = _words.members(given, path, names | shorter)
         self._paths: Paths = {}
         self._held: Held = {}
         for name, value in held.items():
-            one = _SYNONYMS.get(name, name) if name in shorter else name
+            one = SYNONYMS.get(name, name) if name in shorter else name
             if one in self._held:
                 where = under(path, name)
                 raise DocumentError(where, f"{self._paths[one]} says the same")

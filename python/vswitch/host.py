@@ -64,7 +64,7 @@ class Host:
     @property
     def switches(self) -> "Mapping[str, Switch]":
         """Its switches, by their aliases."""
-        return Live(self._aliases, self._get_switch, "switches")
+        return Live(self._aliases, self._get_switch, "switches", lambda alias: Switch(self, alias))
 
     def _aliases(self) -> Iterator[str]:
         for handle in checked.DVSState_SwitchForEach():
@@ -79,7 +79,7 @@ class Host:
     @property
     def uplinks(self) -> "Mapping[str, Uplink]":
         """The uplinks that its switches have, by their names; of others no call tells."""
-        return Live(lambda: self._uplinks(), self._get_uplink, "uplinks")
+        return Live(self._uplinks, self._get_uplink, "uplinks")
 
     def _uplinks(self) -> Dict[str, Uplink]:
         running = [one for one in self.switches.values() if one.running]

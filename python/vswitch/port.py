@@ -2,6 +2,7 @@
 
 from __future__ import annotations
 
+import struct
 import typing
 from typing import Any, Dict, Iterable, Optional, Sequence, Tuple, Union
 
@@ -164,8 +165,8 @@ class Port(AnyPort):
     @property
     def link(self) -> LinkState:
         """Whether the side of its client is up."""
-        (held,) = self.get_property(_vs.QEX_NEBPROP_PORT_LINK_STATUS)[:1]
-        return LinkState.UP if held else LinkState.DOWN
+        (held,) = struct.unpack("=I", self.get_property(_vs.QEX_NEBPROP_PORT_LINK_STATUS))
+        return LinkState(held)
 
     @property
     def macs(self) -> Tuple[MacEntry, ...]:

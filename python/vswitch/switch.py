@@ -130,7 +130,8 @@ class Switch(Thing):
     @property
     def ports(self) -> "Mapping[str, Port]":
         """Its ports for clients, by their identifiers."""
-        return Live(self._port_ids, self._get_port, f"ports of {self.alias}")
+        shown = f"ports of {self.alias}"
+        return Live(self._port_ids, self._get_port, shown, lambda id_: Port(self, id_))
 
     def _port_ids(self) -> Iterator[str]:
         for_uplinks = set(self._uplink_port_ids())
@@ -153,7 +154,9 @@ class Switch(Thing):
     @property
     def uplink_ports(self) -> "Mapping[str, UplinkPort]":
         """Its ports for uplinks, by their identifiers."""
-        return Live(self._uplink_port_ids, self._get_uplink_port, f"uplink ports of {self.alias}")
+        shown = f"uplink ports of {self.alias}"
+        known = self._uplink_port_ids
+        return Live(known, self._get_uplink_port, shown, lambda id_: UplinkPort(self, id_))
 
     def _uplink_port_ids(self) -> Tuple[str, ...]:
         return checked.VSDVS_GetSwitchUplinkPorts(self.alias).ids
@@ -168,7 +171,8 @@ class Switch(Thing):
     @property
     def uplinks(self) -> "Mapping[str, Uplink]":
         """Its uplinks, by their names."""
-        return Live(self._uplink_names, self._get_uplink, f"uplinks of {self.alias}")
+        shown = f"uplinks of {self.alias}"
+        return Live(self._uplink_names, self._get_uplink, shown, lambda name: Uplink(self, name))
 
     def _uplink_names(self) -> Iterator[str]:
         return (one.name for one in checked.VSQEX_GetUplinks(self.alias))

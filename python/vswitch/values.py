@@ -34,13 +34,15 @@ Words = Any
 """A value as JSON has it."""
 
 
-def to_words(form: Form, value: object) -> Words:
-    """What a value is in the words of documents; what is no value of the kind stays as it is."""
+def to_words(form: Form, value: object, own: Optional[Callable[[Any], Any]] = None) -> Words:
+    """What a value is in the words of documents; what is no value of its own kind stays as it is,
+    as is a member of another family of constants."""
     kind = form["form"]
-    if kind == "choice" and isinstance(value, int):
+    is_own = isinstance(own, type) and isinstance(value, own)
+    if kind == "choice" and is_own and isinstance(value, int):
         return next((word for word, one in form["choices"].items() if one == value), str(value))
     if kind == "bits":
-        if isinstance(value, int):
+        if is_own and isinstance(value, int):
             return [word for word, bit in form["choices"].items() if value & bit]
         if isinstance(value, str):
             return value.split(",") if value else []
@@ -94,7 +96,7 @@ class SettingValue(Value):
         for one in self._form["members"]:
             value = getattr(self, one["name"])
             if value is not None:
-                given[one["name"]] = to_words(one, value)
+                given[one["name"]] = to_words(one, value, self._types.get(one["name"]))
         held = _words.read(self._form, given, type(self).__name__)
         for name, value in held.items():
             object.__setattr__(self, name, self._natural(name, value))
@@ -129,7 +131,9 @@ class SettingValue(Value):
             if value is None:
                 continue
             if "always" in one or "required" in one or not self._is_absent(name, value):
-                said[name] = to_words(one, _trunk_words(value) if name == "trunk" else value)
+                if name == "trunk":
+                    value = _trunk_words(value)
+                said[name] = to_words(one, value, self._types.get(name))
         alone = self._form.get("alone")
         if alone and set(said) <= {alone}:
             return getattr(self, alone)

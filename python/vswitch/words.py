@@ -14,6 +14,14 @@ from vswitch._table import Form
 
 __all__ = ["ABSENT", "DocumentError", "mac", "read", "trunk"]
 
+SYNONYMS = {
+    "options": "runtime_options",
+    "identifier": "id",
+    "macs": "addresses",
+    "mirrors": "mirror_sessions",
+}
+"""Where an object has a shorter name than documents have."""
+
 ABSENT = "absent"
 """In place of a setting's value in a document: the setting is to be cleared."""
 

@@ -1,4 +1,4 @@
-"""A tool that is killed between two changes: settings are old or new, and applying again arrives."""
+"""A tool that is killed between two changes: each setting is old or new, and applied again."""
 
 import json
 import signal

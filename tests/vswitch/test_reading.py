@@ -199,6 +199,27 @@ def test_what_is_not_there_says_what_is(objects: Host) -> None:
         assert isinstance(raised.value, NotFound) and str(raised.value) == words
 
 
+def test_what_goes_while_somebody_looks(
+    host: simhost.Host, lab: Switch, objects: Host, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    from libvswitch import checked
+
+    look = Port.properties
+
+    def meanwhile(port: Port) -> Any:
+        if "desk-2" in lab.ports:
+            checked.VSDVS_RemoveDVPort("lab", "desk-2")
+            checked.VSDVS_RemoveDVPort("lab", port.id)
+        return look(port)
+
+    monkeypatch.setattr(Port, "properties", meanwhile)
+    assert [one["id"] for one in lab.state()["ports"]] == ["desk-3", "desk-4"]
+    monkeypatch.undo()
+    host.fault("DVSState_PortFind", panic=(OSError, "the device is gone"))
+    with pytest.raises(HostError, match="the device is gone"):
+        objects.state()
+
+
 def test_objects_outlive_what_they_stand_for(lab: Switch, desk: Port) -> None:
     lab.remove()
     of_switch: List[Callable[[], object]] = [

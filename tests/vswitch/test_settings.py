@@ -245,6 +245,30 @@ def test_what_no_setting_takes(
     assert host.describe()["switches"] == before
 
 
+@pytest.mark.parametrize(
+    "name, given", [("forbids", TeamFlags.ROLLING), ("forbids", 1), ("mac_learning", MacLearning())]
+)
+def test_constants_of_another_family(bare: Port, name: str, given: Any) -> None:
+    with pytest.raises(DocumentError, match=f"{name}"):
+        setattr(bare, name, given)
+    assert not bare.is_set(name)
+
+
+def test_constants_of_another_family_in_values(lab: Switch) -> None:
+    for given in (Balance.IP, 1, True):
+        with pytest.raises(DocumentError, match="multicast: .* is not one of legacy, snooping"):
+            lab.multicast = given  # type: ignore[assignment]
+    with pytest.raises(DocumentError, match="Teaming.balance: .* is not one of none, ip"):
+        Teaming(Multicast.IGMP)  # type: ignore[arg-type]
+    with pytest.raises(DocumentError, match="Teaming.flags.* is not"):
+        Teaming(flags=Criteria.LINK)  # type: ignore[arg-type]
+    assert FrameFilter(EthernetFilter.USE_LADRF).words()["frames"] == ["hashed_multicast"]
+
+
+def test_the_names_of_attributes_are_those_of_settings(desk: Port, bare: Port) -> None:
+    assert desk.is_set("mirrors") and desk.is_set("mirror_sessions") and not bare.is_set("mirrors")
+
+
 def test_what_the_host_refuses(host: simhost.Host, lab: Switch) -> None:
     host.fault("VSDVS_SetMTU", status="QEX_BUSY")
     with pytest.raises(HostError, match=r"VSDVS_SetMTU\(switchName='lab', mtu=1500\): QEX_BUSY"):

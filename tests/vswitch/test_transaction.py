@@ -127,6 +127,24 @@ def test_vlan_and_priority_are_undone_whole(
     assert (vs.VSPROP_PORT_PRIORITY in keys) is (priority is not None)
 
 
+@pytest.mark.parametrize("before", [Vlan(7, "10-12", 5), Vlan(7), None])
+def test_vlan_and_priority_come_back_in_one_call(
+    host: simhost.Host, bare: Port, objects: Host, before: Optional[Vlan]
+) -> None:
+    """Whoever looks meanwhile, or is killed, has one without the other in no case."""
+    if before is not None:
+        bare.vlan = before
+
+    def change() -> None:
+        bare.vlan = Vlan(9, priority=6)
+        for call in ("DVSQEX_PortDataSet", "DVSQEX_PortDataClear"):
+            host.fault(call, times=0, status="QEX_BUSY")
+
+    rolled_back(host, objects, change)
+    host.clear_faults()
+    assert bare.is_set("vlan") is (before is not None) and bare.vlan == (before or Vlan())
+
+
 def test_a_priority_alone_is_undone_whole(host: simhost.Host, bare: Port, objects: Host) -> None:
     bare.set_property(vs.VSPROP_PORT_PRIORITY, b"\3\0\0\0", RUNTIME)
     assert bare.is_set("vlan") and bare.vlan == Vlan(priority=3)
