@@ -32,7 +32,6 @@ from vswitch.transaction import Transaction
 from vswitch.uplink import Uplink, find_port_of
 from vswitch.values import MacLearning, Words, to_words
 
-
 if typing.TYPE_CHECKING:
     from vswitch.documents import Document
     from vswitch.plan import Plan

@@ -6,7 +6,6 @@ import typing
 from typing import Any, Callable, Dict, List, Optional, Set, Tuple, Union
 
 from libvswitch import checked
-
 from libvswitch.errors import HostError, NotFound
 from vswitch import _settings, _table
 from vswitch._thing import Thing
@@ -24,8 +23,8 @@ from vswitch.documents import (
 )
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
-from vswitch.uplink import find_port_of
 from vswitch.told import Change, MacEntry
+from vswitch.uplink import find_port_of
 from vswitch.values import Words
 from vswitch.words import ABSENT, DocumentError
 
@@ -41,8 +40,8 @@ class Action(typing.NamedTuple):
     change: Change
     do: Callable[[], object]
     frees: Tuple[str, ...] = ()
-    """Of what takes something away: the uplinks that others may have then, and the switch that has
-    room for another port."""
+    """Of what takes something away: the uplinks and addresses that others may have then, and the
+    switch that has room for another port."""
 
 
 class Plan:
@@ -305,7 +304,8 @@ class _Difference:
             elif one.id in held:
                 port = held[one.id]
                 change = Change(port.path, {"id": port.id}, None)
-                self._removals.append(Action(change, port.remove, (switch.path,)))
+                macs = [entry.mac for entry in port.macs] if switch.running else []
+                self._removals.append(Action(change, port.remove, (switch.path, *macs)))
 
     def _port(self, switch: Switch, wish: PortWish, found: Optional[Port]) -> None:
         port = found or Port(switch, wish.id, wish.external_id)
@@ -338,8 +338,9 @@ class _Difference:
             if wish.absent:
                 if same:
                     do = _setter(port.remove_mac, wish.mac, vlan=wish.vlan)
-                    self._removals.append(Action(Change(path, before, None), do))
+                    self._removals.append(Action(Change(path, before, None), do, (wish.mac,)))
             elif not same or (same[0].type, same[0].vni) != (wish.type, wish.vni):
+                self._needed.add(wish.mac)
                 more = {"type": wish.type, "vlan": wish.vlan, "vni": wish.vni}
                 do = _setter(port.add_mac, wish.mac, **more)
                 self._add(path, before, _mac_said(wish), do)

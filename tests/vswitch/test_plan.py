@@ -262,6 +262,18 @@ def test_addresses(lab: Switch, objects: Host) -> None:
     }
 
 
+def test_addresses_move_from_port_to_port(lab: Switch, objects: Host) -> None:
+    static = {"mac": "02:00:00:00:00:01", "type": "static"}
+    moves: Dict[str, Document] = {
+        "desk-4": {"id": "desk-1", "macs": [{"mac": static["mac"], "state": "absent"}]},
+        "desk-3": {"id": "desk-4", "state": "absent"},
+    }
+    for to, gone in moves.items():
+        plan = objects.plan(on_lab(ports=[{"id": to, "macs": [static]}, gone]))
+        plan.apply()
+        assert [one.mac for one in lab.ports[to].macs] == [static["mac"]]
+
+
 WRONG = {
     "switches[0].mtuu: unknown key; there are addresses, alias,": on_lab(mtuu=1),
     "swiches: unknown key; there are mac_learning, observed, options,": {"swiches": []},
