@@ -5,7 +5,7 @@
 #
 # Usage: ./dev env [--python PATH] [--debug-python] [--sanitize] [--no-fast-paths]
 #
-# PATH finds simhostctl, PYTHONPATH the modules and the pytest plug-in, MYPYPATH their stubs. What
+# PATH finds vswitch and simhostctl, PYTHONPATH the modules and the pytest plug-in, MYPYPATH their stubs. What
 # these variables hold stays after it. The options are those of ./dev build and choose the folder.
 cmd_env() {
   # Only what the caller's shell is to evaluate goes to standard output.
@@ -13,6 +13,7 @@ cmd_env() {
   choose_python
   [ -d "$folder/python" ] || say "dev: nothing is built in $folder/ yet: ./dev build" >&2
   prepend PATH "$root/$folder/simhost"
+  prepend PATH "$root/$folder/bin"
   prepend PYTHONPATH "$root/$folder/python"
   prepend MYPYPATH "$root/$folder/python"
 }

@@ -3,9 +3,10 @@
 
 build_packages='cmake ninja-build g++ swig python3-dev libsqlitecpp-dev libsqlite3-dev libfmt-dev
   nlohmann-json3-dev libcli11-dev'
+command_packages='python3-typer python3-rich python3-yaml'
 docs_packages='python3-sphinx python3-myst-parser furo'
 test_packages="libgtest-dev libgmock-dev python3-pytest python3-hypothesis valgrind nodejs uidmap
-  $docs_packages"
+  $command_packages $docs_packages"
 check_packages='git python3-pytest-xdist'
 fuzz_packages='clang libclang-rt-14-dev'
 lint_packages='clang-format clang-tidy shellcheck black flake8 mypy'

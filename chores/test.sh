@@ -24,12 +24,15 @@
 # and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
 # where LD_LIBRARY_PATH puts the recording host in place of the simulated one; so do those of
 # tests/classes and tests/vswitch, for once the classes are loaded the flat functions return instances
-# of them. By hand:
+# of them. Those of tests/command run the command, which is plain Python, too: the plain interpreter
+# stands for all. By hand:
 #   export BUILD_DIR=$PWD/build PYTHONPATH=$PWD/build/python:$PWD/build/tests/python
 #   /usr/bin/python3 -m pytest tests --ignore=tests/contract --ignore=tests/classes \
-#     --ignore=tests/vswitch --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages
+#     --ignore=tests/vswitch --ignore=tests/command --ignore=tests/fuzz --ignore=tests/docs \
+#     --ignore=tests/packages
 #   /usr/bin/python3 -m pytest tests/classes
 #   /usr/bin/python3 -m pytest tests/vswitch
+#   /usr/bin/python3 -m pytest tests/command
 #   /usr/bin/python3 -m pytest tests/docs
 #   LD_LIBRARY_PATH=$BUILD_DIR/tests/recording_host /usr/bin/python3 -m pytest tests/contract
 cmd_test() {
@@ -86,16 +89,18 @@ cmd_test() {
     cxx_tests
   fi
   pytest "Python tests" module.xml '' tests --ignore=tests/contract --ignore=tests/classes \
-    --ignore=tests/vswitch --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages "$@"
+    --ignore=tests/vswitch --ignore=tests/command --ignore=tests/fuzz --ignore=tests/docs \
+    --ignore=tests/packages "$@"
   class_tests "$@"
   pytest "Object tests" objects.xml '' tests/vswitch "$@"
   pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" tests/contract "$@"
   # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are
   # the same whatever the module is built for.
   if [ "$folder" != build ]; then
-    not_for_this_build "lint, no fast paths, docs, fuzzers, bench"
+    not_for_this_build "lint, no fast paths, command, docs, fuzzers, bench"
   else
     test_no_fast_paths "$@"
+    pytest "Command tests" command.xml '' tests/command "$@"
     pytest "Docs tests" docs.xml '' tests/docs "$@"
     [ -n "$expression" ] || {
       test_fuzzers "$@"

@@ -9,7 +9,7 @@ import pytest
 
 ROOT = Path(__file__).resolve().parents[2]
 BUILD = ROOT / "build"
-VARIABLES = {"PATH": "simhost", "PYTHONPATH": "python", "MYPYPATH": "python"}
+VARIABLES = {"PATH": "bin", "PYTHONPATH": "python", "MYPYPATH": "python"}
 
 
 def dev_env(*options: str, root: Path = ROOT) -> "subprocess.CompletedProcess[str]":
@@ -30,7 +30,7 @@ def evaluated(text: str, before: Dict[str, str]) -> Dict[str, str]:
 def test_it_puts_the_build_tree_first_and_keeps_the_rest() -> None:
     before = {"PATH": "/usr/bin:/with a space", "PYTHONPATH": "/mine"}
     assert evaluated(dev_env().stdout, before) == {
-        "PATH": f"{BUILD}/simhost:/usr/bin:/with a space",
+        "PATH": f"{BUILD}/bin:{BUILD}/simhost:/usr/bin:/with a space",
         "PYTHONPATH": f"{BUILD}/python:/mine",
         "MYPYPATH": f"{BUILD}/python",
     }
@@ -43,7 +43,9 @@ def test_a_tree_may_lie_anywhere(tmp_path: Path, folder: str) -> None:
     for part in ("dev", "chores"):
         (tree / part).symlink_to(ROOT / part)
     done = dev_env(root=tree)
-    assert evaluated(done.stdout, {"PATH": "/usr/bin"})["PATH"] == f"{tree}/build/simhost:/usr/bin"
+    assert evaluated(done.stdout, {"PATH": "/usr/bin"})["PATH"] == (
+        f"{tree}/build/bin:{tree}/build/simhost:/usr/bin"
+    )
     assert done.stderr == "dev: nothing is built in build/ yet: ./dev build\n"
 
 
@@ -51,6 +53,7 @@ def test_a_tree_may_lie_anywhere(tmp_path: Path, folder: str) -> None:
     "command",
     [
         ["simhostctl", "--version"],
+        ["vswitch", "list"],
         ["/usr/bin/python3", "-c", "import libvswitch, simhost"],
         ["mypy", "--strict", "--cache-dir=/dev/null", "examples/inventory.py"],
     ],

@@ -1,0 +1,19 @@
+"""The command `vswitch`: the objects for people, on a terminal and in scripts.
+
+Each file has the commands of one purpose; `program` puts them together and says how they end. Only
+this package needs more than the standard library: typer, rich and PyYAML.
+"""
+
+import sys
+
+__all__ = ["main"]
+
+
+def main() -> None:
+    """Runs the program with the words of its command line, and ends it."""
+    try:
+        from vswitch.command import program
+    except ModuleNotFoundError as error:
+        needs = "it needs typer, rich and PyYAML, which libvswitch[command] installs"
+        sys.exit(f"vswitch: {error}: {needs}")
+    program.main(sys.argv[1:])

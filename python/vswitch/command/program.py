@@ -1,0 +1,97 @@
+"""The program: its commands, and how it ends.
+
+The status is 0 when all is done; 1 when it was refused, and the host is as before; 2 when the
+command line is wrong, and nothing was changed; 3 when somebody must look. Errors are words on
+standard error.
+"""
+
+import io
+import signal
+import sys
+from types import FrameType
+from typing import Callable, Dict, List, Optional
+
+import click
+import typer
+import typer.main
+
+from libvswitch.errors import HostError
+from vswitch.command import reading
+from vswitch.command.session import Command, Group
+from vswitch.exits import CHANGED, exits
+from vswitch.words import DocumentError
+
+__all__ = ["group", "main"]
+
+NAME = "vswitch"
+_USAGE = 2
+_OPTIONS_FOR_ALL = {"help_option_names": ["-h", "--help"]}
+
+COMMANDS: Dict[str, Callable[..., None]] = {
+    "list": reading.list_,
+    "show": reading.show,
+    "stats": reading.stats,
+    "lag": reading.lag,
+    "options": reading.options,
+    "find": reading.find,
+}
+
+
+def about() -> None:
+    """Look at the virtual switches of this host, and change them.
+
+    A switch is called by its alias, a port SWITCH/PORT. Every command takes --json for programs,
+    and --real to refuse a simulated host.
+
+    The exit status is 0 when all is done; 1 when it was refused, and the host is as before; 2 when
+    the command line is wrong, and nothing was changed; 3 when somebody must look.
+    """
+
+
+def group() -> click.Group:
+    """All commands."""
+    app = typer.Typer(name=NAME, add_completion=False, context_settings=_OPTIONS_FOR_ALL)
+    app.callback(cls=Group, no_args_is_help=True)(about)
+    for name, function in COMMANDS.items():
+        app.command(name, cls=Command)(function)
+    made = typer.main.get_command(app)
+    assert isinstance(made, click.Group)
+    return made
+
+
+def main(words: List[str]) -> None:
+    """Runs the program, and ends it."""
+    for stream in (sys.stdout, sys.stderr):
+        if isinstance(stream, io.TextIOWrapper):
+            # What an encoding has no bytes for is told all the same.
+            stream.reconfigure(errors="backslashreplace")
+    for number in (signal.SIGTERM, signal.SIGHUP):
+        signal.signal(number, _end)
+    with exits(NAME):
+        try:
+            _run(words)
+        except (HostError, DocumentError, OSError):
+            raise
+        except Exception as error:
+            # A mistake of this program: nobody knows what it left.
+            said = f"{type(error).__name__}: {error}"
+            print(f"{NAME}: a mistake of this program: {said}", file=sys.stderr)
+            raise SystemExit(CHANGED) from None
+
+
+def _run(words: List[str]) -> None:
+    try:
+        with group().make_context(NAME, words) as context:
+            context.command.invoke(context)
+    except click.exceptions.Exit as end:
+        raise SystemExit(end.exit_code) from None
+    except click.UsageError as error:
+        path = error.ctx.command_path if error.ctx is not None else NAME
+        print(f"{NAME}: {error.format_message()}", file=sys.stderr)
+        print(f"{NAME}: see {path} --help", file=sys.stderr)
+        raise SystemExit(_USAGE) from None
+
+
+def _end(number: int, _: Optional[FrameType]) -> None:
+    """What a signal ends is put right on the way out."""
+    raise SystemExit(128 + number)
