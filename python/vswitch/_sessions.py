@@ -53,7 +53,9 @@ def _bits(name: str, held: Tuple[str, ...]) -> int:
 def _ends_from(entities: Tuple[DVMirrorEntity, ...]) -> Tuple[MirrorEnd, ...]:
     found = []
     for one in entities:
-        kind = _ENDS[one.type]
+        kind = _ENDS.get(one.type)
+        if kind is None:
+            raise ValueError(f"a mirror session has an entity of the unknown kind {one.type}")
         value = int(one.entity) if kind in ("vlan", "number") else one.entity
         found.append(MirrorEnd.known(**{kind: value}))
     return tuple(found)

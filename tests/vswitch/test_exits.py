@@ -1,5 +1,6 @@
 """How tools end: what they print where, and their status."""
 
+import os
 import subprocess
 import sys
 from pathlib import Path
@@ -21,6 +22,10 @@ if __name__ == "__main__":
 """
 
 
+# What a tool has printed waits until it ends, as it does for those who use it.
+ENVIRONMENT = {name: one for name, one in os.environ.items() if name != "PYTHONUNBUFFERED"}
+
+
 def run(
     body: str, tmp_path: Path, stdout: Optional[int] = subprocess.PIPE
 ) -> "subprocess.CompletedProcess[str]":
@@ -28,7 +33,11 @@ def run(
     lines = "".join(f"    {line}\n" for line in body.splitlines())
     program.write_text(PROGRAM.format(body=lines))
     return subprocess.run(
-        [sys.executable, str(program)], stdout=stdout, stderr=subprocess.PIPE, text=True
+        [sys.executable, str(program)],
+        env=ENVIRONMENT,
+        stdout=stdout,
+        stderr=subprocess.PIPE,
+        text=True,
     )
 
 
@@ -80,7 +89,7 @@ def test_a_closed_pipe_is_no_error(body: str, tmp_path: Path) -> None:
     program.write_text(PROGRAM.format(body=f"    {body}\n"))
     # The reader is gone before the tool begins.
     shell = f'"{sys.executable}" "{program}" 2>"{tmp_path}/stderr"; echo $? >"{tmp_path}/status"'
-    subprocess.run(["sh", "-c", f"({shell}) | true"], check=True)
+    subprocess.run(["sh", "-c", f"({shell}) | true"], env=ENVIRONMENT, check=True)
     assert (tmp_path / "stderr").read_text() == ""
     assert (tmp_path / "status").read_text() == "0\n"
 

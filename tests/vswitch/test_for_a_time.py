@@ -65,6 +65,24 @@ def test_a_session_that_is_refused(desk: Port) -> None:
         desk.mirrored(to="desk-2", snap_length=-1)
 
 
+def test_a_session_of_which_nobody_knows_whether_it_is_there(
+    bare: Port, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    from libvswitch import checked
+
+    append = checked.VSDVS_AppendDVMirrorSessions
+
+    def late(switch: str, port: str, sessions: Any) -> None:
+        append(switch, port, sessions)
+        raise Trapped("the call trapped when all was done")
+
+    monkeypatch.setattr(checked, "VSDVS_AppendDVMirrorSessions", late)
+    with pytest.raises(Trapped):
+        with bare.mirrored(to="desk-3"):
+            raise AssertionError("the block does not begin")
+    assert bare.mirrors == ()
+
+
 def test_a_session_that_somebody_else_removed(bare: Port) -> None:
     with bare.mirrored(to="desk-3"):
         bare.mirrors = ()
