@@ -16,7 +16,7 @@ from vswitch.command import output, places
 from vswitch.command.session import from_words, host, is_json
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
-from vswitch.values import MacEntry, shown
+from vswitch.told import MacEntry, shown
 
 _PLACE = typer.Argument(..., metavar="SWITCH[/PORT]", help="A switch, or a port of it.")
 _SWITCH = typer.Argument(..., metavar="SWITCH", help="The alias of a switch.")
