@@ -29,10 +29,19 @@ _TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
 _ABSENT = ABSENT.encode() + b"\0"
 
 
-def mac_words(told: checked.VSMACEntry) -> Dict[str, Words]:
+def mac_words(
+    mac: str, vlan: int, vni: int, type_: MacType, ages: bool, age: int
+) -> Dict[str, Words]:
     """An address in the place where it is."""
-    said = {"mac": told.macAddress, "vlan": told.vid, "vni": told.vni}
-    return {**said, "type": str(told.macAddrType), "ages": told.aging, "age": told.elapsed}
+    said = {"mac": mac, "vlan": vlan, "vni": vni}
+    return {**said, "type": str(type_), "ages": ages, "age": age}
+
+
+def macs_words(table: Iterable[checked.VSMACEntry]) -> List[Dict[str, Words]]:
+    return [
+        mac_words(one.macAddress, one.vid, one.vni, one.macAddrType, one.aging, one.elapsed)
+        for one in table
+    ]
 
 
 Described = TypeVar("Described", bound=Thing)
@@ -103,7 +112,7 @@ def switch_state(switch: "Switch") -> Dict[str, Words]:
     said["ports"] = each_state(switch.ports.values(), lambda one: port_state(one, running))
     if running:
         table = checked.VSQEX_GetTeamMACTable(switch.alias, MacType.ALL)
-        said["addresses"] = [mac_words(one) for one in table]
+        said["addresses"] = macs_words(table)
     said["properties"] = other_properties(switch._settings, held)
     said["host_properties"] = other_properties({}, switch.host_part.properties())
     return said
@@ -129,7 +138,7 @@ def port_state(port: "Port", running: Optional[bool] = None) -> Dict[str, Words]
     observed: Dict[str, Words] = {}
     if port.switch.running if running is None else running:
         table = checked.VSQEX_GetPortMACTable(*port.owner, MacType.ALL)
-        said["addresses"] = [mac_words(one) for one in table]
+        said["addresses"] = macs_words(table)
         number = port.number
         observed = {"number": number, "uplink": carrier_name(number)}
     said["properties"] = other_properties(port._settings, held)

@@ -1,9 +1,10 @@
 """Values of what the host tells: frozen, compared by what they hold."""
 
 from dataclasses import dataclass
-from typing import Optional, Tuple
+from typing import Dict, Optional, Tuple
 
 from libvswitch.enums import LinkState, MacType
+from vswitch._describing import mac_words
 from vswitch.values import Value, Words
 
 __all__ = [
@@ -34,6 +35,10 @@ class MacEntry(Value):
     port: Optional[str] = None
     vni: int = 0
     ages: bool = False
+
+    def words(self) -> Dict[str, Words]:
+        """The entry as documents say it in the place where it is."""
+        return mac_words(self.mac, self.vlan, self.vni, self.type, self.ages, self.age)
 
 
 @dataclass(frozen=True, eq=False, repr=False)

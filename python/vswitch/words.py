@@ -34,6 +34,9 @@ class DocumentError(ValueError):
         self.path = path
         self.expected = expected
 
+    def __reduce__(self) -> Tuple[Any, ...]:
+        return type(self), (self.path, self.expected)
+
 
 def under(path: str, name: str) -> str:
     """The path of a member."""

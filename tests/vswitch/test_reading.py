@@ -159,6 +159,7 @@ def test_addresses_are_found_in_any_spelling(lab: Switch, objects: Host) -> None
         (entry,) = objects.find_mac(spelling)
         assert (entry.switch, entry.port, entry.vlan, entry.vni) == ("lab", "desk-1", 10, 7)
         assert entry.type is MacType.LEARNED and entry.ages
+    assert entry.words() in lab.ports["desk-1"].state()["addresses"]
     (beyond,) = objects.find_mac("02:00:00:00:00:09")
     assert (beyond.switch, beyond.port) == ("lab", None)
     assert objects.find_mac("02:00:00:00:00:77") == ()

@@ -1,7 +1,9 @@
 """Values by themselves: what they are made of, refuse, and say."""
 
+import copy
 import dataclasses
 import json
+import pickle
 from typing import Any, Dict, Type
 
 import pytest
@@ -136,6 +138,35 @@ def test_changes_in_words() -> None:
     assert str(Change("lab/mtu", None, 9000)) == "lab/mtu: absent -> 9000"
     changed = Change("lab/web/vlan", 7, {"id": 7, "trunk": ["1-3", 9], "private": True})
     assert str(changed) == "lab/web/vlan: 7 -> id=7 trunk=1-3,9 private=true"
+
+
+VALUES = [
+    Vlan(7, "1-3", 5),
+    Teaming(Balance.EXPLICIT, ("a",)),
+    FrameFilter(EthernetFilter.SINK),
+    Mirror("s", to=(MirrorEnd(vlan=7),)),
+    Change("lab/mtu", 1, 2),
+]
+
+
+@pytest.mark.parametrize("value", VALUES, ids=lambda value: type(value).__name__)
+def test_values_are_frozen_dataclasses(value: Any) -> None:
+    again = pickle.loads(pickle.dumps(value))
+    assert again == value == copy.deepcopy(value) and hash(again) == hash(value)
+    assert value != Vlan(8) and value != 7 and repr(again) == repr(value)
+    assert dataclasses.replace(value) == value
+    (name, *_) = dataclasses.asdict(value)
+    with pytest.raises(dataclasses.FrozenInstanceError):
+        setattr(value, name, None)
+    with pytest.raises(dataclasses.FrozenInstanceError):
+        delattr(value, name)
+
+
+def test_errors_go_into_other_processes() -> None:
+    with pytest.raises(DocumentError) as raised:
+        Vlan(4095)
+    again = pickle.loads(pickle.dumps(raised.value))
+    assert (str(again), again.path) == ("Vlan.id: 4095 is above 4094", "Vlan.id")
 
 
 def test_the_public_names() -> None:
