@@ -31,6 +31,9 @@ _WAIT = 5
 class Step(abc.ABC):
     """A write, and what was before it."""
 
+    place: Tuple[str, ...] = ()
+    """The switch and the port that it is about, those that there are."""
+
     @abc.abstractmethod
     def undo(self) -> None:
         ...
@@ -47,9 +50,9 @@ class Step(abc.ABC):
         """Whether it undoes all that became of a switch or a port."""
         return False
 
-    def has(self, what: str) -> bool:
-        """Whether that is about its switch or port, or a part of it."""
-        return (what + "/").startswith((f"{self.what()}:", f"{self.what()}/"))
+    def has(self, other: Step) -> bool:
+        """Whether the other is about its switch or port, or a part of it."""
+        return other.place[: len(self.place)] == self.place
 
 
 # Properties
@@ -95,6 +98,7 @@ class Properties(Step):
     """Properties of a thing that are set or cleared."""
 
     def __init__(self, thing: Thing, keys: Tuple[str, ...]) -> None:
+        self.place = thing.owner
         self._thing = thing
         self._before = noted(thing, keys)
         self._whole = self._setting(keys) if len(keys) > 1 else None
@@ -169,6 +173,7 @@ class Link(Step):
     """Whether an uplink is up. While its cable is out, no call tells what was set."""
 
     def __init__(self, uplink: "Uplink") -> None:
+        self.place = uplink.switch.owner
         self._uplink = uplink
         self._before = uplink.link
 
@@ -188,6 +193,7 @@ class Running(Step):
     """Whether a switch runs on this host."""
 
     def __init__(self, switch: "Switch") -> None:
+        self.place = switch.owner
         self._switch = switch
         self._before = switch.running
 
@@ -208,6 +214,7 @@ class Added(Step):
     """A switch or a port that is added, unless it was there."""
 
     def __init__(self, thing: "typing.Union[Switch, Port]") -> None:
+        self.place = thing.owner
         self._thing = thing
         self._was_there = thing.exists()
 
@@ -230,6 +237,7 @@ class UplinkPorts(Step):
     set."""
 
     def __init__(self, switch: "Switch") -> None:
+        self.place = switch.owner
         self._switch = switch
         self._before = _uplink_ports(switch)
         self._numbers = {id_: switch.uplink_ports[id_].number for id_ in self._before}
@@ -303,6 +311,7 @@ class Macs(Step):
     """The addresses in the table of a port that somebody put there."""
 
     def __init__(self, port: "Port") -> None:
+        self.place = port.owner
         self._port = port
         self._before = kept_macs(port)
 
@@ -343,6 +352,7 @@ class RemovedPort(Step):
     """A port that is removed. Added again it is a new one, which has all that was set."""
 
     def __init__(self, port: "Port") -> None:
+        self.place = port.owner
         self._port = port
         self._properties = _own(port)
         self._number = port.number
@@ -389,6 +399,7 @@ class RemovedSwitch(Step):
     """A switch that is removed. Added again it is a new one, which has all that was set."""
 
     def __init__(self, switch: "Switch") -> None:
+        self.place = switch.owner
         self._switch = switch
         self._made = switch.identifier, switch.portset, switch.max_ports
         self._was_made = False

@@ -8,7 +8,7 @@ from typing import Dict, Iterator, Mapping, Optional, Sequence, Tuple, Union
 from libvswitch import checked
 from libvswitch.enums import Multicast
 from libvswitch.errors import NotFound
-from vswitch import _describing, _table, _undo
+from vswitch import _describing, _table, _undo, words as _words
 from vswitch._mapping import Live
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
@@ -112,6 +112,7 @@ class Switch(Thing):
 
     @running.setter
     def running(self, runs: bool) -> None:
+        _words.flag(runs, "running")
         if runs is not self.running:
             self.host._note(_undo.Running, self)
             self._run(runs)

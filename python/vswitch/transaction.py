@@ -4,7 +4,7 @@ from __future__ import annotations
 
 import typing
 from types import TracebackType
-from typing import Dict, List, Optional, Type
+from typing import Dict, List, Optional, Tuple, Type
 
 from libvswitch.errors import NotRestored, RolledBack
 from vswitch._undo import Step
@@ -65,13 +65,13 @@ class Transaction:
         After each it is as it was before that write, if all is well. What one could not put back,
         an earlier one about the same may have.
         """
-        left: Dict[str, List[str]] = {}
+        left: Dict[Tuple[Tuple[str, ...], str], Tuple[Step, List[str]]] = {}
         for step in reversed(self._steps):
             found = _undone(step)
             if not found and step.is_whole():
-                left = {what: lines for what, lines in left.items() if not step.has(what)}
-            left[step.what()] = found
-        return [line for lines in reversed(list(left.values())) for line in lines]
+                left = {about: one for about, one in left.items() if not step.has(one[0])}
+            left[step.place, step.what()] = step, found
+        return [line for _, lines in reversed(list(left.values())) for line in lines]
 
 
 def _undone(step: Step) -> List[str]:

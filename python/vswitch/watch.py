@@ -19,8 +19,8 @@ KINDS: Tuple[str, ...] = ("switch", "port", "uplink", "link", "carrier", "settin
 """What an event may be about: something that comes or goes, a link, the uplink that carries a port,
 a setting, an address."""
 
-Seen = Dict[str, Tuple[str, Words]]
-"""What there is to see, by its path: its kind and its value."""
+Seen = Dict[Tuple[str, str], Words]
+"""What there is to see, by its kind and its path."""
 
 
 def watch(
@@ -107,11 +107,11 @@ class _Watching:
 
 def _differences(before: Seen, now: Seen) -> Iterator[Tuple[str, str, Words, Words]]:
     """What goes first, then what comes or changes, in the order of the host."""
-    for path, (kind, value) in before.items():
-        if path not in now:
+    for (kind, path), value in before.items():
+        if (kind, path) not in now:
             yield path, kind, value, None
-    for path, (kind, value) in now.items():
-        _, was = before.get(path, (kind, None))
+    for (kind, path), value in now.items():
+        was = before.get((kind, path))
         if was != value:
             yield path, kind, was, value
 
@@ -123,27 +123,27 @@ def seen(host: "Host", kinds: Collection[str]) -> Seen:
     for uplink in state["uplinks"]:
         observed = uplink["observed"]
         path = f"{observed['switch']}/{uplink['name']}"
-        found[path] = ("uplink", {"name": uplink["name"], "port": observed["port"]})
-        found[f"{path}/link"] = ("link", observed["link"])
+        found["uplink", path] = {"name": uplink["name"], "port": observed["port"]}
+        found["link", f"{path}/link"] = observed["link"]
     for name, value in state["runtime_options"].items():
-        found[f"options/{name}"] = ("setting", value)
-    found["mac_learning"] = ("setting", state["mac_learning"])
+        found["setting", f"options/{name}"] = value
+    found["setting", "mac_learning"] = state["mac_learning"]
     for switch in state["switches"]:
-        found.update(_seen_of_switch(host, switch))
-    return {path: one for path, one in found.items() if one[0] in kinds}
+        found.update(_seen_of_switch(switch))
+    return {about: value for about, value in found.items() if about[0] in kinds}
 
 
-def _seen_of_switch(host: "Host", switch: Dict[str, Words]) -> Seen:
+def _seen_of_switch(switch: Dict[str, Words]) -> Seen:
     alias = switch["alias"]
-    found: Seen = {alias: ("switch", {"alias": alias, "id": switch["id"]})}
-    found[f"{alias}/running"] = ("setting", switch["running"])
+    found: Seen = {("switch", alias): {"alias": alias, "id": switch["id"]}}
+    found["setting", f"{alias}/running"] = switch["running"]
     found.update(_settings_and_macs(alias, switch, _table.SWITCH))
     for port in switch["uplink_ports"]:
         found.update(_settings_and_macs(f"{alias}/{port['id']}", port, _table.UPLINK_PORT))
     for port in switch["ports"]:
         path = f"{alias}/{port['id']}"
-        found[path] = ("port", {"id": port["id"]})
-        found[f"{path}/carrier"] = ("carrier", port["observed"].get("uplink"))
+        found["port", path] = {"id": port["id"]}
+        found["carrier", f"{path}/carrier"] = port["observed"].get("uplink")
         found.update(_settings_and_macs(path, port, _table.PORT))
     return found
 
@@ -154,11 +154,11 @@ def _settings_and_macs(
     found: Seen = {}
     for name, value in described.items():
         if name in ("properties", "host_properties"):
-            found.update({f"{path}/{key}": ("setting", one) for key, one in value.items()})
+            found.update({("setting", f"{path}/{key}"): one for key, one in value.items()})
         elif name in known:
-            found[f"{path}/{name}"] = ("setting", value)
+            found["setting", f"{path}/{name}"] = value
     for entry in described.get("addresses", ()):
         where = f"{path}/macs/{entry['mac']}" + (f"/{entry['vlan']}" if entry["vlan"] else "")
         # Its age changes all the time.
-        found[where] = ("mac", {key: entry[key] for key in ("mac", "type", "vlan")})
+        found["mac", where] = {key: entry[key] for key in ("mac", "type", "vlan")}
     return found

@@ -192,6 +192,16 @@ def test_switches_come_and_go(lab: Switch, objects: Host) -> None:
     ]
 
 
+def test_a_port_with_the_name_of_an_uplink(host: simhost.Host, lab: Switch, objects: Host) -> None:
+    events = objects.watch(seconds=0, kinds=["port", "uplink", "link"])
+    lab.add_port("nic0")
+    host.link("nic0").down()
+    assert told(list(events)) == [
+        "link: lab/nic0/link: up -> down",
+        "port: lab/nic0: absent -> id=nic0",
+    ]
+
+
 def test_a_watch_goes_on_until_its_time_is_over(host: simhost.Host, objects: Host) -> None:
     found = []
     events = objects.watch(every=0.01, seconds=60, kinds=["link"])

@@ -175,6 +175,8 @@ def test_a_switch_that_does_not_run(host: simhost.Host, lab: Switch, objects: Ho
     assert state["switches"][1]["mtu"] == 9000 and "addresses" not in state["switches"][1]
     assert list(objects.uplinks) == ["nic4", "nic5"]
     assert objects.find_mac("02:00:00:00:00:02") == ()
+    with pytest.raises(ValueError, match="running: 1 is not true or false"):
+        lab.running = 1  # type: ignore[assignment]
     lab.running = True
     assert lab.running and len(objects.uplinks) == 4
 

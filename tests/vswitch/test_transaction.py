@@ -353,6 +353,19 @@ def test_what_cannot_be_put_back_is_named(host: simhost.Host, bare: Port, object
     assert str(raised.value).startswith("that is all; not as it was: lab/desk-4: vlan; lab/desk-4:")
 
 
+def test_a_switch_with_the_path_of_a_port(host: simhost.Host, objects: Host) -> None:
+    """What is left of one is not hidden by the other, which is gone as it should be."""
+    other = objects.add_switch("new/a")
+    with pytest.raises(NotRestored) as raised:
+        with objects.transaction():
+            objects.add_switch("new").add_port("a")
+            other.disabled = True
+            host.fault("DVSQEX_GlobalPropClear", times=0, status="QEX_BUSY")
+            raise Stop("that is all")
+    assert raised.value.left == ("new/a: disabled",)
+    assert list(objects.switches) == ["vswitch0", "new/a"]
+
+
 def test_what_nobody_can_tell_is_named(host: simhost.Host, bare: Port, objects: Host) -> None:
     with pytest.raises(NotRestored) as raised:
         with objects.transaction():
