@@ -90,7 +90,7 @@ class _Difference:
     def __init__(self, host: "Host", wish: HostWish) -> None:
         self._host = host
         self._wish = wish
-        self._switches: Dict[str, Switch] = dict(host.switches)
+        self._switches: Dict[str, Switch] = dict(host.switches.items())
         self._removals: List[Action] = []
         self._made: List[Action] = []
         self._last: List[Action] = []
@@ -294,7 +294,7 @@ class _Difference:
     # Ports
 
     def _ports(self, switch: Switch, wish: SwitchWish, is_new: bool) -> None:
-        held = {} if is_new or not wish.ports else dict(switch.ports)
+        held = {} if is_new or not wish.ports else dict(switch.ports.items())
         added = [one for one in wish.ports if not one.absent and one.id not in held]
         if added and not is_new and len(held) + len(added) > switch.max_ports:
             self._needed.add(switch.path)
