@@ -158,11 +158,11 @@ class Host:
                 switch.add_uplink(name)
         return switch
 
-    def plan(self, document: "Document") -> "Plan":
-        """What a document would change; see Plan."""
+    def plan(self, document: "Document", whole: bool = False) -> "Plan":
+        """What a document would change; with `whole`, what it does not name goes. See Plan."""
         from vswitch.plan import Plan
 
-        return Plan(self, document)
+        return Plan(self, document, whole)
 
     def transaction(self) -> Transaction:
         """A block that changes everything or nothing; see Transaction."""

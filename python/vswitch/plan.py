@@ -9,6 +9,7 @@ from libvswitch import checked
 from libvswitch.errors import HostError, NotFound
 from vswitch import _settings, _table
 from vswitch._thing import Thing
+from vswitch._whole import completed
 from vswitch.documents import (
     Document,
     HostWish,
@@ -48,12 +49,13 @@ class Plan:
     """What `Host.plan` makes of a document.
 
     The document is checked when the plan is made, against the host as well: what is wrong is a
-    DocumentError, and nothing is changed.
+    DocumentError, and nothing is changed. With `whole`, what it does not name goes.
     """
 
-    def __init__(self, host: "Host", document: Document) -> None:
+    def __init__(self, host: "Host", document: Document, whole: bool = False) -> None:
         self._host = host
         self._wish = read(document)
+        self._whole = whole
         self._actions()
 
     @property
@@ -78,7 +80,10 @@ class Plan:
         return tuple(action.change for action in actions)
 
     def _actions(self) -> List[Action]:
-        return _Difference(self._host, self._wish).actions()
+        wish = self._wish
+        if self._whole:
+            wish = completed(wish, read(self._host.state()))
+        return _Difference(self._host, wish).actions()
 
     def __str__(self) -> str:
         return "\n".join(map(str, self.changes)) or "no changes"
