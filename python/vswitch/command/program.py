@@ -16,7 +16,7 @@ import typer
 import typer.main
 
 from libvswitch.errors import HostError
-from vswitch.command import reading
+from vswitch.command import changing, documents, reading
 from vswitch.command.session import Command, Group
 from vswitch.exits import CHANGED, exits
 from vswitch.words import DocumentError
@@ -34,6 +34,15 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "lag": reading.lag,
     "options": reading.options,
     "find": reading.find,
+    "set": changing.set_,
+    "unset": changing.unset,
+    "add": changing.add,
+    "remove": changing.remove,
+    "uplink": changing.uplink,
+    "diff": documents.diff,
+    "apply": documents.apply,
+    "backup": documents.backup,
+    "restore": documents.restore,
 }
 
 

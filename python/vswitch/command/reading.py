@@ -251,4 +251,4 @@ def find(
 
 
 def _entry(entry: MacEntry) -> Dict[str, Any]:
-    return {"switch": entry.switch, "port": entry.port, **entry.words()}
+    return {**dataclasses.asdict(entry), "type": str(entry.type)}

@@ -1,0 +1,206 @@
+"""The commands that change the host, each all or nothing.
+
+A command is a short document: it is checked, made, read back and undone as documents are.
+"""
+
+import dataclasses
+import enum
+from typing import Any, Dict, Iterable, List, Optional, Union
+
+import click
+import typer
+
+from libvswitch.errors import Exists, HostError
+from vswitch import _settings, _table, documents
+from vswitch.command import assignments, output, places
+from vswitch.command.session import host, is_json
+from vswitch.port import Port, UplinkPort
+from vswitch.switch import Switch
+from vswitch.told import Change
+from vswitch.values import Words
+from vswitch.words import ABSENT, DocumentError
+
+__all__ = ["add", "remove", "set_", "tell", "unset", "uplink"]
+
+Found = Union[Switch, Port, UplinkPort]
+Members = Dict[str, Words]
+
+_PLACE = typer.Argument(..., metavar="SWITCH[/PORT]", help="A switch, or a port of it.")
+_TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
+
+
+def tell(changes: Iterable[Change]) -> None:
+    """What was changed, or would be."""
+    found = list(changes)
+    if is_json():
+        output.write_json([dataclasses.asdict(one) for one in found])
+    elif not found:
+        output.line("no changes")
+    for one in () if is_json() else found:
+        output.line(one)
+
+
+def _change(alias: str, members: Members) -> None:
+    """Changes a switch as a document says it. What is wrong is known by a word of the user's."""
+    document = {"switches": [{"alias": alias, **members}]}
+    try:
+        documents.read(document)
+    except DocumentError as error:
+        raise click.UsageError(f"{error.path.rpartition('.')[2]}: {error.expected}") from None
+    _carry_out(document)
+
+
+def _carry_out(document: Dict[str, Any]) -> None:
+    try:
+        plan = host().plan(document)
+    except DocumentError as error:
+        raise HostError(error.expected) from None
+    tell(plan.apply())
+
+
+def _change_found(found: Found, members: Members) -> None:
+    if isinstance(found, Switch):
+        _change(found.alias, members)
+        return
+    kind = "ports" if isinstance(found, Port) else "uplink_ports"
+    _change(found.switch.alias, {kind: [{"id": found.id, **members}]})
+
+
+def _members(known: Dict[str, _table.Property], wanted: Members) -> Members:
+    """Settings as a document has them; a text that would clear its setting there, as a property."""
+    said = {name: value for name, value in wanted.items() if value != ABSENT}
+    properties = {
+        known[name].key: {"type": _TYPES[known[name].type], "text": value}
+        for name, value in wanted.items()
+        if value == ABSENT
+    }
+    return {**said, "properties": properties} if properties else said
+
+
+def set_(
+    place: str = _PLACE,
+    settings: List[str] = typer.Argument(
+        ..., metavar="NAME=VALUE...", help="Settings, or members of them."
+    ),
+) -> None:
+    """Change settings of a switch or a port.
+
+    As in: set lab mtu=9000; set lab/web-1 vlan=7 trunk=10-12,20 forbids=forged_transmits. A member
+    of a setting leaves its other members as they are. What has members of its own takes JSON, too.
+    """
+    found = places.find(host(), place)
+
+    def current(known: _table.Property) -> Words:
+        return _settings.words_of(known, _settings.read(found, known))
+
+    wanted = assignments.read(found._settings, settings, current)
+    _change_found(found, _members(found._settings, wanted))
+
+
+def unset(
+    place: str = _PLACE,
+    settings: List[str] = typer.Argument(..., metavar="NAME...", help="Settings."),
+) -> None:
+    """Clear settings of a switch or a port, so that they are what is the default."""
+    found = places.find(host(), place)
+    names = []
+    for name in settings:
+        known = assignments.find_setting(found._settings, name)
+        if known is None:
+            there = ", ".join(sorted(found._settings))
+            raise click.UsageError(f"no setting {name!r} (there are {there})")
+        names.append(known.name)
+    _change_found(found, dict.fromkeys(names, ABSENT))
+
+
+def add(
+    place: str = typer.Argument(..., metavar="SWITCH[/PORT]", help="What is to be there."),
+    settings: Optional[List[str]] = typer.Argument(
+        None, metavar="[NAME=VALUE...]", help="Settings, as of set.", show_default=False
+    ),
+    identifier: Optional[str] = typer.Option(
+        None, metavar="ID", help="Of a switch: its identifier."
+    ),
+    portset: Optional[str] = typer.Option(None, metavar="NAME", help="Of a switch: its port set."),
+    max_ports: Optional[int] = typer.Option(None, metavar="N", help="Of a switch: its ports."),
+    uplink: Optional[List[str]] = typer.Option(
+        None, metavar="NAME", help="Of a switch: an uplink of it; several may be given."
+    ),
+    external_id: Optional[str] = typer.Option(
+        None, metavar="ID", help="Of a port: what another system calls it."
+    ),
+) -> None:
+    """Add a switch, or a port to a switch. The host chooses what is not given."""
+    alias, id_ = places.split(host(), place)
+    of_switch: Dict[str, Any] = {
+        "identifier": identifier,
+        "portset": portset,
+        "max_ports": max_ports,
+        "uplinks": list(uplink) if uplink else None,
+    }
+    of_port = {"external_id": external_id}
+    if not id_:
+        _refuse(of_port, "a port")
+        if alias in host().switches:
+            raise Exists(f"the switch {alias!r} is there already")
+        _change(alias, {**_given(of_switch), **_first(_table.SWITCH, settings)})
+        return
+    _refuse(of_switch, "a switch")
+    switch = host().switches[alias]
+    if id_ in switch.ports or id_ in switch.uplink_ports:
+        raise Exists(f"the port {id_!r} of switch {alias!r} is there already")
+    _change(alias, {"ports": [{"id": id_, **_given(of_port), **_first(_table.PORT, settings)}]})
+
+
+def _given(members: Dict[str, Any]) -> Members:
+    return {name: value for name, value in members.items() if value is not None}
+
+
+def _refuse(members: Dict[str, Any], kind: str) -> None:
+    for name in _given(members):
+        option = f"--{'uplink' if name == 'uplinks' else name.replace('_', '-')}"
+        raise click.UsageError(f"{option} is for {kind}")
+
+
+def _first(known: Dict[str, _table.Property], settings: Optional[List[str]]) -> Members:
+    """The settings of what is made: members that are not said are the defaults."""
+
+    def current(setting: _table.Property) -> Words:
+        return _settings.words_of(setting, _settings.parse(setting, setting.default, setting.name))
+
+    return _members(known, assignments.read(known, settings or (), current))
+
+
+def remove(place: str = _PLACE) -> None:
+    """Remove a switch with its ports, or a port."""
+    _change_found(places.find(host(), place), {"state": ABSENT})
+
+
+class Action(str, enum.Enum):
+    """What can be done with an uplink."""
+
+    add = "add"
+    remove = "remove"
+    up = "up"
+    down = "down"
+
+
+def uplink(
+    alias: str = typer.Argument(..., metavar="SWITCH", help="The alias of a switch."),
+    action: Action = typer.Argument(
+        ..., metavar="add|remove|up|down", help="What is to be done.", show_choices=False
+    ),
+    name: str = typer.Argument(..., metavar="UPLINK", help="An uplink of the host, as nic4."),
+) -> None:
+    """Add an uplink to a switch, remove it, or take it up or down."""
+    switch = host().switches[alias]
+    if action is Action.add:
+        if name in switch.uplinks:
+            raise Exists(f"the uplink {name!r} is at switch {alias!r} already")
+        _change(alias, {"uplinks": [name]})
+        return
+    found = switch.uplinks[name]
+    if action is Action.remove:
+        _change(alias, {"uplinks": [{"name": found.name, "state": ABSENT}]})
+    else:
+        _carry_out({"uplinks": [{"name": found.name, "link": action.value}]})
