@@ -96,11 +96,10 @@ python_tests() {
     # shellcheck disable=SC2046 # none of our file names has a space
     set -- $(sed -n 's/^python //p' "$selected" | of_group "$group" || :)
     [ $# -eq 0 ] || case $group in
-    contract) pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" "$@" ;;
+    contract) contract_tests "$@" ;;
     others)
-      pytest "Python tests" module.xml '' -n "$jobs" --dist loadfile --ignore=tests/contract \
-        --ignore=tests/classes --ignore=tests/vswitch --ignore=tests/fuzz --ignore=tests/docs \
-        --ignore=tests/packages "$@"
+      pytest "Python tests" module.xml '' --ignore=tests/contract --ignore=tests/classes \
+        --ignore=tests/vswitch --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages "$@"
       ;;
     *) pytest "Tests of $group" "$group.xml" '' "$@" ;;
     esac

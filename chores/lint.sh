@@ -34,6 +34,7 @@ lint() {
 }
 
 check() {
+  started=$(date +%s)
   if "$2"; then
     say "$1: clean"
     tally "$1" 1 0

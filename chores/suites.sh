@@ -2,11 +2,12 @@
 # How a suite is run, and what is counted of it.
 
 # pytest TITLE XML HOST ARGUMENTS...: HOST is the folder of the host's libraries, empty for the
-# simulated one.
+# simulated one. The files of tests are spread over the processors.
 pytest() {
   title=$1 xml=$2 host=$3
   shift 3
-  set -- "$python" -m pytest -q ${expression:+-k "$expression"} --junitxml "$folder/$xml" "$@"
+  set -- "$python" -m pytest -q -n "$jobs" --dist loadfile ${expression:+-k "$expression"} \
+    --junitxml "$folder/$xml" "$@"
   [ -z "$host" ] || set -- "LD_LIBRARY_PATH=$host" "$@"
   if [ -n "$sanitizers" ]; then
     # The interpreter is not instrumented, so the runtime must come first, and with it the C++
@@ -17,6 +18,11 @@ pytest() {
       --capture=sys
   fi
   junit "$title" "$xml" env "$@"
+}
+
+# They run in one process, which sums up what they have proven of each call.
+contract_tests() {
+  pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" -n 0 "$@"
 }
 
 # junit TITLE XML COMMAND...: runs a suite and counts its tests in the report that it leaves. A
@@ -55,9 +61,11 @@ select_tests() {
   [ -z "$numbers" ] || cxx_tests "$numbers"
 }
 
+# tally TITLE PASSED FAILED: what has been run since $started.
 tally() {
   passed=$((passed + $2)) failed=$((failed + $3))
-  summary="$summary$(printf '%-16s %5d passed %5d failed' "$1" "$2" "$3")
+  took=$(($(date +%s) - started))
+  summary="$summary$(printf '%-16s %5d passed %5d failed %5d s' "$1" "$2" "$3" "$took")
 "
 }
 

@@ -16,7 +16,8 @@
 #   -- ARGUMENTS    given to each run of pytest as they are
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
-# Without them clang-tidy passes over the tests' own C++, which takes long; ./dev lint does not.
+# Without them clang-tidy passes over the tests' own C++ and that of simhostctl, which take long;
+# ./dev lint does not.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
@@ -76,8 +77,9 @@ cmd_test() {
     tally build 0 1
     report
   fi
-  # The tests' own sources are half of all, and the slower half: ./dev lint has clang-tidy read them.
-  untidied='^\./tests/'
+  # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
+  # parses the command line with a library of templates.
+  untidied='^\./\(tests\|simhost/cli\)/'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
@@ -93,7 +95,7 @@ cmd_test() {
     --ignore=tests/packages "$@"
   class_tests "$@"
   pytest "Object tests" objects.xml '' tests/vswitch "$@"
-  pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" tests/contract "$@"
+  contract_tests tests/contract "$@"
   # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are
   # the same whatever the module is built for.
   if [ "$folder" != build ]; then
@@ -170,10 +172,10 @@ lend_pytest() {
   lent=$root/$folder/pytest
   mkdir -p "$lent"
   for module in pytest _pytest pluggy iniconfig packaging attr attrs py py.py exceptiongroup tomli \
-    hypothesis sortedcontainers; do
+    xdist execnet hypothesis sortedcontainers; do
     ln -sfn "/usr/lib/python3/dist-packages/$module" "$lent/$module"
   done
-  for metadata in /usr/lib/python3/dist-packages/pytest-*; do ln -sfn "$metadata" "$lent/"; done
+  for metadata in /usr/lib/python3/dist-packages/pytest[-_]*; do ln -sfn "$metadata" "$lent/"; done
   export PYTHONPATH="$PYTHONPATH:$lent" PYTHONDONTWRITEBYTECODE=1
   "$python" -m pytest --version >/dev/null 2>&1 || die "$python has no pytest"
 }
@@ -218,6 +220,7 @@ test_packages() {
   passed=0 failed=0 summary=
   make_packages
   export BUILD_DIR="$root/$folder"
-  pytest "Package tests" packages.xml '' tests/packages "$@"
+  # They install into the same empty systems.
+  pytest "Package tests" packages.xml '' -n 0 tests/packages "$@"
   report
 }
