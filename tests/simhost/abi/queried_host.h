@@ -31,7 +31,10 @@ struct Queries : testing::Test {
     ASSERT_EQ(VSDVS_DestroyVSwitch("vswitch0"), QEX_OK);
     ASSERT_EQ(simhost_apply(kHost), QEX_OK) << simhost_error();
   }
-  void TearDown() override { EXPECT_EQ(simhost_ledger_count(), 0U); }
+  void TearDown() override {
+    EXPECT_EQ(simhost_ledger_count(), 0U);
+    EXPECT_EQ(simhost_reset(), QEX_OK);
+  }
 
   static void apply(std::string const &document) {
     ASSERT_EQ(simhost_apply(document.c_str()), QEX_OK) << simhost_error();
