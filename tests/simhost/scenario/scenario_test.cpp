@@ -9,6 +9,7 @@
 #include <cstdlib>
 #include <fstream>
 #include <functional>
+#include <ostream>
 #include <string>
 
 #include "abi/fresh_host.h"
@@ -322,6 +323,8 @@ struct Said {
   char const *members;
   char const *key;
   char const *hex;
+
+  friend void PrintTo(Said const &said, std::ostream *stream) { *stream << said.members; }
 };
 
 struct NamedForms : Scenario, testing::WithParamInterface<Said> {
