@@ -82,7 +82,7 @@ class RuntimeOptions(_records.Record):
         type: int,
         value: int,
     ) -> Optional["_classes.VSRuntimeOptionHeader"]:
-        self._require_place(at, _HEADER + 4)
+        self._require_place(at)
         following = flat.VSRuntimeOptions_add_int_option(self, at, option_name, type, value)
         return self._option(following)
 
@@ -95,7 +95,7 @@ class RuntimeOptions(_records.Record):
     ) -> Optional["_classes.VSRuntimeOptionHeader"]:
         text: Any = _checks.text("option_text", option_text)
         if isinstance(text, str):
-            self._require_place(at, _HEADER + len(text.encode("utf-8", "surrogateescape")) + 1)
+            self._require_place(at)
         following = flat.VSRuntimeOptions_add_str_option(self, at, option_name, type, text)
         return self._option(following)
 
@@ -119,14 +119,11 @@ class RuntimeOptions(_records.Record):
         used: int = flat.VSRuntimeOptions_totalLength_get(self)
         _records.require_room(self, used, "a list of this totalLength")
 
-    def _require_place(self, at: Any, needed: int) -> None:
-        """That an option fits at a place: the flat methods look at the list's own end only."""
+    def _require_place(self, at: Any) -> None:
+        """That an option may be put there: the flat methods look at the list's own end only."""
         self._require_length()
         if not isinstance(at, _records.Record) or at.__dict__.get("_owner") is not self:
             raise ValueError("at is no place in this list")
-        used: int = flat.VSRuntimeOptions_totalLength_get(self)
-        if int(at) + needed <= int(self) + used:
-            _records.require_room(at, needed, "the option")
 
     def _option(self, option: Any) -> Optional["_classes.VSRuntimeOptionHeader"]:
         found: Optional["_classes.VSRuntimeOptionHeader"] = _records.inner(self, option)
