@@ -16,8 +16,8 @@
 #   -- ARGUMENTS    given to each run of pytest as they are
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
-# Without them clang-tidy passes over the tests' own C++ and that of simhostctl, which take long;
-# ./dev lint does not.
+# Without them clang-tidy passes over the tests' own C++ and that of simhostctl, and over clang's
+# analyzer for the simulated host, which take long; ./dev lint does not.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
@@ -78,8 +78,9 @@ cmd_test() {
     report
   fi
   # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
-  # parses the command line with a library of templates.
-  untidied='^\./\(tests\|simhost/cli\)/'
+  # parses the command line with a library of templates. What runs in its callers' processes on a real
+  # host is analyzed too.
+  untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='./simhost/*'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
