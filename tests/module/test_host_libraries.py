@@ -15,6 +15,7 @@ import _libvswitch as vs
 BUILD = Path(os.environ["BUILD_DIR"])
 ROOT = Path(__file__).resolve().parents[2]
 MODULE = Path(vs.__file__)
+RECORDING_HOST = BUILD / "tests" / "recording_host"
 HOST_LIBRARIES = {"libvswitch.so", "libnebPublic.so"}
 
 
@@ -73,9 +74,8 @@ def test_the_simulated_host_is_found_beside_the_module() -> None:
 
 
 def test_another_host_takes_its_place_without_a_rebuild() -> None:
-    other = BUILD / "tests" / "recording_host"
-    found = imported_from(MODULE.parent, LD_LIBRARY_PATH=str(other))
-    assert found.stdout.split() == hosts(other)
+    found = imported_from(MODULE.parent, LD_LIBRARY_PATH=str(RECORDING_HOST))
+    assert found.stdout.split() == hosts(RECORDING_HOST)
 
 
 def test_a_missing_host_is_named_by_the_loader(tmp_path: Path) -> None:
@@ -88,22 +88,42 @@ def test_a_missing_host_is_named_by_the_loader(tmp_path: Path) -> None:
     assert line in (ROOT / "README.md").read_text(encoding="utf-8")
 
 
-def test_a_build_against_a_host_brings_no_other(tmp_path: Path) -> None:
-    host = BUILD / "tests" / "recording_host"
-    configure = [
+def run(*command: str) -> str:
+    done = subprocess.run(command, capture_output=True, text=True)
+    assert done.returncode == 0, done.stdout + done.stderr
+    return done.stdout
+
+
+def configure(folder: Path, *options: str) -> None:
+    """A build against the recording host."""
+    run(
         "cmake",
         f"-S{ROOT}",
-        f"-B{tmp_path}",
+        f"-B{folder}",
         "-GNinja",
-        f"-DHOST_LIBRARY_DIR={host}",
+        f"-DHOST_LIBRARY_DIR={RECORDING_HOST}",
         f"-DPython3_EXECUTABLE={sys.executable}",
-    ]
-    for command in (configure, ["cmake", "--build", str(tmp_path)]):
-        done = subprocess.run(command, capture_output=True, text=True)
-        assert done.returncode == 0, done.stdout + done.stderr
+        *options,
+    )
+
+
+def test_a_build_against_a_host_brings_no_other(tmp_path: Path) -> None:
+    configure(tmp_path, f"-DPROPERTY_REFERENCE={BUILD}/simhost/properties.json")
+    run("cmake", "--build", str(tmp_path))
     assert not (tmp_path / "simhost").exists()
-    found = imported_from(tmp_path / "python", LD_LIBRARY_PATH=str(host))
-    assert found.stdout.split() == hosts(host), found.stderr
+    found = imported_from(tmp_path / "python", LD_LIBRARY_PATH=str(RECORDING_HOST))
+    assert found.stdout.split() == hosts(RECORDING_HOST), found.stderr
+    settings = "python/vswitch/_properties.py"
+    assert (tmp_path / settings).read_bytes() == (BUILD / settings).read_bytes()
+
+
+def test_a_build_against_a_host_makes_the_table_of_settings_if_none_is_given(
+    tmp_path: Path,
+) -> None:
+    configure(tmp_path)
+    commands = run("ninja", "-C", str(tmp_path), "-t", "commands", "all")
+    assert "/properties/make_properties" in commands
+    assert "libsimhost.so" not in commands
 
 
 @pytest.mark.parametrize("missing", sorted(HOST_LIBRARIES))
