@@ -52,6 +52,16 @@ def _set_vlan(switch: str, port: str, vlan: Vlan) -> None:
     checked.VSDVS_SetPortVLANPolicy(switch, port, *given)
 
 
+def _learning(switch: str) -> MacLearning:
+    """Unless it has its own, a switch learns as the host says, which the typed call does not."""
+    identifier = checked.DVSAliasToSwitchId(switch)
+    try:
+        checked.DVSState_GlobalPropLookup(identifier, _vs.VSPROP_SWITCH_MAC_LEARNING)
+    except NotFound:
+        return _records.learning_from(checked.VSQEX_GetGlobalMACLearningProps())
+    return _records.learning_from(checked.VSDVS_GetMACLearning(switch))
+
+
 def _private_vlans(switch: str) -> Tuple[PrivateVlan, ...]:
     choices = _choices(PrivateVlan._form, "type")
     kinds = {number: word for word, number in choices.items()}
@@ -104,7 +114,7 @@ CROSSINGS: Dict[str, Crossing] = {
     ),
     _vs.VSPROP_SWITCH_MAC_LEARNING: Crossing(
         MacLearning.from_words,
-        lambda *owner: _records.learning_from(checked.VSDVS_GetMACLearning(*owner)),
+        _learning,
         lambda switch, value: checked.VSDVS_SetMACLearning(switch, _records.learning_of(value)),
         checked.VSDVS_ClearMACLearning,
     ),

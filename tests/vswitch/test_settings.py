@@ -187,7 +187,7 @@ def test_a_setting_of_an_uplink_port(
     assert not port.is_set(name) and getattr(port, name) != value
 
 
-def test_what_is_not_set_is_the_default(lab: Switch, bare: Port) -> None:
+def test_what_is_not_set_is_the_default(lab: Switch, bare: Port, objects: Host) -> None:
     assert bare.vlan == Vlan() and bare.forbids == Forbid(0) and bare.uplink == ""
     assert bare.mac_learning == PortMacLearning() and bare.ethernet_filter == FrameFilter()
     assert bare.mirrors == () and bare.alias == "" and bare.connection == 0
@@ -197,7 +197,7 @@ def test_what_is_not_set_is_the_default(lab: Switch, bare: Port) -> None:
         delattr(lab, name)
     assert lab.mtu == 1500 and lab.teaming == Teaming() and lab.multicast is Multicast.LEGACY
     assert lab.disabled is False and lab.private_vlans == () and lab.uplink_mirror_sessions == ()
-    assert lab.mac_learning == MacLearning()
+    assert lab.mac_learning == objects.mac_learning == MacLearning(60, 1000, True)
 
 
 def test_what_is_set_is_told_from_the_default(bare: Port) -> None:
