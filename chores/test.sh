@@ -78,8 +78,7 @@ cmd_test() {
     report
   fi
   # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
-  # parses the command line with a library of templates. What runs in its callers' processes on a real
-  # host is analyzed too.
+  # parses the command line with a library of templates. The module and its helpers are analyzed too.
   untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='./simhost/*'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
