@@ -1,10 +1,11 @@
 """The commands that take a document, which says how the host is to be, and that make one."""
 
-from typing import Any
+import sys
+from typing import Any, Optional
 
 import typer
 
-from vswitch.command import files, output
+from vswitch.command import files, keeping, output
 from vswitch.command.changing import tell
 from vswitch.command.session import host, is_json
 from vswitch.plan import Plan
@@ -29,13 +30,29 @@ def diff(file: str = _FILE) -> None:
     tell(plan(file, files.read(file)).changes)
 
 
-def apply(file: str = _FILE, dry_run: bool = _DRY_RUN) -> None:
+def apply(
+    file: str = _FILE,
+    dry_run: bool = _DRY_RUN,
+    confirm_within: Optional[float] = typer.Option(
+        None, metavar="S", min=0.1, help="Take it back unless confirmed within so many seconds."
+    ),
+) -> None:
     """Make the host what a document says. What it does not name stays as it is.
 
-    All of it arrives, or everything is as it was before. Applying again changes nothing.
+    All of it arrives, or everything is as it was before. Applying again changes nothing. With
+    --confirm-within, the change is taken back unless the command confirm comes in time, even if
+    the shell is gone by then.
     """
-    wanted = plan(file, files.read(file))
-    tell(wanted.changes if dry_run else wanted.apply())
+    document = files.read(file)
+    if dry_run or confirm_within is None:
+        wanted = plan(file, document)
+        tell(wanted.changes if dry_run else wanted.apply())
+        return
+    changes = keeping.apply(host(), lambda: plan(file, document), confirm_within)
+    tell(changes)
+    if changes:
+        said = f"# taken back in {confirm_within:g} s, unless this confirms it: vswitch confirm"
+        print(said, file=sys.stderr)
 
 
 def backup() -> None:

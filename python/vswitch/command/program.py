@@ -16,7 +16,7 @@ import typer
 import typer.main
 
 from libvswitch.errors import HostError
-from vswitch.command import changing, documents, reading
+from vswitch.command import changing, confirming, documents, reading
 from vswitch.command.session import Command, Group
 from vswitch.exits import CHANGED, exits
 from vswitch.words import DocumentError
@@ -25,6 +25,7 @@ __all__ = ["group", "main"]
 
 NAME = "vswitch"
 _USAGE = 2
+_SIGNALS = (signal.SIGTERM, signal.SIGHUP)
 _OPTIONS_FOR_ALL = {"help_option_names": ["-h", "--help"]}
 
 COMMANDS: Dict[str, Callable[..., None]] = {
@@ -41,6 +42,7 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "uplink": changing.uplink,
     "diff": documents.diff,
     "apply": documents.apply,
+    "confirm": confirming.confirm,
     "backup": documents.backup,
     "restore": documents.restore,
 }
@@ -74,7 +76,7 @@ def main(words: List[str]) -> None:
         if isinstance(stream, io.TextIOWrapper):
             # What an encoding has no bytes for is told all the same.
             stream.reconfigure(errors="backslashreplace")
-    for number in (signal.SIGTERM, signal.SIGHUP):
+    for number in _SIGNALS:
         signal.signal(number, _end)
     with exits(NAME):
         try:
@@ -102,5 +104,7 @@ def _run(words: List[str]) -> None:
 
 
 def _end(number: int, _: Optional[FrameType]) -> None:
-    """What a signal ends is put right on the way out."""
+    """What a signal ends is put right on the way out, which another does not disturb."""
+    for one in _SIGNALS:
+        signal.signal(one, signal.SIG_IGN)
     raise SystemExit(128 + number)
