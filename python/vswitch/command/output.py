@@ -5,10 +5,11 @@ line for the next program. Names come from a host, so what would move a terminal
 not sent.
 """
 
+import contextlib
 import io
 import json
 import sys
-from typing import Any, Iterable, Sequence, Tuple
+from typing import Any, Callable, Iterable, Iterator, Sequence, Tuple
 
 from rich import box
 from rich.console import Console, RenderableType
@@ -16,7 +17,16 @@ from rich.table import Table
 from rich.text import Text
 from rich.tree import Tree
 
-__all__ = ["Branch", "line", "printable", "table", "tree", "write_json", "write_json_line"]
+__all__ = [
+    "Branch",
+    "line",
+    "printable",
+    "progress",
+    "table",
+    "tree",
+    "write_json",
+    "write_json_line",
+]
 
 Branch = Tuple[str, Sequence[Any]]
 """A line of a tree, and the branches below it."""
@@ -79,6 +89,17 @@ def _label(words: str) -> Text:
     """A line of a tree; what stands before a colon is the name of what follows."""
     name, colon, value = printable(words).partition(": ")
     return Text.assemble((name, "bold" if not colon else "cyan"), colon, value)
+
+
+@contextlib.contextmanager
+def progress(what: str) -> Iterator[Callable[[str], None]]:
+    """A line on a terminal while something takes long; it goes when that is over."""
+    if not sys.stderr.isatty():
+        yield lambda how_far: None
+        return
+    console = Console(stderr=True, highlight=False)
+    with console.status(printable(what)) as status:
+        yield lambda how_far: status.update(printable(f"{what}: {how_far}"))
 
 
 def _render(what: RenderableType) -> None:

@@ -16,7 +16,7 @@ import typer
 import typer.main
 
 from libvswitch.errors import HostError
-from vswitch.command import changing, confirming, documents, reading
+from vswitch.command import changing, confirming, documents, reading, watching
 from vswitch.command.session import Command, Group
 from vswitch.exits import CHANGED, exits
 from vswitch.words import DocumentError
@@ -45,6 +45,9 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "confirm": confirming.confirm,
     "backup": documents.backup,
     "restore": documents.restore,
+    "watch": watching.watch,
+    "mirror": watching.mirror,
+    "drill": watching.drill,
 }
 
 
