@@ -45,7 +45,9 @@ def environment() -> Dict[str, str]:
     }
     # pytest finds the plug-in once, and only the module's folder is what a reader would have.
     given["PYTHONPATH"] = str(BUILD / "python")
-    given["PATH"] = os.pathsep.join([str(BUILD / "simhost"), "/usr/bin", given["PATH"]])
+    given["PATH"] = os.pathsep.join(
+        [str(BUILD / "bin"), str(BUILD / "simhost"), "/usr/bin", given["PATH"]]
+    )
     return given
 
 
@@ -74,7 +76,12 @@ def test_sessions_of_python(guide: Path, tmp_path: Path) -> None:
     )
     assert done.returncode == 0, done.stdout + done.stderr
     assert int(done.stdout) == len(doctest.DocTestParser().get_examples(sessions))
-    assert int(done.stdout) > 0 or guide.stem in ("testing", "describing_a_host", "performance")
+    assert int(done.stdout) > 0 or guide.stem in (
+        "command",
+        "describing_a_host",
+        "performance",
+        "testing",
+    )
 
 
 def commands(guide: Path) -> List[Tuple[str, str]]:
