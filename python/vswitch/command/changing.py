@@ -12,7 +12,7 @@ import typer
 
 from libvswitch.errors import Exists, HostError
 from vswitch import _settings, _table, documents
-from vswitch.command import assignments, output, places
+from vswitch.command import assignments, completing, output, places
 from vswitch.command.session import host, is_json
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
@@ -25,7 +25,12 @@ __all__ = ["add", "remove", "set_", "tell", "unset", "uplink"]
 Found = Union[Switch, Port, UplinkPort]
 Members = Dict[str, Words]
 
-_PLACE = typer.Argument(..., metavar="SWITCH[/PORT]", help="A switch, or a port of it.")
+_PLACE = typer.Argument(
+    ...,
+    metavar="SWITCH[/PORT]",
+    help="A switch, or a port of it.",
+    autocompletion=completing.things,
+)
 _TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
 
 
@@ -99,7 +104,9 @@ def set_(
 
 def unset(
     place: str = _PLACE,
-    settings: List[str] = typer.Argument(..., metavar="NAME...", help="Settings."),
+    settings: List[str] = typer.Argument(
+        ..., metavar="NAME...", help="Settings.", autocompletion=completing.settings
+    ),
 ) -> None:
     """Clear settings of a switch or a port, so that they are what is the default."""
     found = places.find(host(), place)
@@ -114,7 +121,9 @@ def unset(
 
 
 def add(
-    place: str = typer.Argument(..., metavar="SWITCH[/PORT]", help="What is to be there."),
+    place: str = typer.Argument(
+        ..., metavar="SWITCH[/PORT]", help="What is to be there.", autocompletion=completing.things
+    ),
     settings: Optional[List[str]] = typer.Argument(
         None, metavar="[NAME=VALUE...]", help="Settings, as of set.", show_default=False
     ),
@@ -186,11 +195,18 @@ class Action(str, enum.Enum):
 
 
 def uplink(
-    alias: str = typer.Argument(..., metavar="SWITCH", help="The alias of a switch."),
+    alias: str = typer.Argument(
+        ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=completing.switches
+    ),
     action: Action = typer.Argument(
         ..., metavar="add|remove|up|down", help="What is to be done.", show_choices=False
     ),
-    name: str = typer.Argument(..., metavar="UPLINK", help="An uplink of the host, as nic4."),
+    name: str = typer.Argument(
+        ...,
+        metavar="UPLINK",
+        help="An uplink of the host, as nic4.",
+        autocompletion=completing.uplinks,
+    ),
 ) -> None:
     """Add an uplink to a switch, remove it, or take it up or down."""
     switch = host().switches[alias]

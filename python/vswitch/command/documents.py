@@ -1,6 +1,7 @@
 """The commands that take a document, which says how the host is to be, and that make one."""
 
 import sys
+from pathlib import Path
 from typing import Any, Optional
 
 import typer
@@ -13,7 +14,11 @@ from vswitch.words import DocumentError
 
 __all__ = ["apply", "backup", "diff", "restore"]
 
-_FILE = typer.Argument(..., metavar="FILE", help="A document, YAML or JSON; - is standard input.")
+_FILE = typer.Argument(
+    ...,
+    metavar="FILE",
+    help="A document, YAML or JSON; - is standard input.",
+)
 _DRY_RUN = typer.Option(False, "--dry-run", help="Tell what would change, and change nothing.")
 
 
@@ -25,13 +30,13 @@ def plan(name: str, document: Any, whole: bool = False) -> Plan:
         raise DocumentError(name, str(error)) from None
 
 
-def diff(file: str = _FILE) -> None:
+def diff(file: Path = _FILE) -> None:
     """Tell what a document would change."""
-    tell(plan(file, files.read(file)).changes)
+    tell(plan(str(file), files.read(str(file))).changes)
 
 
 def apply(
-    file: str = _FILE,
+    file: Path = _FILE,
     dry_run: bool = _DRY_RUN,
     confirm_within: Optional[float] = typer.Option(
         None, metavar="S", min=0.1, help="Take it back unless confirmed within so many seconds."
@@ -43,12 +48,12 @@ def apply(
     --confirm-within, the change is taken back unless the command confirm comes in time, even if
     the shell is gone by then.
     """
-    document = files.read(file)
+    document = files.read(str(file))
     if dry_run or confirm_within is None:
-        wanted = plan(file, document)
+        wanted = plan(str(file), document)
         tell(wanted.changes if dry_run else wanted.apply())
         return
-    changes = keeping.apply(host(), lambda: plan(file, document), confirm_within)
+    changes = keeping.apply(host(), lambda: plan(str(file), document), confirm_within)
     tell(changes)
     if changes:
         said = f"# taken back in {confirm_within:g} s, unless this confirms it: vswitch confirm"
@@ -64,10 +69,10 @@ def backup() -> None:
         print(files.write(state), end="")
 
 
-def restore(file: str = _FILE, dry_run: bool = _DRY_RUN) -> None:
+def restore(file: Path = _FILE, dry_run: bool = _DRY_RUN) -> None:
     """Make the host what a backup says: switches, ports and settings that are not in it go.
 
     Links, learned addresses and counters are the host's own, and stay.
     """
-    wanted = plan(file, files.read(file), whole=True)
+    wanted = plan(str(file), files.read(str(file)), whole=True)
     tell(wanted.changes if dry_run else wanted.apply())

@@ -16,7 +16,7 @@ import typer
 import typer.main
 
 from libvswitch.errors import HostError
-from vswitch.command import changing, confirming, documents, reading, watching
+from vswitch.command import changing, completing, confirming, documents, reading, watching
 from vswitch.command.session import Command, Group
 from vswitch.exits import CHANGED, exits
 from vswitch.words import DocumentError
@@ -48,6 +48,7 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "watch": watching.watch,
     "mirror": watching.mirror,
     "drill": watching.drill,
+    "completion": completing.completion,
 }
 
 
@@ -94,8 +95,11 @@ def main(words: List[str]) -> None:
 
 
 def _run(words: List[str]) -> None:
+    commands = group()
+    if completing.answer(commands, NAME):
+        return
     try:
-        with group().make_context(NAME, words) as context:
+        with commands.make_context(NAME, words) as context:
             context.command.invoke(context)
     except click.exceptions.Exit as end:
         raise SystemExit(end.exit_code) from None

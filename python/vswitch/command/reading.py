@@ -12,14 +12,21 @@ import typer
 from libvswitch.errors import NotFound
 from vswitch import _settings, _table, words
 from vswitch._thing import Thing
-from vswitch.command import output, places
+from vswitch.command import completing, output, places
 from vswitch.command.session import from_words, host, is_json
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
 from vswitch.told import MacEntry, shown
 
-_PLACE = typer.Argument(..., metavar="SWITCH[/PORT]", help="A switch, or a port of it.")
-_SWITCH = typer.Argument(..., metavar="SWITCH", help="The alias of a switch.")
+_PLACE = typer.Argument(
+    ...,
+    metavar="SWITCH[/PORT]",
+    help="A switch, or a port of it.",
+    autocompletion=completing.things,
+)
+_SWITCH = typer.Argument(
+    ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=completing.switches
+)
 
 
 def list_() -> None:

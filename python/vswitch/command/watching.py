@@ -10,7 +10,7 @@ import typer
 
 from libvswitch.enums import LinkState
 from libvswitch.errors import HostError
-from vswitch.command import output, places
+from vswitch.command import completing, output, places
 from vswitch.command.session import from_words, host, is_json
 from vswitch.port import Port
 from vswitch.switch import Switch
@@ -27,7 +27,10 @@ _EVERY = typer.Option(1.0, "--every", metavar="S", min=0.05, help="Seconds betwe
 def watch(
     seconds: Optional[float] = _FOR,
     kind: Optional[List[str]] = typer.Option(
-        None, metavar="KIND", help=f"Only such: {', '.join(KINDS)}. Several may be given."
+        None,
+        metavar="KIND",
+        help=f"Only such: {', '.join(KINDS)}. Several may be given.",
+        autocompletion=completing.kinds,
     ),
     every: float = _EVERY,
 ) -> None:
@@ -47,9 +50,17 @@ def watch(
 
 
 def mirror(
-    place: str = typer.Argument(..., metavar="SWITCH/PORT", help="The port that is mirrored."),
+    place: str = typer.Argument(
+        ...,
+        metavar="SWITCH/PORT",
+        help="The port that is mirrored.",
+        autocompletion=completing.things,
+    ),
     to: str = typer.Option(
-        ..., metavar="SWITCH/PORT", help="Where its frames go, too: a port, or an uplink."
+        ...,
+        metavar="SWITCH/PORT",
+        help="Where its frames go, too: a port, or an uplink.",
+        autocompletion=completing.things,
     ),
     seconds: float = typer.Option(..., "--for", metavar="S", min=0, help="For how many seconds."),
     every: float = _EVERY,
@@ -83,7 +94,9 @@ def _end_of(switch: Switch, to: str) -> Union[Port, Uplink]:
 
 
 def drill(
-    alias: str = typer.Argument(..., metavar="SWITCH", help="The alias of a switch."),
+    alias: str = typer.Argument(
+        ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=completing.switches
+    ),
     timeout: float = typer.Option(
         5.0, metavar="S", min=0.1, help="How long a link may take to go down and to come up."
     ),

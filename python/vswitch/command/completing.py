@@ -1,0 +1,109 @@
+"""Completion in shells: the command that sets it up, and the names that the host has now.
+
+A shell asks in the middle of somebody's typing, so nothing is said but names; where there is no
+host, there are none.
+"""
+
+import enum
+import os
+from typing import Iterable, Iterator, List, Optional
+
+import click
+import typer
+from click.shell_completion import get_completion_class, shell_complete
+
+from libvswitch.errors import HostError
+from vswitch.command import places
+from vswitch.host import Host
+from vswitch.watch import KINDS
+
+__all__ = ["answer", "completion", "kinds", "settings", "switches", "things", "uplinks"]
+
+_VARIABLE = "_VSWITCH_COMPLETE"
+
+
+class Shell(str, enum.Enum):
+    """The shells that there are scripts for."""
+
+    bash = "bash"
+    zsh = "zsh"
+    fish = "fish"
+
+
+def completion(
+    shell: Shell = typer.Argument(
+        ..., metavar="bash|zsh|fish", help="The shell.", show_choices=False
+    )
+) -> None:
+    """Write what lets a shell complete names: eval "$(vswitch completion bash)"."""
+    root = click.get_current_context().find_root()
+    made = get_completion_class(shell.value)
+    assert made is not None and root.info_name is not None
+    try:
+        print(made(root.command, {}, root.info_name, _VARIABLE).source())
+    except RuntimeError as error:
+        raise HostError(str(error)) from None
+
+
+def answer(group: click.Group, name: str) -> bool:
+    """Answers a shell that asks, which its script does through the environment."""
+    asked = os.environ.get(_VARIABLE)
+    if asked is None:
+        return False
+    shell_complete(group, {}, name, _VARIABLE, asked)
+    return True
+
+
+def _matching(names: Iterable[str], incomplete: str) -> List[str]:
+    try:
+        return [name for name in names if name.startswith(incomplete)]
+    except (HostError, OSError):
+        return []
+
+
+def switches(incomplete: str) -> List[str]:
+    return _matching(_switches(), incomplete)
+
+
+def _switches() -> Iterator[str]:
+    yield from Host().switches
+
+
+def things(incomplete: str) -> List[str]:
+    """Switches, and the ports of one that there is no doubt about."""
+    return _matching(_things(incomplete), incomplete)
+
+
+def _things(incomplete: str) -> Iterator[str]:
+    found = Host().switches
+    aliases = [one for one in found if one.startswith(incomplete)]
+    yield from aliases
+    of = (
+        aliases if len(aliases) == 1 else [one for one in found if incomplete.startswith(one + "/")]
+    )
+    for alias in of:
+        for id_ in (*found[alias].ports, *found[alias].uplink_ports):
+            yield f"{alias}/{id_}"
+
+
+def uplinks(context: click.Context, incomplete: str) -> List[str]:
+    """Those that the switch has: of others no call tells."""
+    return _matching(_uplinks(context.params.get("alias")), incomplete)
+
+
+def _uplinks(alias: Optional[str]) -> Iterator[str]:
+    if alias is not None:
+        yield from Host().switches[alias].uplinks
+
+
+def settings(context: click.Context, incomplete: str) -> List[str]:
+    return _matching(_settings(context.params.get("place")), incomplete)
+
+
+def _settings(place: Optional[str]) -> Iterator[str]:
+    if place is not None:
+        yield from places.find(Host(), place)._settings
+
+
+def kinds(incomplete: str) -> List[str]:
+    return _matching(KINDS, incomplete)
