@@ -97,7 +97,7 @@ FAMILIES = (
             "ALLMULTI": "ALL_MULTICAST",
             "BROADCAST": "BROADCAST",
             "PROMISC": "PROMISCUOUS",
-            "USE_LADRF": "USE_LADRF",
+            "USE_LADRF": "HASHED_MULTICAST",
             "SINK": "SINK",
         },
         is_set=True,

@@ -1,14 +1,29 @@
 """The guide of the checked calls has the whole table of statuses, and all words."""
 
+import json
+import os
 import re
 from pathlib import Path
-from typing import Dict, List
+from typing import Any, Dict, List, Tuple, Type
 
 import pytest
 from libvswitch import enums, errors
 from simhost import Host
 
 GUIDE = Path(__file__).resolve().parents[2] / "docs/guides/checked.md"
+SETTINGS = Path(os.environ["BUILD_DIR"], "simhost", "properties.json")
+
+# What documents say with the words of a family: the object or setting, and its member.
+SAID: Dict[Type[Any], List[Tuple[str, ...]]] = {
+    enums.Balance: [("teaming", "balance")],
+    enums.Criteria: [("teaming", "criteria")],
+    enums.EthernetFilter: [("ethernet_filter", "frames")],
+    enums.Forbid: [("forbids",)],
+    enums.LinkState: [("uplinks", "link"), ("uplinks", "admin"), ("uplinks", "lacp")],
+    enums.MacType: [("addresses", "type")],
+    enums.Multicast: [("multicast",)],
+    enums.TeamFlags: [("teaming", "flags")],
+}
 
 
 def rows(heading: str) -> Dict[str, List[str]]:
@@ -38,6 +53,35 @@ def test_the_words() -> None:
     for name, words in listed.items():
         if name != "Status":
             assert words == [str(one) for one in getattr(enums, name).__members__.values()], name
+
+
+def choices(said: Tuple[str, ...]) -> Dict[str, int]:
+    """The words that documents have there, and their numbers."""
+    known = json.loads(SETTINGS.read_text(encoding="utf-8"))
+    first, *member = said
+    (value, *more) = [one["value"] for one in known["properties"] if one.get("name") == first] or [
+        {"members": known["objects"][first]}
+    ]
+    assert all(one == value for one in more)
+    for name in member:
+        (value,) = [one for one in value["members"] if one["name"] == name]
+    found: Dict[str, int] = value["choices"]
+    return found
+
+
+def test_every_family_is_in_documents() -> None:
+    assert {family.__name__ for family in SAID} == set(enums.__all__) - {"Status"}
+
+
+@pytest.mark.parametrize(
+    "family, said",
+    [(family, said) for family, places in SAID.items() for said in places],
+    ids=lambda one: ".".join(one) if isinstance(one, tuple) else one.__name__,
+)
+def test_every_constant_has_the_word_of_documents(family: Type[Any], said: Tuple[str, ...]) -> None:
+    # Only questions have the type ALL: no address is of all types.
+    constants = [one for one in family.__members__.values() if one is not enums.MacType.ALL]
+    assert {str(one): int(one) for one in constants} == choices(said)
 
 
 @pytest.mark.parametrize("balance", enums.Balance)

@@ -262,7 +262,7 @@ def test_constants_of_another_family_in_values(lab: Switch) -> None:
         Teaming(Multicast.IGMP)  # type: ignore[arg-type]
     with pytest.raises(DocumentError, match="Teaming.flags.* is not"):
         Teaming(flags=Criteria.LINK)  # type: ignore[arg-type]
-    assert FrameFilter(EthernetFilter.USE_LADRF).words()["frames"] == ["hashed_multicast"]
+    assert FrameFilter(EthernetFilter.HASHED_MULTICAST).words()["frames"] == ["hashed_multicast"]
 
 
 def test_the_names_of_attributes_are_those_of_settings(desk: Port, bare: Port) -> None:
