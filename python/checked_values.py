@@ -9,6 +9,8 @@ from stub_text import doc
 PACKED = (
     "DVMirrorEntity",
     "DVMirrorSession",
+    "VSLAGStatus",
+    "VSLAGTable",
     "VSMcastFilterStats",
     "VSMcastFilters",
     "VSRuntimeOption",
@@ -21,7 +23,6 @@ PLAIN = (
     "VSPvlanMapEntry",
     "VSMACEntry",
     "VSMACTable",
-    "VSLAGTable",
     "VSUplinks_entries",
     "VSUplinks",
     "VSDVMirrorSessionIDs",
@@ -35,7 +36,13 @@ PLAIN = (
 NAMES_ALONE = ("VSUplinkPorts", "VSUplinkPortIds")
 """Nothing but a counted array: these are tuples."""
 
-READERS = ("DVMirrorSessionTable", "VSRuntimeOptions", "VSMcastFilters", "VSMcastFilterStats")
+READERS = (
+    "DVMirrorSessionTable",
+    "VSLAGTable",
+    "VSMcastFilterStats",
+    "VSMcastFilters",
+    "VSRuntimeOptions",
+)
 
 _HEAD = '''"""Values that checked calls return for records of the host's memory.
 

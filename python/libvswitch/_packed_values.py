@@ -1,5 +1,6 @@
-"""Values of what is packed in a way that its record does not tell: mirror tables, multicast groups,
-runtime options. Here they are read from the host's memory, and written into a caller's."""
+"""Values of what is packed in a way that its record does not tell: link-aggregation groups, mirror
+tables, multicast groups, runtime options. Here they are read from the host's memory, and written
+into a caller's."""
 
 import ctypes
 import socket
@@ -11,6 +12,7 @@ import _libvswitch as _flat
 import libvswitch as _vs
 from libvswitch import _pointers
 from libvswitch._checking import sequence, text
+from libvswitch.enums import LinkState
 
 T = TypeVar("T")
 
@@ -57,6 +59,59 @@ def texts_at(first: Any, size: int, count: int) -> Tuple[str, ...]:
 def numbers_at(first: Any, count: int) -> Tuple[int, ...]:
     """Numbers of 32 bits each."""
     return tuple((ctypes.c_uint * count).from_address(int(first)))
+
+
+# Link-aggregation groups
+
+
+@dataclass(frozen=True)
+class VSLAGStatus:
+    """A group and its uplinks."""
+
+    state: LinkState = LinkState.DOWN
+    id: int = 0
+    name: str = ""
+    uplinkLinkupBitmap: int = 0
+    uplinkNames: Tuple[str, ...] = ()
+
+
+@dataclass(frozen=True)
+class VSLAGTable(Table[VSLAGStatus]):
+    """The groups of a switch."""
+
+    entries: Tuple[VSLAGStatus, ...] = ()
+
+    def _entries(self) -> Tuple[VSLAGStatus, ...]:
+        return self.entries
+
+
+def read_VSLAGTable(record: Any) -> VSLAGTable:
+    at = int(record) + _SIZES["VSLAGTable"]
+    found = []
+    for _ in range(_lag_count(_flat.VSLAGTable_numLAGs_get(record), _flat.VS_MAX_LAGS)):
+        group: Any = _pointers.pointer_object(at, "VSLAGStatus *")
+        count = _flat.VSLAGStatus_numUplinks_get(group)
+        at += _SIZES["VSLAGStatus"]
+        uplinks = texts_at(at, _SIZES["qex_Name"], _lag_count(count, _flat.VS_MAX_UPLINKS_IN_LAG))
+        at += count * _SIZES["qex_Name"]
+        (name,) = texts_at(_flat.VSLAGStatus_name_get(group), _flat.VS_LACP_LAG_NAME_LENGTH, 1)
+        found.append(
+            VSLAGStatus(
+                state=LinkState(_flat.VSLAGStatus_state_get(group)),
+                id=_flat.VSLAGStatus_id_get(group),
+                name=name,
+                uplinkLinkupBitmap=_flat.VSLAGStatus_uplinkLinkupBitmap_get(group),
+                uplinkNames=uplinks,
+            )
+        )
+    return VSLAGTable(tuple(found))
+
+
+def _lag_count(count: int, most: int) -> int:
+    """A count that says where the next group lies, and so has to be one that there may be."""
+    if count > most:
+        raise ValueError(f"the table of link-aggregation groups says {count} of at most {most}")
+    return count
 
 
 # Multicast

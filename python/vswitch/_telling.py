@@ -8,7 +8,7 @@ import libvswitch as _vs
 from libvswitch import checked
 from libvswitch.enums import MacType, Multicast
 from libvswitch.errors import NotFound
-from vswitch.told import Group, MacEntry, MirrorStats, PortStats, SwitchStats
+from vswitch.told import Group, Lag, MacEntry, MirrorStats, PortStats, SwitchStats
 
 if typing.TYPE_CHECKING:
     from vswitch.port import Port
@@ -37,6 +37,11 @@ def macs_beyond(switch: "Switch") -> Tuple[MacEntry, ...]:
 def _mac_entry(told: checked.VSMACEntry, switch: str, port: Optional[str]) -> MacEntry:
     where = told.vid, told.elapsed, switch, port, told.vni
     return MacEntry(told.macAddress, told.macAddrType, *where, told.aging)
+
+
+def lags(switch: "Switch") -> Tuple[Lag, ...]:
+    table = checked.VSQEX_GetLAGTable(switch.alias)
+    return tuple(Lag(one.name, one.state, one.uplinkNames) for one in table)
 
 
 def groups(port: "Port") -> Tuple[Group, ...]:

@@ -185,9 +185,9 @@ class Switch(Thing):
     @property
     def lags(self) -> Tuple[Lag, ...]:
         """Its link-aggregation groups."""
-        from vswitch import _lags
+        from vswitch import _telling
 
-        return _lags.of_switch(self.alias)
+        return _telling.lags(self)
 
     @property
     def macs(self) -> Tuple[MacEntry, ...]:

@@ -268,7 +268,7 @@ returns(
     ENTRY,
     before=lambda: checked.VSQEX_SetPortMACTable(SWITCH, PORT, ENTRY),
 )
-returns("VSQEX_GetLAGTable", SWITCH, value=checked.VSLAGTable(numLAGs=0))
+returns("VSQEX_GetLAGTable", SWITCH, value=checked.VSLAGTable())
 returns("VSQEX_SetUplinkAdminLinkState", SWITCH, "nic4", LinkState.DOWN)
 returns("VSQEX_GetUplinkLinkState", SWITCH, "nic4", value=LinkState.UP)
 returns("VSQEX_GetUplinkLACPLinkState", SWITCH, "nic4", value=of(LinkState))

@@ -15,7 +15,7 @@ import libvswitch as vs
 import pytest
 from checked_calls import CASES, CONFIG, ID, KEY, PORT, SWITCH, note, number
 from libvswitch import _checking, checked, errors
-from libvswitch.enums import MacType, Multicast, Status
+from libvswitch.enums import LinkState, MacType, Multicast, Status
 from simhost import Host
 
 NAMES = sorted({one.name for one in functions.read() if one.kind == "call"})
@@ -342,6 +342,47 @@ def test_entities_of_every_kind_come_back(host: Host) -> None:
     )
     checked.VSDVS_AppendDVMirrorSessions(SWITCH, PORT, sessions)
     assert checked.VSDVS_GetDVMirrorSessions(SWITCH, PORT) == sessions
+
+
+LAGS = [
+    {"name": "east", "uplinks": ["nic0", "nic1", "nic2"]},
+    {"name": "empty", "uplinks": []},
+    {"name": "west", "uplinks": ["nic3"]},
+]
+
+
+def test_groups_of_links_have_their_uplinks(host: Host) -> None:
+    uplinks = [f"nic{number}" for number in range(4)]
+    host.apply({"switches": [{"alias": "lab", "uplinks": uplinks, "lags": LAGS}]})
+    host.link("nic1").down()
+    host.link("nic3").down()
+    table = checked.VSQEX_GetLAGTable("lab")
+    ids = [group.id for group in table]
+    assert len(set(ids)) == len(ids)
+    down, up = LinkState.DOWN, LinkState.UP
+    assert table == checked.VSLAGTable(
+        (
+            checked.VSLAGStatus(up, ids[0], "east", 0b101, ("nic0", "nic1", "nic2")),
+            checked.VSLAGStatus(down, ids[1], "empty", 0, ()),
+            checked.VSLAGStatus(down, ids[2], "west", 0, ("nic3",)),
+        )
+    )
+    assert all(isinstance(group.state, LinkState) for group in table)
+    assert outstanding(host) == []
+
+
+@pytest.mark.parametrize("count", ["VSLAGTable_numLAGs_get", "VSLAGStatus_numUplinks_get"])
+def test_groups_of_links_that_there_cannot_be(
+    host: Host, monkeypatch: pytest.MonkeyPatch, count: str
+) -> None:
+    def many(record: object) -> int:
+        return 33
+
+    host.apply({"switches": [{"alias": "lab", "uplinks": ["nic3"], "lags": LAGS[2:]}]})
+    monkeypatch.setattr("_libvswitch." + count, many)
+    with pytest.raises(ValueError, match="says 33 of at most 32"):
+        checked.VSQEX_GetLAGTable("lab")
+    assert outstanding(host) == []
 
 
 def test_sessions_without_entities(host: Host) -> None:

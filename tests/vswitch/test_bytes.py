@@ -2,10 +2,9 @@
 believed."""
 
 import struct
-from typing import Any
 
 import pytest
-from vswitch import Mirror, MirrorEnd, PortMacLearning, Switch, _lags, _records, _sessions
+from vswitch import Mirror, MirrorEnd, PortMacLearning, _records, _sessions
 
 LEARNING = PortMacLearning(learning=True, limit=7, limit_policy="drop", mac_change=True)
 MIRRORS = (
@@ -52,18 +51,3 @@ def test_entities_of_a_kind_that_nobody_knows() -> None:
     struct.pack_into("=I", data, first, 77)
     with pytest.raises(ValueError, match="an entity of the unknown kind 77"):
         _sessions.mirrors_from(bytes(data))
-
-
-def test_groups_of_links_that_say_more_than_there_may_be(
-    lab: Switch, monkeypatch: pytest.MonkeyPatch
-) -> None:
-    import _libvswitch
-
-    def many(status: Any) -> int:
-        return 33
-
-    monkeypatch.setattr(_libvswitch, "VSLAGStatus_numUplinks_get", many)
-    with pytest.raises(
-        ValueError, match="the table of link-aggregation groups says 33 of at most 32"
-    ):
-        _lags.of_switch("lab")
