@@ -39,9 +39,15 @@ class exits(contextlib.ContextDecorator):
         raised: Optional[BaseException],
         trace: Optional[TracebackType],
     ) -> None:
-        if raised is None:
-            raised = _flushed()
+        if isinstance(raised, SystemExit) and raised.code:
+            # The tool has said how it ends, and that stays.
+            unwritten = _flushed()
+            if unwritten is not None and not isinstance(unwritten, BrokenPipeError):
+                self._tell(unwritten)
+            return
         if raised is None or isinstance(raised, SystemExit):
+            raised = _flushed()
+        if raised is None:
             return
         if isinstance(raised, BrokenPipeError):
             _close_output()

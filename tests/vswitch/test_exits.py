@@ -82,8 +82,16 @@ def test_a_mistake_in_the_tool_keeps_its_traceback(tmp_path: Path) -> None:
     assert "AttributeError: 'NoneType' object has no attribute 'name'" in done.stderr
 
 
-@pytest.mark.parametrize("body", ["print('x' * 2**20)", "print('x')"])
-def test_a_closed_pipe_is_no_error(body: str, tmp_path: Path) -> None:
+@pytest.mark.parametrize(
+    "body, status",
+    [
+        ("print('x' * 2**20)", 0),
+        ("print('x')", 0),
+        ("print('x'); sys.exit()", 0),
+        ("print('x'); sys.exit(3)", 3),
+    ],
+)
+def test_a_closed_pipe_is_no_error(body: str, status: int, tmp_path: Path) -> None:
     """Whether the pipe is found closed while the tool writes, or when it ends."""
     program = tmp_path / "tool.py"
     program.write_text(PROGRAM.format(body=f"    {body}\n"))
@@ -91,14 +99,22 @@ def test_a_closed_pipe_is_no_error(body: str, tmp_path: Path) -> None:
     shell = f'"{sys.executable}" "{program}" 2>"{tmp_path}/stderr"; echo $? >"{tmp_path}/status"'
     subprocess.run(["sh", "-c", f"({shell}) | true"], env=ENVIRONMENT, check=True)
     assert (tmp_path / "stderr").read_text() == ""
-    assert (tmp_path / "status").read_text() == "0\n"
+    assert (tmp_path / "status").read_text() == f"{status}\n"
 
 
-@pytest.mark.parametrize("body", ["print('x' * 2**20)", "print('x')"])
-def test_what_cannot_be_written_is_an_error(body: str, tmp_path: Path) -> None:
+@pytest.mark.parametrize(
+    "body, status",
+    [
+        ("print('x' * 2**20)", 1),
+        ("print('x')", 1),
+        ("print('x'); sys.exit()", 1),
+        ("print('x'); sys.exit(3)", 3),
+    ],
+)
+def test_what_cannot_be_written_is_an_error(body: str, status: int, tmp_path: Path) -> None:
     with open("/dev/full", "w") as full:
         done = run(body, tmp_path, full.fileno())
-    assert (done.stderr, done.returncode) == ("tool: [Errno 28] No space left on device\n", 1)
+    assert (done.stderr, done.returncode) == ("tool: [Errno 28] No space left on device\n", status)
 
 
 def test_as_a_decorator() -> None:
