@@ -5,6 +5,8 @@ from __future__ import annotations
 import typing
 from typing import Callable, Iterable, Iterator, Optional, Tuple, TypeVar
 
+from libvswitch.errors import NotFound
+
 T = TypeVar("T")
 
 
@@ -27,6 +29,9 @@ class Live(typing.Mapping[str, T]):
         self._shown = shown
 
     def __getitem__(self, name: str) -> T:
+        # No call can be asked about such a text, so it is the name of nothing.
+        if isinstance(name, str) and ("\0" in name or not _is_utf_8(name)):
+            raise NotFound(f"no {name!r} among the {self._shown}")
         return self._get(name)
 
     def __contains__(self, name: object) -> bool:
@@ -46,6 +51,14 @@ class Live(typing.Mapping[str, T]):
 
     def __repr__(self) -> str:
         return f"<{self._shown}: {', '.join(self) or 'none'}>"
+
+
+def _is_utf_8(name: str) -> bool:
+    try:
+        name.encode()
+    except UnicodeEncodeError:
+        return False
+    return True
 
 
 class _Values(typing.ValuesView[T]):

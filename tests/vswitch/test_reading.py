@@ -209,6 +209,15 @@ def test_what_is_not_there_says_what_is(objects: Host) -> None:
         assert isinstance(raised.value, NotFound) and str(raised.value) == words
 
 
+@pytest.mark.parametrize("name", ["v\udcff", "a\0b"])
+def test_what_no_call_takes_is_the_name_of_nothing(name: str, objects: Host, lab: Switch) -> None:
+    for mapping in (objects.switches, objects.uplinks, lab.ports, lab.uplinks, lab.mirrors):
+        assert name not in mapping
+        with pytest.raises(NotFound) as raised:
+            mapping[name]
+        assert str(raised.value).startswith(f"no {name!r} among the ")
+
+
 def test_what_goes_while_somebody_looks(
     host: simhost.Host, lab: Switch, objects: Host, monkeypatch: pytest.MonkeyPatch
 ) -> None:
