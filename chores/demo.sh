@@ -5,8 +5,8 @@
 #
 # Usage: ./dev demo [--python PATH] [--debug-python] [--no-fast-paths]
 #
-# Runs the programs of examples/, each on a host of its own: the first steps, records that a tool
-# builds, tools to copy from, and a tour through the whole host. With LD_LIBRARY_PATH set to the
+# Runs the programs of examples/, each on a host of its own: tools to copy from, the first steps
+# underneath, records that a tool builds, and a tour through the whole host. With LD_LIBRARY_PATH set to the
 # folder of another host's libraries, only those run there that need no switch of the simulated
 # host.
 cmd_demo() {
@@ -14,13 +14,15 @@ cmd_demo() {
   [ -z "$sanitizers" ] || die "demo: --sanitize is for build and test"
   build
   unset SIMHOST_STATE SIMHOST_SCENARIO
-  example first_steps
-  example records
   example inventory
+  example records
+  example first_steps
   [ -z "${LD_LIBRARY_PATH-}" ] || return 0
-  example change_vlan vswitch0 web-1 100 --trunk 10-12,20
-  example mirror_session vswitch0 web-1 web-2 --for 0
-  example watch_links vswitch0 --for 0
+  example compliance --fix
+  example apply tests/examples/document.json
+  example find_mac 02:00:00:00:01:02
+  example mirror vswitch0 web-1 web-2 --for 0
+  example failover_drill vswitch0
   example tour
 }
 

@@ -81,6 +81,7 @@ def test_sessions_of_python(guide: Path, tmp_path: Path) -> None:
         "describing_a_host",
         "performance",
         "testing",
+        "tools",
     )
 
 
@@ -103,6 +104,7 @@ def commands(guide: Path) -> List[Tuple[str, str]]:
 def test_sessions_of_the_shell(guide: Path, tmp_path: Path) -> None:
     for beside in guide.parent.glob("*.py"):
         shutil.copy(beside, tmp_path)
+    (tmp_path / "examples").symlink_to(ROOT / "examples")
     end = "-- the end of a command --"
     script = "".join(f"{command}\necho '{end}'\n" for command, _ in commands(guide))
     done = subprocess.run(

@@ -87,12 +87,12 @@ def test_each_test_that_is_shown_is_one_of_the_guides() -> None:
 SAMPLE = """
 ```console
 $ ./examples/inventory.py vswitch0
-SWITCH    MTU   PORTS     UPLINKS
-vswitch0  ...nic5 up
+SWITCH      MTU   PORTS       UPLINKS
+vswitch0    ...nic5 up
 $ simhostctl link nic5 down
 $ ./examples/inventory.py vswitch0
-SWITCH    MTU   PORTS     UPLINKS
-vswitch0  1500  3 of 128  nic4 up, nic5 up
+SWITCH      MTU   PORTS       UPLINKS
+vswitch0    1500  3 of 128    nic4 up, nic5 up
 ```
 
 ```console
@@ -104,8 +104,8 @@ $ ./dev build
 def test_a_wrong_session_would_be_found(shared_host: SharedHost) -> None:
     (session,) = runnable(SAMPLE)
     assert len(session) == 3
-    row = "vswitch0  1500  3 of 128  nic4 up, nic5 "
-    head = "SWITCH    MTU   PORTS     UPLINKS\n"
+    row = "vswitch0    1500  3 of 128    nic4 up, nic5 "
+    head = "SWITCH      MTU   PORTS       UPLINKS\n"
     assert differences(shared_host, session) == (
         f"$ ./examples/inventory.py vswitch0\n{head}{row}down\ninstead of\n{head}{row}up\n"
     )

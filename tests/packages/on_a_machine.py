@@ -9,15 +9,19 @@ from roots import Root
 
 HOST = ("libvswitch.so", "libnebPublic.so")
 
+DOCUMENT = "/tmp/document.json"
+
 # Programs, and words that show that they got there.
 EXAMPLES = {
     ("first_steps.py",): "Bad parameter",
     ("records.py",): "MaxRARPsPerInterval",
     ("tour.py",): "The host restarts",
     ("inventory.py",): "nic4 up, nic5 up",
-    ("change_vlan.py", "vswitch0", "web-1", "100"): "VLAN 0 -> VLAN 100",
-    ("mirror_session.py", "vswitch0", "web-1", "web-2", "--for", "0"): "mirror_session is removed",
-    ("watch_links.py", "vswitch0", "--for", "0"): "nic4 up, nic5 up",
+    ("compliance.py", "--fix"): "vswitch0/web-1/forbids: absent -> mac_changes,forged_transmits",
+    ("apply.py", DOCUMENT): "vswitch0/mtu: 1500 -> 9000",
+    ("find_mac.py", "02:00:00:00:01:02"): "at web-1, VLAN 10",
+    ("mirror.py", "vswitch0", "web-1", "web-2", "--for", "0"): "0 packets mirrored",
+    ("failover_drill.py", "vswitch0"): "nic4 down: web-1 to nic5",
 }
 
 CALL = "import _libvswitch as vs; print(vs.VSDVS_SetMTU('no such switch', 9000))"
@@ -96,6 +100,7 @@ class Machine:
         installed = self.root.run("ls", folder).split()
         assert {name for name, *_ in EXAMPLES} == {one for one in installed if one.endswith(".py")}
         path = f"{Path(self.simhostctl).parent}:/usr/bin:/bin"
+        self.root.write(DOCUMENT, '{"switches": [{"alias": "vswitch0", "mtu": 9000}]}')
         for (name, *arguments), expected in EXAMPLES.items():
             said = self.root.run(self.python, f"{folder}/{name}", *arguments, PATH=path)
             assert expected in said
