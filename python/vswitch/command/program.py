@@ -16,8 +16,8 @@ import typer
 import typer.main
 
 from libvswitch.errors import HostError
-from vswitch.command import changing, completing, confirming, documents, reading, watching
-from vswitch.command.session import Command, Group
+from vswitch.command import changing, completing, confirming, documents, drawing, reading, watching
+from vswitch.command.session import Command, Group, TextCommand
 from vswitch.exits import CHANGED, exits
 from vswitch.words import DocumentError
 
@@ -48,8 +48,10 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "watch": watching.watch,
     "mirror": watching.mirror,
     "drill": watching.drill,
+    "draw": drawing.draw,
     "completion": completing.completion,
 }
+_TEXTS = ("draw", "completion")
 
 
 def about() -> None:
@@ -68,7 +70,7 @@ def group() -> click.Group:
     app = typer.Typer(name=NAME, add_completion=False, context_settings=_OPTIONS_FOR_ALL)
     app.callback(cls=Group, no_args_is_help=True)(about)
     for name, function in COMMANDS.items():
-        app.command(name, cls=Command)(function)
+        app.command(name, cls=TextCommand if name in _TEXTS else Command)(function)
     made = typer.main.get_command(app)
     assert isinstance(made, click.Group)
     return made

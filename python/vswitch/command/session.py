@@ -10,7 +10,7 @@ from typer.core import TyperCommand, TyperGroup, TyperOption
 from vswitch.host import Host
 from vswitch.words import DocumentError
 
-__all__ = ["Command", "Group", "from_words", "host", "is_json"]
+__all__ = ["Command", "Group", "TextCommand", "from_words", "host", "is_json"]
 
 
 class _Session:
@@ -56,19 +56,24 @@ def _remember(name: str) -> Callable[[click.Context, click.Parameter, bool], Non
     return callback
 
 
-class Command(TyperCommand):
-    """A command, which has these options beside its own."""
+class TextCommand(TyperCommand):
+    """A command that writes what is neither for people alone nor JSON."""
 
     def __init__(self, *arguments: Any, **more: Any) -> None:
         super().__init__(*arguments, **more)
-        self.params += [
-            _flag("--json", "Write JSON, for programs.", _remember("json")),
-            _flag("--real", "Refuse a simulated host.", _remember("real")),
-        ]
+        self.params.append(_flag("--real", "Refuse a simulated host.", _remember("real")))
 
     def format_help(self, context: click.Context, formatter: click.HelpFormatter) -> None:
         """The same text on a terminal, in a pipe and on the manual page."""
         click.Command.format_help(self, context, formatter)
+
+
+class Command(TextCommand):
+    """A command whose output is for people, or for programs."""
+
+    def __init__(self, *arguments: Any, **more: Any) -> None:
+        super().__init__(*arguments, **more)
+        self.params.insert(-1, _flag("--json", "Write JSON, for programs.", _remember("json")))
 
 
 class Group(TyperGroup):
