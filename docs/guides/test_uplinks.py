@@ -50,6 +50,16 @@ def test_a_busy_host(host: Host) -> None:
     assert vs.VSDVS_SetMTU("vswitch0", 9000) == vs.QEX_OK
 
 
+# The host as objects.
+
+
+def test_what_carries_a_port(host: Host) -> None:
+    web = host.objects.switches["vswitch0"].ports["web-1"]
+    assert str(web.carrier) == "nic4"
+    host.link("nic4").down()
+    assert str(web.carrier) == "nic5"
+
+
 # A host of your own making.
 
 

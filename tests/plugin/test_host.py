@@ -46,6 +46,8 @@ NUMBER = """
 import _libvswitch as vs
 print(vs.VSDVS_DvPortIDToPortID("vswitch0", "web-1"))
 """
+# Its example loads the classes, which the flat functions of this process must not return.
+ELSEWHERE = {"Host.objects"}
 CLASSES = (simhost.SimulatedHost, simhost.Host, simhost.SharedHost, simhost.Clock, simhost.Link)
 
 Run = Callable[[str], List[str]]
@@ -362,7 +364,7 @@ def examples() -> Iterator[Any]:
                 yield pytest.param(example, id=example.name)
 
 
-@pytest.mark.parametrize("example", examples())
+@pytest.mark.parametrize("example", [one for one in examples() if one.id not in ELSEWHERE])
 def test_the_documentation_shows_what_happens(
     example: doctest.DocTest, host: Host, shared_host: SharedHost
 ) -> None:

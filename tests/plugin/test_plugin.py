@@ -523,8 +523,9 @@ def test_is_typed(tmp_path: Path) -> None:
                 now: float = host.clock.now
                 host.fault("VSDVS_SetMTU", nth=2, panic=(OSError, "gone"))
                 size: int = host.ledger()[0].size
+                mtu: int = host.objects.switches["lab"].mtu
                 out: str = shared_host.run(["tool"]).stdout
-                print(now, size, out)
+                print(now, size, mtu, out)
                 host.link("nic4").sideways()
             """
         )
@@ -538,6 +539,53 @@ def test_is_typed(tmp_path: Path) -> None:
         encoding="utf-8",
     )
     assert done.stdout == (
-        'test_tool.py:10: error: "Link" has no attribute "sideways"  [attr-defined]\n'
+        'test_tool.py:11: error: "Link" has no attribute "sideways"  [attr-defined]\n'
         "Found 1 error in 1 file (checked 1 source file)\n"
     )
+
+
+OBJECTS = """
+import doctest
+import sys
+
+import pytest
+import simhost
+
+
+def test_nothing_is_loaded_before_it_is_asked_for(host: simhost.Host) -> None:
+    assert not {"vswitch", "libvswitch"} & set(sys.modules)
+    assert host.objects.simulated
+    assert {"vswitch", "libvswitch"} <= set(sys.modules)
+
+
+def test_they_are_of_the_host_of_the_test(host: simhost.Host) -> None:
+    host.apply({"switches": [{"alias": "lab", "uplinks": ["nic0"], "ports": [{"id": "desk"}]}]})
+    desk = host.objects.switches["lab"].ports["desk"]
+    desk.vlan = 7
+    assert host.describe()["switches"][1]["ports"][0]["vlan"] == 7
+    assert str(desk.carrier) == "nic0"
+    host.reset()
+    assert list(host.objects.switches) == ["vswitch0"]
+
+
+def test_a_transaction_knows_what_is_written(host: simhost.Host) -> None:
+    from vswitch import RolledBack
+
+    with pytest.raises(RolledBack):
+        with host.objects.transaction():
+            host.objects.switches["vswitch0"].mtu = 9000
+            raise OSError("the tool fails")
+    assert host.describe()["switches"][0]["mtu"] == 1500
+
+
+def test_the_documentation_shows_what_happens(host: simhost.Host) -> None:
+    finder = doctest.DocTestFinder(recurse=False)
+    (example,) = finder.find(simhost.Host.objects, "objects", globs={"host": host})
+    result = doctest.DocTestRunner().run(example)
+    assert result.attempted == 2 and result.failed == 0
+"""
+
+
+def test_the_host_as_objects(pytester: pytest.Pytester) -> None:
+    """In a process of its own: the objects load the classes."""
+    run(pytester, OBJECTS).assert_outcomes(passed=4)

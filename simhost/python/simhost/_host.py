@@ -5,12 +5,15 @@ import json
 import os
 import subprocess
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, Optional, Sequence, Tuple, Type, Union
+from typing import TYPE_CHECKING, Any, Dict, List, Mapping, Optional, Sequence, Tuple, Type, Union
 
 from simhost._control import Control
 from simhost._in_file import InFileControl
 from simhost._ledger import Block, MemoryLeftOut, split_summary
 from simhost._loaded import LoadedControl
+
+if TYPE_CHECKING:
+    import vswitch
 
 Document = Union[Mapping[str, Any], str, "os.PathLike[str]"]
 """A scenario document: as a dict, or the name of a JSON file."""
@@ -234,7 +237,26 @@ class Host(SimulatedHost):
     def __init__(self, scenario: Optional[Document], folder: Path) -> None:
         self._loaded = LoadedControl()
         self._out_before = frozenset(self._loaded.ledger())
+        self._objects: Optional["vswitch.Host"] = None
         super().__init__(self._loaded, scenario, folder)
+
+    @property
+    def objects(self) -> "vswitch.Host":
+        """The same host as `vswitch` has it: switches, ports and uplinks as objects.
+
+        Who asks for it loads the classes of `libvswitch`, which flat functions return from then on.
+
+        >>> host.objects.switches["vswitch0"].mtu = 9000
+        >>> host.describe()["switches"][0]["mtu"]
+        9000
+        """
+        if self._objects is None:
+            # Only a test that asks for the objects pays for them, and needs them installed.
+            from vswitch import Host as Objects
+
+            # One for the whole test: a transaction sees the writes through its own host alone.
+            self._objects = Objects(simulated=True)
+        return self._objects
 
     def ledger(self) -> List[Block]:
         """The memory that the host has given out since the test began and not got back, oldest
