@@ -98,7 +98,9 @@ class Machine:
 
     def runs_the_examples(self, folder: str) -> None:
         installed = self.root.run("ls", folder).split()
-        assert {name for name, *_ in EXAMPLES} == {one for one in installed if one.endswith(".py")}
+        shared = "private_host.py"  # imported by the others
+        programs = {one for one in installed if one.endswith(".py")} - {shared}
+        assert shared in installed and {name for name, *_ in EXAMPLES} == programs
         path = f"{Path(self.simhostctl).parent}:/usr/bin:/bin"
         self.root.write(DOCUMENT, '{"switches": [{"alias": "vswitch0", "mtu": 9000}]}')
         for (name, *arguments), expected in EXAMPLES.items():
