@@ -28,14 +28,25 @@ def test_every_example_is_run() -> None:
         assert Path(__file__).with_name(f"test_{tool}.py").exists()
 
 
+def lines_without_imports(source: str) -> int:
+    body = ast.parse(source).body
+    imports = (one for one in body if isinstance(one, (ast.Import, ast.ImportFrom)))
+    without = {line for one in imports for line in range(one.lineno, (one.end_lineno or 0) + 1)}
+    lines = enumerate(source.splitlines(), 1)
+    return len([line for number, line in lines if line.strip() and number not in without])
+
+
+def test_lines_are_counted() -> None:
+    source = (
+        '"""What it is."""\n\nimport io\nfrom os import (\n    path,\n)\n\n# why\nprint(io, path)\n'
+    )
+    assert lines_without_imports(source) == 3
+
+
 @pytest.mark.parametrize("name", TOOLS)
 def test_a_tool_is_short_and_ends_in_words(name: str) -> None:
     source = (EXAMPLES / f"{name}.py").read_text(encoding="utf-8")
-    module = ast.parse(source)
-    imports = (one for one in module.body if isinstance(one, (ast.Import, ast.ImportFrom)))
-    without = {line for one in imports for line in range(one.lineno, (one.end_lineno or 0) + 1)}
-    lines = enumerate(source.splitlines(), 1)
-    assert len([line for number, line in lines if line.strip() and number not in without]) <= 25
+    assert lines_without_imports(source) <= 25
     end = f'if __name__ == "__main__":\n    with vswitch.exits("{name}"):\n        main()\n'
     assert source.endswith(f"\n\n\n{end}")
 
