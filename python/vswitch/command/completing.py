@@ -17,7 +17,7 @@ from vswitch.command import places
 from vswitch.host import Host
 from vswitch.watch import KINDS
 
-__all__ = ["answer", "completion", "kinds", "settings", "switches", "things", "uplinks"]
+__all__ = ["completion", "is_asked", "kinds", "settings", "switches", "things", "uplinks"]
 
 _VARIABLE = "_VSWITCH_COMPLETE"
 
@@ -45,8 +45,8 @@ def completion(
         raise HostError(str(error)) from None
 
 
-def answer(group: click.Group, name: str) -> bool:
-    """Answers a shell that asks, which its script does through the environment."""
+def is_asked(group: click.Group, name: str) -> bool:
+    """Whether a shell asks, which its script does through the environment; it is told then."""
     asked = os.environ.get(_VARIABLE)
     if asked is None:
         return False

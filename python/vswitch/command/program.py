@@ -98,7 +98,7 @@ def main(words: List[str]) -> None:
 
 def _run(words: List[str]) -> None:
     commands = group()
-    if completing.answer(commands, NAME):
+    if completing.is_asked(commands, NAME):
         return
     try:
         with commands.make_context(NAME, words) as context:
