@@ -50,7 +50,7 @@ def populate(switches: int, ports: int) -> None:
                 ],
             }
             for number in range(switches)
-        ]
+        ],
     }
     simhost = ctypes.CDLL(flat.__file__)
     simhost.simhost_error.restype = ctypes.c_char_p
