@@ -10,7 +10,8 @@
 #
 # Prints tables of ratios, of checked calls to checks by hand and of objects to flat calls too, and
 # what the simulated host does in a second; leaves results.json, calls.svg, host.json and
-# host_curve.svg in build/bench/. bench/README.md says how it measures and how to read it. On a machine with other work to do it takes longer, and ratios stay ratios.
+# host_curve.svg in build/bench/. bench/README.md says how it measures and how to read it. On a
+# machine with other work to do it takes longer, and ratios stay ratios.
 cmd_bench() {
   quick='' full=surfaces
   case ${1-} in

@@ -92,15 +92,12 @@ lint_changed() {
 # The selected Python tests; ./dev test --help says why not all can be run in one process.
 python_tests() {
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
-  for group in docs classes vswitch contract others; do
+  for group in docs classes vswitch command contract others; do
     # shellcheck disable=SC2046 # none of our file names has a space
     set -- $(sed -n 's/^python //p' "$selected" | of_group "$group" || :)
     [ $# -eq 0 ] || case $group in
     contract) contract_tests "$@" ;;
-    others)
-      pytest "Python tests" module.xml '' --ignore=tests/contract --ignore=tests/classes \
-        --ignore=tests/vswitch --ignore=tests/fuzz --ignore=tests/docs --ignore=tests/packages "$@"
-      ;;
+    others) other_tests "$@" ;;
     *) pytest "Tests of $group" "$group.xml" '' "$@" ;;
     esac
   done
@@ -109,7 +106,7 @@ python_tests() {
 # of_group GROUP: those of the given tests that are run together.
 of_group() {
   case $1 in
-  others) grep -v -e '^tests/docs' -e '^tests/classes' -e '^tests/vswitch' -e '^tests/contract' ;;
+  others) not_apart ;;
   *) sed -n "s:^tests\$:tests/$1:p; \\:^tests/$1:p" ;;
   esac
 }

@@ -6,9 +6,9 @@
 # Usage: ./dev demo [--python PATH] [--debug-python] [--no-fast-paths]
 #
 # Runs the programs of examples/, each on a host of its own: tools to copy from, the first steps
-# underneath, records that a tool builds, and a tour through the whole host. With LD_LIBRARY_PATH set to the
-# folder of another host's libraries, only those run there that need no switch of the simulated
-# host.
+# underneath, records that a tool builds, and a tour through the whole host. With LD_LIBRARY_PATH
+# set to the folder of another host's libraries, only those run there that need no switch of the
+# simulated host.
 cmd_demo() {
   only_build_options "$@"
   [ -z "$sanitizers" ] || die "demo: --sanitize is for build and test"

@@ -5,8 +5,9 @@
 #
 # Usage: ./dev env [--python PATH] [--debug-python] [--sanitize] [--no-fast-paths]
 #
-# PATH finds vswitch and simhostctl, PYTHONPATH the modules and the pytest plug-in, MYPYPATH their stubs. What
-# these variables hold stays after it. The options are those of ./dev build and choose the folder.
+# PATH finds vswitch and simhostctl, PYTHONPATH the modules and the pytest plug-in, MYPYPATH their
+# stubs. What these variables hold stays after it. The options are those of ./dev build and choose
+# the folder.
 cmd_env() {
   # Only what the caller's shell is to evaluate goes to standard output.
   only_build_options "$@" >&2

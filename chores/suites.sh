@@ -20,6 +20,21 @@ pytest() {
   junit "$title" "$xml" env "$@"
 }
 
+# Folders of tests/ that are suites of their own; ./dev test --help says why.
+apart='contract classes vswitch command docs fuzz packages'
+
+# not_apart: of the given tests, those of all other folders.
+not_apart() {
+  # shellcheck disable=SC2046,SC2086 # lists of words
+  grep -v $(printf -- '-e ^tests/%s ' $apart)
+}
+
+# other_tests ARGUMENTS...: those, together.
+other_tests() {
+  # shellcheck disable=SC2046,SC2086 # lists of words
+  pytest "Python tests" module.xml '' $(printf -- '--ignore=tests/%s ' $apart) "$@"
+}
+
 # They run in one process, which sums up what they have proven of each call.
 contract_tests() {
   pytest "Contract tests" contract.xml "$root/$folder/tests/recording_host" -n 0 "$@"

@@ -92,9 +92,7 @@ cmd_test() {
   fi
   leave_out_tests
   # shellcheck disable=SC2086 # a list of words
-  pytest "Python tests" module.xml '' tests --ignore=tests/contract --ignore=tests/classes \
-    --ignore=tests/vswitch --ignore=tests/command --ignore=tests/fuzz --ignore=tests/docs \
-    --ignore=tests/packages $deselected "$@"
+  other_tests tests $deselected "$@"
   # shellcheck disable=SC2086 # a list of words
   pytest "Class tests" classes.xml '' tests/classes $deselected "$@"
   pytest "Object tests" objects.xml '' tests/vswitch "$@"
