@@ -5,6 +5,7 @@ import os
 import re
 import subprocess
 import sys
+import sysconfig
 from pathlib import Path
 from typing import Any, Dict
 
@@ -135,6 +136,10 @@ def test_stock_frame_knows_the_vocabulary_of_the_definitions(tmp_path: Path) -> 
     command = ["swig", "-python", *(f"-I{folder}" for folder in folders)]
     output = ["-outdir", str(tmp_path), "-o", str(source)]
     subprocess.run([*command, *output, str(folders[0] / "stock_surface.i")], check=True)
+    # What a body names and the frame lacks shows to the compiler alone.
+    syntax = ["cc", "-fsyntax-only", "-std=gnu11", "-Werror=implicit-function-declaration"]
+    includes = ["-isystem", sysconfig.get_path("include"), *(f"-I{folder}" for folder in folders)]
+    subprocess.run([*syntax, *includes, str(source)], check=True)
     made = set(re.findall(r'^\t \{ "(\w+)", ', source.read_text(), flags=re.M))
     expected = {function.name for function in functions.read() if function.kind != "runtime"}
     assert expected <= made

@@ -24,8 +24,7 @@ typedef size_t SIZE;
 %typemap(in, noblock=1) (unsigned char *mac_str, SIZE) (Py_buffer view, int held = 0) {
   if (PyObject_GetBuffer($input, &view, PyBUF_SIMPLE) < 0) {
     PyErr_Clear();
-    report_argument(kWrongType, "$symname", $argnum, "(unsigned char *mac_str, SIZE)");
-    SWIG_fail;
+    %argument_fail(SWIG_TypeError, "(unsigned char *mac_str, SIZE)", $symname, $argnum);
   }
   held = 1;
   $1 = view.buf;
