@@ -143,13 +143,29 @@ void Connection::require_schema_of_now() {
   seen_ = version;
 }
 
-void Connection::begin(char const *sql, std::chrono::nanoseconds longest_wait) {
+void Connection::begin(std::string_view sql, std::chrono::nanoseconds longest_wait) {
   using std::chrono::milliseconds;
   guarded([&] {
     database_->setBusyTimeout(
         static_cast<int>(std::chrono::duration_cast<milliseconds>(longest_wait).count()));
-    database_->exec(sql);
   });
+  run(sql);
+}
+
+void Connection::roll_back() {
+  if (sqlite3_get_autocommit(database_->getHandle()) == 0) {
+    run("ROLLBACK");
+  }
+}
+
+void Connection::run(std::string_view sql) {
+  auto &statement = kept(sql).statement;
+  start_statement();
+  auto const code = statement.tryExecuteStep();
+  statement.tryReset();
+  if (code != SQLITE_DONE) {
+    guarded([&] { throw SQLite::Exception(database_->getHandle(), code); });
+  }
 }
 
 SQLite::Statement &Connection::prepared(std::string_view sql, bool may_change) {

@@ -49,8 +49,11 @@ class Connection {
   /// Costs little while nobody writes to the file.
   void require_schema_of_now();
 
-  /// Begins a transaction, which waits for other processes no longer than that.
-  void begin(char const *sql, std::chrono::nanoseconds longest_wait);
+  /// Begins a transaction with such a literal, which waits for other processes no longer than that.
+  void begin(std::string_view sql, std::chrono::nanoseconds longest_wait);
+  void commit() { run("COMMIT"); }
+  /// Undoes the transaction, unless SQLite has done so by itself.
+  void roll_back();
   /// `sql` is a literal: the statement prepared from it is kept. Throws std::logic_error for one
   /// that changes the state where none may.
   SQLite::Statement &prepared(std::string_view sql, bool may_change);
@@ -68,6 +71,9 @@ class Connection {
   static int stop_if_endless(void *connection);
   void open_file();
   Prepared &kept(std::string_view sql);
+  // Runs a literal that yields no rows, by a statement that is kept: to parse "BEGIN" and "COMMIT"
+  // each time takes a good part of a short call.
+  void run(std::string_view sql);
   [[nodiscard]] bool changes(SQLite::Statement const &statement) const;
   void require_schema();
   [[nodiscard]] std::uint32_t data_version() const;

@@ -76,9 +76,13 @@ Transaction::Transaction(Store &store, Access access) : store_(store), access_(a
 }
 
 Transaction::~Transaction() {
-  if (open_) {
-    // It fails when SQLite has rolled back by itself, and then there is nothing left to undo.
-    connection().database().tryExec("ROLLBACK");
+  if (!open_) {
+    return;
+  }
+  try {
+    connection().roll_back();
+  } catch (std::exception const &) {
+    // The next transaction cannot begin then, and says why.
   }
 }
 
@@ -90,7 +94,7 @@ void Transaction::begin(Patience &patience) {
 }
 
 void Transaction::commit() {
-  connection().guarded([&] { connection().database().exec("COMMIT"); });
+  connection().commit();
   open_ = false;
   if (access_ == Access::write) {
     // Into a file that is gone it was written for nobody.
