@@ -6,12 +6,13 @@ build_packages='cmake ninja-build g++ swig python3-dev libsqlitecpp-dev libsqlit
 command_packages='python3-typer python3-rich python3-yaml'
 docs_packages='python3-sphinx python3-myst-parser furo'
 test_packages="libgtest-dev libgmock-dev python3-pytest python3-pytest-xdist python3-hypothesis
-  valgrind nodejs uidmap $command_packages $docs_packages"
+  valgrind nodejs uidmap groff-base $command_packages $docs_packages"
 check_packages=git
 fuzz_packages='clang libclang-rt-14-dev'
 lint_packages='clang-format clang-tidy shellcheck black flake8 mypy'
 bench_packages='pybind11-dev python3-cffi cython3'
-package_packages='build-essential debhelper dh-python python3-pip python3-setuptools python3-wheel'
+package_packages="build-essential debhelper dh-python python3-pip python3-setuptools python3-wheel
+  $command_packages"
 package_test_packages='lintian mmdebstrap python3-pytest python3-pytest-xdist'
 
 # need PACKAGE...: installs those that are missing. One query, so that a repeat costs nothing.

@@ -43,7 +43,7 @@ PYTHON_TESTS: Dict[str, List[str]] = {
         "tests/classes",
         "tests/vswitch",
     ],
-    "packaging": ["tests/docs/test_documents.py"],
+    "packaging": ["tests/docs/test_documents.py", "tests/command/test_manual_page.py"],
     "pyproject.toml": [],
     "python": ["tests/classes", "tests/vswitch", "tests/docs/test_catalogue.py"],
     "python/vswitch": ["tests/vswitch", "tests/command"],

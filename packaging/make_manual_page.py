@@ -1,55 +1,83 @@
-"""Writes the manual page of simhostctl from what its --help says: make_manual_page.py SIMHOSTCTL"""
+"""Writes a manual page from what a program says of itself: make_manual_page.py PAGE PROGRAM
 
+PAGE is a page in which @DESCRIPTION@, @COMMANDS@ and @OPTIONS@, or another title, stand alone on a
+line for what --help says under it. PROGRAM is a file, or MODULE:FUNCTION, which makes commands of
+click and is asked without a process for each of them.
+"""
+
+import importlib
 import re
 import subprocess
 import sys
-from typing import Dict, Iterator, List, NamedTuple, Sequence, Tuple
+import textwrap
+from pathlib import Path
+from typing import Callable, Dict, Iterable, Iterator, List, NamedTuple, Sequence, Tuple
 
-FRONT = r""".TH SIMHOSTCTL 1 "" libvswitch "User Commands"
-.SH NAME
-simhostctl \- look at a simulated virtual-switch host and change it
-.SH SYNOPSIS
-.B simhostctl
-.RB [ \-\-state
-.IR FILE ]
-.I COMMAND
-.RI [ ARGUMENT ...]
-.SH DESCRIPTION"""
-
-BACK = r""".SH ENVIRONMENT
-.TP
-.B SIMHOST_STATE
-The file that holds the state of the host; one that does not exist becomes a new host.
-.TP
-.B SIMHOST_SCENARIO
-The scenario document of a new state; the default host unless set.
-.SH SEE ALSO
-README.md and SCENARIOS.md of the package say what the host models and what documents may hold."""
+import click
 
 Entry = Tuple[str, str]
+Texts = Callable[[Sequence[str]], str]
+"""What --help says of the command that these words name."""
+
+# The programs have different libraries for their words, which have different titles.
+ARGUMENTS = ("Positionals", "Arguments")
+OPTIONS = "Options"
+COMMANDS = ("Subcommands", "Commands")
+EXIT_STATUS = "Exit status"
+
+# So wide that nothing is wrapped.
+WIDE = 10_000
 
 
 class Help(NamedTuple):
-    description: str
+    description: List[str]
     usage: str
     sections: Dict[str, List[Entry]]
-    """Positionals, Options and Subcommands: terms, each with what is said of it."""
+    """By their titles: terms, each with what is said of it."""
     footer: List[str]
 
+    def entries(self, *titles: str) -> Iterator[Entry]:
+        for title in titles:
+            yield from self.sections.get(title, [])
 
-def read(program: str, words: Sequence[str]) -> Help:
-    done = subprocess.run(
-        [program, *words, "--help"], check=True, stdout=subprocess.PIPE, encoding="utf-8"
-    )
-    head, *blocks = done.stdout.strip().split("\n\n")
-    description, usage = head.split("\nUsage: ")
-    found = Help(description, usage, {}, [])
-    for block in blocks:
-        title, *lines = block.splitlines()
-        if title in ("Positionals:", "Options:", "Subcommands:"):
-            found.sections[title[:-1]] = list(entries(lines))
+
+def texts_of(program: str) -> Texts:
+    module, colon, function = program.partition(":")
+    if colon:
+        return texts_of_click(getattr(importlib.import_module(module), function)())
+
+    def text(words: Sequence[str]) -> str:
+        command = [program, *words, "--help"]
+        return subprocess.run(command, check=True, stdout=subprocess.PIPE, encoding="utf-8").stdout
+
+    return text
+
+
+def texts_of_click(group: click.Group) -> Texts:
+    def context_of(words: Sequence[str]) -> click.Context:
+        if not words:
+            return group.make_context(group.name, [], resilient_parsing=True, terminal_width=WIDE)
+        above = context_of(words[:-1])
+        assert isinstance(above.command, click.Group)
+        command = above.command.commands[words[-1]]
+        return command.make_context(words[-1], [], above, resilient_parsing=True)
+
+    return lambda words: context_of(words).get_help()
+
+
+def read(text: str) -> Help:
+    found = Help([], "", {}, [])
+    for block in text.strip().split("\n\n"):
+        title, *lines = textwrap.dedent(block).splitlines()
+        before, is_usage, usage = block.partition("Usage: ")
+        if is_usage:
+            found = found._replace(usage=usage, description=before.splitlines())
+        elif title.rstrip(":") in (*ARGUMENTS, OPTIONS, *COMMANDS, EXIT_STATUS):
+            found.sections[title.rstrip(":")] = list(entries(lines))
+        elif found.sections:
+            found.footer.extend([title, *lines])
         else:
-            found.footer.extend(block.splitlines())
+            found.description.extend(["", title, *lines] if found.description else [title, *lines])
     return found
 
 
@@ -61,15 +89,21 @@ def entries(lines: Sequence[str]) -> Iterator[Entry]:
 
 
 def escaped(text: str) -> str:
-    # At the start of a line a full stop or an apostrophe would be a request.
-    return re.sub(r"^([.'])", r"\\&\1", text.replace("\\", r"\e").replace("-", r"\-"))
+    # What is to be typed keeps its quotes. At the start of a line a full stop would be a request.
+    for plain, escape in (("\\", r"\e"), ("-", r"\-"), ("'", r"\(aq"), ("`", r"\(ga")):
+        text = text.replace(plain, escape)
+    return f"\\&{text}" if text.startswith(".") else text
 
 
-def terms(found: Help) -> Iterator[str]:
-    for section in ("Positionals", "Options"):
-        for term, said in found.sections.get(section, []):
-            if "--help" not in term:
-                yield from (".TP", f"\\fB{escaped(term)}\\fR", escaped(said))
+def paragraphs(lines: Sequence[str]) -> Iterator[str]:
+    for line in lines:
+        yield escaped(line) if line else ".PP"
+
+
+def terms(found: Iterable[Entry]) -> Iterator[str]:
+    for term, said in found:
+        if "--help" not in term:
+            yield from (".TP", f"\\fB{escaped(term)}\\fR", escaped(said))
 
 
 def footer(found: Help) -> Iterator[str]:
@@ -77,24 +111,35 @@ def footer(found: Help) -> Iterator[str]:
         yield from (".PP", ".nf", *map(escaped, found.footer), ".fi")
 
 
-def commands(program: str, above: Sequence[str], parent: Help) -> Iterator[str]:
-    for name, _ in parent.sections.get("Subcommands", []):
+def commands(texts: Texts, above: Sequence[str], parent: Help) -> Iterator[str]:
+    for name, _ in parent.entries(*COMMANDS):
         words = [*above, name]
-        found = read(program, words)
-        yield from (f".SS {escaped(found.usage)}", escaped(found.description) + ".")
-        yield from terms(found)
+        found = read(texts(words))
+        description = list(paragraphs(found.description))
+        yield f".SS {escaped(found.usage)}"
+        yield from (*description[:-1], description[-1].rstrip(".") + ".")
+        yield from terms(found.entries(*ARGUMENTS, OPTIONS))
         # A command without words of its own repeats those of the one above it.
         if found.footer != parent.footer:
             yield from footer(found)
-        yield from commands(program, words, found)
+        yield from commands(texts, words, found)
 
 
-def page(program: str) -> Iterator[str]:
-    found = read(program, [])
-    yield from (FRONT, escaped(found.description), ".SH OPTIONS", *terms(found), ".SH COMMANDS")
-    yield from commands(program, [], found)
-    yield BACK
+def page(template: str, texts: Texts) -> Iterator[str]:
+    found = read(texts([]))
+    said: Dict[str, Callable[[], Iterator[str]]] = {
+        "DESCRIPTION": lambda: paragraphs(found.description),
+        "COMMANDS": lambda: commands(texts, [], found),
+    }
+    for line in template.splitlines():
+        title = line.strip("@")
+        if f"@{title}@" != line:
+            yield line
+        elif title in said:
+            yield from said[title]()
+        else:
+            yield from terms(found.entries(title.capitalize()))
 
 
 if __name__ == "__main__":
-    print("\n".join(page(sys.argv[1])))
+    print("\n".join(page(Path(sys.argv[1]).read_text(encoding="utf-8"), texts_of(sys.argv[2]))))

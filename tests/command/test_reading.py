@@ -219,7 +219,8 @@ def test_help(vswitch: Vswitch) -> None:
         done = vswitch(*words)
         assert (done.status, done.stderr) == (0, "")
         assert done.lines[0] == "Usage: vswitch [OPTIONS] COMMAND [ARGS]..."
-    for line in vswitch("--help").stdout.partition("Commands:\n")[2].splitlines():
+    _, _, listed = vswitch("--help").stdout.partition("Commands:\n")
+    for line in listed.partition("\n\n")[0].splitlines():
         name = line.split()[0]
         told = vswitch(name, "--help")
         assert told.status == 0 and told.lines[0].startswith(f"Usage: vswitch {name} ")

@@ -18,11 +18,16 @@ from typing import Dict, Iterator, Optional
 from libvswitch.errors import HostError
 from vswitch.host import Host
 
-__all__ = ["Meeting"]
+__all__ = ["Meeting", "folder"]
 
 _CONFIRM = b"confirm"
 _DONE = b"confirmed"
 _PATIENCE = 5
+
+
+def folder() -> Path:
+    """Where this user's changes and confirmations meet, whatever a shell's environment says."""
+    return Path("/tmp", f"vswitch-{os.getuid()}")
 
 
 class Meeting:
@@ -41,14 +46,14 @@ class Meeting:
     # Both sides
 
     def _path(self, kind: str) -> Path:
-        folder = Path("/tmp", f"vswitch-{os.getuid()}")
+        where = folder()
         with contextlib.suppress(FileExistsError):
-            folder.mkdir(mode=0o700)
-        found = folder.lstat()
+            where.mkdir(mode=0o700)
+        found = where.lstat()
         # In a folder that is everybody's, that name may be somebody else's.
         if not stat.S_ISDIR(found.st_mode) or found.st_uid != os.getuid() or found.st_mode & 0o077:
-            raise HostError(f"{folder} is not a folder of this user alone")
-        return folder / f"{self._name}.{kind}"
+            raise HostError(f"{where} is not a folder of this user alone")
+        return where / f"{self._name}.{kind}"
 
     @contextlib.contextmanager
     def _lock(self, more: int) -> Iterator[None]:

@@ -1,9 +1,4 @@
-"""The program: its commands, and how it ends.
-
-The status is 0 when all is done; 1 when it was refused, and the host is as before; 2 when the
-command line is wrong, and nothing was changed; 3 when somebody must look. Errors are words on
-standard error.
-"""
+"""The program: its commands, and how it ends. Errors are words on standard error."""
 
 import io
 import signal
@@ -18,7 +13,7 @@ import typer.main
 from libvswitch.errors import HostError
 from vswitch.command import changing, completing, confirming, documents, drawing, reading, watching
 from vswitch.command.session import Command, Group, TextCommand
-from vswitch.exits import CHANGED, exits
+from vswitch.exits import CHANGED, REFUSED, exits
 from vswitch.words import DocumentError
 
 __all__ = ["group", "main"]
@@ -53,22 +48,28 @@ COMMANDS: Dict[str, Callable[..., None]] = {
 }
 _TEXTS = ("draw", "completion")
 
+STATUSES = {
+    0: "all is done",
+    REFUSED: "it was refused, and the host is as before",
+    _USAGE: "the command line is wrong, and nothing was changed",
+    CHANGED: "somebody must look: something is left changed, or nobody knows",
+}
+# Lines that are not to be filled follow \b.
+_ENDS = "\n".join(["\b", "Exit status:", *(f"  {n}  {words}" for n, words in STATUSES.items())])
+
 
 def about() -> None:
     """Look at the virtual switches of this host, and change them.
 
     A switch is called by its alias, a port SWITCH/PORT. Every command takes --json for programs,
     and --real to refuse a simulated host.
-
-    The exit status is 0 when all is done; 1 when it was refused, and the host is as before; 2 when
-    the command line is wrong, and nothing was changed; 3 when somebody must look.
     """
 
 
 def group() -> click.Group:
     """All commands."""
     app = typer.Typer(name=NAME, add_completion=False, context_settings=_OPTIONS_FOR_ALL)
-    app.callback(cls=Group, no_args_is_help=True)(about)
+    app.callback(cls=Group, no_args_is_help=True, epilog=_ENDS)(about)
     for name, function in COMMANDS.items():
         app.command(name, cls=TextCommand if name in _TEXTS else Command)(function)
     made = typer.main.get_command(app)

@@ -1,0 +1,116 @@
+"""The manual page of the command, as its package has it."""
+
+import os
+import re
+import shlex
+import subprocess
+from pathlib import Path
+from typing import Dict, List
+
+import click
+import pytest
+
+from vswitch import _table
+from vswitch.command import assignments, meeting
+from vswitch.command.program import group
+
+ROOT = Path(__file__).resolve().parents[2]
+PACKAGING = ROOT / "packaging"
+GUIDE = ROOT / "docs" / "guides" / "command.md"
+
+
+@pytest.fixture(scope="module")
+def page() -> str:
+    """The page, in the words of groff."""
+    maker, template = PACKAGING / "make_manual_page.py", PACKAGING / "manual" / "vswitch.1.in"
+    command = ["/usr/bin/python3", "-B", str(maker), str(template), "vswitch.command.program:group"]
+    return subprocess.run(command, check=True, stdout=subprocess.PIPE, encoding="utf-8").stdout
+
+
+def plain(page: str) -> str:
+    return page.replace("\\-", "-").replace("\\(aq", "'")
+
+
+def section(page: str, title: str) -> str:
+    (found,) = re.findall(
+        rf'^\.S[HS] "?{title}\b(.*?)(?=^\.S[HS] |\Z)', page, re.MULTILINE | re.DOTALL
+    )
+    return str(found)
+
+
+def terms(page: str) -> List[str]:
+    """What the page has something to say of."""
+    return re.findall(r"^\.TP\n\\fB(.*)\\fR$", page, re.MULTILINE)
+
+
+def missing(page: str) -> List[str]:
+    """Commands of the program, their options and arguments that are not where they belong."""
+    found = []
+    for name, command in group().commands.items():
+        if f".SS vswitch {name} " not in page:
+            found.append(name)
+            continue
+        words = {word for term in terms(section(page, f"vswitch {name}")) for word in term.split()}
+        for parameter in command.params:
+            is_option = isinstance(parameter, click.Option)
+            asked = parameter.opts if is_option else [str(parameter.metavar)]
+            found += [f"{name} {one}" for one in asked if one not in words]
+    return found
+
+
+def test_every_command_is_there_with_its_options(page: str) -> None:
+    assert missing(plain(page)) == []
+
+
+def test_what_is_not_there_would_be_noticed(page: str) -> None:
+    less = plain(page).replace("\\fB--every S\\fR", "", 1).replace(".SS vswitch lag ", ".SS ")
+    assert missing(less) == ["stats --every", "lag"]
+
+
+def complaints(page: str) -> str:
+    command = ["groff", "-man", "-Tutf8", "-ww", "-z"]
+    done = subprocess.run(command, check=True, input=page, stderr=subprocess.PIPE, encoding="utf-8")
+    return done.stderr
+
+
+def test_groff_has_nothing_to_complain_of(page: str) -> None:
+    assert complaints(page) == ""
+    assert "macro 'BQ' not defined" in complaints(page.replace("\n.B ", "\n.BQ ", 1))
+
+
+def statuses(page: str) -> Dict[str, str]:
+    return dict(
+        re.findall(r"^\.TP\n\\fB(.*)\\fR\n(.*)$", section(page, "EXIT STATUS"), re.MULTILINE)
+    )
+
+
+def test_it_says_how_the_command_ends(page: str) -> None:
+    found = statuses(plain(page))
+    assert list(found) == ["0", "1", "2", "3"]
+    rows = re.findall(r"^\| ([0-9]) \| (.*) \|$", GUIDE.read_text(encoding="utf-8"), re.MULTILINE)
+    assert dict(rows) == found
+
+
+def test_it_says_where_changes_wait(page: str) -> None:
+    folder = str(meeting.folder()).replace(str(os.getuid()), "UID")
+    assert f".I {folder}/\n" in section(plain(page), "FILES")
+
+
+def test_it_has_all_sections(page: str) -> None:
+    found = re.findall(r"^\.SH (.*)$", page, re.MULTILINE)
+    assert found == [
+        *("NAME", "SYNOPSIS", "DESCRIPTION", "COMMANDS", "EXIT STATUS", "ENVIRONMENT"),
+        *("FILES", "EXAMPLES", "SEE ALSO"),
+    ]
+
+
+def test_the_program_takes_its_examples(page: str) -> None:
+    examples = re.findall(r"^vswitch (.*)$", section(plain(page), "EXAMPLES"), re.MULTILINE)
+    assert len(examples) > 10
+    for example in examples:
+        name, *words = shlex.split(example.partition(" > ")[0])
+        context = group().commands[name].make_context(name, words)
+        if name == "set":
+            place, settings = context.params["place"], context.params["settings"]
+            known = _table.PORT if "/" in place else _table.SWITCH
+            assert assignments.read(known, settings, lambda setting: setting.default)
