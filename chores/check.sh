@@ -7,9 +7,9 @@
 #
 #   -k EXPRESSION   instead all tests whose names match, C++ and Python alike, whatever was changed
 #
-# Compares the tree with the one that passed last, or with the last commit; builds; checks the format
-# and style of the changed files; runs the C++ tests of the programs that a change makes anew, and the
-# Python tests of what it touches. chores/select_tests.py says which those are.
+# Compares the tree with the one that passed last, or with the last commit; builds; checks the
+# format and style of the changed files; runs the C++ tests of the programs that a change makes
+# anew, and the Python tests of what it touches. chores/select_tests.py says which those are.
 # It leaves to ./dev test what takes long or is tried at random, and clang-tidy to ./dev lint.
 cmd_check() {
   expression=
@@ -21,7 +21,8 @@ cmd_check() {
   [ $# -eq 0 ] || die "check: unknown option '$1'; see ./dev check --help"
   checked=$folder/check
   mkdir -p "$checked"
-  current=$(tree_of_files) || die "check: this compares with git's trees, and there is no repository"
+  current=$(tree_of_files) ||
+    die "check: this compares with git's trees, and there is no repository"
   git diff-tree -r --no-renames --name-only "$(last_checked)" "$current" >"$checked/changed"
   if [ -z "$expression" ] && [ ! -s "$checked/changed" ]; then
     say "Nothing has changed since the last check that passed."
@@ -68,7 +69,8 @@ last_checked() {
 
 # Ninja configures again when it has to.
 build_again() {
-  if grep -qs '^BUILD_TESTING:BOOL=ON' "$folder/CMakeCache.txt" && [ -e "$folder/build.ninja" ]; then
+  if grep -qs '^BUILD_TESTING:BOOL=ON' "$folder/CMakeCache.txt" &&
+    [ -e "$folder/build.ninja" ]; then
     step "Building in $folder/"
     flock "$folder/.lock" nice cmake --build "$folder"
   else

@@ -5,8 +5,8 @@
 #
 # Usage: ./dev lint
 #
-# clang-format, clang-tidy, shellcheck, black, flake8, mypy --strict, and chores/check_words.py for the
-# words of the glossary. clang-tidy leaves out files that were clean before and have not changed
+# clang-format, clang-tidy, shellcheck, black, flake8, mypy --strict, and chores/check_words.py for
+# the words of the glossary. clang-tidy leaves out files that were clean before and have not changed
 # since, nor any header that they include.
 # To put the format right: clang-format -i FILE..., black FILE...
 cmd_lint() {
@@ -44,8 +44,8 @@ check() {
   fi
 }
 
-# sources PATTERN...: our own files with such names, a line each; of those that the file $only lists,
-# if it is set.
+# sources PATTERN...: our own files with such names, a line each; of those that the file $only
+# lists, if it is set.
 sources() {
   for pattern; do
     find . -path './build*' -prune -o -path './.*/*' -prune -o -type f -name "$pattern" -print
@@ -74,9 +74,9 @@ check_mypy() {
 
 check_words() { "$python" chores/check_words.py; }
 
-# What clang-tidy says of a file depends on what tidy_inputs.py hashes; the hash names a stamp that is
-# left when it had nothing to say. Sources that $untidied matches are passed over, and $unanalyzed
-# those of clang's analyzer, which takes half the time.
+# What clang-tidy says of a file depends on what tidy_inputs.py hashes; the hash names a stamp that
+# is left when it had nothing to say. Sources that $untidied matches are passed over, and
+# $unanalyzed those of clang's analyzer, which takes half the time.
 check_tidy() {
   export folder ours="^$root/(include|helpers|simhost|tests|bench)/"
   stamps=$folder/tidy
@@ -100,8 +100,8 @@ check_tidy() {
       echo "$1: no target builds it, so nothing checks it"
       exit 1
     fi
-    findings=$(clang-tidy --quiet -p "$folder" --header-filter "$ours" --checks "$less" "$1" 2>&1) &&
-      : >"$2" && exit
+    findings=$(clang-tidy --quiet -p "$folder" --header-filter "$ours" --checks "$less" "$1" \
+      2>&1) && : >"$2" && exit
     printf "%s\n" "$findings" | grep -v " generated\.$" | head -n 40
     exit 1' sh
 }

@@ -24,9 +24,9 @@
 # The Python tests find the module, and those that exist for the tests alone, through PYTHONPATH,
 # and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
 # where LD_LIBRARY_PATH puts the recording host in place of the simulated one; so do those of
-# tests/classes and tests/vswitch, for once the classes are loaded the flat functions return instances
-# of them. Those of tests/command run the command, which is plain Python, too: the plain interpreter
-# stands for all. By hand:
+# tests/classes and tests/vswitch, for once the classes are loaded the flat functions return
+# instances of them. Those of tests/command run the command, which is plain Python, too: the plain
+# interpreter stands for all. By hand:
 #   export BUILD_DIR=$PWD/build PYTHONPATH=$PWD/build/python:$PWD/build/tests/python
 #   /usr/bin/python3 -m pytest tests --ignore=tests/contract --ignore=tests/classes \
 #     --ignore=tests/vswitch --ignore=tests/command --ignore=tests/fuzz --ignore=tests/docs \
@@ -78,7 +78,8 @@ cmd_test() {
     report
   fi
   # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
-  # parses the command line with a library of templates. The module and its helpers are analyzed too.
+  # parses the command line with a library of templates. The module and its helpers are analyzed,
+  # too.
   untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='./simhost/*'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
