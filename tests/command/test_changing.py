@@ -234,6 +234,9 @@ def test_wrong_command_lines(refused: Refused, words: List[str], said: str) -> N
             "no uplink 'nic4' of switch 'lab' (it has nic0, nic1)",
         ),
         (["remove", "lab/x"], "no port 'x' of switch 'lab' (it has web-1, web-2)"),
+        (["remove", "lab/"], "no port '' of switch 'lab' (it has web-1, web-2)"),
+        (["unset", "lab/", "teaming"], "no port '' of switch 'lab' (it has web-1, web-2)"),
+        (["add", "new/"], "no switch 'new' (there are lab, vswitch0)"),
     ],
 )
 def test_what_the_host_has_not(refused: Refused, words: List[str], said: str) -> None:

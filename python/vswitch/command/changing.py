@@ -148,7 +148,7 @@ def add(
         "uplinks": list(uplink) if uplink else None,
     }
     of_port = {"external_id": external_id}
-    if not id_:
+    if id_ is None:
         _refuse(of_port, "a port")
         if alias in host().switches:
             raise Exists(f"the switch {alias!r} is there already")

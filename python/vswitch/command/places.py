@@ -1,6 +1,6 @@
 """How people call switches and ports on a command line: SWITCH, or SWITCH/PORT."""
 
-from typing import Tuple, Union
+from typing import Optional, Tuple, Union
 
 import click
 
@@ -11,24 +11,23 @@ from vswitch.switch import Switch
 __all__ = ["find", "find_port", "split"]
 
 
-def split(host: Host, place: str) -> Tuple[str, str]:
-    """The alias of a switch and what follows it, which is empty for the switch itself.
+def split(host: Host, place: str) -> Tuple[str, Optional[str]]:
+    """The alias of a switch and the port that follows it, None for the switch itself.
 
-    An alias may have a slash in it: the longest one that the host has counts.
+    An alias may have a slash in it: the longest one that the host has counts. After a slash there
+    is a port: a script that has no name for it does not mean the whole switch.
     """
     parts = place.split("/")
-    for end in range(len(parts), 0, -1):
-        alias = "/".join(parts[:end])
-        if alias in host.switches:
-            return alias, "/".join(parts[end:])
-    return parts[0], "/".join(parts[1:])
+    there = (end for end in range(len(parts), 0, -1) if "/".join(parts[:end]) in host.switches)
+    end = next(there, 1)
+    return "/".join(parts[:end]), "/".join(parts[end:]) if end < len(parts) else None
 
 
 def find(host: Host, place: str) -> Union[Switch, Port, UplinkPort]:
     """The switch or the port of that name."""
     alias, id_ = split(host, place)
     switch = host.switches[alias]
-    if not id_:
+    if id_ is None:
         return switch
     if id_ in switch.uplink_ports:
         return switch.uplink_ports[id_]
@@ -38,6 +37,6 @@ def find(host: Host, place: str) -> Union[Switch, Port, UplinkPort]:
 def find_port(host: Host, place: str) -> Port:
     """The port for a client of that name."""
     alias, id_ = split(host, place)
-    if not id_:
+    if id_ is None:
         raise click.UsageError(f"{place!r} is no port: SWITCH/PORT is expected")
     return host.switches[alias].ports[id_]

@@ -88,7 +88,7 @@ def _end_of(switch: Switch, to: str) -> Union[Port, Uplink]:
     alias, name = places.split(switch.host, to)
     if alias != switch.alias and alias in switch.host.switches:
         raise HostError(f"{to!r} is not of switch {switch.alias!r}")
-    if alias == switch.alias and name in switch.uplinks:
+    if alias == switch.alias and name is not None and name in switch.uplinks:
         return switch.uplinks[name]
     return places.find_port(switch.host, to)
 
