@@ -9,7 +9,7 @@ from types import TracebackType
 from typing import Optional, Type
 
 from libvswitch.errors import HostError, NotRestored
-from vswitch.words import DocumentError
+from vswitch.words import DocumentError, printable
 
 __all__ = ["exits"]
 
@@ -22,15 +22,16 @@ class exits(contextlib.ContextDecorator):
     """Ends a tool: `with exits("tool"): main()`, or as a decorator of its main function.
 
     What the host or the system refuses, and what is wrong with a document, is told on standard
-    error, and the status is 1; 3 when something is left changed that should not be. A reader who
-    closes the pipe has seen enough: that is no error. What else is raised is a mistake in the tool,
-    and keeps its traceback.
+    error, in one line, and the status is 1; 3 when something is left changed that should not be. A
+    reader who closes the pipe has seen enough: that is no error. What else is raised is a mistake
+    in the tool, and keeps its traceback.
     """
 
     def __init__(self, tool: str) -> None:
         self._tool = tool
 
     def __enter__(self) -> "exits":
+        _open_streams()
         return self
 
     def __exit__(
@@ -61,7 +62,14 @@ class exits(contextlib.ContextDecorator):
     def _tell(self, raised: BaseException) -> None:
         words = "interrupted" if isinstance(raised, KeyboardInterrupt) else str(raised)
         with contextlib.suppress(OSError):
-            print(f"{self._tool}: {words}", file=sys.stderr, flush=True)
+            print(f"{self._tool}: {printable(words)}", file=sys.stderr, flush=True)
+
+
+def _open_streams() -> None:
+    """Standard streams that are closed lead nowhere: errors would go where results belong."""
+    for name, mode in (("stdin", "r"), ("stdout", "w"), ("stderr", "w")):
+        if getattr(sys, name) is None:
+            setattr(sys, name, open(os.devnull, mode))
 
 
 def _status(raised: BaseException) -> Optional[int]:

@@ -12,7 +12,7 @@ from typing import Any, Callable, Dict, Iterable, List, Optional, Tuple
 
 from vswitch._table import Form
 
-__all__ = ["ABSENT", "DocumentError", "mac", "read", "trunk"]
+__all__ = ["ABSENT", "DocumentError", "mac", "printable", "read", "trunk"]
 
 SYNONYMS = {
     "options": "runtime_options",
@@ -36,6 +36,18 @@ class DocumentError(ValueError):
 
     def __reduce__(self) -> Tuple[Any, ...]:
         return type(self), (self.path, self.expected)
+
+
+def printable(given: object) -> str:
+    """A text of one line that moves no cursor: names come from a host."""
+    text = str(given)
+    if text.isprintable():
+        return text
+    return "".join(one if one.isprintable() else _escaped(one) for one in text)
+
+
+def _escaped(character: str) -> str:
+    return character.encode("unicode_escape", "surrogatepass").decode("ascii")
 
 
 def under(path: str, name: str) -> str:

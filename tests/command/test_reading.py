@@ -114,6 +114,8 @@ def test_an_alias_may_have_a_slash(vswitch: Vswitch, lab: SharedHost) -> None:
 def test_names_move_no_cursor(vswitch: Vswitch, lab: SharedHost) -> None:
     lab.apply({"switches": [{"alias": "a\x1b[2Jb\n[bold]c[/bold]"}]})
     assert vswitch("list").lines[3].startswith("a\\x1b[2Jb\\n[bold]c[/bold]  1500")
+    for words in (["show", "nope"], ["list", "--a\x1b[2Jb\n[bold]c[/bold]"]):
+        assert "a\\x1b[2Jb\\n[bold]c[/bold]" in vswitch(*words).stderr
 
 
 def test_stats(vswitch: Vswitch) -> None:

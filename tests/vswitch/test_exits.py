@@ -66,6 +66,11 @@ def run(
             3,
             "tool: the link is down\n",
         ),
+        (
+            "print('done'); raise vswitch.HostError('no \\x1b[2J\\n\\ud800')",
+            1,
+            "tool: no \\x1b[2J\\n\\ud800\n",
+        ),
         ("print('done'); raise KeyboardInterrupt", 130, "tool: interrupted\n"),
         ("print('done'); sys.exit(2)", 2, ""),
         ("print('done'); sys.exit('said already')", 1, "said already\n"),
@@ -115,6 +120,27 @@ def test_what_cannot_be_written_is_an_error(body: str, status: int, tmp_path: Pa
     with open("/dev/full", "w") as full:
         done = run(body, tmp_path, full.fileno())
     assert (done.stderr, done.returncode) == ("tool: [Errno 28] No space left on device\n", status)
+
+
+@pytest.mark.parametrize(
+    "closed, stdout, stderr",
+    [("<&-", "done\n", "tool: no\n"), (">&-", "", "tool: no\n"), ("2>&-", "done\n", "")],
+)
+def test_a_closed_stream_leads_nowhere(
+    closed: str, stdout: str, stderr: str, tmp_path: Path
+) -> None:
+    program = tmp_path / "tool.py"
+    body = "print(sys.stdin.read() + 'done'); raise vswitch.HostError('no')"
+    program.write_text(PROGRAM.format(body=f"    {body}\n"))
+    done = subprocess.run(
+        ["sh", "-c", f'"$0" "$1" {closed}', sys.executable, str(program)],
+        env=ENVIRONMENT,
+        stdin=subprocess.DEVNULL,
+        stdout=subprocess.PIPE,
+        stderr=subprocess.PIPE,
+        text=True,
+    )
+    assert (done.returncode, done.stdout, done.stderr) == (1, stdout, stderr)
 
 
 def test_as_a_decorator() -> None:

@@ -9,10 +9,10 @@ from xml.etree import ElementTree
 import typer
 
 from vswitch.command import completing
-from vswitch.command.output import printable
 from vswitch.command.session import host
 from vswitch.switch import Switch
 from vswitch.told import shown
+from vswitch.words import printable
 
 __all__ = ["draw"]
 

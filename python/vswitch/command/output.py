@@ -17,10 +17,11 @@ from rich.table import Table
 from rich.text import Text
 from rich.tree import Tree
 
+from vswitch.words import printable
+
 __all__ = [
     "Branch",
     "line",
-    "printable",
     "progress",
     "table",
     "tree",
@@ -33,18 +34,6 @@ Branch = Tuple[str, Sequence[Any]]
 
 # Wide enough that nothing is wrapped or cut.
 _NO_END = 100_000
-
-
-def printable(given: object) -> str:
-    """A text of one line that moves no cursor."""
-    text = str(given)
-    if text.isprintable():
-        return text
-    return "".join(one if one.isprintable() else _escaped(one) for one in text)
-
-
-def _escaped(character: str) -> str:
-    return character.encode("unicode_escape", "surrogatepass").decode("ascii")
 
 
 def write_json(value: object) -> None:

@@ -14,7 +14,7 @@ from libvswitch.errors import HostError
 from vswitch.command import changing, completing, confirming, documents, drawing, reading, watching
 from vswitch.command.session import Command, Group, TextCommand
 from vswitch.exits import CHANGED, REFUSED, exits
-from vswitch.words import DocumentError
+from vswitch.words import DocumentError, printable
 
 __all__ = ["group", "main"]
 
@@ -79,20 +79,20 @@ def group() -> click.Group:
 
 def main(words: List[str]) -> None:
     """Runs the program, and ends it."""
-    for stream in (sys.stdout, sys.stderr):
-        if isinstance(stream, io.TextIOWrapper):
-            # What an encoding has no bytes for is told all the same.
-            stream.reconfigure(errors="backslashreplace")
     for number in _SIGNALS:
         signal.signal(number, _end)
     with exits(NAME):
+        for stream in (sys.stdout, sys.stderr):
+            if isinstance(stream, io.TextIOWrapper):
+                # What an encoding has no bytes for is told all the same.
+                stream.reconfigure(errors="backslashreplace")
         try:
             _run(words)
         except (HostError, DocumentError, OSError):
             raise
         except Exception as error:
             # A mistake of this program: nobody knows what it left.
-            said = f"{type(error).__name__}: {error}"
+            said = printable(f"{type(error).__name__}: {error}")
             print(f"{NAME}: a mistake of this program: {said}", file=sys.stderr)
             raise SystemExit(CHANGED) from None
 
@@ -108,7 +108,7 @@ def _run(words: List[str]) -> None:
         raise SystemExit(end.exit_code) from None
     except click.UsageError as error:
         path = error.ctx.command_path if error.ctx is not None else NAME
-        print(f"{NAME}: {error.format_message()}", file=sys.stderr)
+        print(f"{NAME}: {printable(error.format_message())}", file=sys.stderr)
         print(f"{NAME}: see {path} --help", file=sys.stderr)
         raise SystemExit(_USAGE) from None
 
