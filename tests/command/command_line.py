@@ -1,9 +1,14 @@
 """The command as tests run it: a program with words, on a host whose state is in a file."""
 
 import contextlib
+import errno
+import fcntl
 import json
 import os
+import pty
+import struct
 import subprocess
+import termios
 from pathlib import Path
 from typing import IO, Any, Dict, Iterator, List, NamedTuple, Protocol, Tuple
 
@@ -85,3 +90,33 @@ def started(host: SharedHost, *words: str) -> "Iterator[Tuple[subprocess.Popen[s
             yield running, running.stdout
         finally:
             running.kill()
+
+
+def on_terminal(host: SharedHost, *words: str, columns: int = 80, **more: str) -> Tuple[int, str]:
+    """The status of the program at a terminal, and all that somebody sees there.
+
+    `more` is its environment besides.
+    """
+    ours, theirs = pty.openpty()
+    fcntl.ioctl(theirs, termios.TIOCSWINSZ, struct.pack("HHHH", 24, columns, 0, 0))
+    with open(ours, "rb", buffering=0) as terminal:
+        running = subprocess.Popen(
+            [PROGRAM, *words],
+            env={**host.environment, "TERM": "xterm", **more},
+            stdin=theirs,
+            stdout=theirs,
+            stderr=theirs,
+        )
+        os.close(theirs)
+        seen = b"".join(iter(lambda: _read(terminal), b"")).decode()
+    return running.wait(), seen.replace("\r\n", "\n")
+
+
+def _read(terminal: "IO[bytes]") -> bytes:
+    """What comes next; a terminal that nobody writes to any more is at its end."""
+    try:
+        return terminal.read(4096)
+    except OSError as error:
+        if error.errno != errno.EIO:
+            raise
+        return b""

@@ -64,7 +64,7 @@ def table(heads: Sequence[str], rows: Iterable[Sequence[object]]) -> None:
 
 
 def tree(root: str, branches: Sequence[Branch]) -> None:
-    made = Tree(_label(root))
+    made = Tree(Text(printable(root), "bold"))
     _grow(made, branches)
     _render(made)
 
@@ -87,8 +87,8 @@ def progress(what: str) -> Iterator[Callable[[str], None]]:
         yield lambda how_far: None
         return
     console = Console(stderr=True, highlight=False)
-    with console.status(printable(what)) as status:
-        yield lambda how_far: status.update(printable(f"{what}: {how_far}"))
+    with console.status(Text(printable(what))) as status:
+        yield lambda how_far: status.update(Text(printable(f"{what}: {how_far}")))
 
 
 def _render(what: RenderableType) -> None:
