@@ -1,7 +1,7 @@
 # shellcheck shell=sh
 # What is built for whom, and in which folder.
 
-#@ build  Build the module (build/python) and the simulated host (build/simhost)
+#@ build  Build the modules (build/python), the command (build/bin), the simulated host (build/simhost)
 #
 # Usage: ./dev build [--python PATH] [--debug-python] [--sanitize] [--no-fast-paths]
 #
@@ -13,6 +13,8 @@
 #                    build-no-fast-paths/
 cmd_build() {
   only_build_options "$@"
+  # shellcheck disable=SC2086 # a list of words
+  need $command_packages
   build
 }
 

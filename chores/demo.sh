@@ -1,29 +1,35 @@
 # shellcheck shell=sh
-# The programs of examples/, run.
+# The command and the programs of examples/, run.
 
-#@ demo   Build, then run the first programs of a tool's author against the simulated host
+#@ demo   Build, then watch the command and tools at work on the simulated host
 #
 # Usage: ./dev demo [--python PATH] [--debug-python] [--no-fast-paths]
 #
-# Runs the programs of examples/, each on a host of its own: tools to copy from, the first steps
-# underneath, records that a tool builds, and a tour through the whole host. With LD_LIBRARY_PATH
-# set to the folder of another host's libraries, only those run there that need no switch of the
-# simulated host.
+# Runs the command and the programs of examples/, each on a host of its own: tools to copy from, the
+# first steps underneath, records that a tool builds, and a tour through the whole host. The command
+# is for Debian's interpreter, whose packages it needs. With LD_LIBRARY_PATH set to the folder of
+# another host's libraries, only those run there that need no switch of the simulated host.
 cmd_demo() {
   only_build_options "$@"
   [ -z "$sanitizers" ] || die "demo: --sanitize is for build and test"
+  # shellcheck disable=SC2086 # a list of words
+  need $command_packages
   build
   unset SIMHOST_STATE SIMHOST_SCENARIO
+  PATH=$root/$folder/bin:$root/$folder/simhost:$PATH
+  export PATH PYTHONPATH="$root/$folder/python"
+  [ "$folder" != build ] || shown vswitch list
   example inventory
-  example records
+  [ -n "${LD_LIBRARY_PATH-}" ] || {
+    example compliance --fix
+    example apply tests/examples/document.json
+    example find_mac 02:00:00:00:01:02
+    example mirror vswitch0 web-1 web-2 --for 0
+    example failover_drill vswitch0
+  }
   example first_steps
-  [ -z "${LD_LIBRARY_PATH-}" ] || return 0
-  example compliance --fix
-  example apply tests/examples/document.json
-  example find_mac 02:00:00:00:01:02
-  example mirror vswitch0 web-1 web-2 --for 0
-  example failover_drill vswitch0
-  example tour
+  example records
+  [ -n "${LD_LIBRARY_PATH-}" ] || example tour
 }
 
 # example NAME ARGUMENTS...: runs a program of examples/.
@@ -31,5 +37,10 @@ example() {
   name=examples/$1.py
   shift
   step "$name${*:+ $*}"
-  PATH=$root/$folder/simhost:$PATH PYTHONPATH=$root/$folder/python "$python" "$name" "$@"
+  "$python" "$name" "$@"
+}
+
+shown() {
+  step "$*"
+  "$@"
 }
