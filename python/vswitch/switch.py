@@ -94,10 +94,12 @@ class Switch(Thing):
 
     @property
     def version(self) -> int:
+        """The version of the distributed switch, fixed once it exists."""
         return checked.DVS_Version(self._handle())
 
     @property
     def max_ports(self) -> int:
+        """How many ports for clients it has room for."""
         return checked.DVS_GetMaxPorts(self._handle())
 
     @property

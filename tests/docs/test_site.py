@@ -260,6 +260,19 @@ def test_what_is_written_by_hand(site: Site) -> None:
         documented = getattr(libvswitch, name).__doc__.split(".")[0].splitlines()[0]
         assert documented.split("`")[0] in page.text
     import simhost
+    import vswitch
+
+    objects = site["reference/objects.html"].anchors
+    kinds = [getattr(vswitch, name) for name in vswitch.__all__]
+    own = [kind for kind in kinds if kind.__module__.startswith("vswitch.")]
+    assert len(own) > 20
+    for kind in own:
+        assert f"vswitch.{kind.__name__}" in objects
+    for kind in (vswitch.Host, vswitch.Switch, vswitch.Port, vswitch.UplinkPort, vswitch.Uplink):
+        said = [name for name, one in vars(kind).items() if name[0] != "_" and one.__doc__]
+        assert len(said) > 3
+        for name in said:
+            assert f"vswitch.{kind.__name__}.{name}" in objects
 
     page = site["reference/testing.html"]
     for host in (simhost.Host, simhost.SharedHost):
