@@ -86,9 +86,8 @@ def port_learning_from(data: bytes) -> PortMacLearning:
     held = _vs.VSPMACManagement()
     _fill(held, data)
     inner = held.portMACLearning
-    form = _table.member(PortMacLearning._form, "limit_policy")
-    assert form is not None
-    policies = {number: word for word, number in form["choices"].items()}
+    choices = _table.choices(PortMacLearning._form, "limit_policy")
+    policies = {number: word for word, number in choices.items()}
     return PortMacLearning.known(
         learning=inner.learning,
         flooding=inner.flooding,
@@ -99,13 +98,12 @@ def port_learning_from(data: bytes) -> PortMacLearning:
 
 
 def port_learning_bytes(learning: PortMacLearning) -> bytes:
-    form = _table.member(PortMacLearning._form, "limit_policy")
-    assert form is not None
+    choices = _table.choices(PortMacLearning._form, "limit_policy")
     held = _vs.VSPMACManagement(macChangeAllowed=learning.mac_change)
     held.portMACLearning.learning = learning.learning
     held.portMACLearning.flooding = learning.flooding
     held.portMACLearning.macLimit = learning.limit
-    held.portMACLearning.macLimitPolicy = form["choices"][learning.limit_policy]
+    held.portMACLearning.macLimitPolicy = choices[learning.limit_policy]
     return _pointers.read_memory(held, 0, _SIZES["VSPMACManagement"])
 
 

@@ -32,17 +32,16 @@ _ENDS: Dict[int, str] = {
 
 
 def _word(name: str, number: int, form: Any = Mirror._form) -> str:
-    choices = (_table.member(form, name) or {})["choices"]
+    choices = _table.choices(form, name)
     return next((word for word, one in choices.items() if one == number), str(number))
 
 
 def _number(name: str, word: str, form: Any = Mirror._form) -> int:
-    found: int = (_table.member(form, name) or {})["choices"][word]
-    return found
+    return _table.choices(form, name)[word]
 
 
 def _bits_words(name: str, bits: int) -> Tuple[str, ...]:
-    choices = (_table.member(Mirror._form, name) or {})["choices"]
+    choices = _table.choices(Mirror._form, name)
     return tuple(word for word, bit in choices.items() if bits & bit)
 
 

@@ -63,7 +63,7 @@ def _learning(switch: str) -> MacLearning:
 
 
 def _private_vlans(switch: str) -> Tuple[PrivateVlan, ...]:
-    choices = _choices(PrivateVlan._form, "type")
+    choices = _table.choices(PrivateVlan._form, "type")
     kinds = {number: word for word, number in choices.items()}
     return tuple(
         PrivateVlan.known(
@@ -76,18 +76,11 @@ def _private_vlans(switch: str) -> Tuple[PrivateVlan, ...]:
 
 
 def _set_private_vlans(switch: str, vlans: Tuple[PrivateVlan, ...]) -> None:
-    choices = _choices(PrivateVlan._form, "type")
+    choices = _table.choices(PrivateVlan._form, "type")
     entries = [
         checked.VSPvlanMapEntry(one.primary, one.secondary, choices[one.type]) for one in vlans
     ]
     checked.VSDVS_SetPrivateVLANMap(switch, entries)
-
-
-def _choices(form: _table.Form, name: str) -> Dict[str, int]:
-    found = _table.member(form, name)
-    assert found is not None
-    choices: Dict[str, int] = found["choices"]
-    return choices
 
 
 def _mirrors(data: bytes) -> Tuple[Mirror, ...]:

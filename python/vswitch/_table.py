@@ -1,7 +1,7 @@
 """What settings there are: the table that the build compiles into this package, looked up."""
 
 import typing
-from typing import Any, Dict, FrozenSet, Optional, Tuple
+from typing import Any, Dict, FrozenSet, Tuple
 
 import _libvswitch as _flat
 from vswitch._properties import PROPERTIES
@@ -67,6 +67,12 @@ UPLINK_PORT = _named("port", "uplink_port_name")
 COMPUTED: FrozenSet[str] = frozenset(known["key"] for known in PROPERTIES if known["computed"])
 
 
-def member(form: Form, name: str) -> Optional[Form]:
+def get_member(form: Form, name: str) -> Form:
     """The form of a member of a record."""
-    return next((one for one in form["members"] if one["name"] == name), None)
+    return next(one for one in form["members"] if one["name"] == name)
+
+
+def choices(form: Form, name: str) -> Dict[str, int]:
+    """The words that there are for a member of a record, and what they stand for."""
+    found: Dict[str, int] = get_member(form, name)["choices"]
+    return found

@@ -118,9 +118,7 @@ class SettingValue(Value):
     @classmethod
     def _natural(cls, name: str, held: Words) -> Any:
         """The value of a member that is said in words."""
-        form = _table.member(cls._form, name)
-        assert form is not None
-        return natural(form, held, cls._types.get(name))
+        return natural(_table.get_member(cls._form, name), held, cls._types.get(name))
 
     def words(self) -> Words:
         """The value as JSON has it, and documents say it."""
@@ -254,12 +252,6 @@ class PrivateVlan(SettingValue):
 _SESSION = _table.PORT["mirror_sessions"].form["element"]
 
 
-def _in_session(name: str) -> Form:
-    form = _table.member(_SESSION, name)
-    assert form is not None
-    return form
-
-
 @dataclass(frozen=True, eq=False, repr=False)
 class Encapsulation(SettingValue):
     """How mirrored frames are wrapped."""
@@ -271,7 +263,7 @@ class Encapsulation(SettingValue):
     cos: int = 0
     granularity: int = 0
 
-    _form: ClassVar[Form] = _in_session("encapsulation")
+    _form: ClassVar[Form] = _table.get_member(_SESSION, "encapsulation")
 
 
 @dataclass(frozen=True, eq=False, repr=False)
@@ -284,7 +276,7 @@ class MirrorEnd(SettingValue):
     ip: Optional[str] = None
     number: Optional[int] = None
 
-    _form: ClassVar[Form] = _in_session("to")["element"]
+    _form: ClassVar[Form] = _table.get_member(_SESSION, "to")["element"]
 
 
 def _end(held: Words) -> MirrorEnd:
