@@ -13,7 +13,8 @@ T = TypeVar("T")
 class Live(typing.Mapping[str, T]):
     """A mapping by name. What is not there raises the NotFound of the call that looked for it.
 
-    `get` looks a name up; `make` takes one that was told just now, and asks for nothing.
+    `get` looks a name up; `make` takes one that was told just now, and asks for nothing. A call
+    takes names of so many bytes at most.
     """
 
     def __init__(
@@ -22,17 +23,16 @@ class Live(typing.Mapping[str, T]):
         get: Callable[[str], T],
         shown: str,
         make: Optional[Callable[[str], T]] = None,
+        most_bytes: Optional[int] = None,
     ) -> None:
         self._names = names
         self._get = get
         self._make = make or get
         self._shown = shown
+        self._most_bytes = most_bytes
 
     def __getitem__(self, name: str) -> T:
-        # No call can be asked about such a text, so it is the name of nothing.
-        if isinstance(name, str) and ("\0" in name or not _is_utf_8(name)):
-            raise NotFound(f"no {name!r} among the {self._shown}")
-        return self._get(name)
+        return self._get(sought(name, self._shown, self._most_bytes))
 
     def __contains__(self, name: object) -> bool:
         return isinstance(name, str) and super().__contains__(name)
@@ -53,12 +53,26 @@ class Live(typing.Mapping[str, T]):
         return f"<{self._shown}: {', '.join(self) or 'none'}>"
 
 
-def _is_utf_8(name: str) -> bool:
+def sought(name: object, among: str, most_bytes: Optional[int] = None) -> str:
+    """A name that calls can be asked about; any other text is the name of nothing: NotFound."""
+    known = require_text(name, among)
     try:
-        name.encode()
+        size = len(known.encode())
     except UnicodeEncodeError:
-        return False
-    return True
+        raise _nothing(known, among) from None
+    if "\0" in known or (most_bytes is not None and size > most_bytes):
+        raise _nothing(known, among)
+    return known
+
+
+def require_text(name: object, among: str) -> str:
+    if not isinstance(name, str):
+        raise TypeError(f"the {among} are found by a str, not by {type(name).__name__}")
+    return name
+
+
+def _nothing(name: str, among: str) -> NotFound:
+    return NotFound(f"no {name!r} among the {among}")
 
 
 class _Values(typing.ValuesView[T]):

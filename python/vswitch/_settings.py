@@ -198,7 +198,7 @@ def read(thing: Thing, known: Property, item: Optional[Item] = None) -> Any:
     if how.get is not None:
         return how.get(*thing.owner)
     try:
-        data = item.data if item is not None else thing.get_property(known.key)
+        data = item.data if item is not None else thing.read_property(known.key)
     except NotFound:
         if not thing.exists():
             raise

@@ -60,7 +60,7 @@ def groups(port: "Port") -> Tuple[Group, ...]:
 
 def port_stats(port: "Port") -> PortStats:
     learned = checked.VSQEX_GetPortMACLearningStats(*port.owner).asdict()
-    data = port.get_property(_vs.QEX_NEBPROP_PORT_STATISTICS)
+    data = port.read_property(_vs.QEX_NEBPROP_PORT_STATISTICS)
     counted = dict(zip(_COUNTERS, struct.unpack(f"={len(_COUNTERS)}Q", data)))
     return PortStats(**counted, **learned)
 

@@ -12,6 +12,7 @@ from typing import Dict
 
 from libvswitch import checked
 from vswitch import _table
+from vswitch._mapping import sought
 from vswitch.words import SYNONYMS
 
 if typing.TYPE_CHECKING:
@@ -45,8 +46,8 @@ class Thing(abc.ABC):
         """All properties that are set, by their keys."""
 
     @abc.abstractmethod
-    def get_property(self, key: str) -> bytes:
-        """The bytes of a property; NotFound if it is not set."""
+    def read_property(self, key: str) -> bytes:
+        """The bytes of a property that a call can be asked about."""
 
     @abc.abstractmethod
     def write_property(self, key: str, data: bytes, type_: int) -> None:
@@ -55,6 +56,10 @@ class Thing(abc.ABC):
     @abc.abstractmethod
     def erase_property(self, key: str) -> None:
         """Clears a property that is set, and notes nothing."""
+
+    def get_property(self, key: str) -> bytes:
+        """The bytes of a property; NotFound if it is not set."""
+        return self.read_property(sought(key, f"properties of {self.path}"))
 
     def set_property(self, key: str, data: bytes, type_: int) -> None:
         """Sets a property that has no name, by its bytes and its property type."""

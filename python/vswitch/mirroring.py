@@ -95,4 +95,6 @@ def _end(to: "Union[Port, Uplink, MirrorEnd, str]") -> MirrorEnd:
         return to
     if isinstance(to, Uplink):
         return MirrorEnd(uplink=to.name)
-    return MirrorEnd(port=to if isinstance(to, str) else to.id)
+    # What has no identifier is refused as what it is.
+    id_: Any = getattr(to, "id", to)
+    return MirrorEnd(port=id_)

@@ -8,6 +8,7 @@ from typing import Any, Dict, Iterator, Union
 from libvswitch import checked
 from libvswitch.errors import NotFound
 from vswitch import _undo, words as _words
+from vswitch._mapping import require_text
 from vswitch._properties import RUNTIME_OPTIONS
 
 if typing.TYPE_CHECKING:
@@ -33,7 +34,7 @@ class Options(typing.MutableMapping[str, Option]):
 
     def _get(self, name: str) -> checked.VSRuntimeOption:
         known = self._all()
-        if name not in known:
+        if require_text(name, "runtime options") not in known:
             raise NotFound(f"no runtime option {name!r} (there are {', '.join(sorted(known))})")
         return known[name]
 
@@ -47,10 +48,11 @@ class Options(typing.MutableMapping[str, Option]):
         checked.VSQEX_SetRuntimeOptions([checked.VSRuntimeOption(type_, held)])
 
     def __delitem__(self, name: str) -> None:
-        self[name] = _option(name)["default"]
+        known = self._get(name)
+        self[name] = _option(known.name)["default"]
 
     def __contains__(self, name: object) -> bool:
-        return name in self._all()
+        return isinstance(name, str) and name in self._all()
 
     def __iter__(self) -> Iterator[str]:
         return iter(self._all())

@@ -58,7 +58,7 @@ class AnyPort(Thing):
             raise NotFound(f"no port {self.id!r} of switch {self.switch.alias!r}")
         return {one.name: one for one in checked.DVSState_PortDataForEach(handle)}
 
-    def get_property(self, key: str) -> bytes:
+    def read_property(self, key: str) -> bytes:
         return checked.DVSQEX_PortDataGet(self.switch.identifier, self.id, key)
 
     def write_property(self, key: str, data: bytes, type_: int) -> None:
@@ -165,7 +165,7 @@ class Port(AnyPort):
     @property
     def link(self) -> LinkState:
         """Whether the side of its client is up."""
-        (held,) = struct.unpack("=I", self.get_property(_vs.QEX_NEBPROP_PORT_LINK_STATUS))
+        (held,) = struct.unpack("=I", self.read_property(_vs.QEX_NEBPROP_PORT_LINK_STATUS))
         return LinkState(held)
 
     @property

@@ -9,7 +9,7 @@ from libvswitch import checked
 from libvswitch.enums import Multicast
 from libvswitch.errors import NotFound
 from vswitch import _describing, _table, _undo, words as _words
-from vswitch._mapping import Live
+from vswitch._mapping import Live, sought
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
 from vswitch.port import Port, UplinkPort
@@ -43,7 +43,7 @@ class HostPart(Thing):
         walk = checked.DVSState_HostPropForEach(self.switch._handle())
         return {one.name: one for one in walk}
 
-    def get_property(self, key: str) -> bytes:
+    def read_property(self, key: str) -> bytes:
         return checked.DVSQEX_HostPropGet(self.switch.identifier, key)
 
     def write_property(self, key: str, data: bytes, type_: int) -> None:
@@ -151,7 +151,8 @@ class Switch(Thing):
 
     def find_port(self, external_id: str) -> Port:
         """The port that another system calls so."""
-        found = checked.DVSQEX_PortGetByExternalId(self.identifier, external_id)
+        name = sought(external_id, f"ports of {self.alias} that another system knows")
+        found = checked.DVSQEX_PortGetByExternalId(self.identifier, name)
         return Port(self, found.dvPortId, external_id)
 
     @property
@@ -208,6 +209,7 @@ class Switch(Thing):
             lambda: checked.VSQEX_GetDVMirrorSessionIDs(self.alias),
             lambda sid: _telling.mirror_stats(self.alias, sid),
             f"running mirror sessions of {self.alias}",
+            most_bytes=_table.get_member(Mirror._form, "sid")["most_bytes"],
         )
 
     @property
@@ -288,7 +290,7 @@ class Switch(Thing):
     def properties(self) -> Dict[str, Item]:
         return {one.name: one for one in checked.DVSState_GlobalPropForEach(self._handle())}
 
-    def get_property(self, key: str) -> bytes:
+    def read_property(self, key: str) -> bytes:
         return checked.DVSQEX_GlobalPropGet(self.identifier, key)
 
     def write_property(self, key: str, data: bytes, type_: int) -> None:

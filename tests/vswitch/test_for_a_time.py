@@ -63,6 +63,8 @@ def test_a_session_that_is_refused(desk: Port) -> None:
     assert desk.mirrors == before
     with pytest.raises(DocumentError, match="Mirror.snap_length: -1 is below 0"):
         desk.mirrored(to="desk-2", snap_length=-1)
+    with pytest.raises(DocumentError, match="MirrorEnd.port: 7 is not a text"):
+        desk.mirrored(to=7)  # type: ignore[arg-type]
 
 
 def test_a_session_of_which_nobody_knows_whether_it_is_there(

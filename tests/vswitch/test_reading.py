@@ -1,7 +1,7 @@
 """What objects tell of a host, beside what the simulated host says of itself."""
 
 import json
-from typing import Any, Callable, Dict, List
+from typing import Any, Callable, Dict, List, Mapping
 
 import pytest
 import simhost
@@ -209,13 +209,47 @@ def test_what_is_not_there_says_what_is(objects: Host) -> None:
         assert isinstance(raised.value, NotFound) and str(raised.value) == words
 
 
-@pytest.mark.parametrize("name", ["v\udcff", "a\0b"])
-def test_what_no_call_takes_is_the_name_of_nothing(name: str, objects: Host, lab: Switch) -> None:
-    for mapping in (objects.switches, objects.uplinks, lab.ports, lab.uplinks, lab.mirrors):
-        assert name not in mapping
+def look_ups(objects: Host, lab: Switch) -> Dict[str, Callable[[Any], object]]:
+    """Every way to look something up by a name."""
+    mappings: Dict[str, Mapping[str, object]] = {
+        "switches": objects.switches,
+        "uplinks": objects.uplinks,
+        "options": objects.options,
+        "ports": lab.ports,
+        "uplink_ports": lab.uplink_ports,
+        "uplinks of a switch": lab.uplinks,
+        "mirrors": lab.mirrors,
+    }
+    ways: Dict[str, Callable[[Any], object]] = {
+        name: mapping.__getitem__ for name, mapping in mappings.items()
+    }
+    ways["del options"] = lambda name: objects.options.__delitem__(name)
+    ways["set options"] = lambda name: objects.options.__setitem__(name, 1)
+    ways["find_port"] = lab.find_port
+    for thing in (lab, lab.host_part, lab.ports["desk-1"]):
+        ways[f"get_property of {thing.path}"] = thing.get_property
+    for name in ("nope", 7):
+        assert all(name not in mapping for mapping in mappings.values())
+    return ways
+
+
+@pytest.mark.parametrize("name", ["v\udcff", "a\0b", "x" * 32, "x" * 5000, "nope", ""])
+def test_what_is_no_name_is_not_found(name: str, objects: Host, lab: Switch) -> None:
+    """Whether a call can be asked about it or not."""
+    for way, look_up in look_ups(objects, lab).items():
         with pytest.raises(NotFound) as raised:
-            mapping[name]
-        assert str(raised.value).startswith(f"no {name!r} among the ")
+            look_up(name)
+        assert isinstance(raised.value, KeyError) and repr(name) in str(raised.value), way
+    for mapping in (objects.switches, objects.uplinks, objects.options, lab.ports, lab.mirrors):
+        assert name not in mapping and mapping.get(name) is None
+
+
+@pytest.mark.parametrize("name", [7, None, b"desk-1", ["desk-1"]])
+def test_what_is_no_text_is_a_mistake(name: Any, objects: Host, lab: Switch) -> None:
+    for way, look_up in look_ups(objects, lab).items():
+        with pytest.raises(TypeError, match=f"found by a str, not by {type(name).__name__}"):
+            look_up(name)
+    assert name not in lab.ports and name not in objects.options
 
 
 def test_what_goes_while_somebody_looks(
