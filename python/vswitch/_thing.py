@@ -8,7 +8,7 @@ from __future__ import annotations
 
 import abc
 import typing
-from typing import Dict
+from typing import Dict, Optional
 
 from libvswitch import checked
 from vswitch import _table
@@ -19,6 +19,8 @@ if typing.TYPE_CHECKING:
     from vswitch.host import Host
 
 Item = checked.DVSDataItem
+Before = Dict[str, Optional[Item]]
+"""Properties as they were, None for one that was not set."""
 
 
 class Thing(abc.ABC):
@@ -80,3 +82,30 @@ class Thing(abc.ABC):
             raise AttributeError(f"{type(self).__name__} has no setting {name!r} (it has {names})")
         held = self.properties()
         return any(key in held for key in known.keys)
+
+
+def own_properties(thing: Thing) -> Dict[str, Item]:
+    """The properties that somebody has set."""
+    held = thing.properties()
+    return {key: item for key, item in held.items() if key not in _table.COMPUTED}
+
+
+def restore(thing: Thing, before: Before) -> None:
+    """Puts bytes and property types back, and takes away what was not there."""
+    held = thing.properties()
+    if all(held.get(key) == item for key, item in before.items()):
+        return
+    for key, item in before.items():
+        now = held.get(key)
+        if now == item:
+            continue
+        if item is None:
+            thing.erase_property(key)
+        else:
+            thing.write_property(key, item.data, item.propertyType)
+
+
+def restore_all(thing: Thing, before: Dict[str, Item]) -> None:
+    """Likewise, and takes away whatever else somebody has set."""
+    keys = {*before, *own_properties(thing)}
+    restore(thing, {key: before.get(key) for key in keys})

@@ -9,13 +9,14 @@ from __future__ import annotations
 import abc
 import contextlib
 import typing
-from typing import Callable, Dict, Iterable, List, Optional, Tuple
+from typing import Callable, Dict, Iterable, List, Tuple
 
 from libvswitch import checked
 from libvswitch.enums import LinkState, MacType
 from libvswitch.errors import HostError
-from vswitch import _settings, _table
-from vswitch._thing import Item, Thing
+from vswitch import _settings
+from vswitch._arrangement import arrange, arrangement
+from vswitch._thing import Before, Item, Thing, own_properties, restore, restore_all
 from vswitch.values import MacLearning
 
 if typing.TYPE_CHECKING:
@@ -24,7 +25,6 @@ if typing.TYPE_CHECKING:
     from vswitch.switch import Switch
     from vswitch.uplink import Uplink
 
-Before = Dict[str, Optional[Item]]
 _WAIT = 5
 
 
@@ -61,21 +61,6 @@ class Step(abc.ABC):
 def noted(thing: Thing, keys: Iterable[str]) -> Before:
     held = thing.properties()
     return {key: held.get(key) for key in keys}
-
-
-def restore(thing: Thing, before: Before) -> None:
-    """Puts bytes and property types back, and takes away what was not there."""
-    held = thing.properties()
-    if all(held.get(key) == item for key, item in before.items()):
-        return
-    for key, item in before.items():
-        now = held.get(key)
-        if now == item:
-            continue
-        if item is None:
-            thing.erase_property(key)
-        else:
-            thing.write_property(key, item.data, item.propertyType)
 
 
 def differences(thing: Thing, before: Before) -> List[str]:
@@ -239,41 +224,14 @@ class UplinkPorts(Step):
     def __init__(self, switch: "Switch") -> None:
         self.place = switch.owner
         self._switch = switch
-        self._before = _uplink_ports(switch)
+        self._before = arrangement(switch)
         self._numbers = {id_: switch.uplink_ports[id_].number for id_ in self._before}
 
     def undo(self) -> None:
-        if _uplink_ports(self._switch) == self._before:
-            return
-        self._detach()
-        self._attach()
-        names = [one.name for one in self._before.values()]
-        checked.VSDVS_SetSwitchUplinkPorts(self._switch.alias, names, list(self._before))
-        for id_, one in self._before.items():
-            now = self._switch.uplink_ports[id_]
-            keys = {*one.properties, *_own(now)}
-            restore(now, {key: one.properties.get(key) for key in keys})
-
-    def _detach(self) -> None:
-        """What was not there, or elsewhere."""
-        wanted = {one.uplink: id_ for id_, one in self._before.items()}
-        for id_, one in _uplink_ports(self._switch).items():
-            if one.uplink is not None and wanted.get(one.uplink) != id_:
-                checked.VSDVS_RemoveSwitchUplinkPort(self._switch.alias, one.uplink)
-
-    def _attach(self) -> None:
-        """An uplink goes to a port without one: there is no more than the right one meanwhile."""
-        alias = self._switch.alias
-        here = [id_ for id_, one in _uplink_ports(self._switch).items() if one.uplink is not None]
-        for id_, one in self._before.items():
-            if one.uplink is not None and id_ not in here:
-                here.append(id_)
-                # Names may be those of other ports meanwhile: identifiers cannot.
-                checked.VSDVS_SetSwitchUplinkPorts(alias, here, here)
-                checked.VSDVS_AddSwitchUplinkPort(alias, one.uplink)
+        arrange(self._switch, self._before)
 
     def left(self) -> List[str]:
-        now = _uplink_ports(self._switch)
+        now = arrangement(self._switch)
         left = [f"{self._switch.path}/{id_}" for id_ in now if now[id_] != self._before.get(id_)]
         left += [f"{self._switch.path}/{id_}" for id_ in self._before if id_ not in now]
         for id_, number in self._numbers.items():
@@ -284,27 +242,6 @@ class UplinkPorts(Step):
 
     def what(self) -> str:
         return f"{self._switch.path}: uplink ports"
-
-
-class _UplinkPort(typing.NamedTuple):
-    name: str
-    uplink: Optional[str]
-    properties: Dict[str, Item]
-
-
-def _uplink_ports(switch: "Switch") -> Dict[str, _UplinkPort]:
-    told = checked.VSDVS_GetSwitchUplinkPorts(switch.alias)
-    at = {checked.VSQEX_GetUplinkDVPortID(name): name for name in switch.uplinks}
-    return {
-        id_: _UplinkPort(name, at.get(id_), _own(switch.uplink_ports[id_]))
-        for name, id_ in zip(told.names, told.ids)
-    }
-
-
-def _own(thing: Thing) -> Dict[str, Item]:
-    """The properties that somebody has set."""
-    held = thing.properties()
-    return {key: item for key, item in held.items() if key not in _table.COMPUTED}
 
 
 class Macs(Step):
@@ -354,7 +291,7 @@ class RemovedPort(Step):
     def __init__(self, port: "Port") -> None:
         self.place = port.owner
         self._port = port
-        self._properties = _own(port)
+        self._properties = own_properties(port)
         self._number = port.number
         self._external_id = port.external_id
         self._macs = kept_macs(port)
@@ -405,8 +342,8 @@ class RemovedSwitch(Step):
         self._was_made = False
         self._version = switch.version
         self._things: List[Tuple[Thing, Dict[str, Item]]] = [
-            (switch, _own(switch)),
-            (switch.host_part, _own(switch.host_part)),
+            (switch, own_properties(switch)),
+            (switch.host_part, own_properties(switch.host_part)),
         ]
         self._running = switch.running
         self._uplinks = UplinkPorts(switch) if self._running else None
@@ -425,8 +362,7 @@ class RemovedSwitch(Step):
         if self._uplinks is not None:
             self._uplinks.undo()
         for thing, before in self._things:
-            keys = {*before, *_own(thing)}
-            restore(thing, {key: before.get(key) for key in keys})
+            restore_all(thing, before)
         for port in self._ports:
             port.undo()
         switch._run(self._running)
