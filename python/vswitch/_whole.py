@@ -48,6 +48,7 @@ def _switch(wanted: SwitchWish, now: SwitchWish) -> SwitchWish:
         uplinks=_each(wanted.uplinks, uplinks, "name", _as_wanted),
         uplink_ports=_each(wanted.uplink_ports, now.uplink_ports, "id", _uplink_port),
         ports=_each(wanted.ports, now.ports, "id", _port),
+        whole=True,
     )
 
 

@@ -95,6 +95,8 @@ class SwitchWish(ThingWish):
     lags: Tuple[LagWish, ...] = ()
     ports: Tuple[PortWish, ...] = ()
     host_properties: Tuple[PropertyWish, ...] = ()
+    whole: bool = False
+    """Whether an uplink that is elsewhere than it says may move."""
 
 
 @dataclass(frozen=True)
@@ -309,13 +311,19 @@ def _switch(given: object, path: str) -> SwitchWish:
         "version": (_words.number, (0, _MOST_32)),
     }
     fixed = {name: held.get(name, read, *how) for name, (read, how) in readers.items()}
+    uplink_ports = held.get("uplink_ports", _each, _uplink_port, "id", default=())
+    uplinks = held.get("uplinks", _each, _uplink, "name", default=())
+    at = {one.uplink: one.path for one in uplink_ports}
+    for one in uplinks:
+        if one.absent and one.name in at:
+            raise DocumentError(one.path, f"{at[one.name]} has {one.name!r}")
     return SwitchWish(
         alias=alias,
         fixed={name: value for name, value in fixed.items() if value is not None},
         persistent=held.get("persistent", _words.flag, default=True),
         running=held.get("running", _words.flag),
-        uplink_ports=held.get("uplink_ports", _each, _uplink_port, "id", default=()),
-        uplinks=held.get("uplinks", _each, _uplink, "name", default=()),
+        uplink_ports=uplink_ports,
+        uplinks=uplinks,
         lags=held.get("lags", _each, _lag, "name", default=()),
         ports=held.get("ports", _each, _port, "id", default=()),
         host_properties=held.get("host_properties", _properties, default=()),

@@ -3,11 +3,12 @@
 from __future__ import annotations
 
 import typing
-from typing import Any, Callable, Dict, List, Optional, Set, Tuple, Union
+from typing import Any, Callable, Dict, Iterator, List, Optional, Set, Tuple, Union
 
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound
 from vswitch import _settings, _table
+from vswitch._arrangement import arrangement, vacant
 from vswitch._thing import Thing
 from vswitch._whole import completed
 from vswitch.documents import (
@@ -19,7 +20,6 @@ from vswitch.documents import (
     SwitchWish,
     ThingWish,
     UplinkPortWish,
-    UplinkWish,
     read,
 )
 from vswitch.port import Port, UplinkPort
@@ -101,6 +101,8 @@ class _Difference:
         self._last: List[Action] = []
         # What must be free before something is added.
         self._needed: Set[str] = set()
+        # The uplinks that leave their ports.
+        self._going = {name for switch in wish.switches for name in self._leaving(switch)}
 
     def actions(self) -> List[Action]:
         self._host_itself()
@@ -219,14 +221,32 @@ class _Difference:
 
     # Uplinks
 
+    def _leaving(self, wish: SwitchWish) -> Iterator[str]:
+        """The uplinks of a switch that are to go, or to be at other ports."""
+        switch = self._switches.get(wish.alias)
+        if switch is None or not switch.running:
+            return
+        ports: Dict[Optional[str], UplinkPortWish] = {one.id: one for one in wish.uplink_ports}
+        places: Dict[Optional[str], Optional[str]] = {
+            one.uplink: one.id for one in wish.uplink_ports
+        }
+        plain = {one.name: one for one in wish.uplinks}
+        for name in switch.uplinks if wish.absent or ports or plain else ():
+            id_ = find_port_of(name)
+            port = ports.get(id_)
+            is_absent = wish.absent or (name in plain and plain[name].absent)
+            loses_port = port is not None and port.absent and (name in places or name in plain)
+            moves = places.get(name, id_) != id_
+            makes_room = port is not None and port.uplink not in (None, name)
+            if is_absent or loses_port or (wish.whole and (moves or makes_room)):
+                yield name
+
     def _uplink_ports(self, switch: Switch, wish: SwitchWish, is_new: bool, running: bool) -> None:
         if not (wish.uplink_ports or wish.uplinks):
             return
         ids = [] if is_new else list(switch.uplink_ports)
         here = {find_port_of(name): name for name in switch.uplinks} if running else {}
-        for uplink in wish.uplinks:
-            if uplink.absent:
-                self._detach(switch, uplink, set(here.values()))
+        self._detach(switch, wish, ids, here)
         for one in wish.uplink_ports:
             if one.absent:
                 self._remove_uplink_port(switch, one, ids)
@@ -273,11 +293,24 @@ class _Difference:
             do = _setter(_remove_uplink_port, switch, wish.id)
             self._removals.append(Action(change, do))
 
-    def _detach(self, switch: Switch, wish: UplinkWish, here: Set[str]) -> None:
-        if wish.name in here:
-            uplink = switch.uplinks[wish.name]
-            change = Change(uplink.path, {"name": wish.name}, None)
-            self._removals.append(Action(change, uplink.remove, (wish.name,)))
+    def _detach(
+        self, switch: Switch, wish: SwitchWish, ids: List[str], here: Dict[Optional[str], str]
+    ) -> None:
+        """The host takes an uplink with its port, unless somebody sees to it."""
+        kept = {one.id: one for one in wish.uplink_ports if not one.absent}
+        for id_, name in list(here.items()):
+            if id_ is None or name not in self._going:
+                continue
+            uplink = switch.uplinks[name]
+            if id_ in kept:
+                do = _setter(_vacate, switch, id_)
+                if kept[id_].uplink is not None:
+                    self._needed.add(name)
+            else:
+                do = uplink.remove
+                ids.remove(id_)
+            del here[id_]
+            self._removals.append(Action(Change(uplink.path, {"name": name}, None), do, (name,)))
 
     def _check_free(self, path: str, name: str) -> None:
         """An uplink that is to be attached exists, and is free or becomes so."""
@@ -288,11 +321,9 @@ class _Difference:
         if port is None:
             return
         self._needed.add(name)
+        if name in self._going:
+            return
         owner = next((one for one in self._switches.values() if name in one.uplinks), None)
-        for wish in self._wish.switches:
-            if owner is not None and wish.alias == owner.alias:
-                if wish.absent or any(one.name == name and one.absent for one in wish.uplinks):
-                    return
         where = f"switch {owner.alias!r}" if owner is not None else f"port {port!r}"
         raise DocumentError(path, f"the uplink {name!r} is at {where}")
 
@@ -422,7 +453,19 @@ def _remove_uplink_port(switch: Switch, id_: str) -> None:
     switch.set_uplink_ports(left)
 
 
+def _vacate(switch: Switch, id_: str) -> None:
+    """Takes the uplink from a port, which stays."""
+    now = arrangement(switch)
+    switch._arrange_uplink_ports({**now, id_: now[id_]._replace(uplink=None)})
+
+
 def _attach(switch: Switch, id_: str, name: str) -> None:
-    went_to = switch.add_uplink(name).port
+    """Attaches an uplink to a port, even if it is not the next to get one."""
+    now = arrangement(switch)
+    if vacant(now)[:1] == [id_]:
+        switch.add_uplink(name)
+    else:
+        switch._arrange_uplink_ports({**now, id_: now[id_]._replace(uplink=name)})
+    went_to = switch.uplinks[name].port
     if went_to != id_:
         raise HostError(f"the host attached {name!r} to the uplink port {went_to!r}, not {id_!r}")

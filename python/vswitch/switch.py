@@ -9,6 +9,7 @@ from libvswitch import checked
 from libvswitch.enums import Multicast
 from libvswitch.errors import NotFound
 from vswitch import _describing, _table, _undo, words as _words
+from vswitch._arrangement import Arrangement, arrange
 from vswitch._mapping import Live, sought
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
@@ -261,6 +262,11 @@ class Switch(Thing):
         """
         self.host._note(_undo.UplinkPorts, self)
         checked.VSDVS_SetSwitchUplinkPorts(self.alias, list(names.values()), list(names))
+
+    def _arrange_uplink_ports(self, wanted: Arrangement) -> None:
+        """Makes them those, each with its name, its uplink and its properties."""
+        self.host._note(_undo.UplinkPorts, self)
+        arrange(self, wanted)
 
     def remove(self) -> None:
         """Removes it from the host, with its ports."""

@@ -1,7 +1,7 @@
 """Documents as plans: what would change, what changes, what is refused, what is taken back."""
 
 import copy
-from typing import Any, Dict, List
+from typing import Any, Callable, Dict, List, Optional
 
 import pytest
 import simhost
@@ -16,6 +16,7 @@ from vswitch import (
     RolledBack,
     Switch,
     Vlan,
+    _table,
 )
 
 Document = Dict[str, Any]
@@ -223,6 +224,86 @@ def test_uplink_ports(lab: Switch, objects: Host) -> None:
     assert "fifth" not in ports
 
 
+def test_an_uplink_that_leaves_a_port_that_stays(
+    host: simhost.Host, lab: Switch, objects: Host
+) -> None:
+    """The host takes an uplink with its port."""
+    port = lab.uplink_ports["left"]
+    port.set_property("com.example.a", b"\1", _table.PROPERTY_TYPES["config"])
+    held = port.properties()
+    document = on_lab(
+        uplink_ports=[{"id": "left"}, {"id": "new"}],
+        uplinks=[{"name": "nic0", "state": "absent"}],
+    )
+    plan = objects.plan(document)
+    assert [one.path for one in plan.changes] == ["lab/new", "lab/nic0"]
+    plan.apply()
+    assert plan.changes == () and at(lab) == {"left": None, "spare": "nic1", "new": None}
+    now = lab.uplink_ports["left"].properties()
+    assert {key: now.get(key) for key in _own(held)} == _own(held)
+
+
+def _own(held: Dict[str, Any]) -> Dict[str, Any]:
+    return {key: item for key, item in held.items() if key not in _table.COMPUTED}
+
+
+def test_an_uplink_whose_port_goes(lab: Switch, objects: Host) -> None:
+    document = on_lab(uplink_ports=[{"id": "spare", "state": "absent"}], uplinks=["nic1"])
+    plan = objects.plan(document)
+    assert [one.path for one in plan.changes] == ["lab/nic1", "lab/nic1"]
+    plan.apply()
+    assert plan.changes == () and list(at(lab).values()) == ["nic0", "nic1"]
+    assert "spare" not in lab.uplink_ports
+
+
+def at(switch: Switch) -> Dict[str, Optional[str]]:
+    """The uplink at each uplink port."""
+    ports = switch.uplink_ports.items()
+    return {id_: None if port.uplink is None else port.uplink.name for id_, port in ports}
+
+
+CABLES = {
+    "a vacant port gets one": "plug nic2",
+    "a port is left": "unplug nic1",
+    "one comes back elsewhere": "unplug nic0, plug nic0",
+    "two change places": "unplug nic0, unplug nic1, plug nic2, plug nic1, plug nic0",
+    "one goes to another switch": "unplug nic1, lend nic1",
+    "all ports are others": "rename x",
+}
+
+
+def recable(changes: str, here: Switch, there: Switch) -> None:
+    ways: Dict[str, Callable[[str], object]] = {
+        "plug": here.add_uplink,
+        "unplug": lambda name: here.uplinks[name].remove(),
+        "lend": there.add_uplink,
+        "rename": lambda id_: here.set_uplink_ports({id_: id_}),
+    }
+    for change in changes.split(", "):
+        way, name = change.split()
+        ways[way](name)
+
+
+@pytest.mark.parametrize("change", CABLES)
+def test_uplinks_come_back_to_their_ports(host: simhost.Host, objects: Host, change: str) -> None:
+    there = objects.switches["vswitch0"]
+    here = objects.add_switch("here", uplinks=["nic0"])
+    here.set_uplink_ports({"vacant": "Vacant", "uplink1": "Left", "right": "Right"})
+    here.set_uplink_ports({"uplink1": "Left", "right": "Right"})
+    here.add_uplink("nic1")
+    here.set_uplink_ports({"vacant": "Vacant", "uplink1": "Left", "right": "Right"})
+    here.uplink_ports["vacant"].nested_tag = here.uplink_ports["right"].blocked = True
+    before = at(here)
+    assert before == {"vacant": None, "uplink1": "nic0", "right": "nic1"}
+    backup, everything_before = objects.state(), without_numbers(everything(host))
+    recable(CABLES[change], here, there)
+    assert at(here) != before
+    plan = objects.plan(backup, whole=True)
+    plan.apply()
+    assert at(here) == before and plan.changes == ()
+    assert without_numbers(everything(host)) == everything_before
+
+
 def test_room_for_a_port(host: simhost.Host, objects: Host) -> None:
     switch = objects.add_switch("small", max_ports=1)
     switch.add_port("a")
@@ -290,6 +371,10 @@ WRONG = {
     "switches[0].uplinks[0]: the uplink 'nic4' is at switch 'vswitch0'": on_lab(uplinks=["nic4"]),
     "switches[0].uplink_ports[0]: 'left' and 'nic1' must be without one another first": on_lab(
         uplink_ports=[{"id": "left", "uplink": "nic1"}]
+    ),
+    "switches[0].uplinks[0]: switches[0].uplink_ports[0] has 'nic0'": on_lab(
+        uplinks=[{"name": "nic0", "state": "absent"}],
+        uplink_ports=[{"id": "left", "uplink": "nic0"}],
     ),
     "switches[0].lags[0]: no call makes link-aggregation groups": on_lab(
         lags=[{"name": "lag9", "uplinks": ["nic0"]}]
