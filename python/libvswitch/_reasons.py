@@ -93,36 +93,51 @@ def _missing_part(switch: checked.DVSwitchHandle, where: str, arguments: Dict[st
             ports.difference_update(checked.VSDVS_GetSwitchUplinkPorts(alias).ids)
             return f"no port {port!r} {where} ({_it_has(ports)})"
         owner = f"of port {port!r} {where}"
-    if isinstance(port, int) and port not in _numbers(switch, alias):
-        return f"no port {where} has the number {port}"
     if "externalId" in arguments:
         return f"no port {where} is called {arguments['externalId']!r} by another system"
+    if "key" in arguments:
+        return f"no property {arguments['key']!r} is set {owner}"
+    if "sid" in arguments and isinstance(port, str):
+        kept = [one.sid for one in checked.VSDVS_GetDVMirrorSessions(alias, port)]
+        return f"no mirror session {arguments['sid']!r} {owner} ({_it_has(kept)})"
+    return _missing_running(switch, where, owner, arguments)
+
+
+def _missing_running(
+    switch: checked.DVSwitchHandle, where: str, owner: str, arguments: Dict[str, object]
+) -> str:
+    """What there is only while a switch runs."""
+    alias = checked.DVS_SwitchName(switch) or ""
+    port = arguments.get("port")
+    if not _runs(alias):
+        return f"switch {alias!r} does not run on this host"
+    if isinstance(port, int) and port not in _numbers(switch, alias):
+        return f"no port {where} has the number {port}"
     if "uplink" in arguments:
-        return f"no uplink {arguments['uplink']!r} {where} ({_it_has(_uplinks(alias))})"
+        uplinks = [one.name for one in checked.VSQEX_GetUplinks(alias)]
+        return f"no uplink {arguments['uplink']!r} {where} ({_it_has(uplinks)})"
     if "sid" in arguments:
-        sessions = _sessions(alias, port)
+        sessions = checked.VSQEX_GetDVMirrorSessionIDs(alias)
         return f"no mirror session {arguments['sid']!r} {owner} ({_it_has(sessions)})"
     if "group" in arguments:
         return f"port {port} {where} has not joined the group {arguments['group']!r}"
     if "entry" in arguments:
         address = getattr(arguments["entry"], "macAddress", "")
         return f"no address {address!r} of that kind in the table {owner}"
-    return f"no property {arguments['key']!r} is set {owner}" if "key" in arguments else ""
+    return ""
+
+
+def _runs(alias: str) -> bool:
+    try:
+        checked.VSQEX_GetVSInfo(alias)
+    except errors.NotFound:
+        return False
+    return True
 
 
 def _numbers(switch: checked.DVSwitchHandle, alias: str) -> List[int]:
     ids = [checked.DVS_PortId(one) for one in checked.DVSState_PortForEach(switch)]
     return [checked.VSDVS_DvPortIDToPortID(alias, one) for one in ids]
-
-
-def _uplinks(alias: str) -> List[str]:
-    return [one.name for one in checked.VSQEX_GetUplinks(alias)]
-
-
-def _sessions(alias: str, port: object) -> List[str]:
-    if isinstance(port, str):
-        return [one.sid for one in checked.VSDVS_GetDVMirrorSessions(alias, port)]
-    return list(checked.VSQEX_GetDVMirrorSessionIDs(alias))
 
 
 def _portset(handle: checked.DVSwitchHandle) -> str:

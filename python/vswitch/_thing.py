@@ -11,6 +11,7 @@ import typing
 from typing import Dict, Optional
 
 from libvswitch import checked
+from libvswitch.errors import HostError
 from vswitch import _table
 from vswitch._mapping import sought
 from vswitch.words import SYNONYMS
@@ -93,16 +94,20 @@ def own_properties(thing: Thing) -> Dict[str, Item]:
 def restore(thing: Thing, before: Before) -> None:
     """Puts bytes and property types back, and takes away what was not there."""
     held = thing.properties()
-    if all(held.get(key) == item for key, item in before.items()):
-        return
+    failed: Optional[HostError] = None
     for key, item in before.items():
-        now = held.get(key)
-        if now == item:
+        if held.get(key) == item:
             continue
-        if item is None:
-            thing.erase_property(key)
-        else:
-            thing.write_property(key, item.data, item.propertyType)
+        # One that fails must not keep the others from their places.
+        try:
+            if item is None:
+                thing.erase_property(key)
+            else:
+                thing.write_property(key, item.data, item.propertyType)
+        except HostError as error:
+            failed = failed or error
+    if failed is not None:
+        raise failed
 
 
 def restore_all(thing: Thing, before: Dict[str, Item]) -> None:

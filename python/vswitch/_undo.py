@@ -9,7 +9,8 @@ from __future__ import annotations
 import abc
 import contextlib
 import typing
-from typing import Callable, Dict, Iterable, List, Tuple
+from functools import partial
+from typing import Callable, Dict, Iterable, List, Optional, Tuple
 
 from libvswitch import checked
 from libvswitch.enums import LinkState, MacType
@@ -21,7 +22,7 @@ from vswitch.values import MacLearning
 
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
-    from vswitch.port import Port
+    from vswitch.port import AnyPort, Port
     from vswitch.switch import Switch
     from vswitch.uplink import Uplink
 
@@ -225,9 +226,12 @@ class UplinkPorts(Step):
         self.place = switch.owner
         self._switch = switch
         self._before = arrangement(switch)
-        self._numbers = {id_: switch.uplink_ports[id_].number for id_ in self._before}
+        self._numbers = {id_: _number(switch.uplink_ports[id_]) for id_ in self._before}
+        self._added_again: List[str] = []
 
     def undo(self) -> None:
+        now = arrangement(self._switch)
+        self._added_again = [id_ for id_ in self._before if id_ not in now]
         arrange(self._switch, self._before)
 
     def left(self) -> List[str]:
@@ -235,13 +239,20 @@ class UplinkPorts(Step):
         left = [f"{self._switch.path}/{id_}" for id_ in now if now[id_] != self._before.get(id_)]
         left += [f"{self._switch.path}/{id_}" for id_ in self._before if id_ not in now]
         for id_, number in self._numbers.items():
-            if id_ in now and self._switch.uplink_ports[id_].number != number:
-                again = self._switch.uplink_ports[id_].number
+            again = _number(self._switch.uplink_ports[id_]) if id_ in now else number
+            if again != number:
                 left.append(f"{self._switch.path}/{id_}: its number was {number} and is {again}")
+            elif number is None and id_ in self._added_again:
+                left.append(f"{self._switch.path}/{id_}: the uplink that it has when it runs")
         return left
 
     def what(self) -> str:
         return f"{self._switch.path}: uplink ports"
+
+
+def _number(port: "AnyPort") -> Optional[int]:
+    """What the host calls it, which it does while the switch runs."""
+    return port.number if port.switch.running else None
 
 
 class Macs(Step):
@@ -292,13 +303,15 @@ class RemovedPort(Step):
         self.place = port.owner
         self._port = port
         self._properties = own_properties(port)
-        self._number = port.number
+        self._number = _number(port)
         self._external_id = port.external_id
         self._macs = kept_macs(port)
+        self._was_added = False
 
     def undo(self) -> None:
         if not self._port.exists():
             self._add()
+            self._was_added = True
         restore(self._port, dict(self._properties))
         now = kept_macs(self._port)
         for key, kept in self._macs.items():
@@ -315,15 +328,21 @@ class RemovedPort(Step):
         path = self._port.path
         if not self._port.exists():
             return [path]
-        number = self._port.number
-        if number == self._number:
-            return differences(self._port, dict(self._properties))
-        return [
-            f"{path}: it was removed and added again: its number was {self._number} and is"
-            f" {number}; what it learned and counted is gone, and so is what another system"
-            " called it",
-            *differences(self._port, dict(self._properties)),
-        ]
+        left = differences(self._port, dict(self._properties))
+        if kept_macs(self._port) != self._macs:
+            left.append(f"{path}: macs")
+        number = _number(self._port)
+        if self._was_added or number != self._number:
+            left.insert(0, f"{path}: it was removed and added again{self._lost(number)}")
+        return left
+
+    def _lost(self, number: Optional[int]) -> str:
+        lost = "what it learned and counted is gone"
+        if self._external_id is None:
+            lost += ", and so is what another system called it"
+        if number is None:
+            return f": {lost}"
+        return f": its number was {self._number} and is {number}; {lost}"
 
     def is_whole(self) -> bool:
         return True
@@ -346,7 +365,7 @@ class RemovedSwitch(Step):
             (switch.host_part, own_properties(switch.host_part)),
         ]
         self._running = switch.running
-        self._uplinks = UplinkPorts(switch) if self._running else None
+        self._uplinks = UplinkPorts(switch)
         self._lags = switch.lags if self._running else ()
         self._ports = [RemovedPort(port) for port in switch.ports.values()]
 
@@ -359,13 +378,14 @@ class RemovedSwitch(Step):
         checked.VSDVS_CreateVSwitch(
             switch.alias, identifier, portset, max_ports, True, self._version, 0, 0
         )
-        if self._uplinks is not None:
-            self._uplinks.undo()
-        for thing, before in self._things:
-            restore_all(thing, before)
-        for port in self._ports:
-            port.undo()
-        switch._run(self._running)
+        undos: List[Callable[[], object]] = [self._uplinks.undo]
+        undos += [partial(restore_all, thing, before) for thing, before in self._things]
+        undos += [port.undo for port in self._ports]
+        undos.append(partial(switch._run, self._running))
+        for undo in undos:
+            # One that fails must not keep the others from their work.
+            with contextlib.suppress(Exception):
+                undo()
 
     def left(self) -> List[str]:
         switch = self._switch
@@ -377,8 +397,7 @@ class RemovedSwitch(Step):
             line for thing, before in self._things for line in differences(thing, dict(before))
         ]
         left += [line for port in self._ports for line in port.left()]
-        if self._uplinks is not None:
-            left += self._uplinks.left()
+        left += self._uplinks.left()
         if switch.running is not self._running:
             left.append(f"{switch.path}: running")
         elif self._running and switch.lags != self._lags:

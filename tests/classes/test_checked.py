@@ -187,6 +187,16 @@ REFUSED = [
         " QEX_NOT_SUPPORTED for a command that it does not have",
     ),
     (
+        errors.NotFound,
+        lambda: _stopped(lambda: checked.VSQEX_GetUplinks(SWITCH)),
+        "switch 'vswitch0' does not run on this host",
+    ),
+    (
+        errors.NotFound,
+        lambda: _stopped(lambda: checked.DVSQEX_PortDataGet(ID, PORT, KEY)),
+        "no property 'com.example.key' is set of port 'web-1' of switch 'vswitch0'",
+    ),
+    (
         errors.NoUplink,
         lambda: _without_links(),
         "QEX_ENETDOWN if no link of the team is usable",
@@ -198,6 +208,11 @@ def _without_links() -> object:
     for name in ("nic4", "nic5"):
         checked.VSQEX_SetUplinkAdminLinkState(SWITCH, name, checked.LinkState.DOWN)
     return checked.VSQEX_PortGetTeamUplinkHint(number())
+
+
+def _stopped(act: Callable[[], object]) -> object:
+    checked.DVSQEX_SwitchDissociate(ID)
+    return act()
 
 
 @pytest.mark.parametrize("kind, act, words", REFUSED, ids=[one[2][:40] for one in REFUSED])

@@ -223,6 +223,37 @@ def test_whether_a_switch_runs(host: simhost.Host, objects: Host) -> None:
     rolled_back(host, objects, lambda: setattr(switch, "running", True))
 
 
+def test_what_a_switch_has_that_does_not_run(
+    host: simhost.Host, lab: Switch, objects: Host
+) -> None:
+    """No port of it has a number."""
+    lab.running = False
+    names = {"left": "Links", "spare": "spare", "new": "new"}
+    rolled_back(host, objects, lambda: lab.set_uplink_ports(names))
+    rolled_back(host, objects, lambda: lab.add_port("new", external_id="7f"))
+    lab.ports["desk-4"].vlan = Vlan(7, priority=3)
+    before = lab.state()
+    removals: Dict[str, Callable[[], None]] = {
+        "lab/spare: the uplink that it has": lambda: lab.set_uplink_ports({"left": "Left"}),
+        "lab/desk-4: it was removed and added again: what it": lab.ports["desk-4"].remove,
+        "lab: it was removed and added again": lab.remove,
+    }
+    for words, remove in removals.items():
+        with pytest.raises(NotRestored) as raised:
+            with objects.transaction():
+                remove()
+                raise Stop("that is all")
+        assert lab.state() == before
+        assert raised.value.left[0].startswith(words)
+    assert raised.value.left[-2:] == (
+        "lab/left: the uplink that it has when it runs",
+        "lab/spare: the uplink that it has when it runs",
+    )
+    # No call tells of them before.
+    lab.running = True
+    assert list(lab.uplinks) == []
+
+
 def without_numbers(described: Dict[str, Any]) -> Dict[str, Any]:
     """What is set; a port that is added again has learned and counted nothing."""
     described.pop("bytes")
@@ -254,6 +285,20 @@ def test_a_port_that_was_removed(host: simhost.Host, desk: Port, objects: Host) 
         f"lab/desk-1: it was removed and added again: its number was {number} and is {desk.number};"
     )
     assert str(raised.value) == f"that is all; not as it was: {left}"
+
+
+def test_what_fails_while_a_port_comes_back(host: simhost.Host, desk: Port, objects: Host) -> None:
+    """What can be put back is, and what cannot is named."""
+    before = everything(host)["bytes"]["lab", "desk-1"]
+    with pytest.raises(NotRestored) as raised:
+        with objects.transaction():
+            desk.remove()
+            host.fault("DVSQEX_PortDataSet", nth=3, status="QEX_BUSY")
+            host.fault("VSQEX_SetPortMACTable", times=0, status="QEX_BUSY")
+            raise Stop("that is all")
+    now = everything(host)["bytes"]["lab", "desk-1"]
+    assert len([item for item in before if item in now]) > 10
+    assert [line.split(": ")[1] for line in raised.value.left[1:]] == ["blocked", "macs"]
 
 
 def test_a_switch_that_was_removed(host: simhost.Host, lab: Switch, objects: Host) -> None:
