@@ -1,6 +1,8 @@
 """Settings as attributes: what is assigned, cleared, refused, and what the host makes of it."""
 
-from typing import Any, Dict, Tuple, Union
+import re
+from pathlib import Path
+from typing import Any, Dict, Set, Tuple, Union
 
 import pytest
 import simhost
@@ -24,9 +26,13 @@ from vswitch import (
     Switch,
     TeamFlags,
     Teaming,
+    UplinkPort,
     Vlan,
     _table,
 )
+from vswitch._settings import Setting
+
+GUIDE = Path(__file__).resolve().parents[2] / "docs/guides/objects.md"
 
 
 def session(sid: str, **more: Any) -> Dict[str, Any]:
@@ -111,6 +117,21 @@ def described(host: simhost.Host, thing: Union[Switch, Port]) -> Dict[str, Any]:
         return dict(switch)
     (port,) = [one for one in switch["ports"] if one["id"] == thing.id]
     return dict(port)
+
+
+def attributes(kind: type) -> Set[str]:
+    return {name for name, one in vars(kind).items() if isinstance(one, Setting)}
+
+
+def test_the_guide_has_every_setting() -> None:
+    table = GUIDE.read_text(encoding="utf-8").split("\n|---|---|\n")[1].split("\n\n")[0]
+    rows = [re.findall(r"`(\w+)`", line) for line in table.splitlines()]
+    assert {first: set(names) for first, *names in rows} == {
+        "Host": {"options", "mac_learning"},
+        "Switch": attributes(Switch) | {"running"},
+        "Port": attributes(Port),
+        "UplinkPort": attributes(UplinkPort) | {"name"},
+    }
 
 
 def test_every_setting_is_an_attribute() -> None:
