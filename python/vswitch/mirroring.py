@@ -11,6 +11,7 @@ from typing import Any, Dict, Iterator, Optional, Type, Union
 
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound, NotRestored
+from vswitch._surely import surely
 from vswitch.uplink import Uplink
 from vswitch.values import Mirror, MirrorEnd
 
@@ -64,10 +65,10 @@ class Mirroring:
         sessions = [_sessions.session_of(self.mirror)]
         try:
             checked.VSDVS_AppendDVMirrorSessions(*self.port.owner, sessions)
-        except HostError as error:
-            # What is refused is not there; what traps may be.
-            if error.status is None:
-                self._remove()
+        except BaseException as error:
+            # What is refused is not there; what traps or is interrupted may be.
+            if not isinstance(error, HostError) or error.status is None:
+                surely(self._remove)
             raise
         return self
 
@@ -77,7 +78,7 @@ class Mirroring:
         raised: Optional[BaseException],
         trace: Optional[TracebackType],
     ) -> None:
-        self._remove()
+        surely(self._remove)
 
     def _remove(self) -> None:
         sid = self.mirror.sid

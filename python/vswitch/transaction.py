@@ -52,7 +52,13 @@ class Transaction:
             return
         # The words of an error name what the host has when they are made: now.
         words = str(raised) or type(raised).__name__
-        left = self._roll_back()
+        try:
+            left = self._roll_back()
+        except BaseException:
+            # It is interrupted, as by Ctrl-C, which goes on when all is put back.
+            left = self._roll_back()
+            if not left:
+                raise
         if left:
             raise NotRestored(f"{words}; not as it was: {'; '.join(left)}", left=left) from raised
         # What ends a program goes on doing so, and so does what is raised in `_whole`.

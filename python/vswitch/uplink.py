@@ -11,6 +11,7 @@ from libvswitch import checked
 from libvswitch.enums import LinkState
 from libvswitch.errors import HostError, NotRestored
 from vswitch import _undo, words as _words
+from vswitch._surely import surely
 
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
@@ -81,7 +82,7 @@ class Uplink:
             self.wait(LinkState.DOWN, timeout)
             yield self
         finally:
-            self._bring_up(timeout)
+            surely(lambda: self._bring_up(timeout))
 
     def _bring_up(self, timeout: float) -> None:
         try:

@@ -4,7 +4,7 @@ They run in a process with no tests of the flat module: the objects load the cla
 """
 
 import os
-from typing import Any, Dict
+from typing import Any, Callable, Dict
 
 import pytest
 
@@ -172,3 +172,25 @@ def desk(lab: Switch) -> Port:
 def bare(lab: Switch) -> Port:
     """A port with no setting."""
     return lab.ports["desk-4"]
+
+
+@pytest.fixture
+def interrupt(monkeypatch: pytest.MonkeyPatch) -> Callable[..., None]:
+    """Lets Ctrl-C come in a call, before or after it is done, as it does the first time."""
+    from libvswitch import checked
+
+    def patch(name: str, *, nth: int = 1, done: bool) -> None:
+        call, turns = getattr(checked, name), iter(range(1, 100))
+
+        def interrupted(*arguments: Any) -> Any:
+            is_now = next(turns) == nth
+            if is_now and not done:
+                raise KeyboardInterrupt
+            result = call(*arguments)
+            if is_now:
+                raise KeyboardInterrupt
+            return result
+
+        monkeypatch.setattr(checked, name, interrupted)
+
+    return patch

@@ -1,7 +1,7 @@
 """What lasts for the time of a block, or is looked for again and again: sessions, links, events."""
 
 import asyncio
-from typing import Any, List
+from typing import Any, Callable, List
 
 import pytest
 import simhost
@@ -85,6 +85,19 @@ def test_a_session_of_which_nobody_knows_whether_it_is_there(
     assert bare.mirrors == ()
 
 
+@pytest.mark.parametrize(
+    "call, done", [("Append", True), ("Append", False), ("Remove", False), ("Remove", True)]
+)
+def test_a_session_that_is_interrupted(
+    bare: Port, interrupt: Callable[..., None], call: str, done: bool
+) -> None:
+    interrupt(f"VSDVS_{call}DVMirrorSession{'s' if call == 'Append' else ''}", done=done)
+    with pytest.raises(KeyboardInterrupt):
+        with bare.mirrored(to="desk-3"):
+            assert call == "Remove", "the block does not begin"
+    assert bare.mirrors == ()
+
+
 def test_a_session_that_somebody_else_removed(bare: Port) -> None:
     with bare.mirrored(to="desk-3"):
         bare.mirrors = ()
@@ -116,6 +129,18 @@ def test_an_uplink_comes_up_whatever_happens(lab: Switch, raised: Any) -> None:
     with pytest.raises(raised):
         with lab.uplinks["nic0"].taken_down():
             raise raised
+    assert lab.uplinks["nic0"].link is LinkState.UP
+
+
+@pytest.mark.parametrize("nth, done", [(1, True), (2, False), (2, True)])
+def test_an_uplink_comes_up_though_that_is_interrupted(
+    lab: Switch, interrupt: Callable[..., None], nth: int, done: bool
+) -> None:
+    """The first call takes it down, the second one up."""
+    interrupt("VSQEX_SetUplinkAdminLinkState", nth=nth, done=done)
+    with pytest.raises(KeyboardInterrupt):
+        with lab.uplinks["nic0"].taken_down():
+            assert nth == 2, "the block does not begin"
     assert lab.uplinks["nic0"].link is LinkState.UP
 
 

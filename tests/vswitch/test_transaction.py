@@ -378,6 +378,21 @@ def test_what_ends_the_program_goes_on_doing_so(
     assert everything(host) == before
 
 
+@pytest.mark.parametrize("done", [False, True])
+def test_putting_back_goes_on_to_its_end(
+    host: simhost.Host, bare: Port, objects: Host, interrupt: Callable[..., None], done: bool
+) -> None:
+    """Whoever interrupts it sees the program end, when everything is as it was."""
+    before = everything(host)
+    interrupt("DVSQEX_PortDataClear", done=done)
+    with pytest.raises(KeyboardInterrupt):
+        with objects.transaction():
+            bare.blocked = True
+            bare.vlan = 7
+            raise Stop("that is all")
+    assert everything(host) == before
+
+
 def test_errors_keep_the_words_of_their_time(lab: Switch, objects: Host) -> None:
     with pytest.raises(RolledBack, match=r"no port 'x' of switch 'lab' \(it has a, desk-1, "):
         with objects.transaction():
