@@ -266,6 +266,22 @@ def test_without_its_libraries_it_says_what_it_needs(lab: SharedHost) -> None:
     assert done.stderr.endswith("typer, rich and PyYAML, which libvswitch[command] installs\n")
 
 
+@pytest.mark.parametrize("library", ["typer", "vswitch"])
+def test_interrupted_before_it_begins(
+    lab: SharedHost, tmp_path: "os.PathLike[str]", library: str
+) -> None:
+    with open(os.path.join(tmp_path, f"{library}.py"), "w", encoding="utf-8") as file:
+        file.write("raise KeyboardInterrupt\n")
+    path = f"{tmp_path}{os.pathsep}{lab.environment['PYTHONPATH']}"
+    done = subprocess.run(
+        [PROGRAM, "list"],
+        env={**lab.environment, "PYTHONPATH": path},
+        capture_output=True,
+        text=True,
+    )
+    assert (done.returncode, done.stdout, done.stderr) == (130, "", "")
+
+
 def test_without_a_host_it_says_so(lab: SharedHost, tmp_path: "os.PathLike[str]") -> None:
     """Libraries that are none stand for a machine that has none."""
     for name in ("libvswitch.so", "libnebPublic.so"):

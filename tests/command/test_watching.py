@@ -143,6 +143,52 @@ def test_a_drill_that_finds_something(vswitch: Vswitch, lab: SharedHost) -> None
     assert state(lab)["uplinks"] == before
 
 
+SIGNALLED = """
+import os
+import signal
+import sys
+
+from vswitch import LinkState, Switch, Uplink
+from vswitch.command import main
+
+number = getattr(signal, sys.argv.pop(1))
+carriers, set_ = Switch.carriers, Uplink._set
+
+
+def meanwhile(switch):
+    if any(uplink.link is LinkState.DOWN for uplink in switch.uplinks.values()):
+        os.kill(os.getpid(), number)
+    return carriers(switch)
+
+
+def once_more(uplink, state):
+    if state is LinkState.UP:
+        for one in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP):
+            os.kill(os.getpid(), one)
+    set_(uplink, state)
+
+
+Switch.carriers, Uplink._set = meanwhile, once_more
+main()
+"""
+
+
+@pytest.mark.parametrize("number", [signal.SIGINT, signal.SIGTERM, signal.SIGHUP])
+def test_a_link_comes_up_whatever_ends_a_drill(lab: SharedHost, number: signal.Signals) -> None:
+    """The signal comes while it is down, and all of them once more when it is to come up."""
+    before = state(lab)["uplinks"]
+    done = lab.run(["/usr/bin/python3", "-c", SIGNALLED, number.name, "drill", "lab"])
+    said = "vswitch: interrupted\n" if number is signal.SIGINT else ""
+    assert (done.returncode, done.stdout, done.stderr) == (128 + number, "", SIMULATED + said)
+    assert state(lab)["uplinks"] == before
+
+
+def test_a_signal_that_is_ignored_from_the_beginning(lab: SharedHost) -> None:
+    """As nohup has it."""
+    done = lab.run(["nohup", "/usr/bin/python3", "-c", SIGNALLED, "SIGHUP", "drill", "lab"])
+    assert done.returncode == 130, done
+
+
 def test_no_drill(lab: SharedHost, refused: Refused) -> None:
     lab.link("nic1").down()
     assert refused("drill", "lab") == (

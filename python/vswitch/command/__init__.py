@@ -6,6 +6,8 @@ this package needs more than the standard library: typer, rich and PyYAML.
 
 import sys
 
+from vswitch.exits import INTERRUPTED
+
 __all__ = ["main"]
 
 
@@ -16,4 +18,6 @@ def main() -> None:
     except ModuleNotFoundError as error:
         needs = "it needs typer, rich and PyYAML, which libvswitch[command] installs"
         sys.exit(f"vswitch: {error}: {needs}")
+    except KeyboardInterrupt:
+        sys.exit(INTERRUPTED)
     program.main(sys.argv[1:])

@@ -20,7 +20,7 @@ __all__ = ["group", "main"]
 
 NAME = "vswitch"
 _USAGE = 2
-_SIGNALS = (signal.SIGTERM, signal.SIGHUP)
+_SIGNALS = (signal.SIGINT, signal.SIGTERM, signal.SIGHUP)
 _OPTIONS_FOR_ALL = {"help_option_names": ["-h", "--help"]}
 
 COMMANDS: Dict[str, Callable[..., None]] = {
@@ -80,7 +80,9 @@ def group() -> click.Group:
 def main(words: List[str]) -> None:
     """Runs the program, and ends it."""
     for number in _SIGNALS:
-        signal.signal(number, _end)
+        # nohup and shells have a program begin with some that it is to ignore.
+        if signal.getsignal(number) is not signal.SIG_IGN:
+            signal.signal(number, _end)
     with exits(NAME):
         for stream in (sys.stdout, sys.stderr):
             if isinstance(stream, io.TextIOWrapper):
@@ -117,4 +119,6 @@ def _end(number: int, _: Optional[FrameType]) -> None:
     """What a signal ends is put right on the way out, which another does not disturb."""
     for one in _SIGNALS:
         signal.signal(one, signal.SIG_IGN)
+    if number == signal.SIGINT:
+        raise KeyboardInterrupt
     raise SystemExit(128 + number)
