@@ -77,6 +77,21 @@ def test_a_kind_that_is_none(refused: Refused) -> None:
     assert told.startswith("vswitch: --kind: 'lnk' is not one of switch, port, uplink, link")
 
 
+@pytest.mark.parametrize(
+    "words",
+    [
+        ["watch", "--for", "nan"],
+        ["stats", "lab", "--watch", "--every", "inf"],
+        ["mirror", "lab/web-1", "--to", "lab/web-2", "--for", "nan"],
+        ["drill", "lab", "--timeout", "1e99"],
+        ["apply", "-", "--confirm-within", "inf"],
+    ],
+)
+def test_what_is_no_time(refused: Refused, words: List[str]) -> None:
+    said = f"vswitch: Invalid value for '{words[-2]}': {float(words[-1])} is no time of up to"
+    assert refused(*words, status=2).startswith(said)
+
+
 @pytest.mark.parametrize("to", ["lab/web-2", "lab/nic1"])
 def test_mirror(vswitch: Vswitch, lab: SharedHost, to: str) -> None:
     before = state(lab)

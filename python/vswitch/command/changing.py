@@ -13,6 +13,7 @@ import typer
 from libvswitch.errors import Exists, HostError
 from vswitch import _settings, _table, documents
 from vswitch.command import assignments, completing, output, places
+from vswitch.command.arguments import PLACE, SWITCH
 from vswitch.command.session import host, is_json
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
@@ -25,12 +26,6 @@ __all__ = ["add", "remove", "set_", "tell", "unset", "uplink"]
 Found = Union[Switch, Port, UplinkPort]
 Members = Dict[str, Words]
 
-_PLACE = typer.Argument(
-    ...,
-    metavar="SWITCH[/PORT]",
-    help="A switch, or a port of it.",
-    autocompletion=completing.things,
-)
 _TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
 
 
@@ -83,7 +78,7 @@ def _members(known: Dict[str, _table.Property], wanted: Members) -> Members:
 
 
 def set_(
-    place: str = _PLACE,
+    place: str = PLACE,
     settings: List[str] = typer.Argument(
         ..., metavar="NAME=VALUE...", help="Settings, or members of them."
     ),
@@ -103,7 +98,7 @@ def set_(
 
 
 def unset(
-    place: str = _PLACE,
+    place: str = PLACE,
     settings: List[str] = typer.Argument(
         ..., metavar="NAME...", help="Settings.", autocompletion=completing.settings
     ),
@@ -180,7 +175,7 @@ def _first(known: Dict[str, _table.Property], settings: Optional[List[str]]) -> 
     return _members(known, assignments.read(known, settings or (), current))
 
 
-def remove(place: str = _PLACE) -> None:
+def remove(place: str = PLACE) -> None:
     """Remove a switch with its ports, or a port."""
     _change_found(places.find(host(), place), {"state": ABSENT})
 
@@ -195,9 +190,7 @@ class Action(str, enum.Enum):
 
 
 def uplink(
-    alias: str = typer.Argument(
-        ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=completing.switches
-    ),
+    alias: str = SWITCH,
     action: Action = typer.Argument(
         ..., metavar="add|remove|up|down", help="What is to be done.", show_choices=False
     ),

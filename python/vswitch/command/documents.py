@@ -7,6 +7,7 @@ from typing import Any, Optional
 import typer
 
 from vswitch.command import files, keeping, output
+from vswitch.command.arguments import seconds
 from vswitch.command.changing import tell
 from vswitch.command.session import host, is_json
 from vswitch.plan import Plan
@@ -38,8 +39,8 @@ def diff(file: Path = _FILE) -> None:
 def apply(
     file: Path = _FILE,
     dry_run: bool = _DRY_RUN,
-    confirm_within: Optional[float] = typer.Option(
-        None, metavar="S", min=0.1, help="Take it back unless confirmed within so many seconds."
+    confirm_within: Optional[float] = seconds(
+        None, least=0.1, words="Take it back unless confirmed within so many seconds."
     ),
 ) -> None:
     """Make the host what a document says. What it does not name stays as it is.

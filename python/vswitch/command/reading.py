@@ -12,21 +12,12 @@ import typer
 from libvswitch.errors import NotFound
 from vswitch import _settings, _table, words
 from vswitch._thing import Thing
-from vswitch.command import completing, output, places
+from vswitch.command import output, places
+from vswitch.command.arguments import EVERY, PLACE, SWITCH
 from vswitch.command.session import from_words, host, is_json
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
 from vswitch.told import MacEntry, shown
-
-_PLACE = typer.Argument(
-    ...,
-    metavar="SWITCH[/PORT]",
-    help="A switch, or a port of it.",
-    autocompletion=completing.things,
-)
-_SWITCH = typer.Argument(
-    ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=completing.switches
-)
 
 
 def list_() -> None:
@@ -64,7 +55,7 @@ def _no_uplinks(listed: Dict[str, Any]) -> str:
     return "none" if listed["running"] else "not running"
 
 
-def show(place: str = _PLACE) -> None:
+def show(place: str = PLACE) -> None:
     """Show a switch with all that it has, or a port: what is set, and what is the default."""
     found = places.find(host(), place)
     if is_json():
@@ -161,10 +152,9 @@ def _port_branches(port: Union[Port, UplinkPort]) -> List[output.Branch]:
 
 
 _WATCH = typer.Option(False, "--watch", help="Tell again and again, until interrupted.")
-_EVERY = typer.Option(1.0, "--every", metavar="S", min=0.05, help="Seconds between two times.")
 
 
-def stats(place: str = _PLACE, watch: bool = _WATCH, every: float = _EVERY) -> None:
+def stats(place: str = PLACE, watch: bool = _WATCH, every: float = EVERY) -> None:
     """Show what a switch or a port counted.
 
     With --watch, people get what was added since the time before; programs get all counters, a line
@@ -219,7 +209,7 @@ def _tell_increase(counted: Dict[str, Dict[str, int]], before: Dict[str, Dict[st
             output.line(f"{now} {path}: {said or 'nothing counted'}")
 
 
-def lag(switch: str = _SWITCH) -> None:
+def lag(switch: str = SWITCH) -> None:
     """List the link-aggregation groups of a switch."""
     found = host().switches[switch].lags
     if is_json():

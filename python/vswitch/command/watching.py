@@ -11,6 +11,7 @@ import typer
 from libvswitch.enums import LinkState
 from libvswitch.errors import HostError
 from vswitch.command import completing, output, places
+from vswitch.command.arguments import EVERY, SWITCH, seconds as seconds_of
 from vswitch.command.session import from_words, host, is_json
 from vswitch.port import Port
 from vswitch.switch import Switch
@@ -20,8 +21,7 @@ from vswitch.words import choice
 
 __all__ = ["drill", "mirror", "watch"]
 
-_FOR = typer.Option(None, "--for", metavar="S", min=0, help="End after so many seconds.")
-_EVERY = typer.Option(1.0, "--every", metavar="S", min=0.05, help="Seconds between two times.")
+_FOR = seconds_of(None, "--for", least=0, words="End after so many seconds.")
 
 
 def watch(
@@ -32,7 +32,7 @@ def watch(
         help=f"Only such: {', '.join(KINDS)}. Several may be given.",
         autocompletion=completing.kinds,
     ),
-    every: float = _EVERY,
+    every: float = EVERY,
 ) -> None:
     """Tell what changes on the host from now on, until interrupted.
 
@@ -62,8 +62,8 @@ def mirror(
         help="Where its frames go, too: a port, or an uplink.",
         autocompletion=completing.things,
     ),
-    seconds: float = typer.Option(..., "--for", metavar="S", min=0, help="For how many seconds."),
-    every: float = _EVERY,
+    seconds: float = seconds_of(..., "--for", least=0, words="For how many seconds."),
+    every: float = EVERY,
 ) -> None:
     """Mirror a port for a time: what it receives and sends goes to another, too.
 
@@ -94,11 +94,9 @@ def _end_of(switch: Switch, to: str) -> Union[Port, Uplink]:
 
 
 def drill(
-    alias: str = typer.Argument(
-        ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=completing.switches
-    ),
-    timeout: float = typer.Option(
-        5.0, metavar="S", min=0.1, help="How long a link may take to go down and to come up."
+    alias: str = SWITCH,
+    timeout: float = seconds_of(
+        5.0, least=0.1, words="How long a link may take to go down and to come up."
     ),
 ) -> None:
     """Try a failover: take each uplink of a switch down in turn, and up again.
