@@ -200,6 +200,7 @@ SETTINGS = (
         ),
         (["set", "lab", "teaming={"], "teaming: '{' is not JSON: Expecting property name"),
         (["set", "lab", "mtu=" + "9" * 5000], "mtu: '9999"),
+        (["set", "lab", "teaming=" + "[" * 5000], "teaming: '[[[["),
         (["unset", "lab/web-1", "trunk"], f"no setting 'trunk' (there are {SETTINGS})"),
         (["add", "new", "--max-ports", "0"], "max_ports: 0 is below 1"),
         (["add", "new", "--external-id", "x"], "--external-id is for a port"),

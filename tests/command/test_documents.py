@@ -55,16 +55,33 @@ def test_json_from_standard_input(vswitch: Vswitch) -> None:
 @pytest.mark.parametrize(
     "text, said",
     [
-        ("switches:\n- alias: lab\n  mtu: 99\n", "switches[0].mtu: 99 is below 1280"),
-        ("switch: []\n", "switch: unknown key; there are "),
-        ("", "None is not an object"),
-        ("- 1\n", "[1] is not an object"),
         ("a: [\n", "line 2: expected the node content, but found '<stream end>'"),
         ("a: 1\nb: 2\na: 3\n", "line 3: the key 'a' is there twice"),
         ('{"a": 1, "a": 2}', "the key 'a' is there twice"),
         ("? [1]\n: 2\n", "line 1: a key that is no text"),
         ("!!python/object/apply:os.system ['true']\n", "line 1: could not determine a constructor"),
         ("[" * 5000, "it is nested too deeply"),
+        ('a: !!int "many"\n', "line 1: this is no int that can be read"),
+        ("a: 1\nb: !!bool maybe\n", "line 2: this is no bool that can be read"),
+        ("a: !!timestamp x\n", "line 1: could not determine a constructor"),
+        ("[" + "9" * 5000 + "]", "line 1: this is no int that can be read"),
+    ],
+)
+def test_files_that_are_no_documents(
+    refused: Refused, tmp_path: Path, text: str, said: str
+) -> None:
+    path = tmp_path / "document"
+    path.write_text(text)
+    assert refused("apply", str(path)).startswith(f"vswitch: {path}: {said}")
+
+
+@pytest.mark.parametrize(
+    "text, said",
+    [
+        ("switches:\n- alias: lab\n  mtu: 99\n", "switches[0].mtu: 99 is below 1280"),
+        ("switch: []\n", "switch: unknown key; there are "),
+        ("", "None is not an object"),
+        ("- 1\n", "[1] is not an object"),
         (
             "switches: [{alias: lab, uplinks: [nic99]}]",
             "switches[0].uplinks[0]: the host has no uplink 'nic99'",
@@ -94,12 +111,16 @@ def test_what_yaml_has_two_readings_of(vswitch: Vswitch) -> None:
     """Addresses of digits only, and words that are truths to some."""
     given = (
         "switches: [{alias: lab, ports: [{id: 010, alias: no,"
-        " addresses: [{mac: 20:30:40:50:10:20, type: static}]}, {id: 2026-11-22}]}]"
+        " addresses: [{mac: 20:30:40:50:10:20, type: static}]},"
+        " {id: 2026-11-22}, {id: 12e5}, {id: 089}, {id: 0o17}]}]"
     )
     assert vswitch("apply", "-", input=given).status == 0
     port = vswitch("show", "lab/010", "--json").json
     assert (port["alias"], port["addresses"][0]["mac"]) == ("no", "20:30:40:50:10:20")
-    assert vswitch("show", "lab/2026-11-22").status == 0
+    # Nor does what is written have two.
+    written = vswitch("backup").stdout
+    for id_ in ("010", "2026-11-22", "12e5", "089", "0o17"):
+        assert f"id: '{id_}'\n" in written
 
 
 def test_apply_is_rolled_back(lab: SharedHost, refused: Refused, document: str) -> None:

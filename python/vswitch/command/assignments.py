@@ -109,5 +109,5 @@ def _parts(text: str) -> List[str]:
 def _from_json(text: str, path: str) -> Any:
     try:
         return json.loads(text)
-    except ValueError as error:
+    except (ValueError, RecursionError) as error:
         raise _words.fail(path, text, f"JSON: {error}") from None

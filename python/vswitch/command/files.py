@@ -1,13 +1,14 @@
 """Documents in files: YAML or JSON, and nothing that either would read in two ways.
 
-YAML is read as its core schema has it: `yes`, `010`, a date and an address of digits and colons are
-texts. A key that is there twice is refused.
+YAML is read as its core schema has it, with no other numbers than the whole ones of JSON: `yes`,
+`010`, `12e5`, a date and an address of digits and colons are texts. A key that is there twice is
+refused.
 """
 
 import json
 import re
 import sys
-from typing import Any, Dict, List, Tuple
+from typing import Any, Callable, Dict, List, Tuple
 
 import yaml
 
@@ -15,13 +16,22 @@ from vswitch.words import DocumentError
 
 __all__ = ["read", "write"]
 
-_MAP = "tag:yaml.org,2002:map"
+_TAG = "tag:yaml.org,2002:"
 
 
 class _Loader(yaml.SafeLoader):
-    """Scalars as the core schema has them, and each key once."""
+    """Scalars as the core schema has them, each key once, and no kinds that JSON has not."""
 
     yaml_implicit_resolvers: Dict[str, List[Tuple[str, Any]]] = {}
+    yaml_constructors = {
+        tag: construct
+        for tag, construct in yaml.SafeLoader.yaml_constructors.items()
+        if tag is None or tag.replace(_TAG, "") in ("null", "bool", "int", "str", "seq", "map")
+    }
+
+
+class _Dumper(yaml.SafeDumper):
+    """What a newer schema takes for a number is written as the text that it is, too."""
 
 
 for _tag, _pattern, _first in (
@@ -30,9 +40,13 @@ for _tag, _pattern, _first in (
     ("int", r"[-+]?(?:0|[1-9][0-9]*)", list("-+0123456789")),
     ("merge", r"<<", ["<"]),
 ):
-    _Loader.add_implicit_resolver(
-        f"tag:yaml.org,2002:{_tag}", re.compile(f"(?:{_pattern})$"), _first
-    )
+    _Loader.add_implicit_resolver(f"{_TAG}{_tag}", re.compile(f"(?:{_pattern})$"), _first)
+
+_Dumper.add_implicit_resolver(
+    f"{_TAG}float",
+    re.compile(r"0o[0-7]+$|[-+]?(?:\.[0-9]+|[0-9]+(?:\.[0-9]*)?)(?:[eE][-+]?[0-9]+)?$"),
+    list("-+.0123456789"),
+)
 
 
 def _mapping(loader: Any, node: Any) -> Any:
@@ -46,11 +60,26 @@ def _mapping(loader: Any, node: Any) -> Any:
     return loader.construct_mapping(node, deep=True)
 
 
+def _checked(kind: str) -> Callable[[Any, Any], Any]:
+    """What makes a scalar, whose tag may promise more than its text holds."""
+    construct = yaml.SafeLoader.yaml_constructors[f"{_TAG}{kind}"]
+
+    def checked(loader: Any, node: Any) -> Any:
+        try:
+            return construct(loader, node)
+        except (KeyError, ValueError):
+            raise _problem(node, f"this is no {kind} that can be read") from None
+
+    return checked
+
+
 def _problem(node: Any, words: str) -> yaml.MarkedYAMLError:
     return yaml.MarkedYAMLError(problem=words, problem_mark=node.start_mark)
 
 
-_Loader.add_constructor(_MAP, _mapping)
+_Loader.add_constructor(f"{_TAG}map", _mapping)
+for _tag in ("bool", "int"):
+    _Loader.add_constructor(f"{_TAG}{_tag}", _checked(_tag))
 
 
 def read(name: str) -> Any:
@@ -75,7 +104,10 @@ def read(name: str) -> Any:
 def _parsed(text: str) -> Any:
     try:
         return json.loads(text, object_pairs_hook=_once)
-    except json.JSONDecodeError:
+    except DocumentError:
+        raise
+    except ValueError:
+        # No JSON, or with a number of more digits than Python reads.
         return yaml.load(text, _Loader)
 
 
@@ -98,5 +130,5 @@ def write(document: Dict[str, Any]) -> str:
     """A document as YAML that any reader of YAML takes as it is meant."""
     # What is ready for JSON may be of kinds that only look like a number or a text.
     plain = json.loads(json.dumps(document))
-    written: str = yaml.safe_dump(plain, sort_keys=False)
+    written: str = yaml.dump(plain, Dumper=_Dumper, sort_keys=False)
     return written
