@@ -41,7 +41,8 @@ FAULTS: Dict[str, Tuple[str, str]] = {
     "pointer deallocation": ("  type->tp_dealloc = drop_pointer;", ""),
     "pointer append": ('strcmp(method->ml_name, "append")', 'strcmp(method->ml_name, "")'),
     "pointer ownership": ('strcmp(method->ml_name, "own")', 'strcmp(method->ml_name, "")'),
-    "destructors": ("#undef PyCFunction_GET_FLAGS\n", "#undef PyCFunction_GET_FLAGS\n#if 0\n"),
+    # The interpreter's own macro stays, or inline function, whichever it has.
+    "destructors": ("#undef PyCFunction_GET_FLAGS\n", "#if 0\n"),
 }
 _AFTER_DESTRUCTORS = "#define PyCFunction_GET_FLAGS(function) METH_VARARGS\n"
 
