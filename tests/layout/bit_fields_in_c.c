@@ -1,3 +1,4 @@
+// The bit fields of all records as the C compiler lays them.
 #define BIT_FIELD_TABLE bit_fields_in_c
 #define BIT_FIELD_COUNT bit_fields_in_c_count
 #include "bit_field_table.inc"

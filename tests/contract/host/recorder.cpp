@@ -1,3 +1,4 @@
+// The list of calls so far, and what to return next; see recorder.h.
 #include "recorder.h"
 
 #include <chrono>
