@@ -349,6 +349,9 @@ Json form_to_json(Form const &form, void const *defaults) {
     }
     case FormKind::text:
       add_bound(said, "most_bytes", form.most);
+      if (form.of_uplinks) {
+        said["names"] = "uplinks";
+      }
       break;
     case FormKind::record:
     case FormKind::one_of:

@@ -60,7 +60,7 @@ struct Address {
 inline constexpr std::array kEntityMembers{
     form::member("port", form::text<form::TextField<&DVMirrorEntity::dvPortId>>(),
                  "a port, by its identifier"),
-    form::member("uplink", form::text<UplinkName>(), "an uplink, by its name"),
+    form::member("uplink", form::of_uplinks(form::text<UplinkName>()), "an uplink, by its name"),
     form::member("vlan", form::number<&DVMirrorEntity::vlan>(0, vlans::kGreatest), "a VLAN"),
     form::member("ip", form::address<Address>(FormKind::ip), "an IPv4 or IPv6 address"),
     form::member("number", form::number<&DVMirrorEntity::portId>(1, UINT32_MAX),

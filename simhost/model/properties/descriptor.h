@@ -179,6 +179,12 @@ struct Property : Descriptor {
     made.form.most = most;
     return made;
   }
+  /// A text that is the name of an uplink, or of what stands for some.
+  [[nodiscard]] constexpr Property of_uplinks() const {
+    auto made = *this;
+    made.form.of_uplinks = true;
+    return made;
+  }
   /// A rule for values by themselves; it refuses what is against it.
   template <auto kRule>
   [[nodiscard]] constexpr Property obeys() const {

@@ -73,6 +73,8 @@ struct Form {
   Form const *element = nullptr;
 
   std::size_t most = 0;  ///< bytes of a text, elements of a list
+  /// Whether a text is the name of an uplink, or of a port or group that stands for some.
+  bool of_uplinks = false;
 };
 
 /// Whether a record is said without a member that has its default.
@@ -276,6 +278,14 @@ constexpr FormOf<typename Access::Object> text() {
     array_text<Characters>().put_text(&Access::in(*static_cast<Object *>(object)), text);
   };
   made.most = array_text<Characters>().most;
+  return made;
+}
+
+/// A text that is the name of an uplink, or of what stands for some.
+template <typename Object>
+constexpr FormOf<Object> of_uplinks(FormOf<Object> const &text) {
+  auto made = text;
+  made.of_uplinks = true;
   return made;
 }
 

@@ -64,7 +64,7 @@ struct StandbyNames {
     return &policy.uplinkPortName[used];
   }
 };
-inline constexpr auto kName = form::array_text<char[QEX_NEB_NAME_MAX_LEN]>();
+inline constexpr auto kName = form::of_uplinks(form::array_text<char[QEX_NEB_NAME_MAX_LEN]>());
 
 inline constexpr std::array kMembers{
     form::member("balance", form::choice<&VSTeamPolicy::loadBalance>(kBalances),
@@ -123,6 +123,7 @@ inline constexpr auto bound_uplink =
         .of_port()
         .typed()
         .up_to(QEX_NEB_NAME_MAX_LEN)
+        .of_uplinks()
         .defaults_to("")
         .json("uplink")
         .says("the one uplink that the port uses whatever its teaming says");
