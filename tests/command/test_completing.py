@@ -1,28 +1,47 @@
 """What a shell is told when somebody presses the key for completion."""
 
+import contextlib
+import functools
+import os
+import pty
 import subprocess
 from pathlib import Path
-from typing import List
+from typing import Dict, List
 
+import click
 import pytest
 from command_line import PROGRAM, Refused, Vswitch
 from simhost import SharedHost
 
+from vswitch import _table
+from vswitch.command import assignments
+
+# The word that bash completes begins after a character that it takes words apart at.
 CHOSEN = """
-eval "$(vswitch completion bash)"
-COMP_WORDS=("$@")
-COMP_CWORD=$(($# - 1))
-_vswitch_completion vswitch
+eval "$SCRIPT"
+compopt() { printf '%s\\n' "$2"; }
+COMP_LINE=$1 COMP_POINT=${#1}
+_vswitch_completion vswitch "${COMP_LINE##*[ =:]}"
 printf '%s\\n' "${COMPREPLY[@]}"
 """
 
 
-def completed(host: SharedHost, *words: str) -> List[str]:
-    """What bash offers for the last word."""
+def environment(host: SharedHost) -> Dict[str, str]:
     path = f"{Path(PROGRAM).parent}:{host.environment['PATH']}"
+    return {**host.environment, "PATH": path}
+
+
+@functools.lru_cache(None)
+def script() -> str:
+    """What lets bash complete."""
+    return subprocess.check_output([PROGRAM, "completion", "bash"], encoding="utf-8")
+
+
+def completed(host: SharedHost, *words: str) -> List[str]:
+    """What bash offers for the last word, after what it is told of how to put it in."""
     done = subprocess.run(
-        ["bash", "-c", CHOSEN, "bash", "vswitch", *words],
-        env={**host.environment, "PATH": path},
+        ["bash", "-c", CHOSEN, "bash", " ".join(("vswitch", *words))],
+        env={**environment(host), "SCRIPT": script()},
         capture_output=True,
         text=True,
     )
@@ -44,10 +63,97 @@ def completed(host: SharedHost, *words: str) -> List[str]:
         (["uplink", "lab", "down", "nic"], ["nic0", "nic1"]),
         (["mirror", "lab/web-1", "--to", "lab/web-"], ["lab/web-1", "lab/web-2"]),
         (["watch", "--kind", "l"], ["link"]),
+        (["apply", ""], ["default"]),
     ],
 )
 def test_names(lab: SharedHost, words: List[str], expected: List[str]) -> None:
     assert completed(lab, *words) == expected
+
+
+@pytest.mark.parametrize(
+    "words, expected",
+    [
+        (["set", "lab", "m"], ["nospace", "mtu=", "mac_learning=", "multicast="]),
+        (["set", "lab/web-1", "vlan=7", "forbids=promiscuous,f"], ["promiscuous,forged_transmits"]),
+        (["set", "lab/left", "f"], []),
+        (["set", "lab/web-1", "teaming.active=right,l"], ["right,left", "right,lag1"]),
+        (["set", "lab/web-1", "uplink=nic"], ["nic0", "nic1"]),
+        (["set", "nope/web-1", "te"], []),
+        (["add", "lab/new", "teaming.active=nic"], ["nic0", "nic1"]),
+        (["add", "new", "teaming.active="], []),
+    ],
+)
+def test_settings(lab: SharedHost, words: List[str], expected: List[str]) -> None:
+    assert completed(lab, *words) == expected
+
+
+@pytest.mark.parametrize(
+    "known, begun, expected",
+    [
+        (_table.SWITCH, "", [f"{name}=" for name in _table.SWITCH]),
+        (_table.PORT, "vlan.t", ["vlan.trunk="]),
+        (_table.PORT, "t", ["teaming=", "transmit_uplink="]),
+        (_table.PORT, "tr", ["transmit_uplink="]),
+        (_table.PORT, "tru", ["trunk="]),
+        (_table.SWITCH, "multicast=", ["legacy", "snooping", "igmp", "mld"]),
+        (_table.SWITCH, "disabled=", ["true", "false"]),
+        (_table.SWITCH, "teaming.balance=e", ["explicit"]),
+        (_table.PORT, "balance=e", ["explicit"]),
+        (_table.PORT, "forbids=", ["promiscuous", "mac_changes", "forged_transmits"]),
+        (_table.PORT, "forbids=mac_changes,", ["promiscuous", "forged_transmits"]),
+        (_table.PORT, "private=", ["true", "false"]),
+        (_table.PORT, "standby=b,", ["a"]),
+        (_table.PORT, "uplink=", ["a", "b"]),
+        (_table.PORT, "alias=", []),
+        (_table.SWITCH, "mtu=", []),
+        (_table.SWITCH, 'teaming={"balance": ', []),
+    ],
+)
+def test_what_may_follow(
+    known: Dict[str, _table.Property], begun: str, expected: List[str]
+) -> None:
+    offered = assignments.offered(known, begun, lambda: ["a", "b"])
+    before = begun[: max(begun.rfind("="), begun.rfind(",")) + 1]
+    assert [one for one in offered if one.startswith(begun)] == [before + one for one in expected]
+
+
+def test_a_setting_that_there_is_not_has_no_values() -> None:
+    with pytest.raises(click.UsageError, match="no setting 'nope'"):
+        list(assignments.offered(_table.SWITCH, "nope=", list))
+
+
+TYPED = r"""
+eval "$SCRIPT"
+bind 'set enable-bracketed-paste off'
+PS1= PS2=
+"""
+
+
+def test_bash_puts_in_what_is_offered(lab: SharedHost) -> None:
+    """The key for completion is pressed after some letters of each word; the line is shown then."""
+    terminal, other = pty.openpty()
+    typed = "vswitch set lab/web-1 forb\tp\tupl\tr\t\x01echo typed: \n"
+    with subprocess.Popen(
+        ["bash", "--norc", "--noprofile", "-i"],
+        env={**environment(lab), "TERM": "dumb", "SCRIPT": script()},
+        stdin=other,
+        stdout=other,
+        stderr=other,
+    ) as shell:
+        os.close(other)
+        os.write(terminal, (TYPED + typed + "exit\n").encode("ascii"))
+        said = read_all(terminal)
+    assert shell.returncode == 0
+    assert "\ntyped: vswitch set lab/web-1 forbids=promiscuous uplink=right" in said
+
+
+def read_all(terminal: int) -> str:
+    """What is written until nobody writes there any more."""
+    said = b""
+    with open(terminal, "rb", buffering=0) as file, contextlib.suppress(OSError):
+        while True:
+            said += file.read(4096)
+    return said.decode("ascii").replace("\r", "")
 
 
 @pytest.mark.parametrize("shell", ["bash", "zsh", "fish"])

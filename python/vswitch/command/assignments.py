@@ -8,7 +8,7 @@ stand alone.
 
 import json
 import re
-from typing import Any, Callable, Dict, Iterable, List, Optional, Tuple
+from typing import Any, Callable, Dict, Iterable, Iterator, List, Optional, Tuple
 
 import click
 
@@ -17,9 +17,11 @@ from vswitch._table import Form, Property
 from vswitch.values import Words
 from vswitch.words import SYNONYMS, DocumentError
 
-__all__ = ["find_setting", "read"]
+__all__ = ["find_setting", "offered", "read"]
 
 Known = Dict[str, Property]
+
+_BOOLEANS = {"true": True, "false": False}
 
 
 def read(
@@ -51,6 +53,54 @@ def read(
     return wanted
 
 
+def offered(known: Known, begun: str, uplinks: Callable[[], Iterable[str]]) -> Iterator[str]:
+    """What an assignment may be of which so much is there: names first, then words of its value.
+
+    `uplinks` has the names that the host has for them.
+    """
+    name, equals, text = begun.partition("=")
+    if not equals:
+        yield from (f"{one}=" for one in _names(known, begun))
+        return
+    setting, member = _resolve(known, name)
+    form = _alone(member or setting.form)
+    before, comma, _ = text.rpartition(",") if form["form"] in ("bits", "list") else ("", "", text)
+    said = _parts(before)
+    for word in _values(form, uplinks):
+        if word not in said:
+            yield f"{name}={before}{comma}{word}"
+
+
+def _names(known: Known, begun: str) -> List[str]:
+    """Settings; where none begins so, their members, which may stand alone."""
+    settings = [name for name in known if name.startswith(begun)]
+    if settings:
+        return settings
+    setting, dot, _ = begun.rpartition(".")
+    members = [(of.name, member["name"]) for of, member in _members(known)]
+    return [setting + dot + member for of, member in members if setting in ("", of)]
+
+
+def _members(known: Known) -> Iterator[Tuple[Property, Form]]:
+    """The members of settings, each with its setting."""
+    for setting in known.values():
+        for member in setting.form["members"] if setting.form["form"] == "record" else ():
+            yield setting, member
+
+
+def _values(form: Form, uplinks: Callable[[], Iterable[str]]) -> Iterable[str]:
+    """The words that a value has, or an element of it."""
+    kind = form["form"]
+    if kind == "list":
+        return _values(form["element"], uplinks)
+    if kind == "boolean":
+        return _BOOLEANS
+    if form.get("names") == "uplinks":
+        return uplinks()
+    choices: Dict[str, int] = form.get("choices", {})
+    return choices
+
+
 def find_setting(known: Known, name: str) -> Optional[Property]:
     return known.get(name) or known.get(SYNONYMS.get(name, name))
 
@@ -62,10 +112,9 @@ def _resolve(known: Known, name: str) -> Tuple[Property, Optional[Form]]:
         return setting, None
     of, _, inner = name.rpartition(".")
     found = [
-        (one, member)
-        for one in known.values()
-        for member in (one.form["members"] if one.form["form"] == "record" else ())
-        if member["name"] == inner and of in ("", one.name)
+        (setting, member)
+        for setting, member in _members(known)
+        if member["name"] == inner and of in ("", setting.name)
     ]
     if len(found) == 1:
         return found[0]
@@ -80,14 +129,20 @@ def _whole(form: Form, held: Words) -> Dict[str, Words]:
     return dict(held) if isinstance(held, dict) else {form["alone"]: held}
 
 
+def _alone(form: Form) -> Form:
+    """Of a record, the member that may stand for it."""
+    if "alone" not in form:
+        return form
+    return next(one for one in form["members"] if one["name"] == form["alone"])
+
+
 def _from_text(form: Form, text: str, path: str) -> Any:
     """The value that a text says. What says none is left to those who check values."""
     kind = form["form"]
     if kind in ("record", "one_of", "list") and text.startswith(("{", "[")):
         return _from_json(text, path)
-    if kind == "record" and "alone" in form:
-        alone = next(one for one in form["members"] if one["name"] == form["alone"])
-        return _from_text(alone, text, path)
+    if "alone" in form:
+        return _from_text(_alone(form), text, path)
     if kind in ("record", "one_of"):
         names = ", ".join(one["name"] for one in form["members"])
         raise DocumentError(path, f"{text!r} is not a JSON object with some of {names}")
@@ -98,7 +153,7 @@ def _from_text(form: Form, text: str, path: str) -> Any:
     if kind == "number" and re.fullmatch("[+-]?[0-9]{1,20}", text):
         return int(text)
     if kind == "boolean":
-        return {"true": True, "false": False}.get(text, text)
+        return _BOOLEANS.get(text, text)
     return text
 
 

@@ -80,7 +80,10 @@ def _members(known: Dict[str, _table.Property], wanted: Members) -> Members:
 def set_(
     place: str = PLACE,
     settings: List[str] = typer.Argument(
-        ..., metavar="NAME=VALUE...", help="Settings, or members of them."
+        ...,
+        metavar="NAME=VALUE...",
+        help="Settings, or members of them.",
+        autocompletion=completing.new_settings,
     ),
 ) -> None:
     """Change settings of a switch or a port.
@@ -120,7 +123,11 @@ def add(
         ..., metavar="SWITCH[/PORT]", help="What is to be there.", autocompletion=completing.things
     ),
     settings: Optional[List[str]] = typer.Argument(
-        None, metavar="[NAME=VALUE...]", help="Settings, as of set.", show_default=False
+        None,
+        metavar="[NAME=VALUE...]",
+        help="Settings, as of set.",
+        show_default=False,
+        autocompletion=completing.first_settings,
     ),
     identifier: Optional[str] = typer.Option(
         None, metavar="ID", help="Of a switch: its identifier."

@@ -6,20 +6,30 @@ host, there are none.
 
 import enum
 import os
-from typing import Iterable, Iterator, List, Optional
+from typing import Dict, Iterable, Iterator, List, Optional
 
 import click
 import typer
 from click.shell_completion import get_completion_class, shell_complete
 
 from libvswitch.errors import HostError
-from vswitch.command import places
+from vswitch import _table
+from vswitch.command import assignments, places, shells
 from vswitch.host import Host
+from vswitch.switch import Switch
 from vswitch.watch import KINDS
 
-__all__ = ["completion", "is_asked", "kinds", "settings", "switches", "things", "uplinks"]
-
-_VARIABLE = "_VSWITCH_COMPLETE"
+__all__ = [
+    "completion",
+    "first_settings",
+    "is_asked",
+    "kinds",
+    "new_settings",
+    "settings",
+    "switches",
+    "things",
+    "uplinks",
+]
 
 
 class Shell(str, enum.Enum):
@@ -39,25 +49,22 @@ def completion(
     root = click.get_current_context().find_root()
     made = get_completion_class(shell.value)
     assert made is not None and root.info_name is not None
-    try:
-        print(made(root.command, {}, root.info_name, _VARIABLE).source())
-    except RuntimeError as error:
-        raise HostError(str(error)) from None
+    print(made(root.command, {}, root.info_name, shells.VARIABLE).source(), end="")
 
 
 def is_asked(group: click.Group, name: str) -> bool:
     """Whether a shell asks, which its script does through the environment; it is told then."""
-    asked = os.environ.get(_VARIABLE)
+    asked = os.environ.get(shells.VARIABLE)
     if asked is None:
         return False
-    shell_complete(group, {}, name, _VARIABLE, asked)
+    shell_complete(group, {}, name, shells.VARIABLE, asked)
     return True
 
 
 def _matching(names: Iterable[str], incomplete: str) -> List[str]:
     try:
         return [name for name in names if name.startswith(incomplete)]
-    except (HostError, OSError):
+    except (HostError, OSError, click.UsageError):
         return []
 
 
@@ -103,6 +110,48 @@ def settings(context: click.Context, incomplete: str) -> List[str]:
 def _settings(place: Optional[str]) -> Iterator[str]:
     if place is not None:
         yield from places.find(Host(), place)._settings
+
+
+def new_settings(context: click.Context, incomplete: str) -> List[str]:
+    """What settings of a switch or a port may be set to."""
+    return _matching(_new_settings(context.params.get("place"), incomplete), incomplete)
+
+
+def _new_settings(place: Optional[str], incomplete: str) -> Iterator[str]:
+    if place is not None:
+        found = places.find(Host(), place)
+        switch = found if isinstance(found, Switch) else found.switch
+        yield from _offered(found._settings, switch, incomplete)
+
+
+def first_settings(context: click.Context, incomplete: str) -> List[str]:
+    """Likewise for a switch or a port that is to be added."""
+    return _matching(_first_settings(context.params.get("place"), incomplete), incomplete)
+
+
+def _first_settings(place: Optional[str], incomplete: str) -> Iterator[str]:
+    if place is not None:
+        host = Host()
+        alias, id_ = places.split(host, place)
+        known = _table.PORT if id_ else _table.SWITCH
+        yield from _offered(known, host.switches.get(alias), incomplete)
+
+
+def _offered(
+    known: Dict[str, _table.Property], switch: Optional[Switch], incomplete: str
+) -> Iterator[str]:
+    return assignments.offered(known, incomplete, lambda: _names_of_uplinks(switch))
+
+
+def _names_of_uplinks(switch: Optional[Switch]) -> Iterator[str]:
+    """Its uplinks, and what stands for some."""
+    if switch is None:
+        return
+    yield from switch.uplinks
+    for port in switch.uplink_ports.values():
+        yield port.name
+    for lag in switch.lags:
+        yield lag.name
 
 
 def kinds(incomplete: str) -> List[str]:
