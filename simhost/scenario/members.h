@@ -31,7 +31,7 @@ inline constexpr std::string_view kObserved = "observed";
 
 /// The members of a document and of its larger objects, beside those of settings.
 inline constexpr auto kDocumentKeys = std::to_array<std::string_view>(
-    {"clock", "uplinks", "runtime_options", "mac_learning", "switches", "faults"});
+    {"clock", "uplinks", "runtime_options", "mac_learning", "switches", "faults", kObserved});
 inline constexpr auto kSwitchKeys = std::to_array<std::string_view>(
     {"alias", "id", "portset", "max_ports", "persistent", "version", "running", "uplink_ports",
      "uplinks", "lags", "addresses", "counters", "mirror_counters", "properties", "host_properties",
@@ -39,7 +39,7 @@ inline constexpr auto kSwitchKeys = std::to_array<std::string_view>(
 inline constexpr auto kPortKeys = std::to_array<std::string_view>(
     {"id", "external_id", "addresses", "groups", "counters", "properties", kObserved});
 inline constexpr auto kUplinkPortKeys =
-    std::to_array<std::string_view>({"id", "uplink", "properties"});
+    std::to_array<std::string_view>({"id", "uplink", "properties", kObserved});
 
 /// A text in a field.
 template <auto kField>

@@ -239,6 +239,20 @@ TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
       << "with the numbers of ports and groups";
 }
 
+TEST_F(Scenario, WhatADescriptionAddsIsReadOverWhereverItIs) {
+  auto const observed = R"("observed": {"anything": [1, {"alias": 2}]})";
+  EXPECT_EQ(refusal(fmt::format(R"({{{0},
+    "uplinks": [{{"name": "nic0", {0}}}, {{"name": "nic1"}}],
+    "mac_learning": {{"limit": 7}},
+    "switches": [{{"alias": "s", {0}, "uplink_ports": [{{"id": "up", "uplink": "nic0", {0}}}],
+      "uplinks": ["nic1"], "lags": [{{"name": "lag", "uplinks": ["nic0"], {0}}}],
+      "addresses": [{{"mac": "02:00:00:00:00:01", {0}}}],
+      "ports": [{{"id": "p", {0}, "groups": [{{"address": "239.1.1.1", {0}}}]}}]}}],
+    "faults": [{{"call": "VSDVS_SetMTU", "status": "QEX_BUSY", {0}}}]}})",
+                                observed)),
+            "");
+}
+
 TEST_F(Scenario, AnUplinkPortIsSetAndDescribedByNames) {
   Transaction transaction(store, Access::write);
   auto const document = nlohmann::ordered_json::parse(R"({"clock": {"stopped": true}, "switches": [{
