@@ -184,11 +184,12 @@ void apply_switch(Transaction &transaction, Node const &node) {
   auto const owner = PropertyOwner::global(key);
   apply_raw(transaction, owner, SettingOwner::of_switch, node);
   apply_raw(transaction, PropertyOwner::host(key), SettingOwner::of_host, node, "host_properties");
+  // Before ports of either kind: their VLANs may be in the switch's private VLANs.
+  apply_named(transaction, owner, SettingOwner::of_switch, node);
   for_each_in(node, "uplink_ports",
               [&](Node const &item) { apply_uplink_port(transaction, key, item); });
   attach_uplinks(transaction, key, node);
   for_each_in(node, "lags", [&](Node const &item) { apply_lag(transaction, key, item); });
-  apply_named(transaction, owner, SettingOwner::of_switch, node);
   for_each_in(node, "ports", [&](Node const &item) { apply_port(transaction, key, item); });
   apply_addresses(transaction, {.switch_key = key, .port = std::nullopt}, node);
   apply_counters(transaction, {.switch_key = key}, node);

@@ -277,6 +277,13 @@ TEST_F(Scenario, AnUplinkPortIsSetAndDescribedByNames) {
   EXPECT_EQ(simhost::scenario::host_to_json(transaction), described);
 }
 
+TEST_F(Scenario, AnUplinkPortMayBeInThePrivateVlansOfItsSwitch) {
+  EXPECT_EQ(refusal_in_switch(R"("private_vlans": [
+      {"primary": 100, "secondary": 101, "type": "isolated"}],
+    "uplink_ports": [{"id": "up", "vlan": {"id": 101, "private": true}}])"),
+            "");
+}
+
 TEST_F(Scenario, AnUplinkPortHasNotWhatOtherPortsHave) {
   auto const refusal_in_uplink_port = [&](std::string const &member) {
     return refusal_in_switch(R"("uplink_ports": [{"id": "left", )" + member + "}]");
