@@ -2,7 +2,7 @@
 
 import struct
 import typing
-from typing import Optional, Tuple
+from typing import Dict, Optional, Tuple
 
 import libvswitch as _vs
 from libvswitch import checked
@@ -19,7 +19,7 @@ _SOURCE_MODES = {
     _vs.VS_MCAST_SRC_IP_FILTER_MODE_INCLUDE: "include",
     _vs.VS_MCAST_SRC_IP_FILTER_MODE_EXCLUDE: "exclude",
 }
-_GROUP_FORMS = (Multicast.LEGACY, Multicast.IGMP, Multicast.MLD)
+GROUP_FORMS = (Multicast.LEGACY, Multicast.IGMP, Multicast.MLD)
 _COUNTERS = tuple(PortStats.__dataclass_fields__)[:16]
 
 
@@ -46,23 +46,33 @@ def lags(switch: "Switch") -> Tuple[Lag, ...]:
 
 def groups(port: "Port") -> Tuple[Group, ...]:
     alias, number = port.switch.alias, port.number
-    found = []
-    for mode in _GROUP_FORMS:
-        for address in checked.VSQEX_GetMcastFilters(alias, number, mode):
-            try:
-                told = checked.VSQEX_GetMcastFilterStats(alias, number, mode, address)
-            except NotFound:
-                continue  # it has left it since
-            source_mode = _SOURCE_MODES.get(told.srcIPFilterMode, str(told.srcIPFilterMode))
-            found.append(Group(address, told.version, source_mode, told.entries, told.vni))
-    return tuple(found)
+    return tuple(
+        group
+        for mode in GROUP_FORMS
+        for address in checked.VSQEX_GetMcastFilters(alias, number, mode)
+        for group in group_of(alias, number, mode, address)
+    )
+
+
+def group_of(switch: str, number: int, mode: Multicast, address: str) -> Tuple[Group, ...]:
+    """The group of that address, none if the port has left it since."""
+    try:
+        told = checked.VSQEX_GetMcastFilterStats(switch, number, mode, address)
+    except NotFound:
+        return ()
+    source_mode = _SOURCE_MODES.get(told.srcIPFilterMode, str(told.srcIPFilterMode))
+    return (Group(address, told.version, source_mode, told.entries, told.vni),)
 
 
 def port_stats(port: "Port") -> PortStats:
     learned = checked.VSQEX_GetPortMACLearningStats(*port.owner).asdict()
-    data = port.read_property(_vs.QEX_NEBPROP_PORT_STATISTICS)
-    counted = dict(zip(_COUNTERS, struct.unpack(f"={len(_COUNTERS)}Q", data)))
+    counted = counted_in(port.read_property(_vs.QEX_NEBPROP_PORT_STATISTICS))
     return PortStats(**counted, **learned)
+
+
+def counted_in(statistics: bytes) -> Dict[str, int]:
+    """The counters that the property has."""
+    return dict(zip(_COUNTERS, struct.unpack(f"={len(_COUNTERS)}Q", statistics)))
 
 
 def switch_stats(switch: "Switch") -> SwitchStats:
