@@ -3,6 +3,7 @@
 A table is the header, the sessions, and the entities of all of them.
 """
 
+import contextlib
 from typing import Any, Dict, Tuple
 
 import libvswitch as _vs
@@ -134,7 +135,22 @@ def mirror_bytes(mirrors: Tuple[Mirror, ...]) -> bytes:
 
 
 def mirrors_from(data: bytes) -> Tuple[Mirror, ...]:
-    """From the bytes of a table, whose counts are not believed past its end."""
+    """From the bytes of a table."""
+    return tuple(map(mirror_from, _sessions_from(data)))
+
+
+def known_mirrors_from(data: bytes) -> Tuple[Mirror, ...]:
+    """Likewise, of a table of which words say all."""
+    sessions = _sessions_from(data)
+    mirrors = tuple(map(mirror_from, sessions))
+    with contextlib.suppress(KeyError):
+        if tuple(map(session_of, mirrors)) == sessions:
+            return mirrors
+    raise ValueError("a mirror session has what no word says")
+
+
+def _sessions_from(data: bytes) -> Tuple[DVMirrorSession, ...]:
+    """The sessions of a table, whose counts are not believed past its end."""
     header = _SIZES["DVMirrorSessionTable"]
     if len(data) < header:
         raise ValueError(f"a table of mirror sessions has {header} bytes, not {len(data)}")
@@ -146,6 +162,6 @@ def mirrors_from(data: bytes) -> Tuple[Mirror, ...]:
         ends += table.numEntities * _SIZES["DVMirrorEntity"]
         if header + ends != len(data):
             raise ValueError(f"a table of mirror sessions says {header + ends} bytes of itself")
-        return tuple(map(mirror_from, _packed_values.read_DVMirrorSessionTable(table)))
+        return _packed_values.read_DVMirrorSessionTable(table)
     finally:
         _vs.free_dvmirror_session_table(table)

@@ -45,23 +45,30 @@ def _named(scope: str, under: str) -> Dict[str, Property]:
                 for other in PROPERTIES
                 if other["scope"] == scope and other.get("part_of", {}).get("name") == known["name"]
             ]
-            found[known[under]] = Property(
-                known[under],
-                scope,
-                known["key"],
-                tuple(companions),
-                PROPERTY_TYPES[known["type"]],
-                known["value"],
-                known["bytes"],
-                known.get("default"),
-                known["words"],
-            )
+            found[known[under]] = _property(known, known[under], tuple(companions))
     return found
+
+
+def _property(known: Dict[str, Any], name: str, companions: Tuple[str, ...]) -> Property:
+    return Property(
+        name,
+        known["scope"],
+        known["key"],
+        companions,
+        PROPERTY_TYPES[known["type"]],
+        known["value"],
+        known["bytes"],
+        known.get("default"),
+        known["words"],
+    )
 
 
 SWITCH = _named("switch", "name")
 PORT = _named("port", "name")
 UPLINK_PORT = _named("port", "uplink_port_name")
+
+# All, those without a name too, which their keys stand for.
+BY_KEY = {known["key"]: _property(known, known["key"], ()) for known in PROPERTIES}
 
 # What the host works out by itself, and what no document has to say.
 COMPUTED: FrozenSet[str] = frozenset(known["key"] for known in PROPERTIES if known["computed"])

@@ -13,6 +13,7 @@ from typing import Any, Callable, Dict, List, Optional, Tuple
 
 from libvswitch.enums import LinkState, MacType
 from vswitch import _settings, _table, words as _words
+from vswitch._of_snapshot import settable
 from vswitch._properties import RUNTIME_OPTIONS
 from vswitch.options import read_option
 from vswitch.uplink import link_state
@@ -24,6 +25,7 @@ Document = typing.Mapping[str, Any]
 # What scenario documents tell a simulated host, and no call tells any.
 _NO_CALL = {"clock", "faults", "groups", "counters", "mirror_counters", "stats"}
 _FIXED = ("id", "portset", "max_ports", "version")
+_MOST_24 = 2**24 - 1
 _MOST_32 = 2**32 - 1
 
 
@@ -239,7 +241,7 @@ def _thing(held: _Object, known: Dict[str, _table.Property]) -> Dict[str, Any]:
     return {"path": held.path, "settings": settings, "properties": properties}
 
 
-def _mac(given: object, path: str) -> MacWish:
+def read_mac(given: object, path: str) -> MacWish:
     held = _Object(given, path, ("mac", "vlan", "vni", "type", "ages", "age", "state"))
     absent = "state" in held and bool(held.get("state", _words.choice, (ABSENT,)))
     types = [str(one) for one in (MacType.STATIC, MacType.USER, MacType.LEARNED)]
@@ -249,12 +251,12 @@ def _mac(given: object, path: str) -> MacWish:
         held.need("mac", _words.mac),
         MacType[held.get("type", _words.choice, types, default="learned").upper()],
         held.get("vlan", _words.number, 0, 4094, default=0),
-        held.get("vni", _words.number, 0, _MOST_32, default=0),
+        held.get("vni", _words.number, 0, _MOST_24, default=0),
     )
 
 
 def _macs(given: object, path: str) -> Tuple[MacWish, ...]:
-    found = [_mac(one, f"{path}[{at}]") for at, one in enumerate(_words.items(given, path))]
+    found = [read_mac(one, f"{path}[{at}]") for at, one in enumerate(_words.items(given, path))]
     return tuple(one for one in found if one.type is not MacType.LEARNED or one.absent)
 
 
@@ -354,9 +356,13 @@ def _host_learning(given: object, path: str) -> MacLearning:
     return read
 
 
-def read(document: Document) -> HostWish:
-    """What a document wants; DocumentError with the path of the key that is wrong."""
+def read(document: Document, whole: bool = False) -> HostWish:
+    """What a document wants; DocumentError with the path of the key that is wrong.
+
+    With `whole` it says all of a host, which a snapshot may not know.
+    """
     given = dict(document) if isinstance(document, typing.Mapping) else document
+    given = settable(given, whole)
     held = _Object(given, "", ("uplinks", "runtime_options", "mac_learning", "switches"))
     return HostWish(
         "",

@@ -104,6 +104,16 @@ class Host:
         """The host as a document: ready for JSON, in the words of scenario documents."""
         return _describing.host_state(self)
 
+    def snapshot(self) -> Dict[str, Words]:
+        """The host as a scenario document from which a simulated host starts as its clone.
+
+        What a call refuses, what no document says and what no call tells is listed under
+        `observed`.
+        """
+        from vswitch import snapshot
+
+        return snapshot.snapshot(self)
+
     # Its own settings
 
     @property

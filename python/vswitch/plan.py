@@ -54,7 +54,7 @@ class Plan:
 
     def __init__(self, host: "Host", document: Document, whole: bool = False) -> None:
         self._host = host
-        self._wish = read(document)
+        self._wish = read(document, whole)
         self._whole = whole
         self._actions()
 

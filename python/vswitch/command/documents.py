@@ -13,7 +13,7 @@ from vswitch.command.session import host, is_json
 from vswitch.plan import Plan
 from vswitch.words import DocumentError
 
-__all__ = ["apply", "backup", "diff", "restore"]
+__all__ = ["apply", "backup", "diff", "restore", "snapshot"]
 
 _FILE = typer.Argument(
     ...,
@@ -63,11 +63,22 @@ def apply(
 
 def backup() -> None:
     """Write the whole host as a document: YAML, or JSON with --json."""
-    state = host().state()
+    from vswitch import snapshot
+
+    document = snapshot.backup(host())
     if is_json():
-        output.write_json(state)
+        output.write_json(document)
     else:
-        print(files.write(state), end="")
+        print(files.write(document), end="")
+
+
+def snapshot() -> None:
+    """Write the whole host as a scenario document, JSON, from which a clone of it starts.
+
+    SIMHOST_SCENARIO names it to a simulated host. What a call refuses, what no document says and
+    what no call tells is listed in it under observed.
+    """
+    output.write_json(host().snapshot())
 
 
 def restore(file: Path = _FILE, dry_run: bool = _DRY_RUN) -> None:

@@ -40,6 +40,7 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "confirm": confirming.confirm,
     "backup": documents.backup,
     "restore": documents.restore,
+    "snapshot": documents.snapshot,
     "watch": watching.watch,
     "mirror": watching.mirror,
     "drill": watching.drill,
