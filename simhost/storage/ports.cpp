@@ -22,13 +22,13 @@ PortNumber number_at(Query const &row, int column) {
 Port port_at(Query const &row) {
   return {.number = number_at(row, 0),
           .switch_key = SwitchKey{row.integer(1)},
-          .identifier = row.text(2),
+          .identifier = row.name(2),
           .kind = row.flag(3) ? PortKind::uplink : PortKind::client};
 }
 
 // Of a row that SELECT_UPLINK finds.
 Uplink any_uplink_at(Query const &row) {
-  Uplink uplink{.name = row.text(0), .port = std::nullopt};
+  Uplink uplink{.name = row.name(0), .port = std::nullopt};
   if (!row.is_null(1)) {
     uplink.port = number_at(row, 1);
   }
@@ -36,7 +36,7 @@ Uplink any_uplink_at(Query const &row) {
 }
 
 std::string name_at(Query const &row) {
-  return row.text(0);
+  return row.name(0);
 }
 
 }  // namespace
@@ -165,7 +165,7 @@ std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switc
                "SELECT uplink.name, port.number FROM port JOIN uplink ON uplink.port = port.number"
                " WHERE port.switch = ? AND port.is_uplink ORDER BY port.number");
   return select.with(switch_key).all([](Query const &row) {
-    return AttachedUplink{.name = row.text(0), .port = number_at(row, 1)};
+    return AttachedUplink{.name = row.name(0), .port = number_at(row, 1)};
   });
 }
 

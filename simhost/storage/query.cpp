@@ -104,6 +104,14 @@ std::string Query::text(int column) const {
   return text;
 }
 
+std::string Query::name(int column) const {
+  auto name = text(column);
+  if (name.empty()) {
+    refuse(column, "no name");
+  }
+  return name;
+}
+
 std::vector<std::byte> Query::bytes(int column) const {
   auto const value = statement_.getColumn(column);
   if (!value.isBlob()) {

@@ -74,6 +74,8 @@ class Query {
   }
   /// Without a NUL in it.
   [[nodiscard]] std::string text(int column) const;
+  /// Likewise, and not empty.
+  [[nodiscard]] std::string name(int column) const;
   [[nodiscard]] std::vector<std::byte> bytes(int column) const;
   /// Of that length.
   [[nodiscard]] std::vector<std::byte> bytes(int column, std::size_t length) const;

@@ -27,9 +27,9 @@ std::string_view query_by(SwitchName kind) {
 // Of a row that SELECT_SWITCH finds.
 FoundSwitch switch_at(Query const &row) {
   return {.key = SwitchKey{row.integer(0)},
-          .row = {.alias = row.text(1),
-                  .identifier = row.text(2),
-                  .portset = row.text(3),
+          .row = {.alias = row.name(1),
+                  .identifier = row.name(2),
+                  .portset = row.name(3),
                   .max_ports = row.number<std::uint32_t>(4),
                   .version = row.number<std::uint32_t>(5),
                   .persistent = row.flag(6),

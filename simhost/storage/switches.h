@@ -24,6 +24,8 @@ struct Switch {
   std::uint32_t version;
   bool persistent;
   bool associated = true;  ///< runs on this host
+
+  bool operator==(Switch const &) const = default;
 };
 
 struct FoundSwitch {

@@ -127,6 +127,12 @@ TEST(DamagedState, SaysWhatIsWrongWithIt) {
            {"UPDATE link SET speed = 4294967296", "the column 'speed' holds 4294967296"},
            {"UPDATE property SET type = 3", "the column 'type' holds 3"},
            {"UPDATE switch SET max_ports = -1", "the column 'max_ports' holds -1"},
+           {"UPDATE switch SET alias = '' WHERE key = 1", "the column 'alias' holds no name"},
+           {"UPDATE switch SET identifier = '' WHERE key = 1",
+            "the column 'identifier' holds no name"},
+           {"UPDATE port SET identifier = '' WHERE number = 1",
+            "the column 'identifier' holds no name"},
+           {"UPDATE uplink SET name = '' WHERE position = 1", "the column 'name' holds no name"},
        }) {
     EXPECT_EQ(complaint_after(sql), complaint) << sql;
   }
