@@ -13,6 +13,7 @@
 #include "model/switches/switches.h"
 #include "model/uplinks/lags.h"
 #include "scenario/forms.h"
+#include "scenario/keys.h"
 #include "scenario/members.h"
 #include "scenario/scenario.h"
 #include "scenario/settings.h"
@@ -92,14 +93,13 @@ Json counters_to_json(Transaction &transaction, CounterOwner const &owner) {
 Json port_to_json(Transaction &transaction, storage::Port const &port) {
   auto const owner = PropertyOwner::port(port.switch_key, port.number);
   Place const place{.switch_key = port.switch_key, .port = port.number};
-  Json described{{"id", port.identifier}};
-  if (auto const external = storage::external_id_of(transaction, port.number); !external.empty()) {
-    described["external_id"] = external;
-  }
+  auto described = object_to_json(
+      kPortMembers, PortMembers{.id = port.identifier,
+                                .external_id = storage::external_id_of(transaction, port.number)});
   describe_named(described, transaction, owner, SettingOwner::of_port);
-  described["addresses"] = addresses_to_json(transaction, place);
-  described["groups"] = groups_to_json(transaction, port.number);
-  described["counters"] =
+  described[keys::addresses] = addresses_to_json(transaction, place);
+  described[keys::groups] = groups_to_json(transaction, port.number);
+  described[keys::counters] =
       counters_to_json(transaction, {.switch_key = port.switch_key, .port = port.number});
   describe_raw(described, transaction, owner, SettingOwner::of_port);
   Json observed{{"number", static_cast<std::uint32_t>(port.number)}};
@@ -115,11 +115,11 @@ Json port_to_json(Transaction &transaction, storage::Port const &port) {
 
 Json uplink_port_to_json(Transaction &transaction, storage::Port const &port) {
   auto const owner = owner_of(port);
-  Json described{{"id", port.identifier}};
+  auto described = object_to_json(
+      kUplinkPortMembers,
+      UplinkPortMembers{.id = port.identifier,
+                        .uplink = storage::uplink_at(transaction, port.number).value_or("")});
   describe_named(described, transaction, owner, SettingOwner::of_uplink_port);
-  if (auto const uplink = storage::uplink_at(transaction, port.number)) {
-    described["uplink"] = *uplink;
-  }
   describe_raw(described, transaction, owner, SettingOwner::of_uplink_port);
   return described;
 }
@@ -160,25 +160,21 @@ Json session_counters_to_json(Transaction &transaction, storage::SwitchKey key) 
 
 Json switch_to_json(Transaction &transaction, storage::FoundSwitch const &known) {
   auto const &key = known.key;
-  auto const &row = known.row;
   auto const owner = PropertyOwner::global(key);
-  Json described{{"alias", row.alias},           {"id", row.identifier},
-                 {"portset", row.portset},       {"max_ports", row.max_ports},
-                 {"persistent", row.persistent}, {"version", row.version},
-                 {"running", row.associated}};
-  described["uplink_ports"] = uplink_ports_to_json(transaction, key);
-  described["uplinks"] = each_to_json(storage::uplinks_of(transaction, key),
-                                      [](auto const &uplink) { return uplink.name; });
-  described["lags"] = each_to_json(lags_of(transaction, key), lag_to_json);
+  auto described = object_to_json(kSwitchMembers, known.row);
+  described[keys::uplink_ports] = uplink_ports_to_json(transaction, key);
+  described[keys::uplinks] = each_to_json(storage::uplinks_of(transaction, key),
+                                          [](auto const &uplink) { return uplink.name; });
+  described[keys::lags] = each_to_json(lags_of(transaction, key), lag_to_json);
   describe_named(described, transaction, owner, SettingOwner::of_switch);
-  described["ports"] = ports_to_json(transaction, key);
-  described["addresses"] =
+  described[keys::ports] = ports_to_json(transaction, key);
+  described[keys::addresses] =
       addresses_to_json(transaction, {.switch_key = key, .port = std::nullopt});
-  described["counters"] = counters_to_json(transaction, {.switch_key = key});
-  described["mirror_counters"] = session_counters_to_json(transaction, key);
+  described[keys::counters] = counters_to_json(transaction, {.switch_key = key});
+  described[keys::mirror_counters] = session_counters_to_json(transaction, key);
   describe_raw(described, transaction, owner, SettingOwner::of_switch);
   describe_raw(described, transaction, PropertyOwner::host(key), SettingOwner::of_host,
-               "host_properties");
+               keys::host_properties);
   return described;
 }
 
@@ -210,16 +206,17 @@ Json runtime_options_to_json(Transaction &transaction) {
 }  // namespace
 
 Json host_to_json(Transaction &transaction) {
-  Json host{{"clock", object_to_json(kClockMembers, clock_members(transaction))}};
-  host["uplinks"] = each_to_json(
+  Json host{{keys::clock, object_to_json(kClockMembers, clock_members(transaction))}};
+  host[keys::uplinks] = each_to_json(
       storage::all_uplinks(transaction),
       [&](storage::Uplink const &uplink) { return uplink_to_json(transaction, uplink); });
-  host["runtime_options"] = runtime_options_to_json(transaction);
-  host["mac_learning"] = object_to_json(kGlobalLearningMembers, global_mac_learning(transaction));
-  host["switches"] = each_to_json(
+  host[keys::runtime_options] = runtime_options_to_json(transaction);
+  host[keys::mac_learning] =
+      object_to_json(kGlobalLearningMembers, global_mac_learning(transaction));
+  host[keys::switches] = each_to_json(
       storage::all_switches(transaction),
       [&](storage::FoundSwitch const &known) { return switch_to_json(transaction, known); });
-  host["faults"] = each_to_json(waiting_faults(transaction), fault_to_json);
+  host[keys::faults] = each_to_json(waiting_faults(transaction), fault_to_json);
   return host;
 }
 

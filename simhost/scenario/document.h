@@ -54,7 +54,6 @@ class Node {
   [[nodiscard]] std::vector<Node> items() const;
 
   [[nodiscard]] bool flag() const;
-  static bool flag_of(Node const &node) { return node.flag(); }
   [[nodiscard]] std::string text() const;
   [[nodiscard]] std::int64_t integer(std::int64_t least, std::int64_t greatest) const;
   [[nodiscard]] std::uint64_t counter() const;

@@ -12,6 +12,7 @@
 #include "clock/clock.h"
 #include "model/plane.h"
 #include "model/properties/form.h"
+#include "model/switches/switches.h"
 #include "model/vlans/properties.h"
 #include "scenario/texts.h"
 #include "vswitch/lags.h"
@@ -26,20 +27,6 @@ inline constexpr std::size_t kUnbounded = SIZE_MAX;
 
 /// Of an uplink.
 inline constexpr std::string_view kName = "name";
-/// What a description adds to an object, and a reader passes over.
-inline constexpr std::string_view kObserved = "observed";
-
-/// The members of a document and of its larger objects, beside those of settings.
-inline constexpr auto kDocumentKeys = std::to_array<std::string_view>(
-    {"clock", "uplinks", "runtime_options", "mac_learning", "switches", "faults", kObserved});
-inline constexpr auto kSwitchKeys = std::to_array<std::string_view>(
-    {"alias", "id", "portset", "max_ports", "persistent", "version", "running", "uplink_ports",
-     "uplinks", "lags", "addresses", "counters", "mirror_counters", "properties", "host_properties",
-     "ports", kObserved});
-inline constexpr auto kPortKeys = std::to_array<std::string_view>(
-    {"id", "external_id", "addresses", "groups", "counters", "properties", kObserved});
-inline constexpr auto kUplinkPortKeys =
-    std::to_array<std::string_view>({"id", "uplink", "properties", kObserved});
 
 /// A text in a field.
 template <auto kField>
@@ -85,6 +72,57 @@ inline constexpr std::array kLinkMembers{
                  "how many of 100 frames are damaged"),
     form::member("driver", form::boolean<&Link::driver>(),
                  "whether the driver of the card is loaded"),
+};
+
+inline constexpr std::string_view kId = "id";
+
+/// A switch by itself. All of it but whether it runs is fixed once it exists.
+inline constexpr std::string_view kAlias = "alias";
+inline constexpr std::string_view kRunning = "running";
+inline constexpr std::array kSwitchMembers{
+    form::required_member(kAlias, text_member<&storage::Switch::alias>(), "its name"),
+    form::sparse(kId, text_member<&storage::Switch::identifier>(),
+                 "its identifier, chosen by the host unless given"),
+    form::sparse("portset", text_member<&storage::Switch::portset>(),
+                 "the name of its ports, chosen by the host unless given"),
+    form::member("max_ports", form::number<&storage::Switch::max_ports>(1, kGreatestMaxPorts),
+                 "how many ports it may have, uplink ports not counted"),
+    form::member("persistent", form::boolean<&storage::Switch::persistent>(),
+                 "whether it outlasts a restart"),
+    form::member("version", form::number<&storage::Switch::version>(0, k32Bits),
+                 "its version, the host's usual one for 0"),
+    form::member(kRunning, form::boolean<&storage::Switch::associated>(),
+                 "whether it runs on this host"),
+};
+inline storage::Switch new_switch() {
+  return {.alias = {},
+          .identifier = {},
+          .portset = {},
+          .max_ports = kDefaultMaxPorts,
+          .version = kDefaultVersion,
+          .persistent = true};
+}
+
+struct PortMembers {
+  std::string id = {};
+  std::string external_id = {};
+};
+inline constexpr std::string_view kExternalId = "external_id";
+inline constexpr std::array kPortMembers{
+    form::required_member(kId, text_member<&PortMembers::id>(), "its identifier"),
+    form::sparse(kExternalId, text_member<&PortMembers::external_id>(),
+                 "what another system calls it"),
+};
+
+struct UplinkPortMembers {
+  std::string id = {};
+  std::string uplink = {};
+};
+inline constexpr std::string_view kUplink = "uplink";
+inline constexpr std::array kUplinkPortMembers{
+    form::required_member(kId, text_member<&UplinkPortMembers::id>(), "its identifier"),
+    form::sparse(kUplink, text_member<&UplinkPortMembers::uplink>(),
+                 "the uplink of the host that it is to have"),
 };
 
 struct LagMembers {

@@ -9,18 +9,10 @@
 #include "base/outcomes.h"
 #include "scenario/document.h"
 #include "scenario/forms.h"
-#include "scenario/members.h"
+#include "scenario/keys.h"
 #include "scenario/texts.h"
 
 namespace simhost::scenario {
-
-inline std::string text_of_node(Node const &node) {
-  return node.text();
-}
-
-inline std::uint32_t number_of_32_bits(Node const &node) {
-  return static_cast<std::uint32_t>(node.integer(0, k32Bits));
-}
 
 /// Makes of the object what a document says of its members. The document may also have what a
 /// description adds.

@@ -5,6 +5,7 @@
 #include "model/options/runtime_options.h"
 #include "model/properties/registry.h"
 #include "scenario/forms.h"
+#include "scenario/keys.h"
 #include "scenario/members.h"
 #include "scenario/settings.h"
 
@@ -98,16 +99,22 @@ Json object_to_json(std::span<Member const> members, Object const *unless_given)
 
 Json objects_to_json() {
   Link const link;
+  auto const made = new_switch();
+  PortMembers const port;
+  UplinkPortMembers const uplink_port;
   auto const address = new_address();
   McastGroup const group{};
   FaultMembers const fault;
-  return {{"clock", object_to_json<ClockMembers>(kClockMembers, nullptr)},
-          {"uplinks", object_to_json(kLinkMembers, &link)},
-          {"mac_learning", object_to_json(kGlobalLearningMembers, &kGlobalLearning)},
-          {"lags", object_to_json<LagMembers>(kLagMembers, nullptr)},
-          {"addresses", object_to_json(kAddressMembers, &address)},
-          {"groups", object_to_json(kGroupMembers, &group)},
-          {"faults", object_to_json(kFaultMembers, &fault)}};
+  return {{keys::clock, object_to_json<ClockMembers>(kClockMembers, nullptr)},
+          {keys::uplinks, object_to_json(kLinkMembers, &link)},
+          {keys::mac_learning, object_to_json(kGlobalLearningMembers, &kGlobalLearning)},
+          {keys::switches, object_to_json(kSwitchMembers, &made)},
+          {keys::ports, object_to_json(kPortMembers, &port)},
+          {keys::uplink_ports, object_to_json(kUplinkPortMembers, &uplink_port)},
+          {keys::lags, object_to_json<LagMembers>(kLagMembers, nullptr)},
+          {keys::addresses, object_to_json(kAddressMembers, &address)},
+          {keys::groups, object_to_json(kGroupMembers, &group)},
+          {keys::faults, object_to_json(kFaultMembers, &fault)}};
 }
 
 }  // namespace
@@ -117,11 +124,11 @@ std::string reference() {
            {"runtime_options", Json::array()},
            {"objects", objects_to_json()},
            {"keys",
-            {{"document", kDocumentKeys},
-             {"switches", kSwitchKeys},
-             {"ports", kPortKeys},
-             {"uplink_ports", kUplinkPortKeys},
-             {"uplinks", {kName, kObserved}}}}};
+            {{"document", kDocumentParts},
+             {keys::switches, kSwitchParts},
+             {keys::ports, kPortParts},
+             {keys::uplink_ports, kUplinkPortParts},
+             {keys::uplinks, {kName, kObserved}}}}};
   for (auto const *const descriptor : descriptors()) {
     all["properties"].push_back(property_to_json(*descriptor));
   }

@@ -11,6 +11,7 @@
 #include "model/options/runtime_options.h"
 #include "model/plane.h"
 #include "qexapi/names.h"
+#include "scenario/members.h"
 #include "scenario/reading.h"
 #include "scenario/scenario_switches.h"
 #include "storage/store.h"
@@ -101,18 +102,18 @@ void apply_fault(Transaction &transaction, Node const &node) {
 void apply(Transaction &transaction, std::string_view document) {
   auto const json = parsed(document);
   Node const node(json);
-  node.only(kDocumentKeys);
-  if_there(node, "clock", [&](Node const &clock) { apply_clock(transaction, clock); });
-  for_each_in(node, "uplinks", [&](Node const &item) { apply_uplink(transaction, item); });
-  if_there(node, "runtime_options", [&](Node const &options) {
+  node.only(kDocumentParts);
+  if_there(node, keys::clock, [&](Node const &clock) { apply_clock(transaction, clock); });
+  for_each_in(node, keys::uplinks, [&](Node const &item) { apply_uplink(transaction, item); });
+  if_there(node, keys::runtime_options, [&](Node const &options) {
     for_each_member(options, [&](std::string const &name, Node const &value) {
       apply_runtime_option(transaction, name, value);
     });
   });
-  if_there(node, "mac_learning",
+  if_there(node, keys::mac_learning,
            [&](Node const &learning) { apply_global_learning(transaction, learning); });
-  for_each_in(node, "switches", [&](Node const &item) { apply_switch(transaction, item); });
-  for_each_in(node, "faults", [&](Node const &item) { apply_fault(transaction, item); });
+  for_each_in(node, keys::switches, [&](Node const &item) { apply_switch(transaction, item); });
+  for_each_in(node, keys::faults, [&](Node const &item) { apply_fault(transaction, item); });
 }
 
 }  // namespace simhost::scenario

@@ -211,7 +211,7 @@ void apply_named(Transaction &transaction, PropertyOwner const &owner, SettingOw
     if_there(node, name,
              [&](Node const &member) { apply_member(transaction, owner, descriptor, member); });
   });
-  apply_bytes(transaction, owner, node, "properties",
+  apply_bytes(transaction, owner, node, keys::properties,
               [&](std::string_view key) { return is_named(kind, key); });
 }
 

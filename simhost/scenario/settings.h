@@ -8,6 +8,7 @@
 
 #include "model/properties/descriptor.h"
 #include "scenario/document.h"
+#include "scenario/keys.h"
 #include "storage/properties.h"
 
 namespace simhost::scenario {
@@ -27,7 +28,7 @@ std::string_view name_at_uplink_port(std::string_view name);
 
 /// Sets what has no name but its key.
 void apply_raw(storage::Transaction &transaction, storage::PropertyOwner const &owner,
-               SettingOwner kind, Node const &node, std::string_view under = "properties");
+               SettingOwner kind, Node const &node, std::string_view under = keys::properties);
 /// Sets what members name; where the bytes are there too, they win, for a member may not be able to
 /// say them.
 void apply_named(storage::Transaction &transaction, storage::PropertyOwner const &owner,
@@ -42,6 +43,6 @@ void describe_named(Json &described, storage::Transaction &transaction,
 /// Adds the bytes of those that have no member that says them whole.
 void describe_raw(Json &described, storage::Transaction &transaction,
                   storage::PropertyOwner const &owner, SettingOwner kind,
-                  std::string_view under = "properties");
+                  std::string_view under = keys::properties);
 
 }  // namespace simhost::scenario

@@ -17,15 +17,12 @@
 #include "storage/properties.h"
 #include "storage/store.h"
 #include "storage/switches.h"
-#include "vswitch/mirror.h"
 
 namespace simhost {
 namespace {
 
 using storage::PropertyOwner;
 using storage::SwitchName;
-
-constexpr std::uint32_t kDefaultVersion = VS_YKT_NEB_VERSION_20;
 
 void check_name(std::string_view name, std::size_t longest) {
   if (name.size() > longest) {

@@ -11,6 +11,7 @@
 #include "model/properties/descriptor.h"
 #include "storage/ports.h"
 #include "vswitch/device.h"
+#include "vswitch/mirror.h"
 #include "vswitch/switch_info.h"
 
 namespace simhost {
@@ -18,6 +19,7 @@ namespace simhost {
 /// Ports of a switch, uplink ports not counted.
 inline constexpr std::uint32_t kDefaultMaxPorts = 128;
 inline constexpr std::uint32_t kGreatestMaxPorts = 65535;
+inline constexpr std::uint32_t kDefaultVersion = VS_YKT_NEB_VERSION_20;
 
 /// Bytes of names, without the NUL that the fixed texts of the callers' records have room for.
 inline constexpr std::size_t kLongestAlias = sizeof(VSInfo::dvsName) - 1;

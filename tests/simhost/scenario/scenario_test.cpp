@@ -175,14 +175,30 @@ TEST_F(Scenario, WhatExistsIsChangedAndTheRestIsLeftAlone) {
 
 TEST_F(Scenario, WhatASwitchWasMadeWithStays) {
   Transaction transaction(store, Access::write);
-  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
-  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "max_ports": 5}]})");
-  try {
-    simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "max_ports": 6}]})");
-    FAIL() << "it changed";
-  } catch (DocumentError const &error) {
-    EXPECT_STREQ(error.what(), "switches[0].max_ports: cannot change while the switch exists");
+  constexpr auto kMade = R"({"switches": [{
+    "alias": "s", "id": "i", "portset": "p", "max_ports": 5, "persistent": false, "version": 7,
+    "running": false}]})";
+  simhost::scenario::apply(transaction, kMade);
+  simhost::scenario::apply(transaction, kMade);
+  for (auto const &[key, value] : {std::pair{"id", R"("j")"},
+                                   {"portset", R"("q")"},
+                                   {"max_ports", "6"},
+                                   {"persistent", "true"},
+                                   {"version", "200"}}) {
+    try {
+      simhost::scenario::apply(
+          transaction, fmt::format(R"({{"switches": [{{"alias": "s", "{}": {}}}]}})", key, value));
+      ADD_FAILURE() << key << " changed";
+    } catch (DocumentError const &error) {
+      EXPECT_EQ(error.what(),
+                fmt::format("switches[0].{}: cannot change while the switch exists", key));
+    }
   }
+  // Whether it runs can change, and stays where a document does not say it.
+  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "mtu": 9000}]})");
+  EXPECT_FALSE(simhost::get_switch(transaction, "s").row.associated);
+  simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "running": true}]})");
+  EXPECT_TRUE(simhost::get_switch(transaction, "s").row.associated);
 }
 
 // Everything that a document can say, so that nothing is lost on the way there and back.
