@@ -6,6 +6,7 @@
 #include <string>
 
 #include "scenario/scenario.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -14,7 +15,7 @@ constexpr char const *kDefaultHost =
 #include "default_host.inc"
     ;
 
-void apply_file(storage::Transaction &transaction, std::string const &name) {
+void apply_file(storage::ChangingTransaction &transaction, std::string const &name) {
   std::ifstream file(name);
   std::string const document(std::istreambuf_iterator<char>(file), {});
   try {
@@ -29,7 +30,7 @@ void apply_file(storage::Transaction &transaction, std::string const &name) {
 
 }  // namespace
 
-void populate_fresh_host(storage::Transaction &transaction) {
+void populate_fresh_host(storage::ChangingTransaction &transaction) {
   char const *const named = std::getenv("SIMHOST_SCENARIO");
   if (named != nullptr && *named != '\0') {
     apply_file(transaction, named);

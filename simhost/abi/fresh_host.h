@@ -2,13 +2,13 @@
 #pragma once
 
 namespace simhost::storage {
-class Transaction;
+class ChangingTransaction;
 }
 
 namespace simhost {
 
 /// Fills an empty state with what the document says that SIMHOST_SCENARIO names; without one, with
 /// the default host. Throws scenario::DocumentError for a document that cannot be used.
-void populate_fresh_host(storage::Transaction &transaction);
+void populate_fresh_host(storage::ChangingTransaction &transaction);
 
 }  // namespace simhost

@@ -6,6 +6,7 @@
 
 #include "base/outcomes.h"
 #include "storage/running/clock.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -32,20 +33,20 @@ bool clock_is_stopped(storage::Transaction &transaction) {
   return storage::get_clock(transaction).stopped;
 }
 
-void stop_clock(storage::Transaction &transaction) {
+void stop_clock(storage::ChangingTransaction &transaction) {
   storage::put_clock(transaction, {.stopped = true, .value = clock_now(transaction)});
 }
 
-void run_clock(storage::Transaction &transaction) {
+void run_clock(storage::ChangingTransaction &transaction) {
   storage::put_clock(transaction,
                      {.stopped = false, .value = clock_now(transaction) - real_time()});
 }
 
-void reset_clock(storage::Transaction &transaction) {
+void reset_clock(storage::ChangingTransaction &transaction) {
   storage::put_clock(transaction, {.stopped = false, .value = ClockTime::zero()});
 }
 
-void step_clock(storage::Transaction &transaction, ClockTime by) {
+void step_clock(storage::ChangingTransaction &transaction, ClockTime by) {
   auto row = storage::get_clock(transaction);
   if (by < ClockTime::zero() || by > kEnd - shown_by(row)) {
     throw Refused(QEX_BAD_PARAM);
@@ -54,7 +55,7 @@ void step_clock(storage::Transaction &transaction, ClockTime by) {
   storage::put_clock(transaction, row);
 }
 
-void set_clock(storage::Transaction &transaction, ClockTime to) {
+void set_clock(storage::ChangingTransaction &transaction, ClockTime to) {
   if (to < ClockTime::zero() || to > kEnd) {
     throw Refused(QEX_BAD_PARAM);
   }

@@ -5,8 +5,9 @@
 #include <chrono>
 
 namespace simhost::storage {
+class ChangingTransaction;
 class Transaction;
-}
+}  // namespace simhost::storage
 
 namespace simhost {
 
@@ -16,15 +17,15 @@ using ClockTime = std::chrono::milliseconds;
 ClockTime clock_now(storage::Transaction &transaction);
 bool clock_is_stopped(storage::Transaction &transaction);
 /// Stops the clock at what it shows.
-void stop_clock(storage::Transaction &transaction);
+void stop_clock(storage::ChangingTransaction &transaction);
 /// Lets the clock run on from what it shows.
-void run_clock(storage::Transaction &transaction);
+void run_clock(storage::ChangingTransaction &transaction);
 /// Makes the clock a real one again.
-void reset_clock(storage::Transaction &transaction);
+void reset_clock(storage::ChangingTransaction &transaction);
 /// Moves the clock forward, whether or not it runs. Refuses to move it back, or further than a time
 /// of 64 bits reaches (QEX_BAD_PARAM).
-void step_clock(storage::Transaction &transaction, ClockTime by);
+void step_clock(storage::ChangingTransaction &transaction, ClockTime by);
 /// Sets what the clock shows; refuses times before 1970 (QEX_BAD_PARAM).
-void set_clock(storage::Transaction &transaction, ClockTime to);
+void set_clock(storage::ChangingTransaction &transaction, ClockTime to);
 
 }  // namespace simhost

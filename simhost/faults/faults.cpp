@@ -8,6 +8,7 @@
 
 #include "base/outcomes.h"
 #include "base/utf8.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -84,11 +85,12 @@ bool any_fault_waits(storage::Transaction &transaction, std::string_view functio
   return storage::has_fault(transaction, function);
 }
 
-std::vector<Fault> count_call(storage::Transaction &transaction, std::string_view function) {
+std::vector<Fault> count_call(storage::ChangingTransaction &transaction,
+                              std::string_view function) {
   return storage::count_for_faults(transaction, function);
 }
 
-void add_fault(storage::Transaction &transaction, Fault const &fault) {
+void add_fault(storage::ChangingTransaction &transaction, Fault const &fault) {
   check(fault);
   storage::insert_fault(transaction, fault);
 }
@@ -97,7 +99,7 @@ std::vector<WaitingFault> waiting_faults(storage::Transaction &transaction) {
   return storage::all_faults(transaction);
 }
 
-void clear_faults(storage::Transaction &transaction, std::string_view function) {
+void clear_faults(storage::ChangingTransaction &transaction, std::string_view function) {
   if (function.empty()) {
     storage::remove_all_faults(transaction);
   } else {

@@ -21,16 +21,16 @@ inline constexpr std::chrono::milliseconds kLongestDelay = std::chrono::hours(1)
 /// that returns none (QEX_NOT_SUPPORTED); an unknown exception, both a status and an exception, no
 /// effect at all, calls that are none, and a delay that is negative or longer
 /// than kLongestDelay (QEX_BAD_PARAM).
-void add_fault(storage::Transaction &transaction, Fault const &fault);
+void add_fault(storage::ChangingTransaction &transaction, Fault const &fault);
 std::vector<WaitingFault> waiting_faults(storage::Transaction &transaction);
 /// Removes the faults of a function, or all if it is empty. Refuses a function that no fault can
 /// hit, as add_fault does.
-void clear_faults(storage::Transaction &transaction, std::string_view function);
+void clear_faults(storage::ChangingTransaction &transaction, std::string_view function);
 
 /// Whether a fault waits for calls of a function.
 bool any_fault_waits(storage::Transaction &transaction, std::string_view function);
 /// Counts a call of a function that is being made. Returns the faults that hit it.
-std::vector<Fault> count_call(storage::Transaction &transaction, std::string_view function);
+std::vector<Fault> count_call(storage::ChangingTransaction &transaction, std::string_view function);
 /// How long a call waits that they hit: for all of them, but kLongestDelay at most.
 std::chrono::milliseconds delay_of(std::vector<Fault> const &hits);
 /// Does to a call what the faults that hit it say: throws Refused or Trapped.

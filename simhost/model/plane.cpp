@@ -30,11 +30,11 @@ Wires &get_wires() {
   return *wires;
 }
 
-void commit(storage::Transaction &transaction) {
-  if (transaction.access() == storage::Access::read) {
-    transaction.commit();
-    return;
-  }
+void commit(storage::ReadingTransaction &transaction) {
+  transaction.commit();
+}
+
+void commit(storage::ChangingTransaction &transaction) {
   auto &plane = running_plane();
   plane.prepare(transaction);
   transaction.commit();

@@ -26,6 +26,10 @@
 
 namespace simhost {
 
+namespace storage {
+class ReadingTransaction;
+}
+
 using storage::AddressBytes;
 using storage::Link;
 using storage::McastGroup;
@@ -52,16 +56,16 @@ class Wires {
   virtual Link link_of(storage::Transaction &transaction, std::string_view uplink) = 0;
   /// Changes a link, and lets the team of its switch follow. Its up_since is kept by the clock,
   /// whatever `link` says.
-  virtual void change_link(storage::Transaction &transaction, std::string_view uplink,
+  virtual void change_link(storage::ChangingTransaction &transaction, std::string_view uplink,
                            Link const &link) = 0;
 
   /// A frame from this address, VLAN and network arrives at a place; its other fields mean nothing.
   /// Refuses what no frame can come from, like Plane::put_address.
-  virtual Sighting learn(storage::Transaction &transaction, Place const &place,
+  virtual Sighting learn(storage::ChangingTransaction &transaction, Place const &place,
                          VSMACEntry const &source) = 0;
   /// Puts an address of any type at a place, last seen `elapsed` seconds ago: for describing a
   /// host, past all limits. The rest as for Plane::put_address.
-  virtual void describe_address(storage::Transaction &transaction, Place const &place,
+  virtual void describe_address(storage::ChangingTransaction &transaction, Place const &place,
                                 VSMACEntry const &entry) = 0;
 
   /// The client of a port joins a group, or reports it anew: what is known of it is replaced. Its
@@ -69,14 +73,14 @@ class Wires {
   /// than 4, 6 or 16 bytes or that is not multicast, and sources of another length or beside a
   /// group of Ethernet (QEX_INVALID_ADDRESS); a protocol version or source mode out of bounds
   /// (QEX_BAD_PARAM); more sources than IGMPV3MaxSrcIPNum or MLDV2MaxSrcIPNum (QEX_LIMIT_EXCEEDED).
-  virtual void join(storage::Transaction &transaction, storage::PortNumber port,
+  virtual void join(storage::ChangingTransaction &transaction, storage::PortNumber port,
                     McastGroup const &group) = 0;
   /// Refuses a group that the port has not joined (QEX_NOT_FOUND).
-  virtual void leave(storage::Transaction &transaction, storage::PortNumber port,
+  virtual void leave(storage::ChangingTransaction &transaction, storage::PortNumber port,
                      AddressBytes const &address) = 0;
 
   /// `counter` is one of the owner's, and `value` has room in it.
-  virtual void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
+  virtual void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                            Counter const &counter, std::uint64_t value) = 0;
 };
 
@@ -111,20 +115,20 @@ class Plane {
 
   // What callers change of the runtime state.
 
-  virtual void set_admin_state(storage::Transaction &transaction, std::string_view uplink,
+  virtual void set_admin_state(storage::ChangingTransaction &transaction, std::string_view uplink,
                                bool up) = 0;
   /// Puts a static or user address at a place; one that is there already starts over. A learned
   /// address gives way wherever it is. Refuses other types (QEX_BAD_PARAM), a multicast or zero
   /// address (QEX_INVALID_ADDRESS), a VLAN that is none (QEX_BAD_VLANID), a network of more than 24
   /// bits (QEX_BAD_PARAM), and an address that is static or a user's elsewhere (QEX_EXISTS).
-  virtual void put_address(storage::Transaction &transaction, Place const &place,
+  virtual void put_address(storage::ChangingTransaction &transaction, Place const &place,
                            VSMACEntry const &entry) = 0;
   /// Takes an address from a place. Refuses an address that is not there, or of another type than
   /// the entry's unless that is VS_MAC_ADDR_TYPE_ALL (QEX_NOT_FOUND).
-  virtual void remove_address(storage::Transaction &transaction, Place const &place,
+  virtual void remove_address(storage::ChangingTransaction &transaction, Place const &place,
                               VSMACEntry const &entry) = 0;
   /// What the host learned and counted goes; what is wired and configured stays.
-  virtual void restart(storage::Transaction &transaction) = 0;
+  virtual void restart(storage::ChangingTransaction &transaction) = 0;
 
   // Transactions.
 
@@ -132,7 +136,7 @@ class Plane {
   /// the plane cannot run what the state then says; nothing of it happens then. It may still fail
   /// to be committed: a plane acts on nothing before committed(). A state that is opened is told in
   /// neither way; a plane that keeps something of it looks when it is asked or told first.
-  virtual void prepare(storage::Transaction &transaction) = 0;
+  virtual void prepare(storage::ChangingTransaction &transaction) = 0;
   /// The transaction that was prepared last is committed: others see it. Returns when it is in
   /// force or the plane has run out of patience, and cannot fail any more.
   virtual void committed() noexcept = 0;
@@ -149,7 +153,9 @@ void run_on(Plane &plane);
 /// (QEX_NOT_SUPPORTED).
 Wires &get_wires();
 
+/// Ends a transaction.
+void commit(storage::ReadingTransaction &transaction);
 /// Makes what a transaction changed last. The plane is told before, and may refuse it, and after.
-void commit(storage::Transaction &transaction);
+void commit(storage::ChangingTransaction &transaction);
 
 }  // namespace simhost

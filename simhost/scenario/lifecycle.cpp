@@ -7,17 +7,18 @@
 #include "model/state/restart.h"
 #include "storage/ports.h"
 #include "storage/running/host_settings.h"
+#include "storage/store.h"
 #include "storage/switches.h"
 
 namespace simhost::scenario {
 
-void restart_host(storage::Transaction &transaction) {
+void restart_host(storage::ChangingTransaction &transaction) {
   restart_configuration(transaction);
   running_plane().restart(transaction);
   storage::remove_host_settings(transaction);
 }
 
-void empty_host(storage::Transaction &transaction) {
+void empty_host(storage::ChangingTransaction &transaction) {
   for (auto const &known : storage::all_switches(transaction)) {
     storage::remove_switch(transaction, known.key);
   }

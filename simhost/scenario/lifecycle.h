@@ -2,7 +2,7 @@
 #pragma once
 
 namespace simhost::storage {
-class Transaction;
+class ChangingTransaction;
 }
 
 namespace simhost::scenario {
@@ -10,9 +10,9 @@ namespace simhost::scenario {
 /// The host restarts: switches that are not persistent go, and so do runtime and volatile
 /// properties, learned addresses, multicast groups, counters, runtime options and the global MAC
 /// learning. Cabling, the clock and faults are not the host's and stay.
-void restart_host(storage::Transaction &transaction);
+void restart_host(storage::ChangingTransaction &transaction);
 
 /// Empties the host: no switches, no uplinks, a real clock, no faults, and numbers from 1 on.
-void empty_host(storage::Transaction &transaction);
+void empty_host(storage::ChangingTransaction &transaction);
 
 }  // namespace simhost::scenario

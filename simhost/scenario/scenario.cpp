@@ -19,9 +19,9 @@
 namespace simhost::scenario {
 namespace {
 
-using storage::Transaction;
+using storage::ChangingTransaction;
 
-void apply_clock(Transaction &transaction, Node const &node) {
+void apply_clock(ChangingTransaction &transaction, Node const &node) {
   auto const before = clock_members(transaction);
   auto const after = read_object(kClockMembers, node, before);
   if (after.stopped != before.stopped) {
@@ -33,13 +33,13 @@ void apply_clock(Transaction &transaction, Node const &node) {
   }
 }
 
-void apply_link(Transaction &transaction, std::string const &name, Node const &node) {
+void apply_link(ChangingTransaction &transaction, std::string const &name, Node const &node) {
   auto link = get_wires().link_of(transaction, name);
   read_members(kLinkMembers, node, &link);
   get_wires().change_link(transaction, name, link);
 }
 
-void apply_uplink(Transaction &transaction, Node const &node) {
+void apply_uplink(ChangingTransaction &transaction, Node const &node) {
   auto const link_keys = names_of(kLinkMembers);
   auto keys = link_keys;
   keys.insert(keys.end(), {kName, kObserved});
@@ -56,7 +56,8 @@ void apply_uplink(Transaction &transaction, Node const &node) {
   }
 }
 
-void apply_runtime_option(Transaction &transaction, std::string const &name, Node const &node) {
+void apply_runtime_option(ChangingTransaction &transaction, std::string const &name,
+                          Node const &node) {
   auto const options = runtime_options();
   auto const found = std::find_if(options.begin(), options.end(),
                                   [&](RuntimeOption const &option) { return option.name == name; });
@@ -72,7 +73,7 @@ void apply_runtime_option(Transaction &transaction, std::string const &name, Nod
   }
 }
 
-void apply_global_learning(Transaction &transaction, Node const &node) {
+void apply_global_learning(ChangingTransaction &transaction, Node const &node) {
   auto props = global_mac_learning(transaction);
   read(form::record<VSMACLearningGlobalProps>(kGlobalLearningMembers), node, &props);
   set_global_mac_learning(transaction, props);
@@ -86,7 +87,7 @@ QEX_ReturnStatus status_from(Node const &node) {
   return *status;
 }
 
-void apply_fault(Transaction &transaction, Node const &node) {
+void apply_fault(ChangingTransaction &transaction, Node const &node) {
   auto const said = read_object(kFaultMembers, node, FaultMembers());
   add_fault(transaction, {.function = said.call,
                           .first = said.nth,
@@ -99,7 +100,7 @@ void apply_fault(Transaction &transaction, Node const &node) {
 
 }  // namespace
 
-void apply(Transaction &transaction, std::string_view document) {
+void apply(ChangingTransaction &transaction, std::string_view document) {
   auto const json = parsed(document);
   Node const node(json);
   node.only(kDocumentParts);

@@ -7,15 +7,16 @@
 #include "scenario/document.h"
 
 namespace simhost::storage {
+class ChangingTransaction;
 class Transaction;
-}
+}  // namespace simhost::storage
 
 namespace simhost::scenario {
 
 /// Makes the host what a document says. What the document names is added or changed; nothing else
 /// is touched. Throws DocumentError for a document that is malformed or that the host refuses; the
 /// transaction must not be committed then.
-void apply(storage::Transaction &transaction, std::string_view document);
+void apply(storage::ChangingTransaction &transaction, std::string_view document);
 
 /// The whole host as a document. Beside what apply() reads, switches and ports have a key
 /// "observed" with what follows from the rest, which apply() passes over.

@@ -26,8 +26,8 @@
 namespace simhost::scenario {
 namespace {
 
+using storage::ChangingTransaction;
 using storage::PropertyOwner;
-using storage::Transaction;
 
 // The keys that an object may have.
 std::vector<std::string_view> keys_of(SettingOwner kind, std::span<Member const> members,
@@ -58,25 +58,26 @@ void only_of_uplink_port(Node const &node) {
   node.only(own);
 }
 
-void set_counters(Transaction &transaction, CounterOwner const &owner, Node const &counters) {
+void set_counters(ChangingTransaction &transaction, CounterOwner const &owner,
+                  Node const &counters) {
   for_each_member(counters, [&](std::string const &name, Node const &value) {
     set_counter(transaction, owner, name, value.counter());
   });
 }
 
-void apply_counters(Transaction &transaction, CounterOwner const &owner, Node const &node) {
+void apply_counters(ChangingTransaction &transaction, CounterOwner const &owner, Node const &node) {
   if_there(node, keys::counters,
            [&](Node const &counters) { set_counters(transaction, owner, counters); });
 }
 
-void apply_addresses(Transaction &transaction, Place const &place, Node const &node) {
+void apply_addresses(ChangingTransaction &transaction, Place const &place, Node const &node) {
   for_each_in(node, keys::addresses, [&](Node const &item) {
     get_wires().describe_address(transaction, place,
                                  read_object(kAddressMembers, item, new_address()));
   });
 }
 
-void apply_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+void apply_port(ChangingTransaction &transaction, storage::SwitchKey key, Node const &node) {
   node.only(keys_of(SettingOwner::of_port, kPortMembers, kPortParts));
   PortMembers said;
   read_members(kPortMembers, node, &said);
@@ -93,7 +94,7 @@ void apply_port(Transaction &transaction, storage::SwitchKey key, Node const &no
   apply_counters(transaction, {.switch_key = key, .port = port.number}, node);
 }
 
-storage::SwitchKey made_switch(Transaction &transaction, storage::Switch const &wanted) {
+storage::SwitchKey made_switch(ChangingTransaction &transaction, storage::Switch const &wanted) {
   return create_switch(transaction, {.alias = wanted.alias,
                                      .identifier = wanted.identifier,
                                      .portset = wanted.portset,
@@ -118,7 +119,8 @@ void require_fixed(Node const &node, storage::Switch const &row) {
 }
 
 // The port is to have the uplink, and no other one.
-void attach_to(Transaction &transaction, storage::Port const &port, std::string const &uplink) {
+void attach_to(ChangingTransaction &transaction, storage::Port const &port,
+               std::string const &uplink) {
   auto const known = get_uplink(transaction, uplink);
   auto const present = storage::uplink_at(transaction, port.number);
   if (present == uplink) {
@@ -133,7 +135,7 @@ void attach_to(Transaction &transaction, storage::Port const &port, std::string 
   storage::attach_uplink(transaction, uplink, port.number);
 }
 
-void apply_uplink_port(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+void apply_uplink_port(ChangingTransaction &transaction, storage::SwitchKey key, Node const &node) {
   only_of_uplink_port(node);
   UplinkPortMembers said;
   read_members(kUplinkPortMembers, node, &said);
@@ -147,7 +149,7 @@ void apply_uplink_port(Transaction &transaction, storage::SwitchKey key, Node co
   if_there(node, kUplink, [&](Node const &) { attach_to(transaction, port, said.uplink); });
 }
 
-void attach_uplinks(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+void attach_uplinks(ChangingTransaction &transaction, storage::SwitchKey key, Node const &node) {
   for_each_in(node, keys::uplinks, [&](Node const &item) {
     auto const name = item.text();
     auto const attached = storage::uplinks_of(transaction, key);
@@ -159,12 +161,13 @@ void attach_uplinks(Transaction &transaction, storage::SwitchKey key, Node const
   });
 }
 
-void apply_lag(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+void apply_lag(ChangingTransaction &transaction, storage::SwitchKey key, Node const &node) {
   auto const lag = read_object(kLagMembers, node, LagMembers());
   put_lag(transaction, key, lag.name, lag.uplinks);
 }
 
-void apply_session_counters(Transaction &transaction, storage::SwitchKey key, Node const &node) {
+void apply_session_counters(ChangingTransaction &transaction, storage::SwitchKey key,
+                            Node const &node) {
   if_there(node, keys::mirror_counters, [&](Node const &sessions) {
     for_each_member(sessions, [&](std::string const &sid, Node const &counters) {
       set_counters(transaction, {.switch_key = key, .session = sid}, counters);
@@ -174,7 +177,7 @@ void apply_session_counters(Transaction &transaction, storage::SwitchKey key, No
 
 }  // namespace
 
-void apply_switch(Transaction &transaction, Node const &node) {
+void apply_switch(ChangingTransaction &transaction, Node const &node) {
   node.only(keys_of(SettingOwner::of_switch, kSwitchMembers, kSwitchParts));
   auto wanted = new_switch();
   read_members(kSwitchMembers, node, &wanted);

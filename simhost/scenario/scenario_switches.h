@@ -7,6 +7,6 @@
 namespace simhost::scenario {
 
 /// Makes a switch what an item of "switches" says; see apply() in scenario.h.
-void apply_switch(storage::Transaction &transaction, Node const &node);
+void apply_switch(storage::ChangingTransaction &transaction, Node const &node);
 
 }  // namespace simhost::scenario

@@ -13,10 +13,12 @@
 #include "scenario/forms.h"
 #include "scenario/reading.h"
 #include "scenario/texts.h"
+#include "storage/store.h"
 
 namespace simhost::scenario {
 namespace {
 
+using storage::ChangingTransaction;
 using storage::PropertyOwner;
 using storage::PropertyScope;
 using storage::Transaction;
@@ -152,7 +154,7 @@ Bytes bytes_from(Node const &node) {
 }
 
 template <typename IsWanted>
-void apply_bytes(Transaction &transaction, PropertyOwner const &owner, Node const &node,
+void apply_bytes(ChangingTransaction &transaction, PropertyOwner const &owner, Node const &node,
                  std::string_view under, IsWanted const &is_wanted) {
   if_there(node, under, [&](Node const &properties) {
     for_each_member(properties, [&](std::string const &key, Node const &property) {
@@ -166,7 +168,7 @@ void apply_bytes(Transaction &transaction, PropertyOwner const &owner, Node cons
   });
 }
 
-void apply_member(Transaction &transaction, PropertyOwner const &owner,
+void apply_member(ChangingTransaction &transaction, PropertyOwner const &owner,
                   Descriptor const &descriptor, Node const &member) {
   for (auto const &made : made_from(descriptor, member)) {
     if (made.bytes) {
@@ -199,13 +201,13 @@ std::string_view name_at_uplink_port(std::string_view name) {
   return found;
 }
 
-void apply_raw(Transaction &transaction, PropertyOwner const &owner, SettingOwner kind,
+void apply_raw(ChangingTransaction &transaction, PropertyOwner const &owner, SettingOwner kind,
                Node const &node, std::string_view under) {
   apply_bytes(transaction, owner, node, under,
               [&](std::string_view key) { return !is_named(kind, key); });
 }
 
-void apply_named(Transaction &transaction, PropertyOwner const &owner, SettingOwner kind,
+void apply_named(ChangingTransaction &transaction, PropertyOwner const &owner, SettingOwner kind,
                  Node const &node) {
   for_each_named(kind, [&](Descriptor const &descriptor, std::string_view name) {
     if_there(node, name,
@@ -215,7 +217,7 @@ void apply_named(Transaction &transaction, PropertyOwner const &owner, SettingOw
               [&](std::string_view key) { return is_named(kind, key); });
 }
 
-void apply_settings(Transaction &transaction, PropertyOwner const &owner, SettingOwner kind,
+void apply_settings(ChangingTransaction &transaction, PropertyOwner const &owner, SettingOwner kind,
                     Node const &node) {
   apply_raw(transaction, owner, kind, node);
   apply_named(transaction, owner, kind, node);

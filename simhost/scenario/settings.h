@@ -27,14 +27,14 @@ std::vector<std::string_view> setting_names(SettingOwner kind);
 std::string_view name_at_uplink_port(std::string_view name);
 
 /// Sets what has no name but its key.
-void apply_raw(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+void apply_raw(storage::ChangingTransaction &transaction, storage::PropertyOwner const &owner,
                SettingOwner kind, Node const &node, std::string_view under = keys::properties);
 /// Sets what members name; where the bytes are there too, they win, for a member may not be able to
 /// say them.
-void apply_named(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+void apply_named(storage::ChangingTransaction &transaction, storage::PropertyOwner const &owner,
                  SettingOwner kind, Node const &node);
 /// Both, in this order.
-void apply_settings(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+void apply_settings(storage::ChangingTransaction &transaction, storage::PropertyOwner const &owner,
                     SettingOwner kind, Node const &node);
 
 /// Adds to an object the members of the settings that are set.

@@ -171,7 +171,7 @@ void Connection::run(std::string_view sql) {
 SQLite::Statement &Connection::prepared(std::string_view sql, bool may_change) {
   auto &prepared = kept(sql);
   if (prepared.changes && !may_change) {
-    throw std::logic_error("a call that only reads the state was about to change it");
+    throw std::logic_error("what reads the state was about to change it");
   }
   return prepared.statement;
 }

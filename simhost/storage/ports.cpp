@@ -41,11 +41,11 @@ std::string name_at(Query const &row) {
 
 }  // namespace
 
-std::optional<PortNumber> add_port(Transaction &transaction, SwitchKey switch_key,
+std::optional<PortNumber> add_port(ChangingTransaction &transaction, SwitchKey switch_key,
                                    std::string_view identifier, PortKind kind) {
-  Query insert(transaction,
-               "INSERT INTO port (switch, identifier, is_uplink) VALUES (?, ?, ?)"
-               " ON CONFLICT DO NOTHING");
+  Change insert(transaction,
+                "INSERT INTO port (switch, identifier, is_uplink) VALUES (?, ?, ?)"
+                " ON CONFLICT DO NOTHING");
   insert.with(switch_key).with(identifier);
   insert.with(kind == PortKind::uplink);
   if (insert.run() == 0) {
@@ -95,13 +95,14 @@ std::string external_id_of(Transaction &transaction, PortNumber number) {
   return select.with(number).next() ? select.text(0) : std::string();
 }
 
-bool set_external_id(Transaction &transaction, PortNumber number, std::string_view external_id) {
-  Query update(transaction, "UPDATE OR IGNORE port SET external_id = ? WHERE number = ?");
+bool set_external_id(ChangingTransaction &transaction, PortNumber number,
+                     std::string_view external_id) {
+  Change update(transaction, "UPDATE OR IGNORE port SET external_id = ? WHERE number = ?");
   return update.with(external_id).with(number).run() != 0;
 }
 
-void remove_port(Transaction &transaction, PortNumber number) {
-  Query(transaction, "DELETE FROM port WHERE number = ?").with(number).run();
+void remove_port(ChangingTransaction &transaction, PortNumber number) {
+  Change(transaction, "DELETE FROM port WHERE number = ?").with(number).run();
 }
 
 std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key) {
@@ -132,8 +133,8 @@ std::vector<Uplink> all_uplinks(Transaction &transaction) {
   return select.all(any_uplink_at);
 }
 
-void add_uplink(Transaction &transaction, std::string_view name) {
-  Query(transaction, "INSERT INTO uplink (name) VALUES (?)").with(name).run();
+void add_uplink(ChangingTransaction &transaction, std::string_view name) {
+  Change(transaction, "INSERT INTO uplink (name) VALUES (?)").with(name).run();
 }
 
 std::vector<std::string> free_uplinks(Transaction &transaction) {
@@ -141,12 +142,12 @@ std::vector<std::string> free_uplinks(Transaction &transaction) {
   return select.all(name_at);
 }
 
-void remove_uplinks(Transaction &transaction) {
-  Query(transaction, "DELETE FROM uplink").run();
+void remove_uplinks(ChangingTransaction &transaction) {
+  Change(transaction, "DELETE FROM uplink").run();
 }
 
-void attach_uplink(Transaction &transaction, std::string_view name, PortNumber port) {
-  Query update(transaction, "UPDATE uplink SET port = ? WHERE name = ?");
+void attach_uplink(ChangingTransaction &transaction, std::string_view name, PortNumber port) {
+  Change update(transaction, "UPDATE uplink SET port = ? WHERE name = ?");
   update.with(port).with(name).run();
 }
 
@@ -169,9 +170,9 @@ std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switc
   });
 }
 
-void restart_numbering(Transaction &transaction) {
+void restart_numbering(ChangingTransaction &transaction) {
   // Keys of switches, which nobody sees, tell a handle from before.
-  Query(transaction, "DELETE FROM sqlite_sequence WHERE name <> 'switch'").run();
+  Change(transaction, "DELETE FROM sqlite_sequence WHERE name <> 'switch'").run();
 }
 
 }  // namespace simhost::storage

@@ -18,7 +18,7 @@ enum class PortNumber : std::uint32_t {};
 enum class PortKind { client, uplink };
 
 /// Adds a port; nothing if the switch has one of that identifier.
-std::optional<PortNumber> add_port(Transaction &transaction, SwitchKey switch_key,
+std::optional<PortNumber> add_port(ChangingTransaction &transaction, SwitchKey switch_key,
                                    std::string_view identifier, PortKind kind);
 struct Port {
   PortNumber number;
@@ -44,9 +44,10 @@ std::optional<Port> next_port(Transaction &transaction, SwitchKey switch_key, Po
 /// What another system calls the port; empty if none does.
 std::string external_id_of(Transaction &transaction, PortNumber number);
 /// False if another port of the switch is known by it.
-bool set_external_id(Transaction &transaction, PortNumber number, std::string_view external_id);
+bool set_external_id(ChangingTransaction &transaction, PortNumber number,
+                     std::string_view external_id);
 /// Removes a port with its properties; an uplink at it becomes free.
-void remove_port(Transaction &transaction, PortNumber number);
+void remove_port(ChangingTransaction &transaction, PortNumber number);
 /// The ports of a switch, in the order in which they were added.
 std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key);
 /// The numbers of the ports of a switch that are no uplink ports.
@@ -68,13 +69,13 @@ std::optional<Uplink> find_uplink(Transaction &transaction, std::string_view nam
 /// All uplinks of the host, in the order in which they were added.
 std::vector<Uplink> all_uplinks(Transaction &transaction);
 /// Adds a free uplink to the host. Its name is unique there.
-void add_uplink(Transaction &transaction, std::string_view name);
+void add_uplink(ChangingTransaction &transaction, std::string_view name);
 /// Removes all uplinks from the host.
-void remove_uplinks(Transaction &transaction);
+void remove_uplinks(ChangingTransaction &transaction);
 /// The free uplinks of the host, in the order in which they were added.
 std::vector<std::string> free_uplinks(Transaction &transaction);
 /// Puts an uplink at an uplink port.
-void attach_uplink(Transaction &transaction, std::string_view name, PortNumber port);
+void attach_uplink(ChangingTransaction &transaction, std::string_view name, PortNumber port);
 /// The uplink ports of a switch in their order, with or without an uplink.
 std::vector<Port> uplink_ports_of(Transaction &transaction, SwitchKey switch_key);
 /// The uplink at a port.
@@ -84,6 +85,6 @@ std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switc
 
 /// The numbers that callers see, of ports and of link-aggregation groups, begin anew: for a host
 /// that has none of them.
-void restart_numbering(Transaction &transaction);
+void restart_numbering(ChangingTransaction &transaction);
 
 }  // namespace simhost::storage

@@ -26,13 +26,13 @@ Property property_at(Query const &row) {
 
 }  // namespace
 
-void put_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name,
-                  std::span<std::byte const> value, PropertyType type) {
-  Query upsert(transaction,
-               "INSERT INTO property (switch, scope, port, name, type, value)"
-               " VALUES (?, ?, nullif(?, 0), ?, ?, ?)"
-               " ON CONFLICT (switch, scope, ifnull(port, 0), name)"
-               " DO UPDATE SET type = excluded.type, value = excluded.value");
+void put_property(ChangingTransaction &transaction, PropertyOwner const &owner,
+                  std::string_view name, std::span<std::byte const> value, PropertyType type) {
+  Change upsert(transaction,
+                "INSERT INTO property (switch, scope, port, name, type, value)"
+                " VALUES (?, ?, nullif(?, 0), ?, ?, ?)"
+                " ON CONFLICT (switch, scope, ifnull(port, 0), name)"
+                " DO UPDATE SET type = excluded.type, value = excluded.value");
   upsert.with(owner.switch_key).with(owner.scope);
   upsert.with(number_or_none(owner)).with(name).with(type).with(value).run();
 }
@@ -46,10 +46,11 @@ std::optional<Property> find_property(Transaction &transaction, PropertyOwner co
   return select.with(number_or_none(owner)).with(name).first(property_at);
 }
 
-bool remove_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name) {
-  Query remove(transaction,
-               "DELETE FROM property"
-               " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? AND name = ?");
+bool remove_property(ChangingTransaction &transaction, PropertyOwner const &owner,
+                     std::string_view name) {
+  Change remove(transaction,
+                "DELETE FROM property"
+                " WHERE switch = ? AND scope = ? AND ifnull(port, 0) = ? AND name = ?");
   remove.with(owner.switch_key).with(owner.scope);
   return remove.with(number_or_none(owner)).with(name).run() != 0;
 }
@@ -74,8 +75,8 @@ std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey ke
   });
 }
 
-void remove_properties(Transaction &transaction, PropertyType type) {
-  Query(transaction, "DELETE FROM property WHERE type = ?").with(type).run();
+void remove_properties(ChangingTransaction &transaction, PropertyType type) {
+  Change(transaction, "DELETE FROM property WHERE type = ?").with(type).run();
 }
 
 }  // namespace simhost::storage

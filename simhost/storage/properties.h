@@ -43,12 +43,13 @@ struct Property {
 };
 
 /// Sets a property, its type included, whether or not it was there.
-void put_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name,
-                  std::span<std::byte const> value, PropertyType type);
+void put_property(ChangingTransaction &transaction, PropertyOwner const &owner,
+                  std::string_view name, std::span<std::byte const> value, PropertyType type);
 std::optional<Property> find_property(Transaction &transaction, PropertyOwner const &owner,
                                       std::string_view name);
 /// False if the property was not there.
-bool remove_property(Transaction &transaction, PropertyOwner const &owner, std::string_view name);
+bool remove_property(ChangingTransaction &transaction, PropertyOwner const &owner,
+                     std::string_view name);
 
 struct NamedProperty {
   std::string name;
@@ -67,6 +68,6 @@ struct PortProperty {
 std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey key,
                                           std::string_view name);
 /// Removes every property of that type from the host.
-void remove_properties(Transaction &transaction, PropertyType type);
+void remove_properties(ChangingTransaction &transaction, PropertyType type);
 
 }  // namespace simhost::storage

@@ -51,7 +51,7 @@ void Query::require_row() {
   }
 }
 
-int Query::run() {
+int Query::execute() {
   int const changed = connection_.guarded([&] { return statement_.exec(); });
   connection_.require_schema_of_now();
   return changed;

@@ -19,16 +19,14 @@
 
 namespace simhost::storage {
 
-/// One run of a prepared statement. It resets the statement when it goes, because a statement left
-/// in the middle of its rows would keep its transaction from ending.
+/// One run of a prepared statement that reads. It resets the statement when it goes, because a
+/// statement left in the middle of its rows would keep its transaction from ending.
 class Query {
  public:
-  /// `sql` is a literal: the statement prepared from it is kept.
+  /// `sql` is a literal: the statement prepared from it is kept. Throws std::logic_error for one
+  /// that changes the state.
   Query(Transaction &transaction, std::string_view sql)
-      : connection_(transaction.connection()),
-        statement_(connection_.prepared(sql, transaction.access() == Access::write)) {
-    connection_.start_statement();
-  }
+      : Query(transaction.connection(), sql, false) {}
   ~Query();
   Query(Query const &) = delete;
   Query &operator=(Query const &) = delete;
@@ -50,9 +48,6 @@ class Query {
   bool next();
   /// Steps to the row that every state has; throws UnusableState without one.
   void require_row();
-  /// Runs a statement that yields no rows; returns how many rows it changed.
-  int run();
-
   /// The columns of the row that next() reached, counted from 0. The file may have been written by
   /// anybody: these throw UnusableState for a value of another type or outside its bounds.
   [[nodiscard]] std::int64_t integer(int column) const;
@@ -98,6 +93,15 @@ class Query {
     return rows;
   }
 
+ protected:
+  Query(Connection &connection, std::string_view sql, bool may_change)
+      : connection_(connection), statement_(connection.prepared(sql, may_change)) {
+    connection_.start_statement();
+  }
+
+  // Runs a statement that yields no rows; how many rows it changed.
+  int execute();
+
  private:
   // Bytes that may come out of the state before it is asked how large the file is.
   static constexpr std::uint64_t kFree = std::uint64_t{1} << 20;
@@ -111,6 +115,21 @@ class Query {
   std::string_view setting_;
   mutable std::uint64_t taken_ = 0;
   mutable std::uint64_t allowed_ = kFree;
+};
+
+/// Likewise, of one that changes the state.
+class Change : public Query {
+ public:
+  Change(ChangingTransaction &transaction, std::string_view sql)
+      : Query(transaction.connection(), sql, true) {}
+
+  template <typename Value>
+  Change &with(Value const &value) {
+    Query::with(value);
+    return *this;
+  }
+  /// Returns how many rows it changed.
+  int run() { return execute(); }
 };
 
 }  // namespace simhost::storage

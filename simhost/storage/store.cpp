@@ -30,7 +30,7 @@ void Store::prepare(Populate const &populate) {
   // Nothing may be written before it is known what is there.
   auto const version = connection_->patiently([&] {
     // In one transaction, or another process could create the state between two of the questions.
-    Transaction const look(*this, Access::read);
+    ReadingTransaction const look(*this);
     return version_of(database);
   });
   if (version != kSchemaVersion && file && !file->is_writable()) {
@@ -47,14 +47,14 @@ void Store::prepare(Populate const &populate) {
     // waiting for the disk as well would only guard against a power cut.
     database.exec("PRAGMA synchronous = NORMAL");
     connection_->patiently([&] {
-      Transaction const look(*this, Access::read);
+      ReadingTransaction const look(*this);
       connection_->watch();
     });
   }
 }
 
 void Store::create_or_bring_forward(Populate const &populate) {
-  Transaction transaction(*this, Access::write);
+  ChangingTransaction transaction(*this);
   auto &database = connection_->database();
   if (auto const version = version_of(database); version == kBlank) {
     create_state(database);
@@ -102,7 +102,7 @@ void Transaction::commit() {
   }
 }
 
-std::int64_t Transaction::last_key() const {
+std::int64_t ChangingTransaction::last_key() const {
   return connection().database().getLastInsertRowid();
 }
 

@@ -13,7 +13,8 @@
 namespace simhost::storage {
 
 class Query;
-class Transaction;
+class Change;
+class ChangingTransaction;
 class Connection;
 
 /// A connection to the state. Not safe for use by several threads at once, nor across a fork. What
@@ -21,7 +22,7 @@ class Connection;
 /// lock, a full disk, a medium that can only be read) as StateFailure.
 class Store {
  public:
-  using Populate = std::function<void(Transaction &)>;
+  using Populate = std::function<void(ChangingTransaction &)>;
 
   /// Opens the state in `file`, or a private one in memory if there is none; `populate` fills a
   /// state that is new.
@@ -44,40 +45,39 @@ class Store {
   std::unique_ptr<Connection> connection_;
 };
 
-enum class Access { read, write };
-
 /// All the work of one call on the state: seen by others whole or not at all. Rolls back when it
-/// goes without a commit. A writer waits for the writers of other processes; a reader never waits.
+/// goes without a commit. What takes one only reads the state; what changes it takes a
+/// ChangingTransaction.
 class Transaction {
  public:
-  /// Throws StateFailure (busy) when the wait for other writers takes too long.
-  Transaction(Store &store, Access access, Patience &patience);
-  /// Likewise, waiting as long as one call does.
-  Transaction(Store &store, Access access);
   ~Transaction();
   Transaction(Transaction const &) = delete;
   Transaction &operator=(Transaction const &) = delete;
 
-  [[nodiscard]] Access access() const { return access_; }
   void commit();
   /// Throws UnusableState, which names the file.
   [[noreturn]] void refuse(std::string const &why) const { store_.refuse(why); }
 
-  /// The key of the row that was inserted last.
-  [[nodiscard]] std::int64_t last_key() const;
+ protected:
+  enum class Access { read, write };
+
+  /// Throws StateFailure (busy) when the wait for other writers takes too long.
+  Transaction(Store &store, Access access, Patience &patience);
+  /// Likewise, waiting as long as one call does.
+  Transaction(Store &store, Access access);
+  [[nodiscard]] Connection &connection() const { return *store_.connection_; }
 
  private:
   friend class Query;
 
   void begin(Patience &patience);
-  [[nodiscard]] Connection &connection() const { return *store_.connection_; }
 
   Store &store_;
   Access access_;
   bool open_ = true;
 };
 
-/// A transaction that only reads the state: what would change it throws std::logic_error.
+/// A transaction that only reads the state; it never waits for another process.
 class ReadingTransaction : public Transaction {
  public:
   explicit ReadingTransaction(Store &store) : Transaction(store, Access::read) {}
@@ -85,12 +85,18 @@ class ReadingTransaction : public Transaction {
       : Transaction(store, Access::read, patience) {}
 };
 
-/// A transaction that changes the state: what changes it takes one of these.
+/// A transaction that changes the state. It waits for those of other processes.
 class ChangingTransaction : public Transaction {
  public:
   explicit ChangingTransaction(Store &store) : Transaction(store, Access::write) {}
   ChangingTransaction(Store &store, Patience &patience)
       : Transaction(store, Access::write, patience) {}
+
+  /// The key of the row that was inserted last.
+  [[nodiscard]] std::int64_t last_key() const;
+
+ private:
+  friend class Change;
 };
 
 }  // namespace simhost::storage

@@ -38,9 +38,9 @@ FoundSwitch switch_at(Query const &row) {
 
 }  // namespace
 
-std::optional<SwitchKey> add_switch(Transaction &transaction, Switch const &row) {
-  Query insert(transaction, "INSERT INTO switch (" SWITCH_COLUMNS
-                            ") VALUES (?, ?, ?, ?, ?, ?, ?) ON CONFLICT DO NOTHING");
+std::optional<SwitchKey> add_switch(ChangingTransaction &transaction, Switch const &row) {
+  Change insert(transaction, "INSERT INTO switch (" SWITCH_COLUMNS
+                             ") VALUES (?, ?, ?, ?, ?, ?, ?) ON CONFLICT DO NOTHING");
   insert.with(row.alias).with(row.identifier).with(row.portset);
   insert.with(row.max_ports).with(row.version).with(row.persistent);
   insert.with(row.associated);
@@ -80,28 +80,28 @@ std::vector<FoundSwitch> all_switches(Transaction &transaction) {
   return select.all(switch_at);
 }
 
-bool rename_switch(Transaction &transaction, SwitchKey key, std::string_view alias) {
-  Query update(transaction, "UPDATE OR IGNORE switch SET alias = ? WHERE key = ?");
+bool rename_switch(ChangingTransaction &transaction, SwitchKey key, std::string_view alias) {
+  Change update(transaction, "UPDATE OR IGNORE switch SET alias = ? WHERE key = ?");
   return update.with(alias).with(key).run() != 0;
 }
 
-void set_version(Transaction &transaction, SwitchKey key, std::uint32_t version) {
-  Query update(transaction, "UPDATE switch SET version = ? WHERE key = ?");
+void set_version(ChangingTransaction &transaction, SwitchKey key, std::uint32_t version) {
+  Change update(transaction, "UPDATE switch SET version = ? WHERE key = ?");
   update.with(version).with(key).run();
 }
 
-void set_max_ports(Transaction &transaction, SwitchKey key, std::uint32_t max_ports) {
-  Query update(transaction, "UPDATE switch SET max_ports = ? WHERE key = ?");
+void set_max_ports(ChangingTransaction &transaction, SwitchKey key, std::uint32_t max_ports) {
+  Change update(transaction, "UPDATE switch SET max_ports = ? WHERE key = ?");
   update.with(max_ports).with(key).run();
 }
 
-void set_associated(Transaction &transaction, SwitchKey key, bool associated) {
-  Query update(transaction, "UPDATE switch SET associated = ? WHERE key = ?");
+void set_associated(ChangingTransaction &transaction, SwitchKey key, bool associated) {
+  Change update(transaction, "UPDATE switch SET associated = ? WHERE key = ?");
   update.with(associated).with(key).run();
 }
 
-void remove_switch(Transaction &transaction, SwitchKey key) {
-  Query(transaction, "DELETE FROM switch WHERE key = ?").with(key).run();
+void remove_switch(ChangingTransaction &transaction, SwitchKey key) {
+  Change(transaction, "DELETE FROM switch WHERE key = ?").with(key).run();
 }
 
 }  // namespace simhost::storage

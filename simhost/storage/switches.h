@@ -9,6 +9,7 @@
 
 namespace simhost::storage {
 
+class ChangingTransaction;
 class Transaction;
 
 enum class SwitchKey : std::int64_t {};
@@ -34,7 +35,7 @@ struct FoundSwitch {
 };
 
 /// Adds a switch; nothing if one of its names is taken.
-std::optional<SwitchKey> add_switch(Transaction &transaction, Switch const &row);
+std::optional<SwitchKey> add_switch(ChangingTransaction &transaction, Switch const &row);
 /// The switch that bears `name`, which is of the given kind.
 std::optional<FoundSwitch> find_switch(Transaction &transaction, SwitchName kind,
                                        std::string_view name);
@@ -46,11 +47,11 @@ std::optional<FoundSwitch> next_switch(Transaction &transaction, SwitchKey key);
 /// All switches of the host, in the order in which they were added.
 std::vector<FoundSwitch> all_switches(Transaction &transaction);
 /// Replaces the alias; false if another switch has it.
-bool rename_switch(Transaction &transaction, SwitchKey key, std::string_view alias);
-void set_version(Transaction &transaction, SwitchKey key, std::uint32_t version);
-void set_max_ports(Transaction &transaction, SwitchKey key, std::uint32_t max_ports);
-void set_associated(Transaction &transaction, SwitchKey key, bool associated);
+bool rename_switch(ChangingTransaction &transaction, SwitchKey key, std::string_view alias);
+void set_version(ChangingTransaction &transaction, SwitchKey key, std::uint32_t version);
+void set_max_ports(ChangingTransaction &transaction, SwitchKey key, std::uint32_t max_ports);
+void set_associated(ChangingTransaction &transaction, SwitchKey key, bool associated);
 /// Removes a switch with its ports and properties; its uplinks become free.
-void remove_switch(Transaction &transaction, SwitchKey key);
+void remove_switch(ChangingTransaction &transaction, SwitchKey key);
 
 }  // namespace simhost::storage

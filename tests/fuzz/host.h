@@ -11,7 +11,7 @@
 /// A switch "s" with two of three uplinks and the ports "p1" and "p2".
 inline simhost::storage::Store &shared_host() {
   static simhost::storage::Store store(std::nullopt,
-                                       [](simhost::storage::Transaction &transaction) {
+                                       [](simhost::storage::ChangingTransaction &transaction) {
                                          simhost::run_on(simhost::stored::plane());
                                          simhost::scenario::apply(transaction, R"({
       "clock": {"stopped": true, "now": 1000},

@@ -91,7 +91,7 @@ simhost::BytesView bytes_of(Table const &table) {
 
 /// The host takes a table or refuses it; the sessions of one that it took are there, twice over.
 void offer(Table const &table) {
-  simhost::storage::Transaction transaction(shared_host(), simhost::storage::Access::write);
+  simhost::storage::ChangingTransaction transaction(shared_host());
   auto const key = simhost::get_switch(transaction, "s").key;
   auto const port = simhost::get_port(transaction, key, "p1");
   auto const taken = is_accepted([&] {

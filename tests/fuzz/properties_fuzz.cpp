@@ -16,10 +16,10 @@
 
 namespace {
 
+using simhost::storage::ChangingTransaction;
 using simhost::storage::PropertyOwner;
-using simhost::storage::Transaction;
 
-PropertyOwner consume_owner(Input &input, Transaction &transaction) {
+PropertyOwner consume_owner(Input &input, ChangingTransaction &transaction) {
   auto const key =
       simhost::get_switch(transaction, "s-id", simhost::storage::SwitchName::identifier).key;
   switch (input.ConsumeIntegralInRange(0, 3)) {
@@ -41,7 +41,7 @@ bool is_kept_as_bytes(std::string const &key) {
   return known == nullptr || !known->is_computed();
 }
 
-void set_and_get(Input &input, Transaction &transaction) {
+void set_and_get(Input &input, ChangingTransaction &transaction) {
   auto const owner = consume_owner(input, transaction);
   auto const key = consume_key(input);
   auto const set = [&](simhost::BytesView value) {
@@ -110,7 +110,7 @@ bool is_one_number(simhost::Descriptor const &descriptor) {
                                        kind == FormKind::choice || kind == FormKind::bits);
 }
 
-void set_one_number(Input &input, Transaction &transaction) {
+void set_one_number(Input &input, ChangingTransaction &transaction) {
   auto const known = simhost::descriptors();
   auto const &descriptor = *known[input.ConsumeIntegralInRange<std::size_t>(0, known.size() - 1)];
   if (!is_one_number(descriptor)) {
@@ -131,7 +131,7 @@ void set_one_number(Input &input, Transaction &transaction) {
 }
 
 /// Sets a setting by its name; what is accepted says itself, and is accepted again.
-void say(Input &input, Transaction &transaction) {
+void say(Input &input, ChangingTransaction &transaction) {
   using simhost::scenario::Json;
   auto const known = simhost::descriptors();
   auto const &descriptor = *known[input.ConsumeIntegralInRange<std::size_t>(0, known.size() - 1)];
@@ -173,7 +173,7 @@ void say(Input &input, Transaction &transaction) {
 
 extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size) {
   Input input(data, size);
-  Transaction transaction(shared_host(), simhost::storage::Access::write);
+  ChangingTransaction transaction(shared_host());
   for (int calls = 0; calls < 12 && input.remaining_bytes() > 0; ++calls) {
     switch (input.ConsumeIntegralInRange(0, 2)) {
       case 0:

@@ -79,7 +79,7 @@ void require_same(std::vector<Option> const &one, std::vector<Option> const &oth
 
 /// What the host is given or allocates: a list in memory of its own size.
 void offer(VSRuntimeOptions const &list) {
-  simhost::storage::Transaction transaction(shared_host(), simhost::storage::Access::write);
+  simhost::storage::ChangingTransaction transaction(shared_host());
   is_accepted([&] { simhost::set_runtime_options(transaction, list); });
   std::vector<std::uint16_t> types(VS_NUM_RT_OPT);
   for (std::size_t type = 0; type < types.size(); ++type) {

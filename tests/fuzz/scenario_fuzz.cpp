@@ -17,9 +17,9 @@ namespace {
 
 using simhost::scenario::DocumentError;
 using simhost::scenario::Json;
-using simhost::storage::Transaction;
+using simhost::storage::ChangingTransaction;
 
-bool applies(Transaction &transaction, std::string_view document) {
+bool applies(ChangingTransaction &transaction, std::string_view document) {
   try {
     simhost::scenario::apply(transaction, document);
     return true;
@@ -41,7 +41,7 @@ void remove_observed(Json &value) {
 }
 
 /// The host as callers would describe it: without what follows from the rest.
-Json description_of(Transaction &transaction) {
+Json description_of(ChangingTransaction &transaction) {
   auto described = simhost::scenario::parsed(simhost::scenario::description(transaction));
   remove_observed(described);
   return described;
@@ -128,7 +128,7 @@ extern "C" std::size_t LLVMFuzzerCustomMutator(std::uint8_t *data, std::size_t s
 }
 
 extern "C" int LLVMFuzzerTestOneInput(std::uint8_t const *data, std::size_t size) {
-  Transaction transaction(shared_host(), simhost::storage::Access::write);
+  ChangingTransaction transaction(shared_host());
   if (!applies(transaction, {reinterpret_cast<char const *>(data), size})) {
     return 0;
   }

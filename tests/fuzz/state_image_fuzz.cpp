@@ -20,7 +20,7 @@ using simhost::Bytes;
 using simhost::BytesView;
 using simhost::Extent;
 using simhost::Writer;
-using simhost::storage::Transaction;
+using simhost::storage::ChangingTransaction;
 
 /// What the header of a block says after its magic number, format, kind and version.
 constexpr std::size_t kLength = 16;
@@ -116,14 +116,14 @@ Bytes any_bytes(Input &input) {
   return {view.begin(), view.end()};
 }
 
-bool loads(Transaction &transaction, Block const &image) {
+bool loads(ChangingTransaction &transaction, Block const &image) {
   BytesView const view(image.as<std::byte>(), image.size());
   return is_accepted([&] { simhost::load_state(transaction, view, Extent::whole); });
 }
 
 /// What the host accepts it can describe, and write so that it reads the same again.
 void load(Bytes const &image) {
-  Transaction transaction(shared_host(), simhost::storage::Access::write);
+  ChangingTransaction transaction(shared_host());
   if (!loads(transaction, Block::of(image))) {
     return;
   }
@@ -135,7 +135,7 @@ void load(Bytes const &image) {
 }
 
 void load_into_port(Bytes const &image) {
-  Transaction transaction(shared_host(), simhost::storage::Access::write);
+  ChangingTransaction transaction(shared_host());
   auto const port = simhost::get_port(transaction, simhost::get_switch(transaction, "s").key, "p1");
   auto const block = Block::of(image);
   BytesView const view(block.as<std::byte>(), block.size());

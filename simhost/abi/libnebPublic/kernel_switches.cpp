@@ -43,33 +43,38 @@ QEX_ReturnStatus DVSQEX_SwitchAdd(char const *switchId, char const *alias, qex_u
 }
 
 QEX_ReturnStatus DVSQEX_SwitchRemove(char const *switchId) {
-  return change(__func__, switchId, [](storage::Transaction &transaction, storage::SwitchKey key) {
-    destroy_switch(transaction, key);
-  });
+  return change(__func__, switchId,
+                [](storage::ChangingTransaction &transaction, storage::SwitchKey key) {
+                  destroy_switch(transaction, key);
+                });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchAssociate(char const *switchId) {
-  return change(__func__, switchId, [](storage::Transaction &transaction, storage::SwitchKey key) {
-    change_running(transaction, key, true);
-  });
+  return change(__func__, switchId,
+                [](storage::ChangingTransaction &transaction, storage::SwitchKey key) {
+                  change_running(transaction, key, true);
+                });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchDissociate(char const *switchId) {
-  return change(__func__, switchId, [](storage::Transaction &transaction, storage::SwitchKey key) {
-    change_running(transaction, key, false);
-  });
+  return change(__func__, switchId,
+                [](storage::ChangingTransaction &transaction, storage::SwitchKey key) {
+                  change_running(transaction, key, false);
+                });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchSetVersion(char const *switchId, NEBVersion version) {
-  return change(__func__, switchId, [&](storage::Transaction &transaction, storage::SwitchKey key) {
-    change_version(transaction, key, version);
-  });
+  return change(__func__, switchId,
+                [&](storage::ChangingTransaction &transaction, storage::SwitchKey key) {
+                  change_version(transaction, key, version);
+                });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchSetMaxPorts(char const *switchId, qex_uint32 maxPorts) {
-  return change(__func__, switchId, [&](storage::Transaction &transaction, storage::SwitchKey key) {
-    change_max_ports(transaction, key, maxPorts);
-  });
+  return change(__func__, switchId,
+                [&](storage::ChangingTransaction &transaction, storage::SwitchKey key) {
+                  change_max_ports(transaction, key, maxPorts);
+                });
 }
 
 QEX_ReturnStatus DVSQEX_SwitchPortList(char const *switchId, DVPortList **ports, DVSPortType type) {

@@ -71,20 +71,19 @@ QEX_ReturnStatus VSQEX_SetPortMACTable(char const *switchName, char const *port,
   return changing(__func__, [&](ChangingCall &call) {
     change_table(
         call, switchName, port, entry,
-        [](storage::Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
-          running_plane().put_address(transaction, place, wanted);
-        });
+        [](storage::ChangingTransaction &transaction, Place const &place,
+           VSMACEntry const &wanted) { running_plane().put_address(transaction, place, wanted); });
   });
 }
 
 QEX_ReturnStatus VSQEX_ClearPortMACTable(char const *switchName, char const *port,
                                          VSMACEntry const *entry) {
   return changing(__func__, [&](ChangingCall &call) {
-    change_table(
-        call, switchName, port, entry,
-        [](storage::Transaction &transaction, Place const &place, VSMACEntry const &wanted) {
-          running_plane().remove_address(transaction, place, wanted);
-        });
+    change_table(call, switchName, port, entry,
+                 [](storage::ChangingTransaction &transaction, Place const &place,
+                    VSMACEntry const &wanted) {
+                   running_plane().remove_address(transaction, place, wanted);
+                 });
   });
 }
 

@@ -21,6 +21,7 @@
 #include "scenario/lifecycle.h"
 #include "scenario/scenario.h"
 #include "scenario/texts.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -171,7 +172,8 @@ SIMHOST_API size_t simhost_describe(char *text, size_t size) {
 }
 
 SIMHOST_API int simhost_restart() {
-  return changing([](storage::Transaction &transaction) { scenario::restart_host(transaction); });
+  return changing(
+      [](storage::ChangingTransaction &transaction) { scenario::restart_host(transaction); });
 }
 
 SIMHOST_API int simhost_reset() {
@@ -188,7 +190,7 @@ SIMHOST_API int64_t simhost_clock_now() {
 }
 
 SIMHOST_API int simhost_clock_stop() {
-  return changing([](storage::Transaction &transaction) { stop_clock(transaction); });
+  return changing([](storage::ChangingTransaction &transaction) { stop_clock(transaction); });
 }
 
 SIMHOST_API int simhost_clock_run() {

@@ -7,6 +7,7 @@
 
 #include "base/outcomes.h"
 #include "model/plane.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -69,7 +70,7 @@ Counter const *find_counter(CounterKind kind, std::string_view name) {
   return found == counters.end() ? nullptr : &*found;
 }
 
-void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
+void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                  std::string_view name, std::uint64_t value) {
   auto const kind = kind_of(owner);
   auto const *const counter = find_counter(kind, name);

@@ -153,7 +153,7 @@ void show(Counters const &counters, Record &record) {
 /// Sets a counter from outside, by its name. Refuses a name that the owner does not have
 /// (QEX_NOT_FOUND), a number that its field has no room for (QEX_BAD_PARAM), and what get_wires()
 /// refuses.
-void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
+void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                  std::string_view name, std::uint64_t value);
 
 }  // namespace simhost

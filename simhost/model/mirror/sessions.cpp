@@ -7,10 +7,11 @@
 #include "base/outcomes.h"
 #include "model/lookup.h"
 #include "model/properties/properties.h"
+#include "storage/store.h"
 
 namespace simhost::mirror {
 
-void append_sessions(storage::Transaction &transaction, storage::Port const &port,
+void append_sessions(storage::ChangingTransaction &transaction, storage::Port const &port,
                      BytesView table) {
   auto added = Table::from(table);
   auto const owner = owner_of(port);
@@ -21,7 +22,7 @@ void append_sessions(storage::Transaction &transaction, storage::Port const &por
   set(transaction, sessions, owner, added);
 }
 
-void remove_session(storage::Transaction &transaction, storage::Port const &port,
+void remove_session(storage::ChangingTransaction &transaction, storage::Port const &port,
                     std::string_view sid) {
   auto const owner = owner_of(port);
   auto table = effective(transaction, sessions, owner);

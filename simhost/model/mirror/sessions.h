@@ -16,10 +16,10 @@ namespace simhost::mirror {
 SIMHOST_API BytesView table_bytes(DVMirrorSessionTable const &table);
 
 /// Adds the sessions of a table. Refuses an identifier that is taken (QEX_EXISTS).
-SIMHOST_API void append_sessions(storage::Transaction &transaction, storage::Port const &port,
-                                 BytesView table);
+SIMHOST_API void append_sessions(storage::ChangingTransaction &transaction,
+                                 storage::Port const &port, BytesView table);
 /// Refuses an identifier that no session has (QEX_NOT_FOUND).
-SIMHOST_API void remove_session(storage::Transaction &transaction, storage::Port const &port,
-                                std::string_view sid);
+SIMHOST_API void remove_session(storage::ChangingTransaction &transaction,
+                                storage::Port const &port, std::string_view sid);
 
 }  // namespace simhost::mirror

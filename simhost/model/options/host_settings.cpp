@@ -5,6 +5,7 @@
 
 #include "base/outcomes.h"
 #include "storage/running/host_settings.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -27,7 +28,7 @@ VSMACLearningGlobalProps global_mac_learning(storage::Transaction &transaction) 
   return props;
 }
 
-void set_global_mac_learning(storage::Transaction &transaction,
+void set_global_mac_learning(storage::ChangingTransaction &transaction,
                              VSMACLearningGlobalProps const &given) {
   auto props = given;
   props.learnStatic = given.learnStatic != 0 ? 1 : 0;

@@ -10,8 +10,9 @@
 #include "vswitch/mac_tables.h"
 
 namespace simhost::storage {
+class ChangingTransaction;
 class Transaction;
-}
+}  // namespace simhost::storage
 
 namespace simhost {
 
@@ -34,7 +35,7 @@ inline constexpr VSMACLearningGlobalProps kGlobalLearning{
 
 SIMHOST_API VSMACLearningGlobalProps global_mac_learning(storage::Transaction &transaction);
 /// Refuses an ageing time of 0 or more than VS_MAC_LEARNING_AGING_TIME_MAX (QEX_BAD_PARAM).
-SIMHOST_API void set_global_mac_learning(storage::Transaction &transaction,
+SIMHOST_API void set_global_mac_learning(storage::ChangingTransaction &transaction,
                                          VSMACLearningGlobalProps const &given);
 
 }  // namespace simhost

@@ -8,6 +8,7 @@
 
 #include "base/outcomes.h"
 #include "storage/running/host_settings.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {
@@ -125,7 +126,7 @@ std::int32_t runtime_number(storage::Transaction &transaction, VSRuntimeOptionTy
   return std::get<std::int32_t>(runtime_option(transaction, type));
 }
 
-void set_runtime_option(storage::Transaction &transaction, unsigned type,
+void set_runtime_option(storage::ChangingTransaction &transaction, unsigned type,
                         RuntimeValue const &value) {
   auto const &option = get_option(type);
   if (value.index() != option.initial.index()) {
@@ -140,7 +141,8 @@ void set_runtime_option(storage::Transaction &transaction, unsigned type,
   }
 }
 
-void set_runtime_options(storage::Transaction &transaction, VSRuntimeOptions const &options) {
+void set_runtime_options(storage::ChangingTransaction &transaction,
+                         VSRuntimeOptions const &options) {
   auto const total = options.totalLength;
   if (total < sizeof options || total > VS_CHARDEV_MAX_RUNTIME_OPTIONS_LENGTH) {
     refuse_list();

@@ -13,8 +13,9 @@
 #include "vswitch/runtime_options.h"
 
 namespace simhost::storage {
+class ChangingTransaction;
 class Transaction;
-}
+}  // namespace simhost::storage
 
 namespace simhost {
 
@@ -43,13 +44,13 @@ SIMHOST_API std::int32_t runtime_number(storage::Transaction &transaction,
 /// Refuses a type that no option has (QEX_NOT_SUPPORTED), a value of the other kind, a number out
 /// of bounds (QEX_BAD_PARAM), and a text that is no address of the option's family
 /// (QEX_INVALID_ADDRESS).
-void set_runtime_option(storage::Transaction &transaction, unsigned type,
+void set_runtime_option(storage::ChangingTransaction &transaction, unsigned type,
                         RuntimeValue const &value);
 
 /// Sets the options of a packed list, in its order. Refuses a list that is malformed
 /// (QEX_BAD_PARAM) and what set_runtime_option refuses; nothing past the length that the list
 /// states is read.
-SIMHOST_API void set_runtime_options(storage::Transaction &transaction,
+SIMHOST_API void set_runtime_options(storage::ChangingTransaction &transaction,
                                      VSRuntimeOptions const &options);
 /// The packed list of the options of those types, its length first. Refuses a type that no option
 /// has (QEX_NOT_SUPPORTED) and a list longer than there may be (QEX_LIMIT_EXCEEDED).

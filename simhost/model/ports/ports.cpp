@@ -33,7 +33,7 @@ void check_name(std::string_view name, std::size_t longest) {
   require_utf8(name);
 }
 
-storage::Port added_port(storage::Transaction &transaction, storage::SwitchKey switch_key,
+storage::Port added_port(storage::ChangingTransaction &transaction, storage::SwitchKey switch_key,
                          std::string_view identifier, storage::PortKind kind) {
   check_name(identifier, kLongestIdentifier);
   auto const number = storage::add_port(transaction, switch_key, identifier, kind);
@@ -66,7 +66,7 @@ void check_uplink_ports(std::vector<UplinkPort> const &ports) {
 }
 
 // An uplink port of that identifier, whether or not the switch has it yet.
-storage::Port uplink_port(storage::Transaction &transaction, storage::SwitchKey switch_key,
+storage::Port uplink_port(storage::ChangingTransaction &transaction, storage::SwitchKey switch_key,
                           std::string const &identifier) {
   auto const found = storage::find_port(transaction, switch_key, identifier);
   if (!found) {
@@ -96,7 +96,8 @@ std::string fresh_uplink_identifier(storage::Transaction &transaction,
   }
 }
 
-storage::Port vacant_uplink_port(storage::Transaction &transaction, storage::SwitchKey switch_key) {
+storage::Port vacant_uplink_port(storage::ChangingTransaction &transaction,
+                                 storage::SwitchKey switch_key) {
   auto const ports = storage::uplink_ports_of(transaction, switch_key);
   auto const vacant = std::find_if(ports.begin(), ports.end(), [&](storage::Port const &port) {
     return !storage::uplink_at(transaction, port.number);
@@ -138,8 +139,8 @@ std::vector<std::string> texts_of(BytesView list) {
 
 }  // namespace
 
-storage::Port add_client_port(storage::Transaction &transaction, storage::SwitchKey switch_key,
-                              std::string_view identifier) {
+storage::Port add_client_port(storage::ChangingTransaction &transaction,
+                              storage::SwitchKey switch_key, std::string_view identifier) {
   auto port = added_port(transaction, switch_key, identifier, storage::PortKind::client);
   auto const count = storage::count_ports(transaction, switch_key, storage::PortKind::client);
   if (count > storage::get_switch_row(transaction, switch_key).row.max_ports) {
@@ -148,7 +149,7 @@ storage::Port add_client_port(storage::Transaction &transaction, storage::Switch
   return port;
 }
 
-storage::Port add_vacant_uplink_port(storage::Transaction &transaction,
+storage::Port add_vacant_uplink_port(storage::ChangingTransaction &transaction,
                                      storage::SwitchKey switch_key, std::string_view identifier) {
   auto port = added_port(transaction, switch_key, identifier, storage::PortKind::uplink);
   auto const count = storage::count_ports(transaction, switch_key, storage::PortKind::uplink);
@@ -158,7 +159,7 @@ storage::Port add_vacant_uplink_port(storage::Transaction &transaction,
   return port;
 }
 
-void set_external_id(storage::Transaction &transaction, storage::Port const &port,
+void set_external_id(storage::ChangingTransaction &transaction, storage::Port const &port,
                      std::string_view external_id) {
   check_name(external_id, kLongestIdentifier);
   if (!storage::set_external_id(transaction, port.number, external_id)) {
@@ -166,7 +167,7 @@ void set_external_id(storage::Transaction &transaction, storage::Port const &por
   }
 }
 
-void remove_port(storage::Transaction &transaction, storage::Port const &port) {
+void remove_port(storage::ChangingTransaction &transaction, storage::Port const &port) {
   if (storage::uplink_at(transaction, port.number)) {
     throw Refused(QEX_BUSY);
   }
@@ -240,7 +241,7 @@ void check_port_alias(Setting const &setting) {
   }
 }
 
-void set_uplink_ports(storage::Transaction &transaction, storage::SwitchKey switch_key,
+void set_uplink_ports(storage::ChangingTransaction &transaction, storage::SwitchKey switch_key,
                       std::vector<UplinkPort> const &ports) {
   check_uplink_ports(ports);
   for (auto const &port : storage::uplink_ports_of(transaction, switch_key)) {
@@ -259,7 +260,7 @@ void set_uplink_ports(storage::Transaction &transaction, storage::SwitchKey swit
   }
 }
 
-void add_uplink_port(storage::Transaction &transaction, storage::SwitchKey switch_key,
+void add_uplink_port(storage::ChangingTransaction &transaction, storage::SwitchKey switch_key,
                      std::string_view uplink) {
   auto const found = get_uplink(transaction, uplink);
   if (found.port) {
@@ -271,7 +272,7 @@ void add_uplink_port(storage::Transaction &transaction, storage::SwitchKey switc
   storage::attach_uplink(transaction, uplink, vacant_uplink_port(transaction, switch_key).number);
 }
 
-void remove_uplink_port(storage::Transaction &transaction, storage::SwitchKey switch_key,
+void remove_uplink_port(storage::ChangingTransaction &transaction, storage::SwitchKey switch_key,
                         std::string_view uplink) {
   auto const found = storage::find_uplink(transaction, uplink);
   if (!found || !found->port ||

@@ -23,18 +23,18 @@ inline constexpr std::size_t kLongestName = QEX_NEB_NAME_MAX_LEN - 1;
 /// Adds a port for a client. Refuses an empty identifier (QEX_BAD_PARAM), one of more than 47 bytes
 /// (QEX_NAME_TOO_LONG), one that is taken (QEX_EXISTS), and a port past the switch's limit
 /// (QEX_LIMIT_EXCEEDED).
-SIMHOST_API storage::Port add_client_port(storage::Transaction &transaction,
+SIMHOST_API storage::Port add_client_port(storage::ChangingTransaction &transaction,
                                           storage::SwitchKey switch_key,
                                           std::string_view identifier);
 /// Adds an uplink port without an uplink, by the same rules of identifiers; refuses more than
 /// QEX_TEAM_MAX_UPLINKS (QEX_LIMIT_EXCEEDED).
-storage::Port add_vacant_uplink_port(storage::Transaction &transaction,
+storage::Port add_vacant_uplink_port(storage::ChangingTransaction &transaction,
                                      storage::SwitchKey switch_key, std::string_view identifier);
 /// Sets what another system calls a port, by the rules of identifiers.
-SIMHOST_API void set_external_id(storage::Transaction &transaction, storage::Port const &port,
-                                 std::string_view external_id);
+SIMHOST_API void set_external_id(storage::ChangingTransaction &transaction,
+                                 storage::Port const &port, std::string_view external_id);
 /// Removes a port. Refuses an uplink port with its uplink (QEX_BUSY).
-SIMHOST_API void remove_port(storage::Transaction &transaction, storage::Port const &port);
+SIMHOST_API void remove_port(storage::ChangingTransaction &transaction, storage::Port const &port);
 
 /// The port of a switch that another system knows by `external_id`.
 SIMHOST_API storage::Port get_external_port(storage::Transaction &transaction,
@@ -75,15 +75,16 @@ SIMHOST_API void check_port_alias(Setting const &setting);
 /// Refuses empty names (QEX_BAD_PARAM), long ones (QEX_NAME_TOO_LONG), a name or an identifier
 /// twice or an identifier of another port (QEX_EXISTS), more than QEX_TEAM_MAX_UPLINKS
 /// (QEX_LIMIT_EXCEEDED).
-SIMHOST_API void set_uplink_ports(storage::Transaction &transaction, storage::SwitchKey switch_key,
+SIMHOST_API void set_uplink_ports(storage::ChangingTransaction &transaction,
+                                  storage::SwitchKey switch_key,
                                   std::vector<UplinkPort> const &ports);
 /// Attaches an uplink of the host to the first uplink port without one, or to a new one. Refuses an
 /// unknown uplink (QEX_NOT_FOUND), one that the switch has (QEX_EXISTS) and one that another has
 /// (QEX_BUSY).
-SIMHOST_API void add_uplink_port(storage::Transaction &transaction, storage::SwitchKey switch_key,
-                                 std::string_view uplink);
+SIMHOST_API void add_uplink_port(storage::ChangingTransaction &transaction,
+                                 storage::SwitchKey switch_key, std::string_view uplink);
 /// Removes the uplink port at which an uplink is; the uplink becomes free.
-SIMHOST_API void remove_uplink_port(storage::Transaction &transaction,
+SIMHOST_API void remove_uplink_port(storage::ChangingTransaction &transaction,
                                     storage::SwitchKey switch_key, std::string_view uplink);
 
 /// The uplink ports in a list of names and a list of identifiers, a VSUplinkPorts and a

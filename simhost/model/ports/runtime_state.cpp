@@ -9,6 +9,7 @@
 #include "model/properties/properties.h"
 #include "qexapi/links.h"
 #include "qexapi/switch_ports.h"
+#include "storage/store.h"
 
 namespace simhost {
 namespace {

@@ -30,7 +30,7 @@ namespace simhost {
 
 /// A property and the bytes that it is to have.
 struct Setting {
-  storage::Transaction &transaction;
+  storage::ChangingTransaction &transaction;
   storage::PropertyOwner const &owner;
   BytesView value;
 };

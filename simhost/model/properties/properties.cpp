@@ -62,7 +62,7 @@ storage::Property computed(storage::Transaction &transaction, storage::PropertyO
   return {.type = descriptor.type, .value = descriptor.read(transaction, owner)};
 }
 
-void put(storage::Transaction &transaction, Descriptor const &descriptor,
+void put(storage::ChangingTransaction &transaction, Descriptor const &descriptor,
          storage::PropertyOwner const &owner, BytesView value, storage::PropertyType type) {
   if (descriptor.is_read_only()) {
     throw Refused(QEX_READ_ONLY);
@@ -94,7 +94,7 @@ storage::PropertyType property_type(std::uint32_t number) {
   }
 }
 
-void set_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+void set_property(storage::ChangingTransaction &transaction, storage::PropertyOwner const &owner,
                   std::string_view key, BytesView value, storage::PropertyType type) {
   check_key(owner, key);
   auto const *const known = find_meant(owner, key);
@@ -105,7 +105,7 @@ void set_property(storage::Transaction &transaction, storage::PropertyOwner cons
   put(transaction, *known, owner, value, type);
 }
 
-void set_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+void set_property(storage::ChangingTransaction &transaction, storage::PropertyOwner const &owner,
                   std::string_view key, BytesView value) {
   auto const *const known = find_meant(owner, key);
   if (known == nullptr) {
@@ -180,7 +180,7 @@ std::optional<storage::NamedProperty> next_property(storage::Transaction &transa
   return std::move(*next);
 }
 
-void clear_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+void clear_property(storage::ChangingTransaction &transaction, storage::PropertyOwner const &owner,
                     std::string_view key) {
   auto const *const known = find_meant(owner, key);
   if (known != nullptr && known->is_computed()) {
@@ -191,7 +191,7 @@ void clear_property(storage::Transaction &transaction, storage::PropertyOwner co
   }
 }
 
-void reset_property(storage::Transaction &transaction, storage::PropertyOwner const &owner,
+void reset_property(storage::ChangingTransaction &transaction, storage::PropertyOwner const &owner,
                     std::string_view key) {
   storage::remove_property(transaction, owner, key);
 }
@@ -216,7 +216,7 @@ Bytes effective_bytes(storage::Transaction &transaction, Descriptor const &descr
                                storage::PropertyOwner::global(owner.switch_key));
 }
 
-void set_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
+void set_bytes(storage::ChangingTransaction &transaction, Descriptor const &descriptor,
                storage::PropertyOwner const &owner, BytesView value) {
   put(transaction, descriptor, owner, value, descriptor.type);
 }

@@ -19,11 +19,11 @@ SIMHOST_API storage::PropertyType property_type(std::uint32_t number);
 /// Sets a property. Refuses no name, a known key of another scope, and bytes that the key does not
 /// allow (QEX_BAD_PARAM), a name of more than 255 bytes (QEX_NAME_TOO_LONG), and a key that callers
 /// may only read (QEX_READ_ONLY). A key without a meaning to the host takes any bytes.
-SIMHOST_API void set_property(storage::Transaction &transaction,
+SIMHOST_API void set_property(storage::ChangingTransaction &transaction,
                               storage::PropertyOwner const &owner, std::string_view key,
                               BytesView value, storage::PropertyType type);
 /// Likewise for a key with a meaning, with the type that typed calls give it.
-SIMHOST_API void set_property(storage::Transaction &transaction,
+SIMHOST_API void set_property(storage::ChangingTransaction &transaction,
                               storage::PropertyOwner const &owner, std::string_view key,
                               BytesView value);
 
@@ -52,10 +52,10 @@ SIMHOST_API std::vector<storage::PortProperty> list_stored_at_ports(
 
 /// Clears a property. Refuses one that is not set, which whatever cannot be set never is
 /// (QEX_NOT_FOUND), and one that the host keeps elsewhere (QEX_READ_ONLY).
-SIMHOST_API void clear_property(storage::Transaction &transaction,
+SIMHOST_API void clear_property(storage::ChangingTransaction &transaction,
                                 storage::PropertyOwner const &owner, std::string_view key);
 /// Likewise, but it need not be set.
-SIMHOST_API void reset_property(storage::Transaction &transaction,
+SIMHOST_API void reset_property(storage::ChangingTransaction &transaction,
                                 storage::PropertyOwner const &owner, std::string_view key);
 
 /// Likewise of a setting that is known: its bytes, if it is set or computed.
@@ -66,7 +66,7 @@ SIMHOST_API std::optional<Bytes> find_bytes(storage::Transaction &transaction,
 SIMHOST_API Bytes effective_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
                                   storage::PropertyOwner const &owner);
 /// Sets it, with the type that typed calls give it.
-SIMHOST_API void set_bytes(storage::Transaction &transaction, Descriptor const &descriptor,
+SIMHOST_API void set_bytes(storage::ChangingTransaction &transaction, Descriptor const &descriptor,
                            storage::PropertyOwner const &owner, BytesView value);
 
 /// The value of a setting, if it is set.
@@ -86,13 +86,13 @@ Value effective(storage::Transaction &transaction, Property<Value> const &proper
 
 /// Sets a value; refuses one that the property may not have.
 template <typename Value>
-void set(storage::Transaction &transaction, Property<Value> const &property,
+void set(storage::ChangingTransaction &transaction, Property<Value> const &property,
          storage::PropertyOwner const &owner, std::type_identity_t<Value> const &value) {
   set_bytes(transaction, property, owner, Codec<Value>::bytes(value));
 }
 
 /// Clears a setting, which need not be set.
-inline void clear(storage::Transaction &transaction, Descriptor const &descriptor,
+inline void clear(storage::ChangingTransaction &transaction, Descriptor const &descriptor,
                   storage::PropertyOwner const &owner) {
   reset_property(transaction, owner, descriptor.key);
 }

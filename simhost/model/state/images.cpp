@@ -38,7 +38,7 @@ void write_properties(Writer &writer, storage::Transaction &transaction, Propert
   }
 }
 
-void read_properties(Reader &reader, storage::Transaction &transaction,
+void read_properties(Reader &reader, storage::ChangingTransaction &transaction,
                      PropertyOwner const &owner) {
   for (auto left = reader.number(); left != 0; --left) {
     auto const name = reader.text();
@@ -57,7 +57,7 @@ void write_port(Writer &writer, storage::Transaction &transaction, storage::Port
 }
 
 // An uplink that is not here, or is somewhere else by now, is left where it is.
-void attach_if_free(storage::Transaction &transaction, std::string const &uplink,
+void attach_if_free(storage::ChangingTransaction &transaction, std::string const &uplink,
                     storage::PortNumber port) {
   auto const found = storage::find_uplink(transaction, uplink);
   if (found && !found->port) {
@@ -65,7 +65,8 @@ void attach_if_free(storage::Transaction &transaction, std::string const &uplink
   }
 }
 
-void read_port(Reader &reader, storage::Transaction &transaction, storage::SwitchKey switch_key) {
+void read_port(Reader &reader, storage::ChangingTransaction &transaction,
+               storage::SwitchKey switch_key) {
   auto const identifier = reader.text();
   bool const is_uplink = reader.number() != 0;
   auto const port = is_uplink ? add_vacant_uplink_port(transaction, switch_key, identifier)
@@ -98,7 +99,7 @@ void write_switch(Writer &writer, storage::Transaction &transaction,
   }
 }
 
-void read_switch(Reader &reader, storage::Transaction &transaction) {
+void read_switch(Reader &reader, storage::ChangingTransaction &transaction) {
   auto const alias = reader.text();
   auto const identifier = reader.text();
   auto const portset = reader.text();
@@ -137,7 +138,7 @@ Bytes state_image(storage::Transaction &transaction, Extent extent) {
   return writer.block(extent == Extent::whole ? BlockKind::state : BlockKind::persistent_state, 0);
 }
 
-void load_state(storage::Transaction &transaction, BytesView image, Extent extent) {
+void load_state(storage::ChangingTransaction &transaction, BytesView image, Extent extent) {
   Reader reader(image);
   bool const fits = reader.kind() == BlockKind::persistent_state ||
                     (reader.kind() == BlockKind::state && extent == Extent::whole);
@@ -151,13 +152,13 @@ void load_state(storage::Transaction &transaction, BytesView image, Extent exten
   reader.end();
 }
 
-void clear_state(storage::Transaction &transaction) {
+void clear_state(storage::ChangingTransaction &transaction) {
   for (auto const &found : storage::all_switches(transaction)) {
     storage::remove_switch(transaction, found.key);
   }
 }
 
-void sanitize_state(storage::Transaction &transaction) {
+void sanitize_state(storage::ChangingTransaction &transaction) {
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     if (!row.associated && !row.persistent) {
       storage::remove_switch(transaction, key);
@@ -181,7 +182,8 @@ Bytes port_image(storage::Transaction &transaction, storage::Port const &port, E
   return writer.block(BlockKind::port_state, version);
 }
 
-void load_port(storage::Transaction &transaction, storage::Port const &port, BytesView image) {
+void load_port(storage::ChangingTransaction &transaction, storage::Port const &port,
+               BytesView image) {
   Reader reader(image);
   if (reader.kind() != BlockKind::port_state) {
     throw Refused(QEX_BAD_PARAM);

@@ -17,18 +17,19 @@ SIMHOST_API Bytes state_image(storage::Transaction &transaction, Extent extent);
 /// free. Refuses an image of a port, damaged ones as Reader does, and content that no calls could
 /// have made, as those calls would; a persistent extent refuses the image of a whole state
 /// (QEX_BAD_PARAM).
-SIMHOST_API void load_state(storage::Transaction &transaction, BytesView image, Extent extent);
+SIMHOST_API void load_state(storage::ChangingTransaction &transaction, BytesView image,
+                            Extent extent);
 /// Removes all switches; all uplinks become free.
-SIMHOST_API void clear_state(storage::Transaction &transaction);
+SIMHOST_API void clear_state(storage::ChangingTransaction &transaction);
 /// Removes the ports of type DVSPORT_TYPE_ZOMBIE, and the switches that neither run on this host
 /// nor are persistent.
-SIMHOST_API void sanitize_state(storage::Transaction &transaction);
+SIMHOST_API void sanitize_state(storage::ChangingTransaction &transaction);
 
 /// The properties of a port, for a switch of that version; refuses version 0 (QEX_BAD_PARAM).
 SIMHOST_API Bytes port_image(storage::Transaction &transaction, storage::Port const &port,
                              Extent extent, std::uint32_t version);
 /// Gives a port the properties of an image, beside its own.
-SIMHOST_API void load_port(storage::Transaction &transaction, storage::Port const &port,
+SIMHOST_API void load_port(storage::ChangingTransaction &transaction, storage::Port const &port,
                            BytesView image);
 
 }  // namespace simhost

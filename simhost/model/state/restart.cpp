@@ -7,7 +7,7 @@
 
 namespace simhost {
 
-void restart_configuration(storage::Transaction &transaction) {
+void restart_configuration(storage::ChangingTransaction &transaction) {
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     if (!row.persistent) {
       storage::remove_switch(transaction, key);

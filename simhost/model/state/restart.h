@@ -4,13 +4,13 @@
 #include "base/api.h"
 
 namespace simhost::storage {
-class Transaction;
+class ChangingTransaction;
 }
 
 namespace simhost {
 
 /// Drops what does not outlast a restart: switches that are not persistent, and runtime and
 /// volatile properties. Ports keep their numbers.
-SIMHOST_API void restart_configuration(storage::Transaction &transaction);
+SIMHOST_API void restart_configuration(storage::ChangingTransaction &transaction);
 
 }  // namespace simhost

@@ -81,7 +81,7 @@ storage::Switch row_of(storage::Transaction &transaction, SwitchSpec const &spec
           .associated = spec.associated};
 }
 
-void attach_free_uplinks(storage::Transaction &transaction, storage::SwitchKey key,
+void attach_free_uplinks(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                          std::uint32_t count) {
   auto const free = storage::free_uplinks(transaction);
   if (count > free.size()) {
@@ -98,7 +98,8 @@ storage::Switch get_row(storage::Transaction &transaction, storage::SwitchKey ke
 
 }  // namespace
 
-storage::SwitchKey create_switch(storage::Transaction &transaction, SwitchSpec const &spec) {
+storage::SwitchKey create_switch(storage::ChangingTransaction &transaction,
+                                 SwitchSpec const &spec) {
   auto const key = storage::add_switch(transaction, row_of(transaction, spec));
   if (!key) {
     throw Refused(QEX_EXISTS);
@@ -109,19 +110,20 @@ storage::SwitchKey create_switch(storage::Transaction &transaction, SwitchSpec c
   return *key;
 }
 
-void destroy_switch(storage::Transaction &transaction, std::string_view alias) {
+void destroy_switch(storage::ChangingTransaction &transaction, std::string_view alias) {
   destroy_switch(transaction, get_switch(transaction, alias).key);
 }
 
-void destroy_switch(storage::Transaction &transaction, storage::SwitchKey key) {
+void destroy_switch(storage::ChangingTransaction &transaction, storage::SwitchKey key) {
   storage::remove_switch(transaction, key);
 }
 
-void change_running(storage::Transaction &transaction, storage::SwitchKey key, bool running) {
+void change_running(storage::ChangingTransaction &transaction, storage::SwitchKey key,
+                    bool running) {
   storage::set_associated(transaction, key, running);
 }
 
-void change_version(storage::Transaction &transaction, storage::SwitchKey key,
+void change_version(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                     std::uint32_t version) {
   if (version == 0) {
     throw Refused(QEX_BAD_PARAM);
@@ -129,7 +131,7 @@ void change_version(storage::Transaction &transaction, storage::SwitchKey key,
   storage::set_version(transaction, key, version);
 }
 
-void change_max_ports(storage::Transaction &transaction, storage::SwitchKey key,
+void change_max_ports(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                       std::uint32_t max_ports) {
   if (max_ports == 0 || max_ports > kGreatestMaxPorts) {
     throw Refused(QEX_BAD_PARAM);

@@ -42,22 +42,22 @@ struct SwitchSpec {
 /// Creates a switch and attaches free uplinks to its uplink ports "uplink1", "uplink2", ... Refuses
 /// an empty alias and a number out of bounds (QEX_BAD_PARAM), a name too long (QEX_NAME_TOO_LONG),
 /// a name that is taken (QEX_EXISTS), and more uplinks than are free (QEX_NO_RESOURCES).
-SIMHOST_API storage::SwitchKey create_switch(storage::Transaction &transaction,
+SIMHOST_API storage::SwitchKey create_switch(storage::ChangingTransaction &transaction,
                                              SwitchSpec const &spec);
 /// Destroys a switch with its ports and properties; its uplinks become free.
-SIMHOST_API void destroy_switch(storage::Transaction &transaction, std::string_view alias);
+SIMHOST_API void destroy_switch(storage::ChangingTransaction &transaction, std::string_view alias);
 
-SIMHOST_API void destroy_switch(storage::Transaction &transaction, storage::SwitchKey key);
+SIMHOST_API void destroy_switch(storage::ChangingTransaction &transaction, storage::SwitchKey key);
 /// Starts or stops running a switch on this host.
-SIMHOST_API void change_running(storage::Transaction &transaction, storage::SwitchKey key,
+SIMHOST_API void change_running(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                                 bool running);
 
 /// Refuses 0 (QEX_BAD_PARAM).
-SIMHOST_API void change_version(storage::Transaction &transaction, storage::SwitchKey key,
+SIMHOST_API void change_version(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                                 std::uint32_t version);
 /// Refuses 0 and more than a switch can have (QEX_BAD_PARAM), and fewer than it has
 /// (QEX_LIMIT_EXCEEDED).
-SIMHOST_API void change_max_ports(storage::Transaction &transaction, storage::SwitchKey key,
+SIMHOST_API void change_max_ports(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                                   std::uint32_t max_ports);
 
 /// From one name of a switch to another.

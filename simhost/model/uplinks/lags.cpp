@@ -7,6 +7,7 @@
 #include "base/outcomes.h"
 #include "model/lookup.h"
 #include "model/plane.h"
+#include "storage/store.h"
 #include "vswitch/lags.h"
 
 namespace simhost {
@@ -28,8 +29,8 @@ std::vector<Lag> lags_of(storage::Transaction &transaction, storage::SwitchKey k
   return lags;
 }
 
-void put_lag(storage::Transaction &transaction, storage::SwitchKey key, std::string_view name,
-             std::vector<std::string> const &uplinks) {
+void put_lag(storage::ChangingTransaction &transaction, storage::SwitchKey key,
+             std::string_view name, std::vector<std::string> const &uplinks) {
   if (name.empty()) {
     throw Refused(QEX_BAD_PARAM);
   }

@@ -32,7 +32,7 @@ SIMHOST_API std::vector<Lag> lags_of(storage::Transaction &transaction, storage:
 /// long for a VSLAGStatus (QEX_BAD_PARAM, QEX_NAME_TOO_LONG), more groups or uplinks than there may
 /// be (QEX_LIMIT_EXCEEDED), an uplink that is not the switch's (QEX_NOT_FOUND) and one that is in
 /// another group (QEX_BUSY).
-void put_lag(storage::Transaction &transaction, storage::SwitchKey key, std::string_view name,
-             std::vector<std::string> const &uplinks);
+void put_lag(storage::ChangingTransaction &transaction, storage::SwitchKey key,
+             std::string_view name, std::vector<std::string> const &uplinks);
 
 }  // namespace simhost

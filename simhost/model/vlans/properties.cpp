@@ -6,6 +6,7 @@
 #include <span>
 
 #include "model/properties/properties.h"
+#include "storage/store.h"
 
 namespace simhost::vlans {
 namespace {

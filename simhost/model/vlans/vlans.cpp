@@ -4,10 +4,11 @@
 #include "base/outcomes.h"
 #include "model/lookup.h"
 #include "model/properties/properties.h"
+#include "storage/store.h"
 
 namespace simhost {
 
-void set_vlans(storage::Transaction &transaction, storage::Port const &port,
+void set_vlans(storage::ChangingTransaction &transaction, storage::Port const &port,
                vlans::PortVlans const &wanted) {
   if (wanted.priority != vlans::kNoPriority) {
     check_number(vlans::priority, wanted.priority);
@@ -21,7 +22,7 @@ void set_vlans(storage::Transaction &transaction, storage::Port const &port,
   }
 }
 
-void clear_vlans(storage::Transaction &transaction, storage::Port const &port) {
+void clear_vlans(storage::ChangingTransaction &transaction, storage::Port const &port) {
   clear(transaction, vlans::of_port, owner_of(port));
   clear(transaction, vlans::priority, owner_of(port));
 }

@@ -1,5 +1,6 @@
 // Counters are rows of the state, by their names.
 #include "planes/stored/counters.h"
+#include "storage/store.h"
 
 #include <algorithm>
 
@@ -17,12 +18,12 @@ Counters counters_of(storage::Transaction &transaction, CounterOwner const &owne
   return counters;
 }
 
-void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
+void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                  Counter const &counter, std::uint64_t value) {
   storage::put_counter(transaction, owner, counter.name, value);
 }
 
-void add_to_counter(storage::Transaction &transaction, CounterOwner const &owner,
+void add_to_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                     Counter const &counter, std::uint64_t more) {
   auto const value = std::min(storage::find_counter(transaction, owner, counter.name).value_or(0),
                               counter.greatest);

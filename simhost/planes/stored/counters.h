@@ -8,10 +8,10 @@
 namespace simhost::stored {
 
 Counters counters_of(storage::Transaction &transaction, CounterOwner const &owner);
-void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
+void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                  Counter const &counter, std::uint64_t value);
 /// Counts on; a counter that is full stays full.
-void add_to_counter(storage::Transaction &transaction, CounterOwner const &owner,
+void add_to_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                     Counter const &counter, std::uint64_t more);
 
 }  // namespace simhost::stored

@@ -2,6 +2,7 @@
 #include "planes/stored/links.h"
 
 #include "clock/clock.h"
+#include "storage/store.h"
 
 namespace simhost::stored {
 
@@ -9,7 +10,8 @@ Link link_of(storage::Transaction &transaction, std::string_view uplink) {
   return storage::find_link(transaction, uplink).value_or(Link{});
 }
 
-void set_link(storage::Transaction &transaction, std::string_view uplink, Link const &link) {
+void set_link(storage::ChangingTransaction &transaction, std::string_view uplink,
+              Link const &link) {
   auto const before = link_of(transaction, uplink);
   auto changed = link;
   changed.up_since = link.up() && !before.up() ? clock_now(transaction) : before.up_since;

@@ -9,7 +9,7 @@ namespace simhost::stored {
 
 Link link_of(storage::Transaction &transaction, std::string_view uplink);
 /// Changes a link. Its up_since is kept by the clock, whatever `link` says.
-void set_link(storage::Transaction &transaction, std::string_view uplink, Link const &link);
+void set_link(storage::ChangingTransaction &transaction, std::string_view uplink, Link const &link);
 
 /// Whether the other end would aggregate the link with others.
 inline bool would_aggregate(Link const &link) {

@@ -12,6 +12,7 @@
 #include "model/properties/properties.h"
 #include "planes/stored/counters.h"
 #include "qexapi/protocols.h"
+#include "storage/store.h"
 #include "vswitch/mac_learning.h"
 
 namespace simhost::stored {
@@ -63,7 +64,7 @@ ClockTime gone_if_seen_by(storage::Transaction &transaction, VSMACLearning const
   return clock_now(transaction) - std::chrono::seconds(learning.agingTime);
 }
 
-void remove_aged(storage::Transaction &transaction, storage::SwitchKey key,
+void remove_aged(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                  VSMACLearning const &learning) {
   storage::remove_aged(transaction, key, gone_if_seen_by(transaction, learning));
 }
@@ -101,7 +102,7 @@ bool has_room(storage::Transaction &transaction, Place const &place, VSMACLearni
 }
 
 // A source that is not learned because there is no room.
-Sighting turn_away(storage::Transaction &transaction, Place const &place,
+Sighting turn_away(storage::ChangingTransaction &transaction, Place const &place,
                    VSPMACLearning const &port) {
   if (!place.port) {
     return Sighting::let_through;
@@ -128,7 +129,8 @@ std::vector<VSMACEntry> addresses(storage::Transaction &transaction, Place const
   return entries;
 }
 
-void put_address(storage::Transaction &transaction, Place const &place, VSMACEntry const &entry) {
+void put_address(storage::ChangingTransaction &transaction, Place const &place,
+                 VSMACEntry const &entry) {
   if (entry.macAddrType != VS_MAC_ADDR_TYPE_STATIC && entry.macAddrType != VS_MAC_ADDR_TYPE_USER) {
     throw Refused(QEX_BAD_PARAM);
   }
@@ -137,7 +139,7 @@ void put_address(storage::Transaction &transaction, Place const &place, VSMACEnt
   describe_address(transaction, place, just_seen);
 }
 
-void describe_address(storage::Transaction &transaction, Place const &place,
+void describe_address(storage::ChangingTransaction &transaction, Place const &place,
                       VSMACEntry const &entry) {
   check_source(entry);
   if (entry.macAddrType > VS_MAC_ADDR_TYPE_LEARNED) {
@@ -157,7 +159,7 @@ void describe_address(storage::Transaction &transaction, Place const &place,
                           .seen = clock_now(transaction) - std::chrono::seconds(elapsed)});
 }
 
-void remove_address(storage::Transaction &transaction, Place const &place,
+void remove_address(storage::ChangingTransaction &transaction, Place const &place,
                     VSMACEntry const &entry) {
   remove_aged(transaction, place.switch_key, learning_of(transaction, place.switch_key));
   auto const known = storage::find_address(transaction, place.switch_key, name_of(entry));
@@ -168,7 +170,8 @@ void remove_address(storage::Transaction &transaction, Place const &place,
   storage::remove_address(transaction, known->row);
 }
 
-Sighting learn(storage::Transaction &transaction, Place const &place, VSMACEntry const &source) {
+Sighting learn(storage::ChangingTransaction &transaction, Place const &place,
+               VSMACEntry const &source) {
   check_source(source);
   auto const learning = learning_of(transaction, place.switch_key);
   auto const port = place.port ? port_learning(transaction, place) : VSPMACLearning{};

@@ -17,14 +17,17 @@ std::vector<VSMACEntry> addresses(storage::Transaction &transaction, Place const
                                   VSMACAddrType type);
 
 /// See Plane::put_address.
-void put_address(storage::Transaction &transaction, Place const &place, VSMACEntry const &entry);
+void put_address(storage::ChangingTransaction &transaction, Place const &place,
+                 VSMACEntry const &entry);
 /// See Wires::describe_address.
-void describe_address(storage::Transaction &transaction, Place const &place,
+void describe_address(storage::ChangingTransaction &transaction, Place const &place,
                       VSMACEntry const &entry);
 /// See Plane::remove_address.
-void remove_address(storage::Transaction &transaction, Place const &place, VSMACEntry const &entry);
+void remove_address(storage::ChangingTransaction &transaction, Place const &place,
+                    VSMACEntry const &entry);
 /// See Wires::learn.
-Sighting learn(storage::Transaction &transaction, Place const &place, VSMACEntry const &source);
+Sighting learn(storage::ChangingTransaction &transaction, Place const &place,
+               VSMACEntry const &source);
 /// See Plane::learning_stats.
 VSPMACLearningStats learning_stats(storage::Transaction &transaction, Place const &place);
 

@@ -6,6 +6,7 @@
 #include "base/outcomes.h"
 #include "model/options/runtime_options.h"
 #include "qexapi/protocols.h"
+#include "storage/store.h"
 #include "vswitch/mcast_filters.h"
 
 namespace simhost::stored {
@@ -53,7 +54,8 @@ void check(storage::Transaction &transaction, McastGroup const &group) {
 
 }  // namespace
 
-void join(storage::Transaction &transaction, storage::PortNumber port, McastGroup const &group) {
+void join(storage::ChangingTransaction &transaction, storage::PortNumber port,
+          McastGroup const &group) {
   check(transaction, group);
   auto joined = group;
   joined.updated = clock_now(transaction);
@@ -61,7 +63,7 @@ void join(storage::Transaction &transaction, storage::PortNumber port, McastGrou
   storage::insert_group(transaction, port, joined);
 }
 
-void leave(storage::Transaction &transaction, storage::PortNumber port,
+void leave(storage::ChangingTransaction &transaction, storage::PortNumber port,
            AddressBytes const &address) {
   if (!storage::remove_group(transaction, port, address)) {
     throw Refused(QEX_NOT_FOUND);

@@ -6,9 +6,10 @@
 namespace simhost::stored {
 
 /// See Wires::join.
-void join(storage::Transaction &transaction, storage::PortNumber port, McastGroup const &group);
+void join(storage::ChangingTransaction &transaction, storage::PortNumber port,
+          McastGroup const &group);
 /// See Wires::leave.
-void leave(storage::Transaction &transaction, storage::PortNumber port,
+void leave(storage::ChangingTransaction &transaction, storage::PortNumber port,
            AddressBytes const &address);
 
 }  // namespace simhost::stored

@@ -7,6 +7,7 @@
 #include "planes/stored/mac_tables.h"
 #include "planes/stored/multicast.h"
 #include "planes/stored/teaming.h"
+#include "storage/store.h"
 
 namespace simhost::stored {
 namespace {
@@ -18,27 +19,27 @@ class StoredWires : public Wires {
   Link link_of(storage::Transaction &transaction, std::string_view uplink) override {
     return stored::link_of(transaction, uplink);
   }
-  void change_link(storage::Transaction &transaction, std::string_view uplink,
+  void change_link(storage::ChangingTransaction &transaction, std::string_view uplink,
                    Link const &link) override {
     teaming_.change_link(transaction, uplink, link);
   }
-  Sighting learn(storage::Transaction &transaction, Place const &place,
+  Sighting learn(storage::ChangingTransaction &transaction, Place const &place,
                  VSMACEntry const &source) override {
     return stored::learn(transaction, place, source);
   }
-  void describe_address(storage::Transaction &transaction, Place const &place,
+  void describe_address(storage::ChangingTransaction &transaction, Place const &place,
                         VSMACEntry const &entry) override {
     stored::describe_address(transaction, place, entry);
   }
-  void join(storage::Transaction &transaction, storage::PortNumber port,
+  void join(storage::ChangingTransaction &transaction, storage::PortNumber port,
             McastGroup const &group) override {
     stored::join(transaction, port, group);
   }
-  void leave(storage::Transaction &transaction, storage::PortNumber port,
+  void leave(storage::ChangingTransaction &transaction, storage::PortNumber port,
              AddressBytes const &address) override {
     stored::leave(transaction, port, address);
   }
-  void set_counter(storage::Transaction &transaction, CounterOwner const &owner,
+  void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &owner,
                    Counter const &counter, std::uint64_t value) override {
     stored::set_counter(transaction, owner, counter, value);
   }
@@ -82,28 +83,28 @@ class StoredPlane : public Plane {
     return storage::sessions_with_counters(transaction, key);
   }
 
-  void set_admin_state(storage::Transaction &transaction, std::string_view uplink,
+  void set_admin_state(storage::ChangingTransaction &transaction, std::string_view uplink,
                        bool up) override {
     auto link = link_of(transaction, uplink);
     link.admin = up;
     teaming_.change_link(transaction, uplink, link);
   }
-  void put_address(storage::Transaction &transaction, Place const &place,
+  void put_address(storage::ChangingTransaction &transaction, Place const &place,
                    VSMACEntry const &entry) override {
     stored::put_address(transaction, place, entry);
   }
-  void remove_address(storage::Transaction &transaction, Place const &place,
+  void remove_address(storage::ChangingTransaction &transaction, Place const &place,
                       VSMACEntry const &entry) override {
     stored::remove_address(transaction, place, entry);
   }
-  void restart(storage::Transaction &transaction) override {
+  void restart(storage::ChangingTransaction &transaction) override {
     storage::remove_learned(transaction);
     storage::remove_groups(transaction);
     storage::remove_counters(transaction);
   }
 
   // The state is all that is running: whatever it says, it says to whoever asks next.
-  void prepare(storage::Transaction & /*transaction*/) override {}
+  void prepare(storage::ChangingTransaction & /*transaction*/) override {}
   void committed() noexcept override {}
 
   Wires *find_wires() override { return &wires_; }

@@ -13,6 +13,7 @@
 #include "model/teaming/properties.h"
 #include "planes/stored/counters.h"
 #include "planes/stored/links.h"
+#include "storage/store.h"
 
 namespace simhost::stored {
 namespace {
@@ -66,7 +67,8 @@ std::optional<storage::SwitchKey> switch_running_over(storage::Transaction &tran
                                                                   : std::nullopt;
 }
 
-void announce(storage::Transaction &transaction, storage::SwitchKey key, std::uint64_t sent) {
+void announce(storage::ChangingTransaction &transaction, storage::SwitchKey key,
+              std::uint64_t sent) {
   if (sent > 0) {
     CounterOwner const owner{.switch_key = key};
     add_to_counter(transaction, owner, counter_in(&VSRARPStats::rarpPktsSent), sent);
@@ -180,7 +182,7 @@ std::uint64_t Teaming::count_announced(KeptTeam const &before, KeptTeam const &a
   return count;
 }
 
-void Teaming::change_link(storage::Transaction &transaction, std::string_view uplink,
+void Teaming::change_link(storage::ChangingTransaction &transaction, std::string_view uplink,
                           Link const &link) {
   auto const running = switch_running_over(transaction, uplink);
   if (!running) {

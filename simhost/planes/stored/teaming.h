@@ -40,7 +40,8 @@ class Teaming {
   /// Changes a link and lets the teams of its switch follow: every port that moves to another
   /// uplink is announced with a reverse-ARP packet if its policy says TEAM_FRP_FLAG_NOTIFY_SWITCH,
   /// at most MaxRARPsPerInterval of them.
-  void change_link(storage::Transaction &transaction, std::string_view uplink, Link const &link);
+  void change_link(storage::ChangingTransaction &transaction, std::string_view uplink,
+                   Link const &link);
 
  private:
   struct KeptTeam {

@@ -78,32 +78,32 @@ std::optional<FoundAddress> find_address(Transaction &transaction, SwitchKey key
   return select.first(found_at);
 }
 
-void place_address(Transaction &transaction, Place const &place, Address const &address) {
-  Query upsert(transaction, "INSERT INTO address (switch, port, " ADDRESS_COLUMNS
-                            ") VALUES (?, nullif(?, 0), ?, ?, ?, ?, ?, ?)"
-                            " ON CONFLICT (switch, mac, vid, vni) DO UPDATE SET"
-                            " port = excluded.port, type = excluded.type, ages = excluded.ages,"
-                            " seen = excluded.seen");
+void place_address(ChangingTransaction &transaction, Place const &place, Address const &address) {
+  Change upsert(transaction, "INSERT INTO address (switch, port, " ADDRESS_COLUMNS
+                             ") VALUES (?, nullif(?, 0), ?, ?, ?, ?, ?, ?)"
+                             " ON CONFLICT (switch, mac, vid, vni) DO UPDATE SET"
+                             " port = excluded.port, type = excluded.type, ages = excluded.ages,"
+                             " seen = excluded.seen");
   bind_name(upsert.with(place.switch_key).with(port_or_none(place)), address.name);
   upsert.with(address.type).with(address.ages).with(address.seen.count()).run();
 }
 
-void set_seen(Transaction &transaction, AddressRow row, std::chrono::milliseconds seen) {
-  Query update(transaction, "UPDATE address SET seen = ? WHERE rowid = ?");
+void set_seen(ChangingTransaction &transaction, AddressRow row, std::chrono::milliseconds seen) {
+  Change update(transaction, "UPDATE address SET seen = ? WHERE rowid = ?");
   update.with(seen.count()).with(row).run();
 }
 
-void remove_address(Transaction &transaction, AddressRow row) {
-  Query(transaction, "DELETE FROM address WHERE rowid = ?").with(row).run();
+void remove_address(ChangingTransaction &transaction, AddressRow row) {
+  Change(transaction, "DELETE FROM address WHERE rowid = ?").with(row).run();
 }
 
-void remove_aged(Transaction &transaction, SwitchKey key, std::chrono::milliseconds gone) {
-  Query remove(transaction, "DELETE FROM address WHERE switch = ? AND ages AND seen <= ?");
+void remove_aged(ChangingTransaction &transaction, SwitchKey key, std::chrono::milliseconds gone) {
+  Change remove(transaction, "DELETE FROM address WHERE switch = ? AND ages AND seen <= ?");
   remove.with(key).with(gone.count()).run();
 }
 
-void remove_learned(Transaction &transaction) {
-  Query(transaction, "DELETE FROM address WHERE type = ?").with(VS_MAC_ADDR_TYPE_LEARNED).run();
+void remove_learned(ChangingTransaction &transaction) {
+  Change(transaction, "DELETE FROM address WHERE type = ?").with(VS_MAC_ADDR_TYPE_LEARNED).run();
 }
 
 std::int64_t count_learned(Transaction &transaction, Place const &place) {

@@ -50,12 +50,12 @@ std::vector<Address> addresses_at(Transaction &transaction, Place const &place, 
 std::optional<FoundAddress> find_address(Transaction &transaction, SwitchKey key,
                                          AddressName const &name);
 /// Puts an address at a place, wherever it was before.
-void place_address(Transaction &transaction, Place const &place, Address const &address);
-void set_seen(Transaction &transaction, AddressRow row, std::chrono::milliseconds seen);
-void remove_address(Transaction &transaction, AddressRow row);
+void place_address(ChangingTransaction &transaction, Place const &place, Address const &address);
+void set_seen(ChangingTransaction &transaction, AddressRow row, std::chrono::milliseconds seen);
+void remove_address(ChangingTransaction &transaction, AddressRow row);
 /// Removes from a switch what ages and was last seen at `gone` or before.
-void remove_aged(Transaction &transaction, SwitchKey key, std::chrono::milliseconds gone);
-void remove_learned(Transaction &transaction);
+void remove_aged(ChangingTransaction &transaction, SwitchKey key, std::chrono::milliseconds gone);
+void remove_learned(ChangingTransaction &transaction);
 
 /// How many addresses are learned at a place, or at all places of a switch: with those that are too
 /// old and have not been removed yet.

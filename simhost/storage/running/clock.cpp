@@ -11,8 +11,8 @@ ClockRow get_clock(Transaction &transaction) {
   return {.stopped = select.flag(0), .value = select.time(1)};
 }
 
-void put_clock(Transaction &transaction, ClockRow const &row) {
-  Query update(transaction, "UPDATE clock SET stopped = ?, value = ?");
+void put_clock(ChangingTransaction &transaction, ClockRow const &row) {
+  Change update(transaction, "UPDATE clock SET stopped = ?, value = ?");
   update.with(row.stopped).with(row.value.count()).run();
 }
 

@@ -5,6 +5,7 @@
 
 namespace simhost::storage {
 
+class ChangingTransaction;
 class Transaction;
 
 struct ClockRow {
@@ -14,6 +15,6 @@ struct ClockRow {
 };
 
 ClockRow get_clock(Transaction &transaction);
-void put_clock(Transaction &transaction, ClockRow const &row);
+void put_clock(ChangingTransaction &transaction, ClockRow const &row);
 
 }  // namespace simhost::storage

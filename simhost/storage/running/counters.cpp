@@ -33,9 +33,9 @@ std::optional<std::uint64_t> find_counter(Transaction &transaction, CounterOwner
   return select.with(name).first([](Query const &row) { return value_at(row, 0); });
 }
 
-void put_counter(Transaction &transaction, CounterOwner const &owner, std::string_view name,
+void put_counter(ChangingTransaction &transaction, CounterOwner const &owner, std::string_view name,
                  std::uint64_t value) {
-  Query upsert(
+  Change upsert(
       transaction,
       "INSERT INTO counter (switch, port, session, name, value) VALUES (?, nullif(?, 0), ?, ?, ?)"
       " ON CONFLICT (switch, ifnull(port, 0), session, name) DO UPDATE SET value = excluded.value");
@@ -50,8 +50,8 @@ std::vector<std::string> sessions_with_counters(Transaction &transaction, Switch
   return select.with(key).all([](Query const &row) { return row.text(0); });
 }
 
-void remove_counters(Transaction &transaction) {
-  Query(transaction, "DELETE FROM counter").run();
+void remove_counters(ChangingTransaction &transaction) {
+  Change(transaction, "DELETE FROM counter").run();
 }
 
 }  // namespace simhost::storage

@@ -28,10 +28,10 @@ std::vector<CounterRow> all_counters(Transaction &transaction, CounterOwner cons
 std::optional<std::uint64_t> find_counter(Transaction &transaction, CounterOwner const &owner,
                                           std::string_view name);
 /// Sets a counter, whether or not it was there.
-void put_counter(Transaction &transaction, CounterOwner const &owner, std::string_view name,
+void put_counter(ChangingTransaction &transaction, CounterOwner const &owner, std::string_view name,
                  std::uint64_t value);
 /// The mirror sessions of a switch that have counted, in the order of their names.
 std::vector<std::string> sessions_with_counters(Transaction &transaction, SwitchKey key);
-void remove_counters(Transaction &transaction);
+void remove_counters(ChangingTransaction &transaction);
 
 }  // namespace simhost::storage

@@ -35,9 +35,9 @@ WaitingFault fault_at(Query const &row) {
 
 }  // namespace
 
-void insert_fault(Transaction &transaction, Fault const &fault) {
-  Query insert(transaction,
-               "INSERT INTO fault (" FAULT_COLUMNS ") VALUES (?, ?, ?, ?, ?, ?, ?, ?)");
+void insert_fault(ChangingTransaction &transaction, Fault const &fault) {
+  Change insert(transaction,
+                "INSERT INTO fault (" FAULT_COLUMNS ") VALUES (?, ?, ?, ?, ?, ?, ?, ?)");
   insert.with(fault.function).with(fault.first).with(fault.last).with(std::int64_t{0});
   insert.with(fault.delay.count()).with(fault.status).with(fault.exception).with(fault.message);
   insert.run();
@@ -51,22 +51,22 @@ bool has_fault(Transaction &transaction, std::string_view function) {
   return Query(transaction, "SELECT 1 FROM fault WHERE function = ?").with(function).next();
 }
 
-std::vector<Fault> count_for_faults(Transaction &transaction, std::string_view function) {
-  Query(transaction, "UPDATE fault SET seen = seen + 1 WHERE function = ?").with(function).run();
+std::vector<Fault> count_for_faults(ChangingTransaction &transaction, std::string_view function) {
+  Change(transaction, "UPDATE fault SET seen = seen + 1 WHERE function = ?").with(function).run();
   auto hits = Query(transaction,
                     SELECT_FAULT " WHERE function = ? AND seen BETWEEN first AND last ORDER BY key")
                   .with(function)
                   .all([](Query const &row) { return fault_at(row).fault; });
-  Query(transaction, "DELETE FROM fault WHERE function = ? AND seen >= last").with(function).run();
+  Change(transaction, "DELETE FROM fault WHERE function = ? AND seen >= last").with(function).run();
   return hits;
 }
 
-void remove_faults(Transaction &transaction, std::string_view function) {
-  Query(transaction, "DELETE FROM fault WHERE function = ?").with(function).run();
+void remove_faults(ChangingTransaction &transaction, std::string_view function) {
+  Change(transaction, "DELETE FROM fault WHERE function = ?").with(function).run();
 }
 
-void remove_all_faults(Transaction &transaction) {
-  Query(transaction, "DELETE FROM fault").run();
+void remove_all_faults(ChangingTransaction &transaction) {
+  Change(transaction, "DELETE FROM fault").run();
 }
 
 }  // namespace simhost::storage

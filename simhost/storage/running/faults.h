@@ -12,6 +12,7 @@
 
 namespace simhost::storage {
 
+class ChangingTransaction;
 class Transaction;
 
 /// One or more of a delay, and a status or an exception. A call that several faults hit waits for
@@ -33,16 +34,16 @@ struct WaitingFault {
   std::int64_t seen;  ///< calls since it was added
 };
 
-void insert_fault(Transaction &transaction, Fault const &fault);
+void insert_fault(ChangingTransaction &transaction, Fault const &fault);
 /// All faults, in the order in which they were added.
 std::vector<WaitingFault> all_faults(Transaction &transaction);
 /// Whether a function has a fault.
 bool has_fault(Transaction &transaction, std::string_view function);
 /// Counts a call of a function for its faults. Returns those that hit the call, in the order in
 /// which they were added; a fault that hits no further call is gone.
-std::vector<Fault> count_for_faults(Transaction &transaction, std::string_view function);
+std::vector<Fault> count_for_faults(ChangingTransaction &transaction, std::string_view function);
 /// Removes the faults of a function.
-void remove_faults(Transaction &transaction, std::string_view function);
-void remove_all_faults(Transaction &transaction);
+void remove_faults(ChangingTransaction &transaction, std::string_view function);
+void remove_all_faults(ChangingTransaction &transaction);
 
 }  // namespace simhost::storage

@@ -9,10 +9,10 @@ namespace simhost::storage {
 namespace {
 
 template <typename Value>
-void put_value(Transaction &transaction, std::string_view name, Value const &value) {
-  Query(transaction,
-        "INSERT INTO host_setting (name, value) VALUES (?, ?)"
-        " ON CONFLICT (name) DO UPDATE SET value = excluded.value")
+void put_value(ChangingTransaction &transaction, std::string_view name, Value const &value) {
+  Change(transaction,
+         "INSERT INTO host_setting (name, value) VALUES (?, ?)"
+         " ON CONFLICT (name) DO UPDATE SET value = excluded.value")
       .with(name)
       .with(value)
       .run();
@@ -45,16 +45,17 @@ std::optional<std::string> find_host_text(Transaction &transaction, std::string_
   });
 }
 
-void put_host_number(Transaction &transaction, std::string_view name, std::int64_t value) {
+void put_host_number(ChangingTransaction &transaction, std::string_view name, std::int64_t value) {
   put_value(transaction, name, value);
 }
 
-void put_host_text(Transaction &transaction, std::string_view name, std::string_view value) {
+void put_host_text(ChangingTransaction &transaction, std::string_view name,
+                   std::string_view value) {
   put_value(transaction, name, value);
 }
 
-void remove_host_settings(Transaction &transaction) {
-  Query(transaction, "DELETE FROM host_setting").run();
+void remove_host_settings(ChangingTransaction &transaction) {
+  Change(transaction, "DELETE FROM host_setting").run();
 }
 
 }  // namespace simhost::storage

@@ -40,9 +40,9 @@ std::optional<Link> find_link(Transaction &transaction, std::string_view uplink)
   return select.with(uplink).first(link_at);
 }
 
-void put_link(Transaction &transaction, std::string_view uplink, Link const &link) {
-  Query replace(transaction, "INSERT OR REPLACE INTO link (uplink, " LINK_COLUMNS
-                             ") VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?)");
+void put_link(ChangingTransaction &transaction, std::string_view uplink, Link const &link) {
+  Change replace(transaction, "INSERT OR REPLACE INTO link (uplink, " LINK_COLUMNS
+                              ") VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?)");
   replace.with(uplink).with(link.carrier).with(link.admin).with(link.partner).with(link.speed);
   replace.with(link.full_duplex).with(link.beacons).with(link.error_percent).with(link.driver);
   replace.with(link.up_since.count()).run();
@@ -64,8 +64,8 @@ std::optional<LagId> find_lag(Transaction &transaction, SwitchKey key, std::stri
   return select.with(key).with(name).first(lag_id_at);
 }
 
-LagId insert_lag(Transaction &transaction, SwitchKey key, std::string_view name) {
-  Query insert(transaction, "INSERT INTO lag (switch, name) VALUES (?, ?)");
+LagId insert_lag(ChangingTransaction &transaction, SwitchKey key, std::string_view name) {
+  Change insert(transaction, "INSERT INTO lag (switch, name) VALUES (?, ?)");
   insert.with(key).with(name).run();
   return LagId(static_cast<std::uint32_t>(transaction.last_key()));
 }
@@ -80,13 +80,13 @@ bool is_in_lag(Transaction &transaction, std::string_view uplink) {
   return Query(transaction, "SELECT 1 FROM lag_uplink WHERE uplink = ?").with(uplink).next();
 }
 
-void add_to_lag(Transaction &transaction, LagId lag, std::string_view uplink) {
-  Query insert(transaction, "INSERT INTO lag_uplink (lag, uplink) VALUES (?, ?)");
+void add_to_lag(ChangingTransaction &transaction, LagId lag, std::string_view uplink) {
+  Change insert(transaction, "INSERT INTO lag_uplink (lag, uplink) VALUES (?, ?)");
   insert.with(lag).with(uplink).run();
 }
 
-void empty_lag(Transaction &transaction, LagId lag) {
-  Query(transaction, "DELETE FROM lag_uplink WHERE lag = ?").with(lag).run();
+void empty_lag(ChangingTransaction &transaction, LagId lag) {
+  Change(transaction, "DELETE FROM lag_uplink WHERE lag = ?").with(lag).run();
 }
 
 }  // namespace simhost::storage

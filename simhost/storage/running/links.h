@@ -30,7 +30,7 @@ struct Link {
 
 std::optional<Link> find_link(Transaction &transaction, std::string_view uplink);
 /// Sets the link of an uplink, whether or not it was there.
-void put_link(Transaction &transaction, std::string_view uplink, Link const &link);
+void put_link(ChangingTransaction &transaction, std::string_view uplink, Link const &link);
 
 /// The number of a link-aggregation group: unique on the host.
 enum class LagId : std::uint32_t {};
@@ -45,14 +45,14 @@ struct LagRow {
 std::vector<LagRow> all_lags(Transaction &transaction, SwitchKey key);
 std::optional<LagId> find_lag(Transaction &transaction, SwitchKey key, std::string_view name);
 /// Makes a group without uplinks. Its name is unique on the switch.
-LagId insert_lag(Transaction &transaction, SwitchKey key, std::string_view name);
+LagId insert_lag(ChangingTransaction &transaction, SwitchKey key, std::string_view name);
 /// How many groups the switch has.
 std::uint32_t count_lags(Transaction &transaction, SwitchKey key);
 /// Whether an uplink is in a group.
 bool is_in_lag(Transaction &transaction, std::string_view uplink);
 /// Puts an uplink that is in no group at the end of one.
-void add_to_lag(Transaction &transaction, LagId lag, std::string_view uplink);
+void add_to_lag(ChangingTransaction &transaction, LagId lag, std::string_view uplink);
 /// Takes all uplinks out of a group.
-void empty_lag(Transaction &transaction, LagId lag);
+void empty_lag(ChangingTransaction &transaction, LagId lag);
 
 }  // namespace simhost::storage

@@ -40,22 +40,22 @@ std::vector<AddressBytes> sources_of(Transaction &transaction, std::int64_t grou
 
 }  // namespace
 
-void insert_group(Transaction &transaction, PortNumber port, McastGroup const &group) {
-  Query insert(transaction,
-               "INSERT INTO mcast_group (" GROUP_COLUMNS ", port) VALUES (?, ?, ?, ?, ?, ?)");
+void insert_group(ChangingTransaction &transaction, PortNumber port, McastGroup const &group) {
+  Change insert(transaction,
+                "INSERT INTO mcast_group (" GROUP_COLUMNS ", port) VALUES (?, ?, ?, ?, ?, ?)");
   insert.with(group.address).with(group.version).with(group.source_mode).with(group.vni);
   insert.with(group.updated.count()).with(port).run();
   auto const key = transaction.last_key();
   for (auto const &source : group.sources) {
-    Query(transaction, "INSERT INTO mcast_source (mcast_group, address) VALUES (?, ?)")
+    Change(transaction, "INSERT INTO mcast_source (mcast_group, address) VALUES (?, ?)")
         .with(key)
         .with(source)
         .run();
   }
 }
 
-bool remove_group(Transaction &transaction, PortNumber port, AddressBytes const &address) {
-  Query erase(transaction, "DELETE FROM mcast_group WHERE port = ? AND address = ?");
+bool remove_group(ChangingTransaction &transaction, PortNumber port, AddressBytes const &address) {
+  Change erase(transaction, "DELETE FROM mcast_group WHERE port = ? AND address = ?");
   return erase.with(port).with(address).run() != 0;
 }
 
@@ -78,8 +78,8 @@ std::vector<AddressBytes> group_addresses(Transaction &transaction, PortNumber p
   return select.with(port).with(static_cast<std::int64_t>(length)).all(address_at);
 }
 
-void remove_groups(Transaction &transaction) {
-  Query(transaction, "DELETE FROM mcast_group").run();
+void remove_groups(ChangingTransaction &transaction) {
+  Change(transaction, "DELETE FROM mcast_group").run();
 }
 
 }  // namespace simhost::storage

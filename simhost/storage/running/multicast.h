@@ -25,14 +25,14 @@ struct McastGroup {
 };
 
 /// Adds a group that the port has not joined.
-void insert_group(Transaction &transaction, PortNumber port, McastGroup const &group);
+void insert_group(ChangingTransaction &transaction, PortNumber port, McastGroup const &group);
 /// False if the port has not joined it.
-bool remove_group(Transaction &transaction, PortNumber port, AddressBytes const &address);
+bool remove_group(ChangingTransaction &transaction, PortNumber port, AddressBytes const &address);
 std::optional<McastGroup> find_group(Transaction &transaction, PortNumber port,
                                      AddressBytes const &address);
 /// The groups of a port with addresses of that many bytes, in the order of the addresses.
 std::vector<AddressBytes> group_addresses(Transaction &transaction, PortNumber port,
                                           std::size_t length);
-void remove_groups(Transaction &transaction);
+void remove_groups(ChangingTransaction &transaction);
 
 }  // namespace simhost::storage

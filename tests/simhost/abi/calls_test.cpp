@@ -4,7 +4,8 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
-#include <string_view>
+#include <type_traits>
+#include <utility>
 
 #include "abi/boundary.h"
 #include "abi/callers_code.h"
@@ -21,7 +22,7 @@ using simhost::StatelessCall;
 constexpr auto kCall = "VSDVS_GetMTU";
 constexpr auto kAlias = "planted";
 
-void add_planted(simhost::storage::Transaction &transaction) {
+void add_planted(simhost::storage::ChangingTransaction &transaction) {
   simhost::storage::add_switch(transaction, {.alias = kAlias,
                                              .identifier = kAlias,
                                              .portset = kAlias,
@@ -37,15 +38,25 @@ bool has_planted() {
       .has_value();
 }
 
-TEST(Calls, OnesThatReadCannotChangeTheState) {
+// What changes the state does not compile in a call that reads it.
+template <typename KindOfCall>
+constexpr bool kCanChange =
+    std::is_invocable_v<decltype(add_planted),
+                        decltype(std::declval<KindOfCall &>().transaction())>;
+static_assert(kCanChange<ChangingCall> && !kCanChange<ReadingCall>);
+
+TEST(Calls, ChangeTheStateWhenTheyComeToTheirEnd) {
   Ending ending{};
-  auto const body = [](auto &call) { add_planted(call.transaction()); };
-  EXPECT_FALSE(simhost::completes<ReadingCall>(kCall, body, ending));
-  EXPECT_TRUE(ending.traps);
-  EXPECT_EQ(std::string_view(ending.report.text.data()),
-            "VSDVS_GetMTU: a call that only reads the state was about to change it");
+  EXPECT_FALSE(simhost::completes<ChangingCall>(
+      kCall,
+      [](ChangingCall &call) {
+        add_planted(call.transaction());
+        simhost::refuse(QEX_BUSY);
+      },
+      ending));
   EXPECT_FALSE(has_planted());
-  EXPECT_TRUE(simhost::completes<ChangingCall>(kCall, body, ending));
+  EXPECT_TRUE(simhost::completes<ChangingCall>(
+      kCall, [](ChangingCall &call) { add_planted(call.transaction()); }, ending));
   EXPECT_TRUE(has_planted());
 }
 

@@ -15,7 +15,7 @@ using std::chrono::milliseconds;
 using std::chrono::seconds;
 
 struct Clock : MemoryState {
-  simhost::storage::Transaction transaction{store, simhost::storage::Access::write};
+  simhost::storage::ChangingTransaction transaction{store};
 };
 
 ClockTime real_time() {

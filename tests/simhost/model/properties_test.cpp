@@ -13,11 +13,10 @@
 namespace {
 
 using simhost::set_property;
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
 using simhost::storage::PropertyOwner;
 using simhost::storage::PropertyType;
 using simhost::storage::SwitchKey;
-using simhost::storage::Transaction;
 
 struct Properties : MemoryState {
   Properties() {
@@ -33,7 +32,7 @@ struct Properties : MemoryState {
     });
   }
 
-  Transaction transaction{store, Access::write};
+  ChangingTransaction transaction{store};
   PropertyOwner owner = PropertyOwner::global(SwitchKey{});
 };
 

@@ -18,21 +18,21 @@
 namespace {
 
 using simhost::SwitchSpec;
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
+using simhost::storage::ReadingTransaction;
 using simhost::storage::SwitchName;
-using simhost::storage::Transaction;
 
 struct Switches : MemoryState {
   QEX_ReturnStatus create(SwitchSpec const &spec) {
     return status_of([&] {
-      Transaction transaction(store, Access::write);
+      ChangingTransaction transaction(store);
       simhost::create_switch(transaction, spec);
       transaction.commit();
     });
   }
   QEX_ReturnStatus set_mtu(std::string_view alias, std::uint32_t mtu) {
     return status_of([&] {
-      Transaction transaction(store, Access::write);
+      ChangingTransaction transaction(store);
       auto const key = simhost::get_switch(transaction, alias).key;
       simhost::set(transaction, simhost::switches::mtu,
                    simhost::storage::PropertyOwner::global(key), mtu);
@@ -41,21 +41,21 @@ struct Switches : MemoryState {
   }
   QEX_ReturnStatus destroy(std::string_view alias) {
     return status_of([&] {
-      Transaction transaction(store, Access::write);
+      ChangingTransaction transaction(store);
       simhost::destroy_switch(transaction, alias);
       transaction.commit();
     });
   }
   VSInfo info(std::string_view alias) {
-    Transaction transaction(store, Access::read);
+    ReadingTransaction transaction(store);
     return simhost::switch_info(transaction, alias);
   }
   simhost::storage::Switch row(std::string_view alias) {
-    Transaction transaction(store, Access::read);
+    ReadingTransaction transaction(store);
     return simhost::storage::find_switch(transaction, SwitchName::alias, alias).value().row;
   }
   std::vector<std::string> uplinks(std::string_view alias) {
-    Transaction transaction(store, Access::read);
+    ReadingTransaction transaction(store);
     std::vector<std::string> names;
     for (auto const &uplink : simhost::uplinks_of(transaction, alias)) {
       names.push_back(uplink.name);
@@ -63,7 +63,7 @@ struct Switches : MemoryState {
     return names;
   }
   std::size_t free_uplinks() {
-    Transaction transaction(store, Access::read);
+    ReadingTransaction transaction(store);
     return simhost::storage::free_uplinks(transaction).size();
   }
 };
@@ -121,7 +121,7 @@ TEST_F(Switches, TellAboutThemselves) {
 TEST_F(Switches, CountTheirPorts) {
   ASSERT_EQ(create({.alias = "first"}), QEX_OK);
   {
-    Transaction transaction(store, Access::write);
+    ChangingTransaction transaction(store);
     auto const key = simhost::storage::find_switch(transaction, SwitchName::alias, "first")->key;
     simhost::storage::add_port(transaction, key, "p1", simhost::storage::PortKind::client);
     simhost::storage::add_port(transaction, key, "p2", simhost::storage::PortKind::client);
@@ -211,7 +211,7 @@ TEST_F(Switches, MoreUplinksThanAreFreeLeaveNothingBehind) {
 TEST_F(Switches, UplinkPortsHaveNumbersOfTheirOwn) {
   ASSERT_EQ(create({.alias = "a", .uplink_count = 2}), QEX_OK);
   ASSERT_EQ(create({.alias = "b", .uplink_count = 2}), QEX_OK);
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   std::vector<std::uint32_t> numbers{0};
   for (auto const *alias : {"a", "b"}) {
     for (auto const &uplink : simhost::uplinks_of(transaction, alias)) {
@@ -242,7 +242,7 @@ TEST_F(Switches, OtherKindsOfNameAreNoAlias) {
 
 TEST_F(Switches, NamesTranslate) {
   ASSERT_EQ(create({.alias = "a", .identifier = "i", .portset = "p"}), QEX_OK);
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   EXPECT_EQ(simhost::identifier_of(transaction, "a"), "i");
   EXPECT_EQ(simhost::portset_of(transaction, "a"), "p");
   EXPECT_EQ(simhost::alias_of_portset(transaction, "p"), "a");

@@ -30,8 +30,9 @@
 namespace {
 
 using simhost::Link;
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
 using simhost::storage::PropertyOwner;
+using simhost::storage::ReadingTransaction;
 using simhost::storage::Store;
 using simhost::storage::Transaction;
 using simhost::stored::Teaming;
@@ -42,7 +43,7 @@ constexpr auto kSent = simhost::counter_in(&VSRARPStats::rarpPktsSent);
 // A process: its connection, and what it keeps.
 struct Process {
   explicit Process(std::filesystem::path const &file)
-      : store(file, [](Transaction &transaction) {
+      : store(file, [](ChangingTransaction &transaction) {
           for (auto const *uplink : kUplinks) {
             simhost::storage::add_uplink(transaction, uplink);
           }
@@ -67,7 +68,7 @@ class Changes {
   explicit Changes(std::uint32_t seed) : random_(seed) {}
 
   /// Makes one change; tells how many announcements it must have made.
-  std::uint64_t make(Transaction &transaction, Teaming &teaming) {
+  std::uint64_t make(ChangingTransaction &transaction, Teaming &teaming) {
     auto const key = simhost::get_switch(transaction, "s").key;
     try {
       return any(transaction, teaming, key);
@@ -79,7 +80,8 @@ class Changes {
   std::uint32_t below(std::uint32_t bound) { return random_() % bound; }
 
  private:
-  std::uint64_t any(Transaction &transaction, Teaming &teaming, simhost::storage::SwitchKey key) {
+  std::uint64_t any(ChangingTransaction &transaction, Teaming &teaming,
+                    simhost::storage::SwitchKey key) {
     auto const of_switch = PropertyOwner::global(key);
     switch (below(14)) {
       case 0:
@@ -122,7 +124,7 @@ class Changes {
     }
   }
 
-  std::uint64_t change_link(Transaction &transaction, Teaming &teaming,
+  std::uint64_t change_link(ChangingTransaction &transaction, Teaming &teaming,
                             simhost::storage::SwitchKey key) {
     auto const name = uplink();
     auto link = simhost::stored::link_of(transaction, name);
@@ -174,7 +176,7 @@ class Changes {
     return all;
   }
 
-  void change_uplink_ports(Transaction &transaction, simhost::storage::SwitchKey key) {
+  void change_uplink_ports(ChangingTransaction &transaction, simhost::storage::SwitchKey key) {
     auto const ports = simhost::storage::uplink_ports_of(transaction, key);
     auto const free = simhost::storage::free_uplinks(transaction);
     if (!ports.empty() && below(3) == 0) {
@@ -192,7 +194,8 @@ class Changes {
   }
 
   // A port without an uplink gets one, or such a port is made.
-  void attach(Transaction &transaction, simhost::storage::SwitchKey key, std::string const &name) {
+  void attach(ChangingTransaction &transaction, simhost::storage::SwitchKey key,
+              std::string const &name) {
     for (auto const &port : simhost::storage::uplink_ports_of(transaction, key)) {
       if (!simhost::storage::uplink_at(transaction, port.number)) {
         simhost::storage::attach_uplink(transaction, name, port.number);
@@ -202,7 +205,7 @@ class Changes {
     simhost::add_vacant_uplink_port(transaction, key, "vacant" + std::to_string(below(1000)));
   }
 
-  void change_group(Transaction &transaction, simhost::storage::SwitchKey key) {
+  void change_group(ChangingTransaction &transaction, simhost::storage::SwitchKey key) {
     std::vector<std::string> members;
     for (auto const *name : kUplinks) {
       if (below(2) == 0) {
@@ -212,7 +215,7 @@ class Changes {
     simhost::put_lag(transaction, key, "lag", members);
   }
 
-  void change_ports(Transaction &transaction, simhost::storage::SwitchKey key) {
+  void change_ports(ChangingTransaction &transaction, simhost::storage::SwitchKey key) {
     auto const numbers = simhost::storage::client_numbers(transaction, key);
     if (numbers.size() < 3 || below(2) == 0) {
       simhost::add_client_port(transaction, key, "p" + std::to_string(below(1000)));
@@ -222,7 +225,7 @@ class Changes {
     }
   }
 
-  void change_host(Transaction &transaction) {
+  void change_host(ChangingTransaction &transaction) {
     switch (below(4)) {
       case 3:
         simhost::storage::remove_host_settings(transaction);
@@ -242,7 +245,7 @@ class Changes {
 
   std::string uplink() { return kUplinks.at(below(kUplinks.size())); }
 
-  PropertyOwner client(Transaction &transaction, simhost::storage::SwitchKey key) {
+  PropertyOwner client(ChangingTransaction &transaction, simhost::storage::SwitchKey key) {
     auto const numbers = simhost::storage::client_numbers(transaction, key);
     auto const number = numbers.at(below(static_cast<std::uint32_t>(numbers.size())));
     return PropertyOwner::port(key, number);
@@ -271,7 +274,7 @@ class Changes {
 struct KeptTeams : testing::TestWithParam<std::uint32_t> {
   KeptTeams() {
     simhost::run_on(simhost::stored::plane());
-    Transaction transaction(one.store, Access::write);
+    ChangingTransaction transaction(one.store);
     simhost::stop_clock(transaction);
     simhost::create_switch(transaction, {.alias = "s", .uplink_count = 2});
     auto const key = simhost::get_switch(transaction, "s").key;
@@ -283,7 +286,7 @@ struct KeptTeams : testing::TestWithParam<std::uint32_t> {
 
   // A process that keeps what it knows says the same as one that knows nothing.
   static void compare(Process &process) {
-    Transaction transaction(process.store, Access::read);
+    ReadingTransaction transaction(process.store);
     auto const key = simhost::get_switch(transaction, "s").key;
     Teaming anew;
     for (auto const &port : simhost::storage::ports_of(transaction, key)) {
@@ -311,7 +314,7 @@ TEST_P(KeptTeams, AreAsIfWorkedOutAnew) {
     SCOPED_TRACE(change);
     auto &process = changes.below(2) == 0 ? one : other;
     {
-      Transaction transaction(process.store, Access::write);
+      ChangingTransaction transaction(process.store);
       auto const before = sent(transaction);
       auto const expected = changes.make(transaction, process.teaming);
       ASSERT_EQ(sent(transaction) - before, expected);

@@ -17,7 +17,7 @@ using simhost::Sighting;
 using std::chrono::milliseconds;
 using std::chrono::seconds;
 
-Sighting learn(simhost::storage::Transaction &transaction, Place const &place,
+Sighting learn(simhost::storage::ChangingTransaction &transaction, Place const &place,
                VSMACEntry const &source) {
   return simhost::get_wires().learn(transaction, place, source);
 }

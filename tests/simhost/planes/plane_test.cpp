@@ -18,7 +18,8 @@ namespace {
 using simhost::AddressBytes;
 using simhost::Place;
 using simhost::Refused;
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
+using simhost::storage::ReadingTransaction;
 using simhost::storage::Transaction;
 using testing::ElementsAre;
 using testing::IsEmpty;
@@ -67,22 +68,22 @@ class FarPlane : public simhost::Plane {
                                              simhost::storage::SwitchKey /*key*/) override {
     return told_or_refused(std::vector<std::string>());
   }
-  void set_admin_state(Transaction & /*transaction*/, std::string_view /*uplink*/,
+  void set_admin_state(ChangingTransaction & /*transaction*/, std::string_view /*uplink*/,
                        bool /*up*/) override {
     told.push_back(told_or_refused(std::string("admin")));
   }
-  void put_address(Transaction & /*transaction*/, Place const & /*place*/,
+  void put_address(ChangingTransaction & /*transaction*/, Place const & /*place*/,
                    VSMACEntry const & /*entry*/) override {
     told.push_back(told_or_refused(std::string("address")));
   }
-  void remove_address(Transaction & /*transaction*/, Place const & /*place*/,
+  void remove_address(ChangingTransaction & /*transaction*/, Place const & /*place*/,
                       VSMACEntry const & /*entry*/) override {
     told.push_back(told_or_refused(std::string("no address")));
   }
-  void restart(Transaction & /*transaction*/) override {
+  void restart(ChangingTransaction & /*transaction*/) override {
     told.push_back(told_or_refused(std::string("restart")));
   }
-  void prepare(Transaction &transaction) override {
+  void prepare(ChangingTransaction &transaction) override {
     if (!can_run) {
       throw Refused(QEX_NO_RESOURCES, "there are no more flows");
     }
@@ -110,7 +111,7 @@ struct APlaneElsewhere : MemoryState {
 };
 
 TEST_F(APlaneElsewhere, IsToldOfAChangeBeforeAndAfterTheCommit) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::create_switch(transaction, {.alias = "s"});
   EXPECT_THAT(plane.told, IsEmpty());
   simhost::commit(transaction);
@@ -118,7 +119,7 @@ TEST_F(APlaneElsewhere, IsToldOfAChangeBeforeAndAfterTheCommit) {
 }
 
 TEST_F(APlaneElsewhere, IsNotToldOfATransactionThatOnlyReads) {
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   simhost::commit(transaction);
   EXPECT_THAT(plane.told, IsEmpty());
 }
@@ -126,17 +127,17 @@ TEST_F(APlaneElsewhere, IsNotToldOfATransactionThatOnlyReads) {
 TEST_F(APlaneElsewhere, MayRefuseAndThenNothingHappened) {
   plane.can_run = false;
   {
-    Transaction transaction(store, Access::write);
+    ChangingTransaction transaction(store);
     simhost::create_switch(transaction, {.alias = "s"});
     EXPECT_EQ(status_of([&] { simhost::commit(transaction); }), QEX_NO_RESOURCES);
   }
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   EXPECT_THAT(simhost::storage::all_switches(transaction), IsEmpty());
   EXPECT_THAT(plane.told, IsEmpty());
 }
 
 TEST_F(APlaneElsewhere, HasNoWiresToSetAnythingOn) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   EXPECT_EQ(status_of([] { simhost::get_wires(); }), QEX_NOT_SUPPORTED);
   try {
     simhost::scenario::apply(transaction, R"({"uplinks": [{"name": "nic0", "link": "down"}]})");
@@ -148,7 +149,7 @@ TEST_F(APlaneElsewhere, HasNoWiresToSetAnythingOn) {
 }
 
 TEST_F(APlaneElsewhere, IsConfiguredByDocumentsAllTheSame) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, R"({
     "uplinks": [{"name": "nic0"}, {"name": "new"}],
     "switches": [{"alias": "s", "uplinks": ["nic0"], "lags": [{"name": "l", "uplinks": ["nic0"]}],
@@ -163,7 +164,7 @@ TEST_F(APlaneElsewhere, IsConfiguredByDocumentsAllTheSame) {
 }
 
 TEST_F(APlaneElsewhere, ThatCannotBeAskedIsTheReasonThatCallersGet) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::create_switch(transaction, {.alias = "s", .uplink_count = 1});
   auto const key = simhost::get_switch(transaction, "s").key;
   auto const port = simhost::add_client_port(transaction, key, "p");

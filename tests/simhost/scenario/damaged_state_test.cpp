@@ -33,10 +33,9 @@
 
 namespace {
 
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
 using simhost::storage::PropertyOwner;
 using simhost::storage::Store;
-using simhost::storage::Transaction;
 using simhost::storage::UnusableState;
 
 /// Something in every table.
@@ -77,7 +76,7 @@ std::string complaint_after(std::string const &sql, Ask const &ask) {
   damage(file, sql);
   Store store(file, [](auto &) {});
   try {
-    Transaction transaction(store, Access::write);
+    ChangingTransaction transaction(store);
     ask(transaction);
     return "";
   } catch (UnusableState const &error) {
@@ -89,7 +88,7 @@ std::string complaint_after(std::string const &sql, Ask const &ask) {
 
 std::string complaint_after(std::string const &sql) {
   return complaint_after(
-      sql, [](Transaction &transaction) { simhost::scenario::description(transaction); });
+      sql, [](ChangingTransaction &transaction) { simhost::scenario::description(transaction); });
 }
 
 struct Damage {
@@ -272,34 +271,34 @@ TEST(DamagedState, IsNoneForAValueThatNoLongerGoesWithTheRest) {
 }
 
 TEST(DamagedState, IsFoundByEveryWayToReadAProperty) {
-  auto const of_switch = [](Transaction &transaction) {
+  auto const of_switch = [](ChangingTransaction &transaction) {
     return PropertyOwner::global(simhost::get_switch(transaction, "s").key);
   };
   auto const of_mtu = set_to(kOfSwitch, VSPROP_MTU, "DC");
   EXPECT_EQ(complaint_after(of_mtu,
-                            [&](Transaction &transaction) {
+                            [&](ChangingTransaction &transaction) {
                               simhost::effective(transaction, simhost::switches::mtu,
                                                  of_switch(transaction));
                             }),
             no_value(VSPROP_MTU));
   EXPECT_EQ(complaint_after(of_mtu,
-                            [&](Transaction &transaction) {
+                            [&](ChangingTransaction &transaction) {
                               simhost::find_property(transaction, of_switch(transaction),
                                                      VSPROP_MTU);
                             }),
             no_value(VSPROP_MTU));
   EXPECT_EQ(complaint_after(of_mtu,
-                            [&](Transaction &transaction) {
+                            [&](ChangingTransaction &transaction) {
                               simhost::list_properties(transaction, of_switch(transaction));
                             }),
             no_value(VSPROP_MTU));
   EXPECT_EQ(complaint_after(of_mtu,
-                            [](Transaction &transaction) {
+                            [](ChangingTransaction &transaction) {
                               simhost::state_image(transaction, simhost::Extent::whole);
                             }),
             no_value(VSPROP_MTU));
   EXPECT_EQ(complaint_after(of_mtu,
-                            [&](Transaction &transaction) {
+                            [&](ChangingTransaction &transaction) {
                               simhost::clear(transaction, simhost::switches::mtu,
                                              of_switch(transaction));
                             }),
@@ -307,7 +306,7 @@ TEST(DamagedState, IsFoundByEveryWayToReadAProperty) {
       << "what is damaged can be cleared";
   // A link that changes moves ports, which are all looked at.
   EXPECT_EQ(complaint_after(set_to(kOfPort, VSPROP_PORT_TEAMING_OVERRIDE, "75"),
-                            [](Transaction &transaction) {
+                            [](ChangingTransaction &transaction) {
                               simhost::get_wires().change_link(transaction, "nic0",
                                                                {.carrier = false});
                             }),

@@ -30,10 +30,9 @@
 namespace {
 
 using simhost::scenario::DocumentError;
-using simhost::storage::Access;
-using simhost::storage::Transaction;
+using simhost::storage::ChangingTransaction;
 
-void populate_nothing(Transaction &) {}
+void populate_nothing(ChangingTransaction &) {}
 
 struct Scenario : testing::Test {
   Scenario() { simhost::run_on(simhost::stored::plane()); }
@@ -42,7 +41,7 @@ struct Scenario : testing::Test {
 
   /// What is wrong with a document; empty if nothing is. Nothing of it lasts.
   std::string refusal(std::string const &document) {
-    Transaction transaction(store, Access::write);
+    ChangingTransaction transaction(store);
     try {
       simhost::scenario::apply(transaction, document);
       return "";
@@ -158,7 +157,7 @@ TEST_F(Scenario, TextsThatAreNoJson) {
 }
 
 TEST_F(Scenario, WhatExistsIsChangedAndTheRestIsLeftAlone) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, R"({"uplinks": [{"name": "nic0", "speed": 1000}],
       "switches": [{"alias": "s", "mtu": 9000, "uplinks": ["nic0"], "ports": [{"id": "p"}]}]})");
   auto const before = simhost::scenario::host_to_json(transaction);
@@ -174,7 +173,7 @@ TEST_F(Scenario, WhatExistsIsChangedAndTheRestIsLeftAlone) {
 }
 
 TEST_F(Scenario, WhatASwitchWasMadeWithStays) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   constexpr auto kMade = R"({"switches": [{
     "alias": "s", "id": "i", "portset": "p", "max_ports": 5, "persistent": false, "version": 7,
     "running": false}]})";
@@ -245,7 +244,7 @@ constexpr char const *kEverything = R"({
 })";
 
 TEST_F(Scenario, ADescribedHostDescribesTheSameHost) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, kEverything);
   auto const first = simhost::scenario::host_to_json(transaction);
   simhost::scenario::empty_host(transaction);
@@ -270,7 +269,7 @@ TEST_F(Scenario, WhatADescriptionAddsIsReadOverWhereverItIs) {
 }
 
 TEST_F(Scenario, AnUplinkPortIsSetAndDescribedByNames) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   auto const document = nlohmann::ordered_json::parse(R"({"clock": {"stopped": true}, "switches": [{
       "alias": "s", "uplink_ports": [{
         "id": "left", "name": "Left", "blocked": true, "nested_tag": true,
@@ -317,7 +316,7 @@ TEST_F(Scenario, AnUplinkPortHasNotWhatOtherPortsHave) {
 }
 
 TEST_F(Scenario, WhatAMemberCannotSayIsDescribedByItsBytesToo) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "teaming": {"speed": 5},
       "ports": [{"id": "p", "teaming": {"speed": 6}, "mac_learning": {"limit": 3},
                  "mirror_sessions": [{"sid": "m"}]}]}]})");
@@ -365,7 +364,7 @@ struct Said {
 };
 
 struct NamedForms : Scenario, testing::WithParamInterface<Said> {
-  simhost::scenario::Json only_switch(Transaction &transaction) {
+  simhost::scenario::Json only_switch(ChangingTransaction &transaction) {
     return simhost::scenario::host_to_json(transaction)["switches"][0];
   }
 };
@@ -382,7 +381,7 @@ TEST_P(NamedFormsOfPorts, SayTheBytesWhole) {
     return fmt::format(R"({{"switches": [{{"alias": "s", {}, "ports": [{{"id": "p", {}}}]}}]}})",
                        map, port);
   };
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(
       transaction,
       document(fmt::format(R"("properties": {{"{}": {{"type": "{}", "hex": "{}"}}}})", key,
@@ -424,7 +423,7 @@ TEST_P(NamedFormsOfSwitches, SayTheBytesWhole) {
     return fmt::format(R"({{"switches": [{{"alias": "s", "id": "i", "portset": "p", {}}}]}})",
                        given);
   };
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(
       transaction, document(fmt::format(
                        R"("properties": {{"{}": {{"type": "config", "hex": "{}"}}}})", key, hex)));
@@ -448,7 +447,7 @@ INSTANTIATE_TEST_SUITE_P(
                          VSPROP_PVLAN_MAP, "64006400010000006400650002000000"}));
 
 TEST_F(Scenario, AVlanReplacesTheWholeValueItsPriorityToo) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   auto const vlan = [&](std::string const &said) {
     simhost::scenario::apply(
         transaction,
@@ -471,7 +470,7 @@ TEST_F(Scenario, AVlanReplacesTheWholeValueItsPriorityToo) {
 }
 
 TEST_F(Scenario, AMemberThatIsNotGivenIsWhatItIsWhileTheSettingIsNotSet) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "teaming": {},
       "mac_learning": {}, "ports": [{"id": "p", "mac_learning": {}, "ethernet_filter": {}}]}]})");
   auto const key = simhost::get_switch(transaction, "s").key;
@@ -495,7 +494,7 @@ TEST_F(Scenario, AnEncapsulatedSessionIsSaidWhole) {
       "encapsulates": true, "keeps_vlan": true, "no_output": true, "no_input": true,
       "mirrors_uplinks": true, "uplink_filter": "vxlan", "received_from": ["uplinks"],
       "sent_from": ["vmm", "test"], "stack": true})";
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(
       transaction, fmt::format(R"({{"switches": [{{"alias": "s", "uplink_mirror_sessions": [{}],
                                   "ports": [{{"id": "p", "mirror_sessions": [{}]}}]}}]}})",
@@ -551,7 +550,7 @@ TEST_F(Scenario, WhatANamedFormCannotBeIsToldByItsPath) {
 
 // Nothing gets a name that no document could say.
 TEST_F(Scenario, NamesAreUtf8) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   std::string const name = "\xC3";
   auto const refused = [](auto const &change) {
     try {
@@ -585,7 +584,7 @@ TEST_F(Scenario, NamesAreUtf8) {
 }
 
 TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, kEverything);
   auto const host = simhost::scenario::host_to_json(transaction);
   // Each key of the document, wherever it stands, is found with its value.
@@ -613,7 +612,7 @@ TEST_F(Scenario, EverythingOfADocumentIsInItsDescription) {
 }
 
 TEST_F(Scenario, ARestartedHostLosesWhatIsVolatile) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, R"({"switches": [{"alias": "s", "properties": {
       "com.example.keep": {"type": "policy", "text": "x"},
       "com.example.go": {"type": "volatile", "text": "x"},
@@ -635,7 +634,7 @@ struct FreshHost : Scenario {
 
 TEST_F(FreshHost, IsWorthPlayingWith) {
   unsetenv("SIMHOST_SCENARIO");
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::populate_fresh_host(transaction);
   auto const host = simhost::scenario::host_to_json(transaction);
   EXPECT_GE(simhost::storage::free_uplinks(transaction).size(), 2U);
@@ -649,7 +648,7 @@ TEST_F(FreshHost, IsWhatADocumentSays) {
   auto const file = folder.file("host.json");
   std::ofstream(file) << "{}";
   setenv("SIMHOST_SCENARIO", file.c_str(), 1);
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::populate_fresh_host(transaction);
   auto const host = simhost::scenario::host_to_json(transaction);
   EXPECT_TRUE(host["switches"].empty());
@@ -660,7 +659,7 @@ TEST_F(FreshHost, NamesTheDocumentThatCannotBeUsed) {
   TemporaryFolder const folder;
   auto const file = folder.file("host.json");
   setenv("SIMHOST_SCENARIO", file.c_str(), 1);
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   auto const refused = [&]() -> std::string {
     try {
       simhost::populate_fresh_host(transaction);

@@ -23,10 +23,10 @@
 
 namespace {
 
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
+using simhost::storage::ReadingTransaction;
 using simhost::storage::StateFile;
 using simhost::storage::Store;
-using simhost::storage::Transaction;
 using testing::HasSubstr;
 
 std::string content(std::filesystem::path const &file) {
@@ -120,7 +120,7 @@ TEST(StateFile, ThatIsRemovedBeforeACommitIsToldOf) {
   TemporaryFolder const folder;
   Store store(folder.file("host.db"), populate_nothing);
   EXPECT_EQ(refusal_by([&] {
-              Transaction transaction(store, Access::write);
+              ChangingTransaction transaction(store);
               std::filesystem::remove(folder.file("host.db"));
               transaction.commit();
             }),
@@ -210,7 +210,7 @@ TEST(StateFile, OfSchema3IsRead) {
   Store store(file, populate_nothing);
   EXPECT_TRUE(has(store, "old"));
   add(store, "new");
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   for (auto const &known : simhost::storage::all_switches(transaction)) {
     EXPECT_NO_THROW(simhost::storage::get_generations(transaction, known.key)) << known.row.alias;
   }
@@ -225,7 +225,7 @@ TEST(StateFile, WithoutARowThatEachHasIsRefused) {
   }
   execute(file, "DELETE FROM clock; DELETE FROM generation");
   Store store(file, populate_nothing);
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   auto const key = simhost::storage::all_switches(transaction).at(0).key;
   EXPECT_THAT(refusal_by([&] { simhost::storage::get_clock(transaction); }),
               HasSubstr("a row is missing in it"));
@@ -258,7 +258,7 @@ std::string refusal_of_query(char const *sql) {
   TemporaryFolder const folder;
   Store store(folder.file("host.db"), populate_nothing);
   return refusal_by([&] {
-    Transaction transaction(store, Access::read);
+    ReadingTransaction transaction(store);
     simhost::storage::Query query(transaction, sql);
     while (query.next()) {
     }
@@ -268,10 +268,10 @@ std::string refusal_of_query(char const *sql) {
 TEST(StateFile, HasASchemaThatNoStatementWrites) {
   TemporaryFolder const folder;
   Store store(folder.file("host.db"), populate_nothing);
-  Transaction transaction(store, Access::write);
-  simhost::storage::Query(transaction, "PRAGMA writable_schema = ON").next();
+  ChangingTransaction transaction(store);
+  simhost::storage::Change(transaction, "PRAGMA writable_schema = ON").next();
   EXPECT_THAT(
-      refusal_by([&] { simhost::storage::Query(transaction, "DELETE FROM sqlite_schema").run(); }),
+      refusal_by([&] { simhost::storage::Change(transaction, "DELETE FROM sqlite_schema").run(); }),
       HasSubstr("cannot be used: SQLite refuses it"));
 }
 

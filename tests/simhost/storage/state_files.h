@@ -10,7 +10,7 @@
 #include "storage/switches.h"
 #include "temporary_folder.h"
 
-inline void populate_nothing(simhost::storage::Transaction &) {}
+inline void populate_nothing(simhost::storage::ChangingTransaction &) {}
 
 // What `work` says is wrong with a state; empty if nothing is.
 template <typename Work>
@@ -36,7 +36,7 @@ inline void write_file(std::filesystem::path const &file, std::string const &tex
 }
 
 inline void add(simhost::storage::Store &store, std::string const &name) {
-  simhost::storage::Transaction transaction(store, simhost::storage::Access::write);
+  simhost::storage::ChangingTransaction transaction(store);
   simhost::storage::add_switch(transaction, {.alias = name,
                                              .identifier = name,
                                              .portset = name,
@@ -47,7 +47,7 @@ inline void add(simhost::storage::Store &store, std::string const &name) {
 }
 
 inline bool has(simhost::storage::Store &store, std::string const &name) {
-  simhost::storage::Transaction transaction(store, simhost::storage::Access::read);
+  simhost::storage::ReadingTransaction transaction(store);
   return simhost::storage::find_switch(transaction, simhost::storage::SwitchName::alias, name)
       .has_value();
 }

@@ -9,7 +9,9 @@
 #include <filesystem>
 #include <fstream>
 #include <list>
+#include <stdexcept>
 #include <string>
+#include <type_traits>
 
 #include "storage/ports.h"
 #include "storage/query.h"
@@ -19,14 +21,14 @@
 
 namespace {
 
-using simhost::storage::Access;
+using simhost::storage::ChangingTransaction;
+using simhost::storage::ReadingTransaction;
 using simhost::storage::Store;
 using simhost::storage::Switch;
 using simhost::storage::SwitchName;
-using simhost::storage::Transaction;
 using simhost::storage::UnusableState;
 
-void populate_nothing(Transaction &) {}
+void populate_nothing(ChangingTransaction &) {}
 
 Switch named(std::string const &name) {
   return {.alias = name,
@@ -38,13 +40,13 @@ Switch named(std::string const &name) {
 }
 
 void add(Store &store, std::string const &name) {
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   ASSERT_TRUE(simhost::storage::add_switch(transaction, named(name)).has_value());
   transaction.commit();
 }
 
 bool has(Store &store, std::string const &name) {
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   return simhost::storage::find_switch(transaction, SwitchName::alias, name).has_value();
 }
 
@@ -86,14 +88,14 @@ TEST(Store, AClosedFileIsTheWholeState) {
 TEST(Store, OnlyANewStateIsPopulated) {
   TemporaryFolder const folder;
   int times = 0;
-  auto const populate = [&](Transaction &transaction) {
+  auto const populate = [&](ChangingTransaction &transaction) {
     ++times;
     simhost::storage::add_uplink(transaction, "u");
   };
   { Store const first(folder.file("host.db"), populate); }
   Store second(folder.file("host.db"), populate);
   EXPECT_EQ(times, 1);
-  Transaction transaction(second, Access::read);
+  ReadingTransaction transaction(second);
   EXPECT_EQ(simhost::storage::free_uplinks(transaction).size(), 1U);
 }
 
@@ -111,7 +113,7 @@ TEST(Store, AReaderDoesNotWaitForAWriterAndSeesTheStateBefore) {
   TemporaryFolder const folder;
   Store writer(folder.file("host.db"), populate_nothing);
   Store reader(folder.file("host.db"), populate_nothing);
-  Transaction transaction(writer, Access::write);
+  ChangingTransaction transaction(writer);
   simhost::storage::add_switch(transaction, named("a"));
   EXPECT_FALSE(has(reader, "a"));
   transaction.commit();
@@ -122,11 +124,11 @@ TEST(Store, AWriterWaitsForWhatIsLeftOfItsPatience) {
   TemporaryFolder const folder;
   Store holder(folder.file("host.db"), populate_nothing);
   Store waiter(folder.file("host.db"), populate_nothing);
-  Transaction const held(holder, Access::write);
+  ChangingTransaction const held(holder);
   simhost::storage::Patience patience(std::chrono::milliseconds(1));
   for (int time = 0; time < 2; ++time) {
     try {
-      Transaction const transaction(waiter, Access::write, patience);
+      ChangingTransaction const transaction(waiter, patience);
       ADD_FAILURE() << "two write at once";
     } catch (simhost::storage::StateFailure const &failure) {
       EXPECT_EQ(failure.kind(), simhost::storage::FailureKind::busy);
@@ -135,17 +137,30 @@ TEST(Store, AWriterWaitsForWhatIsLeftOfItsPatience) {
     }
     EXPECT_EQ(patience.left(), std::chrono::nanoseconds::zero());
   }
-  Transaction transaction(waiter, Access::read, patience);
+  ReadingTransaction transaction(waiter, patience);
   simhost::storage::Query query(transaction, "PRAGMA busy_timeout");
   query.require_row();
   EXPECT_EQ(query.integer(0), 0) << "SQLite waits longer";
+}
+
+// What changes the state comes down to one of these, so that the compiler knows it everywhere.
+static_assert(
+    std::is_constructible_v<simhost::storage::Change, ChangingTransaction &, char const *>);
+static_assert(
+    !std::is_constructible_v<simhost::storage::Change, ReadingTransaction &, char const *>);
+
+TEST(Store, AQueryChangesNothingWhateverItSays) {
+  Store store(std::nullopt, populate_nothing);
+  ChangingTransaction transaction(store);
+  EXPECT_THROW(simhost::storage::Query(transaction, "DELETE FROM switch"), std::logic_error);
+  EXPECT_NO_THROW(simhost::storage::Change(transaction, "DELETE FROM switch"));
 }
 
 TEST(Store, ATransactionSeesOneStateThroughout) {
   TemporaryFolder const folder;
   Store writer(folder.file("host.db"), populate_nothing);
   Store reader(folder.file("host.db"), populate_nothing);
-  Transaction transaction(reader, Access::read);
+  ReadingTransaction transaction(reader);
   EXPECT_FALSE(simhost::storage::find_switch(transaction, SwitchName::alias, "a"));
   add(writer, "a");
   EXPECT_FALSE(simhost::storage::find_switch(transaction, SwitchName::alias, "a"));
@@ -154,7 +169,7 @@ TEST(Store, ATransactionSeesOneStateThroughout) {
 TEST(Store, WithoutACommitNothingHappened) {
   Store store(std::nullopt, populate_nothing);
   {
-    Transaction transaction(store, Access::write);
+    ChangingTransaction transaction(store);
     simhost::storage::add_switch(transaction, named("a"));
   }
   EXPECT_FALSE(has(store, "a"));
@@ -163,7 +178,7 @@ TEST(Store, WithoutACommitNothingHappened) {
 
 TEST(Store, EveryNameFindsItsSwitch) {
   Store store(std::nullopt, populate_nothing);
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   auto row = named("a");
   row.identifier = "i";
   row.portset = "p";
@@ -207,7 +222,7 @@ TEST(Store, LookUpsUseAnIndex) {
 
 TEST(Store, ARemovedSwitchTakesItsPortsAlongAndFreesItsUplinks) {
   Store store(std::nullopt, populate_nothing);
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   simhost::storage::add_uplink(transaction, "u");
   auto const key = simhost::storage::add_switch(transaction, named("a")).value();
   auto const port =
@@ -223,7 +238,7 @@ TEST(Store, ARemovedSwitchTakesItsPortsAlongAndFreesItsUplinks) {
 
 TEST(Store, APortNumberIsNeverUsedTwice) {
   Store store(std::nullopt, populate_nothing);
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   auto const add_switch_with_port = [&] {
     auto const key = simhost::storage::add_switch(transaction, named("a")).value();
     auto const port =
@@ -238,7 +253,7 @@ TEST(Store, APortNumberIsNeverUsedTwice) {
 
 TEST(Store, APortIdentifierIsUniqueOnItsSwitch) {
   Store store(std::nullopt, populate_nothing);
-  Transaction transaction(store, Access::write);
+  ChangingTransaction transaction(store);
   auto const a = simhost::storage::add_switch(transaction, named("a")).value();
   auto const b = simhost::storage::add_switch(transaction, named("b")).value();
   using simhost::storage::PortKind;
@@ -251,7 +266,7 @@ TEST(Store, APortIdentifierIsUniqueOnItsSwitch) {
 template <typename Read>
 std::string complaint_about(std::string const &value, Read const &read) {
   Store store(std::nullopt, populate_nothing);
-  Transaction transaction(store, Access::read);
+  ReadingTransaction transaction(store);
   static std::list<std::string> statements;  // a query is of a text that stays
   simhost::storage::Query select(transaction,
                                  statements.emplace_back("SELECT " + value + " AS answer"));

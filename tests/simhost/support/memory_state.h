@@ -13,7 +13,7 @@
 struct MemoryState : testing::Test {
   MemoryState() { simhost::run_on(simhost::stored::plane()); }
 
-  static void populate(simhost::storage::Transaction &transaction) {
+  static void populate(simhost::storage::ChangingTransaction &transaction) {
     for (auto const *uplink : {"nic0", "nic1", "nic2", "nic3"}) {
       simhost::storage::add_uplink(transaction, uplink);
     }

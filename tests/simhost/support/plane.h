@@ -36,7 +36,7 @@ struct Plane : MemoryState {
     return simhost::storage::PropertyOwner::port(key, port.number);
   }
 
-  simhost::storage::Transaction transaction{store, simhost::storage::Access::write};
+  simhost::storage::ChangingTransaction transaction{store};
   simhost::storage::SwitchKey key{};
   simhost::storage::Port p1;
   simhost::storage::Port p2;
