@@ -2,6 +2,7 @@
 #include "abi/call.h"
 
 #include <gtest/gtest.h>
+#include <sqlite3.h>
 
 #include <chrono>
 #include <type_traits>
@@ -58,6 +59,43 @@ TEST(Calls, ChangeTheStateWhenTheyComeToTheirEnd) {
   EXPECT_TRUE(simhost::completes<ChangingCall>(
       kCall, [](ChangingCall &call) { add_planted(call.transaction()); }, ending));
   EXPECT_TRUE(has_planted());
+}
+
+// The connection to the host's state, which SQLite tells of when it is opened.
+sqlite3 *host_state = nullptr;
+
+int keep(sqlite3 *opened, char const ** /*error*/, sqlite3_api_routines const * /*api*/) {
+  host_state = opened;
+  return SQLITE_OK;
+}
+
+int const kKept = sqlite3_auto_extension(reinterpret_cast<void (*)()>(keep));
+
+// How long the transaction that began last would have waited for other processes.
+std::chrono::milliseconds longest_wait() {
+  sqlite3_stmt *statement = nullptr;
+  sqlite3_prepare_v2(host_state, "PRAGMA busy_timeout", -1, &statement, nullptr);
+  sqlite3_step(statement);
+  std::chrono::milliseconds const wait(sqlite3_column_int(statement, 0));
+  sqlite3_finalize(statement);
+  return wait;
+}
+
+TEST(Calls, WaitForTheFaultsThatTheyCountAsLongAsOneCallDoes) {
+  ASSERT_EQ(kKept, SQLITE_OK);
+  { StatelessCall const call(kCall); }
+  EXPECT_EQ(longest_wait(), simhost::storage::kPatience) << "it looked whether one waits";
+  {
+    ChangingCall call("simhost_fail_call");
+    simhost::add_fault(call.transaction(),
+                       {.function = kCall, .first = 2, .last = 2, .status = QEX_BUSY});
+    call.complete();
+  }
+  { StatelessCall const call(kCall); }
+  EXPECT_LT(longest_wait(), simhost::storage::kPatience) << "then it counted this call";
+  ChangingCall call("simhost_clear_faults");
+  simhost::clear_faults(call.transaction(), kCall);
+  call.complete();
 }
 
 TEST(Calls, WaitForFaultsAndTheStateTogether) {

@@ -4,10 +4,12 @@
 #include <SQLiteCpp/Database.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sqlite3.h>
 #include <sys/stat.h>
 
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <string>
 
 #include "schema_3.h"
@@ -70,6 +72,54 @@ TEST(StateFile, OfLessThanADatabaseIsRefused) {
     EXPECT_EQ(refusal_of(file), refused(file, "file is not a database"));
     EXPECT_EQ(content(file), text) << "it is left as it was";
   }
+}
+
+// SQLite's way to files, on which another file is in a file's place just while that is opened.
+class SwappedWhileOpened {
+ public:
+  SwappedWhileOpened(std::filesystem::path const &file, std::filesystem::path const &other) {
+    swap = [=] {
+      auto const aside = file.string() + ".aside";
+      std::filesystem::rename(file, aside);
+      std::filesystem::rename(other, file);
+      std::filesystem::rename(aside, other);
+    };
+    vfs_ = *usual();
+    vfs_.zName = "swapping";
+    vfs_.xOpen = open;
+    sqlite3_vfs_register(&vfs_, 1);
+  }
+  ~SwappedWhileOpened() { sqlite3_vfs_unregister(&vfs_); }
+  SwappedWhileOpened(SwappedWhileOpened const &) = delete;
+  SwappedWhileOpened &operator=(SwappedWhileOpened const &) = delete;
+
+ private:
+  static sqlite3_vfs *usual() { return sqlite3_vfs_find("unix"); }
+  static int open(sqlite3_vfs * /*vfs*/, char const *name, sqlite3_file *file, int flags,
+                  int *opened) {
+    bool const is_state = (flags & SQLITE_OPEN_MAIN_DB) != 0;
+    if (is_state) {
+      swap();
+    }
+    int const result = usual()->xOpen(usual(), name, file, flags, opened);
+    if (is_state) {
+      swap();
+    }
+    return result;
+  }
+
+  static inline std::function<void()> swap;
+  sqlite3_vfs vfs_{};
+};
+
+TEST(StateFile, InWhosePlaceWasAnotherWhileItWasOpenedIsRefused) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.db");
+  auto const other = folder.file("other.db");
+  EXPECT_EQ(refusal_of(file), "");
+  EXPECT_EQ(refusal_of(other), "");
+  SwappedWhileOpened const swapped(file, other);
+  EXPECT_EQ(refusal_of(file), refused(file, "another file took its place while it was opened"));
 }
 
 TEST(StateFile, MayBeNamedByALink) {
