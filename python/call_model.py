@@ -79,6 +79,12 @@ class Argument:
     value: Value
     is_added: bool  # both modules own it and add its value to the result
 
+    @property
+    def is_text(self) -> bool:
+        """A text for the call to read."""
+        is_character = self.type.name == "char" and len(self.type.layers) == 1
+        return is_character and self.direction is Direction.IN
+
 
 @dataclass(frozen=True)
 class Result:
@@ -100,6 +106,16 @@ class Call:
     @property
     def has_status(self) -> bool:
         return self.result.type == Type((), STATUS)
+
+    @property
+    def has_pointers(self) -> bool:
+        """Whether a null can be passed, or returned."""
+        types = [self.result.type, *(one.type for one in self.arguments)]
+        return any("p" in one.layers for one in types)
+
+    @property
+    def texts(self) -> List[str]:
+        return [one.name for one in self.arguments if one.is_text]
 
     @property
     def inputs(self) -> List[Argument]:

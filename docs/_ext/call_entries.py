@@ -2,7 +2,7 @@
 
 import re
 from dataclasses import dataclass
-from typing import Collection, Dict, Iterable, List, Optional, Sequence, Tuple
+from typing import Collection, Dict, Iterable, List, Mapping, Optional, Sequence, Tuple
 
 import call_model
 import comments
@@ -58,10 +58,14 @@ class Entries:
     """Makes them of the definitions and of what the headers say."""
 
     def __init__(
-        self, known: Definitions, headers: Dict[str, Header], helpers: Collection[Header]
+        self,
+        known: Definitions,
+        calls: Mapping[str, call_model.Call],
+        headers: Dict[str, Header],
+        helpers: Collection[Header],
     ) -> None:
         self._known = known
-        self._calls = {call.name: call for call in call_model.read(known)}
+        self._calls = calls
         self._headers = headers
         self._helpers = helpers
         self._said_of_types = {
@@ -90,7 +94,7 @@ class Entries:
             forms=tuple(self._names(one) for one in forms),
             results=self._results(forms[0]),
             shape=_shape_of_result(forms[0]),
-            statuses=statuses.of_call(name, header) if header else {},
+            statuses=statuses.of_call(self._calls[name], header) if header else {},
             ownership=tuple(self._ownership(longest)),
             header=header.name if header else "",
         )

@@ -5,6 +5,7 @@ import re
 from pathlib import Path
 from typing import Dict, Iterable, List, Tuple
 
+import call_model
 import comments
 import definitions
 import layout
@@ -22,6 +23,7 @@ TYPES = "C"  # where the names of C types have their places
 class Catalogue:
     def __init__(self, root: Path, build: Path) -> None:
         self.known = definitions.read(build / "classes/made/tree.xml")
+        self.modelled = {call.name: call for call in call_model.read(self.known)}
         self.layout = layout.read(build / "docs/layout.tsv")
         self.headers = _headers(root / "include")
         self.simulated = _simulated(build / "simhost/calls.json")
@@ -30,7 +32,8 @@ class Catalogue:
         }
         self._refuse_other_comments()
         self._shapes = Shapes(self.known, self.layout)
-        self._entries = Entries(self.known, self.headers, _headers(root / "helpers").values())
+        helpers = _headers(root / "helpers").values()
+        self._entries = Entries(self.known, self.modelled, self.headers, helpers)
         self.calls: Dict[str, Call] = {
             name: self._entries.of_call(name, forms) for name, forms in self.known.forms().items()
         }
@@ -46,7 +49,7 @@ class Catalogue:
     def _refuse_other_comments(self) -> None:
         families = self.headers["qexapi/status.h"].families
         known = {name for family in families for name in family.names}
-        refused = statuses.refused(self.headers.values(), known)
+        refused = statuses.refused(self.headers.values(), self.modelled, known)
         if refused:
             raise ValueError("\n".join(["include/README.md asks for other comments", *refused]))
 

@@ -1,6 +1,7 @@
 """What the headers say in words: of files, functions, families of constants.
 
-How a comment has to be written for that, include/README.md says.
+How a comment has to be written for that, include/README.md says. Of what is declared, only names
+are looked at here, to know what a comment is about; the rest is in the definitions.
 """
 
 import re

@@ -4,12 +4,14 @@ import shutil
 from pathlib import Path
 from typing import Dict, List
 
+import call_model
 import comments
 import pytest
 import statuses
 from catalogue import Catalogue
 from comments import Header
 from conftest import BUILD, ROOT
+from definitions import Type
 
 STATUSES = {"QEX_OK", "QEX_EXISTS", "QEX_NOT_FOUND", "QEX_BAD_PARAM"}
 FILE = """/**
@@ -48,6 +50,38 @@ char Exists(char const *port);
 """
 
 
+def declared(name: str, *texts: str, result: str = call_model.STATUS) -> call_model.Call:
+    """A call that takes texts."""
+    nothing = call_model.Value(call_model.Ownership.VALUE)
+    arguments = tuple(
+        call_model.Argument(
+            name=text,
+            type=Type(("p",), "char"),
+            c_type="char const *",
+            direction=call_model.Direction.IN,
+            is_nullable=False,
+            length=None,
+            room=0,
+            value=nothing,
+            is_added=False,
+        )
+        for text in texts
+    )
+    returned = call_model.Result(Type((), result), result, False, nothing)
+    return call_model.Call(name, "switches", "", arguments, returned, takes_more=False)
+
+
+CALLS = {
+    one.name: one
+    for one in (
+        declared("Add", "switchName", "port"),
+        declared("Remove", "switchName", "port"),
+        declared("Clear"),
+        declared("Exists", "port", result="char"),
+    )
+}
+
+
 def header(text: str, folder: Path) -> Header:
     path = folder / "switches.h"
     path.write_text(text, encoding="ascii")
@@ -80,19 +114,19 @@ def header(text: str, folder: Path) -> Header:
 )
 def test_statuses_of_a_call(call: str, expected: Dict[str, str], tmp_path: Path) -> None:
     read = header(FILE + ADD + REST, tmp_path)
-    assert statuses.of_call(call, read) == expected
-    assert statuses.refused([read], STATUSES) == []
+    assert statuses.of_call(CALLS[call], read) == expected
+    assert statuses.refused([read], CALLS, STATUSES) == []
 
 
 def test_success_in_a_call_s_own_words(tmp_path: Path) -> None:
     read = header(FILE + ADD.replace("QEX_BAD_PARAM for", "QEX_OK for"), tmp_path)
-    assert statuses.of_call("Add", read)["QEX_OK"] == "for an empty one"
+    assert statuses.of_call(CALLS["Add"], read)["QEX_OK"] == "for an empty one"
 
 
 def test_the_parameters_that_must_name_something(tmp_path: Path) -> None:
     read = header(FILE + ADD + REST, tmp_path)
-    assert statuses.concerned("Add", read)["QEX_NOT_FOUND"] == ["switchName"]
-    assert statuses.concerned("Remove", read)["QEX_NOT_FOUND"] == ["switchName", "port"]
+    assert statuses.concerned(CALLS["Add"], read)["QEX_NOT_FOUND"] == ["switchName"]
+    assert statuses.concerned(CALLS["Remove"], read)["QEX_NOT_FOUND"] == ["switchName", "port"]
 
 
 def test_a_list_is_no_running_text(tmp_path: Path) -> None:
@@ -164,7 +198,7 @@ typedef enum Kind {
 def test_what_is_refused(right: str, wrong: str, refused: List[str], tmp_path: Path) -> None:
     text = FILE + ADD + REST
     assert text.count(right) == 1
-    found = statuses.refused([header(text.replace(right, wrong), tmp_path)], STATUSES)
+    found = statuses.refused([header(text.replace(right, wrong), tmp_path)], CALLS, STATUSES)
     for one in refused:
         assert any(line.startswith(one) for line in found), found
 

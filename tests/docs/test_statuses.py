@@ -8,7 +8,6 @@ A text of which it is not said to be known need not be.
 from typing import Any, Dict, Iterator, List, Tuple
 
 import libvswitch as vs
-import prototypes
 import provoked_configuration
 import provoked_queries
 import provoked_state
@@ -84,7 +83,9 @@ def status_with(call: Call, name: str, given: Any) -> int:
 def names() -> Iterator[Tuple[str, str]]:
     """Calls, each with a parameter that must name what the host knows."""
     for call in CALLS:
-        concerned = statuses.concerned(call.name, CATALOGUE.headers[call.header])
+        concerned = statuses.concerned(
+            CATALOGUE.modelled[call.name], CATALOGUE.headers[call.header]
+        )
         for name in concerned.get("QEX_NOT_FOUND", []):
             yield call.name, name
 
@@ -99,7 +100,7 @@ def test_a_name_of_nothing(host: Host, call: str, name: str) -> None:
 def test_no_name_at_all(host: Host, call: str, name: str) -> None:
     described = CATALOGUE.calls[call]
     # An array of bytes that is not given is an empty one.
-    is_array = f"{name}[" in described.prototype
+    is_array = CATALOGUE.modelled[call].argument(name).type.is_array
     assert "QEX_BAD_PARAM" in described.statuses
     status = vs.QEX_NOT_FOUND if is_array else vs.QEX_BAD_PARAM
     assert status_with(described, name, None) == status
@@ -109,7 +110,7 @@ def other_texts() -> Iterator[Tuple[str, str]]:
     known = set(names())
     for call in CALLS:
         if "QEX_NOT_FOUND" not in call.comment.statuses:
-            for name in prototypes.texts(call.prototype):
+            for name in CATALOGUE.modelled[call.name].texts:
                 if (call.name, name) not in known:
                     yield call.name, name
 
