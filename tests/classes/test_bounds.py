@@ -298,6 +298,21 @@ def test_a_text_is_no_boolean(switch: str) -> None:
         assert vs.VSDVS_SetTxUplinkAlways(switch, "web", value) == vs.QEX_OK
 
 
+def test_addresses_of_no_known_form_are_read_as_the_host_counts_them(
+    monkeypatch: pytest.MonkeyPatch,
+) -> None:
+    """A host may know a mode whose form nobody here does: where its record ends is not guessed."""
+    _, port = vs.VSDVS_DvPortIDToPortID("vswitch0", "web-1")
+    igmp, unknown = vs.VS_MCAST_FILTER_MODE_IGMP, vs.VS_MCAST_FILTER_MODE_SNOOPING
+    known = _libvswitch.VSQEX_GetMcastFilters
+    monkeypatch.setattr(
+        _libvswitch, "VSQEX_GetMcastFilters", lambda of, at, mode: known(of, at, igmp)
+    )
+    with vs.owned(vs.VSQEX_GetMcastFilters("vswitch0", port, unknown)) as (status, filters):
+        assert status == vs.QEX_OK and filters is not None
+        assert [*filters.ipv4Entries] == [int.from_bytes(bytes([239, 1, 1, 1]), "little")]
+
+
 def test_an_address_shorter_than_its_form_is_refused(switch: str) -> None:
     _, port = vs.VSDVS_DvPortIDToPortID(switch, "web")
     for mode, size in (
