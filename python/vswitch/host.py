@@ -3,7 +3,6 @@
 from __future__ import annotations
 
 import ctypes
-import threading
 import typing
 from typing import (
     Any,
@@ -28,7 +27,7 @@ from vswitch._thing import Thing
 from vswitch.options import Options
 from vswitch.port import Port
 from vswitch.switch import Switch
-from vswitch.transaction import Transaction
+from vswitch.transaction import Transaction, find_transaction
 from vswitch.uplink import Uplink, find_port_of
 from vswitch.values import MacLearning, Words, to_words
 
@@ -45,7 +44,6 @@ class Host:
     """
 
     def __init__(self, simulated: Optional[bool] = None) -> None:
-        self._here = threading.local()
         if simulated is not None and self.simulated is not simulated:
             raise HostError(
                 "this host is simulated, and a real one is wanted"
@@ -209,19 +207,11 @@ class Host:
 
     # What transactions are told
 
-    @property
-    def _transaction(self) -> Optional[Transaction]:
-        found: Optional[Transaction] = getattr(self._here, "transaction", None)
-        return found
-
-    @_transaction.setter
-    def _transaction(self, current: Optional[Transaction]) -> None:
-        self._here.transaction = current
-
     def _note(self, step: Callable[..., _undo.Step], *about: Any) -> None:
         """Before a write: a transaction notes what is there."""
-        if self._transaction is not None:
-            self._transaction.note(step(*about))
+        transaction = find_transaction(self)
+        if transaction is not None:
+            transaction.note(step(*about))
 
     def _note_properties(self, thing: Thing, keys: Tuple[str, ...]) -> None:
         self._note(_undo.Properties, thing, keys)

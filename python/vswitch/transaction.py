@@ -3,6 +3,7 @@
 from __future__ import annotations
 
 import typing
+from contextvars import ContextVar
 from types import TracebackType
 from typing import Dict, List, Optional, Tuple, Type
 
@@ -12,7 +13,15 @@ from vswitch._undo import Step
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
 
-__all__ = ["Transaction"]
+__all__ = ["Transaction", "find_transaction"]
+
+_open: "ContextVar[Tuple[Transaction, ...]]" = ContextVar("open transactions", default=())
+"""Those of this thread or task that lie in one another, whatever their hosts."""
+
+
+def find_transaction(host: "Host") -> "Optional[Transaction]":
+    """The innermost of a host."""
+    return next((one for one in reversed(_open.get()) if one.host is host), None)
 
 
 class Transaction:
@@ -22,18 +31,18 @@ class Transaction:
     type, or that it is not set. When the block raises, that is put back, the last write first:
     RolledBack, with what was raised as its cause. NotRestored names what could not be put back.
     Transactions may lie in one another. Only what is done through the same Host, in the same
-    thread, is noted.
+    thread and the same task of a loop, is noted.
     """
 
     def __init__(self, host: "Host", raises: bool = True) -> None:
-        self._host = host
+        self.host = host
         self._raises = raises
         self._steps: List[Step] = []
         self._outer: Optional[Transaction] = None
 
     def __enter__(self) -> "Transaction":
-        self._outer = self._host._transaction
-        self._host._transaction = self
+        self._outer = find_transaction(self.host)
+        _open.set((*_open.get(), self))
         return self
 
     def note(self, step: Step) -> None:
@@ -45,7 +54,7 @@ class Transaction:
         raised: Optional[BaseException],
         trace: Optional[TracebackType],
     ) -> None:
-        self._host._transaction = self._outer
+        _open.set(tuple(one for one in _open.get() if one is not self))
         if raised is None:
             if self._outer is not None:
                 self._outer._steps += self._steps

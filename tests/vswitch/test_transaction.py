@@ -1,5 +1,7 @@
 """Blocks of changes: what is put back, byte for byte, and what is said of the rest."""
 
+import asyncio
+import threading
 from typing import Any, Callable, Dict, Optional, Union
 
 import libvswitch as vs
@@ -391,6 +393,45 @@ def test_putting_back_goes_on_to_its_end(
             bare.vlan = 7
             raise Stop("that is all")
     assert everything(host) == before
+
+
+def test_what_others_do_meanwhile_stays(host: simhost.Host, lab: Switch, objects: Host) -> None:
+    """In another thread, or in another task of the same."""
+    desk, bare = lab.ports["desk-3"], lab.ports["desk-4"]
+    with pytest.raises(RolledBack):
+        with objects.transaction():
+            bare.vlan = 8
+            other = threading.Thread(target=setattr, args=(desk, "vlan", 9))
+            other.start()
+            other.join()
+            raise Stop
+    assert desk.vlan == Vlan(9) and not bare.is_set("vlan")
+
+    async def first(there: asyncio.Event, done: asyncio.Event) -> None:
+        with objects.transaction():
+            bare.vlan = 8
+            there.set()
+            await done.wait()
+            bare.alias = "x"
+            raise Stop
+
+    async def second(there: asyncio.Event, done: asyncio.Event) -> None:
+        await there.wait()
+        with objects.transaction():
+            desk.vlan = 10
+        desk.alias = "y"
+        done.set()
+
+    async def main() -> None:
+        events = asyncio.Event(), asyncio.Event()
+        raised, nothing = await asyncio.gather(
+            first(*events), second(*events), return_exceptions=True
+        )
+        assert type(raised) is RolledBack and nothing is None
+
+    asyncio.run(main())
+    assert desk.vlan == Vlan(10) and desk.alias == "y"
+    assert not bare.is_set("vlan") and not bare.is_set("alias")
 
 
 def test_errors_keep_the_words_of_their_time(lab: Switch, objects: Host) -> None:
