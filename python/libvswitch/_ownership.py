@@ -1,14 +1,13 @@
 """Memory of the library: which deallocator releases it, once."""
 
 import contextlib
-import threading
 import types
 import typing
 import weakref
 from typing import Any, Callable, Dict, Optional, TypeVar, Union
 
 import _libvswitch
-from libvswitch import _arrays, _layout, _pointers, _records
+from libvswitch import _arrays, _layout, _locks, _pointers, _records
 
 __all__ = ["owned"]
 
@@ -18,7 +17,7 @@ Deallocator = Union[str, Callable[[Any], Any]]
 # What is allocated, by its place: another pointer to it must not outlive it.
 _allocated: Dict[int, "weakref.ref[Any]"] = {}
 # Of several threads, one at a time releases.
-_releasing = threading.RLock()
+_releasing = _locks.RLock()
 
 
 def allocated(result: Any, deallocator: Optional[str], status: int = 0) -> Any:

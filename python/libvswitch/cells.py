@@ -1,11 +1,10 @@
 """Cells: memory of one C type for calls that read or fill it, and functions that C may call."""
 
 import ctypes
-import threading
 import weakref
 from typing import TYPE_CHECKING, Any, Callable, Dict, Iterable, List, Optional, Tuple, Union
 
-from libvswitch import _arrays, _layout, _memory, _ownership, _pointers, _records
+from libvswitch import _arrays, _layout, _locks, _memory, _ownership, _pointers, _records
 
 
 class Pointer(_records._Pointing):
@@ -347,4 +346,4 @@ def _plain(address: int, owner: object = None) -> Pointer:
 
 
 # Held while a pointer in a cell becomes an object, or an object a pointer in a cell.
-_pointing = threading.RLock()
+_pointing = _locks.RLock()

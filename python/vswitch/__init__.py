@@ -37,17 +37,13 @@ from libvswitch.errors import (
 )
 from vswitch.exits import exits
 from vswitch.host import Host
-from vswitch.mirroring import Mirroring
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
 from vswitch.transaction import Transaction
 from vswitch.uplink import Uplink
 from vswitch.values import (
-    Encapsulation,
     FrameFilter,
     MacLearning,
-    Mirror,
-    MirrorEnd,
     PortMacLearning,
     PrivateVlan,
     Teaming,
@@ -56,6 +52,7 @@ from vswitch.values import (
 from vswitch.words import DocumentError
 
 if typing.TYPE_CHECKING:
+    from vswitch.mirroring import Encapsulation, Mirror, MirrorEnd, Mirroring
     from vswitch.plan import Plan
     from vswitch.told import (
         Change,
@@ -68,6 +65,10 @@ if typing.TYPE_CHECKING:
         SwitchStats,
     )
 else:
+    _PLACES = {
+        "Plan": "plan",
+        **dict.fromkeys(("Encapsulation", "Mirror", "MirrorEnd", "Mirroring"), "mirroring"),
+    }
 
     def __getattr__(name: str) -> object:
         # Only those who use them pay for them.
@@ -75,7 +76,7 @@ else:
 
         if name not in __all__:
             raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
-        return getattr(import_module("vswitch.plan" if name == "Plan" else "vswitch.told"), name)
+        return getattr(import_module(f"vswitch.{_PLACES.get(name, 'told')}"), name)
 
 
 __all__ = [

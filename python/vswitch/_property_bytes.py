@@ -15,7 +15,8 @@ from libvswitch import _pointers
 from libvswitch.enums import Forbid
 from vswitch import _records, _settings, _table
 from vswitch._table import Property
-from vswitch.values import MacLearning, Mirror, PrivateVlan, Teaming, Vlan
+from vswitch.mirroring import Mirror
+from vswitch.values import MacLearning, PrivateVlan, Teaming, Vlan
 
 __all__ = ["bytes_of", "check", "value_of"]
 

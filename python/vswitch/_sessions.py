@@ -10,7 +10,7 @@ import libvswitch as _vs
 from libvswitch import _packed_values, _pointers
 from libvswitch.values import DVMirrorEntity, DVMirrorSession
 from vswitch import _table
-from vswitch.values import Encapsulation, Mirror, MirrorEnd
+from vswitch.mirroring import Encapsulation, Mirror, MirrorEnd
 
 _SIZES = _pointers.record_sizes()
 

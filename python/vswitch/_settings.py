@@ -19,7 +19,6 @@ from vswitch._thing import Item, Thing
 from vswitch.values import (
     FrameFilter,
     MacLearning,
-    Mirror,
     PortMacLearning,
     PrivateVlan,
     SettingValue,
@@ -29,6 +28,9 @@ from vswitch.values import (
     natural,
     to_words,
 )
+
+if typing.TYPE_CHECKING:
+    from vswitch.mirroring import Mirror
 
 Got = TypeVar("Got")
 Given = TypeVar("Given")
@@ -83,19 +85,25 @@ def _set_private_vlans(switch: str, vlans: Tuple[PrivateVlan, ...]) -> None:
     checked.VSDVS_SetPrivateVLANMap(switch, entries)
 
 
-def _mirrors(data: bytes) -> Tuple[Mirror, ...]:
+def _mirror(held: Words) -> "Mirror":
+    from vswitch.mirroring import Mirror
+
+    return Mirror.from_words(held)
+
+
+def _mirrors(data: bytes) -> "Tuple[Mirror, ...]":
     from vswitch import _sessions
 
     return _sessions.mirrors_from(data)
 
 
-def _mirror_bytes(mirrors: Tuple[Mirror, ...]) -> bytes:
+def _mirror_bytes(mirrors: "Tuple[Mirror, ...]") -> bytes:
     from vswitch import _sessions
 
     return _sessions.mirror_bytes(mirrors)
 
 
-_MIRRORS = Crossing(Mirror.from_words, read=_mirrors, write=_mirror_bytes)
+_MIRRORS = Crossing(_mirror, read=_mirrors, write=_mirror_bytes)
 
 CROSSINGS: Dict[str, Crossing] = {
     _vs.VSPROP_MTU: Crossing(None, checked.VSDVS_GetMTU, checked.VSDVS_SetMTU),

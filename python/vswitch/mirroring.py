@@ -1,4 +1,4 @@
-"""A mirror session for the time of a block."""
+"""Mirror sessions: their values, and a session for the time of a block."""
 
 from __future__ import annotations
 
@@ -6,20 +6,91 @@ import itertools
 import os
 import time
 import typing
+from dataclasses import dataclass
 from types import TracebackType
-from typing import Any, Dict, Iterator, Optional, Type, Union
+from typing import Any, Callable, ClassVar, Dict, Iterator, Optional, Tuple, Type, Union
 
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound, NotRestored
+from vswitch import _table
 from vswitch._surely import surely
+from vswitch._table import Form
 from vswitch.uplink import Uplink
-from vswitch.values import Mirror, MirrorEnd
+from vswitch.values import SettingValue, Words
 
 if typing.TYPE_CHECKING:
     from vswitch.told import MirrorStats
     from vswitch.port import Port
 
-__all__ = ["Mirroring"]
+__all__ = ["Encapsulation", "Mirror", "MirrorEnd", "Mirroring"]
+
+_SESSION = _table.PORT["mirror_sessions"].form["element"]
+
+
+@dataclass(frozen=True, eq=False, repr=False)
+class Encapsulation(SettingValue):
+    """How mirrored frames are wrapped."""
+
+    type: str = "gre"
+    key: int = 0
+    vlan: int = 0
+    id: int = 0
+    cos: int = 0
+    granularity: int = 0
+
+    _form: ClassVar[Form] = _table.get_member(_SESSION, "encapsulation")
+
+
+@dataclass(frozen=True, eq=False, repr=False)
+class MirrorEnd(SettingValue):
+    """What a session mirrors to or from: one of these."""
+
+    port: Optional[str] = None
+    uplink: Optional[str] = None
+    vlan: Optional[int] = None
+    ip: Optional[str] = None
+    number: Optional[int] = None
+
+    _form: ClassVar[Form] = _table.get_member(_SESSION, "to")["element"]
+
+
+def _known_end(held: Words) -> MirrorEnd:
+    return MirrorEnd.from_words(held)
+
+
+@dataclass(frozen=True, eq=False, repr=False)
+class Mirror(SettingValue):
+    """A mirror session of a port."""
+
+    sid: str
+    name: str = ""
+    type: str = "port"
+    snap_length: int = 0
+    sampling_rate: int = 0
+    disabled: bool = False
+    promiscuous: bool = False
+    to: Tuple[MirrorEnd, ...] = ()
+    received_by: Tuple[MirrorEnd, ...] = ()
+    sent_by: Tuple[MirrorEnd, ...] = ()
+    encapsulation: Encapsulation = Encapsulation()
+    encapsulates: bool = False
+    keeps_vlan: bool = False
+    no_output: bool = False
+    no_input: bool = False
+    mirrors_uplinks: bool = False
+    uplink_filter: str = "none"
+    received_from: Tuple[str, ...] = ()
+    sent_from: Tuple[str, ...] = ()
+    stack: bool = False
+
+    _form: ClassVar[Form] = _SESSION
+    _types: ClassVar[Dict[str, Callable[[Any], Any]]] = {
+        "to": _known_end,
+        "received_by": _known_end,
+        "sent_by": _known_end,
+        "encapsulation": Encapsulation.from_words,
+    }
+
 
 _counted = itertools.count(1)
 

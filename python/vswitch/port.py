@@ -11,15 +11,15 @@ from libvswitch import checked
 from libvswitch.enums import Forbid, LinkState, MacType
 from libvswitch.errors import NotFound, NoUplink
 from vswitch import _describing, _settings, _table, _undo, words as _words
-from vswitch.mirroring import Mirroring
 from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
 from vswitch.uplink import Uplink, find_port_of
-from vswitch.values import FrameFilter, Mirror, MirrorEnd, PortMacLearning, Teaming, Vlan, Words
+from vswitch.values import FrameFilter, PortMacLearning, Teaming, Vlan, Words
 
 if typing.TYPE_CHECKING:
     from vswitch.told import Group, MacEntry, PortStats
     from vswitch.host import Host
+    from vswitch.mirroring import Mirror, MirrorEnd, Mirroring
     from vswitch.switch import Switch
 
 
@@ -208,6 +208,8 @@ class Port(AnyPort):
 
     def mirrored(self, to: "Union[Port, Uplink, MirrorEnd, str]", **settings: Any) -> Mirroring:
         """Mirrors the port for the time of a block; see Mirroring."""
+        from vswitch.mirroring import Mirroring
+
         return Mirroring(self, to, settings)
 
     def remove(self) -> None:

@@ -15,11 +15,14 @@ from vswitch._settings import Setting
 from vswitch._thing import Item, Thing
 from vswitch.port import Port, UplinkPort
 from vswitch.uplink import Uplink
-from vswitch.values import MacLearning, Mirror, PrivateVlan, Teaming, Words
+from vswitch.values import MacLearning, PrivateVlan, Teaming, Words
 
 if typing.TYPE_CHECKING:
     from vswitch.told import Lag, MacEntry, MirrorStats, SwitchStats
     from vswitch.host import Host
+    from vswitch.mirroring import Mirror
+
+_SESSION = _table.PORT["mirror_sessions"].form["element"]
 
 
 class HostPart(Thing):
@@ -210,7 +213,7 @@ class Switch(Thing):
             lambda: checked.VSQEX_GetDVMirrorSessionIDs(self.alias),
             lambda sid: _telling.mirror_stats(self.alias, sid),
             f"running mirror sessions of {self.alias}",
-            most_bytes=_table.get_member(Mirror._form, "sid")["most_bytes"],
+            most_bytes=_table.get_member(_SESSION, "sid")["most_bytes"],
         )
 
     @property

@@ -18,11 +18,8 @@ from vswitch import _table, words as _words
 from vswitch._table import Form
 
 __all__ = [
-    "Encapsulation",
     "FrameFilter",
     "MacLearning",
-    "Mirror",
-    "MirrorEnd",
     "PortMacLearning",
     "PrivateVlan",
     "Teaming",
@@ -84,7 +81,6 @@ class Value:
         return f"{type(self).__name__}({', '.join(held)})"
 
 
-@dataclass(frozen=True, eq=False, repr=False)
 class SettingValue(Value):
     """What the values of settings have in common: their form in the table of settings."""
 
@@ -247,71 +243,3 @@ class PrivateVlan(SettingValue):
     type: str
 
     _form: ClassVar[Form] = _table.SWITCH["private_vlans"].form["element"]
-
-
-_SESSION = _table.PORT["mirror_sessions"].form["element"]
-
-
-@dataclass(frozen=True, eq=False, repr=False)
-class Encapsulation(SettingValue):
-    """How mirrored frames are wrapped."""
-
-    type: str = "gre"
-    key: int = 0
-    vlan: int = 0
-    id: int = 0
-    cos: int = 0
-    granularity: int = 0
-
-    _form: ClassVar[Form] = _table.get_member(_SESSION, "encapsulation")
-
-
-@dataclass(frozen=True, eq=False, repr=False)
-class MirrorEnd(SettingValue):
-    """What a session mirrors to or from: one of these."""
-
-    port: Optional[str] = None
-    uplink: Optional[str] = None
-    vlan: Optional[int] = None
-    ip: Optional[str] = None
-    number: Optional[int] = None
-
-    _form: ClassVar[Form] = _table.get_member(_SESSION, "to")["element"]
-
-
-def _end(held: Words) -> MirrorEnd:
-    return MirrorEnd.from_words(held)
-
-
-@dataclass(frozen=True, eq=False, repr=False)
-class Mirror(SettingValue):
-    """A mirror session of a port."""
-
-    sid: str
-    name: str = ""
-    type: str = "port"
-    snap_length: int = 0
-    sampling_rate: int = 0
-    disabled: bool = False
-    promiscuous: bool = False
-    to: Tuple[MirrorEnd, ...] = ()
-    received_by: Tuple[MirrorEnd, ...] = ()
-    sent_by: Tuple[MirrorEnd, ...] = ()
-    encapsulation: Encapsulation = Encapsulation()
-    encapsulates: bool = False
-    keeps_vlan: bool = False
-    no_output: bool = False
-    no_input: bool = False
-    mirrors_uplinks: bool = False
-    uplink_filter: str = "none"
-    received_from: Tuple[str, ...] = ()
-    sent_from: Tuple[str, ...] = ()
-    stack: bool = False
-
-    _form: ClassVar[Form] = _SESSION
-    _types: ClassVar[Dict[str, Callable[[Any], Any]]] = {
-        "to": _end,
-        "received_by": _end,
-        "sent_by": _end,
-        "encapsulation": Encapsulation.from_words,
-    }

@@ -1,4 +1,4 @@
-"""A program that `python3 -m` runs finds its package before the classes are loaded."""
+"""What is loaded when: not before somebody needs it, and in time for a program of `python3 -m`."""
 
 import subprocess
 import sys
@@ -30,3 +30,26 @@ def test_a_program_that_is_a_package(tmp_path: Path) -> None:
     )
     expected = "explicit {'id': 7, 'trunk': ['10-12'], 'priority': 3}\n"
     assert (done.stderr, done.stdout) == ("", expected)
+
+
+LATE = (
+    "asyncio",
+    "contextlib",
+    "ipaddress",
+    "socket",
+    "threading",
+    "libvswitch.values",
+    "libvswitch._reasons",
+    "vswitch.documents",
+    "vswitch.mirroring",
+    "vswitch.plan",
+    "vswitch.told",
+    "vswitch.watch",
+)
+
+
+def test_what_few_need_is_loaded_late() -> None:
+    loaded = f"import sys, vswitch\nprint([one for one in {LATE} if one in sys.modules])"
+    told = subprocess.run([sys.executable, "-c", loaded], stdout=subprocess.PIPE, check=True)
+    # The one that is there shows that the others are looked for.
+    assert told.stdout == b"['contextlib']\n"
