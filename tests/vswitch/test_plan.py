@@ -80,6 +80,8 @@ def portable(state: Document) -> Document:
         for port in switch["ports"]:
             port.pop("observed")
             port["addresses"] = [one for one in port["addresses"] if one["type"] == "static"]
+            for one in port["addresses"]:
+                one.pop("age")
     return state
 
 

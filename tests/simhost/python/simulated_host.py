@@ -75,7 +75,7 @@ class Host:
             encoding="utf-8",
             check=False,
         )
-        assert (done.returncode, done.stderr) == (0, "")
+        assert (done.returncode, done.stderr) == (0, ""), done.stderr
         return done.stdout
 
     def lines(self, code: str) -> List[str]:
