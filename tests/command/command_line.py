@@ -9,13 +9,16 @@ import pty
 import struct
 import subprocess
 import termios
+import time
 from pathlib import Path
-from typing import IO, Any, Dict, Iterator, List, NamedTuple, Protocol, Tuple
+from typing import IO, Any, Callable, Dict, Iterator, List, NamedTuple, Protocol, Tuple
 
 from simhost import SharedHost
 
 PROGRAM = str(Path(os.environ["BUILD_DIR"], "bin", "vswitch"))
 SIMULATED = "# simulated host\n"
+# How long a test that fails waits, in seconds.
+PATIENCE = 60
 
 LAB: Dict[str, Any] = {
     "uplinks": [{"name": "nic0"}, {"name": "nic1"}, {"name": "nic2", "link": "down"}],
@@ -73,6 +76,13 @@ class Refused(Protocol):
 def state(host: SharedHost) -> Dict[str, Any]:
     """All that is there, but for faults, which are used up."""
     return {**host.describe(), "faults": []}
+
+
+def until(what: Callable[[], bool]) -> None:
+    end = time.monotonic() + PATIENCE
+    while not what():
+        assert time.monotonic() < end, "it has not happened"
+        time.sleep(0.05)
 
 
 @contextlib.contextmanager

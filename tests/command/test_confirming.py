@@ -1,31 +1,24 @@
 """Changes that are taken back unless they are confirmed."""
 
+import contextlib
 import hashlib
 import os
 import signal
+import socket
 import stat
 import subprocess
-import time
 from pathlib import Path
-from typing import Callable, Iterator, List, Set
+from typing import Iterator, List, Set
 
 import pytest
-from command_line import PROGRAM, SIMULATED, Refused, Vswitch, state
+from command_line import PATIENCE, PROGRAM, SIMULATED, Refused, Vswitch, started, state, until
 from simhost import SharedHost
 
 DOCUMENT = '{"switches": [{"alias": "lab", "mtu": 1500, "ports": [{"id": "web-1", "vlan": 8}]}]}'
 CHANGES = "lab/mtu: 9000 -> 1500\nlab/web-1/vlan: id=7 trunk=10-12 -> 8\n"
 FOLDER = Path("/tmp", f"vswitch-{os.getuid()}")
-# Longer than any test, and how long a test that fails waits.
+# Longer than any test.
 LONG = "600"
-PATIENCE = 60
-
-
-def until(what: Callable[[], bool]) -> None:
-    end = time.monotonic() + PATIENCE
-    while not what():
-        assert time.monotonic() < end, "it has not happened"
-        time.sleep(0.05)
 
 
 def keepers(host: SharedHost) -> List[int]:
@@ -33,14 +26,14 @@ def keepers(host: SharedHost) -> List[int]:
     found = []
     mark = f"SIMHOST_STATE={host.state_file}".encode()
     for folder in Path("/proc").glob("[0-9]*"):
-        try:
+        number = int(folder.name)
+        # Any of them may end meanwhile.
+        with contextlib.suppress(OSError):
             words = (folder / "cmdline").read_bytes().split(b"\0")
             environment = (folder / "environ").read_bytes().split(b"\0")
-        except OSError:
-            continue
-        if b"--confirm-within" in words and mark in environment:
-            if os.getsid(int(folder.name)) == int(folder.name):
-                found.append(int(folder.name))
+            is_one = b"--confirm-within" in words and mark in environment
+            if is_one and os.getsid(number) == number:
+                found.append(number)
     return found
 
 
@@ -48,7 +41,9 @@ def keepers(host: SharedHost) -> List[int]:
 def no_keeper_is_left(lab: SharedHost) -> Iterator[None]:
     yield
     for one in keepers(lab):
-        os.kill(one, signal.SIGKILL)
+        with contextlib.suppress(ProcessLookupError):
+            os.kill(one, signal.SIGKILL)
+    until(lambda: not keepers(lab))
     for path in files(lab):
         path.unlink()
 
@@ -93,11 +88,12 @@ def test_taken_back(vswitch: Vswitch, lab: SharedHost) -> None:
 
 
 def test_the_shell_is_gone(lab: SharedHost, tmp_path: Path) -> None:
-    """The shell, and all that is of its session, is killed while the change waits."""
+    """The shell, and all that is of its session, is killed while the change waits: it goes on
+    waiting, and whoever comes back can confirm it."""
     before = state(lab)
     document = tmp_path / "document"
     document.write_text(DOCUMENT)
-    script = f'"{PROGRAM}" apply "{document}" --confirm-within 3 && echo waits && sleep {LONG}'
+    script = f'"{PROGRAM}" apply "{document}" --confirm-within {LONG} && echo waits && sleep {LONG}'
     with subprocess.Popen(
         ["sh", "-c", script],
         env=lab.environment,
@@ -108,10 +104,11 @@ def test_the_shell_is_gone(lab: SharedHost, tmp_path: Path) -> None:
     ) as shell:
         assert shell.stdout is not None
         assert [shell.stdout.readline() for _ in range(3)][2] == "waits\n"
-        assert state(lab) != before
-        assert keepers(lab)
         os.killpg(shell.pid, signal.SIGHUP)
         os.killpg(shell.pid, signal.SIGKILL)
+    (keeper,) = keepers(lab)
+    assert state(lab) != before
+    os.kill(keeper, signal.SIGTERM)
     until(lambda: not keepers(lab))
     assert state(lab) == before
 
@@ -160,6 +157,115 @@ def test_killed_somebody_must_look(vswitch: Vswitch, lab: SharedHost) -> None:
     after = DOCUMENT.replace("1500", "2000")
     assert vswitch("apply", "-", "--confirm-within", LONG, input=after).status == 0
     assert vswitch("confirm").status == 0
+
+
+def test_who_is_gone_has_confirmed_nothing(vswitch: Vswitch, lab: SharedHost) -> None:
+    """Nobody has heard that the change stays, so it is taken back unless somebody else confirms."""
+    assert vswitch("apply", "-", "--confirm-within", LONG, input=DOCUMENT).status == 0
+    (keeper,) = keepers(lab)
+    (path,) = (one for one in files(lab) if one.suffix == ".socket")
+    os.kill(keeper, signal.SIGSTOP)
+    with socket.socket(socket.AF_UNIX) as who:
+        who.connect(str(path))
+        who.sendall(b"confirm")
+    os.kill(keeper, signal.SIGCONT)
+    assert vswitch("confirm") == (0, "confirmed\n", SIMULATED)
+
+
+def test_confirmed_as_it_is_ended(vswitch: Vswitch, lab: SharedHost) -> None:
+    """Whichever comes first, who confirms is told what is so."""
+    before = state(lab)
+    assert vswitch("apply", "-", "--confirm-within", LONG, input=DOCUMENT).status == 0
+    (keeper,) = keepers(lab)
+    os.kill(keeper, signal.SIGSTOP)
+    with started(lab, "confirm") as (confirming, _):
+        os.kill(keeper, signal.SIGTERM)
+        os.kill(keeper, signal.SIGCONT)
+        confirming.communicate()
+    until(lambda: not keepers(lab))
+    assert (confirming.returncode, state(lab) == before) in ((0, False), (1, True))
+
+
+PATCHED = """
+import os, signal, time
+from vswitch.command import keeping, main
+from vswitch.command.meeting import Meeting
+from vswitch.plan import Plan
+
+is_confirmed, tell, apply = Meeting.is_confirmed, keeping._Keeper._tell, Plan.apply
+{patch}
+main()
+"""
+
+
+def patched(lab: SharedHost, patch: str) -> "subprocess.CompletedProcess[str]":
+    program = PATCHED.format(patch=patch)
+    words = ["apply", "-", "--confirm-within", LONG]
+    return lab.run(["/usr/bin/python3", "-c", program, *words], input=DOCUMENT)
+
+
+def test_what_is_confirmed_stays(vswitch: Vswitch, lab: SharedHost) -> None:
+    """Who ends the process right after it said so does not take the change back."""
+    patch = """
+def ended(listening):
+    found = is_confirmed(listening)
+    os.kill(os.getpid(), signal.SIGTERM)
+    return found
+
+Meeting.is_confirmed = staticmethod(ended)
+"""
+    assert patched(lab, patch).returncode == 0
+    wanted = state(lab)
+    assert vswitch("confirm").status == 0
+    until(lambda: not keepers(lab))
+    assert state(lab) == wanted
+
+
+WHILE_IT_IS_MADE = """
+def interrupted(plan):
+    changes = apply(plan)
+    os.kill(os.getppid(), signal.SIGINT)
+    time.sleep(600)
+    return changes
+
+Plan.apply = interrupted
+"""
+WHEN_IT_IS_TOLD = """
+def interrupted(keeper, what):
+    os.write(keeper._pipe, __import__("json").dumps(what).encode())
+    os.kill(os.getppid(), signal.SIGINT)
+    os.close(keeper._pipe)
+    keeper._pipe = None
+
+keeping._Keeper._tell = interrupted
+"""
+
+
+@pytest.mark.parametrize("patch", [WHILE_IT_IS_MADE, WHEN_IT_IS_TOLD], ids=["made", "told"])
+def test_interrupted_it_is_taken_back_at_once(lab: SharedHost, patch: str) -> None:
+    before = state(lab)
+    done = patched(lab, patch)
+    assert (done.returncode, done.stdout) == (130, ""), done
+    assert done.stderr == SIMULATED + "vswitch: interrupted\n"
+    assert state(lab) == before
+
+
+@pytest.mark.parametrize("kind", ["open to others", "a link"])
+def test_a_folder_that_may_be_somebody_elses(lab: SharedHost, tmp_path: Path, kind: str) -> None:
+    folder = tmp_path / "folder"
+    if kind == "a link":
+        (tmp_path / "there").mkdir(mode=0o700)
+        folder.symlink_to(tmp_path / "there")
+    else:
+        folder.mkdir()
+        folder.chmod(0o750)
+    program = (
+        "from pathlib import Path; from vswitch.command import main, meeting;"
+        f"meeting.folder = lambda: Path({str(folder)!r}); main()"
+    )
+    done = lab.run(["/usr/bin/python3", "-c", program, "confirm"])
+    said = f"vswitch: {folder} is not a folder of this user alone\n"
+    assert (done.returncode, done.stdout, done.stderr) == (1, "", SIMULATED + said)
 
 
 def test_what_cannot_be_taken_back(vswitch: Vswitch, lab: SharedHost) -> None:

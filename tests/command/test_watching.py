@@ -4,21 +4,11 @@ import contextlib
 import json
 import signal
 import threading
-import time
-from typing import Callable, Iterator, List
+from typing import Iterator, List
 
 import pytest
-from command_line import SIMULATED, Refused, Vswitch, started, state
+from command_line import SIMULATED, Refused, Vswitch, started, state, until
 from simhost import SharedHost
-
-PATIENCE = 60
-
-
-def until(what: Callable[[], bool]) -> None:
-    end = time.monotonic() + PATIENCE
-    while not what():
-        assert time.monotonic() < end, "it has not happened"
-        time.sleep(0.05)
 
 
 def sessions(host: SharedHost) -> List[str]:

@@ -14,7 +14,7 @@ import signal
 import sys
 import time
 from types import FrameType
-from typing import Any, Callable, Dict, Optional, Tuple
+from typing import Any, Callable, Dict, Iterable, Optional, Tuple
 
 from libvswitch.errors import HostError, NotRestored
 from vswitch.command.meeting import Meeting
@@ -27,33 +27,81 @@ __all__ = ["CONFIRMED", "LEFT", "TAKEN_BACK", "WAITING", "apply"]
 WAITING, CONFIRMED, TAKEN_BACK, LEFT = "waiting", "confirmed", "taken back", "left"
 
 
+_SIGNALS = (signal.SIGINT, signal.SIGTERM, signal.SIGHUP)
+
+
 class _Unconfirmed(Exception):
-    """The time is over."""
+    """The time is over, or somebody ends it before."""
+
+    def __str__(self) -> str:
+        return "it was taken back"
 
 
 def apply(host: Host, make_plan: Callable[[], Plan], seconds: float) -> Tuple[Change, ...]:
     """Makes the change of a plan, which another process takes back unless it is confirmed.
 
-    The host must not have been asked anything yet: its libraries are not made to be forked.
+    The host must not have been asked anything yet: its libraries are not made to be forked. Ctrl-C
+    while the change is being made takes it back at once; the end of a terminal does not.
     """
     meeting = Meeting(host)
     reading, writing = os.pipe()
     sys.stdout.flush()
     sys.stderr.flush()
-    if os.fork() == 0:
-        _end_with(lambda: _Keeper(host, meeting, writing).keep(make_plan, seconds), writing)
+    # Until the other process can tell what a signal means to it.
+    mask = signal.pthread_sigmask(signal.SIG_BLOCK, _SIGNALS)
+    keeper = os.fork()
+    if keeper == 0:
+        _end_with(lambda: _Keeper(host, meeting, writing).keep(make_plan, seconds), writing, mask)
     os.close(writing)
-    with open(reading, encoding="utf-8") as pipe:
-        told: Dict[str, Any] = json.loads(pipe.read() or "{}")
+    said = bytearray()
+    try:
+        signal.pthread_sigmask(signal.SIG_SETMASK, mask)
+        _hear(reading, said)
+    except KeyboardInterrupt:
+        os.kill(keeper, signal.SIGTERM)
+        _hear(reading, said)
+        _require_taken_back(meeting, _told(said))
+        raise
+    finally:
+        os.close(reading)
+    told = _told(said)
     if "changes" in told:
         return tuple(Change(**one) for one in told["changes"])
-    words = told.get("error", "nobody knows what became of the change: who made it is gone")
-    if told.get("refused"):
-        raise HostError(words)
-    raise NotRestored(words, left=())
+    if told["refused"]:
+        raise HostError(told["error"])
+    raise NotRestored(told["error"], left=())
 
 
-def _end_with(keep: Callable[[], None], writing: int) -> None:
+def _hear(pipe: int, said: bytearray) -> None:
+    """All that the other process says. An interruption comes while nothing does."""
+    piece = None
+    while piece != b"":
+        select.select([pipe], [], [])
+        mask = signal.pthread_sigmask(signal.SIG_BLOCK, _SIGNALS)
+        piece = os.read(pipe, 65536)
+        said += piece
+        signal.pthread_sigmask(signal.SIG_SETMASK, mask)
+
+
+def _told(said: bytearray) -> Dict[str, Any]:
+    """What the other process has said, which may be gone without a word."""
+    gone = "nobody knows what became of the change: who made it is gone"
+    told: Dict[str, Any] = json.loads(said) if said else {"error": gone, "refused": False}
+    return told
+
+
+def _require_taken_back(meeting: Meeting, told: Dict[str, Any]) -> None:
+    """The change may have been made by the time that it was to be taken back."""
+    if "changes" in told:
+        last = meeting.last()
+        if last is None or last["outcome"] != TAKEN_BACK:
+            words = last["words"] if last is not None else ""
+            raise NotRestored(f"interrupted, and not taken back: {words}", left=())
+    elif not told["refused"]:
+        raise NotRestored(told["error"], left=())
+
+
+def _end_with(keep: Callable[[], None], writing: int, mask: Iterable[int]) -> None:
     """The whole life of the other process, which has nothing of this one to clean up."""
     try:
         os.setsid()
@@ -67,6 +115,7 @@ def _end_with(keep: Callable[[], None], writing: int) -> None:
         signal.signal(signal.SIGHUP, signal.SIG_IGN)
         signal.signal(signal.SIGINT, signal.SIG_IGN)
         signal.signal(signal.SIGTERM, _end)
+        signal.pthread_sigmask(signal.SIG_SETMASK, mask)
         keep()
     finally:
         os._exit(0)
@@ -107,7 +156,7 @@ class _Keeper:
             raise
         except _Unconfirmed:
             self._meeting.note(TAKEN_BACK)
-            raise HostError("it was taken back") from None
+            raise
         finally:
             self._meeting.stop()
 
@@ -118,11 +167,13 @@ class _Keeper:
             if left <= 0 or not select.select([listening], [], [], left)[0]:
                 self._meeting.stop()
                 raise _Unconfirmed
+            # What is said to be confirmed is not taken back, whatever comes then.
+            signal.pthread_sigmask(signal.SIG_BLOCK, _SIGNALS)
             if self._meeting.is_confirmed(listening):
-                # It has been said to be confirmed: nothing may take it back now.
                 with contextlib.suppress(OSError):
                     self._meeting.note(CONFIRMED)
                 return
+            signal.pthread_sigmask(signal.SIG_UNBLOCK, _SIGNALS)
 
     def _tell(self, what: Dict[str, Any]) -> None:
         """Once: who began it may go on then."""

@@ -95,8 +95,8 @@ class Meeting:
         with contextlib.suppress(OSError), listening.accept()[0] as who:
             who.settimeout(_PATIENCE)
             if who.recv(len(_CONFIRM)) == _CONFIRM:
-                with contextlib.suppress(OSError):
-                    who.sendall(_DONE)
+                # Who is gone by then has not been told that it stays, so it does not.
+                who.sendall(_DONE)
                 return True
         return False
 
@@ -114,10 +114,12 @@ class Meeting:
     # Who confirms
 
     def confirm(self) -> bool:
-        """Confirms the change that waits; False if there is none, or none any more."""
-        with contextlib.suppress(FileNotFoundError, ConnectionError, socket.timeout):
+        """Confirms the change that waits; False if there is none, or none any more.
+
+        While the change is being made, it waits for that.
+        """
+        with contextlib.suppress(FileNotFoundError, ConnectionError):
             with socket.socket(socket.AF_UNIX) as who:
-                who.settimeout(_PATIENCE * 2)
                 who.connect(str(self._path("socket")))
                 who.sendall(_CONFIRM)
                 return who.recv(len(_DONE)) == _DONE
