@@ -84,5 +84,10 @@ def test_no_switches(vswitch: Vswitch) -> None:
     assert texts(drawn(vswitch)) == ["There are no switches."]
 
 
+def test_no_ports(vswitch: Vswitch) -> None:
+    assert vswitch("add", "bare").status == 0
+    assert texts(drawn(vswitch, "bare")) == ["bare", "MTU 1500", "no ports"]
+
+
 def test_no_such_switch(refused: Refused) -> None:
     assert refused("draw", "nope") == "vswitch: no switch 'nope' (there are lab, vswitch0)\n"

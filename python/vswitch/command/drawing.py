@@ -200,6 +200,8 @@ def _ports(
     far: float,
     ends: Dict[str, Tuple[float, str]],
 ) -> None:
+    if not seen.vlans:
+        drawing.text("no ports", x, y + _LINE - 4, fill=_FAINT)
     for label, ports in seen.vlans:
         y += _LINE
         drawing.text(label, x, y - 4, fill=_FAINT, font_weight="bold")
