@@ -1,6 +1,7 @@
 """What people see at a terminal: colours, a line while something takes long, narrow windows."""
 
 import re
+from pathlib import Path
 from typing import List
 
 import pytest
@@ -36,10 +37,13 @@ def test_names_are_no_markup(marked: SharedHost, words: List[str]) -> None:
     assert MARKUP in seen
 
 
-def test_a_line_tells_how_far_it_is(lab: SharedHost) -> None:
+def test_a_line_tells_how_far_it_is(lab: SharedHost, tmp_path: Path) -> None:
     mirror = ("mirror", "lab/web-1", "--to", "lab/web-2", "--for", "0")
     assert "mirroring lab/web-1: 0 s left" in on_terminal(lab, *mirror)[1]
     assert "drill of lab: nic1, 2 of 2" in on_terminal(lab, "drill", "lab")[1]
+    document = tmp_path / "document"
+    document.write_text("switches: [{alias: lab, mtu: 1500}]")
+    assert "changing the host" in on_terminal(lab, "apply", str(document), columns=200)[1]
 
 
 @pytest.mark.parametrize("columns", [1, 40])

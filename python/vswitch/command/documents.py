@@ -25,15 +25,23 @@ _DRY_RUN = typer.Option(False, "--dry-run", help="Tell what would change, and ch
 
 def plan(name: str, document: Any, whole: bool = False) -> Plan:
     """What the document of that file would change."""
+    there = host()
     try:
-        return host().plan(document, whole)
+        with output.progress(f"comparing the host with {name}"):
+            return there.plan(document, whole)
     except DocumentError as error:
         raise DocumentError(name, str(error)) from None
 
 
+def _carry_out(wanted: Plan, dry_run: bool) -> None:
+    with output.progress("looking at what would change" if dry_run else "changing the host"):
+        changes = wanted.changes if dry_run else wanted.apply()
+    tell(changes)
+
+
 def diff(file: Path = _FILE) -> None:
     """Tell what a document would change."""
-    tell(plan(str(file), files.read(str(file))).changes)
+    _carry_out(plan(str(file), files.read(str(file))), dry_run=True)
 
 
 def apply(
@@ -51,8 +59,7 @@ def apply(
     """
     document = files.read(str(file))
     if dry_run or confirm_within is None:
-        wanted = plan(str(file), document)
-        tell(wanted.changes if dry_run else wanted.apply())
+        _carry_out(plan(str(file), document), dry_run)
         return
     changes = keeping.apply(host(), lambda: plan(str(file), document), confirm_within)
     tell(changes)
@@ -86,5 +93,4 @@ def restore(file: Path = _FILE, dry_run: bool = _DRY_RUN) -> None:
 
     Links, learned addresses and counters are the host's own, and stay.
     """
-    wanted = plan(str(file), files.read(str(file)), whole=True)
-    tell(wanted.changes if dry_run else wanted.apply())
+    _carry_out(plan(str(file), files.read(str(file)), whole=True), dry_run)
