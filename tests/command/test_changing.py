@@ -1,9 +1,10 @@
 """The commands that change the host: what they take, say and leave."""
 
+import subprocess
 from typing import Any, Dict, List
 
 import pytest
-from command_line import SIMULATED, Refused, Vswitch
+from command_line import PROGRAM, SIMULATED, Refused, Vswitch
 from simhost import SharedHost
 
 
@@ -265,6 +266,21 @@ def test_a_trap_is_undone(lab: SharedHost, refused: Refused) -> None:
     lab.fault("VSDVS_SetPortSecurity", panic=("OSError", "gone"))
     told = refused("set", "lab/web-1", "vlan=9", "forbids=mac_changes")
     assert "gone" in told and told.endswith("; everything is as it was before\n")
+
+
+def test_what_is_done_and_cannot_be_told(lab: SharedHost) -> None:
+    """It is not as before, so the status does not say so."""
+    with open("/dev/full", "w") as full:
+        done = subprocess.run(
+            [PROGRAM, "set", "lab", "mtu=1500"],
+            env=lab.environment,
+            stdout=full,
+            stderr=subprocess.PIPE,
+            text=True,
+        )
+    said = "vswitch: it is done, which cannot be written: [Errno 28] No space left on device\n"
+    assert (done.returncode, done.stderr) == (3, SIMULATED + said)
+    assert switch_of(lab)["mtu"] == 1500
 
 
 def test_a_link_that_stays_down(lab: SharedHost, refused: Refused) -> None:

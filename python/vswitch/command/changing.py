@@ -21,7 +21,7 @@ from vswitch.told import Change
 from vswitch.values import Words
 from vswitch.words import ABSENT, DocumentError
 
-__all__ = ["add", "remove", "set_", "tell", "unset", "uplink"]
+__all__ = ["add", "remove", "set_", "tell", "tell_made", "unset", "uplink"]
 
 Found = Union[Switch, Port, UplinkPort]
 Members = Dict[str, Words]
@@ -40,6 +40,12 @@ def tell(changes: Iterable[Change]) -> None:
         output.line(one)
 
 
+def tell_made(changes: Iterable[Change]) -> None:
+    """What was changed."""
+    with output.after_change():
+        tell(changes)
+
+
 def _change(alias: str, members: Members) -> None:
     """Changes a switch as a document says it. What is wrong is known by a word of the user's."""
     document = {"switches": [{"alias": alias, **members}]}
@@ -55,7 +61,7 @@ def _carry_out(document: Dict[str, Any]) -> None:
         plan = host().plan(document)
     except DocumentError as error:
         raise HostError(error.expected) from None
-    tell(plan.apply())
+    tell_made(plan.apply())
 
 
 def _change_found(found: Found, members: Members) -> None:

@@ -15,10 +15,11 @@ def confirm() -> None:
     """
     meeting = Meeting(host())
     if meeting.confirm():
-        if is_json():
-            output.write_json({"confirmed": True})
-        else:
-            output.line("confirmed")
+        with output.after_change():
+            if is_json():
+                output.write_json({"confirmed": True})
+            else:
+                output.line("confirmed")
         return
     last = meeting.last() or {"outcome": keeping.CONFIRMED}
     none = "no change waits to be confirmed"

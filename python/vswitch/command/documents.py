@@ -8,7 +8,7 @@ import typer
 
 from vswitch.command import files, keeping, output
 from vswitch.command.arguments import seconds
-from vswitch.command.changing import tell
+from vswitch.command.changing import tell, tell_made
 from vswitch.command.session import host, is_json
 from vswitch.plan import Plan
 from vswitch.words import DocumentError
@@ -36,7 +36,7 @@ def plan(name: str, document: Any, whole: bool = False) -> Plan:
 def _carry_out(wanted: Plan, dry_run: bool) -> None:
     with output.progress("looking at what would change" if dry_run else "changing the host"):
         changes = wanted.changes if dry_run else wanted.apply()
-    tell(changes)
+    (tell if dry_run else tell_made)(changes)
 
 
 def diff(file: Path = _FILE) -> None:
@@ -62,7 +62,7 @@ def apply(
         _carry_out(plan(str(file), document), dry_run)
         return
     changes = keeping.apply(host(), lambda: plan(str(file), document), confirm_within)
-    tell(changes)
+    tell_made(changes)
     if changes:
         said = f"# taken back in {confirm_within:g} s, unless this confirms it: vswitch confirm"
         print(said, file=sys.stderr)

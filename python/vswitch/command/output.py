@@ -17,10 +17,12 @@ from rich.table import Table
 from rich.text import Text
 from rich.tree import Tree
 
+from libvswitch.errors import NotRestored
 from vswitch.words import printable
 
 __all__ = [
     "Branch",
+    "after_change",
     "line",
     "progress",
     "table",
@@ -89,6 +91,19 @@ def progress(what: str) -> Iterator[Callable[[str], None]]:
     console = Console(stderr=True, highlight=False)
     with console.status(Text(printable(what))) as status:
         yield lambda how_far: status.update(Text(printable(f"{what}: {how_far}")))
+
+
+@contextlib.contextmanager
+def after_change() -> Iterator[None]:
+    """For what tells of something done: where it cannot be written, it is done all the same."""
+    try:
+        yield
+        sys.stdout.flush()
+    except BrokenPipeError:
+        raise
+    except OSError as error:
+        words = f"it is done, which cannot be written: {error}"
+        raise NotRestored(words, left=()) from None
 
 
 def _render(what: RenderableType) -> None:
