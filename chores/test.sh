@@ -187,9 +187,10 @@ all_pythons() {
   for minor in 8 9 10 11 12 13; do
     for candidate in "$HOME/.pyenv/versions/3.$minor."*/bin/python \
       "$(command -v "python3.$minor")"; do
-      "$candidate" -c "import sys; sys.exit(sys.version_info[:2] != (3, $minor))" 2>/dev/null &&
-        say "$candidate"
-    done | sort -V | tail -n 1
+      version=$("$candidate" -c 'import sys; print("%d.%d.%d" % sys.version_info[:3])' 2>/dev/null) ||
+        continue
+      case $version in "3.$minor."*) say "$version $candidate" ;; esac
+    done | sort -V | tail -n 1 | cut -d ' ' -f 2-
   done
 }
 
