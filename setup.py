@@ -1,8 +1,8 @@
 """Builds the wheel: CMake builds and installs, setuptools packs.
 
-The wheel holds the module with its classes and stubs, and the simulated host, which the module
-finds after LD_LIBRARY_PATH and before the system's libraries. What it makes on the way lies in
-build/wheel/.
+The wheel holds the module with its classes, objects and stubs, the command, and the simulated host,
+which the module finds after LD_LIBRARY_PATH and before the system's libraries. What it makes on the
+way lies in build/wheel/.
 """
 
 import os
@@ -52,7 +52,7 @@ class CMakeBuild(build_ext):
         self._cmake("--build", objects, "--parallel", str(os.cpu_count() or 1))
         # What an earlier build left there would go into the wheel.
         shutil.rmtree(target, ignore_errors=True)
-        for component in ("module", "simhost"):
+        for component in ("module", "command", "simhost"):
             self._cmake(
                 "--install", objects, "--strip", "--prefix", str(target), "--component", component
             )

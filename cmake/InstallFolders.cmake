@@ -1,5 +1,6 @@
 # Where `cmake --install` puts things below its prefix: as they lie in the build folder, unless a
-# package says otherwise. Its components are module, simhost and development.
+# package says otherwise. Its components are module, command, launcher, simhost and
+# development.
 
 include(GNUInstallDirs)
 

@@ -2,7 +2,6 @@
 
 import json
 import re
-from pathlib import Path
 from typing import Any, Dict, List
 
 from roots import Root
@@ -69,10 +68,12 @@ def test_a_host_for_commands(shared_host):
 class Machine:
     """A system with an interpreter that finds the module."""
 
-    def __init__(self, root: Root, python: str, simhostctl: str) -> None:
+    def __init__(self, root: Root, python: str, programs: str) -> None:
         self.root = root
         self.python = python
-        self.simhostctl = simhostctl
+        self.programs = programs
+        self.simhostctl = f"{programs}/simhostctl"
+        self.vswitch = f"{programs}/vswitch"
 
     def program(self, text: str, **environment: str) -> str:
         return self.root.run(self.python, "-c", text, **environment)
@@ -101,7 +102,7 @@ class Machine:
         shared = "private_host.py"  # imported by the others
         programs = {one for one in installed if one.endswith(".py")} - {shared}
         assert shared in installed and {name for name, *_ in EXAMPLES} == programs
-        path = f"{Path(self.simhostctl).parent}:/usr/bin:/bin"
+        path = f"{self.programs}:/usr/bin:/bin"
         self.root.write(DOCUMENT, '{"switches": [{"alias": "vswitch0", "mtu": 9000}]}')
         for (name, *arguments), expected in EXAMPLES.items():
             said = self.root.run(self.python, f"{folder}/{name}", *arguments, PATH=path)
@@ -115,6 +116,19 @@ class Machine:
         done = self.root.try_run(self.simhostctl, "link", "nic9", "down", **state)
         why = "there is no uplink 'nic9' (QEX_NOT_FOUND)"
         assert (done.returncode, done.stderr) == (1, f"simhostctl: {why}\n")
+
+    def runs_the_command(self) -> None:
+        state = {"SIMHOST_STATE": "/tmp/command.db"}
+        assert "\nCommands:\n  list " in self.root.run(self.vswitch, "--help")
+        done = self.root.try_run(self.vswitch, "list", **state)
+        assert (done.returncode, done.stderr) == (0, "# simulated host\n")
+        assert "vswitch0  1500  3 of 128  nic4 up, nic5 up\n" in done.stdout
+        self.root.run(self.vswitch, "set", "vswitch0", "mtu=9000", **state)
+        backup = self.root.run(self.vswitch, "backup", **state)
+        assert "\n  mtu: 9000\n" in backup
+        done = self.root.try_run(self.vswitch, "show", "nope", **state)
+        why = "no switch 'nope' (there are vswitch0)"
+        assert (done.returncode, done.stderr) == (1, f"# simulated host\nvswitch: {why}\n")
 
     def runs_tests_with_the_plugin(self, **environment: str) -> None:
         self.root.write("/tmp/suite/test_plugin.py", PLUGIN_TEST)

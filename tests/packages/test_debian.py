@@ -10,38 +10,20 @@ from pathlib import Path
 from typing import Dict, Iterator, List, Set, Tuple
 
 import pytest
+from debian_packages import NAMES, field, install, satisfy
 from on_a_machine import HOST, Machine
 from roots import FOLDER, Root
 
 ROOT = Path(__file__).resolve().parents[2]
-NAMES = ("libvswitch-dev", "libvswitch-simhost", "python3-libvswitch")
 TRIPLET = str(sysconfig.get_config_var("MULTIARCH"))
 SIMHOST = f"/usr/lib/{TRIPLET}/libvswitch-simhost"
 TESTERS = "python3-pytest, mypy"
 
 
-def field(deb: Path, name: str) -> str:
-    done = subprocess.run(["dpkg-deb", "-f", deb, name], check=True, capture_output=True, text=True)
-    return done.stdout.strip()
-
-
-def foreign(dependencies: str) -> str:
-    """Without what comes from these packages themselves."""
-    parts = [part.strip() for part in dependencies.split(",")]
-    return ", ".join(part for part in parts if part.split(" ")[0] not in NAMES)
-
-
-def install(root: Root, debs: List[Path]) -> Set[str]:
-    """Installs the packages, and returns the names of all that apt adds for them."""
-    files = [root.put(deb, "/tmp/packages") for deb in debs]
-    said = root.run("apt-get", "install", "-q", "-y", "--no-install-recommends", *files)
-    return set(re.findall(r"^Setting up ([^ :]+)", said, re.MULTILINE))
-
-
 @pytest.fixture(scope="module")
 def before(root: Root, debs: Dict[str, Path]) -> Set[str]:
     """The files of the root with all that the packages ask for, and what tests them."""
-    root.satisfy(", ".join(filter(None, (foreign(field(deb, "Depends")) for deb in debs.values()))))
+    satisfy(root, list(debs.values()))
     root.satisfy(TESTERS)
     return root.files()
 
@@ -51,7 +33,7 @@ def machine(root: Root, debs: Dict[str, Path], before: Set[str]) -> Machine:
     assert before
     # Nothing else had to come: the packages say all that they need.
     assert install(root, list(debs.values())) == set(NAMES)
-    return Machine(root, "/usr/bin/python3", "/usr/bin/simhostctl")
+    return Machine(root, "/usr/bin/python3", "/usr/bin")
 
 
 def test_they_are_what_is_made(debs: Dict[str, Path]) -> None:
@@ -170,21 +152,30 @@ def test_a_real_host_comes_before_the_simulated_one(
     assert machine.doctor(LD_LIBRARY_PATH=SIMHOST)["simulated"] is True
 
 
-def words_of_the_help(machine: Machine, *above: str) -> Set[str]:
+def words_of_the_help(root: Root, program: str, *above: str) -> Set[str]:
     """Its commands, their commands, and all options."""
-    said = machine.root.run(machine.simhostctl, *above, "--help")
-    found = set(re.findall(r"^  (--[a-z-]+)", said, re.MULTILINE))
-    _, _, listed = said.partition("Subcommands:\n")
+    said = root.run(program, *above, "--help")
+    found = set(re.findall(r"^  (?:-h, ?)?(--[a-z-]+)", said, re.MULTILINE))
+    _, _, listed = said.partition("ommands:\n")
     for command in re.findall(r"^  ([a-z]+) ", listed.partition("\n\n")[0], re.MULTILINE):
         words = (*above, command)
-        found |= {" ".join(words)} | words_of_the_help(machine, *words)
-    return found
+        found |= {" ".join(words)} | words_of_the_help(root, program, *words)
+    return found - {"--help"}
 
 
-def test_the_manual_page_has_every_command_and_option(machine: Machine) -> None:
-    page = machine.root.run("zcat", "/usr/share/man/man1/simhostctl.1.gz").replace("\\-", "-")
-    words = words_of_the_help(machine)
-    assert {"show", "--state", "clock step", "--exception"} <= words
+@pytest.mark.parametrize(
+    "program, some",
+    [
+        ("simhostctl", {"show", "--state", "clock step", "--exception"}),
+        ("vswitch", {"show", "--confirm-within", "completion"}),
+    ],
+)
+def test_the_manual_page_has_every_command_and_option(
+    machine: Machine, program: str, some: Set[str]
+) -> None:
+    page = machine.root.run("zcat", f"/usr/share/man/man1/{program}.1.gz").replace("\\-", "-")
+    words = words_of_the_help(machine.root, program)
+    assert some <= words
     assert [each for each in sorted(words) if not re.search(rf"(?<![a-z-]){each}\b", page)] == []
 
 
@@ -266,7 +257,8 @@ def test_on_a_real_host_the_module_stands_alone(debs: Dict[str, Path], real_host
     root = Root("real_host")
     added = install(root, [debs["python3-libvswitch"]])
     assert "python3-libvswitch" in added and "libvswitch-simhost" not in added
-    machine = Machine(root, "/usr/bin/python3", "")
+    assert not {"libvswitch-command", "python3-click", "python3-typer"} & added
+    machine = Machine(root, "/usr/bin/python3", "/usr/bin")
 
     # Before its host is there, it says what to do.
     found = machine.doctor()
@@ -280,3 +272,7 @@ def test_on_a_real_host_the_module_stands_alone(debs: Dict[str, Path], real_host
     found = machine.doctor()
     assert (found["is_well"], found["simulated"]) == (True, False)
     assert not [file for file in root.files("/usr") if "simhost" in file]
+    assert (
+        machine.program("import vswitch; print(vswitch.Host(simulated=False).simulated)")
+        == "False\n"
+    )

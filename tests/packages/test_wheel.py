@@ -3,6 +3,7 @@
 The tests go on where the one before left the environment: it ends as it began.
 """
 
+import re
 from pathlib import Path
 from typing import Set
 
@@ -31,13 +32,18 @@ def before(root: Root) -> Set[str]:
 
 
 @pytest.fixture(scope="module")
-def machine(root: Root, before: Set[str], wheel: Path) -> Machine:
+def file(root: Root, wheel: Path) -> str:
+    """The wheel, where it lies on that machine."""
+    return root.put(wheel, "/tmp/wheel")
+
+
+@pytest.fixture(scope="module")
+def machine(root: Root, before: Set[str], file: str) -> Machine:
     assert before
     for example in EXAMPLES.glob("*.py"):
         root.put(example, "/tmp/examples")
-    file = root.put(wheel, "/tmp/wheel")
     root.run(f"{ENVIRONMENT}/bin/pip", "install", "--no-index", file)
-    return Machine(root, f"{ENVIRONMENT}/bin/python", f"{ENVIRONMENT}/bin/simhostctl")
+    return Machine(root, f"{ENVIRONMENT}/bin/python", f"{ENVIRONMENT}/bin")
 
 
 def test_it_says_which_host_it_found(machine: Machine) -> None:
@@ -74,6 +80,28 @@ def test_it_brings_its_host_and_prefers_it_to_the_systems(
     found = machine.doctor(LD_LIBRARY_PATH="/opt/host")
     assert (found["is_well"], found["simulated"]) == (True, False)
     assert found["host"] == {name: f"/opt/host/{name}" for name in HOST}
+
+
+def test_without_its_extra_the_command_says_what_to_install(machine: Machine, file: str) -> None:
+    machine.program("import vswitch; assert vswitch.Host().simulated")
+    done = machine.root.try_run(machine.vswitch, "list")
+    assert (done.returncode, done.stdout) == (1, "")
+    assert re.fullmatch(
+        r"vswitch: No module named '\w+'; pip install 'libvswitch\[command\]' .*\n", done.stderr
+    )
+    pip = [f"{ENVIRONMENT}/bin/pip", "install", "--no-index"]
+    done = machine.root.try_run(*pip, f"{file}[command]")
+    assert done.returncode != 0
+    assert re.search("No matching distribution found for (click|PyYAML|rich|typer)", done.stderr)
+
+
+def test_with_its_extra_the_command_runs(root: Root, file: str) -> None:
+    """The system's own libraries are enough for it, in an environment that is to see them."""
+    environment = "/tmp/with_extra"
+    root.satisfy("python3-click, python3-rich, python3-typer, python3-yaml")
+    root.run("python3", "-m", "venv", "--system-site-packages", environment)
+    root.run(f"{environment}/bin/pip", "install", "--no-index", f"{file}[command]")
+    Machine(root, f"{environment}/bin/python", f"{environment}/bin").runs_the_command()
 
 
 def test_nothing_is_left_after_uninstalling(machine: Machine, before: Set[str]) -> None:

@@ -16,8 +16,7 @@ def main() -> None:
     try:
         from vswitch.command import program
     except ModuleNotFoundError as error:
-        needs = "it needs typer, rich and PyYAML, which libvswitch[command] installs"
-        sys.exit(f"vswitch: {error}: {needs}")
+        sys.exit(f"vswitch: {error}; pip install 'libvswitch[command]' brings what is missing")
     except KeyboardInterrupt:
         sys.exit(INTERRUPTED)
     program.main(sys.argv[1:])
