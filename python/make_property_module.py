@@ -1,4 +1,4 @@
-"""Makes vswitch/_properties.py from the reference of the properties.
+"""Makes vswitch/_properties.py from the reference of the properties, and of what else things have.
 
 usage: make_property_module.py PROPERTIES.JSON _PROPERTIES.PY
 """
@@ -7,7 +7,7 @@ import json
 import pprint
 import sys
 
-HEAD = '''"""The settings of switches and ports, and the host's runtime options.
+HEAD = '''"""The settings of switches and ports, the host's options, and bounds of other numbers.
 
 Written by python/make_property_module.py.
 """
@@ -24,6 +24,12 @@ def main() -> None:
         for name in ("properties", "runtime_options"):
             held = pprint.pformat(tuple(reference[name]), width=100, sort_dicts=False)
             file.write(f"\n{name.upper()} = {held}\n")
+        numbers = {
+            thing: {one["name"]: (one["least"], one["greatest"]) for one in has if "least" in one}
+            for thing, has in reference["objects"].items()
+        }
+        held = pprint.pformat(numbers, width=100, sort_dicts=False)
+        file.write(f"\nNUMBERS = {held}\n")
 
 
 if __name__ == "__main__":

@@ -14,7 +14,7 @@ from typing import Any, Callable, Dict, List, Optional, Tuple
 from libvswitch.enums import LinkState, MacType
 from vswitch import _settings, _table, words as _words
 from vswitch._of_snapshot import settable
-from vswitch._properties import RUNTIME_OPTIONS
+from vswitch._properties import NUMBERS, RUNTIME_OPTIONS
 from vswitch.options import read_option
 from vswitch.uplink import link_state
 from vswitch.values import MacLearning
@@ -25,8 +25,7 @@ Document = typing.Mapping[str, Any]
 # What scenario documents tell a simulated host, and no call tells any.
 _NO_CALL = {"clock", "faults", "groups", "counters", "mirror_counters", "stats"}
 _FIXED = ("id", "portset", "max_ports", "version")
-_MOST_24 = 2**24 - 1
-_MOST_32 = 2**32 - 1
+_OF_SWITCH, _OF_MAC = NUMBERS["switches"], NUMBERS["addresses"]
 
 
 @dataclass(frozen=True)
@@ -250,8 +249,8 @@ def read_mac(given: object, path: str) -> MacWish:
         absent,
         held.need("mac", _words.mac),
         MacType[held.get("type", _words.choice, types, default="learned").upper()],
-        held.get("vlan", _words.number, 0, 4094, default=0),
-        held.get("vni", _words.number, 0, _MOST_24, default=0),
+        held.get("vlan", _words.number, *_OF_MAC["vlan"], default=0),
+        held.get("vni", _words.number, *_OF_MAC["vni"], default=0),
     )
 
 
@@ -309,8 +308,8 @@ def _switch(given: object, path: str) -> SwitchWish:
     readers: Dict[str, Tuple[Callable[..., Any], Tuple[Any, ...]]] = {
         "id": (_name, ()),
         "portset": (_name, ()),
-        "max_ports": (_words.number, (1, 65535)),
-        "version": (_words.number, (0, _MOST_32)),
+        "max_ports": (_words.number, _OF_SWITCH["max_ports"]),
+        "version": (_words.number, _OF_SWITCH["version"]),
     }
     fixed = {name: held.get(name, read, *how) for name, (read, how) in readers.items()}
     uplink_ports = held.get("uplink_ports", _each, _uplink_port, "id", default=())

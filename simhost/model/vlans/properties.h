@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "base/vlan.h"
 #include "model/properties/descriptor.h"
 #include "qexapi/protocols.h"
 #include "qexapi/switch_ports.h"
@@ -17,9 +18,9 @@
 
 namespace simhost::vlans {
 
-/// VLAN 0 is "untagged" and 4095 is reserved.
+/// Of a VLAN that has tags.
 inline constexpr qex_uint16 kLeast = 1;
-inline constexpr qex_uint16 kGreatest = 4094;
+inline constexpr qex_uint16 kGreatest = kGreatestVlan;
 /// How many numbers a VLAN field can hold; no list of VLANs is longer.
 inline constexpr int kNumbers = 4096;
 

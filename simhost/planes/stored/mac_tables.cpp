@@ -7,6 +7,7 @@
 #include <span>
 
 #include "base/outcomes.h"
+#include "base/vlan.h"
 #include "model/mac/properties.h"
 #include "model/options/host_settings.h"
 #include "model/properties/properties.h"
@@ -18,8 +19,6 @@
 namespace simhost::stored {
 namespace {
 
-constexpr std::uint16_t kGreatestVlan = 4094;
-constexpr std::uint32_t kGreatestNetwork = 0xFFFFFF;
 constexpr unsigned kMulticastBit = 1;
 
 std::span<std::byte const> mac_of(VSMACEntry const &entry) {
@@ -36,7 +35,7 @@ void check_source(VSMACEntry const &entry) {
   if (entry.vid > kGreatestVlan) {
     throw Refused(QEX_BAD_VLANID);
   }
-  if (entry.vni > kGreatestNetwork) {
+  if (entry.vni > QEX_VIRTUAL_NETWORK_ID_MAX) {
     throw Refused(QEX_BAD_PARAM);
   }
 }

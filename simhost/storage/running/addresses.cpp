@@ -3,6 +3,8 @@
 
 #include <algorithm>
 
+#include "base/vlan.h"
+#include "qexapi/protocols.h"
 #include "storage/query.h"
 
 namespace simhost::storage {
@@ -15,9 +17,6 @@ static_assert(VS_MAC_ADDR_TYPE_LEARNED == 2, "the tables count what is of this t
 
 // What the table of counts has instead of a port for all places of a switch.
 constexpr std::int64_t kEverywhere = -1;
-
-constexpr std::int64_t kGreatestVlan = 4094;
-constexpr std::int64_t kGreatestNetwork = 0xFFFFFF;
 
 // 0 stands for the team in the index as well: no port has that number.
 PortNumber port_or_none(Place const &place) {
@@ -33,12 +32,13 @@ VSMACAddrType type_at(Query const &row, int column) {
 }
 
 Address address_at(Query const &row) {
-  Address address{.name = {.mac = {},
-                           .vid = static_cast<std::uint16_t>(row.integer(1, 0, kGreatestVlan)),
-                           .vni = static_cast<std::uint32_t>(row.integer(2, 0, kGreatestNetwork))},
-                  .type = type_at(row, 3),
-                  .ages = row.flag(4),
-                  .seen = row.time(5)};
+  Address address{
+      .name = {.mac = {},
+               .vid = static_cast<std::uint16_t>(row.integer(1, 0, kGreatestVlan)),
+               .vni = static_cast<std::uint32_t>(row.integer(2, 0, QEX_VIRTUAL_NETWORK_ID_MAX))},
+      .type = type_at(row, 3),
+      .ages = row.flag(4),
+      .seen = row.time(5)};
   std::ranges::copy(row.bytes(0, address.name.mac.size()), address.name.mac.begin());
   return address;
 }
