@@ -9,6 +9,16 @@
 //   %table(RECORD, count)         a record that is a sequence, and how many elements it has: a field
 //                                 or a number
 //   %counted(RECORD::field, count)  an array without a size, and the field that counts its elements
+//   %followed(RECORD, element, count)  in its block, after all of its fields: so many records, as a
+//                                 field counts them
+//   %packed(RECORD, element, field, length)  likewise, up to as many bytes of the whole block as the
+//                                 field says, each as long as its own field `length` says
+//   %rest(RECORD::field, length)  an array that goes on to the end of its record, which is as long as
+//                                 that field says
+//   %view(RECORD::field, tag, constant)  of a union: the view that holds if the field `tag` is the
+//                                 constant; FORM stands for the argument that names the form
+//   %holds_text(RECORD::field)    an array of bytes that holds a text and its NUL
+//   %same_bytes(RECORD::field)    another way to look at the first field of its union
 //   %returns(METHOD, type)        what a method returns, where the definitions only say an object
 //   %null(METHOD, when)           that it returns null never, or only on a failure
 
@@ -36,6 +46,30 @@
 
 %define %counted(FIELD, COUNT)
 %feature("count", "COUNT") FIELD;
+%enddef
+
+%define %followed(RECORD, ELEMENT, COUNT)
+%feature("followed", "ELEMENT COUNT") RECORD;
+%enddef
+
+%define %packed(RECORD, ELEMENT, SIZE, LENGTH)
+%feature("packed", "ELEMENT SIZE LENGTH") RECORD;
+%enddef
+
+%define %rest(FIELD, LENGTH)
+%feature("rest", "LENGTH") FIELD;
+%enddef
+
+%define %view(FIELD, TAG, CONSTANT)
+%feature("view", "TAG CONSTANT") FIELD;
+%enddef
+
+%define %holds_text(FIELD)
+%feature("holds_text", "1") FIELD;
+%enddef
+
+%define %same_bytes(FIELD)
+%feature("same_bytes", "1") FIELD;
 %enddef
 
 %define %returns(METHOD, TYPE...)
@@ -93,6 +127,31 @@
 %counted(VSPortList::ports, numPorts)
 %counted(VSPortVlanPolicy::vidRanges, numRanges)
 %counted(qex_NEBPortVlanInfo::vidRanges, numRanges)
+
+%followed(VSLAGTable, VSLAGStatus, numLAGs)
+%followed(DVMirrorSessionTable, DVMirrorEntity, numEntities)
+%packed(VSRuntimeOptions, VSRuntimeOptionHeader, totalLength, length)
+%rest(VSRuntimeOptionHeader::data, length)
+
+%view(VSMcastFilters::macEntries, FORM, VS_MCAST_FILTER_MODE_LEGACY)
+%view(VSMcastFilters::ipv4Entries, FORM, VS_MCAST_FILTER_MODE_IGMP)
+%view(VSMcastFilters::ipv6Entries, FORM, VS_MCAST_FILTER_MODE_MLD)
+%view(VSMcastFilterStats::ipv4Entries, FORM, VS_MCAST_FILTER_MODE_IGMP)
+%view(VSMcastFilterStats::ipv6Entries, FORM, VS_MCAST_FILTER_MODE_MLD)
+%view(DVMirrorEntity::dvPortId, type, MIRROR_ENTTYPE_DVPORT)
+%view(DVMirrorEntity::uplink, type, MIRROR_ENTTYPE_UPLINK)
+%view(DVMirrorEntity::vlan, type, MIRROR_ENTTYPE_VLAN)
+%view(DVMirrorEntity::ip, type, MIRROR_ENTTYPE_IP)
+%view(DVMirrorEntity::portId, type, MIRROR_ENTTYPE_PORT)
+%view(DVMirrorIP::ipv4, isIPv6, QEX_FALSE)
+%view(DVMirrorIP::ipv6, isIPv6, QEX_TRUE)
+
+%holds_text(VSInfo::dvsName)
+%holds_text(VSInfo::nebID)
+%holds_text(VSLAGStatus::name)
+
+%same_bytes(qex_SocketIPv6AddressAddr___u6_addr::__u6_addr16)
+%same_bytes(qex_SocketIPv6AddressAddr___u6_addr::__u6_addr32)
 
 %returns(VSMcastFilters::get_mac_entry, str)
 %returns(VSMcastFilters::get_ip_entry, str)

@@ -110,6 +110,10 @@ class Field:
     doc: str
     count: str  # the field that says how many elements an array without a size has
     is_bit_field: bool = False
+    rest: str = ""  # of an array that goes on to the end of its record: the field with its bytes
+    holds_text: bool = False  # of an array of bytes
+    is_same_bytes: bool = False  # as the first field of its union
+    view: Tuple[str, ...] = ()  # of a union: the field that tells, and the constant it then is
 
 
 @dataclass
@@ -123,6 +127,10 @@ class Record:
     methods: List[Function] = field(default_factory=list)
     base: str = ""  # of its class, written by hand
     constructor: Tuple[Parameter, ...] = ()
+    followed: Tuple[str, ...] = ()  # by records of a name, and the field that counts them
+    packed: Tuple[
+        str, ...
+    ] = ()  # with such, the field with the bytes of all, theirs with their own
 
 
 @dataclass(frozen=True)
@@ -225,6 +233,8 @@ def _record(node: ET.Element, seen: _Attributes, header: str) -> Record:
         header=header,
         count=seen.get("feature_count", ""),
         base=seen.get("feature_base", ""),
+        followed=_words(seen, "followed"),
+        packed=_words(seen, "packed"),
     )
     _collect_members(node, record)
     return record
@@ -248,8 +258,16 @@ def _collect_members(node: ET.Element, record: Record) -> None:
                     doc=_text(seen),
                     count=seen.get("feature_count", ""),
                     is_bit_field="bitfield" in seen,
+                    rest=seen.get("feature_rest", ""),
+                    holds_text=seen.get("feature_holds_text") == "1",
+                    is_same_bytes=seen.get("feature_same_bytes") == "1",
+                    view=_words(seen, "view"),
                 )
             )
+
+
+def _words(seen: _Attributes, feature: str) -> Tuple[str, ...]:
+    return tuple(seen.get(f"feature_{feature}", "").split())
 
 
 def _function(node: ET.Element, seen: _Attributes) -> Function:
