@@ -1,0 +1,66 @@
+// How a call is forwarded to the host's library and recorded on the way.
+#pragma once
+
+#include <setjmp.h>
+
+#include <cstdint>
+#include <type_traits>
+
+#include "recorder/api.h"
+#include "recorder/frames.h"
+#include "recorder/shapes.h"
+#include "recorder/stand_ins.h"
+#include "vswitch/call_trap.h"
+
+#pragma weak exception_buffer
+
+namespace recorder {
+
+#include "numbers.inc"
+
+/// The host's functions, in the order of `calls`. Each library that forwards fills in its own.
+RECORDER_API extern void *host_functions[];
+
+/// The host's function; a process that calls one that its library lacks ends, as without the
+/// recorder.
+RECORDER_API void *host_function(std::size_t number) noexcept;
+
+template <typename T>
+std::uint64_t word_of(T value) noexcept {
+  if constexpr (std::is_pointer_v<T>) {
+    return reinterpret_cast<std::uint64_t>(value);
+  } else {
+    return static_cast<std::uint64_t>(static_cast<std::int64_t>(value));
+  }
+}
+
+/// Calls the host's function. A trap jumps over this frame, so nothing in it has a destructor.
+template <std::size_t number, typename Returned, typename... Parameters>
+Returned forward(Returned (* /*declared*/)(Parameters...),
+                 std::type_identity_t<Parameters>... given) {
+  static_assert(sizeof...(Parameters) <= most_arguments);
+  auto *const host = reinterpret_cast<Returned (*)(Parameters...)>(host_function(number));
+  Frame frame;
+  [[maybe_unused]] auto *word = static_cast<std::uint64_t *>(frame.words);
+  ((*word++ = word_of(given)), ...);
+  if (!begin(frame, calls[number])) {
+    return host(given...);
+  }
+  if (frame.is_armed) {
+    int const value = setjmp(exception_buffer);
+    if (value != 0) {
+      pass_trap_on(frame, value);
+    }
+    note_trap(frame);
+  }
+  if constexpr (std::is_void_v<Returned>) {
+    host(stand_in(frame, given)...);
+    end(frame, 0);
+  } else {
+    Returned const result = host(stand_in(frame, given)...);
+    end(frame, word_of(result));
+    return result;
+  }
+}
+
+}  // namespace recorder

@@ -1,0 +1,22 @@
+// The host's functions, which the libraries that forward have found.
+
+#include <unistd.h>
+
+#include <cstdio>
+
+#include "recorder/forward.h"
+
+namespace recorder {
+
+void *host_function(std::size_t number) noexcept {
+  if (host_functions[number] == nullptr) {
+    std::fprintf(stderr, "vswitch record: the host's %.*s lacks %.*s\n",
+                 static_cast<int>(calls[number].library.size()), calls[number].library.data(),
+                 static_cast<int>(calls[number].name.size()), calls[number].name.data());
+    // What the loader ends a process with that calls such a function.
+    _exit(127);
+  }
+  return host_functions[number];
+}
+
+}  // namespace recorder

@@ -1,0 +1,13 @@
+// libnebPublic.so of the recorder: every call of the host's, forwarded.
+
+#include <dlfcn.h>
+
+#include "nebpublic/data.h"
+#include "nebpublic/kernel_state.h"
+#include "nebpublic/names.h"
+#include "nebpublic/state.h"
+#include "recorder/forward.h"
+
+extern "C" {
+#include "nebPublic_calls.inc"
+}
