@@ -17,7 +17,7 @@
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
 # Without them clang-tidy passes over the tests' own C++ and that of simhostctl, and over clang's
-# analyzer for the simulated host, which take long; ./dev lint does not.
+# analyzer for the simulated host and the recorder, which take long; ./dev lint does not.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
@@ -80,7 +80,7 @@ cmd_test() {
   # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
   # parses the command line with a library of templates. The module and its helpers are analyzed,
   # too.
-  untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='./simhost/*'
+  untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='^\./\(simhost\|recorder\)/'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
@@ -101,12 +101,13 @@ cmd_test() {
   # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are
   # the same whatever the module is built for.
   if [ "$folder" != build ]; then
-    not_for_this_build "lint, no fast paths, command, docs, fuzzers, bench"
+    not_for_this_build "lint, no fast paths, contract recorded, command, docs, fuzzers, bench"
   else
     test_no_fast_paths "$@"
     pytest "Command tests" command.xml '' tests/command "$@"
     pytest "Docs tests" docs.xml '' tests/docs "$@"
     [ -n "$expression" ] || {
+      test_recorded
       test_fuzzers "$@"
       test_peers "$@"
     }
@@ -148,6 +149,16 @@ test_no_fast_paths() {
   pytest "No fast paths" no-fast-paths.xml '' tests/module \
     --ignore=tests/module/test_host_libraries.py "$@"
   PYTHONPATH=$with_fast_paths
+}
+
+# A tool cannot tell that it is recorded: every call as it reaches the host, returns and traps.
+test_recorded() {
+  junit "Contract recorded" recorded.xml env "LD_LIBRARY_PATH=$root/$folder/tests/recording_host" \
+    "$folder/bin/vswitch" record -o "$folder/recorded.jsonl" -- \
+    "$python" -m pytest -q -n 0 --junitxml "$folder/recorded.xml" \
+    tests/contract/test_arguments.py::test_an_argument_passes_unchanged \
+    tests/contract/test_particular_calls.py tests/contract/test_results.py \
+    tests/contract/test_traps_of_calls.py
 }
 
 test_fuzzers() {

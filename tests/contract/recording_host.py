@@ -13,7 +13,7 @@ import ctypes
 import json
 import struct
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, NamedTuple, Optional, Tuple, Type, Union
+from typing import Any, Dict, Iterator, List, Mapping, NamedTuple, Optional, Tuple, Type, Union
 
 Value = Union[int, bytes, None]
 """An integer, the bytes of a text without its NUL, an address, or a null pointer."""
@@ -58,11 +58,22 @@ class WrongHost(Exception):
     """The module runs on another host, so that nothing here would prove anything."""
 
 
-def loaded_files(*names: str) -> List[Path]:
-    """Return the files with one of these names that this process has loaded."""
+_FORWARDING = "libcallrecorder.so"
+
+
+def _loaded() -> Iterator[Path]:
     with open("/proc/self/maps", encoding="utf-8") as maps:
-        paths = {Path(line.rstrip("\n").split(maxsplit=5)[5]) for line in maps if "/" in line}
-    return sorted(path for path in paths if path.name in names)
+        yield from {Path(line.rstrip("\n").split(maxsplit=5)[5]) for line in maps if "/" in line}
+
+
+def loaded_files(*names: str) -> List[Path]:
+    """Return the files with one of these names that this process has loaded.
+
+    Libraries that forward to them, when a recording of this process is made, are not among them.
+    """
+    paths = list(_loaded())
+    forwarding = {path.parent for path in paths if path.name == _FORWARDING}
+    return sorted(path for path in paths if path.name in names and path.parent not in forwarding)
 
 
 class RecordingHost:
@@ -86,6 +97,17 @@ class RecordingHost:
             for name, types in json.loads(self._recorder.recorder_functions()).items()
         }
         self._alive: List[object] = []
+        self._given_for = next(
+            (
+                ctypes.CDLL(str(one)).recorder_given_for
+                for one in _loaded()
+                if one.name == _FORWARDING
+            ),
+            None,
+        )
+        if self._given_for is not None:
+            self._given_for.argtypes = [ctypes.c_void_p]
+            self._given_for.restype = ctypes.c_void_p
 
     def reset(self) -> None:
         """Forget all calls and what they return, and lower the trap's status."""
@@ -100,7 +122,8 @@ class RecordingHost:
     def calls(self) -> List[Call]:
         """Return the calls since the last reset, in order."""
         return [
-            Call(call["function"], tuple(map(_value, call["arguments"]))) for call in self._calls()
+            Call(call["function"], tuple(map(self._value, call["arguments"])))
+            for call in self._calls()
         ]
 
     def details(self) -> List[Details]:
@@ -174,6 +197,13 @@ class RecordingHost:
     def exception_status(self, value: int) -> None:
         self._recorder.recorder_set_exception_status(value)
 
+    def _value(self, argument: Dict[str, Any]) -> Value:
+        value: Union[int, str, None] = argument["value"]
+        if isinstance(value, int) and "(*)" in argument["type"] and self._given_for is not None:
+            # A recording puts a function of its own before the one that was given.
+            return int(self._given_for(value))
+        return bytes.fromhex(value) if isinstance(value, str) else value
+
     def _calls(self) -> List[Dict[str, Any]]:
         calls: List[Dict[str, Any]] = json.loads(self._recorder.recorder_calls())
         return calls
@@ -203,8 +233,3 @@ def _packed(pointer: str, value: int) -> bytes:
 
 def _bytes(text: Optional[str]) -> Optional[bytes]:
     return None if text is None else bytes.fromhex(text)
-
-
-def _value(argument: Dict[str, Any]) -> Value:
-    value: Union[int, str, None] = argument["value"]
-    return bytes.fromhex(value) if isinstance(value, str) else value
