@@ -226,7 +226,7 @@ def test_help(vswitch: Vswitch) -> None:
         name = line.split()[0]
         told = vswitch(name, "--help")
         assert told.status == 0 and told.lines[0].startswith(f"Usage: vswitch {name} ")
-        assert ("--json" in told.stdout) is (name not in ("draw", "completion"))
+        assert ("--json" in told.stdout) is (name not in ("draw", "record", "completion"))
         assert "--real" in told.stdout
 
 

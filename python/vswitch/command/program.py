@@ -11,7 +11,16 @@ import typer
 import typer.main
 
 from libvswitch.errors import HostError
-from vswitch.command import changing, completing, confirming, documents, drawing, reading, watching
+from vswitch.command import (
+    changing,
+    completing,
+    confirming,
+    documents,
+    drawing,
+    reading,
+    recording,
+    watching,
+)
 from vswitch.command.session import Command, Group, TextCommand
 from vswitch.exits import CHANGED, REFUSED, exits
 from vswitch.words import DocumentError, printable
@@ -45,9 +54,10 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "mirror": watching.mirror,
     "drill": watching.drill,
     "draw": drawing.draw,
+    "record": recording.record,
     "completion": completing.completion,
 }
-_TEXTS = ("draw", "completion")
+_TEXTS = ("draw", "record", "completion")
 
 STATUSES = {
     0: "all is done",
