@@ -8,8 +8,8 @@
 #   --quick   a short run, to see that all works: its figures are rough, and it leaves out what is
 #             measured of whole modules
 #
-# Prints tables of ratios, of checked calls to checks by hand and of objects to flat calls too, and
-# what the simulated host does in a second; leaves results.json, calls.svg, host.json and
+# Prints tables of ratios, of checked calls to checks by hand and of objects to flat calls too, what
+# the recorder adds to a call, and what the simulated host does in a second; leaves results.json, calls.svg, host.json and
 # host_curve.svg in build/bench/. bench/README.md says how it measures and how to read it. On a
 # machine with other work to do it takes longer, and ratios stay ratios.
 cmd_bench() {
@@ -24,7 +24,7 @@ cmd_bench() {
   # shellcheck disable=SC2086 # lists of words
   need $build_packages $bench_packages
   asked_python='' benching=yes
-  build_peers ${full:+"$full"}
+  build_peers objects recorder_vswitch recorder_nebPublic ${full:+"$full"}
   # A target that is missed ends nothing: what remains is measured, and the chore fails at its end.
   missed=''
   step "Measuring the module and its peers"
@@ -33,6 +33,9 @@ cmd_bench() {
   PYTHONPATH=$root/$folder/python "$python" bench/checked.py ${quick:+"$quick"} || missed=1
   step "Measuring the objects"
   PYTHONPATH=$root/$folder/python "$python" bench/objects.py ${quick:+"$quick"} || missed=1
+  step "Measuring the recorder"
+  LD_LIBRARY_PATH=$root/$folder/bench/null_host PYTHONPATH=$root/$folder/python \
+    "$python" bench/recorder.py ${quick:+"$quick"} || missed=1
   step "Measuring the simulated host"
   "$python" bench/host_curve.py ${quick:+"$quick"} "$folder" || missed=1
   [ -z "$missed" ] || {
