@@ -65,6 +65,8 @@ def recorded(
 
     They go on to the host's libraries as this process has them, or to those that are given.
     """
+    if not (_FOLDER / _RUNTIME).exists():
+        raise HostError(f"the recorder is not installed: {_FOLDER} lacks its libraries")
     libraries = libraries or host_libraries()
     with tempfile.TemporaryDirectory(prefix="vswitch-record-") as made:
         _stand_before(libraries, Path(made))

@@ -9,6 +9,7 @@ import functions
 import pytest
 from libvswitch.errors import HostError
 from recordings import SIMULATED
+from vswitch import recording
 from vswitch.recording import recorded
 
 FOLDER = Path(os.environ["BUILD_DIR"], "recorder")
@@ -45,6 +46,16 @@ def test_a_recording_is_not_recorded(tmp_path: Path) -> None:
             with recorded(tmp_path / "two", ["x"], {name: inner / name for name in LIBRARIES}):
                 pass
     assert not inner.exists()
+
+
+def test_a_recorder_that_is_not_there_is_missed(
+    tmp_path: Path, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    monkeypatch.setattr(recording, "_FOLDER", tmp_path)
+    with pytest.raises(HostError, match=f"not installed: {tmp_path} lacks its libraries"):
+        with recorded(tmp_path / "one", ["x"]):
+            pass
+    assert not (tmp_path / "one").exists()
 
 
 def test_a_trace_is_its_users_alone(tmp_path: Path) -> None:
