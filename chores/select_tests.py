@@ -52,7 +52,7 @@ PYTHON_TESTS: Dict[str, List[str]] = {
     "python/vswitch/trace.py": ["tests/recorder"],
     "recorder": ["tests/recorder"],
     "setup.py": ["tests/chores"],
-    "simhost": ["tests/simhost", "tests/examples", "tests/docs/test_statuses.py"],
+    "simhost": ["tests/simhost", "tests/docs/test_statuses.py"],
     "simhost/python": ["tests/simhost", "tests/examples", "tests/plugin"],
     "tests": [],
     "tests/README.md": ["tests/docs/test_documents.py"],
