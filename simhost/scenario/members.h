@@ -85,7 +85,7 @@ inline constexpr std::array kSwitchMembers{
                  "its identifier, chosen by the host unless given"),
     form::sparse("portset", text_member<&storage::Switch::portset>(),
                  "the name of its ports, chosen by the host unless given"),
-    form::member("max_ports", form::number<&storage::Switch::max_ports>(1, kGreatestMaxPorts),
+    form::member("max_ports", form::number<&storage::Switch::max_ports>(1, storage::kGreatestMaxPorts),
                  "how many ports it may have, uplink ports not counted"),
     form::member("persistent", form::boolean<&storage::Switch::persistent>(),
                  "whether it outlasts a restart"),

@@ -30,7 +30,7 @@ FoundSwitch switch_at(Query const &row) {
           .row = {.alias = row.name(1),
                   .identifier = row.name(2),
                   .portset = row.name(3),
-                  .max_ports = row.number<std::uint32_t>(4),
+                  .max_ports = static_cast<std::uint32_t>(row.integer(4, 1, kGreatestMaxPorts)),
                   .version = row.number<std::uint32_t>(5),
                   .persistent = row.flag(6),
                   .associated = row.flag(7)}};

@@ -17,6 +17,9 @@ enum class SwitchKey : std::int64_t {};
 /// The three kinds of name that a switch has.
 enum class SwitchName { alias, identifier, portset };
 
+/// Ports of a switch, of which it has one at least.
+inline constexpr std::uint32_t kGreatestMaxPorts = 65535;
+
 struct Switch {
   std::string alias;
   std::string identifier;

@@ -69,7 +69,7 @@ storage::Switch row_of(storage::Transaction &transaction, SwitchSpec const &spec
   check_name(spec.identifier, kLongestSwitchIdentifier);
   check_name(spec.portset, kLongestPortset);
   auto const max_ports = or_default(spec.max_ports, kDefaultMaxPorts);
-  if (max_ports > kGreatestMaxPorts) {
+  if (max_ports > storage::kGreatestMaxPorts) {
     throw Refused(QEX_BAD_PARAM);
   }
   return {.alias = std::string(spec.alias),
@@ -133,7 +133,7 @@ void change_version(storage::ChangingTransaction &transaction, storage::SwitchKe
 
 void change_max_ports(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                       std::uint32_t max_ports) {
-  if (max_ports == 0 || max_ports > kGreatestMaxPorts) {
+  if (max_ports == 0 || max_ports > storage::kGreatestMaxPorts) {
     throw Refused(QEX_BAD_PARAM);
   }
   if (max_ports < storage::count_ports(transaction, key, storage::PortKind::client)) {

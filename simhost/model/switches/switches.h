@@ -18,7 +18,6 @@ namespace simhost {
 
 /// Ports of a switch, uplink ports not counted.
 inline constexpr std::uint32_t kDefaultMaxPorts = 128;
-inline constexpr std::uint32_t kGreatestMaxPorts = 65535;
 inline constexpr std::uint32_t kDefaultVersion = VS_YKT_NEB_VERSION_20;
 
 /// Bytes of names, without the NUL that the fixed texts of the callers' records have room for.
