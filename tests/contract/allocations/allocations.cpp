@@ -12,13 +12,22 @@
 
 namespace {
 
+constexpr std::size_t kLargest = 1 << 14;
+// For one size the C library hands out 8 bytes more or, where it would leave too little of a free
+// block, 24: both belong to one step.
+constexpr std::size_t kStep = 32;
+
 // Zero before anything runs, as the first allocations of a process come early.
-constinit std::array<std::atomic<long>, 1 << 14> live_blocks{};
+constinit std::array<std::atomic<long>, kLargest / kStep + 1> live_blocks{};
+
+std::atomic<long> &blocks_like(std::size_t usable) {
+  return live_blocks[(usable + kStep - 8) / kStep];
+}
 
 void count(void *block, long change) {
   std::size_t const size = block == nullptr ? 0 : malloc_usable_size(block);
-  if (size != 0 && size < live_blocks.size()) {
-    live_blocks[size].fetch_add(change, std::memory_order_relaxed);
+  if (size != 0 && size < kLargest) {
+    blocks_like(size).fetch_add(change, std::memory_order_relaxed);
   }
 }
 
@@ -26,12 +35,12 @@ void count(void *block, long change) {
 
 extern "C" {
 
-/** The number of live blocks of the size that a block of `size` bytes really has. */
+/** The number of live blocks such as one for `size` bytes, a multiple of 32. */
 [[gnu::visibility("default")]] long allocations_like(std::size_t size) {
   void *const block = std::malloc(size);
   std::size_t const usable = malloc_usable_size(block);
   std::free(block);
-  return usable < live_blocks.size() ? live_blocks[usable].load(std::memory_order_relaxed) : -1;
+  return usable < kLargest ? blocks_like(usable).load(std::memory_order_relaxed) : -1;
 }
 
 #ifdef __SANITIZE_ADDRESS__
