@@ -153,8 +153,15 @@ def unwanted(one: Rule, line: str) -> Iterator[str]:
 def findings(root: Path, left_out: List[str]) -> Iterator[Finding]:
     for path in texts(root, left_out):
         place = str(path.relative_to(root))
-        rules = [one for one in RULES if place.startswith(one.only_below)]
-        for number, line in enumerate(path.read_text(encoding="utf-8").splitlines(), start=1):
+        text = path.read_text(encoding="utf-8")
+        texts_of_it = (text, spoken(text))
+        # Most rules meet no word of a file; a search of the whole of it says so at once.
+        rules = [
+            one
+            for one in RULES
+            if place.startswith(one.only_below) and any(map(one.unwanted.search, texts_of_it))
+        ]
+        for number, line in enumerate(text.splitlines() if rules else (), start=1):
             for one in rules:
                 # Some rules are of identifiers as they are written.
                 found = [*unwanted(one, line)] or [*unwanted(one, spoken(line))]

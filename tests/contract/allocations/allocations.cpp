@@ -13,7 +13,7 @@
 namespace {
 
 constexpr std::size_t kLargest = 1 << 14;
-// For one size the C library hands out 8 bytes more or, where it would leave too little of a free
+// For one size the C library allocates 8 bytes more or, where it would leave too little of a free
 // block, 24: both belong to one step.
 constexpr std::size_t kStep = 32;
 
