@@ -1,4 +1,4 @@
-"""What plans take from a snapshot: what calls can set.
+"""What all know of snapshots: which documents are some, and what plans take from them.
 
 A snapshot is a document with its version under `observed`.
 """
@@ -7,9 +7,20 @@ from typing import Any, Callable, Container, Dict
 
 from vswitch.words import DocumentError
 
-__all__ = ["VERSION", "settable"]
+__all__ = ["NOT_TOLD", "VERSION", "settable"]
 
 VERSION = 1
+
+NOT_TOLD = {
+    "clock": "what the clock of the host shows",
+    "persistent": "whether a switch outlasts a restart: each does in a clone",
+    "external_id": "what another system calls a port",
+    "uplinks": "those at no switch that runs; speed, duplex, damaged frames, driver of the others",
+    "link": "why a link is down: in a clone its cable is out",
+    "number": "a document gives no port its number, by which teaming chooses an uplink",
+    "client": "whether the client's side of a port is up while it has no client",
+}
+"""What no call tells and no document says, by the keys of documents where they have one."""
 
 # What goes on at a host is its own: no call sets it, or it would be another host for it.
 _OF_UPLINK = ("link", "lacp")

@@ -202,10 +202,10 @@ def _settings_of(held: _Object, known: Dict[str, _table.Property]) -> Dict[str, 
 def _properties(given: object, path: str) -> Tuple[PropertyWish, ...]:
     if not isinstance(given, dict):
         raise _words.fail(path, given, "an object")
-    return tuple(_property(key, one, under(path, str(key))) for key, one in given.items())
+    return tuple(read_property(key, one, under(path, str(key))) for key, one in given.items())
 
 
-def _property(key: str, given: object, path: str) -> PropertyWish:
+def read_property(key: str, given: object, path: str) -> PropertyWish:
     if given == ABSENT:
         return PropertyWish(path, True, _name(key, path))
     held = _Object(given, path, ("type", "hex", "text"))

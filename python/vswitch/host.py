@@ -102,15 +102,17 @@ class Host:
         """The host as a document: ready for JSON, in the words of scenario documents."""
         return _describing.host_state(self)
 
-    def snapshot(self) -> Dict[str, Words]:
+    def snapshot(self, anonymize: bool = False, key: Optional[bytes] = None) -> Dict[str, Words]:
         """The host as a scenario document from which a simulated host starts as its clone.
 
         What a call refuses, what no document says and what no call tells is listed under
-        `observed`.
+        `observed`. With `anonymize` names and addresses are others, each the same wherever it
+        stands; with a key they become the same in all snapshots that are made with it.
         """
-        from vswitch import snapshot
+        from vswitch import anonymizing, snapshot
 
-        return snapshot.snapshot(self)
+        said = snapshot.snapshot(self)
+        return anonymizing.anonymized(said, key) if anonymize else said
 
     # Its own settings
 

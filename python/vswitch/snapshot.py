@@ -18,7 +18,7 @@ from libvswitch.enums import LinkState
 from libvswitch.errors import HostError, Trapped
 from vswitch import _describing, _property_bytes, _settings, _table, _telling, documents
 from vswitch._describing import Description, Properties, Said
-from vswitch._of_snapshot import VERSION
+from vswitch._of_snapshot import NOT_TOLD, VERSION
 from vswitch._thing import Item, Thing
 from vswitch.port import Port
 from vswitch.switch import HostPart, Switch
@@ -34,18 +34,6 @@ __all__ = ["backup", "snapshot"]
 
 T = TypeVar("T")
 Described = TypeVar("Described", bound=Thing)
-
-NOT_TOLD = {
-    "clock": "what the clock of the host shows",
-    "persistent": "whether a switch outlasts a restart: each does in a clone",
-    "external_id": "what another system calls a port",
-    "uplinks": "those at no switch that runs; speed, duplex, damaged frames, driver of the others",
-    "link": "why a link is down: in a clone its cable is out",
-    "number": "a document gives no port its number, by which teaming chooses an uplink",
-    "client": "whether the client's side of a port is up while it has no client",
-}
-"""What no call tells and no document says, by the keys of documents where they have one."""
-
 
 # Of a switch that a document gives none.
 _MAX_PORTS = 128

@@ -105,3 +105,16 @@ def test_hosts_that_cannot_start_from_a_snapshot(
     # Nothing of them is left.
     file.write_text(text)
     assert in_clone(lab, file, "show", program=SIMHOSTCTL).returncode == 0
+
+
+def test_other_names(vswitch: Vswitch, refused: Refused, lab: SharedHost, tmp_path: Path) -> None:
+    key = tmp_path / "key"
+    key.write_bytes(b"a key")
+    file = tmp_path / "host.json"
+    file.write_text(vswitch("snapshot", "--anonymize", "--key-file", str(key)).stdout)
+    text = file.read_text()
+    assert '"lab"' not in text and "web-1" not in text and "02:00:00:00:00:01" not in text
+    assert in_clone(lab, file, "show", program=SIMHOSTCTL).returncode == 0
+    assert "--key-file: it is for --anonymize" in refused(
+        "snapshot", "--key-file", str(key), status=2
+    )

@@ -338,18 +338,23 @@ class Count:
     made = taken = 0
 
 
-def run(number: int, examples: int, shrink: bool = True) -> Tuple[Count, List[str]]:
-    """So many documents, which the number chooses: how many there were, and what is wrong."""
-    count = Count()
-
-    @seed(number)
-    @settings(
+def options(examples: int, shrink: bool = True) -> settings:
+    """Without a time limit, and without a memory of former runs."""
+    return settings(
         max_examples=examples,
         deadline=None,
         database=None,
         phases=[Phase.generate, *[Phase.shrink] * shrink],
         suppress_health_check=list(HealthCheck),
     )
+
+
+def run(number: int, examples: int, shrink: bool = True) -> Tuple[Count, List[str]]:
+    """So many documents, which the number chooses: how many there were, and what is wrong."""
+    count = Count()
+
+    @seed(number)
+    @options(examples, shrink)
     @given(documents())
     def each(document: Document) -> None:
         count.made += 1
@@ -367,11 +372,11 @@ def main() -> int:
     parser = argparse.ArgumentParser()
     parser.add_argument("--seconds", type=float, default=60.0)
     parser.add_argument("--seed", type=int, default=int(time.time()))
-    options = parser.parse_args()
+    asked = parser.parse_args()
     os.environ.pop("SIMHOST_STATE", None)
-    end, total, number = time.monotonic() + options.seconds, 0, options.seed
+    end, total, number = time.monotonic() + asked.seconds, 0, asked.seed
     wrong: List[str] = []
-    while not wrong and (number == options.seed or time.monotonic() < end):
+    while not wrong and (number == asked.seed or time.monotonic() < end):
         count, wrong = run(number, 50)
         total += count.made
         number += 1

@@ -4,6 +4,7 @@ import sys
 from pathlib import Path
 from typing import Any, Optional
 
+import click
 import typer
 
 from vswitch.command import files, keeping, output
@@ -79,13 +80,23 @@ def backup() -> None:
         print(files.write(document), end="")
 
 
-def snapshot() -> None:
+def snapshot(
+    anonymize: bool = typer.Option(
+        False, "--anonymize", help="Replace names and addresses, each by one other everywhere."
+    ),
+    key_file: Optional[Path] = typer.Option(
+        None, metavar="FILE", help="Replace them alike in all snapshots with the key in that file."
+    ),
+) -> None:
     """Write the whole host as a scenario document, JSON, from which a clone of it starts.
 
     SIMHOST_SCENARIO names it to a simulated host. What a call refuses, what no document says and
     what no call tells is listed in it under observed.
     """
-    output.write_json(host().snapshot())
+    if key_file is not None and not anonymize:
+        raise click.UsageError("--key-file: it is for --anonymize")
+    key = key_file.read_bytes() if key_file is not None else None
+    output.write_json(host().snapshot(anonymize, key))
 
 
 def restore(file: Path = _FILE, dry_run: bool = _DRY_RUN) -> None:
