@@ -9,9 +9,9 @@
 #             measured of whole modules
 #
 # Prints tables of ratios, of checked calls to checks by hand and of objects to flat calls too, what
-# the recorder adds to a call, and what the simulated host does in a second; leaves results.json, calls.svg, host.json and
-# host_curve.svg in build/bench/. bench/README.md says how it measures and how to read it. On a
-# machine with other work to do it takes longer, and ratios stay ratios.
+# the recorder adds to a call, and what the simulated host does in a second; leaves results.json,
+# calls.svg, host.json and host_curve.svg in build/bench/. bench/README.md says how it measures and
+# how to read it. On a machine with other work to do it takes longer, and ratios stay ratios.
 cmd_bench() {
   quick='' full=surfaces
   case ${1-} in
