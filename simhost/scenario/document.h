@@ -1,5 +1,5 @@
 // Reading a document with care: every value is asked for by what it must be, and what is wrong is
-// told with the path of the key, such as "switches[0].mtu: 99 is below 1280".
+// told with the path of the key, such as "switches[0].version: -1 is below 0".
 #pragma once
 
 #include <cstddef>

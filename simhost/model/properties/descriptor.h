@@ -3,7 +3,7 @@
 // reference. Each is a constant in the folder of its domain:
 //
 //   inline constexpr auto mtu = property<qex_uint32>(VSPROP_MTU)
-//       .of_switch().typed().within(1280, 9190).defaults_to(1500)
+//       .of_switch().typed().within(kLeast, kGreatest).defaults_to(kDefault)
 //       .json("mtu").says("bytes that a frame may have");
 #pragma once
 
