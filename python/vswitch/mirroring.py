@@ -7,8 +7,7 @@ import os
 import time
 import typing
 from dataclasses import dataclass
-from types import TracebackType
-from typing import Any, Callable, ClassVar, Dict, Iterator, Optional, Tuple, Type, Union
+from typing import Any, Callable, ClassVar, Dict, Iterator, Optional, Tuple, Union
 
 from libvswitch import checked
 from libvswitch.errors import HostError, NotFound, NotRestored
@@ -143,12 +142,7 @@ class Mirroring:
             raise
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        raised: Optional[BaseException],
-        trace: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *unused: object) -> None:
         surely(self._remove)
 
     def _remove(self) -> None:

@@ -12,8 +12,7 @@ it has ended. Reading takes as much memory as there are calls in progress, howev
 import json
 from dataclasses import dataclass, field
 from pathlib import Path
-from types import TracebackType
-from typing import IO, Any, Dict, Iterator, List, Optional, Tuple, Type, Union
+from typing import IO, Any, Dict, Iterator, List, Optional, Tuple, Union
 
 __all__ = ["Call", "Callback", "Process", "Trace", "TraceError", "Trap"]
 
@@ -102,6 +101,7 @@ class Trace:
         """Those of which lines were read."""
         self._line = 1
         self._open: Dict[_Key, Union[Call, Callback]] = {}
+        self._left: List[Call] = []  # by processes that became other programs
         self._file: IO[bytes] = open(self.path, "rb")
         try:
             self.header = self._header()
@@ -112,12 +112,7 @@ class Trace:
     def __enter__(self) -> "Trace":
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        raised: Optional[BaseException],
-        trace: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *unused: object) -> None:
         self._file.close()
 
     def __iter__(self) -> Iterator[Call]:
@@ -127,10 +122,10 @@ class Trace:
             ended = self._read(self._parsed(held))
             if ended is not None:
                 yield ended
-        for left in self._open.values():
-            if isinstance(left, Call):
-                yield left
-        self._open.clear()
+        for process in {number for number, _ in self._open}:
+            self._leave(process)
+        yield from self._left
+        self._left.clear()
 
     def _header(self) -> Dict[str, Any]:
         # A foreign file may be one endless line.
@@ -174,7 +169,7 @@ class Trace:
             elif "callback" in event:
                 self._begin(_callback(event))
             elif "parent" in event:
-                self.processes[_whole(event, "process")] = _process(event)
+                self._begin_process(_process(event))
             else:
                 raise ValueError("no event that a trace has")
         except KeyError as error:
@@ -182,6 +177,18 @@ class Trace:
         except ValueError as error:
             raise self._wrong(str(error)) from None
         return None
+
+    def _begin_process(self, process: Process) -> None:
+        # One that runs another program counts anew, and ends nothing of what it had begun.
+        self._leave(process.id)
+        self.processes[process.id] = process
+
+    def _leave(self, process: int) -> None:
+        """What a process has begun will not end."""
+        for key in [one for one in self._open if one[0] == process]:
+            event = self._open.pop(key)
+            if isinstance(event, Call):
+                self._left.append(event)
 
     def _begin(self, event: Union[Call, Callback]) -> None:
         key = event.process, event.number

@@ -37,6 +37,22 @@ def test_the_status_is_that_of_the_tool(vswitch: Vswitch, tmp_path: Path) -> Non
     assert "vswitch: /nowhere/tool: No such file or directory\n" in done.stderr
 
 
+@pytest.mark.parametrize(
+    "damage, said",
+    [
+        ("printf x >> {}", "{}: line 2: the trace is cut off in the middle of a line"),
+        ("rm {}", "[Errno 2] No such file or directory: '{}'"),
+    ],
+)
+def test_a_tool_that_damages_its_trace(
+    vswitch: Vswitch, tmp_path: Path, damage: str, said: str
+) -> None:
+    trace = str(tmp_path / "trace.jsonl")
+    tool = f"{damage.format(trace)}; exit 5"
+    done = vswitch("record", "-o", trace, "--", "sh", "-c", tool)
+    assert (done.status, done.stderr.splitlines()[-1]) == (5, f"vswitch: {said.format(trace)}")
+
+
 def test_the_status_says_how_else_a_tool_ends(
     tmp_path: Path, capsys: pytest.CaptureFixture[str]
 ) -> None:

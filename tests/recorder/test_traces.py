@@ -58,6 +58,18 @@ def fixture_path(tmp_path: Path) -> Path:
     return tmp_path / "trace.jsonl"
 
 
+def test_a_process_that_runs_another_program_counts_anew(path: Path) -> None:
+    lines = [HEADER, PROCESS, begin(1), begin(2, thread=2), PROCESS, begin(1), end(1), begin(2)]
+    with Trace(written(path, lines)) as trace:
+        calls = list(trace)
+    assert [(one.number, one.thread, one.has_ended) for one in calls] == [
+        (1, 1, True),
+        (1, 1, False),
+        (2, 2, False),
+        (2, 1, False),
+    ]
+
+
 def test_calls_come_as_they_end_and_last_those_that_did_not(path: Path) -> None:
     with Trace(written(path, WHOLE)) as trace:
         calls = list(trace)

@@ -12,7 +12,8 @@ import typer
 
 from vswitch.command.session import host
 from vswitch.recording import recorded
-from vswitch.trace import Trace
+from vswitch.trace import Trace, TraceError
+from vswitch.words import printable
 
 __all__ = ["record", "run"]
 
@@ -36,10 +37,18 @@ def record(
     host()
     with recorded(trace, command) as environment:
         status = run(command, environment)
-    with Trace(trace) as written:
-        if next(iter(written), None) is None:
-            print("vswitch: the tool made no call of the host", file=sys.stderr)
+    _look_at(trace)
     raise SystemExit(status)
+
+
+def _look_at(trace: Path) -> None:
+    """Says why nothing can be read in a trace; the status remains that of the tool."""
+    try:
+        with Trace(trace) as written:
+            if next(iter(written), None) is None:
+                print("vswitch: the tool made no call of the host", file=sys.stderr)
+    except (TraceError, OSError) as error:
+        print(f"vswitch: {printable(str(error))}", file=sys.stderr)
 
 
 def run(command: List[str], environment: Dict[str, str]) -> int:
