@@ -5,7 +5,7 @@
 
 First what has an end: every batch of the sweep, then a million calls of every kind and a million
 traps of each call, fewer in less than twenty minutes. What has none shares the time that
-is left: fuzzers, sequences, killed processes and random pairs of values.
+is left: fuzzers, sequences, clones of random hosts, killed processes and random pairs of values.
 """
 
 import argparse
@@ -31,7 +31,7 @@ WHOLE = 20
 ROUNDS = 20
 """Of killed processes, before one looks at the time."""
 
-SHARES = {"fuzzing": 0.45, "sequences": 0.2, "kills": 0.1, "pairs": 0.25}
+SHARES = {"fuzzing": 0.4, "sequences": 0.2, "clones": 0.05, "kills": 0.1, "pairs": 0.25}
 """Of the time that what has an end leaves."""
 
 Outcome = Tuple[int, List[str]]
@@ -61,10 +61,11 @@ def program(name: str, *arguments: str) -> Outcome:
     return printed(processes.run(str(processes.HERE / name), *arguments))
 
 
-def sequences(seed: int, seconds: float) -> Outcome:
-    """Run sequences on the simulated host."""
-    command = [sys.executable, str(processes.TESTS / "sequences" / "sequences.py")]
-    options = [f"--seed={seed}", f"--seconds={seconds}"]
+def by_chance(place: str, seed: int, seconds: float) -> Outcome:
+    """Run a program of tests/ on what chance makes, in a process of its own: the sweeps are of the
+    module without classes, which some of them load."""
+    command = [sys.executable, str(processes.TESTS / place)]
+    options = [f"--seed={seed}", f"--seconds={max(1, int(seconds))}"]
     return printed(
         subprocess.run([*command, *options], capture_output=True, text=True, check=False)
     )
@@ -91,18 +92,6 @@ def killed(seconds: float) -> Outcome:
     return rounds, []
 
 
-def damaged(seed: int, seconds: float) -> Outcome:
-    """Damage state files, and use them.
-
-    A program of its own does: the sweeps are of the module without classes, which it loads.
-    """
-    command = [sys.executable, str(processes.TESTS / "fuzz" / "state_files.py")]
-    options = [f"--seed={seed}", f"--seconds={max(1, int(seconds))}"]
-    return printed(
-        subprocess.run([*command, *options], capture_output=True, text=True, check=False)
-    )
-
-
 def fuzzed(name: str, seed: int, seconds: float) -> Outcome:
     corpus = fuzzing.BUILD / "corpus" / name
     inputs, wrong = fuzzing.run(name, corpus, seed, f"-max_total_time={max(1, int(seconds))}")
@@ -126,10 +115,14 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
     yield Part("traps, in turns", "calls", whole(program, "traps.py", "in-turns", calls))
     yield Part("traps, in a row", "calls", whole(program, "traps.py", "in-a-row", calls))
     share = SHARES["fuzzing"] / (len(fuzzing.NAMES) + 1)
-    yield Part("damaged states", "states", partial(damaged, seed), share)
+    states = partial(by_chance, "fuzz/state_files.py", seed)
+    yield Part("damaged states", "states", states, share)
     for name in fuzzing.NAMES:
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
-    yield Part("sequences of calls", "sequences", partial(sequences, seed), SHARES["sequences"])
+    sequences = partial(by_chance, "sequences/sequences.py", seed)
+    yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
+    clones = partial(by_chance, "vswitch/drawn_documents.py", seed)
+    yield Part("clones of hosts", "documents", clones, SHARES["clones"])
     yield Part("killed processes", "rounds", killed, SHARES["kills"])
     yield Part(
         "random pairs",

@@ -6,30 +6,15 @@
 Prints what is wrong, and at the end how many sequences there were.
 """
 
-import argparse
-import os
 import sys
-import time
 from typing import Any, List, Tuple, Type
 
 import host_machine
-from hypothesis import HealthCheck, Phase, seed, settings
+import seeds
+from hypothesis import seed
 from hypothesis.stateful import RuleBasedStateMachine, run_state_machine_as_test
 
 STEPS = 50
-
-
-def options(sequences: int, shrink: bool) -> settings:
-    """Without a time limit for a step, and without a memory of former runs."""
-    return settings(
-        max_examples=sequences,
-        stateful_step_count=STEPS,
-        deadline=None,
-        database=None,
-        phases=[Phase.generate, *[Phase.shrink] * shrink],
-        report_multiple_bugs=False,
-        suppress_health_check=list(HealthCheck),
-    )
 
 
 def counting(machine: Type[RuleBasedStateMachine]) -> Any:
@@ -55,7 +40,10 @@ def run(
     try:
         # Hypothesis has no types for this one.
         run_state_machine_as_test(  # type: ignore[no-untyped-call]
-            counted, settings=options(sequences, shrink)
+            counted,
+            settings=seeds.options(
+                sequences, shrink, stateful_step_count=STEPS, report_multiple_bugs=False
+            ),
         )
     except Exception as error:
         return counted.made, [told(error)]
@@ -69,24 +57,5 @@ def told(error: Exception) -> str:
     return "\n".join([*shown, f"{type(error).__name__}: {error}"])
 
 
-def main() -> int:
-    """Run sequences of one seed after the other."""
-    parser = argparse.ArgumentParser()
-    parser.add_argument("--seconds", type=float, default=60.0)
-    parser.add_argument("--seed", type=int, default=int(time.time()))
-    given = parser.parse_args()
-    os.environ.pop("SIMHOST_STATE", None)
-    end, total, number = time.monotonic() + given.seconds, 0, given.seed
-    wrong: List[str] = []
-    while not wrong and (number == given.seed or time.monotonic() < end):
-        made, wrong = run(host_machine.HostMachine, number, 50)
-        total += made
-        number += 1
-    for text in wrong:
-        print(f"seed {number - 1}", text, sep="\n")
-    print(total)
-    return 0
-
-
 if __name__ == "__main__":
-    sys.exit(main())
+    sys.exit(seeds.main(lambda number: run(host_machine.HostMachine, number, 50)))

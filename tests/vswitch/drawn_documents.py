@@ -7,16 +7,15 @@ Makes hosts of them for as long as it is told, and a clone of each from its snap
 document whose clone is another host, and at the end how many documents there were.
 """
 
-import argparse
 import json
 import os
 import sys
-import time
 from pathlib import Path
 from typing import Any, Callable, Dict, List, Optional, Tuple
 
+import seeds
 import simhost
-from hypothesis import HealthCheck, Phase, given, seed, settings
+from hypothesis import given, seed
 from hypothesis import strategies as st
 from vswitch import Host
 
@@ -338,23 +337,12 @@ class Count:
     made = taken = 0
 
 
-def options(examples: int, shrink: bool = True) -> settings:
-    """Without a time limit, and without a memory of former runs."""
-    return settings(
-        max_examples=examples,
-        deadline=None,
-        database=None,
-        phases=[Phase.generate, *[Phase.shrink] * shrink],
-        suppress_health_check=list(HealthCheck),
-    )
-
-
 def run(number: int, examples: int, shrink: bool = True) -> Tuple[Count, List[str]]:
     """So many documents, which the number chooses: how many there were, and what is wrong."""
     count = Count()
 
     @seed(number)
-    @options(examples, shrink)
+    @seeds.options(examples, shrink)
     @given(documents())
     def each(document: Document) -> None:
         count.made += 1
@@ -369,21 +357,12 @@ def run(number: int, examples: int, shrink: bool = True) -> Tuple[Count, List[st
 
 def main() -> int:
     """Make documents of one seed after the other."""
-    parser = argparse.ArgumentParser()
-    parser.add_argument("--seconds", type=float, default=60.0)
-    parser.add_argument("--seed", type=int, default=int(time.time()))
-    asked = parser.parse_args()
-    os.environ.pop("SIMHOST_STATE", None)
-    end, total, number = time.monotonic() + asked.seconds, 0, asked.seed
-    wrong: List[str] = []
-    while not wrong and (number == asked.seed or time.monotonic() < end):
+
+    def of_seed(number: int) -> seeds.Outcome:
         count, wrong = run(number, 50)
-        total += count.made
-        number += 1
-    for text in wrong:
-        print(f"seed {number - 1}", text, sep="\n")
-    print(total)
-    return 0
+        return count.made, wrong
+
+    return seeds.main(of_seed)
 
 
 if __name__ == "__main__":

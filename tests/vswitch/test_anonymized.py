@@ -7,6 +7,7 @@ from typing import Any, Iterator, List
 
 import drawn_documents
 import pytest
+import seeds
 import simhost
 from drawn_documents import STOPPED, Document, host_of
 from hypothesis import given, seed
@@ -258,7 +259,7 @@ def test_what_chance_describes() -> None:
     taken: List[bool] = []
 
     @seed(11)
-    @drawn_documents.options(12)
+    @seeds.options(12)
     @given(drawn_documents.documents())
     def each(document: Document) -> None:
         try:
