@@ -7,7 +7,7 @@ import json
 import pprint
 import sys
 
-HEAD = '''"""The settings of switches and ports, the host's options, and bounds of other numbers.
+HEAD = '''"""The settings of switches and ports, the host's options, and bounds and defaults beside.
 
 Written by python/make_property_module.py.
 """
@@ -28,8 +28,13 @@ def main() -> None:
             thing: {one["name"]: (one["least"], one["greatest"]) for one in has if "least" in one}
             for thing, has in reference["objects"].items()
         }
-        held = pprint.pformat(numbers, width=100, sort_dicts=False)
-        file.write(f"\nNUMBERS = {held}\n")
+        defaults = {
+            thing: {one["name"]: one["default"] for one in has if "default" in one}
+            for thing, has in reference["objects"].items()
+        }
+        for name, said in (("NUMBERS", numbers), ("DEFAULTS", defaults)):
+            held = pprint.pformat(said, width=100, sort_dicts=False)
+            file.write(f"\n{name} = {held}\n")
 
 
 if __name__ == "__main__":

@@ -1,7 +1,8 @@
-"""The settings, options and bounds that there are: see python/make_property_module.py."""
+"""The settings, options, bounds and defaults that there are: see python/make_property_module.py."""
 
 from typing import Any, Dict, Tuple
 
 PROPERTIES: Tuple[Dict[str, Any], ...]
 RUNTIME_OPTIONS: Tuple[Dict[str, Any], ...]
 NUMBERS: Dict[str, Dict[str, Tuple[int, int]]]
+DEFAULTS: Dict[str, Dict[str, Any]]

@@ -330,9 +330,8 @@ class _Walk:
 
     def _setting(self, known: _table.Property) -> Reader:
         if known.name == "connection":
-            return lambda given, path: self._names.number(
-                _words.number(given, path, 0, 2**32 - 1)
-            )
+            bounds = known.form["least"], known.form["greatest"]
+            return lambda given, path: self._names.number(_words.number(given, path, *bounds))
         return self._form({"name": known.name, **known.form})
 
     # What there is

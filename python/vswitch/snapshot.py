@@ -19,6 +19,7 @@ from libvswitch.errors import HostError, Trapped
 from vswitch import _describing, _property_bytes, _settings, _table, _telling, documents
 from vswitch._describing import Description, Properties, Said
 from vswitch._of_snapshot import NOT_TOLD, VERSION
+from vswitch._properties import DEFAULTS
 from vswitch._thing import Item, Thing
 from vswitch.port import Port
 from vswitch.switch import HostPart, Switch
@@ -34,9 +35,6 @@ __all__ = ["backup", "snapshot"]
 
 T = TypeVar("T")
 Described = TypeVar("Described", bound=Thing)
-
-# Of a switch that a document gives none.
-_MAX_PORTS = 128
 
 
 def backup(host: "Host") -> Said:
@@ -238,7 +236,7 @@ class _Snapshot(_Exact):
 
     def _keep_what_fits(self, switch: Said) -> None:
         """What a clone refuses where a part of its switch is not known."""
-        if "max_ports" not in switch and len(switch["ports"]) > _MAX_PORTS:
+        if "max_ports" not in switch and len(switch["ports"]) > DEFAULTS["switches"]["max_ports"]:
             switch["max_ports"] = len(switch["ports"])
         if "private_vlans" in switch or _vs.VSPROP_PVLAN_MAP in switch["properties"]:
             return
