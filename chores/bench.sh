@@ -24,7 +24,7 @@ cmd_bench() {
   # shellcheck disable=SC2086 # lists of words
   need $build_packages $bench_packages
   asked_python='' benching=yes
-  build_peers objects recorder_vswitch recorder_nebPublic ${full:+"$full"}
+  build_peers objects recordings_vswitch recordings_nebPublic ${full:+"$full"}
   # A target that is missed ends nothing: what remains is measured, and the chore fails at its end.
   missed=''
   step "Measuring the module and its peers"

@@ -36,7 +36,7 @@ class Rule(NamedTuple):
 
 
 HOST = ("simhost",)
-PRODUCT = (*HOST, "docs", "examples", "helpers", "include", "interface", "python", "recorder")
+PRODUCT = (*HOST, "docs", "examples", "helpers", "include", "interface", "python", "recordings")
 
 
 def rule(

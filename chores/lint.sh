@@ -78,7 +78,7 @@ check_words() { "$python" chores/check_words.py; }
 # is left when it had nothing to say. Sources that $untidied matches are passed over, and
 # $unanalyzed those of clang's analyzer, which takes half the time.
 check_tidy() {
-  export folder ours="^$root/(include|helpers|recorder|simhost|tests|bench)/"
+  export folder ours="^$root/(include|helpers|recordings|simhost|tests|bench)/"
   stamps=$folder/tidy
   mkdir -p "$stamps"
   # shellcheck disable=SC2046 # none of our file names has a space

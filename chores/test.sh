@@ -24,16 +24,16 @@
 # The Python tests find the module, and those that exist for the tests alone, through PYTHONPATH,
 # and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
 # where LD_LIBRARY_PATH puts the recording host in place of the simulated one; so do those of
-# tests/classes, tests/vswitch and tests/recorder, for once the classes are loaded the flat functions
+# tests/classes, tests/vswitch and tests/recordings, for once the classes are loaded the flat functions
 # return instances of them. Those of tests/command run the command, which is plain Python, too: the plain
 # interpreter stands for all. By hand:
 #   export BUILD_DIR=$PWD/build PYTHONPATH=$PWD/build/python:$PWD/build/tests/python
 #   /usr/bin/python3 -m pytest tests --ignore=tests/contract --ignore=tests/classes \
-#     --ignore=tests/vswitch --ignore=tests/recorder --ignore=tests/command --ignore=tests/fuzz \
+#     --ignore=tests/vswitch --ignore=tests/recordings --ignore=tests/command --ignore=tests/fuzz \
 #     --ignore=tests/docs --ignore=tests/packages
 #   /usr/bin/python3 -m pytest tests/classes
 #   /usr/bin/python3 -m pytest tests/vswitch
-#   /usr/bin/python3 -m pytest tests/recorder
+#   /usr/bin/python3 -m pytest tests/recordings
 #   /usr/bin/python3 -m pytest tests/command
 #   /usr/bin/python3 -m pytest tests/docs
 #   LD_LIBRARY_PATH=$BUILD_DIR/tests/recording_host /usr/bin/python3 -m pytest tests/contract
@@ -81,7 +81,7 @@ cmd_test() {
   # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
   # parses the command line with a library of templates. The module and its helpers are analyzed,
   # too.
-  untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='^\./\(simhost\|recorder\)/'
+  untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='^\./\(simhost\|recordings\)/'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
@@ -98,7 +98,7 @@ cmd_test() {
   # shellcheck disable=SC2086 # a list of words
   pytest "Class tests" classes.xml '' tests/classes $deselected "$@"
   pytest "Object tests" objects.xml '' tests/vswitch "$@"
-  pytest "Recorder tests" recorder.xml '' tests/recorder "$@"
+  pytest "Tests of recordings" recordings.xml '' tests/recordings "$@"
   contract_tests tests/contract "$@"
   # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are
   # the same whatever the module is built for.

@@ -1,5 +1,5 @@
 # Where `cmake --install` puts things below its prefix: as they lie in the build folder, unless a
-# package says otherwise. Its components are module, command, launcher, recorder, simhost and
+# package says otherwise. Its components are module, command, launcher, recordings, simhost and
 # development.
 
 include(GNUInstallDirs)

@@ -27,8 +27,8 @@ from libvswitch.errors import HostError
 
 __all__ = ["host_libraries", "recorded"]
 
-_FOLDER = Path(_libvswitch.__file__).resolve().parent.parent / "recorder"
-_RUNTIME = "libcallrecorder.so"
+_FOLDER = Path(_libvswitch.__file__).resolve().parent.parent / "recordings"
+_RUNTIME = "librecordings.so"
 # A function of each library.
 _LIBRARIES = {"libvswitch.so": "VSDVS_SetMTU", "libnebPublic.so": "DVSQEX_StateGet"}
 # What the libraries of the recorder are linked against, in place of the host's; no path is longer.

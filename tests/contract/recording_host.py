@@ -58,7 +58,7 @@ class WrongHost(Exception):
     """The module runs on another host, so that nothing here would prove anything."""
 
 
-_FORWARDING = "libcallrecorder.so"
+_FORWARDING = "librecordings.so"
 
 
 def _loaded() -> Iterator[Path]:

@@ -7,7 +7,7 @@
 #include <cstring>
 #include <string_view>
 
-namespace recorder {
+namespace recordings {
 
 /// Room that grows and is used again. Where there is no memory it stays as it is.
 class Room {
@@ -76,4 +76,4 @@ class Line {
   bool is_whole_ = true;
 };
 
-}  // namespace recorder
+}  // namespace recordings

@@ -4,9 +4,11 @@
 
 #include <cstdio>
 
-#include "recorder/forward.h"
+#include "recordings/front/forward.h"
 
-namespace recorder {
+namespace recordings {
+
+void *host_functions[number_of_calls];
 
 void *host_function(std::size_t number) noexcept {
   if (host_functions[number] == nullptr) {
@@ -19,4 +21,4 @@ void *host_function(std::size_t number) noexcept {
   return host_functions[number];
 }
 
-}  // namespace recorder
+}  // namespace recordings

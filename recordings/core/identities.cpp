@@ -1,11 +1,11 @@
-#include "recorder/identities.h"
+#include "recordings/core/identities.h"
 
 #include <sys/mman.h>
 
 #include <cstddef>
 #include <mutex>
 
-namespace recorder {
+namespace recordings {
 namespace {
 
 struct Known {
@@ -115,4 +115,4 @@ void unlock_identities() noexcept {
   mutex.unlock();
 }
 
-}  // namespace recorder
+}  // namespace recordings

@@ -1,4 +1,4 @@
-#include "recorder/trace.h"
+#include "recordings/recorder/trace.h"
 
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -14,10 +14,11 @@
 #include <cstring>
 #include <ctime>
 
-#include "recorder/forward.h"
-#include "recorder/identities.h"
+#include "recordings/core/identities.h"
+#include "recordings/core/process.h"
+#include "recordings/front/forward.h"
 
-namespace recorder {
+namespace recordings {
 namespace {
 
 constexpr char const *trace_variable = "VSWITCH_RECORD_TRACE";
@@ -33,7 +34,6 @@ struct State {
   ino_t inode;
   std::atomic<bool> is_on;
   std::atomic<bool> has_told;  ///< of the process
-  pid_t process;
   pid_t parent;
   std::int64_t start;
   std::atomic<std::uint64_t> numbers;
@@ -122,7 +122,7 @@ void tell_of_process() {
   std::array<char, 4096> program{};
   auto const length = readlink("/proc/self/exe", program.data(), program.size());
   line.clear();
-  line.raw("{").member("process").number(std::int64_t{state.process});
+  line.raw("{").member("process").number(std::int64_t{process_id()});
   line.member("parent").number(std::int64_t{state.parent});
   write_time(line);
   line.member("program").text({program.data(), static_cast<std::size_t>(length < 0 ? 0 : length)});
@@ -134,7 +134,6 @@ void tell_of_process() {
 }
 
 void begin_process() {
-  state.process = getpid();
   state.parent = getppid();
   state.start = now();
   state.has_told = false;
@@ -164,10 +163,6 @@ void after_fork_in_child() {
 
 bool is_recording() noexcept {
   return state.is_on.load(std::memory_order_relaxed);
-}
-
-pid_t process_id() noexcept {
-  return state.process;
 }
 
 std::uint64_t next_number() noexcept {
@@ -202,4 +197,4 @@ void write_line(Line const &line, File file) noexcept {
   }
 }
 
-}  // namespace recorder
+}  // namespace recordings

@@ -3,13 +3,20 @@
 
 #include <cstdint>
 
-#include "recorder/line.h"
-#include "recorder/shapes.h"
+#include "recordings/core/line.h"
+#include "recordings/core/shapes.h"
 
-namespace recorder {
+namespace recordings {
 
 /// The arguments of a call or its result, in 64 bits each.
 using Words = std::uint64_t const *;
+
+/// A number of so many bytes.
+std::int64_t number_at(char const *at, std::uint32_t width, bool is_signed) noexcept;
+
+/// A record with what follows it in the same block; `form` is that of its addresses, or no_form.
+void write_record(Line &line, Record const &record, std::uint64_t address,
+                  std::int64_t form) noexcept;
 
 /// What a caller gives: a member for each argument that goes in.
 void write_inputs(Line &line, Call const &call, Words words) noexcept;
@@ -26,4 +33,4 @@ void write_result(Line &line, Call const &call, std::uint64_t result) noexcept;
 /// A pointer: null, or {"at": its number}.
 void write_pointer(Line &line, std::uint64_t address) noexcept;
 
-}  // namespace recorder
+}  // namespace recordings

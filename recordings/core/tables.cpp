@@ -5,14 +5,13 @@
 #include "nebpublic/handles.h"
 #include "nebpublic/ports.h"
 #include "qexapi/basics.h"
-#include "recorder/forward.h"
-#include "recorder/shapes.h"
+#include "recordings/core/shapes.h"
 #include "vswitch/configuration.h"
 #include "vswitch/queries.h"
 
 #include "tables.inc"
 
-namespace recorder {
+namespace recordings {
 
 std::uint32_t bytes_of_form(std::int64_t form) {
   switch (form) {
@@ -27,4 +26,4 @@ std::uint32_t bytes_of_form(std::int64_t form) {
   }
 }
 
-}  // namespace recorder
+}  // namespace recordings

@@ -6,17 +6,18 @@
 #include <span>
 #include <string_view>
 
-#include "recorder/api.h"
+#include "recordings/core/api.h"
 
-namespace recorder {
+namespace recordings {
 
 struct Record;
 
 /// What lies in some bytes.
 enum class Kind : std::uint8_t { number, text, bytes, record };
 
-/// A number of a record that no address leads to.
+/// A number of a record that no address leads to. Of one that is set, what does not fit is lost.
 using BitsOf = std::int64_t (*)(void const *record);
+using SetBits = void (*)(void *record, std::int64_t value);
 
 /// Where the field is that tells which view of a union holds; the form is an argument of the call.
 inline constexpr int no_tag = -1;
@@ -36,6 +37,7 @@ struct Field {
   std::int64_t tag_value;
   Record const *record;  ///< of a record
   BitsOf bits;           ///< of a bit field
+  SetBits set_bits;
 };
 
 struct Record {
@@ -80,6 +82,11 @@ struct Argument {
   Record const *record;
 };
 
+/// Whether it comes out of the call.
+inline bool is_output(Argument const &argument) noexcept {
+  return argument.passing >= Passing::out_number;
+}
+
 enum class Result : std::uint8_t { nothing, status, number, text, handle };
 
 struct Call {
@@ -90,9 +97,15 @@ struct Call {
   std::span<Argument const> arguments;
 };
 
+/// The form of addresses where no argument names one.
+inline constexpr std::int64_t no_form = -1;
+
 /// Bytes of an address by the form that names it; 0 where nothing says it.
 std::uint32_t bytes_of_form(std::int64_t form);
 
-RECORDER_API extern std::span<Call const> const calls;
+RECORDINGS_API extern std::span<Call const> const calls;
 
-}  // namespace recorder
+/// Those that calls take and give, and those that they hold.
+extern std::span<Record const *const> const records;
+
+}  // namespace recordings

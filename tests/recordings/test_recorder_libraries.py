@@ -12,7 +12,7 @@ from recordings import SIMULATED
 from vswitch import recording
 from vswitch.recording import recorded
 
-FOLDER = Path(os.environ["BUILD_DIR"], "recorder")
+FOLDER = Path(os.environ["BUILD_DIR"], "recordings")
 LIBRARIES = ("libvswitch.so", "libnebPublic.so")
 
 

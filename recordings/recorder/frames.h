@@ -7,10 +7,10 @@
 #include <cstdint>
 #include <string_view>
 
-#include "recorder/api.h"
-#include "recorder/shapes.h"
+#include "recordings/core/api.h"
+#include "recordings/core/shapes.h"
 
-namespace recorder {
+namespace recordings {
 
 inline constexpr std::size_t most_arguments = 8;
 
@@ -26,16 +26,16 @@ struct Frame {
 
 /// Writes that a call begins. False if it is not to be recorded: nobody records, or the call is one
 /// that the host's library makes on its own.
-RECORDER_API bool begin(Frame &frame, Call const &call) noexcept;
+RECORDINGS_API bool begin(Frame &frame, Call const &call) noexcept;
 
 /// Notes that the trap now leads to the frame.
-RECORDER_API void note_trap(Frame &frame) noexcept;
+RECORDINGS_API void note_trap(Frame &frame) noexcept;
 
 /// Writes what the call left, and restores the caller's trap.
-RECORDER_API void end(Frame &frame, std::uint64_t result) noexcept;
+RECORDINGS_API void end(Frame &frame, std::uint64_t result) noexcept;
 
 /// Writes that the call trapped, and goes on to where the caller's trap leads.
-RECORDER_API [[noreturn]] void pass_trap_on(Frame &frame, int value) noexcept;
+RECORDINGS_API [[noreturn]] void pass_trap_on(Frame &frame, int value) noexcept;
 
 /// A value of a callback: a pointer, or a number.
 struct Given {
@@ -54,4 +54,4 @@ void end_callback(std::uint64_t number, Given const *result) noexcept;
 void *callback_in_progress() noexcept;
 void note_callback(Frame &frame, void *callback) noexcept;
 
-}  // namespace recorder
+}  // namespace recordings

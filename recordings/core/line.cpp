@@ -1,4 +1,4 @@
-#include "recorder/line.h"
+#include "recordings/core/line.h"
 
 #include <sys/mman.h>
 
@@ -6,7 +6,7 @@
 #include <array>
 #include <charconv>
 
-namespace recorder {
+namespace recordings {
 namespace {
 
 constexpr std::size_t first_size = std::size_t{1} << 16U;
@@ -114,4 +114,4 @@ Line &Line::text(std::string_view bytes) noexcept {
   return raw("\"");
 }
 
-}  // namespace recorder
+}  // namespace recordings

@@ -1,12 +1,13 @@
-#include "recorder/frames.h"
+#include "recordings/recorder/frames.h"
 
 #include <atomic>
 #include <cerrno>
 #include <cstring>
 
-#include "recorder/identities.h"
-#include "recorder/trace.h"
-#include "recorder/values.h"
+#include "recordings/core/identities.h"
+#include "recordings/core/process.h"
+#include "recordings/core/values.h"
+#include "recordings/recorder/trace.h"
 #include "vswitch/call_trap.h"
 
 // Weak: there is a trap only with the module, and an interpreter only in its processes.
@@ -18,7 +19,7 @@ extern "C" {
 extern char const *PyExceptionClass_Name(struct _object *type) __attribute__((weak));
 }
 
-namespace recorder {
+namespace recordings {
 namespace {
 
 /// What is known of a call or a callback in progress. It is not in the frame itself: a jump may
@@ -335,4 +336,4 @@ void end_callback(std::uint64_t number, Given const *result) noexcept {
   finish_line(line, "end", number);
 }
 
-}  // namespace recorder
+}  // namespace recordings

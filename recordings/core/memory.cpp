@@ -1,4 +1,4 @@
-#include "recorder/memory.h"
+#include "recordings/core/memory.h"
 
 #include <pthread.h>
 #include <sys/uio.h>
@@ -6,9 +6,9 @@
 #include <algorithm>
 #include <cstring>
 
-#include "recorder/trace.h"
+#include "recordings/core/process.h"
 
-namespace recorder {
+namespace recordings {
 namespace {
 
 constexpr std::size_t page = 4096;
@@ -85,4 +85,4 @@ bool Block::need_text() noexcept {
   return true;
 }
 
-}  // namespace recorder
+}  // namespace recordings

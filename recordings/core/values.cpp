@@ -1,12 +1,12 @@
-#include "recorder/values.h"
+#include "recordings/core/values.h"
 
 #include <algorithm>
 #include <cstring>
 
-#include "recorder/identities.h"
-#include "recorder/memory.h"
+#include "recordings/core/identities.h"
+#include "recordings/core/memory.h"
 
-namespace recorder {
+namespace recordings {
 namespace {
 
 constexpr std::string_view not_there = "no memory of the process is there";
@@ -15,17 +15,6 @@ constexpr std::string_view too_much = "it is longer than a trace holds";
 Block &block() {
   static thread_local Block the_block;
   return the_block;
-}
-
-/// Of what the form of addresses is taken when no argument names one.
-constexpr std::int64_t no_form = -1;
-
-std::int64_t number_at(char const *at, std::uint32_t width, bool is_signed) {
-  std::uint64_t bits = 0;
-  std::memcpy(&bits, at, width);
-  auto const unused = 64U - 8U * width;
-  return is_signed ? static_cast<std::int64_t>(bits << unused) >> unused
-                   : static_cast<std::int64_t>(bits);
 }
 
 void write_number(Line &line, std::int64_t value, bool is_signed) {
@@ -284,12 +273,6 @@ void write_elements(Line &line, Argument const &argument, std::uint64_t address,
   }
 }
 
-void write_record(Line &line, Record const &record, std::uint64_t address, std::int64_t form) {
-  auto &held = block();
-  held.open(address);
-  Walk(line, held, form).record(record, 0);
-}
-
 void write_memory(Line &line, Call const &call, Argument const &argument, Words words,
                   std::uint64_t address) {
   if (address == 0) {
@@ -303,10 +286,6 @@ void write_memory(Line &line, Call const &call, Argument const &argument, Words 
     line.raw("{");
     close_memory(line, address, length);
   }
-}
-
-bool is_output(Argument const &argument) {
-  return argument.passing >= Passing::out_number;
 }
 
 void write_input(Line &line, Call const &call, Argument const &argument, Words words,
@@ -390,6 +369,21 @@ void write_output(Line &line, Call const &call, Argument const &argument, Words 
 
 }  // namespace
 
+std::int64_t number_at(char const *at, std::uint32_t width, bool is_signed) noexcept {
+  std::uint64_t bits = 0;
+  std::memcpy(&bits, at, width);
+  auto const unused = 64U - 8U * width;
+  return is_signed ? static_cast<std::int64_t>(bits << unused) >> unused
+                   : static_cast<std::int64_t>(bits);
+}
+
+void write_record(Line &line, Record const &record, std::uint64_t address,
+                  std::int64_t form) noexcept {
+  auto &held = block();
+  held.open(address);
+  Walk(line, held, form).record(record, 0);
+}
+
 void write_pointer(Line &line, std::uint64_t address) noexcept {
   if (address == 0) {
     line.raw("null");
@@ -450,4 +444,4 @@ void write_result(Line &line, Call const &call, std::uint64_t result) noexcept {
   }
 }
 
-}  // namespace recorder
+}  // namespace recordings

@@ -1,4 +1,4 @@
 // What the libraries that forward use of the one that they share.
 #pragma once
 
-#define RECORDER_API [[gnu::visibility("default")]]
+#define RECORDINGS_API [[gnu::visibility("default")]]

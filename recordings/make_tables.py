@@ -1,4 +1,4 @@
-"""Writes the recorder's tables and the calls that it forwards, from the binding definitions.
+"""Writes the tables of the calls and those that are forwarded, from the binding definitions.
 
 usage: make_tables.py TREE FOLDER
 
@@ -54,6 +54,7 @@ class Records:
         self._known = known
         self._seen: Set[str] = set()
         self.lines: List[str] = []
+        self.names: List[str] = []
         for call in calls:
             for one in call.arguments:
                 self._add(known.resolve(one.type).name)
@@ -68,6 +69,7 @@ class Records:
         if record.followed or record.packed:
             self._add((record.followed or record.packed)[0])
         self.lines += self._table(record)
+        self.names.append(name)
 
     def _table(self, record: Record) -> List[str]:
         fields = [one for one in record.fields if not one.is_same_bytes]
@@ -110,17 +112,20 @@ class Records:
         if one.view:
             tag = "form_tag" if one.view[0] == "FORM" else str(index[one.view[0]])
             value = one.view[1]
-        bits, offset = "nullptr", f"offsetof({record.name}, {one.name})"
+        bits, set_bits, offset = "nullptr", "nullptr", f"offsetof({record.name}, {one.name})"
         if one.is_bit_field:
             read = f"static_cast<{record.name} const *>(record)->{one.name}"
             bits = f"[](void const *record) {{ return static_cast<std::int64_t>({read}); }}"
+            written = read.replace(" const *", " *")
+            fitting = f"static_cast<decltype({record.name}::{one.name})>(value)"
+            set_bits = f"[](void *record, std::int64_t value) {{ {written} = {fitting}; }}"
             offset = "0"
         of_record = f"&record_{element.name}" if kind == "record" else "nullptr"
         count = type_.count or 0 if is_array else 0
         return (
             f'{{"{one.name}", Kind::{kind}, {is_signed(self._known, element)}, {cxx(is_array)}, '
             f"{width(self._known, element)}, {offset}, {count}, {index.get(one.count, -1)}, "
-            f"{index.get(one.rest, -1)}, {tag}, {value}, {of_record}, {bits}}}"
+            f"{index.get(one.rest, -1)}, {tag}, {value}, {of_record}, {bits}, {set_bits}}}"
         )
 
 
@@ -220,14 +225,14 @@ def forwarded(call: Call, number: int) -> List[str]:
     given = "".join(f", {one.name}" for one in call.arguments)
     return [
         f"{call.result.c_type} {call.name}({parameters}) {{".replace("* ", "*"),
-        f"  return recorder::forward<{number}>(&{call.name}{given});",
+        f"  return recordings::forward<{number}>(&{call.name}{given});",
         "}",
     ]
 
 
 def library(calls: List[Call], name: str) -> str:
     numbers = [at for at, call in enumerate(calls) if LIBRARIES[call.family] == name]
-    lines = ["// Written by recorder/make_tables.py."]
+    lines = ["// Written by recordings/make_tables.py."]
     lines += [
         line
         for number in numbers
@@ -237,7 +242,7 @@ def library(calls: List[Call], name: str) -> str:
     # From within the library: the host's is what comes after it.
     lines.append("[[gnu::constructor]] static void find_the_hosts_functions() {")
     lines += [
-        f'  recorder::host_functions[{number}] = dlsym(RTLD_NEXT, "{calls[number].name}");'
+        f'  recordings::host_functions[{number}] = dlsym(RTLD_NEXT, "{calls[number].name}");'
         for number in numbers
     ]
     lines.append("}")
@@ -245,11 +250,15 @@ def library(calls: List[Call], name: str) -> str:
 
 
 def tables(known: Definitions, calls: List[Call]) -> str:
-    lines = ["// Written by recorder/make_tables.py.", "namespace recorder {", "namespace {"]
-    lines += Records(known, calls).lines
+    lines = ["// Written by recordings/make_tables.py.", "namespace recordings {", "namespace {"]
+    records = Records(known, calls)
+    lines += records.lines
     lines += Calls(known, calls).lines
-    lines += ["}  // namespace", f"void *host_functions[{len(calls)}];"]
-    lines += ["std::span<Call const> const calls{table_of_calls};", "}  // namespace recorder"]
+    lines.append("constexpr Record const *table_of_records[] = {")
+    lines += [f"    &record_{name}," for name in records.names]
+    lines += ["};", "}  // namespace"]
+    lines.append("std::span<Record const *const> const records{table_of_records};")
+    lines += ["std::span<Call const> const calls{table_of_calls};", "}  // namespace recordings"]
     return "\n".join(lines) + "\n"
 
 
@@ -258,7 +267,8 @@ def main() -> None:
     known = definitions.read(Path(tree))
     calls = call_model.read(known)
     written = {"tables.inc": tables(known, calls)}
-    written["numbers.inc"] = "".join(
+    written["numbers.inc"] = f"inline constexpr std::size_t number_of_calls = {len(calls)};\n"
+    written["numbers.inc"] += "".join(
         f"inline constexpr std::size_t number_of_{call.name} = {number};\n"
         for number, call in enumerate(calls)
         if call.takes_more

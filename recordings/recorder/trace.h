@@ -2,19 +2,14 @@
 // stays readable whatever becomes of the process.
 #pragma once
 
-#include <sys/types.h>
-
 #include <cstdint>
 
-#include "recorder/line.h"
+#include "recordings/core/line.h"
 
-namespace recorder {
+namespace recordings {
 
 /// Whether there is a trace to write; none is left after a write that failed.
 bool is_recording() noexcept;
-
-/// This process; of a child of a fork its own.
-pid_t process_id() noexcept;
 
 /// Numbers of what begins in this process: from 1 on, in the order in which it begins.
 std::uint64_t next_number() noexcept;
@@ -34,4 +29,4 @@ enum class File : bool { is_kept, may_be_closed };
 /// Adds a line. The first one of a process tells of the process itself before.
 void write_line(Line const &line, File file) noexcept;
 
-}  // namespace recorder
+}  // namespace recordings

@@ -6,24 +6,24 @@
 #include <cstdint>
 #include <type_traits>
 
-#include "recorder/api.h"
-#include "recorder/frames.h"
-#include "recorder/shapes.h"
-#include "recorder/stand_ins.h"
+#include "recordings/core/api.h"
+#include "recordings/core/shapes.h"
+#include "recordings/recorder/frames.h"
+#include "recordings/recorder/stand_ins.h"
 #include "vswitch/call_trap.h"
 
 #pragma weak exception_buffer
 
-namespace recorder {
+namespace recordings {
 
 #include "numbers.inc"
 
 /// The host's functions, in the order of `calls`. Each library that forwards fills in its own.
-RECORDER_API extern void *host_functions[];
+RECORDINGS_API extern void *host_functions[];
 
 /// The host's function; a process that calls one that its library lacks ends, as without the
 /// recorder.
-RECORDER_API void *host_function(std::size_t number) noexcept;
+RECORDINGS_API void *host_function(std::size_t number) noexcept;
 
 template <typename T>
 std::uint64_t word_of(T value) noexcept {
@@ -63,4 +63,4 @@ Returned forward(Returned (* /*declared*/)(Parameters...),
   }
 }
 
-}  // namespace recorder
+}  // namespace recordings

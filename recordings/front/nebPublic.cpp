@@ -6,7 +6,7 @@
 #include "nebpublic/kernel_state.h"
 #include "nebpublic/names.h"
 #include "nebpublic/state.h"
-#include "recorder/forward.h"
+#include "recordings/front/forward.h"
 
 extern "C" {
 #include "nebPublic_calls.inc"

@@ -1,12 +1,12 @@
-#include "recorder/stand_ins.h"
+#include "recordings/recorder/stand_ins.h"
 
 #include <array>
 #include <atomic>
 #include <utility>
 
-#include "recorder/identities.h"
+#include "recordings/core/identities.h"
 
-namespace recorder {
+namespace recordings {
 namespace {
 
 constexpr std::size_t most_functions = 32;
@@ -110,10 +110,10 @@ Release stand_in(Frame & /*frame*/, Release given) noexcept {
   return in_a_slot(releasers, release_in, given);
 }
 
-}  // namespace recorder
+}  // namespace recordings
 
 void *recorder_given_for(void *function) {
-  using namespace recorder;
+  using namespace recordings;
   if (function == address_of(visit)) {
     return callback_in_progress();
   }

@@ -4,21 +4,21 @@
 
 #include <cstddef>
 
-#include "recorder/api.h"
-#include "recorder/frames.h"
+#include "recordings/core/api.h"
+#include "recordings/recorder/frames.h"
 
-namespace recorder {
+namespace recordings {
 
 using Visit = char (*)(void *, void *);
 using Allocate = void *(*)(std::size_t);
 using Release = void (*)(void *);
 
-RECORDER_API Visit stand_in(Frame &frame, Visit given) noexcept;
+RECORDINGS_API Visit stand_in(Frame &frame, Visit given) noexcept;
 
 /// A list keeps these beyond the call that it gets them with, so each different one has a stand-in
 /// for good; there are only so many, and after those the tool's own are passed on.
-RECORDER_API Allocate stand_in(Frame &frame, Allocate given) noexcept;
-RECORDER_API Release stand_in(Frame &frame, Release given) noexcept;
+RECORDINGS_API Allocate stand_in(Frame &frame, Allocate given) noexcept;
+RECORDINGS_API Release stand_in(Frame &frame, Release given) noexcept;
 
 /// Anything else is passed on.
 template <typename T>
@@ -26,10 +26,10 @@ T stand_in(Frame & /*frame*/, T given) noexcept {
   return given;
 }
 
-}  // namespace recorder
+}  // namespace recordings
 
 extern "C" {
 
 /// What the tool gave where the host has this function; the function itself if no tool gave it.
-RECORDER_API void *recorder_given_for(void *function);
+RECORDINGS_API void *recorder_given_for(void *function);
 }

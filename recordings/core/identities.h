@@ -3,7 +3,7 @@
 
 #include <cstdint>
 
-namespace recorder {
+namespace recordings {
 
 /// The number of an address, from 1 on; 0 if there is no memory to remember it.
 std::uint64_t identity_of(std::uint64_t address) noexcept;
@@ -15,4 +15,4 @@ void forget(std::uint64_t address) noexcept;
 void lock_identities() noexcept;
 void unlock_identities() noexcept;
 
-}  // namespace recorder
+}  // namespace recordings

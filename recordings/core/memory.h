@@ -6,9 +6,9 @@
 #include <cstdint>
 #include <string_view>
 
-#include "recorder/line.h"
+#include "recordings/core/line.h"
 
-namespace recorder {
+namespace recordings {
 
 /// The most bytes that a trace holds of one value.
 inline constexpr std::size_t most_bytes = std::size_t{64} << 20U;
@@ -35,4 +35,4 @@ class Block {
   std::size_t size_ = 0;
 };
 
-}  // namespace recorder
+}  // namespace recordings

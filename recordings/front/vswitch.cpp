@@ -4,7 +4,7 @@
 
 #include <cstdarg>
 
-#include "recorder/forward.h"
+#include "recordings/front/forward.h"
 #include "vswitch/configuration.h"
 #include "vswitch/queries.h"
 #include "vswitch/status_text.h"
@@ -55,15 +55,16 @@ void panic(Reports host, char const *format, std::va_list more) {
 }  // namespace
 
 extern "C" void Panic(char const *format, ...) {
-  auto *const host = reinterpret_cast<Reports>(recorder::host_function(recorder::number_of_Panic));
-  recorder::Frame frame;
-  frame.words[0] = recorder::word_of(format);
-  bool const is_recorded = recorder::begin(frame, recorder::calls[recorder::number_of_Panic]);
+  auto *const host =
+      reinterpret_cast<Reports>(recordings::host_function(recordings::number_of_Panic));
+  recordings::Frame frame;
+  frame.words[0] = recordings::word_of(format);
+  bool const is_recorded = recordings::begin(frame, recordings::calls[recordings::number_of_Panic]);
   std::va_list more;
   va_start(more, format);
   panic(host, format, more);
   va_end(more);
   if (is_recorded) {
-    recorder::end(frame, 0);
+    recordings::end(frame, 0);
   }
 }
