@@ -1,0 +1,48 @@
+// Which frames a flow is for.
+#pragma once
+
+#include <cstdint>
+#include <map>
+
+#include "planes/openvswitch/openflow/field.h"
+
+namespace simhost::openflow {
+
+/// What some bits of a field are.
+struct Masked {
+  Value value;  // zero wherever the mask is
+  Value mask;   // the bits that count
+
+  friend auto operator<=>(Masked const &, Masked const &) = default;
+};
+
+/// The frames whose fields have these contents; an empty one is for all. The switch refuses a field
+/// whose layer no other field of the match asks for: arp_op without the eth_type of ARP.
+class Match {
+ public:
+  /// Another field; once named it is replaced. Throws std::invalid_argument for bits that the field
+  /// has not, and for a part of a field that only matches as a whole.
+  Match &with(Field field, Value value);
+  /// Likewise, of which only the bits of the mask count; none of them is no condition.
+  Match &with(Field field, Value value, Value mask);
+
+  /// A tag with this VLAN, 0 to 4095, whatever its priority.
+  Match &vlan(std::uint16_t vid) { return with(Field::vlan_vid, kVlanPresent | vid); }
+  /// A tag whose VLAN has these bits.
+  Match &vlan(std::uint16_t vid, std::uint16_t mask) {
+    return with(Field::vlan_vid, kVlanPresent | vid, kVlanPresent | mask);
+  }
+  /// Any tag.
+  Match &tagged() { return vlan(0, 0); }
+  /// No tag.
+  Match &untagged() { return with(Field::vlan_vid, 0); }
+
+  [[nodiscard]] std::map<Field, Masked> const &fields() const { return fields_; }
+
+  friend auto operator<=>(Match const &, Match const &) = default;
+
+ private:
+  std::map<Field, Masked> fields_;
+};
+
+}  // namespace simhost::openflow
