@@ -2,6 +2,7 @@
 #include "planes/stored/links.h"
 
 #include "clock/clock.h"
+#include "model/teaming/team.h"
 #include "storage/store.h"
 
 namespace simhost::stored {
@@ -19,7 +20,8 @@ void set_link(storage::ChangingTransaction &transaction, std::string_view uplink
 }
 
 bool lacp_is_up(storage::Transaction &transaction, std::string_view uplink) {
-  return would_aggregate(link_of(transaction, uplink)) && storage::is_in_lag(transaction, uplink);
+  return teaming::would_aggregate(link_of(transaction, uplink)) &&
+         storage::is_in_lag(transaction, uplink);
 }
 
 }  // namespace simhost::stored

@@ -11,11 +11,6 @@ Link link_of(storage::Transaction &transaction, std::string_view uplink);
 /// Changes a link. Its up_since is kept by the clock, whatever `link` says.
 void set_link(storage::ChangingTransaction &transaction, std::string_view uplink, Link const &link);
 
-/// Whether the other end would aggregate the link with others.
-inline bool would_aggregate(Link const &link) {
-  return link.up() && link.partner;
-}
-
 /// See Plane::lacp_is_up.
 bool lacp_is_up(storage::Transaction &transaction, std::string_view uplink);
 

@@ -39,7 +39,7 @@ OwnTeaming own_teaming(storage::Transaction &transaction, storage::Port const &p
 std::optional<std::size_t> place_by(Team const &team, OwnTeaming const &own,
                                     std::vector<Slot> const &shared, storage::PortNumber number) {
   if (own.uplink) {
-    return bound_uplink(team, *own.uplink);
+    return teaming::bound_uplink_in(team, *own.uplink);
   }
   if (own.policy) {
     return uplink_for(slots_in_use(team, *own.policy), *own.policy, number);
@@ -84,7 +84,7 @@ Teaming::KeptTeam const &Teaming::team_of_switch(storage::Transaction &transacti
                                                  storage::Generations const &generations) {
   auto const found = teams_.find(key);
   if (found == teams_.end() || found->second.generation != generations.team) {
-    auto team = team_of(transaction, key);
+    auto team = teaming::team_of(transaction, key, link_of);
     auto slots = slots_in_use(team, team.policy);
     return keep(
         teams_, key,

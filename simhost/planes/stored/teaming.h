@@ -19,10 +19,13 @@
 #include <vector>
 
 #include "model/plane.h"
-#include "planes/stored/team.h"
+#include "model/teaming/team.h"
 #include "storage/running/generations.h"
 
 namespace simhost::stored {
+
+using teaming::Slot;
+using teaming::Team;
 
 /// What a port has of its own instead of its switch's.
 struct OwnTeaming {

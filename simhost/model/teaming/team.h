@@ -2,16 +2,26 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
-#include "model/plane.h"
-#include "planes/stored/links.h"
+#include "base/api.h"
+#include "clock/clock.h"
+#include "storage/ports.h"
+#include "storage/running/links.h"
 #include "vswitch/teaming.h"
 
-namespace simhost::stored {
+namespace simhost::teaming {
+
+using storage::Link;
+
+/// Whether the other end would aggregate the link with others.
+inline bool would_aggregate(Link const &link) {
+  return link.up() && link.partner;
+}
 
 struct TeamUplink {
   std::string name;
@@ -31,7 +41,11 @@ struct Team {
   ClockTime up_delay;
 };
 
-Team team_of(storage::Transaction &transaction, storage::SwitchKey key);
+/// The link of an uplink as the plane knows it.
+using LinkOf = std::function<Link(storage::Transaction &transaction, std::string_view uplink)>;
+
+SIMHOST_API Team team_of(storage::Transaction &transaction, storage::SwitchKey key,
+                         LinkOf const &link_of);
 
 /// What a policy has in use under one name: an uplink, or the uplinks of a group.
 struct Slot {
@@ -41,14 +55,26 @@ struct Slot {
   bool operator==(Slot const &) const = default;
 };
 
-/// The slots that a policy has in use, in its order. The same for all ports, so that a team is
-/// looked at once for all of them.
+/// What a policy can use, in its order: the first ones are in use, the others stand by for them.
+struct UsableSlots {
+  std::vector<Slot> slots;
+  std::size_t in_use;
+};
+
+/// The same for all ports, so that a team is looked at once for all of them.
+SIMHOST_API UsableSlots usable_slots(Team const &team, VSTeamPolicy const &policy);
+/// Those of them that are in use.
 std::vector<Slot> slots_in_use(Team const &team, VSTeamPolicy const &policy);
+/// Whether every port uses the first slot instead of one chosen by its number.
+inline bool uses_first_slot(VSTeamPolicy const &policy) {
+  return policy.loadBalance == TEAM_FRP_TYPE_NONE ||
+         policy.loadBalance == TEAM_FRP_TYPE_FO_EXPLICIT;
+}
 
 /// Where in Team::uplinks the uplink is that a port uses; nothing without a slot.
 std::optional<std::size_t> uplink_for(std::vector<Slot> const &slots, VSTeamPolicy const &policy,
                                       storage::PortNumber number);
 /// Likewise for a port that is bound to one uplink, which need only be up.
-std::optional<std::size_t> bound_uplink(Team const &team, std::string_view name);
+SIMHOST_API std::optional<std::size_t> bound_uplink_in(Team const &team, std::string_view name);
 
-}  // namespace simhost::stored
+}  // namespace simhost::teaming

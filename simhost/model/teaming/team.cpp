@@ -1,8 +1,9 @@
 // Which uplinks a policy can use, and which of them it does.
-#include "planes/stored/team.h"
+#include "model/teaming/team.h"
 
 #include <algorithm>
 #include <span>
+#include <utility>
 
 #include "base/bytes.h"
 #include "model/lookup.h"
@@ -12,7 +13,7 @@
 #include "model/properties/properties.h"
 #include "model/teaming/properties.h"
 
-namespace simhost::stored {
+namespace simhost::teaming {
 namespace {
 
 bool is_settled(Team const &team, Link const &link) {
@@ -110,13 +111,12 @@ Named named_by(Team const &team, VSTeamPolicy const &policy) {
 
 }  // namespace
 
-Team team_of(storage::Transaction &transaction, storage::SwitchKey key) {
-  Team team{
-      .uplinks = {},
-      .lags = storage::all_lags(transaction, key),
-      .policy = effective(transaction, teaming::of_switch, storage::PropertyOwner::global(key)),
-      .now = clock_now(transaction),
-      .up_delay = ClockTime(runtime_number(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY))};
+Team team_of(storage::Transaction &transaction, storage::SwitchKey key, LinkOf const &link_of) {
+  Team team{.uplinks = {},
+            .lags = storage::all_lags(transaction, key),
+            .policy = effective(transaction, of_switch, storage::PropertyOwner::global(key)),
+            .now = clock_now(transaction),
+            .up_delay = ClockTime(runtime_number(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY))};
   for (auto const &[name, number] : storage::uplinks_of(transaction, key)) {
     auto const port = get_port(transaction, number);
     auto const blocked = effective(transaction, ports::blocked, owner_of(port));
@@ -130,7 +130,7 @@ Team team_of(storage::Transaction &transaction, storage::SwitchKey key) {
   return team;
 }
 
-std::vector<Slot> slots_in_use(Team const &team, VSTeamPolicy const &policy) {
+UsableSlots usable_slots(Team const &team, VSTeamPolicy const &policy) {
   auto const named = named_by(team, policy);
   std::vector<Slot> slots;
   for (auto const name : named.names) {
@@ -143,8 +143,14 @@ std::vector<Slot> slots_in_use(Team const &team, VSTeamPolicy const &policy) {
                      [](Slot const &a, Slot const &b) { return a.since < b.since; });
   }
   // A policy that has standby uplinks only uses one of them.
-  slots.resize(std::min(slots.size(), std::max<std::size_t>(named.active, 1)));
-  return slots;
+  auto const in_use = std::min(slots.size(), std::max<std::size_t>(named.active, 1));
+  return {.slots = std::move(slots), .in_use = in_use};
+}
+
+std::vector<Slot> slots_in_use(Team const &team, VSTeamPolicy const &policy) {
+  auto usable = usable_slots(team, policy);
+  usable.slots.resize(usable.in_use);
+  return std::move(usable.slots);
 }
 
 std::optional<std::size_t> uplink_for(std::vector<Slot> const &slots, VSTeamPolicy const &policy,
@@ -156,17 +162,15 @@ std::optional<std::size_t> uplink_for(std::vector<Slot> const &slots, VSTeamPoli
   auto const share = [spread](std::size_t of) {
     return of == 1 ? 0 : spread % static_cast<std::uint32_t>(of);
   };
-  bool const first =
-      policy.loadBalance == TEAM_FRP_TYPE_NONE || policy.loadBalance == TEAM_FRP_TYPE_FO_EXPLICIT;
-  auto const &slot = slots[first ? 0 : share(slots.size())];
+  auto const &slot = slots[uses_first_slot(policy) ? 0 : share(slots.size())];
   // A group spreads the ports over its uplinks, whatever the policy does with the slots.
   return slot.uplinks[share(slot.uplinks.size())];
 }
 
-std::optional<std::size_t> bound_uplink(Team const &team, std::string_view name) {
+std::optional<std::size_t> bound_uplink_in(Team const &team, std::string_view name) {
   VSTeamPolicy const only_the_link{};
   auto const place = place_of(team, name);
   return place && is_usable(team, team.uplinks[*place], only_the_link) ? place : std::nullopt;
 }
 
-}  // namespace simhost::stored
+}  // namespace simhost::teaming
