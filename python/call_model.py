@@ -45,6 +45,21 @@ class Unit(enum.Enum):
     FORM = "the bytes of an address in the form that the argument names"
 
 
+class Volatile(enum.Enum):
+    """What is each host's own, so that calls of two hosts are not alike in it."""
+
+    PORT_NUMBER = "the number of a port"
+    SWITCH_ID = "the identifier of a switch"
+    PORTSET_NAME = "the name of a port set"
+    LAG_NUMBER = "the number of a LAG"
+    IMAGE = "bytes in a form of the host's own"
+    LENGTH = "how long those are"
+    TIME = "a time"
+    COUNT = "what the host has counted"
+    PADDING = "bytes that mean nothing"
+    CALLERS_OWN = "the caller's own, which the host hands on"
+
+
 @dataclass(frozen=True)
 class Length:
     """Where the length of an array stands: in the argument `of`, or in what the call returns."""
@@ -78,6 +93,7 @@ class Argument:
     room: int  # of a text that the call writes: bytes at most, its NUL not counted; else 0
     value: Value
     is_added: bool  # both modules own it and add its value to the result
+    volatile: Optional[Volatile] = None
 
     @property
     def is_text(self) -> bool:
@@ -92,6 +108,7 @@ class Result:
     c_type: str
     is_nullable: bool
     value: Value
+    volatile: Optional[Volatile] = None
 
 
 @dataclass(frozen=True)
@@ -102,6 +119,7 @@ class Call:
     arguments: Tuple[Argument, ...]
     result: Result
     takes_more: bool  # further arguments, as printf does
+    asks: bool = False  # it changes nothing of the host; any other may
 
     @property
     def has_status(self) -> bool:
@@ -158,6 +176,7 @@ def _call(known: Definitions, function: Function) -> Call:
         arguments=tuple(_argument(known, function, one) for one in function.parameters),
         result=_result(known, function),
         takes_more=function.takes_more,
+        asks=function.asks,
     )
 
 
@@ -173,6 +192,7 @@ def _argument(known: Definitions, function: Function, one: Parameter) -> Argumen
         room=_room(known, one, direction),
         value=_value(known, function, one, direction),
         is_added=one.is_output,
+        volatile=_volatile(function, one.name),
     )
 
 
@@ -239,7 +259,22 @@ def _result(known: Definitions, function: Function) -> Result:
     until = function.says("shows", RESULT)
     if type_.is_pointer and type_.name != "char":
         value = Value(Ownership.VIEW, until=until)
-    return Result(function.result, function.c_result, type_.is_pointer, value)
+    volatile = _volatile(function, RESULT)
+    return Result(function.result, function.c_result, type_.is_pointer, value, volatile)
+
+
+def _volatile(function: Function, name: str) -> Optional[Volatile]:
+    given = (one.name for one in function.parameters)
+    images = [one for one in given if function.says("volatile", one) == "image"]
+    lengths = [_length(function, one) for one in images]
+    if any(one is not None and one.of == name for one in lengths):
+        return Volatile.LENGTH
+    return kind_of(function.says("volatile", name))
+
+
+def kind_of(said: str) -> Optional[Volatile]:
+    """The kind that interface/ names."""
+    return Volatile[said.upper()] if said else None
 
 
 def _refuse_what_is_said_of_nothing(known: Definitions, found: Dict[str, Call]) -> None:
@@ -252,8 +287,8 @@ def _unknown_names(known: Definitions) -> Iterator[str]:
     for function in known.functions:
         names = {RESULT, *(one.name for one in function.parameters)}
         for (kind, name), value in function.said.items():
-            # Lengths are said of a whole family, and concern the calls that have both arguments.
-            if name not in names and kind not in ("bytes", "elements"):
+            # These are said of a whole family, and concern the calls that have the arguments.
+            if name not in names and kind not in ("bytes", "elements", "volatile"):
                 yield f"{function.name} has no {name} for {kind} {value}"
 
 

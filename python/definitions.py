@@ -86,6 +86,7 @@ class Function:
     family: str = ""  # of a call of the host, as interface/calls names it
     is_by_hand: bool = False  # in the class's base
     deallocator: str = ""  # of what a call allocates, unless `said` names another
+    asks: bool = False  # a call of the host that changes nothing of it
     said: Dict[Tuple[str, str], str] = field(default_factory=dict, hash=False)
 
     def says(self, kind: str, name: str) -> str:
@@ -114,6 +115,7 @@ class Field:
     holds_text: bool = False  # of an array of bytes
     is_same_bytes: bool = False  # as the first field of its union
     view: Tuple[str, ...] = ()  # of a union: the field that tells, and the constant it then is
+    volatile: str = ""  # of what is each host's own: its kind
 
 
 @dataclass
@@ -262,6 +264,7 @@ def _collect_members(node: ET.Element, record: Record) -> None:
                     holds_text=seen.get("feature_holds_text") == "1",
                     is_same_bytes=seen.get("feature_same_bytes") == "1",
                     view=_words(seen, "view"),
+                    volatile=seen.get("feature_volatile", ""),
                 )
             )
 
@@ -289,6 +292,7 @@ def _function(node: ET.Element, seen: _Attributes) -> Function:
         family=seen.get("feature_family", ""),
         is_by_hand=seen.get("feature_by_hand") == "1",
         deallocator=seen.get("feature_deallocator", ""),
+        asks=seen.get("feature_asks") == "1",
         said=_said(seen),
     )
 
@@ -305,6 +309,7 @@ _WORDS = (
     "shows",
     "takes",
     "unless",
+    "volatile",
     "within",
 )
 

@@ -6,6 +6,7 @@ from typing import Collection, Dict, Iterable, List, Mapping, Optional, Sequence
 
 import call_model
 import comments
+import likeness
 import ownership
 import statuses
 from comments import Comment, Header
@@ -46,6 +47,7 @@ class Call:
     shape: Tuple[str, ...]  # the names of what a list holds; empty for a single result
     statuses: Dict[str, str]  # when each is returned; empty where there is none
     ownership: Tuple[str, ...]
+    between_hosts: Tuple[str, ...]  # what is each host's own; nothing of what is no call of theirs
     header: str
 
     @property
@@ -96,6 +98,7 @@ class Entries:
             shape=_shape_of_result(forms[0]),
             statuses=statuses.of_call(self._calls[name], header) if header else {},
             ownership=tuple(self._ownership(longest)),
+            between_hosts=tuple(likeness.of_call(self._calls[name])) if header else (),
             header=header.name if header else "",
         )
 
@@ -146,6 +149,7 @@ class Entries:
             shape=(),
             statuses={},
             ownership=(ownership.of_result(self._known, one),),
+            between_hosts=(),
             header="",
         )
 

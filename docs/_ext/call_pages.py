@@ -35,6 +35,8 @@ class Functions(Described):
         yield self.labelled("Returns", self._returns(call))
         if call.ownership:
             yield self.labelled("Ownership", self._joined(call.ownership))
+        if call.between_hosts:
+            yield self.labelled("Between hosts", self._joined(call.between_hosts))
         if call.statuses:
             yield nodes.paragraph("", "", nodes.strong(text="Statuses"))
             yield nodes.bullet_list("", *self._statuses(call), classes=["statuses"])

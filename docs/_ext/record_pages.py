@@ -4,6 +4,7 @@ from typing import List, Sequence
 
 from docutils import nodes
 
+import likeness
 from call_pages import Functions
 from catalogue import CLASSES, FLAT
 from definitions import Field, Record
@@ -63,7 +64,7 @@ class Records(Functions):
                 self._type(one),
                 [nodes.Text(offset)],
                 [nodes.Text(size)],
-                self.words.inline(one.doc),
+                self.words.inline("; ".join(filter(None, (one.doc, likeness.of_field(one))))),
                 self._accessors(record, one),
             )
             rows.append((cells, (attribute, *self._accessor_names(record, one))))

@@ -7,6 +7,9 @@
 //   %end_calls                            up to here; it ends what the next two say, too
 //   %bytes(argument, length)              where a call has both, `argument` is so many bytes
 //   %elements(argument, count)            likewise, so many elements
+//   %volatile(argument, kind)             likewise, it is each host's own: where calls of two hosts are held
+//                                         to each other it is mapped, not compared. The kinds are those of
+//                                         call_model.Volatile
 //
 // Of one call, before it is declared; RESULT stands for what it returns:
 //
@@ -19,6 +22,12 @@
 //   %form(CALL, argument, mode)           `argument` is an address, or has such as entries, of the form
 //                                         that `mode` names
 //   %nullable(CALL, argument)             null is allowed, of a counted argument with a length of 0
+//   %volatile_of(CALL, argument, kind)    as %volatile, of this call
+//   %asks(CALL)                           it changes nothing of the host; of any other, it may
+//
+// Of a field, before its record is declared:
+//
+//   %volatile_field(RECORD::field, kind)  as %volatile
 
 %define %calls(FAMILY, DEALLOCATOR...)
 %feature("family", "FAMILY");
@@ -35,6 +44,11 @@
 %elements(ids, )
 %elements(ranges, )
 %elements(entries, )
+%volatile(switchId, )
+%volatile(portsetName, )
+%volatile(portsetBuffer, )
+%volatile(portID, )
+%volatile(state, )
 %enddef
 
 %define %bytes(ARGUMENT, LENGTH)
@@ -43,6 +57,10 @@
 
 %define %elements(ARGUMENT, COUNT)
 %feature("elements:ARGUMENT", "COUNT");
+%enddef
+
+%define %volatile(ARGUMENT, KIND)
+%feature("volatile:ARGUMENT", "KIND");
 %enddef
 
 %define %allocates(CALL, ARGUMENT, DEALLOCATOR)
@@ -75,4 +93,16 @@
 
 %define %nullable(CALL, ARGUMENT)
 %feature("nullable:ARGUMENT", "1") CALL;
+%enddef
+
+%define %volatile_of(CALL, ARGUMENT, KIND)
+%feature("volatile:ARGUMENT", "KIND") CALL;
+%enddef
+
+%define %asks(CALL)
+%feature("asks", "1") CALL;
+%enddef
+
+%define %volatile_field(FIELD, KIND)
+%feature("volatile", "KIND") FIELD;
 %enddef

@@ -15,6 +15,8 @@
 %bytes(data, length)                                    // DVSData_Update
 %allocates(DVSData_Alloc, list, DVSData_Free)
 %allocates(DVSData_Serialize, bytes, DVSQEX_DataFree)
+%volatile_of(DVSData_Serialize, bytes, image)
+%volatile_of(DVS_SwitchId, RESULT, switch_id)
 %unless(DVSData_Serialize, bytes, "the list has an allocator of its own, whose counterpart frees it")
 %length(DVSData_Serialize, bytes, length)
 %shows(DVSData_Data, data, "the item ends")
@@ -34,12 +36,28 @@
 %nullable(DVS_Version, handle)
 %nullable(DVS_PortId, handle)
 %nullable(DVS_PortAlias, handle)
+%asks(DVS_SwitchId)
+%asks(DVS_SwitchName)
+%asks(DVS_ClassName)
+%asks(DVS_GetMaxPorts)
+%asks(DVS_Version)
+%asks(DVS_PortId)
+%asks(DVS_PortAlias)
+%asks(DVSData_Alloc)
+%asks(DVSData_Free)
+%asks(DVSData_Update)
+%asks(DVSData_Serialize)
+%asks(DVSData_Name)
+%asks(DVSData_Data)
+%asks(DVSData_PropType)
 %include "nebpublic/data.h"
 %end_calls
 
 // Reading the state in place. A walk over a null handle, or with a null callback, does nothing.
 %calls(state)
 %bytes(state, length)                                   // DVSState_ConfigDeserialize
+%volatile(switchId, switch_id)
+%volatile(state, image)
 %shows(DVSState_SwitchFindByAlias, RESULT, "a reset or a cleanup of the state")
 %shows(DVSState_PortFind, RESULT, "a reset or a cleanup of the state")
 %shows(DVSState_GlobalPropLookup, item, "the same property is looked up or walked over again")
@@ -47,6 +65,7 @@
 %define %walk(CALL)
 %nullable(CALL, callback)
 %nullable(CALL, context)
+%volatile_of(CALL, context, callers_own)
 %enddef
 %walk(DVSState_SwitchForEach)
 %nullable(DVSState_PortForEach, handle)
@@ -57,6 +76,15 @@
 %walk(DVSState_GlobalPropForEach)
 %walk(DVSState_HostPropForEach)
 %walk(DVSState_PortDataForEach)
+%asks(DVSState_SwitchFindByAlias)
+%asks(DVSState_PortFind)
+%asks(DVSState_SwitchForEach)
+%asks(DVSState_PortForEach)
+%asks(DVSState_GlobalPropForEach)
+%asks(DVSState_HostPropForEach)
+%asks(DVSState_PortDataForEach)
+%asks(DVSState_GlobalPropLookup)
+%asks(DVSState_HostPropLookup)
 %include "nebpublic/state.h"
 %end_calls
 
@@ -66,6 +94,9 @@
 %bytes(data, length)                                    // DVSQEX_GlobalPropGet, ...
 %bytes(input, inputLength)                              // DVSQEX_CmdExec
 %bytes(output, outputLength)
+%volatile(switchId, switch_id)
+%volatile(portID, port_number)
+%volatile(state, image)
 %length(DVSQEX_PortAdd, state, stateLength)
 %nullable(DVSQEX_StateInit, state)
 %nullable(DVSQEX_PortAdd, state)
@@ -77,6 +108,23 @@
 %allocates(DVSQEX_ExtraConfigPortPropList, list, DVSData_Free)
 %releases(DVSQEX_DataFree, data)
 %nullable(DVSQEX_DataFree, data)
+%asks(DVSQEX_StateGet)
+%asks(DVSQEX_PersistentStateGet)
+%asks(DVSQEX_DataFree)
+%asks(DVSQEX_SwitchPortList)
+%asks(DVSQEX_GlobalPropGet)
+%asks(DVSQEX_HostPropGet)
+%asks(DVSQEX_PortFind)
+%asks(DVSQEX_PortGetByExternalId)
+%asks(DVSQEX_PortDataGet)
+%asks(DVSQEX_PortStateGet)
+%asks(DVSQEX_PersistentPortStateGet)
+%asks(DVSQEX_UplinkDataGet)
+%asks(DVSQEX_VendorGlobalPropList)
+%asks(DVSQEX_VendorHostPropList)
+%asks(DVSQEX_VendorPortPropList)
+%asks(DVSQEX_ExtraConfigPropList)
+%asks(DVSQEX_ExtraConfigPortPropList)
 %include "nebpublic/kernel_state.h"
 %end_calls
 
@@ -87,6 +135,13 @@
 %array_argument(char alias[128])                        // DVSPortsetNameToAlias
 %array_argument(char portsetName[128])                  // DVSAliasToPortsetName
 %calls(names)
+%volatile(switchId, switch_id)
+%volatile(portsetName, portset_name)
+%volatile(portsetBuffer, portset_name)
+%asks(DVSAliasToSwitchId)
+%asks(DVSPortsetNameToAlias)
+%asks(DVSAliasToPortsetName)
+%asks(DVPortExist)
 %include "nebpublic/names.h"
 QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128]);
 %end_calls
@@ -97,6 +152,7 @@ QEX_ReturnStatus DVSAliasToPortsetName(char const *alias, char portsetName[128])
 %untrapped(Panic)
 %calls(status_text)
 %shows(QEX_ReturnStatusToString, RESULT, "the process ends")
+%asks(QEX_ReturnStatusToString)
 %include "vswitch/status_text.h"
 %end_calls
 %called_by_tuple(Panic)

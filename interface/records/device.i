@@ -28,6 +28,16 @@
 #include "vswitch/statistics.h"
 #include "vswitch/switch_info.h"
 %}
+%volatile_field(VSInfo::nebID, switch_id)
+%volatile_field(VSRARPStats::rarpPktsSent, count)
+%volatile_field(VSRARPStats::maxRARPTime, time)
+%volatile_field(VSRARPStats::rarpTime, time)
+%volatile_field(VSServicePortTeamingStats::txFromSrvPort, count)
+%volatile_field(VSServicePortTeamingStats::txUsingSrvPortFRP, count)
+%volatile_field(VSServicePortTeamingStats::txUsingPktSrcPortFRP, count)
+%volatile_field(VSServicePortTeamingStats::txErrors, count)
+%volatile_field(VSServicePortTeamingStats::rxToSrvPort, count)
+%volatile_field(VSServicePortTeamingStats::rxRpfOverride, count)
 %include "vswitch/switch_info.h"
 %include "vswitch/statistics.h"
 %include "vswitch/device_queries.h"

@@ -6,4 +6,5 @@
 %{
 #include "vswitch/lags.h"
 %}
+%volatile_field(VSLAGStatus::id, lag_number)
 %include "vswitch/lags.h"

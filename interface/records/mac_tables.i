@@ -40,6 +40,10 @@ typedef size_t SIZE;
 %feature("takes:mac_str", "buffer") VSMACEntry::set_mac_address;
 %feature("takes:length", "part") VSMACEntry::set_mac_address;
 
+%volatile_field(VSMACEntry::elapsed, time)
+%volatile_field(VSPMACLearningStats::noLearningAllowedPkts, count)
+%volatile_field(VSPMACLearningStats::noLearningDroppedPkts, count)
+%volatile_field(VSPMACLearningStats::numMACsMoved, count)
 %include "vswitch/device.h"
 %include "vswitch/mac_tables.h"
 

@@ -7,6 +7,7 @@
 %{
 #include "vswitch/mcast_filters.h"
 %}
+%volatile_field(VSMcastFilterStats::updateTime, time)
 %include "vswitch/mcast_filters.h"
 
 %extend VSMcastFilters {

@@ -17,6 +17,18 @@
 #include "helpers/mirror.h"
 #include "vswitch/properties.h"
 %}
+%volatile_field(VSDVMirrorSessionStats::mirrorPktCnt, count)
+%volatile_field(VSDVMirrorSessionStats::mirrorPktFailCnt, count)
+%volatile_field(VSDVMirrorSessionStats::mirroredPkts, count)
+%volatile_field(VSDVMirrorSessionStats::discardedPkts, count)
+%volatile_field(VSDVMirrorSessionStats::failedPkts, count)
+%volatile_field(VSPromiscSessionActiveDsts::entries, port_number)
+%volatile_field(DVMirrorEntity::portId, port_number)
+%volatile_field(DVMirrorIP::pad, padding)
+%volatile_field(DVMirrorSession::pad0, padding)
+%volatile_field(DVMirrorSession::pad1, padding)
+%volatile_field(DVMirrorSession::pad2, padding)
+%volatile_field(DVMirrorSessionTable::pad, padding)
 %include "vswitch/properties.h"
 %include "vswitch/mirror.h"
 

@@ -19,6 +19,9 @@
 #include "vswitch/private_vlans.h"
 #include "vswitch/teaming.h"
 %}
+%volatile_field(VSPvlanMapEntry::pad, padding)
+%volatile_field(VSExtraEthFilter::pad, padding)
+%volatile_field(VSPortVlanPolicy::pad, padding)
 %include "vswitch/private_vlans.h"
 %include "vswitch/mac_learning.h"
 %include "vswitch/port_policies.h"

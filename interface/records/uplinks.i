@@ -11,6 +11,7 @@
 %{
 #include "helpers/uplinks.h"
 %}
+%volatile_field(VSUplinks_entries::portID, port_number)
 %include "vswitch/uplinks.h"
 
 %extend VSUplinks {

@@ -1,6 +1,7 @@
 """The model of the calls says what the headers say, call by call where memory is concerned."""
 
 import os
+import re
 import sys
 from pathlib import Path
 from typing import Dict, List, Optional, Set, Tuple
@@ -15,7 +16,7 @@ sys.path.append(str(ROOT / "python"))
 
 import call_model  # noqa: E402  (after the path is set)
 import definitions  # noqa: E402
-from call_model import RESULT, Direction, Ownership, Unit, Value  # noqa: E402
+from call_model import RESULT, Direction, Ownership, Unit, Value, Volatile  # noqa: E402
 
 KNOWN = definitions.read(BUILD / "classes/made/tree.xml")
 CALLS = {call.name: call for call in call_model.read(KNOWN)}
@@ -310,3 +311,72 @@ def test_the_comments_of_the_headers_name_the_same_deallocator() -> None:
             folder = "vswitch" if call.family in ("configuration", "queries") else "nebpublic"
             header = ROOT / "include" / folder / f"{call.family}.h"
             assert one.value.deallocator in header.read_text(encoding="ascii"), call.name
+
+
+# By hand, from the headers: what no two hosts need have alike.
+VOLATILE = """
+    SWITCH_ID     DVS_SwitchId RESULT
+    PORT_NUMBER   VSDVS_DvPortIDToPortID portID
+    PORT_NUMBER   VSDVS_DvPortIDToPortIDFromDVSID portID
+    PORT_NUMBER   VSQEX_GetMcastFilters port
+    PORT_NUMBER   VSQEX_GetMcastFilterStats port
+    PORT_NUMBER   VSQEX_PortGetTeamUplinkHint port
+    PORT_NUMBER   DVSQEX_UplinkDataGet portID
+    PORT_NUMBER   DVSQEX_UplinkDataSet portID
+    PORTSET_NAME  VSDVS_CreateVSwitch portsetName
+    PORTSET_NAME  VSDVS_GetAliasFromPortset portsetName
+    PORTSET_NAME  DVSPortsetNameToAlias portsetName
+    PORTSET_NAME  DVSAliasToPortsetName portsetBuffer
+    IMAGE         DVSData_Serialize bytes
+    LENGTH        DVSData_Serialize length
+    IMAGE         DVSState_ConfigDeserialize state
+    LENGTH        DVSState_ConfigDeserialize length
+    IMAGE         DVSQEX_StateInit state
+    LENGTH        DVSQEX_StateInit length
+    IMAGE         DVSQEX_StateGet state
+    LENGTH        DVSQEX_StateGet length
+    IMAGE         DVSQEX_PersistentStateGet state
+    LENGTH        DVSQEX_PersistentStateGet length
+    IMAGE         DVSQEX_PortAdd state
+    LENGTH        DVSQEX_PortAdd stateLength
+    IMAGE         DVSQEX_PortStateGet state
+    LENGTH        DVSQEX_PortStateGet length
+    IMAGE         DVSQEX_PersistentPortStateGet state
+    LENGTH        DVSQEX_PersistentPortStateGet length
+    CALLERS_OWN   DVSState_SwitchForEach context
+    CALLERS_OWN   DVSState_PortForEach context
+    CALLERS_OWN   DVSState_GlobalPropForEach context
+    CALLERS_OWN   DVSState_HostPropForEach context
+    CALLERS_OWN   DVSState_PortDataForEach context
+"""
+
+
+def test_what_is_each_hosts_own() -> None:
+    found = []
+    for call in CALLS.values():
+        own = {one.name: one.volatile for one in call.arguments if one.name != "switchId"}
+        own[RESULT] = call.result.volatile
+        found += [[kind.name, call.name, name] for name, kind in own.items() if kind is not None]
+    assert sorted(found) == sorted(rows(VOLATILE))
+    identifiers = [call.argument("switchId") for call in CALLS.values() if has_switch_id(call)]
+    assert len(identifiers) == 38
+    assert {one.volatile for one in identifiers} == {Volatile.SWITCH_ID}
+
+
+def has_switch_id(call: call_model.Call) -> bool:
+    return "switchId" in [one.name for one in call.arguments]
+
+
+# Those whose names do not say so.
+CHANGING = """
+    DVSQEX_CmdExec DVSQEX_StateCleanup DVSQEX_StateInit DVSQEX_StateSanitize DVSQEX_SwitchAssociate
+    DVSQEX_SwitchDissociate DVSQEX_SwitchSetMaxPorts DVSQEX_SwitchSetVersion
+    DVSState_ConfigDeserialize DVSState_ConfigReset Panic
+"""
+
+
+def test_calls_that_may_change_the_host() -> None:
+    asking = {name for name, call in CALLS.items() if call.asks}
+    verbs = r"_(Set|Clear|Create|Destroy|Add|Remove|Append|ConfigureS)|(Set|Clear|Add|Remove)$"
+    by_verb = {name for name in CALLS if re.search(verbs, name)}
+    assert set(CALLS) - asking == by_verb | set(CHANGING.split())

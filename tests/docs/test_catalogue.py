@@ -1,5 +1,6 @@
 """What the reference says of ownership, types and constants, against the code that knows it."""
 
+import likeness
 import pytest
 import types_in_words
 from catalogue import Catalogue
@@ -42,6 +43,26 @@ def test_ownership_follows_from_what_is_declared(catalogue: Catalogue) -> None:
     assert said["new_vidrangeArray"] == said["vidrangeArray_getitem"] == owned
     table = "the caller's, until free_dvmirror_session_table releases it."
     assert said["alloc_dvmirror_session_table"] == [table]
+
+
+def test_what_is_each_hosts_own_follows_from_what_is_declared(catalogue: Catalogue) -> None:
+    said = {name: list(call.between_hosts) for name, call in catalogue.calls.items()}
+    asks = "changes nothing of the host."
+    assert said["VSDVS_GetMTU"] == [asks]
+    assert said["VSDVS_SetMTU"] == said["new_vidrangeArray"] == []
+    identifier = "`switchId`: the identifier of a switch, each host's own."
+    number = "`portID`: the number of a port, each host's own."
+    assert said["VSDVS_DvPortIDToPortIDFromDVSID"] == [asks, identifier, number]
+    image = "`state`: bytes in a form of the host's own."
+    length = "`length`: how long those are, each host's own."
+    assert said["DVSQEX_StateInit"] == [image, length]
+    assert said["DVS_SwitchId"] == [
+        asks,
+        "what is returned: the identifier of a switch, each host's own.",
+    ]
+    fields = {one.name: one for one in catalogue.known.records["VSMACEntry"].fields}
+    assert likeness.of_field(fields["elapsed"]) == "a time, each host's own"
+    assert likeness.of_field(fields["vid"]) == ""
 
 
 @pytest.mark.parametrize(
