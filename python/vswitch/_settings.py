@@ -216,13 +216,13 @@ def read(thing: Thing, known: Property, item: Optional[Item] = None) -> Any:
 
 def write(thing: Thing, known: Property, value: Any) -> None:
     """Sets a setting in one call, so that nobody sees half of it."""
-    thing.host._note_properties(thing, known.keys)
     how = crossing(known)
-    if how.set is not None:
-        how.set(*thing.owner, value)
-        return
-    data = how.write(value) if how.write is not None else _records.plain_bytes(known, value)
-    thing.write_property(known.key, data, known.type)
+    with thing.host._writing_properties(thing, known.keys):
+        if how.set is not None:
+            how.set(*thing.owner, value)
+            return
+        data = how.write(value) if how.write is not None else _records.plain_bytes(known, value)
+        thing.write_property(known.key, data, known.type)
 
 
 def clear(thing: Thing, known: Property) -> None:
@@ -230,12 +230,12 @@ def clear(thing: Thing, known: Property) -> None:
     held = thing.properties()
     if not any(key in held for key in known.keys):
         return
-    thing.host._note_properties(thing, known.keys)
     how = crossing(known)
-    if how.clear is not None:
-        how.clear(*thing.owner)
-    else:
-        thing.erase_property(known.key)
+    with thing.host._writing_properties(thing, known.keys):
+        if how.clear is not None:
+            how.clear(*thing.owner)
+        else:
+            thing.erase_property(known.key)
 
 
 class Setting(Generic[Got, Given]):

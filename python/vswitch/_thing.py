@@ -66,14 +66,14 @@ class Thing(abc.ABC):
 
     def set_property(self, key: str, data: bytes, type_: int) -> None:
         """Sets a property that has no name, by its bytes and its property type."""
-        self.host._note_properties(self, (key,))
-        self.write_property(key, data, type_)
+        with self.host._writing_properties(self, (key,)):
+            self.write_property(key, data, type_)
 
     def clear_property(self, key: str) -> None:
         """Clears a property; one that is not set stays so."""
         if key in self.properties():
-            self.host._note_properties(self, (key,))
-            self.erase_property(key)
+            with self.host._writing_properties(self, (key,)):
+                self.erase_property(key)
 
     def is_set(self, name: str) -> bool:
         """Whether a setting has a value of its own, even if that is the default."""

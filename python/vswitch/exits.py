@@ -9,6 +9,7 @@ from types import TracebackType
 from typing import Optional, Type
 
 from libvswitch.errors import HostError, NotRestored
+from vswitch.transaction import committed
 from vswitch.words import DocumentError, printable
 
 __all__ = ["exits"]
@@ -22,16 +23,18 @@ class exits(contextlib.ContextDecorator):
     """Ends a tool: `with exits("tool"): main()`, or as a decorator of its main function.
 
     What the host or the system refuses, and what is wrong with a document, is told on standard
-    error, in one line, and the status is 1; 3 when something is left changed that should not be. A
-    reader who closes the pipe has seen enough: that is no error. What else is raised is a mistake
-    in the tool, and keeps its traceback.
+    error, in one line, and the status is 1; 3 when something is left changed: what could not be put
+    back, or what the tool had done before. A reader who closes the pipe has seen enough: that is no
+    error. What else is raised is a mistake in the tool, and keeps its traceback.
     """
 
     def __init__(self, tool: str) -> None:
         self._tool = tool
+        self._committed = 0
 
     def __enter__(self) -> "exits":
         _open_streams()
+        self._committed = committed()
         return self
 
     def __exit__(
@@ -54,13 +57,14 @@ class exits(contextlib.ContextDecorator):
             _close_output()
             sys.exit(0)
         status = _status(raised)
+        is_left = status == REFUSED and committed() != self._committed
         if status is not None:
-            self._tell(raised)
+            self._tell(raised, "; what was changed stays changed" if is_left else "")
             _flushed()
-            sys.exit(status)
+            sys.exit(CHANGED if is_left else status)
 
-    def _tell(self, raised: BaseException) -> None:
-        words = "interrupted" if isinstance(raised, KeyboardInterrupt) else str(raised)
+    def _tell(self, raised: BaseException, more: str = "") -> None:
+        words = "interrupted" if isinstance(raised, KeyboardInterrupt) else f"{raised}{more}"
         with contextlib.suppress(OSError):
             print(f"{self._tool}: {printable(words)}", file=sys.stderr, flush=True)
 

@@ -2,6 +2,7 @@
 
 from __future__ import annotations
 
+import contextlib
 import ctypes
 import typing
 from typing import (
@@ -27,7 +28,7 @@ from vswitch._thing import Thing
 from vswitch.options import Options
 from vswitch.port import Port
 from vswitch.switch import Switch
-from vswitch.transaction import Transaction, find_transaction
+from vswitch.transaction import Transaction, commit, find_transaction
 from vswitch.uplink import Uplink, find_port_of
 from vswitch.values import MacLearning, Words, to_words
 
@@ -130,8 +131,8 @@ class Host:
     def mac_learning(self, given: MacLearning) -> None:
         known = _table.SWITCH["mac_learning"]
         held = _words.read(known.form, to_words(known.form, given), "mac_learning")
-        self._note(_undo.HostLearning, self)
-        self._set_mac_learning(MacLearning.from_words(held))
+        with self._writing(_undo.HostLearning, self):
+            self._set_mac_learning(MacLearning.from_words(held))
 
     def _set_mac_learning(self, learning: MacLearning) -> None:
         checked.VSQEX_SetGlobalMACLearningProps(
@@ -160,10 +161,10 @@ class Host:
         switch = Switch(self, alias)
         named = _words.items(uplinks, "uplinks")
         with self._whole():
-            self._note(_undo.Added, switch)
-            checked.VSDVS_CreateVSwitch(
-                alias, identifier, portset, max_ports, persistent, version, mtu, 0
-            )
+            with self._writing(_undo.Added, switch):
+                checked.VSDVS_CreateVSwitch(
+                    alias, identifier, portset, max_ports, persistent, version, mtu, 0
+                )
             for name in named:
                 switch.add_uplink(name)
         return switch
@@ -209,14 +210,27 @@ class Host:
 
     # What transactions are told
 
-    def _note(self, step: Callable[..., _undo.Step], *about: Any) -> None:
-        """Before a write: a transaction notes what is there."""
+    @contextlib.contextmanager
+    def _writing(self, step: Callable[..., _undo.Step], *about: Any) -> Iterator[None]:
+        """Around a write: a transaction notes what is there before it; without one it stays."""
         transaction = find_transaction(self)
         if transaction is not None:
             transaction.note(step(*about))
+            yield
+            return
+        try:
+            yield
+        except HostError as error:
+            # What is refused is not done; what traps may be.
+            if error.status is None:
+                commit()
+            raise
+        commit()
 
-    def _note_properties(self, thing: Thing, keys: Tuple[str, ...]) -> None:
-        self._note(_undo.Properties, thing, keys)
+    def _writing_properties(
+        self, thing: Thing, keys: Tuple[str, ...]
+    ) -> typing.ContextManager[None]:
+        return self._writing(_undo.Properties, thing, keys)
 
     def __repr__(self) -> str:
         return f"<Host{' (simulated)' if self.simulated else ''}: {', '.join(self.switches)}>"

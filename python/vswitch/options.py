@@ -44,8 +44,8 @@ class Options(typing.MutableMapping[str, Option]):
     def __setitem__(self, name: str, value: Option) -> None:
         type_ = self._get(name).type
         held = read_option(name, value, name)
-        self._host._note(_undo.Options, (type_,))
-        checked.VSQEX_SetRuntimeOptions([checked.VSRuntimeOption(type_, held)])
+        with self._host._writing(_undo.Options, (type_,)):
+            checked.VSQEX_SetRuntimeOptions([checked.VSRuntimeOption(type_, held)])
 
     def __delitem__(self, name: str) -> None:
         known = self._get(name)

@@ -194,13 +194,14 @@ class Port(AnyPort):
     ) -> None:
         """Puts an address into its table, static or a user's."""
         entry = checked.VSMACEntry(_words.mac(mac), type, False, vlan, vni)
-        self.host._note(_undo.Macs, self)
-        checked.VSQEX_SetPortMACTable(*self.owner, entry)
+        with self.host._writing(_undo.Macs, self):
+            checked.VSQEX_SetPortMACTable(*self.owner, entry)
 
     def remove_mac(self, mac: str, *, vlan: int = 0) -> None:
         """Takes an address out of its table, whatever its type."""
-        self.host._note(_undo.Macs, self)
-        self._take_mac(_words.mac(mac), vlan)
+        known = _words.mac(mac)
+        with self.host._writing(_undo.Macs, self):
+            self._take_mac(known, vlan)
 
     def _take_mac(self, mac: str, vlan: int) -> None:
         entry = checked.VSMACEntry(mac, MacType.ALL, False, vlan)
@@ -214,8 +215,8 @@ class Port(AnyPort):
 
     def remove(self) -> None:
         """Removes it from its switch."""
-        self.host._note(_undo.RemovedPort, self)
-        self._erase()
+        with self.host._writing(_undo.RemovedPort, self):
+            self._erase()
 
     def _erase(self) -> None:
         checked.VSDVS_RemoveDVPort(*self.owner)

@@ -120,8 +120,8 @@ class Switch(Thing):
     def running(self, runs: bool) -> None:
         _words.flag(runs, "running")
         if runs is not self.running:
-            self.host._note(_undo.Running, self)
-            self._run(runs)
+            with self.host._writing(_undo.Running, self):
+                self._run(runs)
 
     def _run(self, runs: bool) -> None:
         call = checked.DVSQEX_SwitchAssociate if runs else checked.DVSQEX_SwitchDissociate
@@ -243,19 +243,19 @@ class Switch(Thing):
                 self.add_port(id, external_id=external_id)
                 port.connection = connection
             return port
-        self.host._note(_undo.Added, port)
-        if external_id is not None:
-            checked.VSDVS_AddOpaqueDVPort(self.alias, id, external_id)
-        elif connection is not None:
-            checked.VSDVS_AddDVPort(self.alias, id, connection)
-        else:
-            checked.DVSQEX_PortAdd(self.identifier, id)
+        with self.host._writing(_undo.Added, port):
+            if external_id is not None:
+                checked.VSDVS_AddOpaqueDVPort(self.alias, id, external_id)
+            elif connection is not None:
+                checked.VSDVS_AddDVPort(self.alias, id, connection)
+            else:
+                checked.DVSQEX_PortAdd(self.identifier, id)
         return port
 
     def add_uplink(self, name: str) -> Uplink:
         """Attaches an uplink of the host, to the first uplink port without one or to a new one."""
-        self.host._note(_undo.UplinkPorts, self)
-        checked.VSDVS_AddSwitchUplinkPort(self.alias, name)
+        with self.host._writing(_undo.UplinkPorts, self):
+            checked.VSDVS_AddSwitchUplinkPort(self.alias, name)
         return Uplink(self, name)
 
     def set_uplink_ports(self, names: "Mapping[str, str]") -> None:
@@ -263,18 +263,18 @@ class Switch(Thing):
 
         A port that it has keeps its uplink, a new one has none, and what is left out goes.
         """
-        self.host._note(_undo.UplinkPorts, self)
-        checked.VSDVS_SetSwitchUplinkPorts(self.alias, list(names.values()), list(names))
+        with self.host._writing(_undo.UplinkPorts, self):
+            checked.VSDVS_SetSwitchUplinkPorts(self.alias, list(names.values()), list(names))
 
     def _arrange_uplink_ports(self, wanted: Arrangement) -> None:
         """Makes them those, each with its name, its uplink and its properties."""
-        self.host._note(_undo.UplinkPorts, self)
-        arrange(self, wanted)
+        with self.host._writing(_undo.UplinkPorts, self):
+            arrange(self, wanted)
 
     def remove(self) -> None:
         """Removes it from the host, with its ports."""
-        self.host._note(_undo.RemovedSwitch, self)
-        self._erase()
+        with self.host._writing(_undo.RemovedSwitch, self):
+            self._erase()
 
     def _erase(self) -> None:
         checked.VSDVS_DestroyVSwitch(self.alias)

@@ -13,10 +13,24 @@ from vswitch._undo import Step
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
 
-__all__ = ["Transaction", "find_transaction"]
+__all__ = ["Transaction", "commit", "committed", "find_transaction"]
 
 _open: "ContextVar[Tuple[Transaction, ...]]" = ContextVar("open transactions", default=())
 """Those of this thread or task that lie in one another, whatever their hosts."""
+
+
+_committed = 0
+
+
+def commit() -> None:
+    """A change of a host is made that stays."""
+    global _committed
+    _committed += 1
+
+
+def committed() -> int:
+    """How often this process has made such."""
+    return _committed
 
 
 def find_transaction(host: "Host") -> "Optional[Transaction]":
@@ -58,6 +72,8 @@ class Transaction:
         if raised is None:
             if self._outer is not None:
                 self._outer._steps += self._steps
+            elif self._steps:
+                commit()
             return
         # The words of an error name what the host has when they are made: now.
         words = str(raised) or type(raised).__name__

@@ -53,8 +53,8 @@ class Uplink:
     def set_link(self, state: Union[LinkState, str]) -> None:
         """Takes it up or down. The link is up when its cable and its other end are so, too."""
         wanted = link_state(state)
-        self.host._note(_undo.Link, self)
-        self._set(wanted)
+        with self.host._writing(_undo.Link, self):
+            self._set(wanted)
 
     def _set(self, state: LinkState) -> None:
         checked.VSQEX_SetUplinkAdminLinkState(self.switch.alias, self.name, state)
@@ -95,8 +95,8 @@ class Uplink:
 
     def remove(self) -> None:
         """Takes it from its switch, with its uplink port."""
-        self.host._note(_undo.UplinkPorts, self.switch)
-        checked.VSDVS_RemoveSwitchUplinkPort(self.switch.alias, self.name)
+        with self.host._writing(_undo.UplinkPorts, self.switch):
+            checked.VSDVS_RemoveSwitchUplinkPort(self.switch.alias, self.name)
 
     def __str__(self) -> str:
         return self.name

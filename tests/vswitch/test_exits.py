@@ -7,6 +7,8 @@ from pathlib import Path
 from typing import Optional
 
 import pytest
+from simhost import Host
+from vswitch import HostError, exits
 
 PROGRAM = """
 import sys
@@ -81,6 +83,61 @@ def test_how_a_tool_ends(body: str, status: int, stderr: str, tmp_path: Path) ->
     assert (done.stderr, done.stdout, done.returncode) == (stderr, "done\n", status)
 
 
+LAB = "lab = vswitch.Host().switches['vswitch0']; lab.mtu = 9000; print('done'); "
+STAYS = "; what was changed stays changed\n"
+
+
+@pytest.mark.parametrize(
+    "then, status, stderr",
+    [
+        ("", 0, ""),
+        ("lab.host.switches['nope']", 3, f"tool: no switch 'nope' (there are vswitch0){STAYS}"),
+        ("open('/nowhere/file')", 3, "tool: [Errno 2] No such file or directory: '/nowhere/file'"),
+        ("sys.exit('said already')", 1, "said already\n"),
+        ("raise KeyboardInterrupt", 130, "tool: interrupted\n"),
+    ],
+)
+def test_what_a_tool_had_changed_before(
+    then: str, status: int, stderr: str, tmp_path: Path
+) -> None:
+    done = run(LAB + then, tmp_path)
+    assert done.stderr.startswith(stderr)
+    assert (done.stdout, done.returncode) == ("done\n", status)
+    assert done.stderr.endswith(STAYS) is (status == 3)
+
+
+@pytest.mark.parametrize(
+    "body",
+    [
+        "host.switches['vswitch0'].add_uplink('nic99')",
+        "host.switches['vswitch0'].mtu = 99",
+        "with host.transaction():\n    host.switches['vswitch0'].mtu = 9000; host.switches['nope']",
+        "host.add_switch('lab', uplinks=['nic0', 'nic99'])",
+        "with host.switches['vswitch0'].uplinks['nic4'].taken_down():\n    host.switches['nope']",
+        "with next(host.ports()).mirrored('web-2'):\n    host.switches['nope']",
+    ],
+    ids=["refused", "wrong", "rolled back", "whole or not", "an uplink", "a mirror"],
+)
+def test_what_leaves_nothing_changed(body: str, tmp_path: Path) -> None:
+    done = run(f"host = vswitch.Host()\n{body}", tmp_path)
+    assert done.returncode == 1, done.stderr
+    assert "stays changed" not in done.stderr
+
+
+def test_a_write_of_which_nobody_knows_whether_it_is_done(host: Host) -> None:
+    host.fault("VSDVS_SetMTU", panic=(OSError, "the device is gone"))
+    with pytest.raises(SystemExit) as raised, exits("tool"):
+        host.objects.switches["vswitch0"].mtu = 9000
+    assert raised.value.code == 3
+
+
+def test_what_was_changed_before_the_tool(host: Host) -> None:
+    host.objects.switches["vswitch0"].mtu = 9000
+    with pytest.raises(SystemExit) as raised, exits("tool"):
+        host.objects.switches["nope"]
+    assert raised.value.code == 1
+
+
 def test_a_mistake_in_the_tool_keeps_its_traceback(tmp_path: Path) -> None:
     done = run("None.name", tmp_path)
     assert done.returncode == 1 and done.stderr.startswith("Traceback")
@@ -108,18 +165,23 @@ def test_a_closed_pipe_is_no_error(body: str, status: int, tmp_path: Path) -> No
 
 
 @pytest.mark.parametrize(
-    "body, status",
+    "body, status, more",
     [
-        ("print('x' * 2**20)", 1),
-        ("print('x')", 1),
-        ("print('x'); sys.exit()", 1),
-        ("print('x'); sys.exit(3)", 3),
+        ("print('x' * 2**20)", 1, "\n"),
+        ("print('x')", 1, "\n"),
+        ("print('x'); sys.exit()", 1, "\n"),
+        ("print('x'); sys.exit(3)", 3, "\n"),
+        (LAB, 3, STAYS),
+        (f"{LAB}print('x' * 2**20)", 3, STAYS),
     ],
 )
-def test_what_cannot_be_written_is_an_error(body: str, status: int, tmp_path: Path) -> None:
+def test_what_cannot_be_written_is_an_error(
+    body: str, status: int, more: str, tmp_path: Path
+) -> None:
     with open("/dev/full", "w") as full:
         done = run(body, tmp_path, full.fileno())
-    assert (done.stderr, done.returncode) == ("tool: [Errno 28] No space left on device\n", status)
+    said = f"tool: [Errno 28] No space left on device{more}"
+    assert (done.stderr, done.returncode) == (said, status)
 
 
 @pytest.mark.parametrize(
@@ -144,8 +206,6 @@ def test_a_closed_stream_leads_nowhere(
 
 
 def test_as_a_decorator() -> None:
-    from vswitch import HostError, exits
-
     @exits("tool")
     def main() -> None:
         raise HostError("no")
