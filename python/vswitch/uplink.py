@@ -9,7 +9,7 @@ from typing import Iterator, Optional, Tuple, Union
 
 from libvswitch import checked
 from libvswitch.enums import LinkState
-from libvswitch.errors import HostError, NotRestored
+from libvswitch.errors import HostError, NotRestored, NotSupported
 from vswitch import _undo, words as _words
 from vswitch._surely import surely
 
@@ -49,6 +49,11 @@ class Uplink:
     def lacp(self) -> LinkState:
         """Whether link aggregation sees it up."""
         return checked.VSQEX_GetUplinkLACPLinkState(self.switch.alias, self.name)
+
+    @property
+    def speed(self) -> typing.NoReturn:
+        """No call of a host tells it: NotSupported."""
+        raise NotSupported(f"{self.path}: no call of a host tells the speed of an uplink")
 
     def set_link(self, state: Union[LinkState, str]) -> None:
         """Takes it up or down. The link is up when its cable and its other end are so, too."""

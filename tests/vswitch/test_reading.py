@@ -13,6 +13,7 @@ from vswitch import (
     LinkState,
     MacType,
     NotFound,
+    NotSupported,
     Port,
     Switch,
     _table,
@@ -97,6 +98,12 @@ def test_uplinks(host: simhost.Host, lab: Switch, objects: Host) -> None:
         objects.uplinks["nope"]
     with pytest.raises(KeyError, match=r"no uplink 'nic4' of switch 'lab' \(it has nic0, nic1\)"):
         lab.uplinks["nic4"]
+
+
+def test_what_no_call_tells_of_an_uplink(lab: Switch) -> None:
+    said = "lab/nic0: no call of a host tells the speed of an uplink"
+    with pytest.raises(NotSupported, match=f"^{said}$"):
+        lab.uplinks["nic0"].speed
 
 
 def test_uplink_ports(lab: Switch) -> None:
