@@ -43,6 +43,8 @@ def test_a_line_tells_how_far_it_is(lab: SharedHost, tmp_path: Path) -> None:
     assert "drill of lab: nic1, 2 of 2" in on_terminal(lab, "drill", "lab")[1]
     document = tmp_path / "document"
     document.write_text("switches: [{alias: lab, mtu: 1500}]")
+    assert "reading the host" in on_terminal(lab, "backup")[1]
+    assert "reading the host" in on_terminal(lab, "snapshot")[1]
     assert "changing the host" in on_terminal(lab, "apply", str(document), columns=200)[1]
 
 

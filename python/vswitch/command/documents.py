@@ -73,7 +73,9 @@ def backup() -> None:
     """Write the whole host as a document: YAML, or JSON with --json."""
     from vswitch import snapshot
 
-    document = snapshot.backup(host())
+    there = host()
+    with output.progress("reading the host"):
+        document = snapshot.backup(there)
     if is_json():
         output.write_json(document)
     else:
@@ -96,12 +98,16 @@ def snapshot(
     if key_file is not None and not anonymize:
         raise click.UsageError("--key-file: it is for --anonymize")
     key = key_file.read_bytes() if key_file is not None else None
-    output.write_json(host().snapshot(anonymize, key))
+    there = host()
+    with output.progress("reading the host"):
+        document = there.snapshot(anonymize, key)
+    output.write_json(document)
 
 
 def restore(file: Path = _FILE, dry_run: bool = _DRY_RUN) -> None:
     """Make the host what a backup says: switches, ports and settings that are not in it go.
 
-    Links, learned addresses and counters are the host's own, and stay.
+    Uplinks move to the switches and uplink ports where the backup has them. Links, learned
+    addresses and counters are the host's own, and stay.
     """
     _carry_out(plan(str(file), files.read(str(file)), whole=True), dry_run)
