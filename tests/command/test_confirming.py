@@ -2,6 +2,7 @@
 
 import contextlib
 import hashlib
+import json
 import os
 import signal
 import socket
@@ -16,7 +17,7 @@ from simhost import SharedHost
 
 DOCUMENT = '{"switches": [{"alias": "lab", "mtu": 1500, "ports": [{"id": "web-1", "vlan": 8}]}]}'
 CHANGES = "lab/mtu: 9000 -> 1500\nlab/web-1/vlan: id=7 trunk=10-12 -> 8\n"
-FOLDER = Path("/tmp", f"vswitch-{os.getuid()}")
+FOLDER = Path("/var/tmp", f"vswitch-{os.getuid()}")
 # Longer than any test.
 LONG = "600"
 
@@ -143,6 +144,23 @@ def test_ended_early_it_is_taken_back(vswitch: Vswitch, lab: SharedHost) -> None
     os.kill(keeper, signal.SIGTERM)
     until(lambda: not keepers(lab))
     assert state(lab) == before
+
+
+def test_a_host_that_restarts_meanwhile(vswitch: Vswitch, lab: SharedHost) -> None:
+    """What outlasts the restart is taken back, and what does not is no obstacle."""
+    lab.restart()
+    before = state(lab)
+    wanted = json.loads(DOCUMENT)
+    wanted["switches"] += [{"alias": "new", "persistent": False, "ports": [{"id": "a"}]}]
+    done = vswitch("apply", "-", "--confirm-within", LONG, input=json.dumps(wanted))
+    assert done.status == 0
+    lab.restart()
+    assert [one["mtu"] for one in lab.describe()["switches"]] == [1500, 1500]
+    (keeper,) = keepers(lab)
+    os.kill(keeper, signal.SIGTERM)
+    until(lambda: not keepers(lab))
+    assert state(lab) == before
+    assert "the last one was taken back" in vswitch("confirm").stderr
 
 
 def test_killed_somebody_must_look(vswitch: Vswitch, lab: SharedHost) -> None:

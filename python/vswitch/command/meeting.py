@@ -1,8 +1,9 @@
 """Where a change that waits and its confirmation meet: a socket, a lock and a note, of one user.
 
 Their folder does not depend on the environment of a shell, and outlasts its session: who confirms
-may have lost the shell that made the change. There is one of each for a host, or for the state file
-of a simulated one.
+may have lost the shell that made the change. It outlasts the machine, too, for the note says of a
+change that was cut off that it is left. There is one of each for a host, or for the state file of a
+simulated one.
 """
 
 import contextlib
@@ -27,7 +28,7 @@ _PATIENCE = 5
 
 def folder() -> Path:
     """Where this user's changes and confirmations meet, whatever a shell's environment says."""
-    return Path("/tmp", f"vswitch-{os.getuid()}")
+    return Path("/var/tmp", f"vswitch-{os.getuid()}")
 
 
 class Meeting:
