@@ -1,8 +1,10 @@
 """Documents as plans: what would change, what changes, what is refused, what is taken back."""
 
 import copy
+import json
 from typing import Any, Callable, Dict, List, Optional
 
+import libvswitch as vs
 import pytest
 import simhost
 from conftest import LAB
@@ -11,13 +13,20 @@ from vswitch import (
     Change,
     DocumentError,
     Host,
+    MacLearning,
     MacType,
     NotRestored,
     RolledBack,
     Switch,
     Vlan,
+    _settings,
     _table,
+    snapshot,
 )
+from vswitch._thing import own_properties
+from vswitch._undo import kept_macs
+
+RUNTIME = _table.PROPERTY_TYPES["runtime"]
 
 Document = Dict[str, Any]
 
@@ -97,6 +106,57 @@ def test_a_state_is_a_plan_for_an_empty_host(
     plan = objects.plan(state)
     plan.apply()
     assert plan.changes == () and portable(objects.state()) == portable(state)
+
+
+def all_that_is_set(host: Host) -> Dict[str, Any]:
+    """Byte for byte where there are bytes."""
+    held: Dict[str, Any] = {"options": host.options.all(), "mac_learning": host.mac_learning}
+    for switch in host.switches.values():
+        held[f"{switch}: lags"] = switch.lags
+        held[f"{switch}: uplinks"] = {name: one.port for name, one in switch.uplinks.items()}
+        for port in switch.ports.values():
+            held[f"{port.path}: macs"] = kept_macs(port)
+        things = (switch, switch.host_part, *switch.ports.values(), *switch.uplink_ports.values())
+        held.update((one.path, own_properties(one)) for one in things)
+    return held
+
+
+def clear(host: Host) -> None:
+    """Takes away what somebody has set, and moves an uplink."""
+    for switch in host.switches.values():
+        for thing in (*switch.ports.values(), *switch.uplink_ports.values(), switch):
+            for name, known in thing._settings.items():
+                if thing.is_set(name):
+                    _settings.clear(thing, known)
+            for key in own_properties(thing):
+                thing.clear_property(key)
+        for key in own_properties(switch.host_part):
+            switch.host_part.clear_property(key)
+    for port in host.ports():
+        for mac, vlan in kept_macs(port):
+            port.remove_mac(mac, vlan=vlan)
+    for name in host.options:
+        del host.options[name]
+    host.mac_learning = MacLearning()
+    host.switches["vswitch0"].uplinks["nic5"].remove()
+    host.add_switch("new", uplinks=["nic5"]).add_port("a")
+
+
+def test_a_backup_brings_every_byte_back(host: simhost.Host, lab: Switch, objects: Host) -> None:
+    lab.ports["desk-3"].set_property("com.example.raw", b"\0\xff", RUNTIME)
+    vlan = lab.ports["desk-3"].get_property(vs.VSPROP_PORT_VLAN)
+    lab.ports["desk-4"].set_property(vs.VSPROP_PORT_VLAN, vlan, RUNTIME)
+    before = all_that_is_set(objects)
+    document = json.loads(json.dumps(snapshot.backup(objects)))
+    clear(objects)
+    left = all_that_is_set(objects)
+    assert {name for name, held in left.items() if held and held == before.get(name)} == {
+        "lab: lags",
+        "lab: uplinks",
+    }
+    objects.plan(document, whole=True).apply()
+    assert all_that_is_set(objects) == before
+    assert objects.plan(document, whole=True).changes == ()
 
 
 def test_every_key_of_the_lab(host: simhost.Host, objects: Host) -> None:
