@@ -11,17 +11,54 @@ import re
 import subprocess
 import sys
 from pathlib import Path
-from typing import List, NamedTuple
+from typing import Callable, Dict, List, NamedTuple
 
 HERE = Path(__file__).parent
 ROOT = HERE.parent.parent
 BUILD = Path(os.environ.get("FUZZERS_DIR", ROOT / "build-fuzzers"))
 
-NAMES = ["mirror", "properties", "runtime_options", "scenario", "state_image", "tables", "texts"]
+NAMES = [
+    "decoded",
+    "mirror",
+    "properties",
+    "runtime_options",
+    "scenario",
+    "state_image",
+    "tables",
+    "texts",
+]
 """Each is a harness of this folder."""
 
 # A run that takes so long hangs; all take far below a second, sanitizers included.
 PATIENCE = 60
+
+# What stands in a trace: records of each shape, and what calls take and give.
+VALUES = [
+    '{"record": "VSUplinkPorts", "value": {"nUplinkPorts": 2, "uplinkPortName": ["a", "b"]}}',
+    '{"record": "VSMACLearning", "value": {"agingTime": 60, "learnStatic": 1, "reserved": 0,'
+    ' "macLimit": 9}}',
+    '{"record": "VSMcastFilters", "form": 2, "value": {"totalEntries": 1, "numEntries": 1,'
+    ' "ipv4Entries": [7]}}',
+    '{"record": "VSMACTable", "value": {"totalEntries": 1, "numEntries": 1, "macEntries":'
+    ' [{"macAddress": "020000000001", "macAddrType": 0, "aging": 0, "vid": 7, "vni": 0,'
+    ' "elapsed": 0}]}}',
+    '{"record": "VSRuntimeOptions", "value": {"totalLength": 25, "VSRuntimeOptionHeader":'
+    ' [{"type": 1, "length": 8, "data": "14000000"},'
+    ' {"type": 13, "length": 13, "data": "31302e302e302e3900"}]}}',
+    '{"record": "VSLAGTable", "value": {"numLAGs": 1, "VSLAGStatus": [{"state": 0, "id": 1,'
+    ' "name": "lag1", "uplinkLinkupBitmap": 3, "numUplinks": 1, "uplinkNames":'
+    ' [{"string": {"hex": "ff"}}]}]}}',
+    '{"record": "DVMirrorEntity", "value": {"type": 3, "ip": {"isIPv6": 0, "pad": "000000",'
+    ' "ipv4": {"s_addr": 117440522}}}}',
+    '{"call": "DVSQEX_GlobalPropGet", "in": {"switchId": "a", "key": "b"},'
+    ' "out": {"data": {"at": 7, "bytes": "28230000"}, "length": 4}}',
+    '{"call": "VSDVS_SetPrivateVLANMap", "in": {"switchName": "lab", "entries": [{"primaryVID": 5,'
+    ' "secondaryVID": 6, "pvlanType": 2, "pad": ""}], "count": 1}, "out": {}}',
+    '{"call": "DVSData_Data", "in": {"item": {"at": 1}}, "out": {"data": {"at": 2, "bytes":'
+    ' "0a0b"}}, "result": 2}',
+    '{"call": "VSQEX_GetMcastFilterStats", "in": {"switchName": {"hex": "ff"}, "port": 1,'
+    ' "mode": 3, "group": {"unread": "no memory"}, "stats": null}}',
+]
 
 MARKDOWN_EXAMPLE = re.compile(r"```json\n(.*?)```", re.DOTALL)
 
@@ -41,16 +78,20 @@ def documents() -> List[str]:
     return [(simhost / "scenario" / "default_host.json").read_text(encoding="utf-8"), *examples]
 
 
-def vocabulary() -> List[str]:
-    """The keys and texts of all documents."""
-    return sorted(set(re.findall(r'"[^"\\]*"', "\n".join(documents()))))
+TEXTS: Dict[str, Callable[[], List[str]]] = {"decoded": lambda: VALUES, "scenario": documents}
+"""The harnesses that read texts, and some for each."""
+
+
+def vocabulary(name: str) -> List[str]:
+    """The keys and texts of all of a harness."""
+    return sorted(set(re.findall(r'"[^"\\]*"', "\n".join(TEXTS[name]()))))
 
 
 def write_seeds(name: str, folder: Path) -> None:
-    """Documents for the harness that reads them, and for the others, whose inputs are rows of
+    """Texts for the harnesses that read them, and for the others, whose inputs are rows of
     choices, choices at random."""
-    if name == "scenario":
-        for number, document in enumerate(documents()):
+    if name in TEXTS:
+        for number, document in enumerate(TEXTS[name]()):
             (folder / f"seed-{number}").write_text(document, encoding="utf-8")
         return
     chance = random.Random(name)
@@ -59,8 +100,8 @@ def write_seeds(name: str, folder: Path) -> None:
         (folder / f"seed-{number}").write_bytes(bytes(chance.choices(range(256), k=size)))
 
 
-def write_dictionary(file: Path) -> None:
-    lines = [text.replace('"', '\\"') for text in vocabulary()]
+def write_dictionary(name: str, file: Path) -> None:
+    lines = [text.replace('"', '\\"') for text in vocabulary(name)]
     file.write_text("".join(f'"{line}"\n' for line in lines if line.isascii()), encoding="ascii")
 
 
@@ -80,9 +121,10 @@ def run(
     corpus.mkdir(parents=True, exist_ok=True)
     write_seeds(name, corpus)
     options = [f"-seed={seed}", f"-timeout={patience}", "-max_len=4096", "-close_fd_mask=1"]
-    if name == "scenario":
-        write_dictionary(BUILD / "scenario.dict")
-        options.append(f"-dict={BUILD / 'scenario.dict'}")
+    if name in TEXTS:
+        dictionary = BUILD / f"{name}.dict"
+        write_dictionary(name, dictionary)
+        options.append(f"-dict={dictionary}")
     fuzzer = BUILD / "fuzzers" / name
     prefix = f"{_findings() / name}-"
     done = subprocess.run(

@@ -11,6 +11,7 @@ SEED = 20
 
 # How many inputs each tries; together they take some seconds.
 INPUTS = {
+    "decoded": 20_000,
     "mirror": 20_000,
     "properties": 1_500,
     "runtime_options": 20_000,
