@@ -9,7 +9,7 @@ namespace simhost::storage {
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables, by a step of state_format.cpp that brings a file of the
 /// version before forward.
-inline constexpr std::int64_t kSchemaVersion = 4;
+inline constexpr std::int64_t kSchemaVersion = 5;
 /// The version that the first of those steps begins with; what is older is refused.
 inline constexpr std::int64_t kOldestSchema = 3;
 
@@ -19,5 +19,7 @@ extern char const *const kSchema;
 extern char const *const kRunningSchema;
 /// Likewise the generations of the switches that are there.
 extern char const *const kGenerationSchema;
+/// Likewise those of a host whose frames a daemon moves.
+extern char const *const kFramesSchema;
 
 }  // namespace simhost::storage

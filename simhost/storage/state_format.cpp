@@ -16,7 +16,8 @@ namespace simhost::storage {
 namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
-std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{kGenerationSchema};
+std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{kGenerationSchema,
+                                                                      kFramesSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -109,6 +110,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kSchema);
   database.exec(kRunningSchema);
   database.exec(kGenerationSchema);
+  database.exec(kFramesSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

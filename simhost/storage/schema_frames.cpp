@@ -1,0 +1,26 @@
+// The tables of a host whose frames a daemon moves: its devices, and what the daemon is to bring
+// into force.
+#include "storage/schema.h"
+
+namespace simhost::storage {
+
+char const *const kFramesSchema = R"sql(
+  -- A network device is one uplink's or one port's. Its number is what the data path knows it by,
+  -- which has 16 bits, where the numbers of ports have 32 and are used once.
+  CREATE TABLE device (
+    number      INTEGER PRIMARY KEY CHECK (number BETWEEN 1 AND 65279),
+    name        TEXT NOT NULL UNIQUE,
+    uplink      TEXT UNIQUE REFERENCES uplink (name) ON DELETE CASCADE,
+    port        INTEGER UNIQUE REFERENCES port ON DELETE CASCADE,
+    mac         BLOB CHECK (length(mac) = 6),
+    CHECK ((uplink IS NULL) <> (port IS NULL))
+  ) STRICT;
+
+  -- One row from the day on which a daemon first took the host. The change that was committed last is
+  -- the one to bring into force.
+  CREATE TABLE frames (
+    change      INTEGER NOT NULL
+  ) STRICT;
+)sql";
+
+}  // namespace simhost::storage
