@@ -22,6 +22,9 @@ HEADERS = {
     "model": "model/plane.h",
     "planes/stored": "planes/stored/stored_plane.h",
     "planes/openvswitch/openflow": "planes/openvswitch/openflow/flow.h",
+    "planes/openvswitch/reconcile": "planes/openvswitch/reconcile/difference.h",
+    "events": "events/loop.h",
+    "planes/openvswitch/processes": "planes/openvswitch/processes/private_openvswitch.h",
     "scenario": "scenario/scenario.h",
     "abi": "abi/host.h",
     "cli": "cli/commands.h",
@@ -36,6 +39,10 @@ BELOW: Dict[str, List[str]] = {
     "planes/stored": ["base", "storage", "clock", "model"],
     # A language, of which the host knows nothing.
     "planes/openvswitch/openflow": [],
+    "planes/openvswitch/reconcile": ["planes/openvswitch/openflow"],
+    # Waiting, which anything that serves may do.
+    "events": [],
+    "planes/openvswitch/processes": ["events"],
     "scenario": ["base", "storage", "clock", "faults", "model"],
     "abi": ["base", "storage", "clock", "faults", "model", "planes/stored", "scenario"],
     # Of the layers below, only what any program may use.

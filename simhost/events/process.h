@@ -1,0 +1,46 @@
+// A program that runs as a child of this process, and no longer than this process does.
+#pragma once
+
+#include <functional>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "events/loop.h"
+
+namespace simhost::events {
+
+/// A program and its words; what is in `environment` is set beside what this process has.
+struct Command {
+  std::string program;
+  std::vector<std::string> words;
+  std::map<std::string, std::string> environment;
+};
+
+class Process {
+ public:
+  /// Starts it; `ended` is called when it has ended by itself, with how.
+  Process(Loop &loop, Command const &command, std::function<void(std::string)> ended);
+  /// Ends it at once if it still runs.
+  ~Process();
+  Process(Process const &) = delete;
+  Process &operator=(Process const &) = delete;
+
+  [[nodiscard]] int id() const { return id_; }
+  /// Asks it to end, and ends it if it has not done so in that time.
+  void end(Clock::duration patience);
+
+ private:
+  std::string reap();
+
+  int id_;
+  bool runs_ = true;
+  Descriptor descriptor_;
+  std::function<void(std::string)> ended_;
+  Loop::Watch watch_;
+};
+
+/// Runs a program to its end. Throws std::runtime_error, with what it said, if it failed.
+void run(Command const &command);
+
+}  // namespace simhost::events

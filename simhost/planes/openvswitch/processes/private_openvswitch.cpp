@@ -1,0 +1,159 @@
+// Starting and watching ovsdb-server(1) and ovs-vswitchd(8).
+#include "planes/openvswitch/processes/private_openvswitch.h"
+
+#include <fcntl.h>
+#include <fmt/format.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+
+#include <algorithm>
+#include <cstring>
+#include <stdexcept>
+#include <system_error>
+#include <utility>
+
+namespace simhost::openvswitch {
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr auto *kSchema = "/usr/share/openvswitch/vswitch.ovsschema";
+constexpr auto kPatience = 1s;
+// Between two starts of what does not stay up.
+constexpr events::Clock::duration kFirstPause = 50ms;
+constexpr events::Clock::duration kLongestPause = 5s;
+// What ran for so long did stay up.
+constexpr auto kSteady = 10s;
+
+std::filesystem::path made(std::filesystem::path const &folder) {
+  std::error_code error;
+  std::filesystem::create_directories(folder, error);
+  auto absolute = error ? folder : std::filesystem::canonical(folder, error);
+  if (error) {
+    throw std::runtime_error(fmt::format("the folder {} of the Open vSwitch cannot be used: {}",
+                                         folder.string(), error.message()));
+  }
+  // Sockets of bridges are in it, and no address of one may be longer.
+  constexpr std::size_t kLongestFolder = sizeof(sockaddr_un::sun_path) - 32;
+  if (absolute.string().size() > kLongestFolder) {
+    throw std::runtime_error(fmt::format(
+        "the folder {} of the Open vSwitch cannot be used: its name has more than {} bytes",
+        folder.string(), kLongestFolder));
+  }
+  return absolute;
+}
+
+events::Descriptor locked(std::filesystem::path const &folder) {
+  auto const file = folder / "lock";
+  events::Descriptor lock(open(file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, S_IRUSR | S_IWUSR));
+  if (!lock) {
+    throw std::runtime_error(fmt::format("the folder {} of the Open vSwitch cannot be used: {}",
+                                         folder.string(), std::strerror(errno)));
+  }
+  struct flock wanted {};
+  wanted.l_type = F_WRLCK;
+  wanted.l_whence = SEEK_SET;
+  if (fcntl(lock.number(), F_SETLK, &wanted) != 0) {
+    fcntl(lock.number(), F_GETLK, &wanted);
+    throw std::runtime_error(
+        fmt::format("the process {} runs an Open vSwitch in {}", wanted.l_pid, folder.string()));
+  }
+  return lock;
+}
+
+bool takes_connections(std::filesystem::path const &socket_file) {
+  sockaddr_un address{};
+  address.sun_family = AF_UNIX;
+  socket_file.string().copy(static_cast<char *>(address.sun_path), sizeof address.sun_path - 1);
+  events::Descriptor const client(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  return connect(client.number(), reinterpret_cast<sockaddr const *>(&address), sizeof address) ==
+         0;
+}
+
+}  // namespace
+
+PrivateOpenVswitch::PrivateOpenVswitch(events::Loop &loop, std::filesystem::path const &folder,
+                                       Datapath datapath, Told told)
+    : loop_(loop),
+      folder_(made(folder)),
+      datapath_(datapath),
+      told_(std::move(told)),
+      lock_(locked(folder_)) {
+  // What is to be there is told anew, so that nothing of a former run is believed.
+  std::filesystem::remove(folder_ / "conf.db");
+  std::filesystem::remove(folder_ / ".conf.db.~lock~");
+  events::run(command("ovsdb-tool", {"create", "conf.db", kSchema}));
+}
+
+PrivateOpenVswitch::~PrivateOpenVswitch() {
+  if (switch_) {
+    switch_->end(kPatience);
+  }
+  if (database_) {
+    database_->end(kPatience);
+  }
+}
+
+events::Command PrivateOpenVswitch::command(std::string const &program,
+                                            std::vector<std::string> words) const {
+  auto const folder = folder_.string();
+  for (auto &word : words) {
+    if (word == "conf.db") {
+      word = folder + "/conf.db";
+    }
+  }
+  return {.program = program,
+          .words = std::move(words),
+          .environment = {{"OVS_RUNDIR", folder}, {"OVS_LOGDIR", folder}, {"OVS_DBDIR", folder}}};
+}
+
+void PrivateOpenVswitch::start() {
+  started_ = events::Clock::now();
+  start_database();
+  start_switch_when_database_is_there();
+}
+
+void PrivateOpenVswitch::start_database() {
+  std::filesystem::remove(folder_ / "db.sock");
+  auto const folder = folder_.string();
+  database_.emplace(loop_,
+                    command("ovsdb-server", {"-vconsole:off", "-vsyslog:off", "conf.db",
+                                             "--remote=punix:" + folder + "/db.sock",
+                                             "--unixctl=" + folder + "/ovsdb-server.ctl",
+                                             "--log-file=" + folder + "/ovsdb-server.log"}),
+                    [this](std::string const &how) { restart("ovsdb-server " + how); });
+}
+
+void PrivateOpenVswitch::start_switch_when_database_is_there() {
+  if (takes_connections(folder_ / "db.sock")) {
+    start_switch();
+    return;
+  }
+  constexpr auto kLookAgain = 2ms;
+  next_ = loop_.after(kLookAgain, [this] { start_switch_when_database_is_there(); });
+}
+
+void PrivateOpenVswitch::start_switch() {
+  auto const folder = folder_.string();
+  std::vector<std::string> words{"-vconsole:off", "-vsyslog:off", "unix:" + folder + "/db.sock",
+                                 "--unixctl=" + folder + "/ovs-vswitchd.ctl",
+                                 "--log-file=" + folder + "/ovs-vswitchd.log"};
+  if (datapath_ == Datapath::netdev) {
+    words.emplace_back("--disable-system");
+  }
+  switch_.emplace(loop_, command("ovs-vswitchd", std::move(words)),
+                  [this](std::string const &how) { restart("ovs-vswitchd " + how); });
+  told_.started();
+}
+
+void PrivateOpenVswitch::restart(std::string const &why) {
+  auto const lasted = events::Clock::now() - started_;
+  pause_ = lasted > kSteady ? events::Clock::duration{}
+                            : std::clamp(pause_ * 2, kFirstPause, kLongestPause);
+  told_.said(why + ": both processes of Open vSwitch start anew");
+  switch_.reset();
+  database_.reset();
+  next_ = loop_.after(pause_, [this] { start(); });
+}
+
+}  // namespace simhost::openvswitch

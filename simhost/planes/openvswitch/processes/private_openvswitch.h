@@ -1,0 +1,58 @@
+// An Open vSwitch of our own: its two processes in a folder, watched, and gone with this process.
+#pragma once
+
+#include <filesystem>
+#include <functional>
+#include <optional>
+#include <string>
+
+#include "events/process.h"
+
+namespace simhost::openvswitch {
+
+/// Which of Open vSwitch's data paths moves the frames.
+enum class Datapath { netdev, system };
+
+/// If one of the two processes ends by itself, both are started anew: the switch without its
+/// database stops all frames, and finds back to it more slowly than it starts.
+class PrivateOpenVswitch {
+ public:
+  struct Told {
+    /// The database takes connections; the switch has been started, and reads it.
+    std::function<void()> started;
+    /// A sentence for the log.
+    std::function<void(std::string const &)> said;
+  };
+
+  /// Makes the folder if it is not there. Throws std::runtime_error if it cannot be used or another
+  /// process uses it.
+  PrivateOpenVswitch(events::Loop &loop, std::filesystem::path const &folder, Datapath datapath,
+                     Told told);
+  /// Ends both processes, in order.
+  ~PrivateOpenVswitch();
+  PrivateOpenVswitch(PrivateOpenVswitch const &) = delete;
+  PrivateOpenVswitch &operator=(PrivateOpenVswitch const &) = delete;
+
+  void start();
+
+ private:
+  void start_database();
+  void start_switch_when_database_is_there();
+  void start_switch();
+  void restart(std::string const &why);
+  [[nodiscard]] events::Command command(std::string const &program,
+                                        std::vector<std::string> words) const;
+
+  events::Loop &loop_;
+  std::filesystem::path folder_;
+  Datapath datapath_;
+  Told told_;
+  events::Descriptor lock_;
+  std::optional<events::Process> database_;
+  std::optional<events::Process> switch_;
+  events::Clock::time_point started_;
+  events::Clock::duration pause_ = {};
+  events::Loop::Timer next_;
+};
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,35 @@
+// What is to be told to a switch so that it has the flows and groups that are wanted of it, and
+// what nobody wants changed stays with its counters.
+#pragma once
+
+#include <span>
+#include <vector>
+
+#include "planes/openvswitch/openflow/flow.h"
+#include "planes/openvswitch/openflow/group.h"
+
+namespace simhost::openvswitch {
+
+/// To be done in the order of the members, all of it or nothing.
+struct Difference {
+  std::vector<openflow::Group> added_groups;
+  std::vector<openflow::Group> changed_groups;
+  /// At places that have none, or one that is other than by its actions; that one goes.
+  std::vector<openflow::Flow> added_flows;
+  /// Other actions for flows that stay, with their counters.
+  std::vector<openflow::Flow> changed_flows;
+  std::vector<openflow::Flow> removed_flows;
+  std::vector<openflow::GroupId> removed_groups;
+
+  [[nodiscard]] bool empty() const;
+};
+
+/// What the switch learned by a wanted flow stays: what is in the table of one of their Learn
+/// actions, with its cookie. No two flows of either list have one place, and no two groups one
+/// number.
+Difference difference(std::span<openflow::Flow const> present_flows,
+                      std::span<openflow::Group const> present_groups,
+                      std::span<openflow::Flow const> wanted_flows,
+                      std::span<openflow::Group const> wanted_groups);
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,177 @@
+// A loop does what is waited for, and no more once nobody waits.
+#include "events/loop.h"
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <unistd.h>
+
+#include <array>
+#include <csignal>
+#include <string>
+#include <vector>
+
+#include "events/process.h"
+#include "events/signals.h"
+
+namespace {
+
+using simhost::events::Command;
+using simhost::events::Descriptor;
+using simhost::events::Loop;
+using simhost::events::Process;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::StrEq;
+using namespace std::chrono_literals;
+
+struct Pipe {
+  Pipe() {
+    std::array<int, 2> ends{};
+    if (pipe2(ends.data(), O_CLOEXEC | O_NONBLOCK) == 0) {
+      out = Descriptor(ends[0]);
+      in = Descriptor(ends[1]);
+    }
+  }
+  void write_one() const { ASSERT_EQ(write(in.number(), "x", 1), 1); }
+  [[nodiscard]] char read_one() const {
+    char one = 0;
+    return read(out.number(), &one, 1) == 1 ? one : '\0';
+  }
+  Descriptor out;
+  Descriptor in;
+};
+
+TEST(ALoop, DoesWhatADescriptorIsWatchedFor) {
+  Loop loop;
+  Pipe const pipe;
+  int seen = 0;
+  auto watch = loop.watch(pipe.out.number(), [&] {
+    EXPECT_EQ(pipe.read_one(), 'x');
+    ++seen;
+  });
+  loop.turn(0ms);
+  EXPECT_EQ(seen, 0);
+  pipe.write_one();
+  loop.turn(10s);
+  EXPECT_EQ(seen, 1);
+  watch.end();
+  pipe.write_one();
+  loop.turn(0ms);
+  EXPECT_EQ(seen, 1);
+}
+
+TEST(ALoop, LeavesOneAloneThatAnotherEndedInTheSameTurn) {
+  Loop loop;
+  Pipe const one;
+  Pipe const other;
+  std::vector<int> seen;
+  Loop::Watch watches[2];
+  auto const ends_the_other = [&](int own) {
+    return [&, own] {
+      seen.push_back(own);
+      watches[1 - own].end();
+    };
+  };
+  watches[0] = loop.watch(one.out.number(), ends_the_other(0));
+  watches[1] = loop.watch(other.out.number(), ends_the_other(1));
+  one.write_one();
+  other.write_one();
+  loop.turn(10s);
+  EXPECT_EQ(seen.size(), 1U);
+}
+
+TEST(ALoop, MayReplaceAWatchWithinItsOwnWork) {
+  Loop loop;
+  Pipe const pipe;
+  std::string seen;
+  Loop::Watch watch;
+  watch = loop.watch(pipe.out.number(), [&] {
+    watch.end();
+    watch = loop.watch(pipe.out.number(), [&] { seen += pipe.read_one(); });
+  });
+  pipe.write_one();
+  loop.turn(10s);
+  loop.turn(10s);
+  EXPECT_THAT(seen, StrEq("x"));
+}
+
+TEST(ALoop, DoesWhatIsDueInItsOrderAndOnce) {
+  Loop loop;
+  std::vector<int> seen;
+  auto const second = loop.after(2ms, [&] {
+    seen.push_back(2);
+    loop.stop();
+  });
+  auto const first = loop.after(1ms, [&] { seen.push_back(1); });
+  auto never = loop.after(1ms, [&] { seen.push_back(3); });
+  EXPECT_TRUE(static_cast<bool>(never));
+  never.end();
+  loop.run();
+  EXPECT_THAT(seen, ElementsAre(1, 2));
+  EXPECT_FALSE(static_cast<bool>(first));
+}
+
+TEST(Signals, AreTakenByTheLoop) {
+  Loop loop;
+  int seen = 0;
+  simhost::events::Signals const signals(loop, {SIGUSR1}, [&](int number) { seen = number; });
+  raise(SIGUSR1);
+  loop.turn(10s);
+  EXPECT_EQ(seen, SIGUSR1);
+}
+
+std::string how_it_ends(std::string const &script) {
+  Loop loop;
+  std::string said;
+  Process const process(loop,
+                        {.program = "sh", .words = {"-c", script}, .environment = {{"A", "7"}}},
+                        [&](std::string const &how) {
+                          said = how;
+                          loop.stop();
+                        });
+  loop.run();
+  return said;
+}
+
+TEST(AProcess, TellsHowItEnded) {
+  EXPECT_THAT(how_it_ends("exit $A"), StrEq("ended with status 7"));
+  EXPECT_THAT(how_it_ends("kill -9 $$"), StrEq("was ended by signal 9"));
+}
+
+TEST(AProcess, EndsWithItsOwner) {
+  Loop loop;
+  int id = 0;
+  {
+    Process const process(loop, {.program = "sleep", .words = {"600"}, .environment = {}},
+                          [](std::string const &) {});
+    id = process.id();
+    EXPECT_EQ(kill(id, 0), 0);
+  }
+  EXPECT_EQ(kill(id, 0), -1);
+}
+
+TEST(AProcess, ThatDoesNotEndWhenItIsAskedIsEnded) {
+  Loop loop;
+  Pipe const pipe;
+  Process process(loop,
+                  {.program = "sh",
+                   .words = {"-c", "trap '' TERM; while :; do sleep 1; done"},
+                   .environment = {}},
+                  [](std::string const &) { ADD_FAILURE() << "it ended by itself"; });
+  process.end(10ms);
+  EXPECT_EQ(kill(process.id(), 0), -1);
+}
+
+TEST(AProgram, ThatFailsIsToldWithWhatItSaid) {
+  try {
+    simhost::events::run(
+        {.program = "sh", .words = {"-c", "echo no luck; exit 3"}, .environment = {}});
+    ADD_FAILURE() << "it did not fail";
+  } catch (std::runtime_error const &error) {
+    EXPECT_THAT(error.what(), HasSubstr("sh ended with status 3: no luck"));
+  }
+  EXPECT_THROW(simhost::events::run({.program = "/nowhere/x", .words = {}, .environment = {}}),
+               std::runtime_error);
+}
+
+}  // namespace

@@ -1,0 +1,99 @@
+// A private Open vSwitch starts, comes back after a kill, and leaves nothing running.
+#include "planes/openvswitch/processes/private_openvswitch.h"
+
+#include <gmock/gmock.h>
+
+#include <chrono>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <string>
+
+#include "temporary_folder.h"
+
+namespace {
+
+using simhost::events::Loop;
+using simhost::openvswitch::Datapath;
+using simhost::openvswitch::PrivateOpenVswitch;
+using testing::HasSubstr;
+
+// The processes whose command lines name the folder.
+std::vector<int> processes_in(std::filesystem::path const &folder) {
+  std::vector<int> found;
+  for (auto const &entry : std::filesystem::directory_iterator("/proc")) {
+    std::ifstream file(entry.path() / "cmdline");
+    std::string const line(std::istreambuf_iterator<char>(file), {});
+    if (line.find(folder.string()) != std::string::npos) {
+      found.push_back(std::stoi(entry.path().filename()));
+    }
+  }
+  return found;
+}
+
+// Likewise, once there are two: a child has its parent's command line until it has become a
+// program.
+std::vector<int> both_processes_in(std::filesystem::path const &folder) {
+  auto const deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
+  auto found = processes_in(folder);
+  while (found.size() < 2 && std::chrono::steady_clock::now() < deadline) {
+    found = processes_in(folder);
+  }
+  return found;
+}
+
+struct AnOpenVswitch : testing::Test {
+  [[nodiscard]] std::filesystem::path own() const { return folder.file("ovs"); }
+  PrivateOpenVswitch::Told told() {
+    return {.started = [this] { loop.stop(); },
+            .said = [this](std::string const &text) { said += text + "\n"; }};
+  }
+
+  TemporaryFolder folder;
+  Loop loop;
+  std::string said;
+};
+
+TEST_F(AnOpenVswitch, StartsAndEndsWithItsOwner) {
+  {
+    PrivateOpenVswitch openvswitch(loop, own(), Datapath::netdev, told());
+    openvswitch.start();
+    loop.run();
+    EXPECT_EQ(both_processes_in(own()).size(), 2U);
+  }
+  EXPECT_TRUE(processes_in(own()).empty());
+  EXPECT_EQ(said, "");
+}
+
+TEST_F(AnOpenVswitch, ComesBackWhole) {
+  PrivateOpenVswitch openvswitch(loop, own(), Datapath::netdev, told());
+  openvswitch.start();
+  loop.run();
+  for (auto const which : {0, 1}) {
+    auto const before = both_processes_in(own());
+    ASSERT_EQ(before.size(), 2U);
+    kill(before.at(static_cast<std::size_t>(which)), SIGKILL);
+    loop.run();
+    for (auto const process : both_processes_in(own())) {
+      EXPECT_THAT(before, testing::Not(testing::Contains(process)));
+    }
+  }
+  EXPECT_THAT(said, HasSubstr("was ended by signal 9: both processes of Open vSwitch start anew"));
+}
+
+TEST_F(AnOpenVswitch, IsRefusedWhereItCannotBe) {
+  auto const refusal = [&](std::filesystem::path const &where) -> std::string {
+    try {
+      PrivateOpenVswitch const refused(loop, where, Datapath::netdev, told());
+    } catch (std::runtime_error const &error) {
+      return error.what();
+    }
+    return {};
+  };
+  EXPECT_THAT(refusal("/proc/nowhere"),
+              HasSubstr("the folder /proc/nowhere of the Open vSwitch cannot be used: "));
+  EXPECT_THAT(refusal(folder.file(std::string(100, 'x').c_str())),
+              HasSubstr("its name has more than"));
+}
+
+}  // namespace
