@@ -9,18 +9,20 @@ turns; of each the fastest counts. A ratio above its target, and what noise may 
 """
 
 import ctypes
+import enum
 import json
 import os
 import subprocess
 import sys
 from time import thread_time_ns
-from typing import Any, Callable, Dict, List
+from typing import Any, Callable, Dict, List, Type
 
 for _variable in ("SIMHOST_STATE", "SIMHOST_SCENARIO"):
     os.environ.pop(_variable, None)
 
 import _libvswitch as flat  # noqa: E402  (after the environment is clean)
 import libvswitch as vs  # noqa: E402
+from libvswitch.enums import Balance, Criteria, Forbid, MacType, TeamFlags  # noqa: E402
 from targets import NOISE  # noqa: E402
 from vswitch import Host  # noqa: E402
 
@@ -28,6 +30,15 @@ STATE, IMPORT = 2.0, 2.5
 STANDARD = "argparse, dataclasses, enum, json"
 
 Said = Dict[str, Any]
+
+FAMILIES: Dict[str, Type[enum.Enum]] = {
+    "balance": Balance,
+    "criteria": Criteria,
+    "flags": TeamFlags,
+    "forbids": Forbid,
+    "type": MacType,
+}
+"""The members of a state that are numbers to the flat module."""
 
 
 def populate(switches: int, ports: int) -> None:
@@ -108,11 +119,15 @@ def teaming(switch: str) -> Said:
         "criteria": flat.VSTeamPolicy_linkCriteria_get(policy),
         "flags": flat.VSTeamPolicy_flags_get(policy),
         "speed": flat.VSTeamPolicy_speed_get(policy),
-        "full_duplex": flat.VSTeamPolicy_fullDuplex_get(policy),
+        "full_duplex": bool(flat.VSTeamPolicy_fullDuplex_get(policy)),
         "error_percent": flat.VSTeamPolicy_percentError_get(policy),
-        "active": flat.VSTeamPolicy_numActive_get(policy),
-        "standby": flat.VSTeamPolicy_numStandby_get(policy),
     }
+    active, standby = (
+        flat.VSTeamPolicy_numActive_get(policy),
+        flat.VSTeamPolicy_numStandby_get(policy),
+    )
+    names = [flat.VSTeamPolicy___getitem__(policy, at) for at in range(active + standby)]
+    said["active"], said["standby"] = names[:active], names[active:]
     flat.delete_VSTeamPolicy(policy)
     return said
 
@@ -125,11 +140,16 @@ def vlan(switch: str, port: str) -> Said:
     for at in range(flat.VSPortVlanPolicy_numRanges_get(policy)):
         one = flat.vidrangeArray_getitem(ranges, at)
         ends = flat.qex_NEBPortVIDRange_minVID_get(one), flat.qex_NEBPortVIDRange_maxVID_get(one)
-        trunk.append(str(ends[0]) if ends[0] == ends[1] else "%d-%d" % ends)
+        trunk.append(ends[0] if ends[0] == ends[1] else "%d-%d" % ends)
     flags = flat.VSPortVlanPolicy_flags_get(policy)
-    said = {"id": flat.VSPortVlanPolicy_vlanID_get(policy), "trunk": trunk, "flags": flags}
+    said = {"id": flat.VSPortVlanPolicy_vlanID_get(policy), "trunk": trunk}
     flat.VSDVS_FreeMemory(policy)
-    return {**said, "priority": priority}
+    more = {
+        "guest_tagging": bool(flags & flat.VSPORT_VLAN_GUEST_TAGGING),
+        "private": bool(flags & flat.VSPORT_VLAN_PVLAN_ENABLED),
+        "priority": None if priority < 0 else priority,
+    }
+    return {**said, **{name: held for name, held in more.items() if held not in (False, None)}}
 
 
 def forbids(switch: str, port: str) -> int:
@@ -163,6 +183,10 @@ def switch(handle: Any, name: Any) -> Said:
     said["max_ports"], said["version"] = flat.DVS_GetMaxPorts(handle), flat.DVS_Version(handle)
     status, said["portset"] = flat.DVSAliasToPortsetName(alias)
     check(status)
+    info = flat.new_VSInfo()
+    said["running"] = flat.VSQEX_GetVSInfo(alias, info) == flat.QEX_OK
+    said["mtu"] = flat.VSInfo_mtu_get(info)
+    flat.delete_VSInfo(info)
     held = properties(flat.DVSState_GlobalPropForEach, handle)
     properties(flat.DVSState_HostPropForEach, handle)
     if flat.VSPROP_SWITCH_TEAMING in held:
@@ -170,11 +194,15 @@ def switch(handle: Any, name: Any) -> Said:
     status, names, ids = flat.VSDVS_GetSwitchUplinkPorts(alias)
     check(status)
     count = flat.VSUplinkPortIds_nUplinkPorts_get(ids)
-    for_uplinks = {flat.VSUplinkPortIds___getitem__(ids, at) for at in range(count)}
+    for_uplinks = [flat.VSUplinkPortIds___getitem__(ids, at) for at in range(count)]
+    said["uplink_ports"] = [{"id": id_} for id_ in for_uplinks]
     flat.VSDVS_FreeMemory(names)
     flat.VSDVS_FreeMemory(ids)
     status, uplinks = flat.VSQEX_GetUplinks(alias)
     check(status)
+    said["uplinks"] = [
+        flat.VSUplinks___getitem__(uplinks, at) for at in range(flat.VSUplinks___len__(uplinks))
+    ]
     flat.VSQEX_FreeMemory(uplinks)
     ports = [(one, flat.DVS_PortId(one)) for one in each(flat.DVSState_PortForEach, handle)]
     said["ports"] = [port(alias, one, id_, name) for one, id_ in ports if id_ not in for_uplinks]
@@ -196,32 +224,30 @@ def objects_state() -> List[Said]:
     return switches
 
 
-def same(ours: List[Said], theirs: List[Said]) -> bool:
-    """Whether both found the same, as far as they say it in the same words."""
-    plain = ("id", "observed", "addresses")
-    for one in (*ours, *theirs):
-        for known in one["ports"]:
-            for entry in known["addresses"]:
-                entry["type"] = str(vs_type(entry["type"]))
-    return [
-        (one["alias"], [{key: known[key] for key in plain} for known in one["ports"]])
-        for one in ours
-    ] == [
-        (one["alias"], [{key: known[key] for key in plain} for known in one["ports"]])
-        for one in theirs
-    ]
+def in_words(found: Any, name: str = "") -> Any:
+    """What the flat module found, as documents say it; the name is that of the member."""
+    if isinstance(found, dict):
+        return {one: in_words(held, one) for one, held in found.items()}
+    if name in FAMILIES:
+        family = FAMILIES[name]
+        words = str(family(found))
+        return words.split(",") if issubclass(family, enum.Flag) else words
+    return [in_words(one) for one in found] if isinstance(found, list) else found
 
 
-def vs_type(given: Any) -> Any:
-    from libvswitch.enums import MacType
-
-    return given if isinstance(given, str) else MacType(given)
+def same(ours: Any, theirs: Any) -> bool:
+    """Whether objects say all that the flat module found; they say more of some things."""
+    if isinstance(theirs, dict):
+        return all(name in ours and same(ours[name], one) for name, one in theirs.items())
+    if isinstance(theirs, list):
+        return len(ours) == len(theirs) and all(map(same, ours, theirs))
+    return type(ours) is type(theirs) and bool(ours == theirs)
 
 
 def measure(switches: int, rounds: int) -> Dict[str, float]:
     """Seconds of a state, of each."""
     populate(switches, switches)
-    if not same(objects_state(), flat_state()):
+    if not same(objects_state(), in_words(flat_state())):
         raise SystemExit("objects and the flat module do not find the same")
     asks: Dict[str, Callable[[], object]] = {"flat": flat_state, "objects": objects_state}
     best = dict.fromkeys(asks, float("inf"))
