@@ -35,6 +35,7 @@ def main() -> None:
         for name, said in (("NUMBERS", numbers), ("DEFAULTS", defaults)):
             held = pprint.pformat(said, width=100, sort_dicts=False)
             file.write(f"\n{name} = {held}\n")
+        file.write(f"\nLONGEST_KEY = {reference['longest_key']}\n")
 
 
 if __name__ == "__main__":

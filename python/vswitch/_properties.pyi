@@ -6,3 +6,4 @@ PROPERTIES: Tuple[Dict[str, Any], ...]
 RUNTIME_OPTIONS: Tuple[Dict[str, Any], ...]
 NUMBERS: Dict[str, Dict[str, Tuple[int, int]]]
 DEFAULTS: Dict[str, Dict[str, Any]]
+LONGEST_KEY: int

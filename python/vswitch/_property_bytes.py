@@ -14,6 +14,7 @@ import libvswitch as _vs
 from libvswitch import _pointers
 from libvswitch.enums import Forbid
 from vswitch import _records, _settings, _table
+from vswitch._properties import LONGEST_KEY
 from vswitch._table import Property
 from vswitch.mirroring import Mirror
 from vswitch.values import MacLearning, PrivateVlan, Teaming, Vlan
@@ -27,7 +28,6 @@ _SIZES = _pointers.record_sizes()
 _WORD = struct.Struct("=I")
 _RANGE = struct.Struct("=HH")
 _ENTRY = struct.Struct("=HHI")
-_LONGEST_KEY = 255
 _VLAN_FLAGS = (
     _vs.VSPORT_VLAN_GUEST_TAGGING | _vs.VSPORT_VLAN_PVLAN_ENABLED | _vs.VSPORT_VLAN_SET_PRIORITY
 )
@@ -197,8 +197,8 @@ def check(scope: str, key: str, held: Held) -> None:
     """ValueError for a property that no document gives a thing of that scope, a "switch", the
     "host"'s part of one or a "port"; of keys without a meaning any bytes do."""
     known = _table.BY_KEY.get(key)
-    if not 0 < len(key.encode()) <= _LONGEST_KEY:
-        raise ValueError(f"a key has {_LONGEST_KEY} bytes at most")
+    if not 0 < len(key.encode()) <= LONGEST_KEY:
+        raise ValueError(f"a key has {LONGEST_KEY} bytes at most")
     if known is None:
         return
     if known.scope != scope:

@@ -3,6 +3,7 @@
 
 #include "model/options/host_settings.h"
 #include "model/options/runtime_options.h"
+#include "model/properties/longest_key.h"
 #include "model/properties/registry.h"
 #include "scenario/forms.h"
 #include "scenario/keys.h"
@@ -121,6 +122,7 @@ Json objects_to_json() {
 
 std::string reference() {
   Json all{{"properties", Json::array()},
+           {"longest_key", kLongestKey},
            {"runtime_options", Json::array()},
            {"objects", objects_to_json()},
            {"keys",

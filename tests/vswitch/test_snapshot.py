@@ -16,6 +16,7 @@ from libvswitch import checked
 from test_faults import NO_STATUS, names
 from test_transaction import everything
 from vswitch import DocumentError, Host, MacType, Port, Switch, _table, snapshot
+from vswitch._properties import LONGEST_KEY
 
 ROOT = Path(__file__).parents[2]
 SCENARIOS = (ROOT / "simhost" / "SCENARIOS.md").read_text(encoding="utf-8")
@@ -331,12 +332,15 @@ ODD = {
     "com.quorix.common.port.block": b"\2",
     "com.quorix.vswitch.mtu": bytes([0, 6, 0, 0]),
     "com.quorix.common.port.alias": b"no end",
+    # One byte more than the host takes.
+    "k" * (LONGEST_KEY + 1): b"any",
 }
 
 
 def test_bytes_that_no_document_says(
     host: simhost.Host, lab: Switch, objects: Host, monkeypatch: pytest.MonkeyPatch
 ) -> None:
+    lab.ports["desk-4"].set_property("k" * LONGEST_KEY, b"any", RUNTIME)
     look = Port.properties
     odd = {key: checked.DVSDataItem(key, data, RUNTIME) for key, data in ODD.items()}
 

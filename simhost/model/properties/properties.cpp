@@ -8,12 +8,11 @@
 
 #include "base/outcomes.h"
 #include "base/utf8.h"
+#include "model/properties/longest_key.h"
 #include "storage/store.h"
 
 namespace simhost {
 namespace {
-
-constexpr std::size_t kLongestKey = 255;
 
 // The setting of that key, if such an owner has it.
 Descriptor const *find_meant(storage::PropertyOwner const &owner, std::string_view name) {
