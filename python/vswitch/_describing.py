@@ -30,7 +30,6 @@ Properties = Dict[str, Dict[str, str]]
 T = TypeVar("T")
 Described = TypeVar("Described", bound=Thing)
 
-_TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
 # As a text in a document it would clear the setting.
 _ABSENT = ABSENT.encode() + b"\0"
 
@@ -48,12 +47,9 @@ def carrier_name(number: int) -> Optional[str]:
         return None
 
 
-def property_words(item: Item) -> Dict[str, str]:
+def property_words(data: bytes, type_: int) -> Dict[str, str]:
     """A property byte for byte."""
-    return {
-        "type": _TYPES.get(item.propertyType, str(item.propertyType)),
-        "hex": item.data.hex(),
-    }
+    return {"type": _table.word_for(_table.PROPERTY_TYPES, type_), "hex": data.hex()}
 
 
 class Description:
@@ -229,7 +225,7 @@ class Description:
     def other_properties(self, thing: Thing, said: Said, held: Dict[str, Item]) -> Properties:
         named = self.said_by(thing, said, held)
         return {
-            key: property_words(item)
+            key: property_words(item.data, item.propertyType)
             for key, item in sorted(held.items())
             if key not in _table.COMPUTED and (key not in named or item.data == _ABSENT)
         }

@@ -13,10 +13,9 @@ from typing import Any, Callable, Dict, List, Mapping, Tuple
 import libvswitch as _vs
 from libvswitch import _pointers
 from libvswitch.enums import Forbid
-from vswitch import _records, _settings, _table
+from vswitch import _records, _sessions, _settings, _table
 from vswitch._properties import LONGEST_KEY
 from vswitch._table import Property
-from vswitch.mirroring import Mirror
 from vswitch.values import MacLearning, PrivateVlan, Teaming, Vlan
 
 __all__ = ["bytes_of", "check", "value_of"]
@@ -79,28 +78,12 @@ def _filter(data: bytes) -> Any:
 
 
 def _private_vlans(data: bytes) -> Tuple[PrivateVlan, ...]:
-    words = {number: word for word, number in _table.choices(PrivateVlan._form, "type").items()}
-    return tuple(
-        PrivateVlan.known(primary=primary, secondary=secondary, type=words.get(kind, str(kind)))
-        for primary, secondary, kind in _each(_ENTRY, data)
-    )
+    return tuple(_records.private_vlan_of(*entry) for entry in _each(_ENTRY, data))
 
 
 def _private_vlan_bytes(vlans: Tuple[PrivateVlan, ...]) -> bytes:
     numbers = _table.choices(PrivateVlan._form, "type")
     return b"".join(_ENTRY.pack(one.primary, one.secondary, numbers[one.type]) for one in vlans)
-
-
-def _mirrors(data: bytes) -> Tuple[Mirror, ...]:
-    from vswitch import _sessions
-
-    return _sessions.known_mirrors_from(data)
-
-
-def _mirror_bytes(mirrors: Tuple[Mirror, ...]) -> bytes:
-    from vswitch import _sessions
-
-    return _sessions.mirror_bytes(mirrors)
 
 
 def _vlan(data: bytes) -> Vlan:
@@ -110,13 +93,7 @@ def _vlan(data: bytes) -> Vlan:
     ranges = _each(_RANGE, data[size:])
     if policy.flags & ~_VLAN_FLAGS or policy.numRanges != len(ranges):
         raise ValueError("no VLANs of a port")
-    trunk = ",".join(f"{a}" if a == b else f"{a}-{b}" for a, b in ranges)
-    return Vlan.known(
-        id=policy.vlanID,
-        trunk=trunk or None,
-        private=bool(policy.flags & _vs.VSPORT_VLAN_PVLAN_ENABLED),
-        guest_tagging=bool(policy.flags & _vs.VSPORT_VLAN_GUEST_TAGGING),
-    )
+    return _records.vlan_of(policy, ranges)
 
 
 def _vlan_bytes(vlan: Vlan) -> bytes:
@@ -142,7 +119,7 @@ _FORMS: Dict[str, _Form] = {
         _records.port_learning_from, _records.port_learning_bytes
     ),
     _vs.VSPROP_PORT_EXTRA_ETH_FRP: _Form(_filter, lambda value: _bytes(_records.filter_of(value))),
-    _vs.VSPROP_PORT_MIRROR_SESSIONS: _Form(_mirrors, _mirror_bytes),
+    _vs.VSPROP_PORT_MIRROR_SESSIONS: _Form(_sessions.known_mirrors_from, _sessions.mirror_bytes),
 }
 _FORMS[_vs.VSPROP_PORT_TEAMING_POLICY] = _FORMS[_vs.VSPROP_SWITCH_TEAMING]
 _FORMS[_vs.VSPROP_SWITCH_UPLINK_MIRROR_SESSIONS] = _FORMS[_vs.VSPROP_PORT_MIRROR_SESSIONS]

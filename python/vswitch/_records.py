@@ -3,13 +3,13 @@
 from __future__ import annotations
 
 import struct
-from typing import Any, List
+from typing import Any, Iterable, List, Optional, Sequence, Union
 
 import libvswitch as _vs
 from libvswitch import _pointers, checked
 from libvswitch.enums import Balance, Criteria, EthernetFilter, TeamFlags
 from vswitch import _table
-from vswitch.values import FrameFilter, MacLearning, PortMacLearning, Teaming, Vlan
+from vswitch.values import FrameFilter, MacLearning, PortMacLearning, PrivateVlan, Teaming, Vlan
 
 _SIZES = _pointers.record_sizes()
 
@@ -48,11 +48,19 @@ def policy_of(teaming: Teaming) -> _vs.VSTeamPolicy:
 def vlan_from(told: checked.VSDVS_GetPortVLANPolicyResult) -> Vlan:
     policy, priority = told
     ranges = [(one.minVID, one.maxVID) for one in policy.vidRanges]
+    return vlan_of(policy, ranges, None if priority < 0 else priority)
+
+
+def vlan_of(
+    policy: Union[_vs.VSPortVlanPolicy, checked.VSPortVlanPolicy],
+    ranges: Iterable[Sequence[int]],
+    priority: Optional[int] = None,
+) -> Vlan:
     trunk = ",".join(str(first) if first == last else f"{first}-{last}" for first, last in ranges)
     return Vlan.known(
         id=policy.vlanID,
         trunk=trunk or None,
-        priority=None if priority < 0 else priority,
+        priority=priority,
         private=bool(policy.flags & _vs.VSPORT_VLAN_PVLAN_ENABLED),
         guest_tagging=bool(policy.flags & _vs.VSPORT_VLAN_GUEST_TAGGING),
     )
@@ -65,6 +73,11 @@ def ranges_of(vlan: Vlan) -> List[checked.qex_NEBPortVIDRange]:
             first, _, last = part.partition("-")
             found.append(checked.qex_NEBPortVIDRange(int(first), int(last or first)))
     return found
+
+
+def private_vlan_of(primary: int, secondary: int, kind: int) -> PrivateVlan:
+    word = _table.word_for(_table.choices(PrivateVlan._form, "type"), kind)
+    return PrivateVlan.known(primary=primary, secondary=secondary, type=word)
 
 
 def learning_from(told: Any) -> MacLearning:
@@ -86,13 +99,12 @@ def port_learning_from(data: bytes) -> PortMacLearning:
     held = _vs.VSPMACManagement()
     _fill(held, data)
     inner = held.portMACLearning
-    choices = _table.choices(PortMacLearning._form, "limit_policy")
-    policies = {number: word for word, number in choices.items()}
+    policies = _table.choices(PortMacLearning._form, "limit_policy")
     return PortMacLearning.known(
         learning=inner.learning,
         flooding=inner.flooding,
         limit=inner.macLimit,
-        limit_policy=policies.get(inner.macLimitPolicy, str(inner.macLimitPolicy)),
+        limit_policy=_table.word_for(policies, inner.macLimitPolicy),
         mac_change=held.macChangeAllowed,
     )
 

@@ -33,8 +33,7 @@ _ENDS: Dict[int, str] = {
 
 
 def _word(name: str, number: int, form: Any = Mirror._form) -> str:
-    choices = _table.choices(form, name)
-    return next((word for word, one in choices.items() if one == number), str(number))
+    return _table.word_for(_table.choices(form, name), number)
 
 
 def _number(name: str, word: str, form: Any = Mirror._form) -> int:

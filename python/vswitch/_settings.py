@@ -65,14 +65,8 @@ def _learning(switch: str) -> MacLearning:
 
 
 def _private_vlans(switch: str) -> Tuple[PrivateVlan, ...]:
-    choices = _table.choices(PrivateVlan._form, "type")
-    kinds = {number: word for word, number in choices.items()}
     return tuple(
-        PrivateVlan.known(
-            primary=one.primaryVID,
-            secondary=one.secondaryVID,
-            type=kinds.get(one.pvlanType, str(one.pvlanType)),
-        )
+        _records.private_vlan_of(one.primaryVID, one.secondaryVID, one.pvlanType)
         for one in checked.VSDVS_GetPrivateVLANMap(switch)
     )
 
@@ -83,6 +77,15 @@ def _set_private_vlans(switch: str, vlans: Tuple[PrivateVlan, ...]) -> None:
         checked.VSPvlanMapEntry(one.primary, one.secondary, choices[one.type]) for one in vlans
     ]
     checked.VSDVS_SetPrivateVLANMap(switch, entries)
+
+
+def _teaming(get: Callable[..., Any], set_: Callable[..., None], clear: Any) -> Crossing:
+    return Crossing(
+        Teaming.from_words,
+        lambda *owner: _records.teaming_from(get(*owner)),
+        lambda *given: set_(*given[:-1], _records.policy_of(given[-1])),
+        clear,
+    )
 
 
 def _mirror(held: Words) -> "Mirror":
@@ -107,10 +110,9 @@ _MIRRORS = Crossing(_mirror, read=_mirrors, write=_mirror_bytes)
 
 CROSSINGS: Dict[str, Crossing] = {
     _vs.VSPROP_MTU: Crossing(None, checked.VSDVS_GetMTU, checked.VSDVS_SetMTU),
-    _vs.VSPROP_SWITCH_TEAMING: Crossing(
-        Teaming.from_words,
-        lambda *owner: _records.teaming_from(checked.VSDVS_GetTeamingPolicy(*owner)),
-        lambda switch, value: checked.VSDVS_SetTeamingPolicy(switch, _records.policy_of(value)),
+    _vs.VSPROP_SWITCH_TEAMING: _teaming(
+        checked.VSDVS_GetTeamingPolicy,
+        checked.VSDVS_SetTeamingPolicy,
         checked.VSDVS_ClearTeamingPolicy,
     ),
     _vs.VSPROP_SWITCH_MAC_LEARNING: Crossing(
@@ -130,12 +132,9 @@ CROSSINGS: Dict[str, Crossing] = {
         _set_vlan,
         checked.VSDVS_ClearPortVLANPolicy,
     ),
-    _vs.VSPROP_PORT_TEAMING_POLICY: Crossing(
-        Teaming.from_words,
-        lambda *owner: _records.teaming_from(checked.VSDVS_GetPortTeamingPolicy(*owner)),
-        lambda switch, port, value: checked.VSDVS_SetPortTeamingPolicy(
-            switch, port, _records.policy_of(value)
-        ),
+    _vs.VSPROP_PORT_TEAMING_POLICY: _teaming(
+        checked.VSDVS_GetPortTeamingPolicy,
+        checked.VSDVS_SetPortTeamingPolicy,
         checked.VSDVS_ClearPortTeamingPolicy,
     ),
     _vs.VSPROP_PORT_TEAMING_OVERRIDE: Crossing(

@@ -83,3 +83,8 @@ def choices(form: Form, name: str) -> Dict[str, int]:
     """The words that there are for a member of a record, and what they stand for."""
     found: Dict[str, int] = get_member(form, name)["choices"]
     return found
+
+
+def word_for(choices: Dict[str, int], number: int) -> str:
+    """The word for a number; of one that has none, the digits."""
+    return next((word for word, one in choices.items() if one == number), str(number))

@@ -9,6 +9,7 @@ from libvswitch import checked
 from libvswitch.errors import HostError, NotFound
 from vswitch import _settings, _table
 from vswitch._arrangement import arrangement, vacant
+from vswitch._describing import property_words
 from vswitch._thing import Thing
 from vswitch._whole import completed
 from vswitch.documents import (
@@ -403,8 +404,8 @@ class _Difference:
         held = found.properties() if found is not None and wishes else {}
         for wish in wishes:
             item = held.get(wish.key)
-            before = None if item is None else _said(item.data, item.propertyType)
-            after = None if wish.data is None else _said(wish.data, wish.type)
+            before = None if item is None else property_words(item.data, item.propertyType)
+            after = None if wish.data is None else property_words(wish.data, wish.type)
             if before != after:
                 if wish.data is None:
                     do = _setter(thing.clear_property, wish.key)
@@ -420,11 +421,6 @@ def _is_absent(wanted: object) -> bool:
 def _mac_said(entry: Union[MacEntry, MacWish]) -> Dict[str, Words]:
     said = {"mac": entry.mac, "vlan": entry.vlan, "vni": entry.vni}
     return {**said, "type": str(entry.type)}
-
-
-def _said(data: bytes, type_: int) -> Dict[str, str]:
-    types = {number: word for word, number in _table.PROPERTY_TYPES.items()}
-    return {"type": types.get(type_, str(type_)), "hex": data.hex()}
 
 
 def _setter(call: Callable[..., object], *arguments: Any, **more: Any) -> Callable[[], object]:

@@ -299,7 +299,7 @@ def _side_of_client(thing: Thing, held: Dict[str, Item]) -> Properties:
     key = _vs.QEX_NEBPROP_PORT_LINK_STATUS
     if isinstance(thing, Port) and _vs.QEX_NEBPROP_PORT_VNIC_CONNECTEE in held and key in held:
         if not any(held[key].data):
-            return {key: _describing.property_words(held[key])}
+            return {key: _describing.property_words(held[key].data, held[key].propertyType)}
     return {}
 
 

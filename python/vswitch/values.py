@@ -37,7 +37,7 @@ def to_words(form: Form, value: object, own: Optional[Callable[[Any], Any]] = No
     kind = form["form"]
     is_own = isinstance(own, type) and isinstance(value, own)
     if kind == "choice" and is_own and isinstance(value, int):
-        return next((word for word, one in form["choices"].items() if one == value), str(value))
+        return _table.word_for(form["choices"], value)
     if kind == "bits":
         if is_own and isinstance(value, int):
             return [word for word, bit in form["choices"].items() if value & bit]

@@ -26,8 +26,6 @@ __all__ = ["add", "remove", "set_", "tell", "tell_made", "unset", "uplink"]
 Found = Union[Switch, Port, UplinkPort]
 Members = Dict[str, Words]
 
-_TYPES = {number: word for word, number in _table.PROPERTY_TYPES.items()}
-
 
 def tell(changes: Iterable[Change]) -> None:
     """What was changed, or would be."""
@@ -76,7 +74,10 @@ def _members(known: Dict[str, _table.Property], wanted: Members) -> Members:
     """Settings as a document has them; a text that would clear its setting there, as a property."""
     said = {name: value for name, value in wanted.items() if value != ABSENT}
     properties = {
-        known[name].key: {"type": _TYPES[known[name].type], "text": value}
+        known[name].key: {
+            "type": _table.word_for(_table.PROPERTY_TYPES, known[name].type),
+            "text": value,
+        }
         for name, value in wanted.items()
         if value == ABSENT
     }
