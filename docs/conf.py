@@ -34,6 +34,7 @@ highlight_language = "none"
 html_theme = "furo"
 html_static_path = ["_static"]
 html_css_files = ["site.css"]
+html_search_scorer = str(HERE / "search_scorer.js")
 html_copy_source = False
 html_show_sphinx = False
 html_show_copyright = False
