@@ -199,7 +199,7 @@ def _argument(known: Definitions, function: Function, one: Parameter) -> Argumen
 def _direction(known: Definitions, function: Function, one: Parameter) -> Direction:
     type_ = known.resolve(one.type)
     is_memory = (type_.is_pointer or type_.is_array) and type_ != Type(("p",), "void")
-    if not is_memory or _is_function(type_) or one.is_const or function.says("reads", one.name):
+    if not is_memory or is_function(type_) or one.is_const or function.says("reads", one.name):
         return Direction.IN
     return Direction.OUT
 
@@ -237,10 +237,10 @@ def _is_memory_of_the_caller(known: Definitions, one: Parameter, direction: Dire
     if type_.name in known.records:
         return type_.is_pointer
     is_given = direction is Direction.IN and one.type.is_pointer
-    return is_given and type_.name != "char" and not _is_function(type_)
+    return is_given and type_.name != "char" and not is_function(type_)
 
 
-def _is_function(type_: Type) -> bool:
+def is_function(type_: Type) -> bool:
     return type_.layers[1:2] != () and type_.layers[1].startswith("f(")
 
 
