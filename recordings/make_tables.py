@@ -3,7 +3,7 @@
 usage: make_tables.py TREE FOLDER
 
 tables.inc has every call and the records that it takes and gives; LIBRARY_calls.inc has the
-functions of one library, and how it finds the host's.
+functions of one library, and how it finds the host's; invokes.inc has what makes each call.
 """
 
 import sys
@@ -272,6 +272,9 @@ def main() -> None:
         f"inline constexpr std::size_t number_of_{call.name} = {number};\n"
         for number, call in enumerate(calls)
         if call.takes_more
+    )
+    written["invokes.inc"] = "".join(
+        f"    Typed<decltype({call.name})>::invoke,\n" for call in calls
     )
     for name in sorted(set(LIBRARIES.values())):
         written[f"{name}_calls.inc"] = library(calls, name)

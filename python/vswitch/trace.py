@@ -99,7 +99,8 @@ class Trace:
         self.path = Path(path)
         self.processes: Dict[int, Process] = {}
         """Those of which lines were read."""
-        self._line = 1
+        self.line = 1
+        """That was read last."""
         self._open: Dict[_Key, Union[Call, Callback]] = {}
         self._left: List[Call] = []  # by processes that became other programs
         self._file: IO[bytes] = open(self.path, "rb")
@@ -118,7 +119,7 @@ class Trace:
     def __iter__(self) -> Iterator[Call]:
         """The calls as they ended, and last those that did not."""
         for held in self._file:
-            self._line += 1
+            self.line += 1
             ended = self._read(self._parsed(held))
             if ended is not None:
                 yield ended
@@ -147,7 +148,7 @@ class Trace:
         return made
 
     def _wrong(self, what: str) -> TraceError:
-        return TraceError(self.path, self._line, what)
+        return TraceError(self.path, self.line, what)
 
     def _parsed(self, held: bytes) -> Dict[str, Any]:
         if not held.endswith(b"\n"):

@@ -8,6 +8,7 @@
 
 #include "recordings/core/api.h"
 #include "recordings/core/shapes.h"
+#include "recordings/core/signatures.h"
 #include "recordings/recorder/frames.h"
 #include "recordings/recorder/stand_ins.h"
 #include "vswitch/call_trap.h"
@@ -24,15 +25,6 @@ RECORDINGS_API extern void *host_functions[];
 /// The host's function; a process that calls one that its library lacks ends, as without the
 /// recorder.
 RECORDINGS_API void *host_function(std::size_t number) noexcept;
-
-template <typename T>
-std::uint64_t word_of(T value) noexcept {
-  if constexpr (std::is_pointer_v<T>) {
-    return reinterpret_cast<std::uint64_t>(value);
-  } else {
-    return static_cast<std::uint64_t>(static_cast<std::int64_t>(value));
-  }
-}
 
 /// Calls the host's function. A trap jumps over this frame, so nothing in it has a destructor.
 template <std::size_t number, typename Returned, typename... Parameters>

@@ -6,18 +6,15 @@
 
 #include "recordings/core/identities.h"
 #include "recordings/core/process.h"
+#include "recordings/core/trap.h"
 #include "recordings/core/values.h"
 #include "recordings/recorder/trace.h"
 #include "vswitch/call_trap.h"
 
-// Weak: there is a trap only with the module, and an interpreter only in its processes.
-extern "C" {
+// Weak: there is a trap only with the module.
 #pragma weak exception_buffer
 #pragma weak exceptionType
 #pragma weak exceptionMsg
-// NOLINTNEXTLINE(readability-identifier-naming): the interpreter's own name
-extern char const *PyExceptionClass_Name(struct _object *type) __attribute__((weak));
-}
 
 namespace recordings {
 namespace {
@@ -181,22 +178,6 @@ void disarm(Frame const &frame, Entry const &entry) {
   }
 }
 
-void write_trap(Line &line, int value) {
-  line.member("trap").raw("{").member("type");
-  if (exceptionType != nullptr && PyExceptionClass_Name != nullptr) {
-    line.text(PyExceptionClass_Name(exceptionType));
-  } else {
-    line.raw("null");
-  }
-  line.member("text");
-  if (exceptionMsg != nullptr) {
-    line.text(exceptionMsg);
-  } else {
-    line.raw("null");
-  }
-  line.member("value").number(std::int64_t{value}).raw("}");
-}
-
 /// All of the end but the jump, which leaves nothing to destroy.
 void end_with_trap(Frame &frame, int value) noexcept {
   KeptErrno const kept;
@@ -206,7 +187,7 @@ void end_with_trap(Frame &frame, int value) noexcept {
   if (is_ours(entry)) {
     Line &line = start_line(thread, "end", entry.number);
     line.member("took").number(moment - frame.began);
-    write_trap(line, value);
+    write_trap(line, exceptionType, exceptionMsg, value);
     finish_line(line, "end", entry.number);
   }
   armed_thread = entry.armed_before;

@@ -2,16 +2,11 @@
 // is recorded; each goes on to the tool's own.
 #pragma once
 
-#include <cstddef>
-
 #include "recordings/core/api.h"
+#include "recordings/core/signatures.h"
 #include "recordings/recorder/frames.h"
 
 namespace recordings {
-
-using Visit = char (*)(void *, void *);
-using Allocate = void *(*)(std::size_t);
-using Release = void (*)(void *);
 
 RECORDINGS_API Visit stand_in(Frame &frame, Visit given) noexcept;
 

@@ -1,0 +1,265 @@
+"""Calls of a trace are made again on the simulated host, and what differs is told."""
+
+import json
+from pathlib import Path
+from typing import Any, Dict, List, Optional, Tuple
+
+import pytest
+from recordings import Recording, record
+from simhost import Host
+from test_recorded_shapes import SCENARIO, TOOL
+from vswitch._replayer import PresentHost
+from vswitch.likeness import Difference
+from vswitch.replay import NOT_MADE, Report, Visit, check, replay
+from vswitch.trace import TraceError
+
+UNKNOWN = "it is given what no call that was made has returned, or what is released"
+
+WALKS = """
+import libvswitch as vs
+from libvswitch import checked
+
+checked.VSDVS_CreateVSwitch("own", None, None, 64, True, 0, 9000, 0)
+handle = vs.DVSState_SwitchFindByAlias("own")
+identifier = vs.DVS_SwitchId(handle)
+checked.VSDVS_AddDVPort("own", "p", 7)
+checked.VSDVS_AddDVPort("own", "q", 7)
+
+def visit(port, context):
+    name = vs.DVS_PortId(port)
+    number = checked.VSDVS_DvPortIDToPortIDFromDVSID(identifier, name)
+    vs.VSQEX_PortGetTeamUplinkHint(number, vs.qex_Name())
+    vs.DVSState_PortDataForEach(port, lambda item, context: vs.DVSData_PropType(item) != 0, None)
+    return name != "q"
+
+vs.DVSState_PortForEach(handle, visit, None)
+image = checked.DVSQEX_StateGet()
+checked.VSDVS_DestroyVSwitch("own")
+checked.DVSQEX_StateInit(image)
+assert vs.DVS_SwitchId(vs.DVSState_SwitchFindByAlias("own")) == identifier
+"""
+
+
+@pytest.fixture(name="present", scope="module")
+def fixture_present() -> PresentHost:
+    return PresentHost()
+
+
+def recorded(folder: Path, tool: str) -> Recording:
+    scenario = folder / "host.json"
+    scenario.write_text(json.dumps(SCENARIO))
+    made = record(tool, folder / "trace.jsonl", SIMHOST_SCENARIO=str(scenario))
+    assert made.status == 0, made.stderr
+    return made
+
+
+@pytest.fixture(name="shapes", scope="module")
+def fixture_shapes(tmp_path_factory: pytest.TempPathFactory) -> Recording:
+    return recorded(tmp_path_factory.mktemp("shapes"), TOOL)
+
+
+@pytest.fixture(name="walks", scope="module")
+def fixture_walks(tmp_path_factory: pytest.TempPathFactory) -> Recording:
+    return recorded(tmp_path_factory.mktemp("walks"), WALKS)
+
+
+def first(report: Report) -> Dict[str, Tuple[str, Any, Any]]:
+    """Of each function what differed first."""
+    differing = {name: of.first for name, of in report.functions.items() if of.first is not None}
+    return {
+        name: (found.path, found.recorded, found.present) for name, (_, found) in differing.items()
+    }
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_on_the_same_host_every_call_goes_as_it_was_recorded(
+    host: Host, present: PresentHost, shapes: Recording, walks: Recording
+) -> None:
+    for recording in (shapes, walks):
+        host.reset()
+        count = check(recording.trace, present)
+        report = replay(recording.trace, present)
+        assert first(report) == {} and report.is_alike
+        assert sum(of.alike for of in report.functions.values()) == count > 30
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_a_default_that_is_another_is_found(
+    host: Host, present: PresentHost, shapes: Recording
+) -> None:
+    host.apply({"switches": [{"alias": "lab", "ports": [{"id": "web-1", "vlan": {"id": 8}}]}]})
+    report = replay(shapes.trace, present)
+    path = "out.policy.VSPortVlanPolicy.vlanID"
+    assert first(report)["VSDVS_GetPortVLANPolicy"] == (path, 7, 8)
+    assert not report.is_alike
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_a_status_that_is_another_is_found(
+    host: Host, present: PresentHost, shapes: Recording
+) -> None:
+    host.fault("VSQEX_GetLAGTable", status="QEX_BUSY")
+    report = replay(shapes.trace, present)
+    assert first(report) == {
+        "VSQEX_GetLAGTable": ("status", "QEX_OK", "QEX_BUSY"),
+        "VSQEX_FreeMemory": (
+            NOT_MADE,
+            "an end",
+            UNKNOWN,
+        ),
+    }
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_a_trap_is_found_and_the_next_call_works(
+    host: Host, present: PresentHost, walks: Recording
+) -> None:
+    host.fault("VSDVS_AddDVPort", nth=2, panic=(OSError, "planned"))
+    report = replay(walks.trace, present)
+    found = first(report)
+    assert found["VSDVS_AddDVPort"] == ("trap", "QEX_OK", "OSError: planned")
+    assert found["DVSState_PortForEach"] == ("callbacks", 2, 1)
+    # What the tool asked of the port that is missing.
+    why = "the host did not call back so often"
+    assert found["DVS_PortId"] == (NOT_MADE, "an end", why)
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_identifiers_and_images_are_the_present_hosts(
+    host: Host, present: PresentHost, walks: Recording
+) -> None:
+    created = [one for one in walks.calls if one.function == "DVS_SwitchId"]
+    replay(walks.trace, present)
+    (own,) = [one for one in host.describe()["switches"] if one["alias"] == "own"]
+    assert own["id"] != created[0].result
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_only_questions(host: Host, present: PresentHost, walks: Recording) -> None:
+    before = host.describe()["switches"]
+    report = replay(walks.trace, present, questions_only=True)
+    assert host.describe()["switches"] == before
+    assert report.functions["VSDVS_CreateVSwitch"].left_out == 1
+    assert report.functions["VSDVS_CreateVSwitch"].calls == 1
+    # There is no such switch to ask of.
+    assert first(report)["DVSState_SwitchFindByAlias"][::2] == ("result", None)
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_what_is_known_is_allowed(host: Host, present: PresentHost, shapes: Recording) -> None:
+    host.apply({"switches": [{"alias": "lab", "ports": [{"id": "web-1", "vlan": {"id": 8}}]}]})
+
+    def allows(function: str, difference: Difference) -> bool:
+        return difference.pattern.startswith("out.policy")
+
+    report = replay(shapes.trace, present, allows)
+    assert report.functions["VSDVS_GetPortVLANPolicy"].allowed == 1
+    assert first(report) == {} and report.is_alike
+
+
+class Unasked:
+    """A host that nothing may be asked of."""
+
+    def check(self, function: str, inputs: Dict[str, Any]) -> Optional[str]:
+        return None
+
+    def make(self, function: str, inputs: Dict[str, Any], visit: Visit) -> Dict[str, Any]:
+        raise AssertionError("nothing was to be made")
+
+
+HEADER = {"vswitch trace": 1, "module": "1.0", "time": "", "command": ["x"], "libraries": {}}
+PROCESS = {"process": 7, "parent": 1, "time": "", "program": "/x", "libraries": {}}
+
+
+def event(number: int, function: str, inputs: Any, **more: Any) -> Dict[str, Any]:
+    begin = {"call": number, "process": 7, "thread": 1, "function": function, "at": 0}
+    return {**begin, "in": inputs, **more}
+
+
+def written(path: Path, *events: Dict[str, Any]) -> Path:
+    path.write_text("".join(f"{json.dumps(one)}\n" for one in (HEADER, PROCESS, *events)))
+    return path
+
+
+def end(number: int, **more: Any) -> Dict[str, Any]:
+    return {"end": number, "process": 7, "took": 1, **more}
+
+
+def test_what_cannot_be_made_is_told_with_its_reason(tmp_path: Path) -> None:
+    callback = {"callback": 12, "process": 7, "thread": 1, "argument": "callback", "at": 1}
+    events: List[Dict[str, Any]] = [
+        event(1, "Panic", {"format": "%s"}),
+        end(1),
+        event(2, "VSDVS_FreeMemory", {"memory": {"at": 9}}),
+        end(2),
+        event(3, "DVSData_Update", {"list": None, "data": {"unread": "it is gone"}}),
+        end(3, status=0),
+        event(4, "DVSQEX_StateSanitize", {}),
+        end(4, left=True),
+        event(11, "DVSState_PortForEach", {"handle": {"at": 9}}),
+        {**callback, "in": {"reached": {"at": 2}}, "within": 11},
+        event(13, "DVS_PortId", {"handle": {"at": 2}}, within=12),
+        end(13, result="p"),
+        {"end": 12, "process": 7, "result": 1},
+        end(11),
+        event(20, "DVSQEX_StateCleanup", {}),
+    ]
+    path = written(tmp_path / "trace.jsonl", *events)
+    assert check(path, Unasked()) == 7
+    report = replay(path, Unasked())
+    assert {name: found[2] for name, found in first(report).items()} == {
+        "Panic": "what follows its format is not recorded",
+        "VSDVS_FreeMemory": UNKNOWN,
+        "DVSData_Update": "in.data was not recorded: it is gone",
+        "DVSQEX_StateSanitize": "the tool left it by a jump",
+        "DVSState_PortForEach": UNKNOWN,
+        "DVS_PortId": "the walk that it was made in was not made",
+        "DVSQEX_StateCleanup": "its process ended during it",
+    }
+    assert sum(of.not_made for of in report.functions.values()) == 7
+
+
+@pytest.mark.parametrize(
+    "function, inputs, said",
+    [
+        ("VSDVS_Get", {}, "call 1: there is no call 'VSDVS_Get'"),
+        ("VSDVS_GetMTU", {}, "call 1: in: lacks switchName"),
+        ("VSDVS_GetMTU", {"switchName": 7}, "call 1: in.switchName: is no object: 7"),
+        (
+            "VSDVS_GetMTU",
+            {"switchName": "x\0y"},
+            "call 1: in.switchName: is a text with a NUL in it",
+        ),
+        (
+            "VSDVS_SetMTU",
+            {"switchName": "x", "mtu": 2**32},
+            "call 1: in.mtu: 4294967296 is not from 0 to 4294967295",
+        ),
+        (
+            "DVSQEX_StateInit",
+            {"state": {"bytes": "00"}, "length": 4096},
+            "call 1: in.state.bytes: has 1 bytes, and not 4096",
+        ),
+        (
+            "DVSData_Free",
+            {"list": {"at": [1]}},
+            "call 1: in.list.at: is no whole number: [1]",
+        ),
+    ],
+)
+def test_hostile_calls_are_refused_with_their_line(
+    tmp_path: Path, present: PresentHost, function: str, inputs: Any, said: str
+) -> None:
+    path = written(tmp_path / "trace.jsonl", event(1, function, inputs), end(1, status=0))
+    with pytest.raises(TraceError) as caught:
+        check(path, present)
+    assert (caught.value.line, caught.value.what) == (4, said)
+
+
+def test_nesting_is_refused(tmp_path: Path) -> None:
+    deep: Any = 1
+    for _ in range(200):
+        deep = {"x": deep}
+    events = event(1, "VSDVS_GetMTU", {"switchName": "x"}), end(1, status=0, out=deep)
+    with pytest.raises(TraceError, match="line 4: call 1: its values are nested too deeply"):
+        check(written(tmp_path / "trace.jsonl", *events), Unasked())
