@@ -19,6 +19,7 @@ from vswitch.command import (
     drawing,
     reading,
     recording,
+    replaying,
     watching,
 )
 from vswitch.command.session import Command, Group, TextCommand
@@ -55,6 +56,7 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "drill": watching.drill,
     "draw": drawing.draw,
     "record": recording.record,
+    "replay": replaying.replay,
     "completion": completing.completion,
 }
 _TEXTS = ("draw", "record", "completion")
