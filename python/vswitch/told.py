@@ -96,7 +96,9 @@ def shown(value: Words) -> str:
     if isinstance(value, dict):
         return " ".join(f"{name}={shown(one)}" for name, one in value.items()) or "none"
     if isinstance(value, (list, tuple)):
-        return ",".join(shown(one) for one in value) or "none"
+        # What has members of its own is told from what follows it.
+        between = "; " if any(isinstance(one, dict) for one in value) else ","
+        return between.join(shown(one) for one in value) or "none"
     return str(value)
 
 

@@ -5,7 +5,7 @@ import re
 import shlex
 import subprocess
 from pathlib import Path
-from typing import Dict, List
+from typing import Dict, List, Set
 
 import click
 import pytest
@@ -65,6 +65,21 @@ def test_every_command_is_there_with_its_options(page: str) -> None:
 def test_what_is_not_there_would_be_noticed(page: str) -> None:
     less = plain(page).replace("\\fB--every S\\fR", "", 1).replace(".SS vswitch lag ", ".SS ")
     assert missing(less) == ["stats --every", "lag"]
+
+
+def test_it_says_which_options_all_commands_take(page: str) -> None:
+    taken = {
+        option: {name for name, one in group().commands.items() if option in _options(one)}
+        for option in ("--real", "--json")
+    }
+    assert taken["--real"] == set(group().commands)
+    *others, last = [name for name in group().commands if name not in taken["--json"]]
+    said = f"and all but {', '.join(others)} and {last} take --json for programs."
+    assert said in " ".join(plain(page).split())
+
+
+def _options(command: click.Command) -> Set[str]:
+    return {one for parameter in command.params for one in parameter.opts}
 
 
 def complaints(page: str) -> str:

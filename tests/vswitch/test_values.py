@@ -138,6 +138,8 @@ def test_changes_in_words() -> None:
     assert str(Change("lab/mtu", None, 9000)) == "lab/mtu: absent -> 9000"
     changed = Change("lab/web/vlan", 7, {"id": 7, "trunk": ["1-3", 9], "private": True})
     assert str(changed) == "lab/web/vlan: 7 -> id=7 trunk=1-3,9 private=true"
+    ends = [{"port": "a"}, {"vlan": 7}]
+    assert str(Change("x", [], {"sid": "s", "to": ends})) == "x: none -> sid=s to=port=a; vlan=7"
 
 
 VALUES = [

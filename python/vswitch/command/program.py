@@ -74,8 +74,8 @@ _ENDS = "\n".join(["\b", "Exit status:", *(f"  {n}  {words}" for n, words in STA
 def about() -> None:
     """Look at the virtual switches of this host, and change them.
 
-    A switch is called by its alias, a port SWITCH/PORT. Every command takes --json for programs,
-    and --real to refuse a simulated host.
+    A switch is called by its alias, a port SWITCH/PORT. Every command takes --real to refuse a
+    simulated host, and all but draw, record and completion take --json for programs.
     """
 
 
