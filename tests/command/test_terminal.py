@@ -45,7 +45,8 @@ def test_a_line_tells_how_far_it_is(lab: SharedHost, tmp_path: Path) -> None:
     document.write_text("switches: [{alias: lab, mtu: 1500}]")
     assert "reading the host" in on_terminal(lab, "backup")[1]
     assert "reading the host" in on_terminal(lab, "snapshot")[1]
-    assert "changing the host" in on_terminal(lab, "apply", str(document), columns=200)[1]
+    status, seen = on_terminal(lab, "apply", str(document), columns=200)
+    assert status == 0 and f"reading {document}" in seen and "changing the host" in seen
 
 
 @pytest.mark.parametrize("columns", [1, 40])

@@ -1,5 +1,6 @@
 """The commands that take a document, which says how the host is to be, and that make one."""
 
+import contextlib
 import sys
 from pathlib import Path
 from typing import Any, Optional
@@ -24,6 +25,14 @@ _FILE = typer.Argument(
 _DRY_RUN = typer.Option(False, "--dry-run", help="Tell what would change, and change nothing.")
 
 
+def _read(file: Path) -> Any:
+    """The document in a file, which takes long if it is one of a large host."""
+    # What somebody types in is not written over.
+    is_typed = str(file) == "-"
+    with contextlib.nullcontext() if is_typed else output.progress(f"reading {file}"):
+        return files.read(str(file))
+
+
 def plan(name: str, document: Any, whole: bool = False) -> Plan:
     """What the document of that file would change."""
     there = host()
@@ -42,7 +51,7 @@ def _carry_out(wanted: Plan, dry_run: bool) -> None:
 
 def diff(file: Path = _FILE) -> None:
     """Tell what a document would change."""
-    _carry_out(plan(str(file), files.read(str(file))), dry_run=True)
+    _carry_out(plan(str(file), _read(file)), dry_run=True)
 
 
 def apply(
@@ -58,7 +67,7 @@ def apply(
     --confirm-within, the change is taken back unless the command confirm comes in time, even if
     the shell is gone by then.
     """
-    document = files.read(str(file))
+    document = _read(file)
     if dry_run or confirm_within is None:
         _carry_out(plan(str(file), document), dry_run)
         return
@@ -76,10 +85,11 @@ def backup() -> None:
     there = host()
     with output.progress("reading the host"):
         document = snapshot.backup(there)
+        written = "" if is_json() else files.write(document)
     if is_json():
         output.write_json(document)
     else:
-        print(files.write(document), end="")
+        print(written, end="")
 
 
 def snapshot(
@@ -110,4 +120,4 @@ def restore(file: Path = _FILE, dry_run: bool = _DRY_RUN) -> None:
     Uplinks move to the switches and uplink ports where the backup has them. Links, learned
     addresses and counters are the host's own, and stay.
     """
-    _carry_out(plan(str(file), files.read(str(file)), whole=True), dry_run)
+    _carry_out(plan(str(file), _read(file), whole=True), dry_run)
