@@ -7,8 +7,8 @@
 #
 #   --minutes N   how long; 20 by default. The sweep of wrong values runs once, with a million calls
 #                 of every kind in the same memory, or fewer if there is less time; fuzzers,
-#                 sequences of calls, clones of random hosts, killed processes and random pairs of
-#                 values share what is left
+#                 sequences of calls, replays of such, clones of random hosts, killed processes and
+#                 random pairs of values share what is left
 #   --seed N      what chance chose in an earlier run, which printed its seed
 #
 # A line for each part says how much it did and what was wrong; the status is 1 if anything was.

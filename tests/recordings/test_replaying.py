@@ -19,6 +19,7 @@ WALKS = """
 import libvswitch as vs
 from libvswitch import checked
 
+checked.VSQEX_GetGlobalMACLearningProps()
 checked.VSDVS_CreateVSwitch("own", None, None, 64, True, 0, 9000, 0)
 handle = vs.DVSState_SwitchFindByAlias("own")
 identifier = vs.DVS_SwitchId(handle)
@@ -84,7 +85,7 @@ def test_on_the_same_host_every_call_goes_as_it_was_recorded(
 
 
 @pytest.mark.scenario(SCENARIO)
-def test_a_default_that_is_another_is_found(
+def test_a_setting_that_is_another_is_found(
     host: Host, present: PresentHost, shapes: Recording
 ) -> None:
     host.apply({"switches": [{"alias": "lab", "ports": [{"id": "web-1", "vlan": {"id": 8}}]}]})
@@ -92,6 +93,15 @@ def test_a_default_that_is_another_is_found(
     path = "out.policy.VSPortVlanPolicy.vlanID"
     assert first(report)["VSDVS_GetPortVLANPolicy"] == (path, 7, 8)
     assert not report.is_alike
+
+
+@pytest.mark.scenario(SCENARIO)
+def test_a_default_that_is_another_is_found(
+    host: Host, present: PresentHost, walks: Recording
+) -> None:
+    host.apply({"mac_learning": {"aging_time": 299}})
+    report = replay(walks.trace, present)
+    assert first(report) == {"VSQEX_GetGlobalMACLearningProps": ("out.props.agingTime", 300, 299)}
 
 
 @pytest.mark.scenario(SCENARIO)

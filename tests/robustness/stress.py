@@ -4,8 +4,9 @@
     stress.py [--minutes N] [--seed N]
 
 First what has an end: every batch of the sweep, then a million calls of every kind and a million
-traps of each call, fewer in less than twenty minutes. What has none shares the time that
-is left: fuzzers, sequences, clones of random hosts, killed processes and random pairs of values.
+traps of each call, fewer in less than twenty minutes. What has none shares the time that is left:
+fuzzers, sequences, replays of such, clones of random hosts, killed processes and random pairs of
+values.
 """
 
 import argparse
@@ -31,7 +32,14 @@ WHOLE = 20
 ROUNDS = 20
 """Of killed processes, before one looks at the time."""
 
-SHARES = {"fuzzing": 0.4, "sequences": 0.2, "clones": 0.05, "kills": 0.1, "pairs": 0.25}
+SHARES = {
+    "fuzzing": 0.4,
+    "sequences": 0.15,
+    "replays": 0.05,
+    "clones": 0.05,
+    "kills": 0.1,
+    "pairs": 0.25,
+}
 """Of the time that what has an end leaves."""
 
 Outcome = Tuple[int, List[str]]
@@ -121,6 +129,8 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
     sequences = partial(by_chance, "sequences/sequences.py", seed)
     yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
+    replays = partial(by_chance, "recordings/recorded_sequences.py", seed)
+    yield Part("replays of sequences", "sequences", replays, SHARES["replays"])
     clones = partial(by_chance, "vswitch/drawn_documents.py", seed)
     yield Part("clones of hosts", "documents", clones, SHARES["clones"])
     yield Part("killed processes", "rounds", killed, SHARES["kills"])

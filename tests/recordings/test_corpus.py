@@ -1,0 +1,127 @@
+"""What the examples, the tour and random programs ask of the simulated host is recorded, and
+replayed on a fresh one: there is no difference, and one that is planted is found."""
+
+import json
+import os
+import subprocess
+import sys
+from pathlib import Path
+from typing import Dict, List
+
+import pytest
+import recorded_sequences
+from programs import EXAMPLES
+from recordings import SIMULATED, record
+from simhost import Host
+from steering import differences, replayed
+
+DOCUMENT = EXAMPLES.parent / "tests" / "examples" / "document.json"
+PROGRAMS: Dict[str, List[str]] = {
+    "apply": [str(DOCUMENT)],
+    "compliance": ["--mtu", "9000", "--forbids", "forged_transmits", "--fix"],
+    "failover_drill": ["vswitch0"],
+    "find_mac": ["02:00:00:00:01:02"],
+    "first_steps": [],
+    "inventory": [],
+    "mirror": ["vswitch0", "web-1", "web-2", "--for", "0"],
+}
+NO_PROGRAMS = {"private_host", "records", "tour"}
+"""What asks nothing of the host, and what is recorded in a way of its own."""
+
+SEED = 16
+SEQUENCES = 20
+
+_RUN = """
+import runpy, sys
+sys.argv = {words!r}
+sys.path.insert(0, {folder!r})
+runpy.run_path({words!r}[0], run_name="__main__")
+"""
+
+
+def program(name: str, *words: str) -> str:
+    return _RUN.format(words=[str(EXAMPLES / f"{name}.py"), *words], folder=str(EXAMPLES))
+
+
+def test_every_example_is_here() -> None:
+    assert {one.stem for one in EXAMPLES.glob("*.py")} == {*PROGRAMS, *NO_PROGRAMS}
+
+
+@pytest.mark.parametrize("name", PROGRAMS)
+def test_an_example_goes_as_it_was_recorded(name: str, tmp_path: Path) -> None:
+    trace = tmp_path / "trace.jsonl"
+    made = record(program(name, *PROGRAMS[name]), trace)
+    assert made.status == 0, made.stderr
+    (report,) = replayed(trace, lambda: Host(None, tmp_path))
+    assert differences(report) == []
+    assert sum(of.alike for of in report.functions.values()) > 10
+
+
+# In place of simhostctl: the trace says what it does.
+_SAYING = """#!{python}
+import os, sys
+from saying import say
+say("simhostctl", *sys.argv[1:])
+os.execv({simhostctl!r}, ["simhostctl", *sys.argv[1:]])
+"""
+
+_REPLAY = """
+import json, subprocess, sys
+from pathlib import Path
+from steering import differences, replayed
+
+def steer(host, what, arguments, more):
+    subprocess.run([sys.argv[2], *arguments], check=True, stdout=subprocess.DEVNULL)
+
+(report,) = replayed(Path(sys.argv[1]), lambda: None, steer)
+alike = sum(of.alike for of in report.functions.values())
+print(json.dumps([alike, differences(report)]))
+"""
+
+
+def test_the_tour_goes_as_it_was_recorded(tmp_path: Path) -> None:
+    simhostctl, shown = str(SIMULATED / "simhostctl"), tmp_path / "bin" / "simhostctl"
+    shown.parent.mkdir()
+    shown.write_text(_SAYING.format(python=sys.executable, simhostctl=simhostctl))
+    shown.chmod(0o755)
+    here = os.pathsep.join([os.environ["PYTHONPATH"], str(Path(__file__).parent)])
+    path = os.pathsep.join([str(shown.parent), os.environ["PATH"]])
+    trace = tmp_path / "trace.jsonl"
+    made = record(program("tour"), trace, PATH=path, PYTHONPATH=here)
+    assert made.status == 0, made.stderr
+    state = str(tmp_path / "host.db")
+    done = subprocess.run(
+        [sys.executable, "-c", _REPLAY, str(trace), simhostctl],
+        env={**os.environ, "PYTHONPATH": here, "SIMHOST_STATE": state},
+        stdout=subprocess.PIPE,
+        text=True,
+        check=True,
+    )
+    alike, found = json.loads(done.stdout)
+    assert found == [] and alike > 300
+
+
+@pytest.fixture(name="sequences", scope="module")
+def fixture_sequences(tmp_path_factory: pytest.TempPathFactory) -> Path:
+    print("seed", SEED)
+    trace = tmp_path_factory.mktemp("sequences") / "trace.jsonl"
+    recorded_sequences.recorded(trace, SEED, SEQUENCES)
+    return trace
+
+
+def test_random_programs_go_as_they_were_recorded(sequences: Path) -> None:
+    count, found = recorded_sequences.found_in(sequences)
+    assert found == []
+    assert count >= SEQUENCES
+
+
+def another_status() -> Host:
+    host = recorded_sequences.begun()
+    host.fault("VSDVS_GetMcastFilterMode", times=0, status="QEX_NOT_SUPPORTED")
+    return host
+
+
+def test_a_status_that_is_planted_is_found_and_named(sequences: Path) -> None:
+    _, found = recorded_sequences.found_in(sequences, another_status)
+    said = "VSDVS_GetMcastFilterMode: status: QEX_OK -> QEX_NOT_SUPPORTED "
+    assert found and all(one.startswith(said) for one in found)

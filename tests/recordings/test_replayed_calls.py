@@ -1,0 +1,93 @@
+"""Every call is made with what it was recorded with: the replay is recorded, too, and both traces
+say the same. What the second one says was read in memory, whichever way it came there."""
+
+import json
+from pathlib import Path
+from typing import Any, List, Tuple
+
+import pytest
+from recordings import RECORDING, record
+from test_recorded_calls import EVERY_CALL
+from test_recorded_shapes import SCENARIO, TOOL
+from vswitch.likeness import is_unread_within
+from vswitch.trace import Call, Trace
+
+# Over the recording host, for which an address is a number like any other.
+ONE_BY_ONE = """
+from vswitch._replayer import PresentHost
+from vswitch.likeness import is_unread_within
+from vswitch.trace import Trace
+
+host = PresentHost()
+with Trace({trace!r}) as trace:
+    for call in trace:
+        if call.function != "Panic" and not is_unread_within(call.inputs):
+            host.make(call.function, call.inputs, lambda argument, inputs: 0)
+"""
+
+WHOLE = """
+from vswitch._replayer import PresentHost
+from vswitch.replay import replay
+
+assert replay({trace!r}, PresentHost()).is_alike
+"""
+
+STOPPED = {"clock": {"stopped": True, "now": 1000}}
+
+LISTS = """
+import ctypes
+from libvswitch import checked
+libc = ctypes.CDLL(None)
+host = ctypes.CDLL("libnebPublic.so")
+host.DVSData_Update.argtypes = [ctypes.c_void_p, ctypes.c_char_p, ctypes.c_char_p,
+                                ctypes.c_uint, ctypes.c_uint]
+host.DVSData_Free.argtypes = [ctypes.c_void_p]
+made = ctypes.c_void_p()
+host.DVSData_Alloc(ctypes.byref(made), libc.malloc, libc.free)
+host.DVSData_Update(made, b"a", b"xy", 2, 16)
+host.DVSData_Update(made, b"a", b"xyz", 3, 16)
+host.DVSData_Free(made)
+"""
+
+
+def without_addresses(value: Any) -> Any:
+    if isinstance(value, dict):
+        return {
+            name: "an address" if name == "at" else without_addresses(one)
+            for name, one in value.items()
+        }
+    return [without_addresses(one) for one in value] if isinstance(value, list) else value
+
+
+def said(call: Call) -> Tuple[Any, ...]:
+    visits = [(one.argument, one.result is None) for one in call.callbacks]
+    values = [call.inputs, call.outputs, call.result]
+    return call.function, call.status, without_addresses(values), visits
+
+
+def calls_of(trace: Path) -> List[Tuple[Any, ...]]:
+    with Trace(trace) as read:
+        return [said(call) for call in read]
+
+
+def test_every_call_is_given_what_it_was_recorded_with(tmp_path: Path) -> None:
+    first, second = tmp_path / "first.jsonl", tmp_path / "second.jsonl"
+    assert record(EVERY_CALL, first, RECORDING).status == 0
+    made = record(ONE_BY_ONE.format(trace=str(first)), second, RECORDING)
+    assert made.status == 0, made.stderr
+    all_ = [(function, values[0]) for function, _, values, _ in calls_of(first)]
+    given = [one for one in all_ if one[0] != "Panic" and not is_unread_within(one[1])]
+    assert len({name for name, _ in all_}) == 146 and len({name for name, _ in given}) > 135
+    assert [(function, values[0]) for function, _, values, _ in calls_of(second)] == given
+
+
+@pytest.mark.parametrize("tool", [TOOL, LISTS], ids=["shapes", "lists"])
+def test_the_trace_of_a_replay_is_the_trace(tool: str, tmp_path: Path) -> None:
+    scenario = tmp_path / "host.json"
+    scenario.write_text(json.dumps({**SCENARIO, **STOPPED}))
+    first, second = tmp_path / "first.jsonl", tmp_path / "second.jsonl"
+    assert record(tool, first, SIMHOST_SCENARIO=str(scenario)).status == 0
+    again = WHOLE.format(trace=str(first))
+    made = record(again, second, SIMHOST_SCENARIO=str(scenario))
+    assert made.status == 0, made.stderr
+    assert calls_of(second) == calls_of(first) != []
