@@ -8,7 +8,7 @@ import pytest
 import simhost
 from conftest import LAB
 from test_transaction import everything
-from vswitch import Host, HostError, NotRestored, RolledBack, _table
+from vswitch import Host, HostError, NotRestored, Plan, RolledBack, _table
 
 # How often each call is made by an apply that goes well, is asked of the host itself.
 CHANGE: Dict[str, Any] = {
@@ -52,10 +52,8 @@ def fresh(host: simhost.Host) -> Dict[str, Any]:
     return everything(host)
 
 
-def calls_of(host: simhost.Host, objects: Host) -> Dict[str, int]:
+def calls_of(host: simhost.Host, plan: Plan) -> Dict[str, int]:
     """How often an apply makes each call."""
-    fresh(host)
-    plan = objects.plan(CHANGE)
     for name in names():
         host.fault(name, nth=NEVER, panic=(OSError, "never"))
     plan.apply()
@@ -72,8 +70,7 @@ def names() -> List[str]:
     ]
 
 
-def outcome(host: simhost.Host, objects: Host, fault: Dict[str, Any]) -> Optional[HostError]:
-    plan = objects.plan(CHANGE)
+def outcome(host: simhost.Host, plan: Plan, fault: Dict[str, Any]) -> Optional[HostError]:
     host.fault(**fault)
     try:
         plan.apply()
@@ -99,7 +96,8 @@ def differences(before: Dict[str, Any], now: Dict[str, Any]) -> Iterator[Tuple[s
             alias, where = place
             path = f"{alias}/{where}" if where else alias
             clients = ("desk-1", "desk-2", "desk-3", "desk-4", "new", "", "host")
-            yield (path,) if where in clients else (path, f"{alias}: uplink ports")
+            whole = (path, f"{alias}: it was removed", f"{alias} (nobody knows")
+            yield whole if where in clients else (*whole, f"{alias}: uplink ports")
     for key, name in (("runtime_options", "options"), ("mac_learning", "mac_learning")):
         if before[key] != now[key]:
             yield (name,)
@@ -117,6 +115,10 @@ def check(before: Dict[str, Any], wanted: Dict[str, Any], now: Dict[str, Any], e
         assert now == before, str(error)
 
 
+def is_of_change(name: str) -> bool:
+    return any(word in name for word in ("Set", "Add", "Remove", "Clear", "Destroy"))
+
+
 def faults_of(name: str, count: int) -> Iterator[Dict[str, Any]]:
     """Each call in turn: of a change in every way, of a question in one way after the other."""
     trap: Dict[str, Any] = {"panic": (OSError, "the device is gone")}
@@ -127,24 +129,60 @@ def faults_of(name: str, count: int) -> Iterator[Dict[str, Any]]:
     # An item is copied by three calls, hundreds of times.
     step = 13 if name.startswith("DVSData_") else 1
     for at, nth in enumerate(range(1, count + 1, step)):
-        of_change = any(word in name for word in ("Set", "Add", "Remove", "Clear"))
+        of_change = is_of_change(name)
         for way in ways if of_change else [ways[at % len(ways)]]:
             yield {"call": name, "nth": nth, **way}
 
 
 @pytest.mark.leaves_host_memory("of a deallocator that traps nobody knows what it did")
 def test_each_call_of_an_apply_in_turn(host: simhost.Host, objects: Host) -> None:
-    calls = calls_of(host, objects)
+    fresh(host)
+    calls = calls_of(host, objects.plan(CHANGE))
     wanted = everything(host)
     seen: Set[Any] = set()
     assert len(calls) > 40
     for name, count in calls.items():
         for fault in faults_of(name, count):
             before = fresh(host)
-            error = outcome(host, objects, fault)
+            error = outcome(host, objects.plan(CHANGE), fault)
             check(before, wanted, everything(host), error)
             seen.add(type(error))
             if error is None or type(error) is RolledBack:
                 objects.plan(CHANGE).apply()
                 assert objects.plan(CHANGE).changes == ()
     assert {RolledBack, NotRestored} <= seen
+
+
+@pytest.mark.leaves_host_memory("of a deallocator that traps nobody knows what it did")
+def test_each_change_of_a_restore_in_turn(host: simhost.Host, objects: Host) -> None:
+    """An uplink has moved to a switch that goes again, and comes back to its port."""
+
+    def changed() -> Plan:
+        fresh(host)
+        document = objects.state()
+        objects.switches["vswitch0"].uplinks["nic5"].remove()
+        objects.add_switch("new", uplinks=["nic5"]).add_port("a")
+        objects.options["IGMPVersion"] = 3
+        lab = objects.switches["lab"]
+        del lab.teaming
+        lab.add_port("new")
+        lab.ports["desk-3"].vlan = 9
+        return objects.plan(document, whole=True)
+
+    calls = calls_of(host, changed())
+    wanted = everything(host)
+    faults = [
+        fault
+        for name, count in calls.items()
+        if is_of_change(name)
+        for fault in faults_of(name, count)
+    ]
+    assert len(faults) > 20
+    for fault in faults:
+        plan = changed()
+        before = everything(host)
+        error = outcome(host, plan, fault)
+        assert error is not None, fault
+        check(before, wanted, everything(host), error)
+        plan.apply()
+        assert plan.changes == ()
