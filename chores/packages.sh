@@ -6,7 +6,7 @@ build_packages='cmake ninja-build g++ swig python3-dev libsqlitecpp-dev libsqlit
 command_packages='python3-typer python3-rich python3-yaml'
 docs_packages='python3-sphinx python3-myst-parser furo'
 test_packages="libgtest-dev libgmock-dev python3-pytest python3-pytest-xdist python3-hypothesis
-  openvswitch-switch valgrind nodejs uidmap groff-base $command_packages $docs_packages"
+  openvswitch-switch iproute2 valgrind nodejs uidmap groff-base $command_packages $docs_packages"
 check_packages=git
 fuzz_packages='clang libclang-rt-14-dev'
 lint_packages='clang-format clang-tidy shellcheck black flake8 mypy'

@@ -31,7 +31,7 @@ struct OutputTruncated {
   friend auto operator<=>(OutputTruncated const &, OutputTruncated const &) = default;
 };
 
-/// As a packet-in, with at most so many of the frame's bytes.
+/// As a packet-in. Open vSwitch may send the whole frame all the same.
 struct ToController {
   std::uint16_t most_bytes = 0xffff;
   friend auto operator<=>(ToController const &, ToController const &) = default;
@@ -111,7 +111,7 @@ struct Learn {
   bool deletes_learned = false;  // with the flow that has this action
   std::uint32_t limit = 0;  // how many flows of the table may have the cookie, 0 for any number
   std::optional<SubField> result = std::nullopt;  // a bit: whether the limit allowed it
-  std::vector<std::variant<LearnedMatch, LearnedLoad, LearnedOutput>> specs;
+  std::vector<std::variant<LearnedMatch, LearnedLoad, LearnedOutput>> specs{};
   friend auto operator<=>(Learn const &, Learn const &) = default;
 };
 

@@ -1,7 +1,10 @@
 // The fields of frames and of their metadata that flows match and change.
 #pragma once
 
+#include <compare>
+#include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string_view>
 
 #include "planes/openvswitch/openflow/value.h"
@@ -73,13 +76,22 @@ inline constexpr Value kVlanPresent = 0x1000;
 /// How the content of a field reads in text.
 enum class Form : std::uint8_t { decimal, hexadecimal, port, ethernet, ipv4, ipv6 };
 
+/// The number of a field on the wire.
+struct FieldId {
+  std::uint16_t oxm_class;
+  std::uint8_t number;
+
+  friend auto operator<=>(FieldId const &, FieldId const &) = default;
+};
+inline constexpr std::uint16_t kExperimenterClass = 0xffff;  // all of ours are of one experimenter
+
 /// What there is to know of a field.
 struct FieldInfo {
   std::string_view name;        // where it is set, learned or hashed: eth_dst
   std::string_view match_name;  // in a match: dl_dst
   std::string_view part_name;   // where a part of it is meant: NXM_OF_ETH_DST
-  std::uint16_t oxm_class;
-  std::uint8_t oxm_field;
+  FieldId oxm;
+  FieldId nxm;         // the older number, or the same
   std::uint8_t bytes;  // on the wire
   std::uint8_t bits;
   Form form;
@@ -87,6 +99,8 @@ struct FieldInfo {
 };
 
 FieldInfo const &info(Field field);
+/// By either number.
+std::optional<Field> find_field(FieldId id);
 /// Register `number`, of 16.
 Field reg(unsigned number);
 /// All the bits that a match or a SetField may name: those of the field, and kVlanPresent.

@@ -14,12 +14,12 @@ namespace simhost::openflow {
 struct Flow {
   std::uint8_t table = 0;
   std::uint16_t priority = 0x8000;
-  Match match;
+  Match match{};
   std::uint64_t cookie = 0;
   std::uint16_t idle_timeout = 0;  // seconds, 0 for never
   std::uint16_t hard_timeout = 0;
   bool tells_removal = false;  // the switch sends a FlowRemoved when the flow goes
-  Actions actions;             // none: the frame is dropped
+  Actions actions{};           // none: the frame is dropped
 
   friend auto operator<=>(Flow const &, Flow const &) = default;
 };

@@ -19,7 +19,7 @@ struct Bucket {
   // It is live while this port is; and while this group has a live bucket.
   Port watch_port = kAnyPort;
   GroupId watch_group = kAnyGroup;
-  Actions actions;
+  Actions actions{};
 
   friend auto operator<=>(Bucket const &, Bucket const &) = default;
 };
@@ -45,7 +45,7 @@ struct Group {
   GroupId id = 0;  // up to 0xffffff00
   GroupType type = GroupType::all;
   Selection selection{};
-  std::vector<Bucket> buckets;
+  std::vector<Bucket> buckets{};
 
   friend auto operator<=>(Group const &, Group const &) = default;
 };

@@ -1,0 +1,314 @@
+#include "planes/openvswitch/openflow/connection.h"
+
+#include <utility>
+
+#include "planes/openvswitch/openflow/codec/messages.h"
+#include "planes/openvswitch/openflow/codec/replies.h"
+#include "planes/openvswitch/openflow/codec/requests.h"
+
+namespace simhost::openflow {
+namespace {
+
+Header header_of(BytesView message) {
+  Reader in(message);
+  return take_header(in);
+}
+
+Reader payload_of(BytesView message) {
+  return Reader(message.subspan(kHeaderSize));
+}
+
+ErrorReply error_of(BytesView message) {
+  auto in = payload_of(message);
+  return take_error(in, header_of(message).xid);
+}
+
+bool is_flow_update(BytesView message) {
+  auto in = payload_of(message);
+  return take_multipart_header(in).type == MultipartType::flow_monitor;
+}
+
+}  // namespace
+
+Connection::Connection(std::filesystem::path const &socket, Deadline deadline)
+    : stream_(socket, deadline) {
+  greet(deadline);
+}
+
+void Connection::greet(Deadline deadline) {
+  Writer out;
+  put_hello(out, next_xid());
+  send(out);
+  auto const message = wait_for_message(deadline);
+  auto const header = header_of(message);
+  if (header.type == MessageType::error) {
+    throw Refused(error_of(message));
+  }
+  if (header.type != MessageType::hello) {
+    throw Malformed("the switch does not begin with a hello");
+  }
+  if (header.version < kVersion) {
+    throw Refused(ErrorReply{});
+  }
+}
+
+void Connection::send(Writer const &out) {
+  stream_.send(out.bytes());
+}
+
+std::optional<Connection::Message> Connection::take_message() {
+  auto const left = BytesView(received_).subspan(taken_);
+  if (left.size() < kHeaderSize) {
+    return std::nullopt;
+  }
+  auto const header = header_of(left);
+  if (header.length < kHeaderSize) {
+    throw Malformed("a message is shorter than its header");
+  }
+  if (left.size() < header.length) {
+    return std::nullopt;
+  }
+  auto const message = left.first(header.length);
+  taken_ += header.length;
+  return Message(message.begin(), message.end());
+}
+
+void Connection::receive() {
+  received_.erase(received_.begin(), received_.begin() + static_cast<std::ptrdiff_t>(taken_));
+  taken_ = 0;
+  stream_.send({});
+  stream_.receive(received_);
+}
+
+Connection::Message Connection::wait_for_message(Deadline deadline) {
+  while (true) {
+    if (auto message = take_message()) {
+      return std::move(*message);
+    }
+    stream_.wait_to_receive(deadline);
+    receive();
+  }
+}
+
+bool Connection::is_handled(Message const &message, Xid first_xid, Xid last_xid) {
+  auto const header = header_of(message);
+  auto in = payload_of(message);
+  // Open vSwitch sends some errors as if they were of OpenFlow 1.0.
+  if (header.version != kVersion && header.type != MessageType::error) {
+    throw Malformed("a message is of another version of OpenFlow");
+  }
+  switch (header.type) {
+    case MessageType::echo_request: {
+      Writer out;
+      put_echo_reply(out, header.xid, in.rest());
+      send(out);
+      return true;
+    }
+    case MessageType::packet_in:
+      events_.emplace_back(take_packet_in(in));
+      return true;
+    case MessageType::flow_removed:
+      events_.emplace_back(take_flow_removed(in));
+      return true;
+    case MessageType::port_status:
+      events_.emplace_back(take_port_status(in));
+      return true;
+    default:
+      break;
+  }
+  if (header.xid >= first_xid && header.xid <= last_xid) {
+    return false;
+  }
+  if (header.type == MessageType::error) {
+    events_.emplace_back(take_error(in, header.xid));
+  } else if (header.type == MessageType::multipart_reply && is_flow_update(message)) {
+    take_multipart_header(in);
+    while (!in.empty()) {
+      events_.emplace_back(take_flow_update(in));
+    }
+  }
+  // Whatever else it is, nobody waits for it any more.
+  return true;
+}
+
+std::optional<Event> Connection::next_event() {
+  while (events_.empty()) {
+    auto const message = take_message();
+    if (!message) {
+      return std::nullopt;
+    }
+    is_handled(*message, 1, 0);
+  }
+  auto event = std::move(events_.front());
+  events_.pop_front();
+  return event;
+}
+
+Connection::Message Connection::wait_for_reply(Xid xid, Deadline deadline) {
+  while (true) {
+    auto message = wait_for_message(deadline);
+    if (is_handled(message, xid, xid)) {
+      continue;
+    }
+    if (header_of(message).type == MessageType::error) {
+      throw Refused(error_of(message));
+    }
+    return message;
+  }
+}
+
+void Connection::send(PacketOut const &packet) {
+  Writer out;
+  put_packet_out(out, next_xid(), packet);
+  send(out);
+}
+
+void Connection::barrier(Deadline deadline) {
+  Writer out;
+  auto const xid = next_xid();
+  put_barrier_request(out, xid);
+  send(out);
+  wait_for_reply(xid, deadline);
+}
+
+void Connection::set_async(AsyncMessages const &wanted, Deadline deadline) {
+  // It has no reply but the error, which comes before that of the barrier.
+  Writer out;
+  auto const xid = next_xid();
+  put_set_async(out, xid, wanted);
+  put_barrier_request(out, xid);
+  send(out);
+  wait_for_reply(xid, deadline);
+}
+
+std::optional<ErrorReply> Connection::wait_for_errors(Xid first, Xid last, Deadline deadline) {
+  std::optional<ErrorReply> error;
+  while (true) {
+    auto const message = wait_for_message(deadline);
+    if (is_handled(message, first, last)) {
+      continue;
+    }
+    auto const header = header_of(message);
+    if (header.type == MessageType::error && !error) {
+      error = error_of(message);
+    }
+    if (header.xid == last) {
+      return error;
+    }
+  }
+}
+
+void Connection::control(std::uint32_t bundle, BundleControl control) {
+  Writer out;
+  put_bundle_control(out, next_xid(), bundle, control);
+  send(out);
+}
+
+void Connection::change(Changes const &changes, Deadline deadline) {
+  auto const bundle = ++bundle_;
+  auto const open = next_xid();
+  Writer out;
+  put_bundle_control(out, open, bundle, BundleControl::open);
+  for (auto const &change : changes) {
+    put_bundle_add(out, next_xid(), bundle, change);
+  }
+  send(out);
+  // The reply to this comes after the errors of the changes; a commit that did not wait for it
+  // would make those that are no error.
+  control(bundle, BundleControl::close);
+  auto error = wait_for_errors(open, xid_, deadline);
+  control(bundle, error ? BundleControl::discard : BundleControl::commit);
+  auto const late_error = wait_for_errors(open, xid_, deadline);
+  if (!error && !late_error) {
+    return;
+  }
+  error = error ? error : late_error;
+  auto const index = error->xid - open - 1;
+  if (index >= changes.size()) {
+    throw Refused(*error);
+  }
+  throw ChangeRefused(index, to_text(changes[index]), *error);
+}
+
+template <typename Item, typename Put, typename Take>
+std::vector<Item> Connection::ask(Put const &put, Take const &take, Deadline deadline) {
+  Writer out;
+  auto const xid = next_xid();
+  put(out, xid);
+  send(out);
+  std::vector<Item> items;
+  while (true) {
+    auto const message = wait_for_reply(xid, deadline);
+    auto in = payload_of(message);
+    if (header_of(message).type != MessageType::multipart_reply) {
+      throw Malformed("the reply is of another kind than the request");
+    }
+    auto const header = take_multipart_header(in);
+    while (!in.empty()) {
+      items.push_back(take(in));
+    }
+    if (!header.has_more) {
+      return items;
+    }
+  }
+}
+
+std::vector<FlowEntry> Connection::flows(FlowFilter const &filter, Deadline deadline) {
+  return ask<FlowEntry>(
+      [&](Writer &out, Xid xid) { put_flows_request(out, xid, MultipartType::flows, filter); },
+      take_flow, deadline);
+}
+
+Aggregate Connection::aggregate(FlowFilter const &filter, Deadline deadline) {
+  auto const all = ask<Aggregate>(
+      [&](Writer &out, Xid xid) { put_flows_request(out, xid, MultipartType::aggregate, filter); },
+      take_aggregate, deadline);
+  if (all.size() != 1) {
+    throw Malformed("the reply has no aggregate, or several");
+  }
+  return all.front();
+}
+
+std::vector<PortStatistics> Connection::port_statistics(Port port, Deadline deadline) {
+  return ask<PortStatistics>(
+      [&](Writer &out, Xid xid) {
+        put_ports_request(out, xid, MultipartType::port_statistics, port);
+      },
+      take_port_statistics, deadline);
+}
+
+std::vector<PortDescription> Connection::ports(Deadline deadline) {
+  return ask<PortDescription>(
+      [&](Writer &out, Xid xid) { put_ports_request(out, xid, MultipartType::ports, kAnyPort); },
+      take_port_description, deadline);
+}
+
+std::vector<GroupEntry> Connection::groups(Deadline deadline) {
+  return ask<GroupEntry>(
+      [&](Writer &out, Xid xid) {
+        put_groups_request(out, xid, MultipartType::groups, kAllGroups);
+      },
+      take_group, deadline);
+}
+
+std::vector<GroupStatistics> Connection::group_statistics(Deadline deadline) {
+  return ask<GroupStatistics>(
+      [&](Writer &out, Xid xid) {
+        put_groups_request(out, xid, MultipartType::group_statistics, kAllGroups);
+      },
+      take_group_statistics, deadline);
+}
+
+std::vector<FlowUpdate> Connection::monitor_flows(std::uint32_t monitor, FlowFilter const &filter,
+                                                  Deadline deadline) {
+  return ask<FlowUpdate>(
+      [&](Writer &out, Xid xid) { put_flow_monitor_request(out, xid, monitor, filter); },
+      take_flow_update, deadline);
+}
+
+void Connection::cancel_monitor(std::uint32_t monitor, Deadline deadline) {
+  ask<FlowUpdate>([&](Writer &out, Xid xid) { put_flow_monitor_cancel(out, xid, monitor); },
+                  take_flow_update, deadline);
+}
+
+}  // namespace simhost::openflow

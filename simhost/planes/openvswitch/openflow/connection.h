@@ -1,0 +1,98 @@
+// A connection to a bridge of Open vSwitch, in OpenFlow 1.5.
+#pragma once
+
+#include <cstdint>
+#include <deque>
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "planes/openvswitch/openflow/change.h"
+#include "planes/openvswitch/openflow/replies.h"
+#include "planes/openvswitch/openflow/requests.h"
+#include "planes/openvswitch/transport/unix_stream.h"
+
+namespace simhost::openflow {
+
+class Writer;
+enum class BundleControl : std::uint16_t;
+
+using openvswitch::Deadline;
+
+/// Requests wait for their replies until a deadline; what the switch sends by itself in the
+/// meantime is kept for next_event(). A connection that threw Disconnected, TimedOut or Malformed
+/// is of no more use: its owner makes another one.
+class Connection {
+ public:
+  /// `socket` is BRIDGE.mgmt in Open vSwitch's run folder. Throws Disconnected, TimedOut, and
+  /// Refused by a switch that speaks another version.
+  Connection(std::filesystem::path const &socket, Deadline deadline);
+
+  /// For poll(2): readable when there is something to receive.
+  [[nodiscard]] int fd() const { return stream_.fd(); }
+  /// Whether poll(2) should tell when fd() is writable, for receive().
+  [[nodiscard]] bool has_unsent() const { return stream_.has_unsent(); }
+
+  // None of these waits. They throw Disconnected and Malformed.
+
+  /// Reads what is there, and sends what is left.
+  void receive();
+  /// What the switch sent by itself, in its order; none when all is told.
+  std::optional<Event> next_event();
+  /// A frame to send. If the switch refuses it, an ErrorReply is an event later.
+  void send(PacketOut const &packet);
+
+  // These wait. They throw Disconnected, TimedOut, Malformed and Refused.
+
+  /// Makes all of the changes in their order, or none of them: throws ChangeRefused, which says
+  /// which one was refused. After TimedOut nobody knows whether they are made.
+  void change(Changes const &changes, Deadline deadline);
+  /// Returns when the switch is done with all that it was sent.
+  void barrier(Deadline deadline);
+  /// From now on it sends these by itself.
+  void set_async(AsyncMessages const &wanted, Deadline deadline);
+
+  std::vector<FlowEntry> flows(FlowFilter const &filter, Deadline deadline);
+  Aggregate aggregate(FlowFilter const &filter, Deadline deadline);
+  std::vector<PortStatistics> port_statistics(Port port, Deadline deadline);
+  std::vector<PortDescription> ports(Deadline deadline);
+  std::vector<GroupEntry> groups(Deadline deadline);
+  std::vector<GroupStatistics> group_statistics(Deadline deadline);
+  /// From now on each change of such flows, its own too, is an event. Returns what there is.
+  /// `monitor` is a number of one's own.
+  std::vector<FlowUpdate> monitor_flows(std::uint32_t monitor, FlowFilter const &filter,
+                                        Deadline deadline);
+  /// Ends one that there is. For others Open vSwitch has no reply that tells what it is about.
+  void cancel_monitor(std::uint32_t monitor, Deadline deadline);
+
+ private:
+  using Message = std::vector<std::uint8_t>;
+
+  std::uint32_t next_xid() { return ++xid_; }
+  void send(Writer const &out);
+  void greet(Deadline deadline);
+  /// The next whole message that is received already.
+  std::optional<Message> take_message();
+  Message wait_for_message(Deadline deadline);
+  /// Replies to an echo, keeps an event; returns whether it was one of those.
+  bool is_handled(Message const &message, std::uint32_t first_xid, std::uint32_t last_xid);
+  /// The reply to a request, or the error: throws Refused.
+  Message wait_for_reply(std::uint32_t xid, Deadline deadline);
+  /// Takes replies to requests of these numbers until the last one's, and returns the first error.
+  std::optional<ErrorReply> wait_for_errors(std::uint32_t first, std::uint32_t last,
+                                            Deadline deadline);
+  void control(std::uint32_t bundle, BundleControl control);
+  /// All items of a multipart reply.
+  template <typename Item, typename Put, typename Take>
+  std::vector<Item> ask(Put const &put, Take const &take, Deadline deadline);
+
+  openvswitch::UnixStream stream_;
+  std::vector<std::uint8_t> received_;
+  std::size_t taken_ = 0;  // of that
+  std::deque<Event> events_;
+  std::uint32_t xid_ = 0;
+  std::uint32_t bundle_ = 0;
+};
+
+}  // namespace simhost::openflow

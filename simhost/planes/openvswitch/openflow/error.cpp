@@ -1,0 +1,136 @@
+// Errors with the numbers of OpenFlow 1.5, and the names that Open vSwitch has for them.
+#include "planes/openvswitch/openflow/error.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+
+namespace simhost::openflow {
+
+std::vector<ErrorName> const &error_names() {
+  static std::vector<ErrorName> const names{
+      {0, 0, "OFPHFC_INCOMPATIBLE", "no version of OpenFlow is common"},
+      {0, 1, "OFPHFC_EPERM", "the connection is not allowed"},
+      {1, 0, "OFPBRC_BAD_VERSION", "the version of OpenFlow is unknown"},
+      {1, 1, "OFPBRC_BAD_TYPE", "the kind of message is unknown"},
+      {1, 2, "OFPBRC_BAD_STAT", "the kind of multipart request is unknown"},
+      {1, 3, "OFPBRC_BAD_VENDOR", "the experimenter is unknown"},
+      {1, 4, "OFPBRC_BAD_SUBTYPE", "the experimenter's kind of message is unknown"},
+      {1, 5, "OFPBRC_EPERM", "the message is not allowed"},
+      {1, 6, "OFPBRC_BAD_LEN", "the message has a wrong length"},
+      {1, 7, "OFPBRC_BUFFER_EMPTY", "the buffer has been used"},
+      {1, 8, "OFPBRC_BUFFER_UNKNOWN", "there is no such buffer"},
+      {1, 9, "OFPBRC_BAD_TABLE_ID", "there is no such table"},
+      {1, 10, "OFPBRC_IS_SECONDARY", "another controller is the master"},
+      {1, 11, "OFPBRC_BAD_PORT", "there is no such port"},
+      {1, 12, "OFPBRC_BAD_PACKET", "the frame is damaged"},
+      {1, 13, "OFPBRC_MULTIPART_BUFFER_OVERFLOW", "the request is too long"},
+      {2, 0, "OFPBAC_BAD_TYPE", "the kind of action is unknown"},
+      {2, 1, "OFPBAC_BAD_LEN", "an action has a wrong length"},
+      {2, 2, "OFPBAC_BAD_VENDOR", "the experimenter of an action is unknown"},
+      {2, 3, "OFPBAC_BAD_VENDOR_TYPE", "the experimenter's kind of action is unknown"},
+      {2, 4, "OFPBAC_BAD_OUT_PORT", "no frame can leave at the port of an action"},
+      {2, 5, "OFPBAC_BAD_ARGUMENT", "an argument of an action is wrong"},
+      {2, 6, "OFPBAC_EPERM", "an action is not allowed"},
+      {2, 7, "OFPBAC_TOO_MANY", "there are too many actions"},
+      {2, 8, "OFPBAC_BAD_QUEUE", "the queue of an action is wrong"},
+      {2, 9, "OFPBAC_BAD_OUT_GROUP", "the group of an action does not exist"},
+      {2, 10, "OFPBAC_MATCH_INCONSISTENT", "an action does not fit the frames that match"},
+      {2, 11, "OFPBAC_UNSUPPORTED_ORDER", "the order of the actions is not supported"},
+      {2, 12, "OFPBAC_BAD_TAG", "the tag of an action is not supported"},
+      {2, 13, "OFPBAC_BAD_SET_TYPE", "the field that an action sets is unknown"},
+      {2, 14, "OFPBAC_BAD_SET_LEN", "the field that an action sets has another length"},
+      {2, 15, "OFPBAC_BAD_SET_ARGUMENT", "a field cannot have the content that an action sets"},
+      {2, 16, "OFPBAC_BAD_SET_MASK", "a field cannot be set under the mask of an action"},
+      {3, 0, "OFPBIC_UNKNOWN_INST", "the kind of instruction is unknown"},
+      {3, 1, "OFPBIC_UNSUP_INST", "the kind of instruction is not supported"},
+      {3, 2, "OFPBIC_BAD_TABLE_ID", "the table of an instruction is wrong"},
+      {3, 3, "OFPBIC_UNSUP_METADATA", "the metadata of an instruction are not supported"},
+      {3, 4, "OFPBIC_UNSUP_METADATA_MASK", "the mask of an instruction is not supported"},
+      {3, 5, "OFPBIC_BAD_EXPERIMENTER", "the experimenter of an instruction is unknown"},
+      {3, 6, "OFPBIC_BAD_EXP_TYPE", "the experimenter's kind of instruction is unknown"},
+      {3, 7, "OFPBIC_BAD_LEN", "an instruction has a wrong length"},
+      {3, 8, "OFPBIC_EPERM", "an instruction is not allowed"},
+      {3, 9, "OFPBIC_DUP_INST", "an instruction is there twice"},
+      {4, 0, "OFPBMC_BAD_TYPE", "the kind of match is unknown"},
+      {4, 1, "OFPBMC_BAD_LEN", "the match has a wrong length"},
+      {4, 2, "OFPBMC_BAD_TAG", "the tag of the match is not supported"},
+      {4, 3, "OFPBMC_BAD_DL_ADDR_MASK", "the mask of an Ethernet address is not supported"},
+      {4, 4, "OFPBMC_BAD_NW_ADDR_MASK", "the mask of a network address is not supported"},
+      {4, 5, "OFPBMC_BAD_WILDCARDS", "a field cannot be left out of the match"},
+      {4, 6, "OFPBMC_BAD_FIELD", "a field of the match is unknown"},
+      {4, 7, "OFPBMC_BAD_VALUE", "a field of the match cannot have its content"},
+      {4, 8, "OFPBMC_BAD_MASK", "a field of the match cannot have its mask"},
+      {4, 9, "OFPBMC_BAD_PREREQ", "a field of the match needs another one, which the match lacks"},
+      {4, 10, "OFPBMC_DUP_FIELD", "a field is in the match twice"},
+      {4, 11, "OFPBMC_EPERM", "the match is not allowed"},
+      {5, 0, "OFPFMFC_UNKNOWN", "the flow cannot be changed"},
+      {5, 1, "OFPFMFC_TABLE_FULL", "the table is full"},
+      {5, 2, "OFPFMFC_BAD_TABLE_ID", "there is no such table"},
+      {5, 3, "OFPFMFC_OVERLAP", "the flow overlaps another one"},
+      {5, 4, "OFPFMFC_EPERM", "the flow may not be changed"},
+      {5, 5, "OFPFMFC_BAD_TIMEOUT", "a timeout is not supported"},
+      {5, 6, "OFPFMFC_BAD_COMMAND", "the command is unknown"},
+      {5, 7, "OFPFMFC_BAD_FLAGS", "the flags are not supported"},
+      {6, 0, "OFPGMFC_GROUP_EXISTS", "the group exists"},
+      {6, 1, "OFPGMFC_INVALID_GROUP", "the group is wrong"},
+      {6, 2, "OFPGMFC_WEIGHT_UNSUPPORTED", "weights are not supported"},
+      {6, 3, "OFPGMFC_OUT_OF_GROUPS", "there are too many groups"},
+      {6, 4, "OFPGMFC_OUT_OF_BUCKETS", "there are too many buckets"},
+      {6, 5, "OFPGMFC_CHAINING_UNSUPPORTED", "groups cannot lead to groups"},
+      {6, 6, "OFPGMFC_WATCH_UNSUPPORTED", "what a bucket watches cannot be watched"},
+      {6, 7, "OFPGMFC_LOOP", "the group leads to itself"},
+      {6, 8, "OFPGMFC_UNKNOWN_GROUP", "there is no such group"},
+      {6, 9, "OFPGMFC_CHAINED_GROUP", "another group leads to this one"},
+      {6, 10, "OFPGMFC_BAD_TYPE", "the type of the group is unknown"},
+      {6, 11, "OFPGMFC_BAD_COMMAND", "the command is unknown"},
+      {6, 12, "OFPGMFC_BAD_BUCKET", "a bucket is wrong"},
+      {6, 13, "OFPGMFC_BAD_WATCH", "what a bucket watches is wrong"},
+      {6, 14, "OFPGMFC_EPERM", "the group may not be changed"},
+      {6, 15, "OFPGMFC_UNKNOWN_BUCKET", "there is no such bucket"},
+      {6, 16, "OFPGMFC_BUCKET_EXISTS", "the bucket exists"},
+      {12, 0, "OFPMMFC_UNKNOWN", "the meter cannot be used"},
+      {12, 1, "OFPMMFC_METER_EXISTS", "the meter exists"},
+      {12, 2, "OFPMMFC_INVALID_METER", "the meter is wrong"},
+      {12, 3, "OFPMMFC_UNKNOWN_METER", "there is no such meter"},
+      {15, 0, "OFPACFC_INVALID", "the choice of messages is wrong"},
+      {15, 1, "OFPACFC_UNSUPPORTED", "the choice of messages is not supported"},
+      {15, 2, "OFPACFC_EPERM", "the choice of messages is not allowed"},
+      {16, 0, "OFPMOFC_UNKNOWN", "flows cannot be monitored"},
+      {16, 1, "OFPMOFC_MONITOR_EXISTS", "the monitor exists"},
+      {16, 2, "OFPMOFC_INVALID_MONITOR", "the monitor is wrong"},
+      {16, 3, "OFPMOFC_UNKNOWN_MONITOR", "there is no such monitor"},
+      {16, 4, "OFPMOFC_BAD_COMMAND", "the command is unknown"},
+      {16, 5, "OFPMOFC_BAD_FLAGS", "the flags are not supported"},
+      {16, 6, "OFPMOFC_BAD_TABLE_ID", "there is no such table"},
+      {16, 7, "OFPMOFC_BAD_OUT", "what flows lead to cannot be monitored"},
+      {17, 0, "OFPBFC_UNKNOWN", "the bundle cannot be made"},
+      {17, 1, "OFPBFC_EPERM", "the bundle is not allowed"},
+      {17, 2, "OFPBFC_BAD_ID", "there is no such bundle"},
+      {17, 3, "OFPBFC_BUNDLE_EXIST", "the bundle exists"},
+      {17, 4, "OFPBFC_BUNDLE_CLOSED", "the bundle is closed"},
+      {17, 5, "OFPBFC_OUT_OF_BUNDLES", "there are too many bundles"},
+      {17, 6, "OFPBFC_BAD_TYPE", "the kind of bundle message is unknown"},
+      {17, 7, "OFPBFC_BAD_FLAGS", "the flags are not supported"},
+      {17, 8, "OFPBFC_MSG_BAD_LEN", "a message of the bundle has a wrong length"},
+      {17, 9, "OFPBFC_MSG_BAD_XID", "a message of the bundle has another number"},
+      {17, 10, "OFPBFC_MSG_UNSUP", "a message cannot be in a bundle"},
+      {17, 11, "OFPBFC_MSG_CONFLICT", "messages of the bundle cannot go together"},
+      {17, 12, "OFPBFC_MSG_TOO_MANY", "the bundle has too many messages"},
+      {17, 13, "OFPBFC_MSG_FAILED", "a message of the bundle is refused"},
+      {17, 14, "OFPBFC_TIMEOUT", "the bundle took too long"},
+  };
+  return names;
+}
+
+std::string to_text(ErrorReply const &error) {
+  auto const &names = error_names();
+  auto const found = std::find_if(names.begin(), names.end(), [&](ErrorName const &name) {
+    return name.type == error.type && name.code == error.code;
+  });
+  return found == names.end()
+             ? fmt::format("an error of type {} with code {}", error.type, error.code)
+             : fmt::format("{}: {}", found->name, found->words);
+}
+
+}  // namespace simhost::openflow

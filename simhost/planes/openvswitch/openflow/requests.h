@@ -1,0 +1,36 @@
+// What a switch is asked for.
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+#include "planes/openvswitch/openflow/action.h"
+#include "planes/openvswitch/openflow/change.h"
+#include "planes/openvswitch/openflow/match.h"
+#include "planes/openvswitch/openflow/port.h"
+
+namespace simhost::openflow {
+
+/// Which flows are meant: all unless it says otherwise.
+struct FlowFilter {
+  std::uint8_t table = kAllTables;
+  std::uint64_t cookie = 0;
+  std::uint64_t cookie_mask = 0;
+  Match match{};  // flows that match at least so much
+};
+
+/// A frame that the switch is to send.
+struct PacketOut {
+  Port in_port = kController;
+  Actions actions{};
+  std::vector<std::uint8_t> frame{};
+};
+
+/// Messages that a switch sends by itself.
+struct AsyncMessages {
+  bool packet_in = false;
+  bool port_status = false;
+  bool flow_removed = false;
+};
+
+}  // namespace simhost::openflow

@@ -1,0 +1,113 @@
+#include "planes/openvswitch/transport/unix_stream.h"
+
+#include <poll.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <thread>
+#include <utility>
+
+namespace simhost::openvswitch {
+namespace {
+
+constexpr std::size_t kChunk = 65536;
+
+events::Descriptor make_socket() {
+  int const number = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+  if (number < 0) {
+    throw Disconnected("no socket can be made: " + error_words(errno));
+  }
+  return events::Descriptor(number);
+}
+
+sockaddr_un address_of(std::filesystem::path const &path) {
+  sockaddr_un address{};
+  address.sun_family = AF_UNIX;
+  auto const &text = path.native();
+  if (text.size() >= sizeof address.sun_path) {
+    throw Disconnected(text + ": a socket's path has at most 107 bytes");
+  }
+  std::copy(text.begin(), text.end(), std::begin(address.sun_path));
+  return address;
+}
+
+}  // namespace
+
+UnixStream::UnixStream(std::filesystem::path path, Deadline deadline)
+    : path_(std::move(path)), socket_(make_socket()) {
+  auto const address = address_of(path_);
+  auto const *const generic = reinterpret_cast<sockaddr const *>(&address);
+  while (::connect(fd(), generic, sizeof address) != 0) {
+    // A full backlog tells nobody when there is room again.
+    if (errno != EAGAIN && errno != EINTR) {
+      fail(errno);
+    }
+    if (Deadline::clock::now() >= deadline) {
+      throw TimedOut(path_.native() + ": nobody accepts the connection in time");
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(1));
+  }
+}
+
+void UnixStream::fail(int error) const {
+  throw Disconnected(path_.native() + ": " + error_words(error));
+}
+
+void UnixStream::send(std::span<std::uint8_t const> bytes) {
+  unsent_.insert(unsent_.end(), bytes.begin(), bytes.end());
+  flush();
+}
+
+void UnixStream::flush() {
+  while (has_unsent()) {
+    auto const count =
+        ::send(fd(), unsent_.data() + sent_, unsent_.size() - sent_, MSG_NOSIGNAL | MSG_DONTWAIT);
+    if (count < 0 && errno == EAGAIN) {
+      return;
+    }
+    if (count < 0 && errno != EINTR) {
+      fail(errno);
+    }
+    sent_ += static_cast<std::size_t>(std::max<ssize_t>(count, 0));
+  }
+  unsent_.clear();
+  sent_ = 0;
+}
+
+bool UnixStream::receive(std::vector<std::uint8_t> &to) {
+  std::array<std::uint8_t, kChunk> chunk{};
+  auto const count = ::recv(fd(), chunk.data(), chunk.size(), MSG_DONTWAIT);
+  if (count < 0 && (errno == EAGAIN || errno == EINTR)) {
+    return false;
+  }
+  if (count < 0) {
+    fail(errno);
+  }
+  if (count == 0) {
+    throw Disconnected(path_.native() + ": the other side closed the connection");
+  }
+  to.insert(to.end(), chunk.begin(), chunk.begin() + count);
+  return true;
+}
+
+void UnixStream::wait_to_receive(Deadline deadline) {
+  while (true) {
+    flush();
+    pollfd polled{fd(), static_cast<short>(POLLIN | (has_unsent() ? POLLOUT : 0)), 0};
+    int const ready = ::poll(&polled, 1, milliseconds_until(deadline));
+    if (ready < 0 && errno != EINTR) {
+      fail(errno);
+    }
+    if (ready > 0 && (polled.revents & ~POLLOUT) != 0) {
+      return;
+    }
+    if (ready == 0 && Deadline::clock::now() >= deadline) {
+      throw TimedOut(path_.native() + ": no reply in time");
+    }
+  }
+}
+
+}  // namespace simhost::openvswitch

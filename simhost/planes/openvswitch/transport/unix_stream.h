@@ -1,0 +1,58 @@
+// A stream to another process over a unix socket, which never makes its owner wait unless asked to.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <filesystem>
+#include <span>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "events/descriptor.h"
+#include "planes/openvswitch/transport/system.h"
+
+namespace simhost::openvswitch {
+
+/// The other side cannot be reached, or is gone. what() names the socket and says why.
+class Disconnected : public std::runtime_error {
+ public:
+  using runtime_error::runtime_error;
+};
+
+/// The deadline passed.
+class TimedOut : public std::runtime_error {
+ public:
+  using runtime_error::runtime_error;
+};
+
+class UnixStream {
+ public:
+  /// Throws Disconnected, and TimedOut where nobody accepts.
+  UnixStream(std::filesystem::path path, Deadline deadline);
+
+  /// For poll(2): readable when there is something to receive.
+  [[nodiscard]] int fd() const { return socket_.number(); }
+  /// Whether poll(2) should tell when the socket is writable, for send({}).
+  [[nodiscard]] bool has_unsent() const { return sent_ < unsent_.size(); }
+
+  // These throw Disconnected.
+
+  /// Sends what the socket takes at once, and keeps the rest.
+  void send(std::span<std::uint8_t const> bytes);
+  /// Appends what is there. Returns whether that was anything.
+  bool receive(std::vector<std::uint8_t> &to);
+  /// Sends what is left until there is something to receive; throws TimedOut too.
+  void wait_to_receive(Deadline deadline);
+
+ private:
+  void flush();
+  [[noreturn]] void fail(int error) const;
+
+  std::filesystem::path path_;
+  events::Descriptor socket_;
+  std::vector<std::uint8_t> unsent_;
+  std::size_t sent_ = 0;  // of those
+};
+
+}  // namespace simhost::openvswitch
