@@ -15,7 +15,7 @@ from typing import Any, Dict, Iterator, List, Optional, Tuple
 import call_model
 import definitions
 import families
-from call_model import Argument, Call, Direction, Volatile
+from call_model import Argument, Call, Direction, Unit, Volatile
 from definitions import Definitions, Type
 
 HEAD = '''"""What the values of a trace mean, call by call. Written by python/make_meanings.py."""
@@ -38,8 +38,13 @@ class Meanings:
             "releases": call.releases.name if call.releases else "",
             "volatile": {path: kind.name for path, kind, _ in found if kind},
             "families": {path: family for path, _, family in found if family},
+            "required": [one.name for one in call.arguments if self._is_required(one)],
             "lengths": dict(_lengths(call)),
         }
+
+    def _is_required(self, one: Argument) -> bool:
+        """Whether a host may rely on it that something is there."""
+        return self._known.resolve(one.type).layers != () and not one.is_nullable
 
     def _values(self, call: Call) -> Iterator[_Found]:
         yield "result", call.result.volatile, families.of_type(call.result.type)
@@ -74,9 +79,9 @@ class Meanings:
 
 
 def _lengths(call: Call) -> Iterator[Tuple[str, str]]:
-    """Of each image that a caller gives, which argument says how many bytes it has."""
+    """Of memory that a caller gives, which argument says how long it is."""
     for one in call.inputs:
-        if one.volatile is Volatile.IMAGE and one.length is not None:
+        if one.length is not None and one.length.unit is not Unit.FORM:
             yield one.name, one.length.of
 
 

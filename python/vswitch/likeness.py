@@ -25,9 +25,9 @@ __all__ = [
     "Untranslated",
     "differences",
     "end_of",
-    "is_unread_within",
     "named",
     "translated",
+    "unread_in",
 ]
 
 _MAPPED = ("PORT_NUMBER", "SWITCH_ID", "PORTSET_NAME", "LAG_NUMBER")
@@ -136,11 +136,16 @@ def _pattern(path: str) -> str:
     return re.sub(r"\[\d+\]", "", path)
 
 
-def is_unread_within(value: Any) -> bool:
-    """Whether anything in a value could not be recorded."""
-    if isinstance(value, dict):
-        return "unread" in value or any(map(is_unread_within, value.values()))
-    return isinstance(value, list) and any(map(is_unread_within, value))
+def unread_in(path: str, value: Any) -> Iterator[str]:
+    """What of a value could not be recorded, and why."""
+    if isinstance(value, dict) and "unread" in value:
+        yield f"{path} was not recorded: {value['unread']}"
+    elif isinstance(value, dict):
+        for name, one in value.items():
+            yield from unread_in(f"{path}.{name}", one)
+    elif isinstance(value, list):
+        for at, one in enumerate(value):
+            yield from unread_in(f"{path}[{at}]", one)
 
 
 class _Comparison:
@@ -211,14 +216,30 @@ def translated(call: Call, known: Correspondence, address: Callable[[int], int])
     Untranslated says why it cannot be made.
     """
     meaning = CALLS[call.function]
+    for why in unread_in("in", call.inputs):
+        raise Untranslated(why)
+    _refuse_nulls(call.inputs, meaning)
     given = {
         name: _Translation(meaning["volatile"], known, address).of(f"in.{name}", value)
         for name, value in call.inputs.items()
     }
     for name, length in meaning["lengths"].items():
+        # An image may be longer here than it was.
         if isinstance(given.get(name), dict):
             given[length] = len(given[name]["bytes"]) // 2
     return given
+
+
+def _refuse_nulls(inputs: Dict[str, Any], meaning: Dict[str, Any]) -> None:
+    """No host need look before it reads or writes."""
+    for name, value in inputs.items():
+        if value is not None:
+            continue
+        if name in meaning["required"]:
+            raise Untranslated(f"in.{name} is null, and something must be there")
+        length = meaning["lengths"].get(name)
+        if length is not None and inputs.get(length) != 0:
+            raise Untranslated(f"in.{name} is null, and in.{length} is not 0")
 
 
 class _Translation:
@@ -235,8 +256,6 @@ class _Translation:
         if not isinstance(value, dict):
             kind = self._kinds.get(path)
             return self._known.present(kind, value) if kind else value
-        if "unread" in value:
-            raise Untranslated(f"{path} was not recorded: {value['unread']}")
         if "at" in value:
             is_own = self._kinds.get(path) == _CALLERS_OWN
             return {"at": value["at"] if is_own else self._address(value["at"])}

@@ -21,8 +21,8 @@ from vswitch.likeness import (
     Untranslated,
     differences,
     end_of,
-    is_unread_within,
     translated,
+    unread_in,
 )
 from vswitch.trace import Call, Callback, Process, Trace, TraceError, Trap
 
@@ -105,7 +105,8 @@ def _wrong_with(call: Call, host: Host) -> Optional[str]:
     if not _is_nested_less(values, _DEEPEST):
         return "its values are nested too deeply"
     # What could not be recorded is no mistake of the trace.
-    return None if is_unread_within(call.inputs) else host.check(call.function, call.inputs)
+    is_whole = next(unread_in("in", call.inputs), None) is None
+    return host.check(call.function, call.inputs) if is_whole else None
 
 
 def _is_nested_less(value: Any, deepest: int) -> bool:

@@ -1,12 +1,13 @@
 """`vswitch replay`: the calls of a trace are made again, and what differs is told."""
 
 import json
+import os
 import subprocess
 import sys
 from pathlib import Path
 
 import pytest
-from command_line import LAB, SIMULATED, Refused, Vswitch
+from command_line import LAB, PROGRAM, SIMULATED, Done, Refused, Vswitch
 from simhost import SharedHost
 from vswitch.recording import recorded
 
@@ -142,6 +143,32 @@ def test_what_is_wrong_with_a_list(refused: Refused, trace: str, tmp_path: Path)
     known.write_text("allowed:\n- {path: status}\n")
     told = refused("replay", trace, "--allow", str(known))
     assert told == f"vswitch: {known}: allowed[0]: 'reason' is missing\n"
+
+
+def test_a_real_host_is_changed_only_by_consent(trace: str) -> None:
+    # It is nobody's simulated host, and notes what it is asked.
+    real = os.path.join(os.environ["BUILD_DIR"], "tests", "recording_host")
+
+    def replay(*options: str) -> Done:
+        done = subprocess.run(
+            [PROGRAM, "replay", trace, *options],
+            env={**os.environ, "LD_LIBRARY_PATH": real},
+            stdout=subprocess.PIPE,
+            stderr=subprocess.PIPE,
+            text=True,
+        )
+        return Done(done.returncode, done.stdout, done.stderr)
+
+    refused = replay()
+    assert (refused.status, refused.stdout) == (2, "")
+    assert refused.stderr.startswith(
+        "vswitch: this is a real host: --questions-only leaves out what may change it, "
+        "--change-host does not\n"
+    )
+    of = replay("--questions-only", "--json").json["functions"]["VSDVS_SetMTU"]
+    assert (of["left_out"], of["calls"]) == (1, 1)
+    of = replay("--change-host", "--json").json["functions"]["VSDVS_SetMTU"]
+    assert (of["alike"], of["calls"]) == (1, 1)
 
 
 def test_usage(refused: Refused, trace: str) -> None:

@@ -188,7 +188,7 @@ def test_what_is_of_two_kinds_differs(recorded: Any, present: Any, found: List[A
 
 
 def test_what_was_not_recorded_cannot_be_given() -> None:
-    unread: Dict[str, Any] = {"list": None, "data": {"unread": "no memory is there"}}
+    unread: Dict[str, Any] = {"list": {"at": 1}, "data": {"unread": "no memory is there"}}
     with pytest.raises(Untranslated, match="^in.data was not recorded: no memory is there$"):
         translated(call("DVSData_Update", unread), Correspondence(), int)
 
@@ -203,3 +203,37 @@ def test_addresses_are_those_of_the_present_host() -> None:
         "callback": {"at": 4},
         "context": {"at": 5},
     }
+
+
+@pytest.mark.parametrize(
+    "function, inputs, said",
+    [
+        (
+            "VSDVS_SetMTU",
+            {"switchName": None, "mtu": 1500},
+            "in.switchName is null, and something must be there",
+        ),
+        (
+            "VSDVS_GetMTU",
+            {"switchName": "lab", "mtu": None},
+            "in.mtu is null, and something must be there",
+        ),
+        (
+            "DVSQEX_StateInit",
+            {"state": None, "length": 9},
+            "in.state is null, and in.length is not 0",
+        ),
+    ],
+)
+def test_no_null_is_given_that_no_host_need_expect(
+    function: str, inputs: Dict[str, Any], said: str
+) -> None:
+    with pytest.raises(Untranslated, match=f"^{said}$"):
+        translated(call(function, inputs), Correspondence(), int)
+
+
+def test_nulls_that_hosts_expect_are_given() -> None:
+    empty = call("DVSQEX_StateInit", {"state": None, "length": 0})
+    assert translated(empty, Correspondence(), int) == {"state": None, "length": 0}
+    named_by_host = call("VSDVS_CreateVSwitch", {"alias": "a", "switchId": None})
+    assert translated(named_by_host, Correspondence(), int)["switchId"] is None

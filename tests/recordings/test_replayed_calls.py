@@ -9,19 +9,19 @@ import pytest
 from recordings import RECORDING, record
 from test_recorded_calls import EVERY_CALL
 from test_recorded_shapes import SCENARIO, TOOL
-from vswitch.likeness import is_unread_within
+from vswitch.likeness import unread_in
 from vswitch.trace import Call, Trace
 
 # Over the recording host, for which an address is a number like any other.
 ONE_BY_ONE = """
 from vswitch._replayer import PresentHost
-from vswitch.likeness import is_unread_within
+from vswitch.likeness import unread_in
 from vswitch.trace import Trace
 
 host = PresentHost()
 with Trace({trace!r}) as trace:
     for call in trace:
-        if call.function != "Panic" and not is_unread_within(call.inputs):
+        if call.function != "Panic" and not any(unread_in("in", call.inputs)):
             host.make(call.function, call.inputs, lambda argument, inputs: 0)
 """
 
@@ -76,7 +76,7 @@ def test_every_call_is_given_what_it_was_recorded_with(tmp_path: Path) -> None:
     made = record(ONE_BY_ONE.format(trace=str(first)), second, RECORDING)
     assert made.status == 0, made.stderr
     all_ = [(function, values[0]) for function, _, values, _ in calls_of(first)]
-    given = [one for one in all_ if one[0] != "Panic" and not is_unread_within(one[1])]
+    given = [one for one in all_ if one[0] != "Panic" and not any(unread_in("in", one[1]))]
     assert len({name for name, _ in all_}) == 146 and len({name for name, _ in given}) > 135
     assert [(function, values[0]) for function, _, values, _ in calls_of(second)] == given
 

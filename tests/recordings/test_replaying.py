@@ -202,7 +202,7 @@ def test_what_cannot_be_made_is_told_with_its_reason(tmp_path: Path) -> None:
         end(1),
         event(2, "VSDVS_FreeMemory", {"memory": {"at": 9}}),
         end(2),
-        event(3, "DVSData_Update", {"list": None, "data": {"unread": "it is gone"}}),
+        event(3, "DVSQEX_CmdExec", {"switchId": "x", "input": {"unread": "it is gone"}}),
         end(3, status=0),
         event(4, "DVSQEX_StateSanitize", {}),
         end(4, left=True),
@@ -220,7 +220,7 @@ def test_what_cannot_be_made_is_told_with_its_reason(tmp_path: Path) -> None:
     assert {name: found[2] for name, found in first(report).items()} == {
         "Panic": "what follows its format is not recorded",
         "VSDVS_FreeMemory": UNKNOWN,
-        "DVSData_Update": "in.data was not recorded: it is gone",
+        "DVSQEX_CmdExec": "in.input was not recorded: it is gone",
         "DVSQEX_StateSanitize": "the tool left it by a jump",
         "DVSState_PortForEach": UNKNOWN,
         "DVS_PortId": "the walk that it was made in was not made",
