@@ -1,8 +1,9 @@
 """Making the calls of a trace again, on the host of this process, and what became of them.
 
-    report = replay(Path("trace.jsonl"))
+    check(path, host)
+    report = replay(path, host)
     for name, of in report.functions.items():
-        print(name, of.made, of.alike, of.first)
+        print(name, of.calls, of.alike, of.first)
 
 Calls are made one after the other in the order in which they ended, whichever process and thread
 made them; those of a callback within the walk that calls back. However long the trace is, it takes

@@ -8,8 +8,13 @@ from pathlib import Path
 
 import pytest
 from command_line import LAB, PROGRAM, SIMULATED, Done, Refused, Vswitch
+from libvswitch.errors import NotRestored
 from simhost import SharedHost
+from vswitch import replay
+from vswitch.allowing import Allowances
+from vswitch.command import replaying
 from vswitch.recording import recorded
+from vswitch.trace import TraceError
 
 
 # Where there are these two switches, too.
@@ -58,6 +63,14 @@ def test_the_first_difference_is_told_in_words(
     (told,) = [line for line in done.lines if line.startswith("VSDVS_SetMTU:")]
     assert told.startswith("VSDVS_SetMTU: status: QEX_OK -> QEX_BUSY [call ")
     assert "VSDVS_GetMTU: out.mtu: 1600 -> 9000" in done.stdout
+
+
+def test_what_else_differs_is_counted(vswitch: Vswitch, lab: SharedHost, trace: str) -> None:
+    lab.apply({"switches": [{"alias": "lab", "mtu": 1700, "ports": [{"id": "x"}]}]})
+    done = vswitch("replay", trace)
+    told = [line for line in done.lines if line.startswith("VSQEX_GetVSInfo: ")]
+    assert told[0].startswith("VSQEX_GetVSInfo: out.info.mtu: 9000 -> 1700 [call ")
+    assert told[1] == "VSQEX_GetVSInfo: out.info.activePorts in 6"
 
 
 def test_json(vswitch: Vswitch, lab: SharedHost, trace: str) -> None:
@@ -149,7 +162,7 @@ def test_a_real_host_is_changed_only_by_consent(trace: str) -> None:
     # It is nobody's simulated host, and notes what it is asked.
     real = os.path.join(os.environ["BUILD_DIR"], "tests", "recording_host")
 
-    def replay(*options: str) -> Done:
+    def asked(*options: str) -> Done:
         done = subprocess.run(
             [PROGRAM, "replay", trace, *options],
             env={**os.environ, "LD_LIBRARY_PATH": real},
@@ -159,16 +172,30 @@ def test_a_real_host_is_changed_only_by_consent(trace: str) -> None:
         )
         return Done(done.returncode, done.stdout, done.stderr)
 
-    refused = replay()
+    refused = asked()
     assert (refused.status, refused.stdout) == (2, "")
     assert refused.stderr.startswith(
         "vswitch: this is a real host: --questions-only leaves out what may change it, "
         "--change-host does not\n"
     )
-    of = replay("--questions-only", "--json").json["functions"]["VSDVS_SetMTU"]
+    of = asked("--questions-only", "--json").json["functions"]["VSDVS_SetMTU"]
     assert (of["left_out"], of["calls"]) == (1, 1)
-    of = replay("--change-host", "--json").json["functions"]["VSDVS_SetMTU"]
+    of = asked("--change-host", "--json").json["functions"]["VSDVS_SetMTU"]
     assert (of["alike"], of["calls"]) == (1, 1)
+
+
+def test_a_trace_that_changes_while_it_is_replayed(
+    monkeypatch: pytest.MonkeyPatch, trace: str
+) -> None:
+    def changed(*unused: object) -> None:
+        raise TraceError(Path(trace), 7, "no JSON")
+
+    monkeypatch.setattr(replay, "replay", changed)
+    with pytest.raises(NotRestored) as caught:
+        replaying.replayed(Path(trace), Allowances([]), True)
+    assert str(caught.value) == (
+        "the trace has changed meanwhile, and calls of it are made: " f"{trace}: line 7: no JSON"
+    )
 
 
 def test_usage(refused: Refused, trace: str) -> None:

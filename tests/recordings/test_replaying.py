@@ -167,6 +167,43 @@ def test_what_is_known_is_allowed(host: Host, present: PresentHost, shapes: Reco
     assert first(report) == {} and report.is_alike
 
 
+def test_threads_and_processes_are_replayed_one_after_the_other(
+    host: Host, present: PresentHost, tmp_path: Path
+) -> None:
+    tool = """
+    import os, threading
+    import libvswitch as vs
+    from libvswitch import checked
+
+    def work(name):
+        for mtu in range(1500, 1510):
+            checked.VSDVS_CreateVSwitch(name, None, None, 8, True, 0, mtu, 0)
+            handle = vs.DVSState_SwitchFindByAlias(name)
+            assert vs.DVS_SwitchName(handle) == name
+            checked.VSDVS_DestroyVSwitch(name)
+
+    threads = [threading.Thread(target=work, args=[name]) for name in "ab"]
+    for one in threads:
+        one.start()
+    for one in threads:
+        one.join()
+    handle = vs.DVSState_SwitchFindByAlias("vswitch0")
+    if os.fork() == 0:
+        vs.DVS_SwitchName(handle)
+        vs.DVS_SwitchName(vs.DVSState_SwitchFindByAlias("vswitch0"))
+        os._exit(0)
+    os.wait()
+    vs.DVS_SwitchName(handle)
+    """
+    made = record(tool, tmp_path / "trace.jsonl")
+    assert made.status == 0, made.stderr
+    assert len({(one.process, one.thread) for one in made.calls}) == 4
+    report = replay(made.trace, present)
+    # The child was given the handle before it was one.
+    assert first(report) == {"DVS_SwitchName": (NOT_MADE, "an end", UNKNOWN)}
+    assert report.functions["DVS_SwitchName"].not_made == 1
+
+
 class Unasked:
     """A host that nothing may be asked of."""
 
@@ -193,6 +230,34 @@ def written(path: Path, *events: Dict[str, Any]) -> Path:
 
 def end(number: int, **more: Any) -> Dict[str, Any]:
     return {"end": number, "process": 7, "took": 1, **more}
+
+
+class Finding(Unasked):
+    """A host that finds every port at an address of its own."""
+
+    def __init__(self) -> None:
+        self.given: List[Any] = []
+
+    def make(self, function: str, inputs: Dict[str, Any], visit: Visit) -> Dict[str, Any]:
+        if function == "DVSState_PortFind":
+            return {"result": {"at": 1000 + len(self.given)}}
+        self.given.append(inputs["handle"])
+        return {"result": "p"}
+
+
+def test_a_program_that_a_process_runs_next_has_other_memory(tmp_path: Path) -> None:
+    def find(number: int) -> List[Dict[str, Any]]:
+        begin = event(number, "DVSState_PortFind", {"switchId": "s", "port": "p"})
+        return [begin, end(number, result={"at": 1})]
+
+    def ask(number: int) -> List[Dict[str, Any]]:
+        return [event(number, "DVS_PortId", {"handle": {"at": 1}}), end(number, result="p")]
+
+    events = [*find(1), *ask(2), *find(3), *ask(4), PROCESS, *ask(1), *find(2), *ask(3)]
+    finding = Finding()
+    report = replay(written(tmp_path / "trace.jsonl", *events), finding)
+    assert finding.given == [{"at": 1000}, {"at": 1001}, {"at": 1002}]
+    assert first(report) == {"DVS_PortId": (NOT_MADE, "an end", UNKNOWN)}
 
 
 def test_what_cannot_be_made_is_told_with_its_reason(tmp_path: Path) -> None:

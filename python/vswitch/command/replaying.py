@@ -19,7 +19,7 @@ from vswitch.replay import OfFunction, Report
 from vswitch.trace import Call, TraceError
 from vswitch.words import DocumentError
 
-__all__ = ["replay"]
+__all__ = ["replay", "replayed"]
 
 _EVERY = 256  # calls after which the progress is told
 _LONGEST = 60  # characters that are shown of a value
@@ -46,7 +46,7 @@ def replay(
     """
     _ask_for_consent(questions_only, change_host)
     allowed = _read_allowances(allow)
-    report = _replayed(trace, allowed, questions_only)
+    report = replayed(trace, allowed, questions_only)
     if is_json():
         output.write_json(_as_json(report, allowed))
     else:
@@ -75,7 +75,8 @@ def _read_allowances(name: Optional[str]) -> Allowances:
         raise DocumentError(name, str(error)) from None
 
 
-def _replayed(trace: Path, allowed: Allowances, questions_only: bool) -> Report:
+def replayed(trace: Path, allowed: Allowances, questions_only: bool) -> Report:
+    """Reads all of a trace, and then replays it."""
     # Most runs of the program replay nothing, and need not wait for it.
     from vswitch import replay as replaying
     from vswitch._replayer import PresentHost
@@ -108,6 +109,9 @@ def _show(report: Report, allowed: Allowances) -> None:
     for name, of in sorted(report.functions.items()):
         if of.first is not None:
             output.line(f"{name}: {_told(*of.first)}")
+            others = _others(of, of.first[1])
+            if others:
+                output.line(f"{name}: {others}")
     for one in allowed.unused:
         output.line(f"allowed, but not found: {one} ({one.reason})")
 
@@ -116,6 +120,12 @@ def _told(call: Call, found: Difference) -> str:
     note = f" ({found.note})" if found.note else ""
     values = f"{_shown(found.recorded)} -> {_shown(found.present)}"
     return f"{found.path}: {values}{note} [call {call.number} of process {call.process}]"
+
+
+def _others(of: OfFunction, first: Difference) -> str:
+    """In how many calls something else differed than did first."""
+    told = (f"{path} in {count}" for path, count in of.paths.items() if path != first.pattern)
+    return ", ".join(told)
 
 
 def _shown(value: Any) -> str:
