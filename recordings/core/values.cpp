@@ -10,6 +10,7 @@ namespace recordings {
 namespace {
 
 constexpr std::string_view not_there = "no memory of the process is there";
+constexpr std::string_view contradiction = "its lengths contradict each other";
 constexpr std::string_view too_much = "it is longer than a trace holds";
 
 Block &block() {
@@ -180,12 +181,20 @@ class Walk {
   void write_packed(Record const &record, std::size_t start) {
     auto const end = start + static_cast<std::size_t>(number(record, record.packed_size, start));
     auto at = end_;
-    while (at != 0 && at < end) {
+    auto least = at;
+    while (at >= least && at < end) {
       line_.comma();
-      auto const next = this->record(*record.followed_by, at);
-      auto const length = next == 0 ? 0 : number(*record.followed_by, record.packed_length, at);
-      // One that is no longer than nothing would never end.
-      at = length <= 0 ? 0 : at + static_cast<std::size_t>(length);
+      least = this->record(*record.followed_by, at);
+      if (least == 0) {
+        end_ = 0;
+        return;
+      }
+      at += static_cast<std::size_t>(number(*record.followed_by, record.packed_length, at));
+    }
+    // One that ends before its own fields do, or after the block, says nothing of what follows.
+    if (at < least || at != end) {
+      write_unread(line_.comma(), contradiction);
+      at = 0;
     }
     end_ = at;
   }

@@ -3,6 +3,7 @@
 import json
 import signal
 from pathlib import Path
+from typing import Any, List
 
 import pytest
 from recordings import FORMATTING, RECORDING, record
@@ -257,3 +258,31 @@ def test_without_a_trace_calls_are_only_forwarded(trace: Path) -> None:
     made = record(program, trace, VSWITCH_RECORD_TRACE="")
     assert (made.status, made.stdout, made.stderr) == (0, "0 True\n", "")
     assert made.calls == []
+
+
+@pytest.mark.parametrize(
+    "options, there",
+    [
+        # All bytes, then a type and a length for each option.
+        ("4, 0, 0, 0", []),
+        ("12, 0, 0, 0,  1, 0, 8, 0, 20, 0, 0, 0", [8]),
+        ("0, 0, 0, 0", ["unread"]),
+        ("12, 0, 0, 0,  1, 0, 0, 0, 20, 0, 0, 0", [0, "unread"]),
+        ("12, 0, 0, 0,  1, 0, 3, 0, 20, 0, 0, 0", [3, "unread"]),
+        ("12, 0, 0, 0,  1, 0, 9, 0, 20, 0, 0, 0, 0", [9, "unread"]),
+    ],
+)
+def test_a_packed_list_that_does_not_end_where_it_says(
+    trace: Path, options: str, there: List[Any]
+) -> None:
+    program = f"""
+    import ctypes
+    import _libvswitch
+    ctypes.CDLL("libvswitch.so").VSQEX_SetRuntimeOptions(bytes([{options}]))
+    """
+    made = record(program, trace, RECORDING)
+    assert made.status == 0, made.stderr
+    given = made.call("VSQEX_SetRuntimeOptions").inputs["options"]["VSRuntimeOptionHeader"]
+    assert [one.get("length", "unread") for one in given] == there
+    if "unread" in there:
+        assert given[-1] == {"unread": "its lengths contradict each other"}
