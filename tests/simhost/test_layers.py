@@ -23,6 +23,7 @@ HEADERS = {
     "planes/stored": "planes/stored/stored_plane.h",
     "planes/openvswitch/transport": "planes/openvswitch/transport/unix_stream.h",
     "planes/openvswitch/openflow": "planes/openvswitch/openflow/connection.h",
+    "planes/openvswitch/ovsdb": "planes/openvswitch/ovsdb/client.h",
     "planes/openvswitch/reconcile": "planes/openvswitch/reconcile/difference.h",
     "events": "events/loop.h",
     "planes/openvswitch/processes": "planes/openvswitch/processes/private_openvswitch.h",
@@ -40,9 +41,10 @@ BELOW: Dict[str, List[str]] = {
     "planes/stored": ["base", "storage", "clock", "model"],
     # Waiting, which anything that serves may do.
     "events": [],
-    # A language, of which the host knows nothing.
+    # Languages, of which the host knows nothing.
     "planes/openvswitch/transport": ["events"],
     "planes/openvswitch/openflow": ["planes/openvswitch/transport", "events"],
+    "planes/openvswitch/ovsdb": ["planes/openvswitch/transport", "events"],
     "planes/openvswitch/reconcile": ["planes/openvswitch/openflow", "planes/openvswitch/transport"]
     + ["events"],
     "planes/openvswitch/processes": ["events"],

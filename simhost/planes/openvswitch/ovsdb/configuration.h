@@ -1,0 +1,21 @@
+// When ovs-vswitchd has done what the database says.
+#pragma once
+
+#include <cstdint>
+
+#include "planes/openvswitch/ovsdb/client.h"
+
+namespace simhost::ovsdb {
+
+/// Adds to a transaction what gives the configuration its next number.
+void raise_configuration(Json &operations);
+/// That number, from the results of the transaction. Throws Malformed.
+std::int64_t raised_configuration(Json const &results);
+
+/// The columns that the following needs of the client's replica.
+void select_configuration(Selected &selected);
+/// Returns when a configuration with this number, or a later one, is in force. Throws what waits
+/// do.
+void wait_for_configuration(Client &client, std::int64_t number, Deadline deadline);
+
+}  // namespace simhost::ovsdb
