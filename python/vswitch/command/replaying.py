@@ -1,23 +1,27 @@
 """The command that makes the calls of a trace again, and tells how like the recording they go."""
 
+from __future__ import annotations
+
 import dataclasses
 import json
 from pathlib import Path
-from typing import Any, Dict, Optional
+from typing import TYPE_CHECKING, Any, Dict, Optional
 
 import click
 import typer
 
 from libvswitch.errors import NotRestored
-from vswitch import allowing
-from vswitch.allowing import Allowances
 from vswitch.command import files, output
 from vswitch.command.session import host, is_json
 from vswitch.exits import REFUSED
-from vswitch.likeness import Difference
-from vswitch.replay import OfFunction, Report
 from vswitch.trace import Call, TraceError
 from vswitch.words import DocumentError
+
+# Most runs of the program replay nothing, and need not wait for it.
+if TYPE_CHECKING:
+    from vswitch.allowing import Allowances
+    from vswitch.likeness import Difference
+    from vswitch.replay import OfFunction, Report
 
 __all__ = ["replay", "replayed"]
 
@@ -66,8 +70,10 @@ def _ask_for_consent(questions_only: bool, change_host: bool) -> None:
 
 
 def _read_allowances(name: Optional[str]) -> Allowances:
+    from vswitch import allowing
+
     if name is None:
-        return Allowances([])
+        return allowing.Allowances([])
     document = files.read(name)
     try:
         return allowing.read(document)
@@ -77,7 +83,6 @@ def _read_allowances(name: Optional[str]) -> Allowances:
 
 def replayed(trace: Path, allowed: Allowances, questions_only: bool) -> Report:
     """Reads all of a trace, and then replays it."""
-    # Most runs of the program replay nothing, and need not wait for it.
     from vswitch import replay as replaying
     from vswitch._replayer import PresentHost
 
