@@ -10,12 +10,14 @@ from recordings import RECORDING, record
 from test_recorded_calls import EVERY_CALL
 from test_recorded_shapes import SCENARIO, TOOL
 from vswitch.likeness import unread_in
+from vswitch.replay import NOT_MADE
 from vswitch.trace import Call, Trace
 
 # Over the recording host, for which an address is a number like any other.
 ONE_BY_ONE = """
 from vswitch._replayer import PresentHost
 from vswitch.likeness import unread_in
+from vswitch.replay import NOT_MADE
 from vswitch.trace import Trace
 
 host = PresentHost()
@@ -33,6 +35,16 @@ assert replay({trace!r}, PresentHost()).is_alike
 """
 
 STOPPED = {"clock": {"stopped": True, "now": 1000}}
+
+SUMMED_UP = """
+import json
+from vswitch._replayer import PresentHost
+from vswitch.replay import replay
+
+functions = replay({trace!r}, PresentHost()).functions.values()
+alike = sum(of.alike for of in functions)
+print(json.dumps([alike, sorted({{path for of in functions for path in of.paths}})]))
+"""
 
 LISTS = """
 import ctypes
@@ -79,6 +91,11 @@ def test_every_call_is_given_what_it_was_recorded_with(tmp_path: Path) -> None:
     given = [one for one in all_ if one[0] != "Panic" and not any(unread_in("in", one[1]))]
     assert len({name for name, _ in all_}) == 146 and len({name for name, _ in given}) > 135
     assert [(function, values[0]) for function, _, values, _ in calls_of(second)] == given
+    # Nobody told the host what to return, and what it returns are zeros and nulls.
+    again = record(SUMMED_UP.format(trace=str(second)), tmp_path / "third.jsonl", RECORDING)
+    assert again.status == 0, again.stderr
+    alike, differing = json.loads(again.stdout)
+    assert alike > 90 and differing == [NOT_MADE]
 
 
 @pytest.mark.parametrize("tool", [TOOL, LISTS], ids=["shapes", "lists"])
