@@ -20,6 +20,8 @@ BUILD = Path(os.environ.get("FUZZERS_DIR", ROOT / "build-fuzzers"))
 NAMES = [
     "decoded",
     "mirror",
+    "openflow",
+    "ovsdb",
     "properties",
     "runtime_options",
     "scenario",
@@ -88,8 +90,11 @@ def vocabulary(name: str) -> List[str]:
 
 
 def write_seeds(name: str, folder: Path) -> None:
-    """Texts for the harnesses that read them, and for the others, whose inputs are rows of
-    choices, choices at random."""
+    """Texts for the harnesses that read them, what a real Open vSwitch sends for those that read
+    that, and for the others, whose inputs are rows of choices, choices at random."""
+    if name in ("openflow", "ovsdb"):
+        subprocess.run([BUILD / "fuzzers" / "openvswitch_seeds", name, folder], check=True)
+        return
     if name in TEXTS:
         for number, document in enumerate(TEXTS[name]()):
             (folder / f"seed-{number}").write_text(document, encoding="utf-8")

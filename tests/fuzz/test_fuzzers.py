@@ -13,6 +13,8 @@ SEED = 20
 INPUTS = {
     "decoded": 20_000,
     "mirror": 20_000,
+    "openflow": 30_000,
+    "ovsdb": 8_000,
     "properties": 1_500,
     "runtime_options": 20_000,
     "scenario": 8_000,

@@ -15,7 +15,7 @@ using openvswitch::Lab;
 using openvswitch::soon;
 
 Client connected() {
-  return Client(Lab::shared().database_socket(), "Open_vSwitch", soon());
+  return {Lab::shared().database_socket(), "Open_vSwitch", soon()};
 }
 
 Json where_name(std::string const &name) {

@@ -135,6 +135,7 @@ TEST(ActionText, SetsFieldsInTheirForms) {
             "set_field:01:00:00:00:00:00/01:00:00:00:00:00->eth_src");
   EXPECT_EQ(text_of(load(part(Field::udp_dst, 0, 7), 5)), "set_field:5/0xff->udp_dst");
   EXPECT_EQ(text_of(load(part(Field::arp_tpa, 24, 31), 1)), "set_field:1.0.0.0/8->arp_tpa");
+  EXPECT_EQ(text_of(SetField{Field::ipv6_dst, 0, 0}), "set_field:::/0->ipv6_dst");
 }
 
 TEST(ActionText, MovesBetweenParts) {

@@ -46,7 +46,7 @@ std::optional<unsigned> prefix_length(Value mask, unsigned bits) {
   while (length < bits && (mask >> (bits - 1 - length) & 1U) != 0) {
     ++length;
   }
-  return mask == (ones(length) << (bits - length)) ? std::optional(length) : std::nullopt;
+  return mask == (ones(bits) ^ ones(bits - length)) ? std::optional(length) : std::nullopt;
 }
 
 std::string mask_text(Field field, Value mask) {
