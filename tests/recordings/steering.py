@@ -57,7 +57,7 @@ def _steer(host: Host, what: str, arguments: List[Any], more: Dict[str, Any]) ->
 
 
 def replayed(
-    trace: Path, begin: Callable[[], Host], steer: Callable[..., None] = _steer
+    trace: Path, begin: Callable[..., Host], steer: Callable[..., None] = _steer
 ) -> Iterator[Report]:
     """Replays what a tool did with each host that it said to begin with."""
     present = PresentHost()
@@ -68,7 +68,9 @@ def replayed(
             if said is not None and said.what == "begin":
                 replay.end()
                 yield replay.report
-                host, replay = begin(), Replay(present, _is_known, questions_only=False)
+                host, replay = begin(*said.arguments), Replay(
+                    present, _is_known, questions_only=False
+                )
             elif said is not None:
                 steer(host, *said)
             else:

@@ -9,6 +9,7 @@ from pathlib import Path
 from typing import Dict, List
 
 import pytest
+import recorded_clones
 import recorded_sequences
 from programs import EXAMPLES
 from recordings import SIMULATED, record
@@ -30,6 +31,7 @@ NO_PROGRAMS = {"private_host", "records", "tour"}
 
 SEED = 16
 SEQUENCES = 20
+CLONES = 8
 
 _RUN = """
 import runpy, sys
@@ -99,6 +101,13 @@ def test_the_tour_goes_as_it_was_recorded(tmp_path: Path) -> None:
     )
     alike, found = json.loads(done.stdout)
     assert found == [] and alike > 300
+
+
+def test_clones_tell_what_their_hosts_told(tmp_path: Path) -> None:
+    print("seed", SEED)
+    count, found = recorded_clones.run(SEED, CLONES, tmp_path / "trace.jsonl")
+    assert found == []
+    assert count > CLONES // 2
 
 
 @pytest.fixture(name="sequences", scope="module")

@@ -1,0 +1,56 @@
+"""Records what hosts tell of themselves that chance describes, and replays it on their clones."""
+
+import json
+import sys
+from pathlib import Path
+from typing import Any, Dict, List, Optional, Tuple
+
+sys.path.append(str(Path(__file__).parents[1] / "vswitch"))
+
+import drawn_documents  # noqa: E402  (after the path is set)
+import seeds  # noqa: E402
+import simhost  # noqa: E402
+from hypothesis import given, seed  # noqa: E402
+from recordings import record  # noqa: E402
+from saying import say  # noqa: E402
+from steering import differences, replayed  # noqa: E402
+from vswitch import Host  # noqa: E402
+
+
+def make(number: int, count: int) -> None:
+    """Has so many hosts told of, and before each says what its clone is to be."""
+
+    @seed(number)
+    @seeds.options(count, shrink=False)
+    @given(drawn_documents.documents())
+    def each(document: Dict[str, Any]) -> None:
+        try:
+            host = drawn_documents.host_of(document)
+        except simhost.HostRefused:
+            return
+        # Which uplinks a switch has that does not run, no call tells.
+        if not all(one["running"] for one in host.describe()["switches"]):
+            return
+        objects = Host(simulated=True)
+        # The snapshot is made of calls, too, which come before it.
+        say("begin", None)
+        clone = {**json.loads(json.dumps(objects.snapshot())), "clock": drawn_documents.STOPPED}
+        say("begin", clone)
+        objects.snapshot()
+
+    each()
+
+
+def begun(document: Optional[Dict[str, Any]] = None) -> simhost.Host:
+    return simhost.Host(document, Path())
+
+
+def run(number: int, count: int, trace: Path) -> Tuple[int, List[str]]:
+    """Records so many hosts and replays them on their clones; how many there were, and what
+    differed."""
+    path = f"import sys; sys.path[:0] = {sys.path!r}"
+    made = record(f"{path}; import recorded_clones as it; it.make({number}, {count})", trace)
+    if made.status != 0:
+        raise RuntimeError(made.stderr)
+    reports = list(replayed(trace, begun))[2::2]
+    return len(reports), [one for report in reports for one in differences(report)]
