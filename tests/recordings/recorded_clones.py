@@ -1,7 +1,14 @@
-"""Records what hosts tell of themselves that chance describes, and replays it on their clones."""
+#!/usr/bin/env python3
+"""Records what hosts tell of themselves that chance describes, and replays it on their clones.
+
+    recorded_clones.py [--seconds N] [--seed N]
+
+Prints what differs, and at the end how many hosts there were.
+"""
 
 import json
 import sys
+import tempfile
 from pathlib import Path
 from typing import Any, Dict, List, Optional, Tuple
 
@@ -45,12 +52,18 @@ def begun(document: Optional[Dict[str, Any]] = None) -> simhost.Host:
     return simhost.Host(document, Path())
 
 
-def run(number: int, count: int, trace: Path) -> Tuple[int, List[str]]:
+def run(number: int, count: int = 20) -> Tuple[int, List[str]]:
     """Records so many hosts and replays them on their clones; how many there were, and what
     differed."""
     path = f"import sys; sys.path[:0] = {sys.path!r}"
-    made = record(f"{path}; import recorded_clones as it; it.make({number}, {count})", trace)
-    if made.status != 0:
-        raise RuntimeError(made.stderr)
-    reports = list(replayed(trace, begun))[2::2]
+    with tempfile.TemporaryDirectory() as folder:
+        trace = Path(folder, "trace.jsonl")
+        made = record(f"{path}; import recorded_clones as it; it.make({number}, {count})", trace)
+        if made.status != 0:
+            raise RuntimeError(made.stderr)
+        reports = list(replayed(trace, begun))[2::2]
     return len(reports), [one for report in reports for one in differences(report)]
+
+
+if __name__ == "__main__":
+    sys.exit(seeds.main(run))

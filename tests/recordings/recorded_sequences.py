@@ -6,7 +6,6 @@
 Prints what differs, and at the end how many sequences there were.
 """
 
-import os
 import sys
 import tempfile
 from pathlib import Path
@@ -75,5 +74,4 @@ def run(seed: int, count: int = 20) -> Tuple[int, List[str]]:
 
 
 if __name__ == "__main__":
-    os.environ.setdefault("BUILD_DIR", str(Path(__file__).parents[2] / "build"))
     sys.exit(seeds.main(run))

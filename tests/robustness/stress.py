@@ -129,8 +129,9 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
     sequences = partial(by_chance, "sequences/sequences.py", seed)
     yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
-    replays = partial(by_chance, "recordings/recorded_sequences.py", seed)
-    yield Part("replays of sequences", "sequences", replays, SHARES["replays"])
+    for what, unit in (("sequences", "sequences"), ("clones", "hosts")):
+        replays = partial(by_chance, f"recordings/recorded_{what}.py", seed)
+        yield Part(f"replays, {what}", unit, replays, SHARES["replays"] / 2)
     clones = partial(by_chance, "vswitch/drawn_documents.py", seed)
     yield Part("clones of hosts", "documents", clones, SHARES["clones"])
     yield Part("killed processes", "rounds", killed, SHARES["kills"])
