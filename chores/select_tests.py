@@ -52,6 +52,8 @@ PYTHON_TESTS: Dict[str, List[str]] = {
     "python/vswitch/allowing.py": ["tests/recordings"],
     "python/vswitch/command": ["tests/command"],
     "python/vswitch/likeness.py": ["tests/recordings"],
+    "python/vswitch/_front.py": ["tests/recordings", "tests/command/test_playing.py"],
+    "python/vswitch/playing.py": ["tests/recordings", "tests/command/test_playing.py"],
     "python/vswitch/recording.py": ["tests/recordings"],
     "python/vswitch/replay.py": ["tests/recordings"],
     "python/vswitch/trace.py": ["tests/recordings"],

@@ -11,49 +11,37 @@ that says what was asked of what, and why not.
 
 import typing
 
-from libvswitch.enums import (
-    Balance,
-    Criteria,
-    EthernetFilter,
-    Forbid,
-    LinkState,
-    MacType,
-    Multicast,
-    TeamFlags,
-)
-from libvswitch.errors import (
-    BadParameter,
-    Busy,
-    Disconnected,
-    Exists,
-    HostError,
-    LimitExceeded,
-    NotFound,
-    NotRestored,
-    NotSupported,
-    NoUplink,
-    RolledBack,
-    Trapped,
-)
-from vswitch.exits import exits
-from vswitch.host import Host
-from vswitch.port import Port, UplinkPort
-from vswitch.switch import Switch
-from vswitch.transaction import Transaction
-from vswitch.uplink import Uplink
-from vswitch.values import (
-    FrameFilter,
-    MacLearning,
-    PortMacLearning,
-    PrivateVlan,
-    Teaming,
-    Vlan,
-)
-from vswitch.words import DocumentError
-
 if typing.TYPE_CHECKING:
+    from libvswitch.enums import (
+        Balance,
+        Criteria,
+        EthernetFilter,
+        Forbid,
+        LinkState,
+        MacType,
+        Multicast,
+        TeamFlags,
+    )
+    from libvswitch.errors import (
+        BadParameter,
+        Busy,
+        Disconnected,
+        Exists,
+        HostError,
+        LimitExceeded,
+        NotFound,
+        NotRestored,
+        NotSupported,
+        NoUplink,
+        RolledBack,
+        Trapped,
+    )
+    from vswitch.exits import exits
+    from vswitch.host import Host
     from vswitch.mirroring import Encapsulation, Mirror, MirrorEnd, Mirroring
     from vswitch.plan import Plan
+    from vswitch.port import Port, UplinkPort
+    from vswitch.switch import Switch
     from vswitch.told import (
         Change,
         Event,
@@ -64,19 +52,45 @@ if typing.TYPE_CHECKING:
         PortStats,
         SwitchStats,
     )
+    from vswitch.transaction import Transaction
+    from vswitch.uplink import Uplink
+    from vswitch.values import (
+        FrameFilter,
+        MacLearning,
+        PortMacLearning,
+        PrivateVlan,
+        Teaming,
+        Vlan,
+    )
+    from vswitch.words import DocumentError
 else:
+    # Traces are read and played where no host can be loaded, and who uses little pays for little.
     _PLACES = {
-        "Plan": "plan",
-        **dict.fromkeys(("Encapsulation", "Mirror", "MirrorEnd", "Mirroring"), "mirroring"),
+        "libvswitch.enums": "Balance Criteria EthernetFilter Forbid LinkState MacType Multicast"
+        " TeamFlags",
+        "libvswitch.errors": "BadParameter Busy Disconnected Exists HostError LimitExceeded"
+        " NotFound NotRestored NotSupported NoUplink RolledBack Trapped",
+        "vswitch.exits": "exits",
+        "vswitch.host": "Host",
+        "vswitch.mirroring": "Encapsulation Mirror MirrorEnd Mirroring",
+        "vswitch.plan": "Plan",
+        "vswitch.port": "Port UplinkPort",
+        "vswitch.switch": "Switch",
+        "vswitch.told": "Change Event Group Lag MacEntry MirrorStats PortStats SwitchStats",
+        "vswitch.transaction": "Transaction",
+        "vswitch.uplink": "Uplink",
+        "vswitch.values": "FrameFilter MacLearning PortMacLearning PrivateVlan Teaming Vlan",
+        "vswitch.words": "DocumentError",
     }
 
     def __getattr__(name: str) -> object:
-        # Only those who use them pay for them.
         from importlib import import_module
 
-        if name not in __all__:
-            raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
-        return getattr(import_module(f"vswitch.{_PLACES.get(name, 'told')}"), name)
+        for module, names in _PLACES.items():
+            if name in names.split():
+                found = globals()[name] = getattr(import_module(module), name)
+                return found
+        raise AttributeError(f"module {__name__!r} has no attribute {name!r}")
 
 
 __all__ = [

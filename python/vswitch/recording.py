@@ -14,7 +14,6 @@ import hashlib
 import importlib.metadata
 import json
 import os
-import shutil
 import tempfile
 from datetime import datetime, timezone
 from pathlib import Path
@@ -22,18 +21,15 @@ from typing import Dict, Iterator, Optional, Sequence
 
 import _libvswitch
 
+from vswitch import _front
 from vswitch.trace import MARK, VERSION
 from libvswitch.errors import HostError
 
-__all__ = ["host_libraries", "recorded"]
+__all__ = ["begin", "host_libraries", "recorded"]
 
-_FOLDER = Path(_libvswitch.__file__).resolve().parent.parent / "recordings"
-_RUNTIME = "librecordings.so"
 # A function of each library.
-_LIBRARIES = {"libvswitch.so": "VSDVS_SetMTU", "libnebPublic.so": "DVSQEX_StateGet"}
-# What the libraries of the recorder are linked against, in place of the host's; no path is longer.
-_ROOM = b"@" * 4096
-_PATHS, _TRACE = "LD_LIBRARY_PATH", "VSWITCH_RECORD_TRACE"
+_FUNCTIONS = {"libvswitch.so": "VSDVS_SetMTU", "libnebPublic.so": "DVSQEX_StateGet"}
+_TRACE = "VSWITCH_RECORD_TRACE"
 
 
 class _Found(ctypes.Structure):
@@ -50,7 +46,7 @@ def host_libraries() -> Dict[str, Path]:
     module = ctypes.CDLL(_libvswitch.__file__)
     look = ctypes.CDLL(None).dladdr
     found = {}
-    for name, function in _LIBRARIES.items():
+    for name, function in _FUNCTIONS.items():
         at = _Found()
         look(ctypes.cast(getattr(module, function), ctypes.c_void_p), ctypes.byref(at))
         found[name] = Path(os.fsdecode(at.file or b"")).absolute()
@@ -65,34 +61,19 @@ def recorded(
 
     They go on to the host's libraries as this process has them, or to those that are given.
     """
-    if not (_FOLDER / _RUNTIME).exists():
-        raise HostError(f"the recorder is not installed: {_FOLDER} lacks its libraries")
+    if not (_front.folder() / _front.RUNTIME).exists():
+        raise HostError(f"the recorder is not installed: {_front.folder()} lacks its libraries")
     libraries = libraries or host_libraries()
+    if any((library.parent / _front.RUNTIME).exists() for library in libraries.values()):
+        raise HostError("this is being recorded already")
     with tempfile.TemporaryDirectory(prefix="vswitch-record-") as made:
-        _stand_before(libraries, Path(made))
-        _begin(trace, command, libraries)
-        paths = [made, os.environ[_PATHS]] if os.environ.get(_PATHS) else [made]
-        yield {**os.environ, _PATHS: os.pathsep.join(paths), _TRACE: str(trace.absolute())}
+        _front.place(Path(made), libraries)
+        begin(trace, command, libraries)
+        yield {**_front.environment(Path(made)), _TRACE: str(trace.absolute())}
 
 
-def _stand_before(libraries: Dict[str, Path], folder: Path) -> None:
-    for name, library in libraries.items():
-        if (library.parent / _RUNTIME).exists():
-            raise HostError("this is being recorded already")
-        (folder / name).write_bytes(_bound(name, library))
-    shutil.copy(_FOLDER / _RUNTIME, folder)
-
-
-def _bound(name: str, library: Path) -> bytes:
-    """A library of the recorder that forwards to one of the host's."""
-    held = (_FOLDER / name).read_bytes()
-    room, path = b"@host:" + name.encode() + _ROOM, os.fsencode(library)
-    if held.count(room) != 1:
-        raise HostError(f"{_FOLDER / name} is no library of the recorder")
-    return held.replace(room, path.ljust(len(room), b"\0"))
-
-
-def _begin(trace: Path, command: Sequence[str], libraries: Dict[str, Path]) -> None:
+def begin(trace: Path, command: Sequence[str], libraries: Dict[str, Path]) -> None:
+    """Writes the first line of a trace; what was there is replaced."""
     header = {
         MARK: VERSION,
         "module": importlib.metadata.version("libvswitch"),

@@ -82,6 +82,7 @@ class Call:
     at: int  # microseconds since its process began
     inputs: Dict[str, Any]
     within: Optional[int] = None  # the callback that made it
+    line: int = 0  # of the trace, in which it begins
     outputs: Dict[str, Any] = field(default_factory=dict)
     status: Optional[int] = None
     result: Any = None
@@ -166,7 +167,7 @@ class Trace:
             if "end" in event:
                 return self._end(event)
             if "call" in event:
-                self._begin(_call(event))
+                self._begin(_call(event, self.line))
             elif "callback" in event:
                 self._begin(_callback(event))
             elif "parent" in event:
@@ -256,7 +257,7 @@ def _within(event: Dict[str, Any]) -> Optional[int]:
     return _whole(event, "within") if "within" in event else None
 
 
-def _call(event: Dict[str, Any]) -> Call:
+def _call(event: Dict[str, Any], line: int) -> Call:
     return Call(
         number=_whole(event, "call"),
         process=_whole(event, "process"),
@@ -265,6 +266,7 @@ def _call(event: Dict[str, Any]) -> Call:
         at=_whole(event, "at"),
         inputs=_named(event, "in"),
         within=_within(event),
+        line=line,
     )
 
 

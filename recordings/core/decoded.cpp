@@ -37,6 +37,9 @@ class Place {
   }
 
   [[noreturn]] void misfit(std::string const &what) const { throw Misfit(path_ + ": " + what); }
+  [[noreturn]] void unread(std::string const &why) const {
+    throw Unread(path_ + ": was not recorded: " + why);
+  }
 
  private:
   std::string path_;
@@ -46,6 +49,14 @@ std::string shown(Json const &value) {
   constexpr std::size_t longest = 40;
   auto text = value.dump(-1, ' ', true, Json::error_handler_t::replace);
   return text.size() <= longest ? text : text.substr(0, longest) + "...";
+}
+
+/// Refuses a value that is of another kind, which may be the reason why there is none.
+[[noreturn]] void refuse_kind(Place &place, Json const &given, std::string const &wanted) {
+  if (auto const why = given.is_object() ? given.find("unread") : given.end(); why != given.end()) {
+    place.unread(why->is_string() ? why->get<std::string>() : "nobody knows why");
+  }
+  place.misfit("is no " + wanted + ": " + shown(given));
 }
 
 Json const &member(Place &place, Json const &object, std::string_view name) {
@@ -60,11 +71,8 @@ Json const &member(Place &place, Json const &object, std::string_view name) {
 class Members {
  public:
   Members(Place &place, Json const &object) : place_(place), object_(object) {
-    if (!object.is_object()) {
-      place.misfit("is no object: " + shown(object));
-    }
-    if (auto const why = object.find("unread"); why != object.end()) {
-      place.misfit("was not recorded: " + (why->is_string() ? why->get<std::string>() : "?"));
+    if (!object.is_object() || object.contains("unread")) {
+      refuse_kind(place, object, "object");
     }
   }
 
@@ -92,7 +100,7 @@ class Members {
 
 std::uint64_t decode_number(Place &place, Json const &given, std::uint32_t width, bool is_signed) {
   if (!given.is_number_integer()) {
-    place.misfit("is no whole number: " + shown(given));
+    refuse_kind(place, given, "whole number");
   }
   auto const unused = 64U - 8U * width;
   auto const most =
@@ -120,7 +128,7 @@ int value_of_digit(Place &place, char digit) {
 
 Bytes decode_hex(Place &place, Json const &given) {
   if (!given.is_string()) {
-    place.misfit("is no text of digits: " + shown(given));
+    refuse_kind(place, given, "text of digits");
   }
   auto const &digits = given.get_ref<std::string const &>();
   if (digits.size() % 2 != 0) {
@@ -142,7 +150,7 @@ void require_size(Place &place, std::size_t found, std::size_t wanted) {
 
 void require_count(Place &place, Json const &list, std::uint64_t wanted) {
   if (!list.is_array()) {
-    place.misfit("is no list: " + shown(list));
+    refuse_kind(place, list, "list");
   }
   if (list.size() != wanted) {
     place.misfit("has " + std::to_string(list.size()) + " elements, and not " +
@@ -352,7 +360,7 @@ class Layout {
   /// Each has a length of its own, and all of them that of the block.
   void packed(Record const &record, Json const &list, std::size_t start) {
     if (!list.is_array()) {
-      place_.misfit("is no list: " + shown(list));
+      refuse_kind(place_, list, "list");
     }
     auto const whole = number(record, record.packed_size, start);
     auto at = end_;

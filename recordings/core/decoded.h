@@ -22,6 +22,12 @@ class Misfit : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
+/// A value of which the recorder wrote why it could not follow it.
+class Unread : public Misfit {
+ public:
+  using Misfit::Misfit;
+};
+
 /// What one argument gives or leaves.
 struct Decoded {
   bool is_null = false;    ///< a pointer that leads nowhere; of an output, that it has no place

@@ -22,4 +22,14 @@ std::uint64_t word_of(T value) noexcept {
   }
 }
 
+/// The argument or result that was those.
+template <typename T>
+T value_of(std::uint64_t word) noexcept {
+  if constexpr (std::is_pointer_v<T>) {
+    return reinterpret_cast<T>(word);
+  } else {
+    return static_cast<T>(word);
+  }
+}
+
 }  // namespace recordings

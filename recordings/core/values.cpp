@@ -298,7 +298,7 @@ void write_memory(Line &line, Call const &call, Argument const &argument, Words 
 }
 
 void write_input(Line &line, Call const &call, Argument const &argument, Words words,
-                 std::uint64_t word) {
+                 std::uint64_t word, Identify identify) {
   switch (argument.passing) {
     case Passing::number:
       write_number(line, static_cast<std::int64_t>(word), argument.is_signed);
@@ -318,7 +318,7 @@ void write_input(Line &line, Call const &call, Argument const &argument, Words w
       }
       break;
     default:
-      write_pointer(line, word);
+      write_pointer(line, word, identify);
       break;
   }
 }
@@ -393,21 +393,21 @@ void write_record(Line &line, Record const &record, std::uint64_t address,
   Walk(line, held, form).record(record, 0);
 }
 
-void write_pointer(Line &line, std::uint64_t address) noexcept {
+void write_pointer(Line &line, std::uint64_t address, Identify identify) noexcept {
   if (address == 0) {
     line.raw("null");
   } else {
-    line.raw("{").member("at").number(identity_of(address)).raw("}");
+    line.raw("{").member("at").number(identify(address)).raw("}");
   }
 }
 
-void write_inputs(Line &line, Call const &call, Words words) noexcept {
+void write_inputs(Line &line, Call const &call, Words words, Identify identify) noexcept {
   line.member("in").raw("{");
   for (std::size_t at = 0; at < call.arguments.size(); ++at) {
     Argument const &argument = call.arguments[at];
     if (!is_output(argument)) {
       line.member(argument.name);
-      write_input(line, call, argument, words, words[at]);
+      write_input(line, call, argument, words, words[at], identify);
     } else if (words[at] == 0) {
       // Nothing comes out where the caller has no place for it.
       line.member(argument.name).raw("null");

@@ -1,4 +1,4 @@
-// How a call is forwarded to the host's library and recorded on the way.
+// What becomes of a call: it is played, or forwarded to the host's library and recorded on the way.
 #pragma once
 
 #include <setjmp.h>
@@ -9,6 +9,7 @@
 #include "recordings/core/api.h"
 #include "recordings/core/shapes.h"
 #include "recordings/core/signatures.h"
+#include "recordings/player/player.h"
 #include "recordings/recorder/frames.h"
 #include "recordings/recorder/stand_ins.h"
 #include "vswitch/call_trap.h"
@@ -26,15 +27,20 @@ RECORDINGS_API extern void *host_functions[];
 /// recorder.
 RECORDINGS_API void *host_function(std::size_t number) noexcept;
 
-/// Calls the host's function. A trap jumps over this frame, so nothing in it has a destructor.
+/// Calls the host's function, unless calls are played. A trap jumps over this frame, so nothing in
+/// it has a destructor.
 template <std::size_t number, typename Returned, typename... Parameters>
 Returned forward(Returned (* /*declared*/)(Parameters...),
                  std::type_identity_t<Parameters>... given) {
   static_assert(sizeof...(Parameters) <= most_arguments);
-  auto *const host = reinterpret_cast<Returned (*)(Parameters...)>(host_function(number));
   Frame frame;
-  [[maybe_unused]] auto *word = static_cast<std::uint64_t *>(frame.words);
+  auto *word = static_cast<std::uint64_t *>(frame.words);
+  *word = 0;
   ((*word++ = word_of(given)), ...);
+  if (is_played(calls[number], static_cast<std::uint64_t *>(frame.words))) {
+    return value_of<Returned>(play(calls[number], static_cast<std::uint64_t *>(frame.words)));
+  }
+  auto *const host = reinterpret_cast<Returned (*)(Parameters...)>(host_function(number));
   if (!begin(frame, calls[number])) {
     return host(given...);
   }

@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
 
 #include "recordings/front/forward.h"
@@ -12,6 +13,9 @@ void *host_functions[number_of_calls];
 
 void *host_function(std::size_t number) noexcept {
   if (host_functions[number] == nullptr) {
+    if (std::ranges::all_of(host_functions, [](void *one) { return one == nullptr; })) {
+      refuse_call(calls[number], "there is no host here, and no recording is played");
+    }
     std::fprintf(stderr, "vswitch record: the host's %.*s lacks %.*s\n",
                  static_cast<int>(calls[number].library.size()), calls[number].library.data(),
                  static_cast<int>(calls[number].name.size()), calls[number].name.data());

@@ -144,22 +144,34 @@ void after_fork_in_child() {
   begin_process();
 }
 
-[[gnu::constructor]] void begin_recording() {
+[[gnu::constructor]] void begin() {
   begin_process();
-  char const *const path = std::getenv(trace_variable);
-  if (path == nullptr || *path == '\0') {
-    return;
-  }
-  std::snprintf(static_cast<char *>(state.path), sizeof state.path, "%s", path);
-  if (!open_trace()) {
-    stop_because(std::strerror(errno));
-    return;
-  }
   pthread_atfork(lock_identities, unlock_identities, after_fork_in_child);
-  state.is_on = true;
+  char const *const path = std::getenv(trace_variable);
+  if (path != nullptr && *path != '\0' && !begin_recording(path)) {
+    stop_because(std::strerror(errno));
+  }
 }
 
 }  // namespace
+
+bool begin_recording(char const *path) noexcept {
+  std::snprintf(static_cast<char *>(state.path), sizeof state.path, "%s", path);
+  if (!open_trace()) {
+    return false;
+  }
+  state.has_told = false;
+  state.is_on = true;
+  return true;
+}
+
+void end_recording() noexcept {
+  state.is_on = false;
+  if (is_trace(state.file)) {
+    close(state.file);
+  }
+  state.file = -1;
+}
 
 bool is_recording() noexcept {
   return state.is_on.load(std::memory_order_relaxed);

@@ -8,6 +8,12 @@
 
 namespace recordings {
 
+/// Begins with a trace that exists, at its end; false if it cannot be written, and errno says why.
+bool begin_recording(char const *path) noexcept;
+
+/// Ends it; calls in progress have no end in it.
+void end_recording() noexcept;
+
 /// Whether there is a trace to write; none is left after a write that failed.
 bool is_recording() noexcept;
 

@@ -25,6 +25,7 @@ NAMES = [
     "properties",
     "runtime_options",
     "scenario",
+    "script",
     "state_image",
     "tables",
     "texts",
@@ -80,7 +81,33 @@ def documents() -> List[str]:
     return [(simhost / "scenario" / "default_host.json").read_text(encoding="utf-8"), *examples]
 
 
-TEXTS: Dict[str, Callable[[], List[str]]] = {"decoded": lambda: VALUES, "scenario": documents}
+# A trace with a call of each ending, a callback and a call within it.
+TRACE = """\
+{"vswitch trace": 1, "module": "1", "time": "", "command": ["x"], "libraries": {}}
+{"process": 7, "parent": 1, "time": "", "program": "/x", "libraries": {}}
+{"call": 1, "process": 7, "thread": 1, "function": "VSDVS_SetMTU", "at": 5, \
+"in": {"switchName": "lab", "mtu": 9000}}
+{"end": 1, "process": 7, "took": 8, "status": 0}
+{"call": 2, "process": 7, "thread": 1, "function": "DVSState_SwitchForEach", "at": 5, \
+"in": {"callback": {"at": 1}, "context": null}}
+{"callback": 3, "process": 7, "thread": 1, "within": 2, "argument": "callback", "at": 6, \
+"in": {"reached": {"at": 2}, "context": null}}
+{"call": 4, "process": 7, "thread": 1, "within": 3, "function": "DVS_SwitchId", "at": 7, \
+"in": {"handle": {"at": 2}}}
+{"end": 4, "process": 7, "took": 8, "result": "lab-1"}
+{"end": 3, "process": 7, "result": 1}
+{"end": 2, "process": 7, "took": 1, "trap": {"type": "RuntimeError", "text": "late", "value": 1}}
+{"call": 5, "process": 7, "thread": 2, "function": "DVSQEX_GlobalPropGet", "at": 9, \
+"in": {"switchId": "a", "key": "b"}}
+{"end": 5, "process": 7, "took": 1, "status": 0, \
+"out": {"data": {"at": 7, "bytes": "28230000"}, "length": 4}}
+"""
+
+TEXTS: Dict[str, Callable[[], List[str]]] = {
+    "decoded": lambda: VALUES,
+    "scenario": documents,
+    "script": lambda: [TRACE],
+}
 """The harnesses that read texts, and some for each."""
 
 

@@ -18,6 +18,7 @@ INPUTS = {
     "properties": 1_500,
     "runtime_options": 20_000,
     "scenario": 8_000,
+    "script": 20_000,
     "state_image": 12_000,
     "tables": 100_000,
     "texts": 300_000,

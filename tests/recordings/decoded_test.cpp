@@ -214,6 +214,8 @@ TEST(Decoded, WhatDoesNotFitTheInputsIsRefused) {
   std::vector<RefusedInput> const all{
       {"VSDVS_SetMTU", R"([])", "in: is no object: []"},
       {"VSDVS_SetMTU", R"({"switchName": "lab"})", "in: lacks mtu"},
+      {"VSQEX_GetRuntimeOptions", R"({"ids": {"unread": "it is longer"}, "count": 3})",
+       "in.ids: was not recorded: it is longer"},
       {"VSDVS_SetMTU", R"({"switchName": "lab", "mtu": 1, "x": 1})", R"(in: there is no "x")"},
       {"VSDVS_SetMTU", R"({"switchName": {"begins": "lab", "unread": "it is longer"}, "mtu": 1})",
        "in.switchName: was not recorded: it is longer"},

@@ -1,16 +1,30 @@
-"""Tools that are recorded: programs in processes of their own, on the host that a test names."""
+"""Tools that are recorded and played: programs in processes of their own, on the host that a test
+names, or without any."""
 
 import os
+import shutil
 import subprocess
 import sys
 import textwrap
 from pathlib import Path
-from typing import Dict, List, NamedTuple, Tuple
+from typing import Dict, List, NamedTuple, Sequence, Tuple
 
+from vswitch.playing import Recorded, played
 from vswitch.recording import recorded
 from vswitch.trace import Call, Trace
 
-__all__ = ["FORMATTING", "RECORDING", "SIMULATED", "Recording", "record"]
+__all__ = [
+    "FORMATTING",
+    "RECORDING",
+    "SIMULATED",
+    "Playing",
+    "Recording",
+    "play",
+    "program",
+    "record",
+    "record_tool",
+    "without_host",
+]
 
 _BUILD = Path(os.environ["BUILD_DIR"])
 SIMULATED = _BUILD / "simhost"
@@ -38,22 +52,71 @@ class Recording(NamedTuple):
         return [one for one in self.calls if one.function == function][nth]
 
 
-def record(program: str, trace: Path, host: Path = SIMULATED, **variables: str) -> Recording:
+class Playing(NamedTuple):
+    """What a tool did over a trace, and which of its calls it did not make."""
+
+    status: int
+    stdout: str
+    stderr: str
+    left: List[Recorded]
+    has_failed: bool
+
+
+def program(source: str) -> List[str]:
+    """The command that runs a program in Python."""
+    return [sys.executable, "-c", textwrap.dedent(source)]
+
+
+def record(source: str, trace: Path, host: Path = SIMULATED, **variables: str) -> Recording:
     """Runs a program in Python, and records it."""
+    return record_tool(program(source), trace, host, **variables)
+
+
+def record_tool(
+    command: Sequence[str], trace: Path, host: Path = SIMULATED, **variables: str
+) -> Recording:
+    """Runs a tool, and records it."""
     libraries = {name: host / name for name in ("libvswitch.so", "libnebPublic.so")}
     if not libraries["libnebPublic.so"].exists():
         libraries["libnebPublic.so"] = SIMULATED / "libnebPublic.so"
     with recorded(trace, ["test"], libraries) as environment:
-        environment.update(variables)
-        for name in ("SIMHOST_STATE", "SIMHOST_SCENARIO"):
-            if name not in variables:
-                environment.pop(name, None)
-        environment["PYTHONPATH"] += os.pathsep + str(_CONTRACT)
-        return Recording(*_run(program, environment), trace)
+        return Recording(*_run(command, environment, variables), trace)
 
 
-def _run(program: str, environment: Dict[str, str]) -> Tuple[int, str, str]:
-    command = [sys.executable, "-c", textwrap.dedent(program)]
+def play(
+    command: Sequence[str], trace: Path, folder: Path, by: str = "order", **variables: str
+) -> Playing:
+    """Runs a tool over a trace, where no host can be found; `folder` is of `without_host`."""
+    with played(trace, by) as playing:
+        environment = playing.environment
+        environment["PYTHONPATH"] = os.pathsep.join(
+            [str(folder / "python"), os.environ["PYTHONPATH"]]
+        )
+        done = _run(command, environment, variables)
+        return Playing(*done, playing.ledger.left, playing.ledger.has_failed)
+
+
+def without_host(made: Path) -> Path:
+    """A folder with the module as it is built, beside which there is no host."""
+    built, python = _BUILD / "python", made / "python"
+    python.mkdir()
+    for one in built.iterdir():
+        if one.name.startswith("_libvswitch."):
+            shutil.copy(one, python)
+        elif one.name != "simhost":
+            (python / one.name).symlink_to(one)
+    (made / "recordings").symlink_to(_BUILD / "recordings")
+    return made
+
+
+def _run(
+    command: Sequence[str], environment: Dict[str, str], variables: Dict[str, str]
+) -> Tuple[int, str, str]:
+    environment.update(variables)
+    for name in ("SIMHOST_STATE", "SIMHOST_SCENARIO"):
+        if name not in variables:
+            environment.pop(name, None)
+    environment["PYTHONPATH"] += os.pathsep + str(_CONTRACT)
     done = subprocess.run(
         command,
         env=environment,

@@ -9,7 +9,7 @@ import functions
 import pytest
 from libvswitch.errors import HostError
 from recordings import SIMULATED
-from vswitch import recording
+from vswitch import _front
 from vswitch.recording import recorded
 
 FOLDER = Path(os.environ["BUILD_DIR"], "recordings")
@@ -51,7 +51,7 @@ def test_a_recording_is_not_recorded(tmp_path: Path) -> None:
 def test_a_recorder_that_is_not_there_is_missed(
     tmp_path: Path, monkeypatch: pytest.MonkeyPatch
 ) -> None:
-    monkeypatch.setattr(recording, "_FOLDER", tmp_path)
+    monkeypatch.setattr(_front, "folder", lambda: tmp_path)
     with pytest.raises(HostError, match=f"not installed: {tmp_path} lacks its libraries"):
         with recorded(tmp_path / "one", ["x"]):
             pass

@@ -17,6 +17,7 @@ from vswitch.command import (
     confirming,
     documents,
     drawing,
+    playing,
     reading,
     recording,
     replaying,
@@ -57,9 +58,10 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "draw": drawing.draw,
     "record": recording.record,
     "replay": replaying.replay,
+    "play": playing.play,
     "completion": completing.completion,
 }
-_TEXTS = ("draw", "record", "completion")
+_TEXTS = ("draw", "record", "play", "completion")
 
 STATUSES = {
     0: "all is done",
@@ -75,7 +77,7 @@ def about() -> None:
     """Look at the virtual switches of this host, and change them.
 
     A switch is called by its alias, a port SWITCH/PORT. Every command takes --real to refuse a
-    simulated host, and all but draw, record and completion take --json for programs.
+    simulated host, and all but draw, record, play and completion take --json for programs.
     """
 
 

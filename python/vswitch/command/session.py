@@ -10,7 +10,7 @@ from typer.core import TyperCommand, TyperGroup, TyperOption
 from vswitch.host import Host
 from vswitch.words import DocumentError
 
-__all__ = ["Command", "Group", "TextCommand", "from_words", "host", "is_json"]
+__all__ = ["Command", "Group", "TextCommand", "from_words", "host", "is_json", "is_real"]
 
 
 class _Session:
@@ -28,6 +28,11 @@ def _session() -> _Session:
 def is_json() -> bool:
     """Whether programs read the output."""
     return _session().json
+
+
+def is_real() -> bool:
+    """Whether a simulated host is refused."""
+    return _session().real
 
 
 def host() -> Host:

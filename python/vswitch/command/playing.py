@@ -1,0 +1,122 @@
+"""The command that runs a tool over a trace in place of a host."""
+
+import os
+import subprocess
+import sys
+import tempfile
+from enum import Enum
+from pathlib import Path
+from typing import List
+
+import typer
+
+from vswitch.command.recording import run
+from vswitch.command.session import is_real
+from vswitch.exits import REFUSED
+from vswitch.playing import Ledger, played
+from vswitch.trace import Trace, TraceError
+from vswitch.words import printable
+
+__all__ = ["play"]
+
+NOT_PLAYED = 125
+
+
+class _Word(str, Enum):
+    """A choice, which help shows as it is written."""
+
+    def __str__(self) -> str:
+        return str(self.value)
+
+
+class By(_Word):
+    """Which recorded call a call is."""
+
+    order = "order"
+    arguments = "arguments"
+
+
+class Mode(_Word):
+    """When a tool is recorded instead."""
+
+    none = "none"
+    once = "once"
+    all = "all"
+
+
+def play(
+    trace: Path = typer.Argument(..., metavar="FILE", help="The trace."),
+    command: List[str] = typer.Argument(..., metavar="COMMAND...", help="The tool, after --."),
+    by: By = typer.Option(
+        By.order,
+        help="Which recorded call a call is: the next, or the next with its arguments.",
+    ),
+    mode: Mode = typer.Option(
+        Mode.none,
+        help="Record the tool instead: never, if there is no trace, or always.",
+    ),
+    all_used: bool = typer.Option(
+        False, "--all-used", help="End with 1 if a recorded call was not made."
+    ),
+) -> None:
+    """Run a tool over a trace: each call gets what it got when it was recorded. No host is needed.
+
+    A call that was not recorded traps, and is told on standard error with the nearest one that was.
+    The exit status is 125 if there was such a call, and otherwise that of the tool, as for record.
+    """
+    if mode is Mode.all or (mode is Mode.once and not trace.exists()):
+        raise SystemExit(_record(trace, command))
+    try:
+        with played(trace, by.value) as recording:
+            status = run(command, recording.environment)
+            left = _tell(recording.ledger)
+            if recording.ledger.has_failed:
+                status = NOT_PLAYED
+    except TraceError as error:
+        print(f"vswitch: {printable(str(error))}", file=sys.stderr)
+        raise SystemExit(REFUSED) from None
+    raise SystemExit(status or (REFUSED if left and all_used else 0))
+
+
+def _tell(ledger: Ledger) -> int:
+    """Says how many calls were made; how many were not."""
+    left = ledger.left
+    words = f"{len(ledger.calls) - len(left)} of {len(ledger.calls)} recorded calls were made"
+    if left:
+        words += f"; the first that was not is {left[0].function} in line {left[0].line}"
+    print(f"vswitch: {words}", file=sys.stderr)
+    return len(left)
+
+
+def _record(trace: Path, command: List[str]) -> int:
+    """Records the tool; what there was is replaced by a trace that is whole, and by no other."""
+    descriptor, name = tempfile.mkstemp(prefix=f".{trace.name}.", dir=str(trace.parent))
+    os.close(descriptor)
+    made = Path(name)
+    try:
+        # A program of its own: this one has no host.
+        words = [sys.executable, "-m", "vswitch", "record", "-o", str(made)]
+        status = subprocess.call([*words, *(["--real"] if is_real() else []), "--", *command])
+        # Without a host there is no line, and what is wrong has been told.
+        why = _unfinished(made) if made.stat().st_size else ""
+        if why:
+            print(f"vswitch: {trace} is left as it was: {printable(why)}", file=sys.stderr)
+            return status or REFUSED
+        if made.stat().st_size:
+            made.replace(trace)
+        return status
+    finally:
+        if made.exists():
+            made.unlink()
+
+
+def _unfinished(trace: Path) -> str:
+    """Why a trace cannot be played to its end; nothing if it can."""
+    try:
+        with Trace(trace) as read:
+            for call in read:
+                if not call.has_ended:
+                    return f"the tool ended during the call {call.function}"
+    except TraceError as error:
+        return f"the recording is wrong in line {error.line}: {error.what}"
+    return ""
