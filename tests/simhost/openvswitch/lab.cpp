@@ -1,6 +1,7 @@
 #include "lab.h"
 
 #include <algorithm>
+#include <chrono>
 #include <fstream>
 #include <iterator>
 #include <sstream>

@@ -2,22 +2,16 @@
 // needs no privileges.
 #pragma once
 
-#include <chrono>
 #include <filesystem>
 #include <memory>
 #include <string>
 #include <vector>
 
 #include "events/process.h"
-#include "planes/openvswitch/transport/system.h"
+#include "soon.h"
 #include "temporary_folder.h"
 
 namespace simhost::openvswitch {
-
-/// Long after anything should be done.
-inline Deadline soon() {
-  return Deadline::clock::now() + std::chrono::seconds(20);
-}
 
 class Lab {
  public:

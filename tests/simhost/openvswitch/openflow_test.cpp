@@ -82,6 +82,17 @@ TEST(OpenFlow, ReadsEveryGroupThatItMade) {
   EXPECT_EQ(groups, sample_groups());
 }
 
+TEST(OpenFlow, SendsFramesThroughMeters) {
+  Bridge const bridge;
+  Lab::shared().ovs_ofctl(
+      {"add-meter", "unix:" + bridge.socket().native(), "meter=5,kbps,band=type=drop,rate=1000"});
+  Connection connection(bridge.socket(), soon());
+  auto const flow = flow_of_table(1, {ToMeter{5}, Output{1}});
+  connection.change(to_add({}, {flow}), soon());
+  EXPECT_EQ(bridge.flows(), texts_of(std::vector{flow}));
+  EXPECT_EQ(connection.flows({}, soon()).at(0).flow, flow);
+}
+
 TEST(OpenFlow, SaysWhatOfAFlowItCannotSay) {
   Bridge const bridge;
   auto &lab = Lab::shared();

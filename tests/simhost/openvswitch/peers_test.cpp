@@ -1,0 +1,113 @@
+// What the clients make of a switch and of a database that do not keep to the protocol, or that ask
+// whether somebody is there.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <functional>
+
+#include "peer.h"
+#include "planes/openvswitch/openflow/codec/wire.h"
+#include "planes/openvswitch/openflow/connection.h"
+#include "planes/openvswitch/ovsdb/client.h"
+#include "soon.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using testing::HasSubstr;
+
+template <typename Expected>
+std::string words_of(std::function<void()> const &work) {
+  try {
+    work();
+  } catch (Expected const &error) {
+    return error.what();
+  }
+  return "nothing is wrong";
+}
+
+/// A message of OpenFlow 1.5 without a payload.
+std::string message(char type, char xid, char version = 6, char length = 8) {
+  return {version, type, 0, length, 0, 0, 0, xid};
+}
+std::string hello() {
+  return message(0, 1);
+}
+constexpr char kBarrierReply = 21;
+
+/// The words about a switch that says this.
+template <typename Expected>
+std::string words_about_switch(std::string const &said) {
+  Peer peer(said);
+  return words_of<Expected>([&] {
+    openflow::Connection connection(peer.socket(), soon());
+    connection.barrier(soon());
+  });
+}
+
+TEST(Switch, OfAnOlderVersionIsRefused) {
+  constexpr auto *kWords =
+      "the switch refuses: OFPHFC_INCOMPATIBLE: no version of OpenFlow is common";
+  EXPECT_EQ(words_about_switch<openflow::Refused>(message(0, 1, 4)), kWords);
+  EXPECT_EQ(words_about_switch<openflow::Refused>(message(1, 1, 6, 12) + std::string(4, '\0')),
+            kWords);
+}
+
+TEST(Switch, ThatDoesNotKeepToTheProtocolIsNotBelieved) {
+  using openflow::Malformed;
+  EXPECT_EQ(words_about_switch<Malformed>(message(kBarrierReply, 1)),
+            "the switch does not begin with a hello");
+  EXPECT_EQ(words_about_switch<Malformed>(hello() + message(kBarrierReply, 2, 6, 7)),
+            "a message is shorter than its header");
+  EXPECT_EQ(words_about_switch<Malformed>(hello() + message(kBarrierReply, 2, 5)),
+            "a message is of another version of OpenFlow");
+  EXPECT_EQ(words_about_switch<Malformed>(hello() + message(10, 0)), "it ends early");
+}
+
+TEST(Switch, IsToldThatSomebodyIsThere) {
+  Peer peer(hello() + message(2, 9, 6, 10) + "ab" + message(kBarrierReply, 2));
+  {
+    openflow::Connection connection(peer.socket(), soon());
+    connection.barrier(soon());
+  }
+  EXPECT_THAT(peer.heard(), HasSubstr(message(3, 9, 6, 10) + "ab"));
+}
+
+TEST(Switch, ThatSaysNothingIsNotWaitedForForEver) {
+  Peer const peer("");
+  EXPECT_EQ(words_of<TimedOut>([&] {
+              openflow::Connection const connection(peer.socket(), Deadline::clock::now());
+            }),
+            peer.socket().native() + ": no reply in time");
+}
+
+ovsdb::Json nothing_done(std::filesystem::path const &socket) {
+  ovsdb::Client client(socket, "Open_vSwitch", soon());
+  return client.transact(ovsdb::Json::array({{{"op", "comment"}, {"comment", "c"}}}), soon());
+}
+
+std::string words_about_database(std::string const &said) {
+  Peer const peer(said);
+  return words_of<ovsdb::Malformed>([&] { nothing_done(peer.socket()); });
+}
+
+TEST(Database, ThatDoesNotKeepToTheProtocolIsNotBelieved) {
+  EXPECT_EQ(words_about_database(R"({"id": 1, "result": [], "error": null})"),
+            "a transaction has fewer results than operations");
+  EXPECT_EQ(words_about_database(R"({"id": 1, "error": null})"),
+            "the result of a transaction is no list");
+  EXPECT_EQ(words_about_database("HTTP/1.0 400"), "what the database sends is no object of JSON");
+  EXPECT_EQ(words_about_database(R"({"method": "update2", "params": ["replica", 1]})"),
+            "a change of the database is no object");
+}
+
+TEST(Database, IsToldThatSomebodyIsThere) {
+  Peer peer(R"({"method": "echo", "params": ["x"], "id": "echo"})"
+            R"({"id": 7, "result": "of nobody's request", "error": null})"
+            R"({"id": 1, "result": [{}], "error": null})");
+  EXPECT_EQ(nothing_done(peer.socket()).size(), 1);
+  EXPECT_THAT(peer.heard(), HasSubstr(R"({"error":null,"id":"echo","result":["x"]})"));
+}
+
+}  // namespace
+}  // namespace simhost::openvswitch
