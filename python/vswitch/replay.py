@@ -58,7 +58,9 @@ class OfFunction:
     left_out: int = 0
     """Because they may change the host, and only questions were wanted."""
     paths: Counts[str] = field(default_factory=Counter)
-    """What differed, without places in lists, and in how many calls; why calls were not made."""
+    """What differed, without places in lists, and in how many calls."""
+    reasons: Counts[str] = field(default_factory=Counter)
+    """Why calls were not made, and how many."""
     first: Optional[Tuple[Call, Difference]] = None
 
     @property
@@ -80,6 +82,8 @@ class Report:
 
 
 _UNKNOWN = "it is given what no call that was made has returned, or what is released"
+_NO_WALK = "it was made in a callback of no walk that ended"
+_WALK_NOT_MADE = "the walk that it was made in was not made"
 # Records within records are far less deep.
 _DEEPEST = 50
 
@@ -182,10 +186,11 @@ class Replay:
         self._waiting: Dict[Tuple[int, int], Call] = {}
 
     def take(self, call: Call, process: Optional[Process]) -> None:
-        # A process that runs another program has other memory.
-        if self._addresses.get(call.process, (None, None))[0] is not process:
-            self._addresses.pop(call.process, None)
-        self._addresses.setdefault(call.process, (process, _Addresses()))
+        known = self._addresses.get(call.process)
+        if known is None or known[0] is not process:
+            # One that runs another program has other memory, and counts anew.
+            self._leave_waiting([key for key in self._waiting if key[0] == call.process])
+            self._addresses[call.process] = process, _Addresses()
         if call.within is not None:
             self._waiting[call.process, call.number] = call
         else:
@@ -193,21 +198,23 @@ class Replay:
 
     def end(self) -> None:
         """There are no more calls."""
-        for call in self._waiting.values():
-            self._note_not_made(call, "it was made in a callback of no walk that ended")
-        self._waiting.clear()
+        self._leave_waiting(list(self._waiting))
+
+    def _leave_waiting(self, keys: List[Tuple[int, int]]) -> None:
+        for key in keys:
+            self._note_not_made(self._waiting.pop(key), _NO_WALK)
 
     def _replay(self, call: Call) -> None:
         of = self.report.of(call.function)
         if self._questions_only and not CALLS[call.function]["asks"]:
             of.left_out += 1
-            self._leave(call, "the walk that it was made in was not made")
+            self._leave(call.callbacks, _WALK_NOT_MADE)
             return
         try:
             made, found = self._made(call)
         except Untranslated as why:
             self._note_not_made(call, str(why))
-            self._leave(call, "the walk that it was made in was not made")
+            self._leave(call.callbacks, _WALK_NOT_MADE)
             return
         new = [one for one in found if not self._allows(call.function, one)]
         if not found:
@@ -216,13 +223,8 @@ class Replay:
             of.allowed += 1
         else:
             of.different += 1
-            self._note(call, new)
-
-    def _note(self, call: Call, new: List[Difference]) -> None:
-        of = self.report.of(call.function)
-        of.paths.update({one.pattern for one in new})
-        if of.first is None:
-            of.first = call, new[0]
+            of.paths.update({one.pattern for one in new})
+            of.first = of.first or (call, new[0])
 
     def _note_not_made(self, call: Call, why: str) -> None:
         of = self.report.of(call.function)
@@ -231,19 +233,18 @@ class Replay:
             of.allowed += 1
         else:
             of.not_made += 1
-            self._note(call, [missing])
+            of.reasons[why] += 1
+            of.first = of.first or (call, missing)
 
-    def _leave(self, call: Call, why: str) -> None:
-        """Says of the calls within a call that they were not made either."""
-        for callback in call.callbacks:
-            self._leave_callback(callback, why)
-
-    def _leave_callback(self, callback: Callback, why: str) -> None:
-        for number in callback.calls:
-            inner = self._waiting.pop((callback.process, number), None)
-            if inner is not None:
-                self._note_not_made(inner, why)
-                self._leave(inner, why)
+    def _leave(self, callbacks: List[Callback], why: str) -> None:
+        """Says of the calls in callbacks, and in theirs, that they were not made either."""
+        left = list(callbacks)
+        for callback in left:
+            for number in callback.calls:
+                inner = self._waiting.pop((callback.process, number), None)
+                if inner is not None:
+                    self._note_not_made(inner, why)
+                    left += inner.callbacks
 
     def _made(self, call: Call) -> Tuple[Call, List[Difference]]:
         meaning = CALLS[call.function]
@@ -252,8 +253,7 @@ class Replay:
         inputs = translated(call, self._known, addresses.find)
         visits = _Visits(call, addresses, self._make_within)
         end = self._host.make(call.function, inputs, visits.visit)
-        for callback in visits.left():
-            self._leave_callback(callback, "the host did not call back so often")
+        self._leave(visits.left(), "the host did not call back so often")
         if meaning["releases"]:
             addresses.forget(call.inputs[meaning["releases"]])
         made = _as_call(call, inputs, end, visits.made)

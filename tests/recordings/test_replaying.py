@@ -201,7 +201,7 @@ def test_threads_and_processes_are_replayed_one_after_the_other(
     report = replay(made.trace, present)
     # The child was given the handle before it was one.
     assert first(report) == {"DVS_SwitchName": (NOT_MADE, "an end", UNKNOWN)}
-    assert report.functions["DVS_SwitchName"].not_made == 1
+    assert report.functions["DVS_SwitchName"].reasons == {UNKNOWN: 1}
 
 
 class Unasked:
@@ -241,7 +241,8 @@ class Finding(Unasked):
     def make(self, function: str, inputs: Dict[str, Any], visit: Visit) -> Dict[str, Any]:
         if function == "DVSState_PortFind":
             return {"result": {"at": 1000 + len(self.given)}}
-        self.given.append(inputs["handle"])
+        if "handle" in inputs:
+            self.given.append(inputs["handle"])
         return {"result": "p"}
 
 
@@ -258,6 +259,42 @@ def test_a_program_that_a_process_runs_next_has_other_memory(tmp_path: Path) -> 
     report = replay(written(tmp_path / "trace.jsonl", *events), finding)
     assert finding.given == [{"at": 1000}, {"at": 1001}, {"at": 1002}]
     assert first(report) == {"DVS_PortId": (NOT_MADE, "an end", UNKNOWN)}
+
+
+def test_calls_of_a_walk_that_ended_its_program_are_not_those_of_the_next(tmp_path: Path) -> None:
+    def walk(last: Dict[str, Any]) -> List[Dict[str, Any]]:
+        callback = {"callback": 2, "process": 7, "thread": 1, "argument": "callback", "at": 1}
+        return [
+            event(1, "DVSState_SwitchForEach", {"callback": {"at": 5}, "context": None}),
+            {**callback, "in": {"reached": {"at": 2}}, "within": 1},
+            event(3, "DVS_PortId", {"handle": {"at": 2}}, within=2),
+            end(3, result="p"),
+            last,
+        ]
+
+    events = [*walk(PROCESS), *walk({"end": 2, "process": 7, "result": 1}), end(1)]
+    path = written(tmp_path / "trace.jsonl", *events)
+    assert check(path, Unasked()) == 4
+    report = replay(path, Finding())
+    assert report.functions["DVS_PortId"].reasons == {
+        "it was made in a callback of no walk that ended": 1,
+        "the host did not call back so often": 1,
+    }
+    assert sum(of.calls for of in report.functions.values()) == 4
+
+
+def test_walks_within_walks_without_end(tmp_path: Path) -> None:
+    begins: List[Dict[str, Any]] = []
+    ends: List[Dict[str, Any]] = []
+    callback = {"process": 7, "thread": 1, "argument": "callback", "at": 1, "in": {}}
+    for number in range(1, 10_000, 2):
+        inner = {"within": number - 1} if number > 1 else {}
+        begins.append(event(number, "DVSState_PortForEach", {"handle": {"at": 9}}, **inner))
+        begins.append({"callback": number + 1, **callback, "within": number})
+        ends += [end(number), {"end": number + 1, "process": 7, "result": 1}]
+    path = written(tmp_path / "trace.jsonl", *begins, *reversed(ends))
+    assert check(path, Unasked()) == 5_000
+    assert replay(path, Unasked()).functions["DVSState_PortForEach"].not_made == 5_000
 
 
 def test_what_cannot_be_made_is_told_with_its_reason(tmp_path: Path) -> None:

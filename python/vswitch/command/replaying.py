@@ -128,8 +128,10 @@ def _told(call: Call, found: Difference) -> str:
 
 
 def _others(of: OfFunction, first: Difference) -> str:
-    """In how many calls something else differed than did first."""
-    told = (f"{path} in {count}" for path, count in of.paths.items() if path != first.pattern)
+    """In how many calls something else differed than did first, or was the reason."""
+    known = first.pattern, first.present
+    told = [f"{path} in {count}" for path, count in of.paths.items() if path not in known]
+    told += [f"{why}: {count}" for why, count in of.reasons.items() if why not in known]
     return ", ".join(told)
 
 
@@ -155,6 +157,7 @@ def _function(of: OfFunction) -> Dict[str, Any]:
         "not_made": of.not_made,
         "left_out": of.left_out,
         "paths": dict(of.paths),
+        "reasons": dict(of.reasons),
         "first": _first(*of.first) if of.first is not None else None,
     }
 
