@@ -116,12 +116,13 @@ void PrivateOpenVswitch::start() {
 void PrivateOpenVswitch::start_database() {
   std::filesystem::remove(folder_ / "db.sock");
   auto const folder = folder_.string();
-  database_.emplace(loop_,
-                    command("ovsdb-server", {"-vconsole:off", "-vsyslog:off", "conf.db",
-                                             "--remote=punix:" + folder + "/db.sock",
-                                             "--unixctl=" + folder + "/ovsdb-server.ctl",
-                                             "--log-file=" + folder + "/ovsdb-server.log"}),
-                    [this](std::string const &how) { restart("ovsdb-server " + how); });
+  database_.emplace(
+      loop_,
+      command("/usr/sbin/ovsdb-server",
+              {"-vconsole:off", "-vsyslog:off", "conf.db", "--remote=punix:" + folder + "/db.sock",
+               "--unixctl=" + folder + "/ovsdb-server.ctl",
+               "--log-file=" + folder + "/ovsdb-server.log"}),
+      [this](std::string const &how) { restart("ovsdb-server " + how); });
 }
 
 void PrivateOpenVswitch::start_switch_when_database_is_there() {
@@ -141,7 +142,7 @@ void PrivateOpenVswitch::start_switch() {
   if (datapath_ == Datapath::netdev) {
     words.emplace_back("--disable-system");
   }
-  switch_.emplace(loop_, command("ovs-vswitchd", std::move(words)),
+  switch_.emplace(loop_, command("/usr/sbin/ovs-vswitchd", std::move(words)),
                   [this](std::string const &how) { restart("ovs-vswitchd " + how); });
   told_.started();
 }
