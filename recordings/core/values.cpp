@@ -63,18 +63,18 @@ class Walk {
     }
     end_ = start + record.size;
     line_.raw("{");
-    bool has_views = false;
+    bool is_more_there = false;
     bool has_view = false;
     for (Field const &field : record.fields) {
       bool const is_view = field.tag != no_tag;
-      has_views |= is_view;
+      is_more_there |= is_view && !is_empty(record, field, start);
       if (!is_view || holds(record, field, start)) {
         has_view |= is_view;
         line_.member(field.name);
         write_field(record, field, start);
       }
     }
-    if (has_views && !has_view) {
+    if (is_more_there && !has_view) {
       line_.member("unread").text("nothing says which view of it holds");
     }
     if (record.followed_by != nullptr && end_ != 0) {
@@ -104,6 +104,11 @@ class Walk {
   [[nodiscard]] bool holds(Record const &record, Field const &field, std::size_t start) const {
     auto const tag = field.tag == form_tag ? form_ : number(record, field.tag, start);
     return tag == field.tag_value;
+  }
+
+  /// Whether it is an array with no elements, so that nothing depends on which view holds.
+  [[nodiscard]] bool is_empty(Record const &record, Field const &field, std::size_t start) const {
+    return field.counted_by >= 0 && number(record, field.counted_by, start) == 0;
   }
 
   void write_field(Record const &record, Field const &field, std::size_t start) {

@@ -47,6 +47,7 @@ number = checked.VSDVS_DvPortIDToPortID("lab", "web-1")
 for mode in (0, 2, 3):
     checked.VSQEX_GetMcastFilters("lab", number, mode)
 checked.VSQEX_GetMcastFilterStats("lab", number, 2, "239.1.2.3")
+checked.VSQEX_GetMcastFilterStats("lab", number, 0, "01:00:5e:05:06:07")
 checked.VSDVS_SetPrivateVLANMap("lab", [
     vs.VSPvlanMapEntry(primaryVID=5, secondaryVID=5, pvlanType=1),
     vs.VSPvlanMapEntry(primaryVID=5, secondaryVID=6, pvlanType=2),
@@ -121,6 +122,12 @@ def test_the_form_that_was_asked_for_says_which_view_holds(recording: Recording)
     stats = recording.call("VSQEX_GetMcastFilterStats")
     assert stats.inputs["group"] == {"bytes": "ef010203"}
     assert stats.outputs["stats"]["VSMcastFilterStats"]["ipv4Entries"] == [0x0100000A]
+
+
+def test_where_nothing_is_no_view_is_missed(recording: Recording) -> None:
+    stats = recording.call("VSQEX_GetMcastFilterStats", 1).outputs["stats"]["VSMcastFilterStats"]
+    names = ["version", "srcIPFilterMode", "updateTime", "vni", "totalEntries", "numEntries"]
+    assert list(stats) == names and stats["numEntries"] == 0
 
 
 def test_arrays_of_a_caller_and_of_the_host(recording: Recording) -> None:
