@@ -2,20 +2,26 @@
 say the same. What the second one says was read in memory, whichever way it came there."""
 
 import json
+import subprocess
+import sys
 from pathlib import Path
 from typing import Any, List, Tuple
 
 import pytest
 from recordings import RECORDING, record
 from test_recorded_calls import EVERY_CALL
+from test_meanings import SNAPSHOT
 from test_recorded_shapes import SCENARIO, TOOL
+from test_replaying import WALKS
 from vswitch.likeness import unread_in
+from vswitch.playing import played
 from vswitch.trace import Call, Trace
 
 # Over the recording host, for which an address is a number like any other.
 ONE_BY_ONE = """
 from vswitch._replayer import PresentHost
 from vswitch.likeness import unread_in
+from vswitch.playing import played
 from vswitch.trace import Trace
 
 host = PresentHost()
@@ -106,3 +112,19 @@ def test_the_trace_of_a_replay_is_the_trace(tool: str, tmp_path: Path) -> None:
     made = record(again, second, SIMHOST_SCENARIO=str(scenario))
     assert made.status == 0, made.stderr
     assert calls_of(second) == calls_of(first) != []
+
+
+def test_what_is_played_is_replayed(tmp_path: Path) -> None:
+    scenario, trace = tmp_path / "host.json", tmp_path / "trace.jsonl"
+    scenario.write_text(json.dumps(SCENARIO))
+    made = record(TOOL + WALKS + SNAPSHOT, trace, SIMHOST_SCENARIO=str(scenario))
+    assert made.status == 0, made.stderr
+    with played(trace) as playing:
+        replayed = subprocess.run(
+            [sys.executable, "-c", WHOLE.format(trace=str(trace))],
+            env=playing.environment,
+            stderr=subprocess.PIPE,
+            text=True,
+        )
+        assert replayed.returncode == 0, replayed.stderr
+        assert playing.ledger.left == [] and not playing.ledger.has_failed
