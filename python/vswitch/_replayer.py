@@ -4,19 +4,19 @@ values of traces as the recorder does."""
 import contextlib
 import ctypes
 import json
-from pathlib import Path
 from typing import Any, Dict, Iterator, List, Optional
 
 import _libvswitch
 
 from libvswitch.errors import HostError
+from vswitch import _front
 from vswitch._meanings import CALLS
 from vswitch.likeness import Untranslated
 from vswitch.replay import Visit
 
 __all__ = ["PresentHost"]
 
-_LIBRARY = Path(_libvswitch.__file__).resolve().parent.parent / "recordings" / "libreplayer.so"
+_LIBRARY = "libreplayer.so"
 _Visitor = ctypes.CFUNCTYPE(ctypes.c_int, ctypes.c_char_p)
 
 
@@ -24,9 +24,10 @@ class PresentHost:
     """The host that the module has found."""
 
     def __init__(self) -> None:
-        if not _LIBRARY.exists():
-            raise HostError(f"replay is not installed: there is no {_LIBRARY}")
-        self._library = ctypes.CDLL(str(_LIBRARY))
+        library = _front.folder() / _LIBRARY
+        if not library.exists():
+            raise HostError(f"replay is not installed: there is no {library}")
+        self._library = ctypes.CDLL(str(library))
         for name in ("open", "check", "make"):
             getattr(self._library, f"replayer_{name}").restype = ctypes.c_char_p
         self._library.replayer_check.argtypes = [ctypes.c_size_t, ctypes.c_char_p]

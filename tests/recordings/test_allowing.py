@@ -6,6 +6,7 @@ from typing import Any, Dict
 import pytest
 from vswitch import allowing
 from vswitch.likeness import Difference
+from vswitch.replay import NOT_MADE
 from vswitch.words import DocumentError
 
 ENTRY = "out.table.VSMACTable.macEntries[1].vid"
@@ -42,6 +43,13 @@ def test_what_an_entry_covers(entry: Dict[str, Any], covered: bool) -> None:
 def test_statuses_are_named() -> None:
     entry = {"path": "status", "recorded": "QEX_OK", "present": "QEX_BUSY"}
     assert covers(entry, "VSDVS_SetMTU", Difference("status", "QEX_OK", "QEX_BUSY"))
+
+
+def test_a_call_that_was_not_made_is_allowed_by_its_reason() -> None:
+    missing = Difference(NOT_MADE, "QEX_OK", "its process ended during it")
+    entry = {"path": "not made", "present": "its process ended during it"}
+    assert covers(entry, "VSDVS_SetMTU", missing)
+    assert not covers({**entry, "present": "another"}, "VSDVS_SetMTU", missing)
 
 
 def test_what_was_not_found_is_known() -> None:

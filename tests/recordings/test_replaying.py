@@ -5,9 +5,11 @@ from pathlib import Path
 from typing import Any, Dict, List, Optional, Tuple
 
 import pytest
+from libvswitch.errors import HostError
 from recordings import Recording, record
 from simhost import Host
 from test_recorded_shapes import SCENARIO, TOOL
+from vswitch import _front
 from vswitch._replayer import PresentHost
 from vswitch.likeness import Difference
 from vswitch.replay import NOT_MADE, Report, Visit, check, replay
@@ -202,6 +204,15 @@ def test_threads_and_processes_are_replayed_one_after_the_other(
     # The child was given the handle before it was one.
     assert first(report) == {"DVS_SwitchName": (NOT_MADE, "an end", UNKNOWN)}
     assert report.functions["DVS_SwitchName"].reasons == {UNKNOWN: 1}
+
+
+def test_a_library_that_is_not_there_is_missed(
+    tmp_path: Path, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    monkeypatch.setattr(_front, "folder", lambda: tmp_path)
+    with pytest.raises(HostError) as caught:
+        PresentHost()
+    assert str(caught.value) == f"replay is not installed: there is no {tmp_path}/libreplayer.so"
 
 
 class Unasked:
