@@ -85,8 +85,9 @@ class Correspondence:
     def learn_given(self, call: Call) -> None:
         """What a tool named itself, and both hosts took, has that name on both."""
         for path, kind, value in _values_of_kinds("in", call.inputs, CALLS[call.function]):
-            if kind in _MAPPED and value not in self._here[kind]:
-                self._here[kind][value] = self._there[kind].setdefault(value, value)
+            if kind not in _MAPPED or value in self._here[kind] or value in self._there[kind]:
+                continue
+            self._here[kind][value] = self._there[kind][value] = value
 
     def present(self, kind: str, recorded: Any) -> Any:
         """What stands on the present host for a value; the value itself until that is known."""

@@ -116,6 +116,15 @@ def test_what_a_tool_named_itself_has_that_name_on_both() -> None:
     }
 
 
+def test_what_a_tool_names_is_not_what_is_something_else_here() -> None:
+    known = Correspondence()
+    assert told(uplinks(("nic0", 4)), uplinks(("nic0", 14)), known) == []
+    guessed = call("VSQEX_PortGetTeamUplinkHint", {"port": 14})
+    assert told(guessed, guessed, known) == []
+    assert translated(guessed, known, int) == {"port": 14}
+    assert told(uplinks(("nic0", 4)), uplinks(("nic0", 14)), known) == []
+
+
 def test_what_is_refused_names_nothing() -> None:
     known = Correspondence()
     refused = call("VSQEX_PortGetTeamUplinkHint", {"port": 3}, status=3)
