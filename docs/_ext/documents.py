@@ -19,6 +19,7 @@ PAGES = {
     "simhost/README.md": "/more/simulated_host.md",
     "simhost/python/README.md": "/more/plugin.md",
     "simhost/SCENARIOS.md": "/more/scenarios.md",
+    "simhost/planes/openvswitch/compile/README.md": "/more/pipeline.md",
     "bench/README.md": "/more/bench.md",
     "include/README.md": "/more/headers.md",
     "packaging/README.md": "/more/packages.md",

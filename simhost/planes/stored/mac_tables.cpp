@@ -8,8 +8,8 @@
 
 #include "base/outcomes.h"
 #include "base/vlan.h"
+#include "model/mac/learning.h"
 #include "model/mac/properties.h"
-#include "model/options/host_settings.h"
 #include "model/properties/properties.h"
 #include "planes/stored/counters.h"
 #include "qexapi/protocols.h"
@@ -38,19 +38,6 @@ void check_source(VSMACEntry const &entry) {
   if (entry.vni > QEX_VIRTUAL_NETWORK_ID_MAX) {
     throw Refused(QEX_BAD_PARAM);
   }
-}
-
-VSMACLearning learning_of(storage::Transaction &transaction, storage::SwitchKey key) {
-  auto const owner = storage::PropertyOwner::global(key);
-  if (auto const own = find_value(transaction, mac::learning, owner)) {
-    return *own;
-  }
-  auto const global = global_mac_learning(transaction);
-  VSMACLearning learning{};
-  learning.agingTime = global.agingTime;
-  learning.learnStatic = global.learnStatic != 0 ? 1 : 0;
-  learning.macLimit = global.macLimit;
-  return learning;
 }
 
 VSPMACLearning port_learning(storage::Transaction &transaction, Place const &place) {
@@ -120,7 +107,7 @@ Sighting turn_away(storage::ChangingTransaction &transaction, Place const &place
 std::vector<VSMACEntry> addresses(storage::Transaction &transaction, Place const &place,
                                   VSMACAddrType type) {
   auto const now = clock_now(transaction);
-  auto const gone = gone_if_seen_by(transaction, learning_of(transaction, place.switch_key));
+  auto const gone = gone_if_seen_by(transaction, mac::learning_of(transaction, place.switch_key));
   std::vector<VSMACEntry> entries;
   for (auto const &address : storage::addresses_at(transaction, place, type, gone)) {
     entries.push_back(entry_of(address, now));
@@ -144,7 +131,7 @@ void describe_address(storage::ChangingTransaction &transaction, Place const &pl
   if (entry.macAddrType > VS_MAC_ADDR_TYPE_LEARNED) {
     throw Refused(QEX_BAD_PARAM);
   }
-  remove_aged(transaction, place.switch_key, learning_of(transaction, place.switch_key));
+  remove_aged(transaction, place.switch_key, mac::learning_of(transaction, place.switch_key));
   auto const known = storage::find_address(transaction, place.switch_key, name_of(entry));
   if (known && !is_at(place, *known) && known->type != VS_MAC_ADDR_TYPE_LEARNED) {
     throw Refused(QEX_EXISTS);
@@ -160,7 +147,7 @@ void describe_address(storage::ChangingTransaction &transaction, Place const &pl
 
 void remove_address(storage::ChangingTransaction &transaction, Place const &place,
                     VSMACEntry const &entry) {
-  remove_aged(transaction, place.switch_key, learning_of(transaction, place.switch_key));
+  remove_aged(transaction, place.switch_key, mac::learning_of(transaction, place.switch_key));
   auto const known = storage::find_address(transaction, place.switch_key, name_of(entry));
   if (!known || !is_at(place, *known) ||
       (entry.macAddrType != VS_MAC_ADDR_TYPE_ALL && entry.macAddrType != known->type)) {
@@ -172,7 +159,7 @@ void remove_address(storage::ChangingTransaction &transaction, Place const &plac
 Sighting learn(storage::ChangingTransaction &transaction, Place const &place,
                VSMACEntry const &source) {
   check_source(source);
-  auto const learning = learning_of(transaction, place.switch_key);
+  auto const learning = mac::learning_of(transaction, place.switch_key);
   auto const port = place.port ? port_learning(transaction, place) : VSPMACLearning{};
   if (place.port && port.learning == 0) {
     return Sighting::learning_off;
@@ -203,7 +190,7 @@ Sighting learn(storage::ChangingTransaction &transaction, Place const &place,
 }
 
 VSPMACLearningStats learning_stats(storage::Transaction &transaction, Place const &place) {
-  auto const gone = gone_if_seen_by(transaction, learning_of(transaction, place.switch_key));
+  auto const gone = gone_if_seen_by(transaction, mac::learning_of(transaction, place.switch_key));
   VSPMACLearningStats stats{};
   stats.numMACsLearned = static_cast<qex_uint32>(storage::count_learned(transaction, place) -
                                                  storage::count_aged(transaction, place, gone));

@@ -1,0 +1,111 @@
+// All stages after one another, and what cannot be compiled.
+#include "planes/openvswitch/compile/compile.h"
+
+#include <algorithm>
+#include <set>
+#include <string>
+
+#include "base/outcomes.h"
+#include "planes/openvswitch/compile/stages/stages.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+// What is sampled by length has a frame's header at least.
+constexpr std::uint16_t kLeastBytes = 14;
+
+[[noreturn]] void refuse(QEX_ReturnStatus status, std::string const &reason) {
+  throw Refused(status, reason);
+}
+
+void check_ports(Network const &network) {
+  std::set<openflow::Port> taken;
+  auto const check = [&](openflow::Port port, std::uint32_t number) {
+    auto const whose = "port " + std::to_string(number) + ": ";
+    if (port == 0 || port > kGreatestPort) {
+      refuse(QEX_LIMIT_EXCEEDED, whose + "Open vSwitch has no port " + std::to_string(port));
+    }
+    if (!taken.insert(port).second) {
+      refuse(QEX_BAD_PARAM,
+             whose + "another one is port " + std::to_string(port) + " of Open vSwitch");
+    }
+  };
+  for (auto const &uplink : network.uplinks) {
+    check(uplink.port, uplink.number);
+  }
+  for (auto const &port : network.ports) {
+    check(port.port, port.number);
+  }
+}
+
+void check_teams(Network const &network) {
+  std::set<openflow::Port> uplinks;
+  for (auto const &uplink : network.uplinks) {
+    uplinks.insert(uplink.port);
+  }
+  for (auto const &team : network.teams) {
+    for (auto const *slots : {&team.in_use, &team.standby}) {
+      for (auto const &slot : *slots) {
+        bool const all_there = std::all_of(
+            slot.begin(), slot.end(), [&](openflow::Port port) { return uplinks.contains(port); });
+        if (slot.empty() || !all_there) {
+          refuse(QEX_BAD_PARAM, "a team uses an uplink that the switch has not");
+        }
+      }
+    }
+  }
+  for (auto const &port : network.ports) {
+    if (port.team && *port.team >= network.teams.size()) {
+      refuse(QEX_BAD_PARAM,
+             "port " + std::to_string(port.number) + " uses a team that the switch has not");
+    }
+  }
+}
+
+void check_mirrors(Network const &network) {
+  std::set<std::uint32_t> taken;
+  for (auto const &mirror : network.mirrors) {
+    auto const which = "mirror session " + std::to_string(mirror.id);
+    if (mirror.id == 0 || !taken.insert(mirror.id).second) {
+      refuse(QEX_BAD_PARAM, which + ": its number is 0 or another one's");
+    }
+    if (mirror.most_bytes != 0 && mirror.most_bytes < kLeastBytes) {
+      refuse(QEX_BAD_PARAM, which + ": fewer than " + std::to_string(kLeastBytes) +
+                                " bytes of a frame cannot be mirrored");
+    }
+  }
+}
+
+}  // namespace
+
+Compiled compile(Network const &network) {
+  check_ports(network);
+  check_teams(network);
+  check_mirrors(network);
+
+  Plan const plan(network);
+  Program program;
+  for (auto *stage :
+       {compile_admission, compile_sources, compile_tags, compile_private_vlans, compile_own_frames,
+        compile_mirrors, compile_learning, compile_lookup, compile_receiving, compile_dispatch,
+        compile_lists, compile_delivery, compile_teams}) {
+    stage(plan, program);
+  }
+  std::sort(program.flows.begin(), program.flows.end());
+  std::sort(program.groups.begin(), program.groups.end());
+  bool const ages = network.addresses.aging != 0;
+  return {.rows = {.most_learned = network.addresses.limit},
+          .flows = std::move(program.flows),
+          .groups = std::move(program.groups),
+          .ages_elsewhere = ages && plan.hard_timeout() == 0};
+}
+
+openflow::Flow generation_marker(std::uint64_t generation) {
+  openflow::Flow flow;
+  flow.table = table::kGeneration;
+  flow.priority = 0;
+  flow.cookie = generation;
+  return flow;
+}
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,43 @@
+// From what a switch is to its frames to what Open vSwitch has for it: a pure function, so that
+// what differs between two networks differs between what is made of them, and nothing else.
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+#include "planes/openvswitch/compile/network.h"
+#include "planes/openvswitch/openflow/flow.h"
+#include "planes/openvswitch/openflow/group.h"
+
+namespace simhost::openvswitch {
+
+/// What the rows of Open vSwitch's database have to say. The bridge itself forwards nothing by
+/// itself (fail_mode=secure).
+struct Rows {
+  /// In Open_vSwitch other_config:vlan-limit, for all bridges.
+  std::uint32_t most_tags = 2;
+  /// In Flow_Table flow_limit of table::kLearnedAddresses.
+  std::uint32_t most_learned = 0;
+
+  friend auto operator<=>(Rows const &, Rows const &) = default;
+};
+
+/// No two flows have one place, and no two groups one number. Open vSwitch fills four tables by
+/// itself, of which nothing is said here: kFirstAddresses, kLearnedAddresses, kRecentSources,
+/// kCountedSources.
+struct Compiled {
+  Rows rows;
+  std::vector<openflow::Flow> flows;    ///< in their order
+  std::vector<openflow::Group> groups;  ///< likewise
+  /// Learned addresses that the switch keeps for ever: the ageing time is longer than a flow can
+  /// tell, and somebody else has to remove them in time.
+  bool ages_elsewhere = false;
+};
+
+/// Refuses, in words, what no flows can be made of (QEX_LIMIT_EXCEEDED, QEX_BAD_PARAM).
+Compiled compile(Network const &network);
+
+/// The flow that says which change of the configuration is in force.
+openflow::Flow generation_marker(std::uint64_t generation);
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,144 @@
+// What a switch is to its frames: what compile() makes flows of. Plain values, which know neither
+// the state nor a plane; read_network() fills them.
+#pragma once
+
+#include <bitset>
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "planes/openvswitch/openflow/port.h"
+#include "planes/openvswitch/openflow/value.h"
+
+namespace simhost::openvswitch {
+
+using openflow::EthernetAddress;
+
+/// A set of VLANs; 0 stands for frames without a tag.
+using Vlans = std::bitset<4096>;
+
+/// An uplink that has a device.
+struct Uplink {
+  openflow::Port port = 0;
+  std::uint32_t number = 0;  ///< of its port of the switch
+  bool blocked = false;
+};
+
+/// Uplinks that are one link to the network: one, or those of a link-aggregation group.
+using Slot = std::vector<openflow::Port>;
+
+/// How a team chooses among the slots that are in use.
+enum class Balance {
+  first,      ///< the first one
+  share,      ///< by the share of the port, see Port::share
+  source,     ///< by the source address of the frame
+  addresses,  ///< by the IP addresses; the network takes the uplinks for one link
+};
+
+/// The uplinks that ports use, in the order of their policy. Which of them meet the criteria, and
+/// which come first, is decided before.
+struct Team {
+  Balance balance = Balance::first;
+  std::vector<Slot> in_use;
+  std::vector<Slot> standby;  ///< step in, in this order, when none in use has a link
+};
+
+/// The kinds of private VLAN, by the numbers that registers hold.
+enum class PrivateKind : std::uint8_t { none = 0, promiscuous = 1, isolated = 2, community = 3 };
+
+/// A private VLAN: the promiscuous one of a primary VLAN is the primary VLAN itself.
+struct PrivateVlan {
+  std::uint16_t primary = 0;
+  std::uint16_t secondary = 0;
+  PrivateKind kind = PrivateKind::none;
+};
+
+/// What a port does with tags.
+struct PortVlan {
+  std::uint16_t vlan = 0;  ///< of frames without a tag
+  /// The VLANs of frames that the client tags by itself; nothing for a client that does not.
+  std::optional<Vlans> carried = std::nullopt;
+  bool must_be_private = false;  ///< passes nothing while the VLAN is not one of the switch's map
+  std::optional<std::uint8_t> priority = std::nullopt;  ///< instead of that of the client's tags
+  bool nested = false;                                  ///< frames may have a second tag
+};
+
+/// What becomes of frames from an address that there is no room for.
+enum class WhenFull { allow, drop };
+
+struct Learning {
+  std::uint32_t limit = 0;
+  WhenFull when_full = WhenFull::allow;
+};
+
+/// A port with a client.
+struct Port {
+  openflow::Port port = 0;
+  std::uint32_t number = 0;  ///< of the switch
+  /// The client's address; the first that it sends from, while it is not known.
+  std::optional<EthernetAddress> address = std::nullopt;
+  PortVlan vlan = {};
+  bool blocked = false;
+  bool address_changed = false;      ///< although the client may not: nothing passes
+  bool may_forge = true;             ///< may send from other addresses than its own
+  bool promiscuous = false;          ///< gets all frames of its VLANs
+  bool floods = false;               ///< gets frames for unknown addresses
+  bool is_sink = false;              ///< gets those that no other port takes
+  bool transmits_by_uplink = false;  ///< whatever it sends goes out over an uplink, and only there
+  std::optional<Learning> learning = std::nullopt;
+  /// Of the switch's teams; none: it reaches no uplink.
+  std::optional<std::size_t> team = std::nullopt;
+  std::uint32_t share = 0;    ///< which of the team's slots it uses: the remainder by their count
+  bool mirrors_only = false;  ///< gets nothing but what is mirrored to it
+  bool sends_nothing = false;
+};
+
+/// An address that stays where it is put.
+struct FixedAddress {
+  EthernetAddress address = {};
+  std::uint16_t vlan = 0;
+  std::optional<std::uint32_t> port = std::nullopt;  ///< its number; none: beyond the uplinks
+};
+
+/// What a mirror session copies from.
+struct MirrorSources {
+  std::vector<openflow::Port> ports;
+  std::vector<openflow::Port> uplinks;
+  std::vector<std::uint16_t> vlans;
+};
+
+struct Mirror {
+  std::uint32_t id = 0;  ///< not 0, and of no other session of the switch
+  MirrorSources
+      received;        ///< to clients of ports; from the wires of uplinks; over uplinks in VLANs
+  MirrorSources sent;  ///< by clients of ports; to the wires of uplinks; by ports in VLANs
+  std::vector<openflow::Port> to_ports;
+  std::vector<openflow::Port> to_uplinks;
+  std::uint16_t remote_vlan = 0;  ///< the tag that copies have on uplinks
+  std::uint16_t most_bytes = 0;   ///< of a frame; 0 for all
+  bool keeps_vlan = false;        ///< copies have the tag of the frame's VLAN
+};
+
+/// How addresses are learned.
+struct Addresses {
+  std::uint32_t aging = 300;  ///< seconds; 0: nothing is learned
+  std::uint32_t limit = 65536;
+  std::uint32_t uplink_limit = 16384;  ///< of those beyond the uplinks
+  bool fixed_ones_move = false;        ///< when they are seen elsewhere
+};
+
+struct Network {
+  bool disabled = false;
+  std::uint16_t mtu = 1500;  ///< bytes of a packet
+  std::vector<PrivateVlan> private_vlans;
+  std::vector<Uplink> uplinks;
+  std::vector<Team> teams;
+  std::vector<Port> ports;  ///< those that have a device
+  Addresses addresses;
+  std::vector<FixedAddress> fixed_addresses;
+  std::vector<Mirror> mirrors;
+};
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,169 @@
+// The places of the pipeline: its tables, its registers, what they hold, and the cookies by which
+// what a flow counted is known. README.md has the picture.
+#pragma once
+
+#include <cstdint>
+
+#include "planes/openvswitch/openflow/field.h"
+#include "planes/openvswitch/openflow/port.h"
+
+namespace simhost::openvswitch {
+
+namespace table {
+
+/// What may come in at all; writes kOrigin.
+inline constexpr std::uint8_t kAdmission = 0;
+/// Whose addresses a port may send from; writes kVerdict for the next one.
+inline constexpr std::uint8_t kSources = 1;
+/// Whether a client whose address is not known sent from its first one; reads kVerdict.
+inline constexpr std::uint8_t kFirstAddress = 2;
+/// From tags to kVlan and kPriority; the tag goes.
+inline constexpr std::uint8_t kTags = 3;
+/// Whether what follows the tag that a client's frame keeps as its second one is a tag as well;
+/// reads kClientTag.
+inline constexpr std::uint8_t kClientTags = 18;
+/// Who may have a second tag; reads kVlan, writes kTooLarge.
+inline constexpr std::uint8_t kNestedTags = 4;
+/// From kVlan to kPrivateKind and kDomain, for what is not too large.
+inline constexpr std::uint8_t kPrivateVlans = 5;
+/// Frames of this switch that come back over an uplink; asks kRecentSources.
+inline constexpr std::uint8_t kOwnFrames = 6;
+/// Asks the sessions; a frame that has come this far is one of the switch's.
+inline constexpr std::uint8_t kMirroring = 7;
+/// Where an address is; writes kVerdict.
+inline constexpr std::uint8_t kLearning = 8;
+/// What becomes of frames from addresses past the limit of their port; reads and writes kVerdict.
+inline constexpr std::uint8_t kLimits = 9;
+/// Likewise past that of the switch.
+inline constexpr std::uint8_t kSwitchLimit = 19;
+/// Asks the three tables of addresses; they write kDestination.
+inline constexpr std::uint8_t kLookup = 10;
+/// Which ports an uplink's frames are for; writes kWay.
+inline constexpr std::uint8_t kReceiving = 11;
+/// Whether the frame came in at the slot that its group elected; reads kElected.
+inline constexpr std::uint8_t kElection = 12;
+/// To a port, to a list of ports, to the uplinks; reads kDestination and kWay, writes kList.
+inline constexpr std::uint8_t kDispatch = 13;
+/// Lists of ports by kList, kDomain and kWay, in pieces by kPiece.
+inline constexpr std::uint8_t kLists = 14;
+/// Out to the port in kDestination, if its VLANs allow it.
+inline constexpr std::uint8_t kDelivery = 15;
+/// Which uplink carries it: the group of the port's team.
+inline constexpr std::uint8_t kTeams = 16;
+/// Out to the uplink in kWire, with its tag.
+inline constexpr std::uint8_t kWires = 17;
+
+/// Sessions by the port that a frame came in at, and by its VLAN.
+inline constexpr std::uint8_t kMirrorsOfPorts = 20;
+inline constexpr std::uint8_t kMirrorsOfVlans = 21;
+/// The copies of the session in kSession; counts them.
+inline constexpr std::uint8_t kMirrors = 22;
+
+/// Addresses, by destination and by kDomain unless their client tags, that are configured,
+inline constexpr std::uint8_t kFixedAddresses = 30;
+/// that clients without a known one sent from first,
+inline constexpr std::uint8_t kFirstAddresses = 31;
+/// and that are learned. These two the switch fills by itself.
+inline constexpr std::uint8_t kLearnedAddresses = 32;
+/// Sources that ports sent from in the last second or two; filled by the switch itself.
+inline constexpr std::uint8_t kRecentSources = 33;
+/// Sources that are learned, as many as the switch may have; filled by the switch itself.
+inline constexpr std::uint8_t kCountedSources = 34;
+
+/// Reached by no frame: the cookie of its one flow is the number of the change that is in force.
+inline constexpr std::uint8_t kGeneration = 250;
+
+}  // namespace table
+
+namespace field {
+
+/// 0 for a frame from a client, 1 for one from an uplink.
+inline constexpr auto kOrigin = openflow::Field::reg0;
+/// Bits of their own.
+inline constexpr auto kFacts = openflow::Field::reg1;
+/// The packet is larger than the MTU.
+inline constexpr openflow::SubField kTooLarge{kFacts, 0, 1};
+/// There was room for the source.
+inline constexpr openflow::SubField kVerdict{kFacts, 1, 1};
+/// A Recent: whether the source sent from a port of this switch just before.
+inline constexpr openflow::SubField kRecent{kFacts, 2, 2};
+/// The frame's own VLAN, 0 for none.
+inline constexpr auto kVlan = openflow::Field::reg2;
+/// A PrivateKind.
+inline constexpr auto kPrivateKind = openflow::Field::reg3;
+/// The VLAN under which addresses are known: the primary one of a private VLAN, else its own.
+inline constexpr auto kDomain = openflow::Field::reg4;
+inline constexpr auto kPriority = openflow::Field::reg5;
+/// The OpenFlow port of a client; 0 while the address is not known, kBeyond past the uplinks.
+inline constexpr auto kDestination = openflow::Field::reg6;
+/// The number of the way over which an uplink's frame comes; 0 for frames of clients.
+inline constexpr auto kWay = openflow::Field::reg7;
+/// A List.
+inline constexpr auto kList = openflow::Field::reg8;
+inline constexpr auto kPiece = openflow::Field::reg9;
+/// The first uplink of the slot at which frames of a way are to come in.
+inline constexpr auto kElected = openflow::Field::reg10;
+/// The OpenFlow port of an uplink.
+inline constexpr auto kWire = openflow::Field::reg11;
+/// The number of a mirror session.
+inline constexpr auto kSession = openflow::Field::reg12;
+/// A tag, as it was in the frame.
+inline constexpr auto kClientTag = openflow::Field::reg13;
+
+}  // namespace field
+
+/// The number of bits that a VLAN has in registers.
+inline constexpr unsigned kVlanBits = 12;
+
+inline constexpr std::uint64_t kFromClient = 0;
+inline constexpr std::uint64_t kFromUplink = 1;
+/// In kDestination: no port has this number.
+inline constexpr openflow::Port kBeyond = 0xffff;
+/// The last that Open vSwitch gives a device.
+inline constexpr openflow::Port kGreatestPort = 0xfeff;
+
+/// In kRecent.
+enum class Recent : std::uint8_t {
+  drops = 1,      ///< the frame is one of this switch's that came back
+  is_on_way = 2,  ///< it may be one that had to go over an uplink: it passes, and teaches nothing
+};
+
+/// In kList.
+enum class List : std::uint8_t {
+  all = 1,          ///< every port
+  unknown = 2,      ///< those that get frames for unknown addresses
+  promiscuous = 3,  ///< those that get every frame
+};
+
+/// What a flow counts: the kind is the cookie's first byte, the number of a port or of a mirror
+/// session its last four.
+enum class Counted : std::uint8_t {
+  nothing = 0,
+  disabled = 1,         ///< dropped: the switch is disabled
+  reserved = 2,         ///< dropped: for the link's other end only, or malformed
+  blocked = 3,          ///< dropped: the port is blocked, or sends nothing
+  too_large = 4,        ///< dropped: larger than the MTU
+  forged = 5,           ///< dropped: from an address that is not the client's
+  address_changed = 6,  ///< dropped: the client changed its address and may not
+  wrong_tag = 7,        ///< dropped: of a VLAN that the port has not
+  nested_tag = 8,       ///< dropped: a second tag where none may be
+  own_frame = 9,        ///< dropped: came back over an uplink
+  limit_allowed = 10,   ///< let through although there was no room for its source
+  limit_dropped = 11,   ///< dropped because there was no room
+  learned = 12,         ///< an address that was learned at a port; at the uplinks it has number 0
+  first_address = 13,   ///< the address that a client sent from first
+  recent_source = 14,   ///< what kRecentSources holds
+  counted_source = 15,  ///< what kCountedSources holds
+  mirrored = 16,        ///< copies of a mirror session
+  port = 17,            ///< of a port, for nothing that is counted
+};
+
+constexpr std::uint64_t cookie(Counted counted, std::uint32_t number = 0) {
+  return static_cast<std::uint64_t>(counted) << 56U | number;
+}
+
+/// Groups of a way: the low bits are its number.
+inline constexpr openflow::GroupId kSendingGroups = 0x10000000;
+inline constexpr openflow::GroupId kReceivingGroups = 0x20000000;
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,74 @@
+// Private VLANs by their numbers, and the addresses of the clients.
+#include "planes/openvswitch/compile/plan.h"
+
+#include <set>
+#include <utility>
+
+namespace simhost::openvswitch {
+namespace {
+
+// A timeout of a flow has 16 bits.
+constexpr std::uint32_t kLongestTimeout = 65535;
+
+}  // namespace
+
+Plan::Plan(Network const &given) : network(given), ways(given) {
+  note_private_vlans();
+  note_addresses();
+}
+
+std::uint16_t Plan::hard_timeout() const {
+  auto const aging = network.addresses.aging;
+  return aging > kLongestTimeout ? 0 : static_cast<std::uint16_t>(aging);
+}
+
+void Plan::note_private_vlans() {
+  for (std::size_t vlan = 0; vlan < kinds_.size(); ++vlan) {
+    kinds_[vlan].domain = static_cast<std::uint16_t>(vlan);
+  }
+  std::set<std::uint16_t> named;
+  for (auto const &entry : network.private_vlans) {
+    kinds_[entry.primary] = {.domain = entry.primary, .kind = PrivateKind::promiscuous};
+    kinds_[entry.secondary] = {.domain = entry.primary, .kind = entry.kind};
+    named.insert({entry.primary, entry.secondary});
+  }
+  private_vlans_.assign(named.begin(), named.end());
+}
+
+void Plan::note_addresses() {
+  std::set<std::pair<EthernetAddress, std::optional<std::uint16_t>>> taken;
+  for (auto const &port : network.ports) {
+    if (!port.address || !has_vlan(*this, port)) {
+      continue;
+    }
+    auto const domain =
+        port.vlan.carried ? std::nullopt : std::optional(kind_of(port.vlan.vlan).domain);
+    if (taken.insert({*port.address, domain}).second) {
+      own_addresses_.push_back({.port = &port, .address = *port.address, .domain = domain});
+    }
+  }
+}
+
+bool has_vlan(Plan const &plan, Port const &port) {
+  return !port.vlan.must_be_private || plan.kind_of(port.vlan.vlan).kind != PrivateKind::none;
+}
+
+bool takes_frames(Plan const &plan, Port const &port) {
+  return !port.blocked && !port.address_changed && !port.mirrors_only && has_vlan(plan, port);
+}
+
+bool sends_frames(Port const &port) {
+  return !port.blocked && !port.sends_nothing;
+}
+
+Carried carried_by(PortVlan const &vlan) {
+  Carried carried{.untagged = std::nullopt, .tagged = *vlan.carried};
+  if (vlan.vlan != 0 || carried.tagged[0]) {
+    carried.untagged = vlan.vlan;
+    carried.tagged.reset(vlan.vlan);
+  }
+  carried.tagged.reset(0);
+  return carried;
+}
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,67 @@
+// What several stages have to know of a network, worked out once.
+#pragma once
+
+#include <array>
+#include <cstdint>
+#include <optional>
+#include <vector>
+
+#include "planes/openvswitch/compile/network.h"
+#include "planes/openvswitch/compile/vlan_masks.h"
+#include "planes/openvswitch/compile/ways.h"
+
+namespace simhost::openvswitch {
+
+/// A VLAN among the switch's private ones.
+struct VlanKind {
+  std::uint16_t domain = 0;  ///< its primary VLAN, or itself
+  PrivateKind kind = PrivateKind::none;
+};
+
+/// Where a port puts frames without a tag, and which it has besides.
+struct Carried {
+  std::optional<std::uint16_t> untagged;
+  Vlans tagged;  ///< neither 0 nor `untagged` among them
+};
+
+/// The known address of a client. Of several ports with one address in one VLAN the first has it.
+struct OwnAddress {
+  Port const *port;
+  EthernetAddress address;
+  std::optional<std::uint16_t> domain;  ///< none: in all VLANs of the port
+};
+
+class Plan {
+ public:
+  /// `given` must outlive it.
+  explicit Plan(Network const &given);
+
+  Network const &network;
+  Ways const ways;
+
+  [[nodiscard]] VlanKind const &kind_of(std::uint16_t vlan) const { return kinds_[vlan]; }
+  /// The private VLANs and their primary ones.
+  [[nodiscard]] std::vector<std::uint16_t> const &private_vlans() const { return private_vlans_; }
+  [[nodiscard]] std::vector<OwnAddress> const &own_addresses() const { return own_addresses_; }
+  /// Whether a switch outside may send this one's frames back.
+  [[nodiscard]] bool frames_may_return() const { return network.uplinks.size() > 1; }
+  /// How long a learned address stays, in seconds; 0 for as long as nobody takes it.
+  [[nodiscard]] std::uint16_t hard_timeout() const;
+
+ private:
+  void note_private_vlans();
+  void note_addresses();
+
+  std::array<VlanKind, 4096> kinds_{};
+  std::vector<std::uint16_t> private_vlans_;
+  std::vector<OwnAddress> own_addresses_;
+};
+
+/// Whether a port has a VLAN at all, and takes part in what happens there.
+bool has_vlan(Plan const &plan, Port const &port);
+bool takes_frames(Plan const &plan, Port const &port);
+bool sends_frames(Port const &port);
+/// Of a port whose client tags its frames.
+Carried carried_by(PortVlan const &vlan);
+
+}  // namespace simhost::openvswitch

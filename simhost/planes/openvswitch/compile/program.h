@@ -1,0 +1,73 @@
+// The flows and groups of a switch as they are put together.
+#pragma once
+
+#include <cstdint>
+#include <initializer_list>
+#include <utility>
+#include <vector>
+
+#include "planes/openvswitch/compile/pipeline.h"
+#include "planes/openvswitch/openflow/action.h"
+#include "planes/openvswitch/openflow/flow.h"
+#include "planes/openvswitch/openflow/group.h"
+#include "planes/openvswitch/openflow/match.h"
+
+namespace simhost::openvswitch {
+
+using openflow::Actions;
+using openflow::Match;
+
+/// What a flow does, and what it counts.
+struct Rule {
+  std::uint16_t priority = 0;
+  Match match = {};
+  Actions actions = {};  ///< none: the frame is dropped
+  std::uint64_t cookie = 0;
+};
+
+struct Program {
+  std::vector<openflow::Flow> flows;
+  std::vector<openflow::Group> groups;
+
+  void add(std::uint8_t table, Rule rule) {
+    flows.push_back({.table = table,
+                     .priority = rule.priority,
+                     .match = std::move(rule.match),
+                     .cookie = rule.cookie,
+                     .actions = std::move(rule.actions)});
+  }
+};
+
+inline openflow::Action go_to(std::uint8_t table) {
+  return openflow::Resubmit{.table = table};
+}
+
+/// `more` after `actions`.
+inline Actions &append(Actions &actions, Actions const &more) {
+  actions.insert(actions.end(), more.begin(), more.end());
+  return actions;
+}
+
+/// The bits of a register that hold a VLAN.
+inline openflow::SubField vlan_bits(openflow::Field field) {
+  return {.field = field, .first = 0, .bits = kVlanBits};
+}
+
+/// A match with some bits of a field.
+inline Match &with_bits(Match &match, openflow::SubField bits, openflow::Value value) {
+  return match.with(bits.field, value << bits.first, openflow::ones(bits.bits) << bits.first);
+}
+
+/// A frame to more than one receiver.
+inline Match &to_many(Match &match) {
+  auto constexpr kGroupBit = openflow::Value{1} << 40U;
+  return match.with(openflow::Field::eth_dst, kGroupBit, kGroupBit);
+}
+
+/// Adds the tag that a frame has outside, from registers; `vlan` has the VLAN. Takes it away again
+/// after `output`, for those that come after.
+Actions with_tag(openflow::Field vlan, Actions const &output);
+/// Likewise the tag of a frame that has no VLAN but a priority.
+Actions with_priority_tag(Actions const &output);
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,86 @@
+// To a port, to a list of ports, to the uplinks.
+#include <algorithm>
+#include <utility>
+
+#include "planes/openvswitch/compile/stages/stages.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using openflow::Field;
+
+Actions to_list(List list) {
+  return {openflow::set(field::kList, static_cast<openflow::Value>(list)),
+          openflow::set(field::kPiece, 0), go_to(table::kLists)};
+}
+
+class Dispatch {
+ public:
+  Dispatch(Plan const &plan, Program &program) : plan_(plan), program_(program) {
+    auto const &ports = plan.network.ports;
+    bool const any_promiscuous =
+        std::any_of(ports.begin(), ports.end(), [](Port const &port) { return port.promiscuous; });
+    if (any_promiscuous) {
+      promiscuous_ = to_list(List::promiscuous);
+    }
+    if (!plan.network.uplinks.empty()) {
+      to_uplinks_ = {go_to(table::kTeams)};
+    }
+  }
+
+  void compile() {
+    for (auto const &port : plan_.network.ports) {
+      compile_port(port);
+    }
+    Match many;
+    to_ports_and_uplinks(200, to_many(many), to_list(List::all));
+    to_ports_and_uplinks(150, Match().with(field::kDestination, kBeyond), promiscuous_);
+    to_ports_and_uplinks(150, Match().with(field::kDestination, 0), to_list(List::unknown));
+    // To a port of another way.
+    add(50, Match().with(field::kOrigin, kFromUplink), promiscuous_);
+    add(10, Match(), deliver());
+  }
+
+ private:
+  void compile_port(Port const &port) {
+    if (port.transmits_by_uplink && sends_frames(port)) {
+      add(300, Match().with(Field::in_port, port.port), to_uplinks_);
+    }
+    auto const to_it = Match().with(field::kDestination, port.port);
+    if (port.promiscuous) {
+      // It is on the list, and gets one copy.
+      add(180, to_it, promiscuous_);
+    } else if (auto const *way = plan_.ways.of(port)) {
+      add(100, Match(to_it).with(field::kOrigin, kFromUplink).with(field::kWay, way->number),
+          deliver());
+    }
+  }
+  // The uplinks have their own frames already.
+  void to_ports_and_uplinks(std::uint16_t priority, Match const &match, Actions const &ports) {
+    auto from_clients = ports;
+    add(priority, Match(match).with(field::kOrigin, kFromClient),
+        append(from_clients, to_uplinks_));
+    add(priority, Match(match).with(field::kOrigin, kFromUplink), ports);
+  }
+  [[nodiscard]] Actions deliver() const {
+    Actions actions{go_to(table::kDelivery)};
+    return append(actions, promiscuous_);
+  }
+  void add(std::uint16_t priority, Match match, Actions actions) {
+    program_.add(table::kDispatch,
+                 {.priority = priority, .match = std::move(match), .actions = std::move(actions)});
+  }
+
+  Plan const &plan_;
+  Program &program_;
+  Actions promiscuous_;
+  Actions to_uplinks_;
+};
+
+}  // namespace
+
+void compile_dispatch(Plan const &plan, Program &program) {
+  Dispatch(plan, program).compile();
+}
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,188 @@
+// Where addresses are: the switch learns them by itself, up to the limits of ports and of the
+// uplinks. The limit of the switch is that of the table.
+#include <algorithm>
+#include <utility>
+
+#include "planes/openvswitch/compile/stages/stages.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using openflow::Field;
+
+Match from(Port const &port) {
+  return Match().with(Field::in_port, port.port);
+}
+
+// The frame's source, in its VLAN, as a destination.
+openflow::LearnedMatch in_domain() {
+  return {.field = vlan_bits(field::kDomain), .content = vlan_bits(field::kDomain)};
+}
+
+openflow::Action learn(Plan const &plan, std::uint32_t number, openflow::Port place,
+                       std::uint32_t limit) {
+  return openflow::Learn{
+      .table = table::kLearnedAddresses,
+      .priority = 100,
+      .cookie = cookie(Counted::learned, number),
+      .hard_timeout = plan.hard_timeout(),
+      .deletes_learned = true,
+      .limit = limit,
+      .result = field::kVerdict,
+      .specs = {in_domain(),
+                openflow::LearnedMatch{.field = openflow::whole(Field::eth_dst),
+                                       .content = openflow::whole(Field::eth_src)},
+                openflow::LearnedLoad{.destination = openflow::part(field::kDestination, 0, 15),
+                                      .content = openflow::Value{place}}}};
+}
+
+void remember_recent(Plan const &plan, Port const &port, Actions &actions) {
+  if (!plan.frames_may_return()) {
+    return;
+  }
+  auto const recent = port.transmits_by_uplink ? Recent::is_on_way : Recent::drops;
+  actions.emplace_back(openflow::Learn{
+      .table = table::kRecentSources,
+      .priority = 100,
+      .cookie = cookie(Counted::recent_source, port.number),
+      .hard_timeout = 1,
+      .deletes_learned = true,
+      .specs = {in_domain(),
+                openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
+                                       .content = openflow::whole(Field::eth_src)},
+                openflow::LearnedLoad{.destination = field::kRecent,
+                                      .content = static_cast<openflow::Value>(recent)}}});
+}
+
+Match own_source(OwnAddress const &own, Match match) {
+  match.with(Field::eth_src, openflow::to_value(own.address));
+  return own.domain ? match.with(field::kDomain, *own.domain) : match;
+}
+
+void add(Program &program, std::uint16_t priority, Match const &match, Actions actions,
+         std::uint32_t number) {
+  program.add(table::kLearning, {.priority = priority,
+                                 .match = match,
+                                 .actions = std::move(actions),
+                                 .cookie = cookie(Counted::port, number)});
+}
+
+// An address that stays where it is teaches nothing.
+void pass_over_fixed(Plan const &plan, Program &program) {
+  for (auto const &own : plan.own_addresses()) {
+    add(program, 200, own_source(own, Match()), {go_to(table::kLookup)}, own.port->number);
+  }
+  for (auto const &fixed : plan.network.fixed_addresses) {
+    auto const match = Match()
+                           .with(Field::eth_src, openflow::to_value(fixed.address))
+                           .with(field::kDomain, plan.kind_of(fixed.vlan).domain);
+    add(program, 210, match, {go_to(table::kLookup)}, 0);
+  }
+}
+
+// One that moves when it is seen elsewhere moves back when it is seen here.
+void learn_own_again(Plan const &plan, Program &program) {
+  for (auto const &own : plan.own_addresses()) {
+    add(program, 200, own_source(own, from(*own.port)),
+        {learn(plan, own.port->number, own.port->port, 0), go_to(table::kLookup)},
+        own.port->number);
+  }
+}
+
+// A table that is full, unlike a limit of a port, does not tell: so those of the switch are counted
+// once more, where all have one cookie.
+openflow::Action count_for_switch(Plan const &plan) {
+  return openflow::Learn{
+      .table = table::kCountedSources,
+      .priority = 100,
+      .cookie = cookie(Counted::counted_source),
+      .hard_timeout = plan.hard_timeout(),
+      .deletes_learned = true,
+      .limit = plan.network.addresses.limit,
+      .result = field::kVerdict,
+      .specs = {in_domain(), openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
+                                                    .content = openflow::whole(Field::eth_src)}}};
+}
+
+void judge(Program &program, std::uint8_t where, Port const &port) {
+  auto match = from(port);
+  bool const allows = port.learning->when_full == WhenFull::allow;
+  program.add(where, {.priority = 100,
+                      .match = with_bits(match, field::kVerdict, 0),
+                      .actions = allows ? Actions{go_to(table::kLookup)} : Actions{},
+                      .cookie = cookie(allows ? Counted::limit_allowed : Counted::limit_dropped,
+                                       port.number)});
+}
+
+void learn_at(Plan const &plan, Program &program, Port const &port) {
+  bool const may_have_some = port.learning->limit != 0 && plan.network.addresses.limit != 0;
+  Actions actions{openflow::load(field::kVerdict, may_have_some ? 1 : 0)};
+  if (may_have_some) {
+    actions.push_back(learn(plan, port.number, port.port, port.learning->limit));
+  }
+  remember_recent(plan, port, actions);
+  actions.push_back(go_to(table::kLimits));
+  add(program, 100, from(port), std::move(actions), port.number);
+  judge(program, table::kLimits, port);
+  judge(program, table::kSwitchLimit, port);
+}
+
+bool ports_learn(Plan const &plan) {
+  auto const &ports = plan.network.ports;
+  return std::any_of(ports.begin(), ports.end(),
+                     [](Port const &port) { return port.learning.has_value(); });
+}
+
+void learn_beyond(Plan const &plan, Program &program) {
+  Match on_way;
+  add(program, 300,
+      with_bits(on_way, field::kRecent, static_cast<openflow::Value>(Recent::is_on_way)),
+      {go_to(table::kLookup)}, 0);
+  auto const &addresses = plan.network.addresses;
+  if (addresses.uplink_limit != 0 && addresses.limit != 0) {
+    add(program, 100, Match().with(field::kOrigin, kFromUplink),
+        {openflow::load(field::kVerdict, 1), learn(plan, 0, kBeyond, addresses.uplink_limit),
+         go_to(ports_learn(plan) ? table::kLimits : table::kLookup)},
+        0);
+  }
+}
+
+void learn_at_ports(Plan const &plan, Program &program) {
+  for (auto const &port : plan.network.ports) {
+    if (!sends_frames(port)) {
+      continue;
+    }
+    if (port.learning) {
+      learn_at(plan, program, port);
+    } else if (!port.address && plan.frames_may_return()) {
+      Actions actions;
+      remember_recent(plan, port, actions);
+      actions.push_back(go_to(table::kLookup));
+      add(program, 100, from(port), std::move(actions), port.number);
+    }
+  }
+}
+
+}  // namespace
+
+void compile_learning(Plan const &plan, Program &program) {
+  auto const &addresses = plan.network.addresses;
+  if (addresses.aging != 0) {
+    if (addresses.fixed_ones_move) {
+      learn_own_again(plan, program);
+    } else {
+      pass_over_fixed(plan, program);
+    }
+    learn_at_ports(plan, program);
+    if (!plan.network.uplinks.empty()) {
+      learn_beyond(plan, program);
+    }
+  }
+  program.add(table::kLearning, {.actions = {go_to(table::kLookup)}});
+  if (ports_learn(plan) && addresses.aging != 0 && addresses.limit != 0) {
+    program.add(table::kLimits, {.actions = {count_for_switch(plan), go_to(table::kSwitchLimit)}});
+    program.add(table::kSwitchLimit, {.actions = {go_to(table::kLookup)}});
+  }
+}
+
+}  // namespace simhost::openvswitch

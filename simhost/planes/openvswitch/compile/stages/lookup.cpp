@@ -1,0 +1,68 @@
+// Where a frame's destination is.
+#include <utility>
+
+#include "planes/openvswitch/compile/stages/stages.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using openflow::Field;
+
+// The later table of two that know an address has the last word.
+Actions look_up(Plan const &plan, std::uint8_t next) {
+  Actions actions{go_to(table::kFirstAddresses)};
+  if (plan.network.addresses.fixed_ones_move) {
+    append(actions, {go_to(table::kFixedAddresses), go_to(table::kLearnedAddresses)});
+  } else {
+    append(actions, {go_to(table::kLearnedAddresses), go_to(table::kFixedAddresses)});
+  }
+  actions.push_back(go_to(next));
+  return actions;
+}
+
+void put(Program &program, std::uint16_t priority, Match match, openflow::Port place,
+         std::uint32_t number) {
+  program.add(table::kFixedAddresses, {.priority = priority,
+                                       .match = std::move(match),
+                                       .actions = {openflow::set(field::kDestination, place)},
+                                       .cookie = cookie(Counted::port, number)});
+}
+
+Match to(EthernetAddress const &address) {
+  return Match().with(Field::eth_dst, openflow::to_value(address));
+}
+
+void put(Plan const &plan, Program &program, FixedAddress const &fixed) {
+  auto const match = to(fixed.address).with(field::kDomain, plan.kind_of(fixed.vlan).domain);
+  if (!fixed.port) {
+    put(program, 300, match, kBeyond, 0);
+    return;
+  }
+  for (auto const &port : plan.network.ports) {
+    if (port.number == *fixed.port) {
+      put(program, 300, match, port.port, port.number);
+    }
+  }
+}
+
+}  // namespace
+
+void compile_lookup(Plan const &plan, Program &program) {
+  program.add(table::kLookup, {.priority = 100,
+                               .match = Match().with(field::kOrigin, kFromUplink),
+                               .actions = look_up(plan, table::kReceiving)});
+  program.add(table::kLookup, {.actions = look_up(plan, table::kDispatch)});
+  for (auto const &own : plan.own_addresses()) {
+    auto match = to(own.address);
+    if (own.domain) {
+      put(program, 200, match.with(field::kDomain, *own.domain), own.port->port, own.port->number);
+    } else {
+      put(program, 100, match, own.port->port, own.port->number);
+    }
+  }
+  for (auto const &fixed : plan.network.fixed_addresses) {
+    put(plan, program, fixed);
+  }
+}
+
+}  // namespace simhost::openvswitch

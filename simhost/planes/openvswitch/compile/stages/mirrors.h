@@ -1,0 +1,29 @@
+// Copies of frames for mirror sessions, which other stages put where the sources are.
+#pragma once
+
+#include <algorithm>
+#include <cstdint>
+#include <vector>
+
+#include "planes/openvswitch/compile/plan.h"
+#include "planes/openvswitch/compile/program.h"
+
+namespace simhost::openvswitch {
+
+/// What copies a frame to each session that names a source: `direction` is Mirror::received or
+/// Mirror::sent, `kind` where in it the source is.
+template <typename Source>
+Actions copies(Plan const &plan, MirrorSources Mirror::*direction,
+               std::vector<Source> MirrorSources::*kind, Source const &source) {
+  Actions actions;
+  for (auto const &mirror : plan.network.mirrors) {
+    auto const &sources = mirror.*direction.*kind;
+    if (std::find(sources.begin(), sources.end(), source) != sources.end()) {
+      actions.emplace_back(openflow::set(field::kSession, mirror.id));
+      actions.push_back(go_to(table::kMirrors));
+    }
+  }
+  return actions;
+}
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,78 @@
+// From which addresses a client may send. One whose address is not known has the first that it
+// sends from: a flow that is learned in a table of its own, where there is room for one of each
+// port.
+#include "planes/openvswitch/compile/stages/stages.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using openflow::Field;
+
+Match from(Port const &port) {
+  return Match().with(Field::in_port, port.port);
+}
+
+openflow::Action learn_first_address(Plan const &plan, Port const &port) {
+  openflow::Learn learn{
+      .table = table::kFirstAddresses,
+      .priority = 100,
+      .cookie = cookie(Counted::first_address, port.number),
+      .deletes_learned = true,
+      .limit = 1,
+      .result = field::kVerdict,
+      .specs = {openflow::LearnedMatch{.field = openflow::whole(Field::eth_dst),
+                                       .content = openflow::whole(Field::eth_src)},
+                openflow::LearnedLoad{.destination = openflow::part(field::kDestination, 0, 15),
+                                      .content = openflow::Value{port.port}}}};
+  if (!port.vlan.carried) {
+    learn.specs.emplace_back(
+        openflow::LearnedMatch{.field = vlan_bits(field::kDomain),
+                               .content = openflow::Value{plan.kind_of(port.vlan.vlan).domain}});
+  }
+  return learn;
+}
+
+void drop_forged(Program &program, std::uint8_t where, Match const &match, Port const &port) {
+  program.add(where,
+              {.priority = 100, .match = match, .cookie = cookie(Counted::forged, port.number)});
+}
+
+void compile(Plan const &plan, Program &program, Port const &port) {
+  if (port.address_changed) {
+    program.add(table::kSources, {.priority = 300,
+                                  .match = from(port),
+                                  .cookie = cookie(Counted::address_changed, port.number)});
+  } else if (!port.address) {
+    program.add(table::kSources,
+                {.priority = 100,
+                 .match = from(port),
+                 .actions = {openflow::load(field::kVerdict, 1), learn_first_address(plan, port),
+                             go_to(table::kFirstAddress)},
+                 .cookie = cookie(Counted::port, port.number)});
+    if (!port.may_forge) {
+      auto match = from(port);
+      drop_forged(program, table::kFirstAddress, with_bits(match, field::kVerdict, 0), port);
+    }
+  } else if (!port.may_forge) {
+    program.add(table::kSources,
+                {.priority = 200,
+                 .match = from(port).with(Field::eth_src, openflow::to_value(*port.address)),
+                 .actions = {go_to(table::kTags)},
+                 .cookie = cookie(Counted::port, port.number)});
+    drop_forged(program, table::kSources, from(port), port);
+  }
+}
+
+}  // namespace
+
+void compile_sources(Plan const &plan, Program &program) {
+  for (auto const &port : plan.network.ports) {
+    if (sends_frames(port)) {
+      compile(plan, program, port);
+    }
+  }
+  program.add(table::kSources, {.actions = {go_to(table::kTags)}});
+  program.add(table::kFirstAddress, {.actions = {go_to(table::kTags)}});
+}
+
+}  // namespace simhost::openvswitch

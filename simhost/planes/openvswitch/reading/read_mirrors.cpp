@@ -1,0 +1,152 @@
+// From the sessions in the tables of ports and of uplinks to what frames have to know of them.
+#include "planes/openvswitch/reading/read_mirrors.h"
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "base/bytes.h"
+#include "base/outcomes.h"
+#include "model/mirror/properties.h"
+#include "model/mirror/running.h"
+#include "model/properties/properties.h"
+#include "storage/ports.h"
+#include "storage/running/devices.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+// The numbers of a table's sessions begin with 1; the rest of an id is the table's port.
+constexpr unsigned kSessionBits = 11;
+static_assert(mirror::kMostSessions < 1U << kSessionBits);
+
+class Sessions {
+ public:
+  Sessions(storage::Transaction &transaction, storage::SwitchKey key, Network &network)
+      : transaction_(transaction), key_(key), network_(network) {}
+
+  void add_table(std::uint32_t owner, mirror::Table const &table) {
+    std::uint32_t number = 0;
+    for (auto const &session : table.sessions) {
+      ++number;
+      MirrorSession const as_running{.port = {}, .record = session.record, .destinations = {}};
+      if (as_running.runs() && !as_running.is_promiscuous()) {
+        add(owner << kSessionBits | number, session);
+      }
+    }
+  }
+
+ private:
+  void add(std::uint32_t id, mirror::Session const &session) {
+    auto const &record = session.record;
+    name_ = text_in(record.sid);
+    auto const wraps = (record.flags & VS_DVMIRROR_FLAG_DST_ENCAP) != 0;
+    if (wraps || record.type == VS_DVMIRROR_SESSIONTYPE_ERMIRROR_SRC) {
+      refuse_session("wraps what it mirrors, which is not done here");
+    }
+    Mirror mirror;
+    mirror.id = id;
+    mirror.received = sources(session.received_by, record.wildIn);
+    mirror.sent = sources(session.sent_by, record.wildOut);
+    mirror.remote_vlan = record.encapVlan;
+    mirror.most_bytes = snap_length(record.snapLen);
+    mirror.keeps_vlan = (record.flags & VS_DVMIRROR_FLAG_DST_ORIG_VLAN) != 0;
+    for (auto const &entity : session.to) {
+      add_destination(mirror, record.flags, entity);
+    }
+    network_.mirrors.push_back(std::move(mirror));
+  }
+
+  MirrorSources sources(std::vector<DVMirrorEntity> const &entities, std::uint32_t wild) {
+    MirrorSources sources;
+    for (auto const &entity : entities) {
+      if (entity.type == MIRROR_ENTTYPE_IP) {
+        refuse_session("mirrors from an address");
+      }
+      if (entity.type == MIRROR_ENTTYPE_VLAN) {
+        sources.vlans.push_back(entity.vlan);
+      } else if (entity.type == MIRROR_ENTTYPE_UPLINK) {
+        append_if_any(sources.uplinks, uplink_of(entity));
+      } else {
+        append_if_any(sources.ports, port_of(entity));
+      }
+    }
+    if ((wild & VS_DVMIRROR_WILDCARD_PNIC) != 0) {
+      sources.uplinks.clear();
+      for (auto const &uplink : network_.uplinks) {
+        sources.uplinks.push_back(uplink.port);
+      }
+    }
+    return sources;
+  }
+
+  void add_destination(Mirror &mirror, std::uint32_t flags, DVMirrorEntity const &entity) {
+    if (entity.type == MIRROR_ENTTYPE_IP || entity.type == MIRROR_ENTTYPE_VLAN) {
+      refuse_session("mirrors to what is no port and no uplink");
+    }
+    if (entity.type == MIRROR_ENTTYPE_UPLINK) {
+      append_if_any(mirror.to_uplinks, uplink_of(entity));
+      return;
+    }
+    auto const port = port_of(entity);
+    append_if_any(mirror.to_ports, port);
+    for (auto &known : network_.ports) {
+      if (known.port == port) {
+        known.mirrors_only = known.mirrors_only || (flags & VS_DVMIRROR_FLAG_DST_NO_OUTPUT) != 0;
+        known.sends_nothing = known.sends_nothing || (flags & VS_DVMIRROR_FLAG_DST_NO_INPUT) != 0;
+      }
+    }
+  }
+
+  // Without a device there is nothing to mirror.
+  std::optional<openflow::Port> port_of(DVMirrorEntity const &entity) {
+    auto const port =
+        entity.type == MIRROR_ENTTYPE_DVPORT
+            ? storage::find_port(transaction_, key_, text_in(entity.dvPortId))
+            : storage::find_port(transaction_, key_, storage::PortNumber{entity.portId});
+    auto const device = port ? storage::device_of(transaction_, port->number) : std::nullopt;
+    return device ? std::optional(openflow::Port{device->number}) : std::nullopt;
+  }
+  std::optional<openflow::Port> uplink_of(DVMirrorEntity const &entity) {
+    auto const name = text_in(entity.uplink.string);
+    auto const uplink = storage::find_uplink(transaction_, name);
+    bool const is_here = uplink && uplink->port &&
+                         storage::get_port_row(transaction_, *uplink->port).switch_key == key_;
+    auto const device = is_here ? storage::device_of(transaction_, name) : std::nullopt;
+    return device ? std::optional(openflow::Port{device->number}) : std::nullopt;
+  }
+
+  static void append_if_any(std::vector<openflow::Port> &ports,
+                            std::optional<openflow::Port> port) {
+    if (port) {
+      ports.push_back(*port);
+    }
+  }
+  // What no frame reaches is all of each.
+  static std::uint16_t snap_length(std::uint32_t bytes) {
+    return bytes < UINT16_MAX ? static_cast<std::uint16_t>(bytes) : 0;
+  }
+  [[noreturn]] void refuse_session(std::string const &why) const {
+    throw Refused(QEX_NOT_SUPPORTED, "the mirror session '" + name_ + "' " + why);
+  }
+
+  storage::Transaction &transaction_;
+  storage::SwitchKey key_;
+  Network &network_;
+  std::string name_;
+};
+
+}  // namespace
+
+void read_mirrors(storage::Transaction &transaction, storage::SwitchKey key, Network &network) {
+  Sessions sessions(transaction, key, network);
+  sessions.add_table(
+      0, effective(transaction, mirror::uplink_sessions, storage::PropertyOwner::global(key)));
+  for (auto const &[port, table] : list_stored_at_ports(transaction, mirror::sessions, key)) {
+    sessions.add_table(static_cast<std::uint32_t>(port), mirror::Table::from(table));
+  }
+}
+
+}  // namespace simhost::openvswitch

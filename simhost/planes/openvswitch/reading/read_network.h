@@ -1,0 +1,26 @@
+// What a switch of the state is to its frames.
+#pragma once
+
+#include <cstdint>
+#include <map>
+
+#include "model/teaming/team.h"
+#include "planes/openvswitch/compile/network.h"
+#include "storage/ports.h"
+
+namespace simhost::openvswitch {
+
+/// What frames and counters told of the ports of a switch, which the state does not know.
+struct Observed {
+  /// The addresses that clients have now, where they can be seen.
+  std::map<storage::PortNumber, EthernetAddress> addresses = {};
+  /// Which of its team's uplinks a port is given, where that is not by its number.
+  std::map<storage::PortNumber, std::uint32_t> shares = {};
+};
+
+/// The uplinks and ports that have a device, by the numbers of their devices. `team` has the links
+/// as they are. Refuses mirror sessions of kinds that are not mirrored here (QEX_NOT_SUPPORTED).
+Network read_network(storage::Transaction &transaction, storage::SwitchKey key,
+                     teaming::Team const &team, Observed const &observed);
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,58 @@
+"""Switches on a bridge, one after the other, and frames at them."""
+
+import re
+from pathlib import Path
+from typing import Any, Counter as Counts, Dict, List, Mapping, Optional, Sequence
+
+from compiler import Compiler
+from frames import Copy, Frame, copies
+from open_vswitch import OpenVSwitch
+from rules import Rules
+
+
+class Bench:
+    """A bridge with so many devices, each of which is what a switch has that number for."""
+
+    def __init__(
+        self,
+        open_vswitch: OpenVSwitch,
+        compiler: Compiler,
+        bridge: str,
+        devices: int,
+        sent_to: Optional[Path] = None,
+    ) -> None:
+        self.ask = open_vswitch.ask
+        self.devices: Dict[str, int] = {}
+        self.more_flows: List[str] = []
+        self._open_vswitch = open_vswitch
+        self._compiler = compiler
+        self._bridge = bridge
+        numbers = range(1, devices + 1)
+        names = {f"{bridge}{number}": number for number in numbers}
+        open_vswitch.add_bridge(bridge, names, sent_to)
+
+    def load(self, switch: Mapping[str, Any], clients: Sequence[Mapping[str, Any]]) -> Rules:
+        """Makes the bridge that switch; its rules."""
+        made = self._compiler.compile(switch, clients)
+        self._open_vswitch.load(self._bridge, [*made["flows"], *self.more_flows], made["groups"])
+        self.devices = made["devices"]
+        macs = {client["port"]: client["mac"] for client in clients if "mac" in client}
+        return Rules(switch, made["numbers"], macs)
+
+    def send(self, at: str, frame: Frame) -> "Counts[Copy]":
+        """What comes out where of a frame that comes in there, which the switch remembers."""
+        return self._trace(frame, f"in_port={self.devices[at]}", frame.to_bytes().hex())
+
+    def look(self, at: str, frame: Frame) -> "Counts[Copy]":
+        """Likewise of one that it forgets."""
+        device = f"{self._bridge}{self.devices[at]}"
+        return self._trace(frame, frame.to_key(device))
+
+    def _trace(self, frame: Frame, *words: str) -> "Counts[Copy]":
+        # A frame by its key belongs to no bridge, but to a data path.
+        where = [] if words[0].startswith("in_port(") else [self._bridge]
+        traced = self.ask("ofproto/trace", "--names", *where, *words)
+        found = re.search(r"^Datapath actions: (.*)$", traced, re.MULTILINE)
+        assert found, traced
+        names = {f"{self._bridge}{number}": name for name, number in self.devices.items()}
+        return copies(found.group(1), frame, names)

@@ -1,0 +1,145 @@
+// Compiles switches for tests: a line of standard input says a host, as a scenario document, and
+// what of it has a device; a line of standard output is what Open vSwitch would be told of its
+// switch "s".
+#include <array>
+#include <cstdio>
+#include <iostream>
+#include <nlohmann/json.hpp>
+#include <optional>
+#include <string>
+
+#include "base/outcomes.h"
+#include "model/lookup.h"
+#include "model/plane.h"
+#include "model/teaming/team.h"
+#include "planes/openvswitch/compile/compile.h"
+#include "planes/openvswitch/openflow/text.h"
+#include "planes/openvswitch/reading/read_network.h"
+#include "planes/stored/links.h"
+#include "planes/stored/stored_plane.h"
+#include "scenario/scenario.h"
+#include "storage/running/devices.h"
+#include "storage/store.h"
+
+namespace {
+
+using Json = nlohmann::json;
+using simhost::storage::ChangingTransaction;
+
+simhost::storage::MacBytes to_mac(std::string const &text) {
+  std::array<unsigned, 6> bytes{};
+  if (std::sscanf(text.c_str(), "%x:%x:%x:%x:%x:%x", bytes.data(), &bytes[1], &bytes[2], &bytes[3],
+                  &bytes[4], &bytes[5]) != 6) {
+    throw std::invalid_argument(text);
+  }
+  simhost::storage::MacBytes mac{};
+  for (std::size_t at = 0; at < mac.size(); ++at) {
+    mac[at] = static_cast<std::byte>(bytes[at]);
+  }
+  return mac;
+}
+
+simhost::openvswitch::Observed connect(ChangingTransaction &transaction,
+                                       simhost::storage::SwitchKey key, Json const &said) {
+  simhost::openvswitch::Observed observed;
+  for (auto const &uplink : said.value("uplinks", Json::array())) {
+    simhost::storage::put_device(transaction, uplink.get<std::string>(),
+                                 "to-" + uplink.get<std::string>());
+  }
+  for (auto const &client : said.value("clients", Json::array())) {
+    auto const name = client.at("port").get<std::string>();
+    auto const port = simhost::get_port(transaction, key, name);
+    std::optional<simhost::storage::MacBytes> mac;
+    if (client.contains("mac")) {
+      mac = to_mac(client.at("mac"));
+    }
+    simhost::storage::put_device(transaction, port.number, "to-" + name, mac);
+    if (client.contains("seen")) {
+      auto const seen = to_mac(client.at("seen"));
+      auto &address = observed.addresses[port.number];
+      for (std::size_t at = 0; at < seen.size(); ++at) {
+        address[at] = std::to_integer<std::uint8_t>(seen[at]);
+      }
+    }
+    if (client.contains("share")) {
+      observed.shares[port.number] = client.at("share");
+    }
+  }
+  return observed;
+}
+
+Json numbers_of_ports(ChangingTransaction &transaction, simhost::storage::SwitchKey key) {
+  auto numbers = Json::object();
+  for (auto const &port : simhost::storage::ports_of(transaction, key)) {
+    numbers[port.identifier] = static_cast<std::uint32_t>(port.number);
+  }
+  return numbers;
+}
+
+Json numbers_of_devices(ChangingTransaction &transaction, simhost::storage::SwitchKey key) {
+  auto numbers = Json::object();
+  for (auto const &[name, port] : simhost::storage::uplinks_of(transaction, key)) {
+    if (auto const device = simhost::storage::device_of(transaction, name)) {
+      numbers[name] = device->number;
+    }
+  }
+  for (auto const &[number, device] : simhost::storage::port_devices(transaction, key)) {
+    numbers[simhost::get_port(transaction, number).identifier] = device.number;
+  }
+  return numbers;
+}
+
+Json compiled(Json const &said) {
+  simhost::storage::Store store(std::nullopt, [](ChangingTransaction &) {});
+  ChangingTransaction transaction(store);
+  simhost::scenario::apply(transaction, said.at("host").dump());
+  auto const key = simhost::get_switch(transaction, "s").key;
+  auto const observed = connect(transaction, key, said);
+  auto const team = simhost::teaming::team_of(transaction, key, simhost::stored::link_of);
+  auto const network = simhost::openvswitch::read_network(transaction, key, team, observed);
+  auto const made = simhost::openvswitch::compile(network);
+
+  Json answer{{"devices", numbers_of_devices(transaction, key)},
+              {"numbers", numbers_of_ports(transaction, key)},
+              {"most_learned", made.rows.most_learned},
+              {"most_tags", made.rows.most_tags},
+              {"ages_elsewhere", made.ages_elsewhere},
+              {"flows", Json::array()},
+              {"groups", Json::array()}};
+  for (auto const &flow : made.flows) {
+    answer["flows"].push_back(simhost::openflow::to_text(flow));
+  }
+  for (auto const &group : made.groups) {
+    answer["groups"].push_back(simhost::openflow::to_text(group));
+  }
+  return answer;
+}
+
+std::string name_of(QEX_ReturnStatus status) {
+  switch (status) {
+    case QEX_NOT_SUPPORTED:
+      return "QEX_NOT_SUPPORTED";
+    case QEX_BAD_PARAM:
+      return "QEX_BAD_PARAM";
+    default:
+      return std::to_string(status);
+  }
+}
+
+}  // namespace
+
+int main() {
+  simhost::run_on(simhost::stored::plane());
+  std::string line;
+  while (std::getline(std::cin, line)) {
+    Json answer;
+    try {
+      answer = compiled(Json::parse(line));
+    } catch (simhost::Refused const &refused) {
+      answer = {{"refused", refused.what()}, {"status", name_of(refused.status())}};
+    } catch (std::exception const &error) {
+      answer = {{"error", error.what()}};
+    }
+    std::cout << answer.dump() << std::endl;
+  }
+}

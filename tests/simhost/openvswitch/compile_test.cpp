@@ -1,0 +1,211 @@
+// What the compiler refuses, what stays when something else changes, and large switches.
+#include "planes/openvswitch/compile/compile.h"
+
+#include <gmock/gmock.h>
+
+#include <algorithm>
+#include <string>
+#include <utility>
+
+#include "base/outcomes.h"
+#include "planes/openvswitch/compile/pipeline.h"
+#include "planes/openvswitch/compile/vlan_masks.h"
+#include "planes/openvswitch/compile/ways.h"
+#include "planes/openvswitch/openflow/text.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+Port access_port(openflow::Port number, std::uint16_t vlan) {
+  Port port;
+  port.port = number;
+  port.number = number;
+  port.address = EthernetAddress{
+      2, 0, 0, 0, static_cast<std::uint8_t>(number >> 8U), static_cast<std::uint8_t>(number)};
+  port.vlan.vlan = vlan;
+  port.share = number;
+  return port;
+}
+
+Network with_ports(openflow::Port count) {
+  Network network;
+  for (openflow::Port number = 1; number <= count; ++number) {
+    network.ports.push_back(access_port(number, 7));
+  }
+  return network;
+}
+
+Network with_uplinks() {
+  auto network = with_ports(2);
+  network.uplinks = {{.port = 11, .number = 11}, {.port = 12, .number = 12}};
+  network.teams.push_back({.balance = Balance::share, .in_use = {{11}, {12}}, .standby = {}});
+  for (auto &port : network.ports) {
+    port.team = 0;
+  }
+  return network;
+}
+
+// The status and the words of a refusal.
+std::pair<QEX_ReturnStatus, std::string> refusal(Network const &network) {
+  try {
+    compile(network);
+  } catch (Refused const &refused) {
+    return {refused.status(), refused.what()};
+  }
+  return {QEX_OK, ""};
+}
+
+TEST(Compiling, RefusesPortsThatOpenVSwitchHasNot) {
+  auto network = with_ports(2);
+  network.ports[1].port = kGreatestPort + 1;
+  EXPECT_EQ(refusal(network),
+            std::pair(QEX_LIMIT_EXCEEDED, std::string("port 2: Open vSwitch has no port 65280")));
+  network.ports[1].port = 0;
+  EXPECT_EQ(refusal(network),
+            std::pair(QEX_LIMIT_EXCEEDED, std::string("port 2: Open vSwitch has no port 0")));
+  network.ports[1].port = kGreatestPort;
+  EXPECT_EQ(refusal(network).first, QEX_OK);
+}
+
+TEST(Compiling, RefusesOnePortForTwo) {
+  auto network = with_ports(2);
+  network.ports[1].port = 1;
+  EXPECT_EQ(refusal(network),
+            std::pair(QEX_BAD_PARAM, std::string("port 2: another one is port 1 of Open vSwitch")));
+}
+
+TEST(Compiling, RefusesTeamsOfOtherSwitches) {
+  auto network = with_uplinks();
+  network.teams[0].standby = {{13}};
+  EXPECT_EQ(refusal(network),
+            std::pair(QEX_BAD_PARAM, std::string("a team uses an uplink that the switch has not")));
+  network = with_uplinks();
+  network.ports[1].team = 1;
+  EXPECT_EQ(refusal(network),
+            std::pair(QEX_BAD_PARAM, std::string("port 2 uses a team that the switch has not")));
+}
+
+TEST(Compiling, RefusesSessionsThatCannotBeToldApart) {
+  auto network = with_ports(1);
+  network.mirrors.resize(2);
+  network.mirrors[0].id = network.mirrors[1].id = 5;
+  EXPECT_EQ(
+      refusal(network),
+      std::pair(QEX_BAD_PARAM, std::string("mirror session 5: its number is 0 or another one's")));
+}
+
+TEST(Compiling, HasNoPlaceAndNoGroupTwice) {
+  auto network = with_uplinks();
+  // The address of one port is another's, too.
+  network.ports[1].address = network.ports[0].address;
+  auto const made = compile(network);
+  auto const same_place = [](auto const &one, auto const &other) {
+    return place(one) == place(other);
+  };
+  EXPECT_EQ(std::adjacent_find(made.flows.begin(), made.flows.end(), same_place), made.flows.end());
+  auto const same_number = [](auto const &one, auto const &other) { return one.id == other.id; };
+  EXPECT_EQ(std::adjacent_find(made.groups.begin(), made.groups.end(), same_number),
+            made.groups.end());
+}
+
+// The flows that one of two networks has.
+std::vector<openflow::Flow> only_in(Network const &one, Network const &other) {
+  auto const ours = compile(one).flows;
+  auto const theirs = compile(other).flows;
+  std::vector<openflow::Flow> found;
+  std::set_difference(ours.begin(), ours.end(), theirs.begin(), theirs.end(),
+                      std::back_inserter(found));
+  return found;
+}
+
+TEST(Compiling, ChangesNoFlowOfAnotherPort) {
+  auto const before = with_uplinks();
+  auto after = before;
+  after.ports[0].vlan.priority = 5;
+  for (auto const &flow : only_in(after, before)) {
+    EXPECT_EQ(flow.cookie, cookie(Counted::port, 1)) << to_text(flow);
+  }
+  after.disabled = true;
+  EXPECT_EQ(only_in(after, before).size(), only_in(before, after).size() + 1);
+}
+
+TEST(Compiling, ChangesGroupsOnlyWhenAnotherUplinkComesFirst) {
+  auto const before = with_uplinks();
+  auto after = before;
+  std::swap(after.teams[0].in_use[0], after.teams[0].in_use[1]);
+  EXPECT_THAT(only_in(after, before), IsEmpty());
+  EXPECT_NE(compile(after).groups, compile(before).groups);
+}
+
+TEST(Compiling, SaysWhatTheSwitchDoesNotAge) {
+  auto network = with_ports(1);
+  network.addresses.aging = 65535;
+  EXPECT_FALSE(compile(network).ages_elsewhere);
+  network.addresses.aging = 65536;
+  EXPECT_TRUE(compile(network).ages_elsewhere);
+  network.addresses.limit = 12;
+  EXPECT_EQ(compile(network).rows, (Rows{.most_tags = 2, .most_learned = 12}));
+}
+
+TEST(Compiling, CutsLongListsIntoPieces) {
+  std::vector<std::size_t> outputs;
+  for (auto const &flow : compile(with_ports(3001)).flows) {
+    auto const count =
+        std::count_if(flow.actions.begin(), flow.actions.end(), [](openflow::Action const &action) {
+          return std::holds_alternative<openflow::Output>(action);
+        });
+    if (flow.table == table::kLists && count != 0) {
+      outputs.push_back(static_cast<std::size_t>(count));
+    }
+  }
+  std::sort(outputs.begin(), outputs.end());
+  EXPECT_THAT(outputs, ElementsAre(1, 1000, 1000, 1000));
+}
+
+TEST(GenerationMarker, IsAFlowThatNoFrameReaches) {
+  EXPECT_EQ(to_text(generation_marker(7)), "cookie=0x7, table=250, priority=0 actions=drop");
+}
+
+TEST(VlanMasks, AreAsFewAsTheyCanBe) {
+  auto const set = [](std::initializer_list<std::pair<unsigned, unsigned>> ranges) {
+    Vlans vlans;
+    for (auto const &[first, last] : ranges) {
+      for (auto vlan = first; vlan <= last; ++vlan) {
+        vlans.set(vlan);
+      }
+    }
+    return masks_of(vlans);
+  };
+  EXPECT_THAT(set({}), IsEmpty());
+  EXPECT_THAT(set({{0, 0}}), IsEmpty());
+  EXPECT_THAT(set({{1, 4094}}), ElementsAre(VlanMask{0, 0}));
+  EXPECT_THAT(set({{1, 1}}), ElementsAre(VlanMask{0, 0xffe}));
+  EXPECT_THAT(set({{4, 7}}), ElementsAre(VlanMask{4, 0xffc}));
+  EXPECT_THAT(set({{3, 5}, {4094, 4094}}),
+              ElementsAre(VlanMask{3, 0xfff}, VlanMask{4, 0xffe}, VlanMask{0xffe, 0xffe}));
+}
+
+TEST(TheWays, AreOneWhereUplinksAndOrderAre) {
+  auto network = with_uplinks();
+  network.ports.push_back(access_port(3, 7));
+  network.ports[2].team = 0;
+  Ways const ways(network);
+  EXPECT_EQ(ways.of(network.ports[0]), ways.of(network.ports[2]));
+  EXPECT_NE(ways.of(network.ports[0]), ways.of(network.ports[1]));
+  network.ports[2].team = std::nullopt;
+  EXPECT_EQ(Ways(network).of(network.ports[2]), nullptr);
+}
+
+TEST(TheWays, SpreadPortsOverTheUplinksOfAGroup) {
+  auto network = with_uplinks();
+  network.teams[0] = {.balance = Balance::first, .in_use = {{11, 12}}, .standby = {}};
+  Ways const ways(network);
+  EXPECT_THAT(ways.of(network.ports[0])->slots, ElementsAre(Slot{12, 11}));
+  EXPECT_THAT(ways.of(network.ports[1])->slots, ElementsAre(Slot{11, 12}));
+}
+
+}  // namespace
+}  // namespace simhost::openvswitch

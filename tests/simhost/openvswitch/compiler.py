@@ -1,0 +1,49 @@
+"""What Open vSwitch would be told of switches, as text."""
+
+import json
+import os
+import subprocess
+from pathlib import Path
+from typing import Any, Dict, List, Mapping, Optional, Sequence
+
+COMPILER = Path(os.environ["BUILD_DIR"], "tests", "simhost", "compile_switches")
+
+
+class Compiler:
+    """The program that compiles a switch that a document says."""
+
+    def __init__(self) -> None:
+        self._process = subprocess.Popen(
+            [str(COMPILER)], stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True
+        )
+
+    def close(self) -> None:
+        self._process.communicate()
+
+    def answer(
+        self,
+        switch: Mapping[str, Any],
+        clients: Sequence[Mapping[str, Any]],
+        host: Optional[Mapping[str, Any]] = None,
+    ) -> Dict[str, Any]:
+        """What it says of a switch whose ports of those names have devices, and all uplinks."""
+        uplinks: List[str] = list(switch.get("uplinks", []))
+        document = {
+            "uplinks": [{"name": uplink} for uplink in uplinks],
+            "switches": [{"alias": "s", **switch}],
+            **(host or {}),
+        }
+        question = {"host": document, "uplinks": uplinks, "clients": list(clients)}
+        assert self._process.stdin and self._process.stdout
+        self._process.stdin.write(json.dumps(question) + "\n")
+        self._process.stdin.flush()
+        answer: Dict[str, Any] = json.loads(self._process.stdout.readline())
+        return answer
+
+    def compile(
+        self, switch: Mapping[str, Any], clients: Sequence[Mapping[str, Any]]
+    ) -> Dict[str, Any]:
+        """Likewise of one that it compiles."""
+        answer = self.answer(switch, clients)
+        assert "flows" in answer, answer
+        return answer

@@ -1,0 +1,143 @@
+"""An Open vSwitch of the tests' own: its two processes in a folder, with a data path whose devices
+are made up, and gone with this process whatever becomes of it."""
+
+import json
+import os
+import socket
+import subprocess
+import time
+from pathlib import Path
+from typing import Any, List, Mapping, Optional, Sequence
+
+SCHEMA = "/usr/share/openvswitch/vswitch.ovsschema"
+PATIENCE = 30.0
+# The tables that a switch fills by itself.
+LEARNED = (31, 32, 33, 34)
+
+
+class OpenVSwitch:
+    """The processes, and the bridges in them."""
+
+    def __init__(self, folder: Path) -> None:
+        self._folder = folder
+        self._environment = dict(os.environ)
+        for name in ("RUN", "LOG", "DB", "SYSCONF"):
+            self._environment[f"OVS_{name}DIR"] = str(folder)
+        self._processes: List["subprocess.Popen[bytes]"] = []
+        self._database = f"unix:{folder}/db.sock"
+        database = str(folder / "conf.db")
+        subprocess.run(["ovsdb-tool", "create", database, SCHEMA], check=True)
+        self._start("ovsdb-server", database, f"--remote=punix:{folder}/db.sock")
+        self._wait_for(folder / "db.sock")
+        self._vsctl("--no-wait", "init")
+        self._control = folder / "switch.ctl"
+        self._start(
+            "ovs-vswitchd",
+            self._database,
+            "--enable-dummy",
+            "--disable-system",
+            f"--unixctl={self._control}",
+        )
+        self._wait_for(self._control)
+        self._vsctl("set", "Open_vSwitch", ".", "other_config:vlan-limit=2")
+
+    def close(self) -> None:
+        """Ends both processes."""
+        for process in reversed(self._processes):
+            process.kill()
+            process.wait()
+
+    def _start(self, *command: str) -> None:
+        # The kernel ends them should nobody else do.
+        words = ["setpriv", "--pdeathsig", "KILL", *command, "--no-chdir"]
+        with open(self._folder / f"{command[0]}.log", "wb") as log:
+            self._processes.append(
+                subprocess.Popen(words, env=self._environment, stdout=log, stderr=log)
+            )
+
+    def _wait_for(self, path: Path) -> None:
+        deadline = time.monotonic() + PATIENCE
+        while not path.exists():
+            assert time.monotonic() < deadline, f"{path} does not come"
+            time.sleep(0.002)
+
+    def _run(self, *command: str, given: str = "") -> str:
+        done = subprocess.run(
+            command,
+            env=self._environment,
+            input=given,
+            stdout=subprocess.PIPE,
+            stderr=subprocess.PIPE,
+            text=True,
+            check=False,
+        )
+        assert done.returncode == 0, f"{' '.join(command)}: {done.stderr}"
+        return done.stdout
+
+    def _vsctl(self, *words: str) -> str:
+        return self._run("ovs-vsctl", f"--db={self._database}", *words)
+
+    def _ofctl(self, *words: str, given: str = "") -> str:
+        return self._run("ovs-ofctl", "-OOpenFlow15", *words, given=given)
+
+    def ask(self, method: str, *parameters: str) -> str:
+        """What the switch says to a command of ovs-appctl."""
+        with socket.socket(socket.AF_UNIX) as connection:
+            connection.connect(str(self._control))
+            question = {"id": 0, "method": method, "params": list(parameters)}
+            connection.sendall(json.dumps(question).encode())
+            connection.settimeout(PATIENCE)
+            text = ""
+            while True:
+                text += connection.recv(1 << 20).decode()
+                try:
+                    answer: Mapping[str, Any] = json.loads(text)
+                except ValueError:
+                    continue
+                assert answer["error"] is None, answer["error"]
+                return str(answer["result"])
+
+    @staticmethod
+    def _settings(bridge: str) -> List[str]:
+        row = ["datapath_type=dummy", "fail_mode=secure", "protocols=OpenFlow15"]
+        return ["--", "set", "Bridge", bridge, *row]
+
+    def add_bridge(
+        self, bridge: str, devices: Mapping[str, int], sent_to: Optional[Path] = None
+    ) -> None:
+        """A bridge with devices of those names, by their OpenFlow ports; each keeps what it sends
+        in a file of its name, as pcap."""
+        words = ["add-br", bridge, *self._settings(bridge)]
+        for name, number in devices.items():
+            words += ["--", "add-port", bridge, name]
+            words += ["--", "set", "Interface", name, "type=dummy", f"ofport_request={number}"]
+            words += [f"options:tx_pcap={sent_to / name}"] if sent_to else []
+        self._vsctl(*words)
+
+    def have_bridge(self, bridge: str) -> None:
+        """A bridge without devices, if it is not there."""
+        self._vsctl("--may-exist", "add-br", bridge, *self._settings(bridge))
+
+    def load(self, bridge: str, flows: Sequence[str], groups: Sequence[str]) -> None:
+        """Replaces all that the bridge has, in one bundle."""
+        lines = ["flow delete", "group delete group_id=4294967292"]
+        lines += [f"group add {group}" for group in groups]
+        lines += [f"flow add {flow}" for flow in flows]
+        self._ofctl("bundle", bridge, "-", given="\n".join(lines) + "\n")
+
+    def flows(self, bridge: str) -> List[str]:
+        """What it has, but for what it learned; a line of text each, sorted."""
+        lines = self._ofctl("--no-stats", "--no-names", "dump-flows", bridge).splitlines()
+        found = [line.strip() for line in lines if not line.startswith("OFPST")]
+        learned = tuple(f"table={table}," for table in LEARNED)
+        matches = [line.split(" actions=")[0] for line in found]
+        return sorted(
+            line
+            for line, match in zip(found, matches)
+            if not any(table in match for table in learned)
+        )
+
+    def groups(self, bridge: str) -> List[str]:
+        """Likewise."""
+        lines = self._ofctl("--no-names", "dump-groups", bridge).splitlines()
+        return sorted(line.strip() for line in lines if not line.startswith("OFPST"))
