@@ -17,6 +17,7 @@ __all__ = ["LIBRARIES", "RUNTIME", "Runtime", "environment", "folder", "place", 
 
 PATHS = "LD_LIBRARY_PATH"
 RUNTIME = "librecordings.so"
+_TRAP = "librecordings_trap.so"
 LIBRARIES = ("libvswitch.so", "libnebPublic.so")
 # What they are linked against, in place of the host's; no path is longer.
 _ROOM = b"@" * 4096
@@ -61,7 +62,9 @@ def stand_in_front(hosts: Dict[str, Path]) -> None:
         raise OSError("_libvswitch is loaded already, and with it the libraries of a host")
     with tempfile.TemporaryDirectory(prefix="vswitch-front-") as made:
         place(Path(made), hosts)
-        for name in LIBRARIES:
+        # What the module has for a host, and brings too late for these.
+        shutil.copy(folder() / _TRAP, made)
+        for name in (_TRAP, *LIBRARIES):
             _KEPT[name] = ctypes.CDLL(str(Path(made, name)), ctypes.RTLD_GLOBAL)
 
 

@@ -500,6 +500,9 @@ def test_the_readme_shows_what_passes(pytester: pytest.Pytester) -> None:
     code = "".join(re.findall(r"^```python\n(.*?)^```$", text, re.M | re.S))
     tests = re.findall(r"^def test_", code, re.M)
     assert tests
+    ini = re.search(r"^```ini\n(.*?)^```$", text, re.M | re.S)
+    assert ini
+    pytester.makeini(ini[1])
     run(pytester, code).assert_outcomes(passed=len(tests))
     said = re.search(r"^_+ test_the_uplinks _+\n(.*?)^```$", text, re.M | re.S)
     assert said and said[1].rstrip() == left_out("the test", "VSQEX_GetUplinks: 80 bytes")

@@ -3,7 +3,7 @@
 from pathlib import Path
 
 import pytest
-from recordings import without_host
+from hostless import without_host
 
 
 @pytest.fixture(name="alone", scope="session")

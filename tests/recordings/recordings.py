@@ -2,7 +2,6 @@
 names, or without any."""
 
 import os
-import shutil
 import subprocess
 import sys
 import textwrap
@@ -23,7 +22,6 @@ __all__ = [
     "program",
     "record",
     "record_tool",
-    "without_host",
 ]
 
 _BUILD = Path(os.environ["BUILD_DIR"])
@@ -86,7 +84,7 @@ def record_tool(
 def play(
     command: Sequence[str], trace: Path, folder: Path, by: str = "order", **variables: str
 ) -> Playing:
-    """Runs a tool over a trace, where no host can be found; `folder` is of `without_host`."""
+    """Runs a tool over a trace, where no host can be found; `folder` is of without_host."""
     with played(trace, by) as playing:
         environment = playing.environment
         environment["PYTHONPATH"] = os.pathsep.join(
@@ -94,19 +92,6 @@ def play(
         )
         done = _run(command, environment, variables)
         return Playing(*done, playing.ledger.left, playing.ledger.has_failed)
-
-
-def without_host(made: Path) -> Path:
-    """A folder with the module as it is built, beside which there is no host."""
-    built, python = _BUILD / "python", made / "python"
-    python.mkdir()
-    for one in built.iterdir():
-        if one.name.startswith("_libvswitch."):
-            shutil.copy(one, python)
-        elif one.name != "simhost":
-            (python / one.name).symlink_to(one)
-    (made / "recordings").symlink_to(_BUILD / "recordings")
-    return made
 
 
 def _run(

@@ -11,13 +11,17 @@ import pytest
 
 from simhost import Block, Host, HostRefused, MemoryLeftOut, NotSimulated, SharedHost
 from simhost._host import Document
+from simhost._recorded_test import RecordedTest, stand_in_front
 from simhost._loaded import LoadedControl
 
 _MARKS = (
     "scenario(document): the host of this test is what the document describes, a dict or the name"
     " of a JSON file beside the test.",
     "leaves_host_memory(reason): this test may leave memory of the host out.",
+    "recording(file, by='order', mode='none', all_used=False): the calls of this test get what they"
+    " got when the file was recorded; its name is relative to the test's file.",
 )
+_FRONT = "vswitch_recordings"
 AnyHost = TypeVar("AnyHost", Host, SharedHost)
 
 
@@ -50,6 +54,21 @@ class _Watch:
 
 
 _WATCH = pytest.StashKey[_Watch]()
+_RECORDED = pytest.StashKey[RecordedTest]()
+
+
+def pytest_addoption(parser: pytest.Parser) -> None:
+    parser.addini(_FRONT, "whether tests may have the mark recording", type="bool", default=False)
+
+
+@pytest.hookimpl(tryfirst=True)  # type: ignore[misc]  # pluggy is not typed
+def pytest_load_initial_conftests(early_config: pytest.Config) -> None:
+    """Before anything of the tests is there, which may load the module, and with it a host."""
+    if early_config.getini(_FRONT):
+        try:
+            stand_in_front()
+        except OSError as error:
+            raise pytest.UsageError(f"{_FRONT}: {error}") from None
 
 
 def pytest_configure(config: pytest.Config) -> None:
@@ -62,6 +81,28 @@ def scenario() -> Optional[Document]:
     """What a fresh host is unless the test has the mark `scenario`: a dict, the name of a JSON file
     beside the test, or None for the default host. Made to be overridden."""
     return None
+
+
+@pytest.fixture(autouse=True)
+def _recording(request: pytest.FixtureRequest) -> Iterator[None]:
+    """Has the calls of a test with the mark `recording` played, and those of its own fixtures."""
+    mark = request.node.get_closest_marker("recording")
+    if mark is None:
+        yield
+        return
+    if not request.config.getini(_FRONT):
+        pytest.fail(
+            f"the mark recording needs a line {_FRONT} = true in the ini file, in the section of"
+            " pytest: what plays has to be there before the module is loaded",
+            pytrace=False,
+        )
+    try:
+        test = RecordedTest(request.node, *mark.args, **mark.kwargs)
+    except (OSError, TypeError, ValueError) as error:
+        pytest.fail(f"the mark recording: {error}", pytrace=False)
+    request.node.stash[_RECORDED] = test
+    with test.under_way():
+        yield
 
 
 @pytest.fixture
@@ -124,6 +165,8 @@ def pytest_runtest_setup(item: pytest.Item) -> None:
 @pytest.hookimpl(trylast=True)  # type: ignore[misc]  # pluggy is not typed
 def pytest_runtest_call(item: pytest.Item) -> None:
     """Runs after a test that has passed; what it raises fails the test itself."""
+    if _RECORDED in item.stash:
+        item.stash[_RECORDED].end_of_passed_test()
     if _WATCH in item.stash:
         item.stash[_WATCH].end_of_passed_test()
 

@@ -1,0 +1,137 @@
+"""A test whose calls are played from a recording, or recorded for the next time.
+
+What plays are libraries in front of the host's, which have to be there before the module is loaded.
+So they are loaded as early as pytest can, and forward the calls of all other tests.
+"""
+
+import contextlib
+import json
+import os
+import subprocess
+import sys
+import tempfile
+from pathlib import Path
+from typing import TYPE_CHECKING, Dict, Iterator
+
+import pytest
+
+if TYPE_CHECKING:
+    from vswitch.playing import Ledger
+
+_BY, _MODES = ("order", "arguments"), ("none", "once", "all")
+_FIND = """
+import json
+from vswitch.recording import host_libraries
+print(json.dumps({name: str(path) for name, path in host_libraries().items()}))
+"""
+_hosts: Dict[str, Path] = {}
+
+
+def stand_in_front() -> None:
+    """Has this process find the libraries that play, and through them the host, if there is one."""
+    from vswitch import _front
+
+    # Another process loads the host's, for this one would then have them.
+    found = subprocess.run([sys.executable, "-c", _FIND], capture_output=True, text=True)
+    if found.returncode == 0:
+        _hosts.update({name: Path(path) for name, path in json.loads(found.stdout).items()})
+    _front.stand_in_front(_hosts)
+
+
+class RecordedTest:
+    """What a test's mark says, and what became of it."""
+
+    def __init__(
+        self,
+        item: pytest.Item,
+        file: str,
+        *,
+        by: str = "order",
+        mode: str = "none",
+        all_used: bool = False,
+    ) -> None:
+        if by not in _BY or mode not in _MODES:
+            raise ValueError(f"by is one of {', '.join(_BY)}, and mode one of {', '.join(_MODES)}")
+        from vswitch._front import Runtime
+
+        self._item = item
+        self._trace = item.path.parent / file
+        self._by_arguments = by == "arguments"
+        self._all_used = all_used
+        self._is_recorded = mode == "all" or (mode == "once" and not self._trace.exists())
+        if not self._is_recorded and not self._trace.exists():
+            raise OSError(f"there is no {self._trace}; mode='once' records it")
+        if self._is_recorded and not _hosts:
+            raise OSError(f"there is no host to record {self._trace} with")
+        self._has_passed = False
+        self._runtime = Runtime()
+
+    @contextlib.contextmanager
+    def under_way(self) -> Iterator[None]:
+        """The calls that are made meanwhile are played, or recorded."""
+        with self._recorded() if self._is_recorded else self._played():
+            yield
+
+    def end_of_passed_test(self) -> None:
+        """A test may hide that a call failed, and has failed all the same."""
+        failure = self._runtime.failure()
+        if failure:
+            pytest.fail(failure, pytrace=False)
+        self._has_passed = True
+
+    @contextlib.contextmanager
+    def _recorded(self) -> Iterator[None]:
+        from vswitch.recording import begin
+
+        made = self._beside()
+        try:
+            begin(made, [self._item.nodeid], _hosts)
+            self._runtime.record(made)
+            yield
+            self._runtime.forward()
+            # What a test that failed has asked is not what it is to ask.
+            if self._has_passed:
+                made.replace(self._trace)
+        finally:
+            self._runtime.forward()
+            if made.exists():
+                made.unlink()
+
+    @contextlib.contextmanager
+    def _played(self) -> Iterator[None]:
+        from vswitch.playing import Ledger
+        from vswitch.trace import TraceError
+
+        with tempfile.TemporaryDirectory(prefix="vswitch-play-") as folder:
+            try:
+                ledger = Ledger(self._trace, Path(folder, "ledger"))
+            except TraceError as error:
+                pytest.fail(f"the mark recording: {error}", pytrace=False)
+            self._runtime.play(self._trace, ledger.file, self._by_arguments)
+            try:
+                yield
+                failure = self._runtime.failure()
+            finally:
+                self._runtime.forward()
+            # A test that has failed has been told enough.
+            if self._has_passed:
+                self._look_back(failure, ledger)
+
+    def _look_back(self, failure: str, ledger: "Ledger") -> None:
+        if failure:
+            pytest.fail(f"a fixture of the test: {failure}", pytrace=False)
+        left = ledger.left
+        if left:
+            first = f"the first that was not is {left[0].function} in line {left[0].line}"
+            words = f"{len(ledger.calls) - len(left)} of {len(ledger.calls)} calls of"
+            words += f" {self._trace.name} were made; {first}"
+            if self._all_used:
+                pytest.fail(words, pytrace=False)
+            self._item.warn(pytest.PytestWarning(words))
+
+    def _beside(self) -> Path:
+        descriptor, name = tempfile.mkstemp(
+            prefix=f".{self._trace.name}.", dir=str(self._trace.parent)
+        )
+        os.close(descriptor)
+        return Path(name)
