@@ -22,6 +22,7 @@ class Bench:
         sent_to: Optional[Path] = None,
     ) -> None:
         self.ask = open_vswitch.ask
+        self.set_link = open_vswitch.set_link
         self.devices: Dict[str, int] = {}
         self.more_flows: List[str] = []
         self._open_vswitch = open_vswitch

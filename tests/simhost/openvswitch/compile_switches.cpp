@@ -3,9 +3,11 @@
 // switch "s".
 #include <array>
 #include <cstdio>
+#include <exception>
 #include <iostream>
 #include <nlohmann/json.hpp>
 #include <optional>
+#include <stdexcept>
 #include <string>
 
 #include "base/outcomes.h"
@@ -128,7 +130,7 @@ std::string name_of(QEX_ReturnStatus status) {
 
 }  // namespace
 
-int main() {
+int main() try {
   simhost::run_on(simhost::stored::plane());
   std::string line;
   while (std::getline(std::cin, line)) {
@@ -137,9 +139,10 @@ int main() {
       answer = compiled(Json::parse(line));
     } catch (simhost::Refused const &refused) {
       answer = {{"refused", refused.what()}, {"status", name_of(refused.status())}};
-    } catch (std::exception const &error) {
-      answer = {{"error", error.what()}};
     }
     std::cout << answer.dump() << std::endl;
   }
+} catch (std::exception const &error) {
+  std::fputs(error.what(), stderr);
+  return 1;
 }

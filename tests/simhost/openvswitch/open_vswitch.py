@@ -75,7 +75,9 @@ class OpenVSwitch:
         return done.stdout
 
     def _vsctl(self, *words: str) -> str:
-        return self._run("ovs-vsctl", f"--db={self._database}", *words)
+        # The server may be there and not yet listen.
+        patient = ["--retry", f"--timeout={int(PATIENCE)}"]
+        return self._run("ovs-vsctl", f"--db={self._database}", *patient, *words)
 
     def _ofctl(self, *words: str, given: str = "") -> str:
         return self._run("ovs-ofctl", "-OOpenFlow15", *words, given=given)
@@ -113,6 +115,14 @@ class OpenVSwitch:
             words += ["--", "set", "Interface", name, "type=dummy", f"ofport_request={number}"]
             words += [f"options:tx_pcap={sent_to / name}"] if sent_to else []
         self._vsctl(*words)
+
+    def set_link(self, bridge: str, number: int, is_up: bool) -> None:
+        """Pulls or plugs the cable of a device, and waits until the bridge has seen it."""
+        device = f"{bridge}{number}"
+        self.ask("netdev-dummy/set-admin-state", device, "up" if is_up else "down")
+        deadline = time.monotonic() + PATIENCE
+        while ("LIVE" in self._ofctl("dump-ports-desc", bridge, str(number))) != is_up:
+            assert time.monotonic() < deadline, f"the link of {device} stays as it was"
 
     def have_bridge(self, bridge: str) -> None:
         """A bridge without devices, if it is not there."""

@@ -207,6 +207,11 @@ class Rules:
                     return True
         return False
 
+    def _sent_by_wire(self, port: str, frame: Frame) -> bool:
+        """Whether a frame from an uplink is one that a port had to send there."""
+        by_wire_only = self.ports[port].get("transmit_uplink", False)
+        return bool(by_wire_only and self.macs.get(port) == frame.source)
+
     def comes_out(self, at: str, frame: Frame) -> Tuple[Counts[Copy], Set[str]]:
         """What each port gets, and the uplinks of which one gets the frame; its tags there are
         under the name "wire"."""
@@ -228,7 +233,7 @@ class Rules:
                 continue
             if from_uplink and not self.receives_at(port, at, to_many or owner is None):
                 continue
-            if self.ports[port].get("transmit_uplink") and self.macs.get(port) == frame.source:
+            if from_uplink and self._sent_by_wire(port, frame):
                 continue
             tags = self.leaves(port, vlan, priority, rest)
             if tags is not None:

@@ -31,7 +31,10 @@ class Wires(Bench):
         self._last = (switch, clients)
         fence, end = self._devices + 1, self._devices + 2
         self.more_flows = [f"priority=65535,in_port={fence} actions=output:{end}"]
-        return super().load(switch, clients)
+        rules = super().load(switch, clients)
+        # What the data path keeps of the flows before goes with them, but not at that moment.
+        self.ask("revalidator/purge")
+        return rules
 
     def forget(self) -> None:
         """Makes the switch one that has learned nothing."""

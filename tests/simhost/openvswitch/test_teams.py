@@ -1,0 +1,146 @@
+"""Which uplinks carry what, and what comes in over which, while links go down and up."""
+
+from typing import Any, Dict, Iterator, Set
+
+import pytest
+
+from bench import Bench
+from compiler import Compiler
+from frames import Frame
+from open_vswitch import OpenVSwitch
+
+BROADCAST = "ff:ff:ff:ff:ff:ff"
+P1, P2 = "02:00:00:00:00:01", "02:00:00:00:00:02"
+STRANGER = "02:00:00:00:00:99"
+UPLINKS = ("nic0", "nic1", "nic2")
+
+
+class Links(Bench):
+    """A switch with three uplinks whose links go down and up."""
+
+    def down(self, uplink: str) -> None:
+        self.set_link("teams", UPLINKS.index(uplink) + 1, is_up=False)
+
+    def up(self, uplink: str) -> None:
+        self.set_link("teams", UPLINKS.index(uplink) + 1, is_up=True)
+
+    def have(self, *shares: int, **teaming: Any) -> None:
+        """Two ports, p2 with the second share if there is one."""
+        switch: Dict[str, Any] = {"uplinks": list(UPLINKS), "teaming": teaming}
+        switch["ports"] = [{"id": "p1", "vlan": 7}, {"id": "p2", "vlan": 7}]
+        clients = [{"port": "p1", "mac": P1}, {"port": "p2", "mac": P2}]
+        for client, share in zip(clients, shares):
+            client["share"] = share  # type: ignore[assignment]
+        self.load(switch, clients)
+
+    def sent_over(self, port: str, source: str) -> Set[str]:
+        return {name for name, _, _ in self.look(port, Frame(STRANGER, source))}
+
+    def accepted(self, destination: str) -> Set[str]:
+        """The uplinks at which a frame comes in."""
+        frame = Frame(destination, STRANGER, ((7, 0),))
+        return {uplink for uplink in UPLINKS if self.look(uplink, frame)}
+
+
+@pytest.fixture(scope="module")
+def all_links(open_vswitch: OpenVSwitch, compiler: Compiler) -> Links:
+    return Links(open_vswitch, compiler, "teams", 5)
+
+
+@pytest.fixture
+def links(all_links: Links) -> Iterator[Links]:
+    yield all_links
+    for uplink in UPLINKS:
+        all_links.up(uplink)
+
+
+def test_the_next_one_steps_in_and_back(links: Links) -> None:
+    links.have(balance="explicit", active=["nic1"], standby=["nic0"])
+    assert links.sent_over("p1", P1) == links.accepted(P1) == {"nic1"}
+    links.down("nic1")
+    assert links.sent_over("p1", P1) == links.accepted(P1) == {"nic0"}
+    assert links.accepted(BROADCAST) == {"nic0"}
+    links.up("nic1")
+    assert links.sent_over("p1", P1) == links.accepted(P1) == {"nic1"}
+
+
+def test_a_team_without_links_sends_and_takes_nothing(links: Links) -> None:
+    links.have(balance="explicit", active=["nic1"], standby=["nic0"])
+    links.down("nic0")
+    links.down("nic1")
+    assert links.sent_over("p1", P1) == set()
+    assert links.accepted(BROADCAST) == set()
+
+
+def test_each_port_has_its_own_by_its_share(links: Links) -> None:
+    links.have(0, 2, balance="load", active=list(UPLINKS))
+    assert links.sent_over("p1", P1) == links.accepted(P1) == {"nic0"}
+    assert links.sent_over("p2", P2) == links.accepted(P2) == {"nic2"}
+    # One of each way takes its copy.
+    assert links.accepted(BROADCAST) == {"nic0", "nic2"}
+    links.down("nic0")
+    assert links.sent_over("p1", P1) == links.accepted(P1) == {"nic1"}
+    assert links.accepted(BROADCAST) == {"nic1", "nic2"}
+
+
+def test_sources_keep_to_one_while_it_has_a_link(links: Links) -> None:
+    links.have(balance="mac", active=["nic0", "nic1"])
+    used = {}
+    for number in range(16):
+        source = f"02:00:00:00:01:{number:02x}"
+        (used[source],) = links.sent_over("p1", source)
+    assert set(used.values()) == {"nic0", "nic1"}
+    assert links.accepted(P1) == {"nic0", "nic1"}
+    assert links.accepted(BROADCAST) == {"nic0"}
+    links.down("nic0")
+    assert {name for source in used for name in links.sent_over("p1", source)} == {"nic1"}
+    assert links.accepted(BROADCAST) == {"nic1"}
+
+
+def test_what_has_no_addresses_keeps_to_one(links: Links) -> None:
+    links.have(balance="ip", active=["nic0", "nic1"])
+    assert len({next(iter(links.sent_over("p1", P1))) for _ in range(4)}) == 1
+    assert links.accepted(P1) == links.accepted(BROADCAST) == {"nic0", "nic1"}
+
+
+def test_a_group_is_one_link(links: Links) -> None:
+    switch = {
+        "uplinks": list(UPLINKS),
+        "lags": [{"name": "lag", "uplinks": ["nic0", "nic1"]}],
+        "teaming": {"balance": "explicit", "active": ["lag"], "standby": ["nic2"]},
+        "ports": [{"id": "p1", "vlan": 7}],
+    }
+    links.load(switch, [{"port": "p1", "mac": P1, "share": 1}])
+    assert links.sent_over("p1", P1) == {"nic1"}
+    assert links.accepted(BROADCAST) == {"nic0", "nic1"}
+    links.down("nic1")
+    assert links.sent_over("p1", P1) == {"nic0"}
+    assert links.accepted(BROADCAST) == {"nic0", "nic1"}
+    links.down("nic0")
+    assert links.sent_over("p1", P1) == links.accepted(BROADCAST) == {"nic2"}
+
+
+def test_a_port_of_another_network_hears_that_one_only(links: Links) -> None:
+    switch = {
+        "uplinks": list(UPLINKS),
+        "teaming": {"balance": "explicit", "active": ["nic0"]},
+        "ports": [{"id": "p1", "vlan": 7}, {"id": "p2", "vlan": 7, "uplink": "nic2"}],
+    }
+    links.load(switch, [{"port": "p1", "mac": P1}, {"port": "p2", "mac": P2}])
+    assert links.sent_over("p2", P2) == links.accepted(P2) == {"nic2"}
+    assert {name for name, _, _ in links.look("nic2", Frame(BROADCAST, STRANGER, ((7, 0),)))} == {
+        "p2"
+    }
+
+
+def test_a_blocked_uplink_lets_nothing_through(links: Links) -> None:
+    uplink_ports = [{"id": "u0", "uplink": "nic0", "blocked": True}, {"id": "u1", "uplink": "nic1"}]
+    switch = {
+        "uplink_ports": uplink_ports,
+        "teaming": {"balance": "explicit", "active": ["nic0"]},
+        "ports": [{"id": "p1", "vlan": 7}],
+        "uplinks": ["nic0", "nic1"],
+    }
+    links.load(switch, [{"port": "p1", "mac": P1}])
+    assert links.sent_over("p1", P1) == set()
+    assert links.look("nic0", Frame(BROADCAST, STRANGER, ((7, 0),))) == {}
