@@ -5,6 +5,7 @@
 
 #include "recordings/core/identities.h"
 #include "recordings/core/memory.h"
+#include "recordings/core/of_thread.h"
 
 namespace recordings {
 namespace {
@@ -14,8 +15,7 @@ constexpr std::string_view contradiction = "its lengths contradict each other";
 constexpr std::string_view too_much = "it is longer than a trace holds";
 
 Block &block() {
-  static thread_local Block the_block;
-  return the_block;
+  return OfThread<Block>::get();
 }
 
 void write_number(Line &line, std::int64_t value, bool is_signed) {

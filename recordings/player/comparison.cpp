@@ -102,8 +102,7 @@ class Differing {
 }  // namespace
 
 Json asked_inputs(Call const &call, Words words, Holdings const &holdings) {
-  static thread_local Line line;
-  line.clear();
+  Line line;
   line.raw("{");
   write_inputs(line, call, words, address_itself);
   line.raw("}");

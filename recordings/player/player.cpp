@@ -13,6 +13,7 @@
 #include <mutex>
 #include <string_view>
 
+#include "recordings/core/of_thread.h"
 #include "recordings/core/process.h"
 #include "recordings/core/signatures.h"
 #include "recordings/player/playing.h"
@@ -56,8 +57,6 @@ struct Thread {
   std::vector<InProgress> calls;
 };
 
-thread_local Thread the_thread;
-
 /// The tool may look at it after a call that does not touch it.
 class KeptErrno {
  public:
@@ -98,7 +97,7 @@ Playing &playing() {
 
 /// This thread, without the calls that a jump has left, and as new in a new recording or process.
 Thread &this_thread(void const *frame) {
-  Thread &thread = the_thread;
+  Thread &thread = OfThread<Thread>::get();
   if (thread.began != state().began || thread.process != process_id()) {
     thread = {state().began, process_id(), {}, {}};
   }
@@ -156,7 +155,8 @@ constexpr Ending goes_on{Ending::Way::returns, 0, 0, nullptr};
 Ending begin(void const *frame, Call const &call, Words words) noexcept {
   return carefully([&] {
     Playing &all = playing();
-    Thread &thread = this_thread(frame);
+    // One that had the place of this frame was left, too.
+    Thread &thread = this_thread(static_cast<char const *>(frame) + 1);
     auto const outer = thread.calls.empty() ? std::nullopt : thread.calls.back().callback;
     auto found = all.begin(thread.place, call, words, outer);
     found.frame = frame;

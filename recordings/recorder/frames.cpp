@@ -5,6 +5,7 @@
 #include <cstring>
 
 #include "recordings/core/identities.h"
+#include "recordings/core/of_thread.h"
 #include "recordings/core/process.h"
 #include "recordings/core/trap.h"
 #include "recordings/core/values.h"
@@ -43,8 +44,6 @@ struct Thread {
   [[nodiscard]] Entry *top() const { return depth == 0 ? nullptr : &at(depth - 1); }
 };
 
-thread_local Thread the_thread{};
-
 // The thread whose frame the trap leads to; 0 for none. The buffer is one for the whole process,
 // and a thread that arms nothing itself must not take it from one that does.
 constinit std::atomic<std::uint64_t> armed_thread{};
@@ -53,7 +52,7 @@ constinit std::atomic<std::uint64_t> armed_thread{};
 constinit std::atomic<void *> last_callback{};
 
 Thread &this_thread() {
-  Thread &thread = the_thread;
+  Thread &thread = OfThread<Thread>::get();
   if (thread.number == 0) {
     thread.number = next_thread();
   }
@@ -108,7 +107,7 @@ bool is_ours(Entry const &entry) {
   return entry.process == process_id();
 }
 
-/// Ends what a jump has left above the entry with a frame, or above the frame that is about to be.
+/// Ends what a jump has left above the entry with a frame.
 void drop_left(Thread &thread, void const *frame) {
   while (thread.depth > 0 && thread.top()->frame < frame) {
     Entry const &left = *thread.top();
@@ -122,6 +121,11 @@ void drop_left(Thread &thread, void const *frame) {
     }
     --thread.depth;
   }
+}
+
+/// Likewise before a frame that is new: one that had its place was left, too.
+void drop_left_before(Thread &thread, void const *frame) {
+  drop_left(thread, static_cast<char const *>(frame) + 1);
 }
 
 bool push(Thread &thread, Entry const &entry) {
@@ -211,7 +215,7 @@ bool begin(Frame &frame, Call const &call) noexcept {
   }
   KeptErrno const kept;
   Thread &thread = this_thread();
-  drop_left(thread, &frame);
+  drop_left_before(thread, &frame);
   if (thread.depth > 0 && thread.top()->call != nullptr) {
     return false;
   }
@@ -282,7 +286,7 @@ std::uint64_t begin_callback(void const *here, std::string_view argument, Given 
   }
   KeptErrno const kept;
   Thread &thread = this_thread();
-  drop_left(thread, here);
+  drop_left_before(thread, here);
   auto const number = next_number();
   Line &line = start_line(thread, "callback", number);
   line.member("thread").number(thread.number);

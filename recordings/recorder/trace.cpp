@@ -118,10 +118,9 @@ void write_libraries(Line &line) {
 }
 
 void tell_of_process() {
-  static thread_local Line line;
+  Line line;
   std::array<char, 4096> program{};
   auto const length = readlink("/proc/self/exe", program.data(), program.size());
-  line.clear();
   line.raw("{").member("process").number(std::int64_t{process_id()});
   line.member("parent").number(std::int64_t{state.parent});
   write_time(line);

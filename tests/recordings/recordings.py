@@ -14,6 +14,7 @@ from vswitch.trace import Call, Trace
 
 __all__ = [
     "FORMATTING",
+    "LEAVING",
     "RECORDING",
     "SIMULATED",
     "Playing",
@@ -29,6 +30,8 @@ SIMULATED = _BUILD / "simhost"
 RECORDING = _BUILD / "tests" / "recording_host"
 FORMATTING = _BUILD / "tests" / "formatting_host"
 """Which has nothing but a Panic that writes what it is given."""
+LEAVING = _BUILD / "tests" / "leaving_tool" / "leaving_tool"
+"""A tool without an interpreter, which jumps out of walks, and makes a call when it exits."""
 _CONTRACT = Path(__file__).parents[1] / "contract"
 _TIMEOUT = 60
 

@@ -5,8 +5,9 @@ import textwrap
 from pathlib import Path
 
 import pytest
-from recordings import SIMULATED, play, program, record, record_tool
+from recordings import LEAVING, SIMULATED, play, program, record, record_tool
 from test_recorded_shapes import SCENARIO, TOOL
+from vswitch.playing import BY
 
 WAYS = {
     "traps": """
@@ -142,6 +143,16 @@ def test_a_way(way: str, tmp_path: Path, alone: Path) -> None:
     # What a process writes while another one does may stand before that.
     assert sorted(done.stdout.splitlines()) == sorted(made.stdout.splitlines()), done.stderr
     assert (done.status, done.stderr) == (0, made.stderr)
+    assert (done.left, done.has_failed) == ([], False)
+
+
+@pytest.mark.parametrize("by", BY)
+def test_a_tool_that_jumps_out_of_walks_and_makes_a_call_when_it_exits(
+    by: str, tmp_path: Path, alone: Path
+) -> None:
+    made = record_tool([str(LEAVING)], tmp_path / "trace.jsonl")
+    done = play([str(LEAVING)], made.trace, alone, by)
+    assert (done.status, done.stdout, done.stderr) == (0, made.stdout, "")
     assert (done.left, done.has_failed) == ([], False)
 
 

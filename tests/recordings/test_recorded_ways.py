@@ -6,7 +6,7 @@ from pathlib import Path
 from typing import Any, List
 
 import pytest
-from recordings import FORMATTING, RECORDING, record
+from recordings import FORMATTING, LEAVING, RECORDING, record, record_tool
 from vswitch.trace import Trace, Trap
 
 
@@ -94,6 +94,17 @@ def test_a_trap_in_a_callback_ends_the_inner_call_alone(trace: Path) -> None:
     assert "is given back twice" in (second.trap.text or "")
     walk = made.call("DVSState_SwitchForEach")
     assert walk.trap is None and not walk.was_left and walk.callbacks[0].result == 1
+
+
+def test_no_call_is_lost_after_jumps_of_the_tools_own_and_at_its_exit(trace: Path) -> None:
+    made = record_tool([str(LEAVING)], trace)
+    assert made.status == 0, made.stderr
+    walks = [one for one in made.calls if one.function == "DVSState_SwitchForEach"]
+    assert [one.was_left for one in walks] == [True, True, True, False]
+    assert [one.within for one in made.calls] == [None] * 6
+    set_to = [one.inputs["mtu"] for one in made.calls if one.function == "VSDVS_SetMTU"]
+    assert set_to == [1, 9000]
+    assert {one.thread for one in made.calls} == {1}
 
 
 def test_allocators_are_recorded_beyond_the_call_that_they_were_given_with(trace: Path) -> None:
