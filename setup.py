@@ -25,6 +25,7 @@ CONFIGURATION = {
     "Python3_EXECUTABLE": sys.executable,
     "PYTHON_INSTALL_DIR": ".",
     "SIMHOST_INSTALL_DIR": "simhost/lib",
+    "RECORDINGS_INSTALL_DIR": "vswitch/recordings",
     "HOST_RUNPATH": "$ORIGIN/simhost/lib",
     "INSTALL_METADATA": "OFF",
     # A wheel cannot ask for libraries of the system.
@@ -52,7 +53,7 @@ class CMakeBuild(build_ext):
         self._cmake("--build", objects, "--parallel", str(os.cpu_count() or 1))
         # What an earlier build left there would go into the wheel.
         shutil.rmtree(target, ignore_errors=True)
-        for component in ("module", "command", "simhost"):
+        for component in ("module", "recordings", "command", "simhost"):
             self._cmake(
                 "--install", objects, "--strip", "--prefix", str(target), "--component", component
             )

@@ -25,7 +25,10 @@ _LONGEST = 8192
 
 
 def folder() -> Path:
-    """Where they are installed, beside the folder of the module."""
+    """Where they are: in this package, or beside the folder of the module, as they are built."""
+    installed = Path(__file__).resolve().parent / "recordings"
+    if installed.is_dir():
+        return installed
     module = importlib.util.find_spec("_libvswitch")
     beside = module.origin if module is not None and module.origin else __file__
     return Path(beside).resolve().parent.parent / "recordings"

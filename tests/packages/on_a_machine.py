@@ -130,6 +130,16 @@ class Machine:
         why = "no switch 'nope' (there are vswitch0)"
         assert (done.returncode, done.stderr) == (1, f"# simulated host\nvswitch: {why}\n")
 
+    def records_and_plays(self) -> None:
+        trace, tool = "/tmp/trace.jsonl", [self.vswitch, "list"]
+        said = self.root.run(self.vswitch, "record", "-o", trace, "--", *tool)
+        assert "vswitch0" in said
+        done = self.root.try_run(self.vswitch, "play", trace, "--all-used", "--", *tool)
+        assert (done.returncode, done.stdout) == (0, said), done.stderr
+        # No host was asked.
+        assert "simulated" not in done.stderr
+        assert self.root.try_run(self.vswitch, "replay", trace).returncode == 0
+
     def runs_tests_with_the_plugin(self, **environment: str) -> None:
         self.root.write("/tmp/suite/test_plugin.py", PLUGIN_TEST)
         # pytest keeps byte code of plug-ins under a name that pip does not know.

@@ -58,6 +58,10 @@ def test_the_command_runs(machine: Machine) -> None:
     assert said == machine.root.run("vswitch", "list")
 
 
+def test_it_records_and_plays(machine: Machine) -> None:
+    machine.records_and_plays()
+
+
 def test_it_has_its_manual_page(machine: Machine) -> None:
     page = machine.root.run("zcat", "/usr/share/man/man1/vswitch.1.gz")
     assert page.startswith('.TH VSWITCH 1 "" libvswitch')

@@ -101,7 +101,9 @@ def test_with_its_extra_the_command_runs(root: Root, file: str) -> None:
     root.satisfy("python3-click, python3-rich, python3-typer, python3-yaml")
     root.run("python3", "-m", "venv", "--system-site-packages", environment)
     root.run(f"{environment}/bin/pip", "install", "--no-index", f"{file}[command]")
-    Machine(root, f"{environment}/bin/python", f"{environment}/bin").runs_the_command()
+    machine = Machine(root, f"{environment}/bin/python", f"{environment}/bin")
+    machine.runs_the_command()
+    machine.records_and_plays()
 
 
 def test_nothing_is_left_after_uninstalling(machine: Machine, before: Set[str]) -> None:
