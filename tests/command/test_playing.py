@@ -196,6 +196,30 @@ def test_what_is_not_whole_replaces_nothing(vswitch: Vswitch, trace: Path) -> No
     assert [one.name for one in trace.parent.iterdir() if "jsonl" in one.name] == ["trace.jsonl"]
 
 
+def test_a_recording_without_a_call_replaces_nothing(
+    vswitch: Vswitch, trace: Path, tmp_path: Path
+) -> None:
+    before = trace.read_text()
+    done = vswitch("play", str(trace), "--mode", "all", "--", "./is-not-there")
+    assert (done.status, trace.read_text()) == (127, before)
+    words = ["play", str(tmp_path / "new.jsonl"), "--mode", "once", "--", "true"]
+    assert [vswitch(*words).status for _ in range(2)] == [0, 0]
+    assert not (tmp_path / "new.jsonl").exists()
+
+
+def test_where_no_trace_can_be_is_told_before_the_tool_runs(
+    vswitch: Vswitch, tmp_path: Path
+) -> None:
+    words = ["--mode", "all", "--", "touch", str(tmp_path / "ran")]
+    for place, what in [
+        (tmp_path, "[Errno 21] Is a directory"),
+        (tmp_path / "none" / "trace.jsonl", "[Errno 2] No such file or directory"),
+    ]:
+        done = vswitch("play", str(place), *words)
+        assert (done.status, done.stderr) == (1, f"vswitch: {what}: '{place}'\n")
+    assert not (tmp_path / "ran").exists()
+
+
 def damaged(change: Callable[[List[Dict[str, Any]]], object]) -> Callable[[List[str]], str]:
     def apply(lines: List[str]) -> str:
         events = [json.loads(line) for line in lines]

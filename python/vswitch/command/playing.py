@@ -1,5 +1,6 @@
 """The command that runs a tool over a trace in place of a host."""
 
+import errno
 import os
 import subprocess
 import sys
@@ -90,24 +91,42 @@ def _tell(ledger: Ledger) -> int:
 
 def _record(trace: Path, command: List[str]) -> int:
     """Records the tool; what there was is replaced by a trace that is whole, and by no other."""
-    descriptor, name = tempfile.mkstemp(prefix=f".{trace.name}.", dir=str(trace.parent))
-    os.close(descriptor)
-    made = Path(name)
+    made = _beside(trace)
     try:
         # A program of its own: this one has no host.
         words = [sys.executable, "-m", "vswitch", "record", "-o", str(made)]
         status = subprocess.call([*words, *(["--real"] if is_real() else []), "--", *command])
         # Without a host there is no line, and what is wrong has been told.
-        why = _unfinished(made) if made.stat().st_size else ""
+        if not made.stat().st_size:
+            return status
+        why = _unfinished(made)
         if why:
             print(f"vswitch: {trace} is left as it was: {printable(why)}", file=sys.stderr)
             return status or REFUSED
-        if made.stat().st_size:
+        # A tool that could not be started, say, has made none, which has been told.
+        if _has_calls(made):
             made.replace(trace)
         return status
     finally:
         if made.exists():
             made.unlink()
+
+
+def _beside(trace: Path) -> Path:
+    """A new file in the folder of a trace; what is wrong there is told before the tool runs."""
+    if trace.is_dir():
+        raise IsADirectoryError(errno.EISDIR, os.strerror(errno.EISDIR), str(trace))
+    try:
+        descriptor, name = tempfile.mkstemp(prefix=f".{trace.name}.", dir=str(trace.parent))
+    except OSError as error:
+        raise OSError(error.errno, error.strerror, str(trace)) from None
+    os.close(descriptor)
+    return Path(name)
+
+
+def _has_calls(trace: Path) -> bool:
+    with Trace(trace) as read:
+        return any(True for _ in read)
 
 
 def _unfinished(trace: Path) -> str:
