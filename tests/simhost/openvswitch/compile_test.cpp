@@ -101,6 +101,11 @@ TEST(Compiling, HasNoPlaceAndNoGroupTwice) {
   auto network = with_uplinks();
   // The address of one port is another's, too.
   network.ports[1].address = network.ports[0].address;
+  // And one is fixed in two private VLANs of one primary.
+  network.private_vlans = {{.primary = 100, .secondary = 101, .kind = PrivateKind::isolated},
+                           {.primary = 100, .secondary = 102, .kind = PrivateKind::community}};
+  network.fixed_addresses = {{.address = {2}, .vlan = 101, .port = 1},
+                             {.address = {2}, .vlan = 102, .port = 2}};
   auto const made = compile(network);
   auto const same_place = [](auto const &one, auto const &other) {
     return place(one) == place(other);

@@ -133,6 +133,19 @@ def test_a_port_of_another_network_hears_that_one_only(links: Links) -> None:
     }
 
 
+def test_two_ways_get_what_comes_over_one_uplink(links: Links) -> None:
+    """Also where lists look at their ports."""
+    floods: Dict[str, Any] = {"mac_learning": {"flooding": True}, "vlan": {"trunk": [7]}}
+    switch = {
+        "uplinks": ["nic0"],
+        "ports": [{"id": "p1", **floods, "teaming": {"balance": "mac"}}, {"id": "p2", **floods}],
+    }
+    links.load(switch, [{"port": "p1", "mac": P1}, {"port": "p2", "mac": P2}])
+    for unknown in (BROADCAST, "02:00:00:00:00:98"):
+        out = links.look("nic0", Frame(unknown, STRANGER, ((7, 0),)))
+        assert set(out) == {("p1", ((7, 0),), None), ("p2", ((7, 0),), None)}
+
+
 def test_a_blocked_uplink_lets_nothing_through(links: Links) -> None:
     uplink_ports = [{"id": "u0", "uplink": "nic0", "blocked": True}, {"id": "u1", "uplink": "nic1"}]
     switch = {

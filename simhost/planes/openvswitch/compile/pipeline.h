@@ -46,7 +46,7 @@ inline constexpr std::uint8_t kElection = 12;
 inline constexpr std::uint8_t kDispatch = 13;
 /// Lists of ports by kList, kDomain and kWay, in pieces by kPiece.
 inline constexpr std::uint8_t kLists = 14;
-/// Out to the port in kDestination, if its VLANs allow it.
+/// Out to the port in kReceiver, if its VLANs allow it.
 inline constexpr std::uint8_t kDelivery = 15;
 /// Which uplink carries it: the group of the port's team.
 inline constexpr std::uint8_t kTeams = 16;
@@ -107,6 +107,8 @@ inline constexpr auto kElected = openflow::Field::reg10;
 inline constexpr auto kWire = openflow::Field::reg11;
 /// The number of a mirror session.
 inline constexpr auto kSession = openflow::Field::reg12;
+/// The OpenFlow port of a client that is to get the frame; a list has many.
+inline constexpr auto kReceiver = openflow::Field::reg14;
 /// A tag, as it was in the frame.
 inline constexpr auto kClientTag = openflow::Field::reg13;
 

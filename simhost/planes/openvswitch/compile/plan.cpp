@@ -15,6 +15,7 @@ constexpr std::uint32_t kLongestTimeout = 65535;
 Plan::Plan(Network const &given) : network(given), ways(given) {
   note_private_vlans();
   note_addresses();
+  note_fixed_addresses();
 }
 
 std::uint16_t Plan::hard_timeout() const {
@@ -45,6 +46,17 @@ void Plan::note_addresses() {
         port.vlan.carried ? std::nullopt : std::optional(kind_of(port.vlan.vlan).domain);
     if (taken.insert({*port.address, domain}).second) {
       own_addresses_.push_back({.port = &port, .address = *port.address, .domain = domain});
+    }
+  }
+}
+
+// Two private VLANs of one primary are one to addresses.
+void Plan::note_fixed_addresses() {
+  std::set<std::pair<EthernetAddress, std::uint16_t>> taken;
+  for (auto const &fixed : network.fixed_addresses) {
+    auto const domain = kind_of(fixed.vlan).domain;
+    if (taken.insert({fixed.address, domain}).second) {
+      fixed_places_.push_back({.address = fixed.address, .domain = domain, .port = fixed.port});
     }
   }
 }

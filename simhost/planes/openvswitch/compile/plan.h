@@ -31,6 +31,13 @@ struct OwnAddress {
   std::optional<std::uint16_t> domain;  ///< none: in all VLANs of the port
 };
 
+/// Likewise an address that stays where it is put.
+struct FixedPlace {
+  EthernetAddress address;
+  std::uint16_t domain;
+  std::optional<std::uint32_t> port;  ///< as FixedAddress::port
+};
+
 class Plan {
  public:
   /// `given` must outlive it.
@@ -43,6 +50,7 @@ class Plan {
   /// The private VLANs and their primary ones.
   [[nodiscard]] std::vector<std::uint16_t> const &private_vlans() const { return private_vlans_; }
   [[nodiscard]] std::vector<OwnAddress> const &own_addresses() const { return own_addresses_; }
+  [[nodiscard]] std::vector<FixedPlace> const &fixed_places() const { return fixed_places_; }
   /// Whether a switch outside may send this one's frames back.
   [[nodiscard]] bool frames_may_return() const { return network.uplinks.size() > 1; }
   /// How long a learned address stays, in seconds; 0 for as long as nobody takes it.
@@ -51,10 +59,12 @@ class Plan {
  private:
   void note_private_vlans();
   void note_addresses();
+  void note_fixed_addresses();
 
   std::array<VlanKind, 4096> kinds_{};
   std::vector<std::uint16_t> private_vlans_;
   std::vector<OwnAddress> own_addresses_;
+  std::vector<FixedPlace> fixed_places_;
 };
 
 /// Whether a port has a VLAN at all, and takes part in what happens there.

@@ -106,7 +106,7 @@ class Delivery {
     deliver(priority, match, with_priority_tag(out_));
   }
 
-  [[nodiscard]] Match to_port() const { return Match().with(field::kDestination, port_.port); }
+  [[nodiscard]] Match to_port() const { return Match().with(field::kReceiver, port_.port); }
   // Likewise of frames with no more tags than the port's may have.
   [[nodiscard]] Match to_vlan_port() const {
     auto match = to_port();

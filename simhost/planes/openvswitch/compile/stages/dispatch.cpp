@@ -63,7 +63,10 @@ class Dispatch {
     add(priority, Match(match).with(field::kOrigin, kFromUplink), ports);
   }
   [[nodiscard]] Actions deliver() const {
-    Actions actions{go_to(table::kDelivery)};
+    // The destination is asked for again where the next way begins.
+    Actions actions{openflow::Move{.source = openflow::whole(field::kDestination),
+                                   .destination = openflow::whole(field::kReceiver)},
+                    go_to(table::kDelivery)};
     return append(actions, promiscuous_);
   }
   void add(std::uint16_t priority, Match match, Actions actions) {

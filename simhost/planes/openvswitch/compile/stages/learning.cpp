@@ -72,10 +72,10 @@ void pass_over_fixed(Plan const &plan, Program &program) {
   for (auto const &own : plan.own_addresses()) {
     add(program, 200, own_source(own, Match()), {go_to(table::kLookup)}, own.port->number);
   }
-  for (auto const &fixed : plan.network.fixed_addresses) {
+  for (auto const &fixed : plan.fixed_places()) {
     auto const match = Match()
                            .with(Field::eth_src, openflow::to_value(fixed.address))
-                           .with(field::kDomain, plan.kind_of(fixed.vlan).domain);
+                           .with(field::kDomain, fixed.domain);
     add(program, 210, match, {go_to(table::kLookup)}, 0);
   }
 }

@@ -122,7 +122,7 @@ class Lists {
     for (; from != to; ++from) {
       auto const &port = **from;
       if (is_looked_at(plan_, port)) {
-        actions.emplace_back(openflow::set(field::kDestination, port.port));
+        actions.emplace_back(openflow::set(field::kReceiver, port.port));
         actions.push_back(go_to(table::kDelivery));
       } else {
         actions.emplace_back(openflow::Output{.port = port.port});

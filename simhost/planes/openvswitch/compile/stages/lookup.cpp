@@ -32,8 +32,8 @@ Match to(EthernetAddress const &address) {
   return Match().with(Field::eth_dst, openflow::to_value(address));
 }
 
-void put(Plan const &plan, Program &program, FixedAddress const &fixed) {
-  auto const match = to(fixed.address).with(field::kDomain, plan.kind_of(fixed.vlan).domain);
+void put(Plan const &plan, Program &program, FixedPlace const &fixed) {
+  auto const match = to(fixed.address).with(field::kDomain, fixed.domain);
   if (!fixed.port) {
     put(program, 300, match, kBeyond, 0);
     return;
@@ -60,7 +60,7 @@ void compile_lookup(Plan const &plan, Program &program) {
       put(program, 100, match, own.port->port, own.port->number);
     }
   }
-  for (auto const &fixed : plan.network.fixed_addresses) {
+  for (auto const &fixed : plan.fixed_places()) {
     put(plan, program, fixed);
   }
 }
