@@ -167,8 +167,8 @@ Event const *Playing::nearest(Call const &call, Json const &asked) const {
     if (event.part == *part_ && event.call == &call) {
       auto const different = differences(call, inputs_of(event), asked, holdings_, names_).size();
       // Of those that are alike, one that is still to be made.
-      bool const is_likelier =
-          different == fewest && ledger_.is_made(found->number) && !ledger_.is_made(event.number);
+      bool const is_likelier = found != nullptr && different == fewest &&
+                               ledger_.is_made(found->number) && !ledger_.is_made(event.number);
       if (different < fewest || is_likelier) {
         fewest = different;
         found = &event;

@@ -15,17 +15,17 @@ namespace {
 std::vector<std::string> const whole{
     R"({"vswitch trace": 1})",
     R"({"process": 7, "parent": 1})",
-    R"({"call": 1, "process": 7, "thread": 1, "function": "DVSState_SwitchForEach", )"
-    R"("in": {"callback": {"at": 1}, "context": null}})",
+    (R"({"call": 1, "process": 7, "thread": 1, "function": "DVSState_SwitchForEach", )"
+     R"("in": {"callback": {"at": 1}, "context": null}})"),
     R"({"callback": 2, "process": 7, "thread": 1, "within": 1, "in": {}})",
-    R"({"call": 3, "process": 7, "thread": 1, "within": 2, "function": "DVS_SwitchId", )"
-    R"("in": {"handle": {"at": 2}}})",
+    (R"({"call": 3, "process": 7, "thread": 1, "within": 2, "function": "DVS_SwitchId", )"
+     R"("in": {"handle": {"at": 2}}})"),
     R"({"end": 3, "process": 7, "result": "lab"})",
     R"({"end": 2, "process": 7, "result": 1})",
     R"({"end": 1, "process": 7})",
     R"({"process": 7, "parent": 1})",
-    R"({"call": 1, "process": 7, "thread": 2, "function": "VSDVS_SetMTU", )"
-    R"("in": {"switchName": "lab", "mtu": 9000}})",
+    (R"({"call": 1, "process": 7, "thread": 2, "function": "VSDVS_SetMTU", )"
+     R"("in": {"switchName": "lab", "mtu": 9000}})"),
 };
 
 std::string text_of(std::vector<std::string> const &lines) {
