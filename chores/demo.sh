@@ -4,12 +4,22 @@
 #@ demo   Build, then watch the command and tools at work on the simulated host
 #
 # Usage: ./dev demo [--python PATH] [--debug-python] [--no-fast-paths]
+#        ./dev demo frames
 #
 # Runs the command and the programs of examples/, each on a host of its own: tools to copy from, the
 # first steps underneath, records that a tool builds, and a tour through the whole host. The command
 # is for Debian's interpreter, whose packages it needs. With LD_LIBRARY_PATH set to the folder of
 # another host's libraries, only those run there that need no switch of the simulated host.
+#
+# With frames, real ones go between clients in network namespaces: a VLAN cuts and joins them, an
+# uplink fails while pings go on, and a mirror shows what another one sends. It takes root's rights
+# or user namespaces, and leaves nothing.
 cmd_demo() {
+  if [ "${1-}" = frames ]; then
+    shift
+    demo_frames "$@"
+    return
+  fi
   only_build_options "$@"
   [ -z "$sanitizers" ] || die "demo: --sanitize is for build and test"
   # shellcheck disable=SC2086 # a list of words
@@ -30,6 +40,15 @@ cmd_demo() {
   example first_steps
   example records
   [ -n "${LD_LIBRARY_PATH-}" ] || example tour
+}
+
+demo_frames() {
+  [ $# -eq 0 ] || die "demo: frames takes no options"
+  # shellcheck disable=SC2086 # a list of words
+  need $frame_packages
+  build
+  BUILD_DIR=$root/$folder PYTHONPATH=$root/$folder/python:$root/tests/simhostd \
+    "$python" tests/simhostd/frames_demo.py
 }
 
 # example NAME ARGUMENTS...: runs a program of examples/.

@@ -23,7 +23,7 @@ from vswitch.words import ABSENT, SYNONYMS, DocumentError, under
 Document = typing.Mapping[str, Any]
 
 # What scenario documents tell a simulated host, and no call tells any.
-_NO_CALL = {"clock", "faults", "groups", "counters", "mirror_counters", "stats"}
+_NO_CALL = {"clock", "faults", "groups", "counters", "mirror_counters", "stats", "device"}
 _FIXED = ("id", "portset", "max_ports", "version")
 _OF_SWITCH, _OF_MAC = NUMBERS["switches"], NUMBERS["addresses"]
 

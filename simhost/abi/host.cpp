@@ -82,6 +82,9 @@ storage::Store &Host::state() {
   }
   if (!state_) {
     state_.emplace(file, populate_fresh_host);
+    if (file) {
+      run_on(plane_.emplace(stored::plane(), file->location()));
+    }
   }
   return *state_;
 }

@@ -7,6 +7,7 @@
 #include "abi/data_lists.h"
 #include "abi/handles.h"
 #include "abi/ledger.h"
+#include "planes/openvswitch/caller/openvswitch_plane.h"
 #include "storage/store.h"
 
 namespace simhost {
@@ -24,6 +25,8 @@ class Host {
   std::optional<storage::StateFile> const &state_file();
   /// The state; opened on first use. Throws storage::UnusableState.
   storage::Store &state();
+  /// The plane of a state file that is open; null for a state in memory.
+  openvswitch::OpenVswitchPlane *find_openvswitch_plane() { return plane_ ? &*plane_ : nullptr; }
   /// Closes a state file; state() opens it again. A state in memory stays.
   void close_state_file();
 
@@ -35,6 +38,7 @@ class Host {
   bool configured_ = false;
   std::optional<storage::StateFile> state_file_;
   std::optional<storage::Store> state_;
+  std::optional<openvswitch::OpenVswitchPlane> plane_;
 };
 
 /// Lives as long as the process.

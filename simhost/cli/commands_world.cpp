@@ -113,6 +113,9 @@ void add_uplink(CLI::App &app) {
           "--driver", [given](bool loaded) { (*given)["driver"] = loaded; },
           "whether the driver of the card is loaded: true or false")
       ->check(one_of("true", "false"));
+  uplink->add_option_function<std::string>(
+      "--device", [given](std::string const &device) { (*given)["device"] = device; },
+      "the network device that it is, such as eth1; empty for none");
   uplink->footer(
       "Teams whose criteria look at it follow at once:\n"
       "  simhostctl uplink nic4 --beacons down --error-percent 12");

@@ -39,16 +39,22 @@ std::string joined(Json const &texts) {
 }
 
 Branch uplink_branch(Json const &uplink) {
+  auto const observed = uplink.value("observed", Json::object());
+  // What a device says of its link is observed, and told otherwise.
+  auto const &link = uplink.contains("link") ? uplink : observed;
   auto line = fmt::format("{:<10} link {}", uplink["name"].get<std::string>(),
-                          uplink["link"].get<std::string>());
-  if (uplink["admin"] == "down") {
+                          link["link"].get<std::string>());
+  if (link["admin"] == "down") {
     line += ", switched off";
   }
-  line += fmt::format(", {} Mbit/s {} duplex", uplink["speed"].get<std::uint32_t>(),
-                      uplink["duplex"].get<std::string>());
-  if (uplink.contains("observed")) {
-    line += fmt::format(", at {} of {}", uplink["observed"]["port"].get<std::string>(),
-                        uplink["observed"]["switch"].get<std::string>());
+  line += fmt::format(", {} Mbit/s {} duplex", link["speed"].get<std::uint32_t>(),
+                      link["duplex"].get<std::string>());
+  if (uplink.contains("device")) {
+    line += fmt::format(", device {}", uplink["device"].get<std::string>());
+  }
+  if (observed.contains("port")) {
+    line += fmt::format(", at {} of {}", observed["port"].get<std::string>(),
+                        observed["switch"].get<std::string>());
   } else {
     line += ", free";
   }

@@ -130,6 +130,10 @@ class Plane {
   /// What the host learned and counted goes; what is wired and configured stays.
   virtual void restart(storage::ChangingTransaction &transaction) = 0;
 
+  /// An uplink or a port is to have this network device. Refuses one that no frames can go through
+  /// (QEX_NOT_FOUND if it is not there); a plane without frames takes any.
+  virtual void check_device(storage::Transaction &transaction, std::string_view device) = 0;
+
   // Transactions.
 
   /// A transaction that changed the state is about to be committed. Refuses it, with the reason, if

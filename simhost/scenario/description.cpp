@@ -18,6 +18,7 @@
 #include "scenario/scenario.h"
 #include "scenario/settings.h"
 #include "scenario/texts.h"
+#include "storage/running/devices.h"
 #include "storage/store.h"
 
 namespace simhost::scenario {
@@ -41,15 +42,22 @@ double seconds(ClockTime time) {
 
 Json uplink_to_json(Transaction &transaction, storage::Uplink const &uplink) {
   Json described{{kName, uplink.name}};
+  Json observed = Json::object();
+  auto const device = storage::device_of(transaction, uplink.name);
+  if (device) {
+    described[keys::device] = device->name;
+  }
   if (auto *const wires = running_plane().find_wires()) {
     auto const link = wires->link_of(transaction, uplink.name);
-    add_members(described, kLinkMembers, &link);
+    add_members(device ? observed : described, kLinkMembers, &link);
   }
   if (uplink.port) {
     auto const port = get_port(transaction, *uplink.port);
-    described[std::string(kObserved)] = {
-        {"switch", storage::get_switch_row(transaction, port.switch_key).row.alias},
-        {"port", port.identifier}};
+    observed["switch"] = storage::get_switch_row(transaction, port.switch_key).row.alias;
+    observed["port"] = port.identifier;
+  }
+  if (!observed.empty()) {
+    described[std::string(kObserved)] = std::move(observed);
   }
   return described;
 }
@@ -90,6 +98,12 @@ Json counters_to_json(Transaction &transaction, CounterOwner const &owner) {
   return list;
 }
 
+Json device_to_json(storage::Device const &device) {
+  DeviceMembers const members{.name = device.name,
+                              .mac = device.mac ? mac_text(*device.mac) : std::string()};
+  return to_json(kPortDevice, &members);
+}
+
 Json port_to_json(Transaction &transaction, storage::Port const &port) {
   auto const owner = PropertyOwner::port(port.switch_key, port.number);
   Place const place{.switch_key = port.switch_key, .port = port.number};
@@ -97,6 +111,9 @@ Json port_to_json(Transaction &transaction, storage::Port const &port) {
       kPortMembers, PortMembers{.id = port.identifier,
                                 .external_id = storage::external_id_of(transaction, port.number)});
   describe_named(described, transaction, owner, SettingOwner::of_port);
+  if (auto const device = storage::device_of(transaction, port.number)) {
+    described[keys::device] = device_to_json(*device);
+  }
   described[keys::addresses] = addresses_to_json(transaction, place);
   described[keys::groups] = groups_to_json(transaction, port.number);
   described[keys::counters] =

@@ -22,6 +22,7 @@ inline constexpr char const *uplink_ports = "uplink_ports";
 inline constexpr char const *lags = "lags";
 inline constexpr char const *ports = "ports";
 inline constexpr char const *addresses = "addresses";
+inline constexpr char const *device = "device";
 inline constexpr char const *groups = "groups";
 inline constexpr char const *counters = "counters";
 inline constexpr char const *mirror_counters = "mirror_counters";
@@ -38,7 +39,7 @@ inline constexpr auto kSwitchParts = std::to_array<std::string_view>(
     {keys::uplink_ports, keys::uplinks, keys::lags, keys::addresses, keys::counters,
      keys::mirror_counters, keys::properties, keys::host_properties, keys::ports, kObserved});
 inline constexpr auto kPortParts = std::to_array<std::string_view>(
-    {keys::addresses, keys::groups, keys::counters, keys::properties, kObserved});
+    {keys::device, keys::addresses, keys::groups, keys::counters, keys::properties, kObserved});
 inline constexpr auto kUplinkPortParts =
     std::to_array<std::string_view>({keys::properties, kObserved});
 

@@ -115,6 +115,18 @@ inline constexpr std::array kPortMembers{
                  "what another system calls it"),
 };
 
+/// The network device of a port; an uplink's has no more than its name.
+struct DeviceMembers {
+  std::string name = {};
+  std::string mac = {};
+};
+inline constexpr std::string_view kMac = "mac";
+inline constexpr std::array kDeviceMembers{
+    form::sparse(kName, text_member<&DeviceMembers::name>(), "as Linux calls it; none if empty"),
+    form::sparse(kMac, text_member<&DeviceMembers::mac>(), "the address of its client"),
+};
+inline constexpr auto kPortDevice = form::record_or_first<DeviceMembers>(kDeviceMembers);
+
 struct UplinkPortMembers {
   std::string id = {};
   std::string uplink = {};

@@ -130,7 +130,7 @@ std::string reference() {
              {keys::switches, kSwitchParts},
              {keys::ports, kPortParts},
              {keys::uplink_ports, kUplinkPortParts},
-             {keys::uplinks, {kName, kObserved}}}}};
+             {keys::uplinks, {kName, keys::device, kObserved}}}}};
   for (auto const *const descriptor : descriptors()) {
     all["properties"].push_back(property_to_json(*descriptor));
   }

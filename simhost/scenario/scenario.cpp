@@ -7,6 +7,8 @@
 
 #include "clock/clock.h"
 #include "faults/faults.h"
+#include "model/devices/devices.h"
+#include "model/lookup.h"
 #include "model/options/host_settings.h"
 #include "model/options/runtime_options.h"
 #include "model/plane.h"
@@ -25,7 +27,7 @@ void apply_clock(ChangingTransaction &transaction, Node const &node) {
   auto const before = clock_members(transaction);
   auto const after = read_object(kClockMembers, node, before);
   if (after.stopped != before.stopped) {
-    after.stopped ? stop_clock(transaction) : run_clock(transaction);
+    after.stopped ? stop_clock_without_devices(transaction) : run_clock(transaction);
   }
   // A clock that runs has gone on meanwhile.
   if (node.find(kNow)) {
@@ -34,15 +36,27 @@ void apply_clock(ChangingTransaction &transaction, Node const &node) {
 }
 
 void apply_link(ChangingTransaction &transaction, std::string const &name, Node const &node) {
-  auto link = get_wires().link_of(transaction, name);
+  auto &wires = get_wires(transaction, name);
+  auto link = wires.link_of(transaction, name);
   read_members(kLinkMembers, node, &link);
-  get_wires().change_link(transaction, name, link);
+  wires.change_link(transaction, name, link);
+}
+
+// An empty name stands for none.
+void apply_device(ChangingTransaction &transaction, std::string const &name,
+                  std::string const &device) {
+  auto const uplink = get_uplink(transaction, name);
+  if (!device.empty()) {
+    connect(transaction, uplink, device);
+  } else if (storage::device_of(transaction, name)) {
+    disconnect(transaction, uplink);
+  }
 }
 
 void apply_uplink(ChangingTransaction &transaction, Node const &node) {
   auto const link_keys = names_of(kLinkMembers);
   auto keys = link_keys;
-  keys.insert(keys.end(), {kName, kObserved});
+  keys.insert(keys.end(), {kName, keys::device, kObserved});
   node.only(keys);
   auto const name = node.at(kName).text();
   if (name.empty() || name.size() >= QEX_MISC_NAME_MAX) {
@@ -54,6 +68,8 @@ void apply_uplink(ChangingTransaction &transaction, Node const &node) {
   if (std::ranges::any_of(link_keys, [&](auto key) { return node.find(key).has_value(); })) {
     apply_link(transaction, name, node);
   }
+  if_there(node, keys::device,
+           [&](Node const &device) { apply_device(transaction, name, device.text()); });
 }
 
 void apply_runtime_option(ChangingTransaction &transaction, std::string const &name,

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "model/counters/counters.h"
+#include "model/devices/devices.h"
 #include "model/lookup.h"
 #include "model/plane.h"
 #include "model/ports/ports.h"
@@ -72,9 +73,35 @@ void apply_counters(ChangingTransaction &transaction, CounterOwner const &owner,
 
 void apply_addresses(ChangingTransaction &transaction, Place const &place, Node const &node) {
   for_each_in(node, keys::addresses, [&](Node const &item) {
-    get_wires().describe_address(transaction, place,
-                                 read_object(kAddressMembers, item, new_address()));
+    auto const entry = read_object(kAddressMembers, item, new_address());
+    // Those of other types are settings, whatever the wires are.
+    auto &wires =
+        entry.macAddrType == VS_MAC_ADDR_TYPE_LEARNED ? get_wires(transaction, place) : get_wires();
+    wires.describe_address(transaction, place, entry);
   });
+}
+
+// The address of the client, if one is said.
+std::optional<storage::MacBytes> client_from(DeviceMembers const &said, Node const &node) {
+  if (said.mac.empty()) {
+    return std::nullopt;
+  }
+  auto const mac = mac_from(said.mac);
+  if (!mac) {
+    node.at(kMac).fail("must be six bytes such as 02:00:00:00:00:01");
+  }
+  return mac;
+}
+
+// An empty name stands for none.
+void apply_device(ChangingTransaction &transaction, storage::Port const &port, Node const &node) {
+  DeviceMembers said;
+  read(kPortDevice, node, &said);
+  if (!said.name.empty()) {
+    connect(transaction, port, said.name, client_from(said, node));
+  } else if (storage::device_of(transaction, port.number)) {
+    disconnect(transaction, port);
+  }
 }
 
 void apply_port(ChangingTransaction &transaction, storage::SwitchKey key, Node const &node) {
@@ -87,11 +114,16 @@ void apply_port(ChangingTransaction &transaction, storage::SwitchKey key, Node c
   if_there(node, kExternalId,
            [&](Node const &) { set_external_id(transaction, port, said.external_id); });
   apply_settings(transaction, owner, SettingOwner::of_port, node);
-  apply_addresses(transaction, {.switch_key = key, .port = port.number}, node);
+  Place const place{.switch_key = key, .port = port.number};
+  apply_addresses(transaction, place, node);
   for_each_in(node, keys::groups, [&](Node const &item) {
-    get_wires().join(transaction, port.number, read_object(kGroupMembers, item, McastGroup()));
+    get_wires(transaction, place)
+        .join(transaction, port.number, read_object(kGroupMembers, item, McastGroup()));
   });
   apply_counters(transaction, {.switch_key = key, .port = port.number}, node);
+  // Last, because what stands in for wires may be said of a port only while it has none.
+  if_there(node, keys::device,
+           [&](Node const &device) { apply_device(transaction, port, device); });
 }
 
 storage::SwitchKey made_switch(ChangingTransaction &transaction, storage::Switch const &wanted) {

@@ -21,18 +21,35 @@ HEADERS = {
     "faults": "faults/faults.h",
     "model": "model/plane.h",
     "planes/stored": "planes/stored/stored_plane.h",
+    "events": "events/loop.h",
     "planes/openvswitch/transport": "planes/openvswitch/transport/unix_stream.h",
     "planes/openvswitch/openflow": "planes/openvswitch/openflow/connection.h",
     "planes/openvswitch/ovsdb": "planes/openvswitch/ovsdb/client.h",
+    "planes/openvswitch/rows": "planes/openvswitch/rows/rows.h",
+    "planes/openvswitch/reconcile": "planes/openvswitch/reconcile/difference.h",
     "planes/openvswitch/compile": "planes/openvswitch/compile/compile.h",
     "planes/openvswitch/reading": "planes/openvswitch/reading/read_network.h",
-    "planes/openvswitch/reconcile": "planes/openvswitch/reconcile/difference.h",
-    "events": "events/loop.h",
     "planes/openvswitch/processes": "planes/openvswitch/processes/private_openvswitch.h",
+    "planes/openvswitch/line": "planes/openvswitch/line/line.h",
+    "planes/openvswitch/caller": "planes/openvswitch/caller/openvswitch_plane.h",
     "scenario": "scenario/scenario.h",
     "abi": "abi/host.h",
+    "daemon": "daemon/daemon.h",
     "cli": "cli/commands.h",
 }
+# What the plane of those who use a state that a daemon serves may use.
+CALLER = [
+    "base",
+    "storage",
+    "clock",
+    "model",
+    "events",
+    "planes/openvswitch/transport",
+    "planes/openvswitch/openflow",
+    "planes/openvswitch/compile",
+    "planes/openvswitch/reading",
+    "planes/openvswitch/line",
+]
 # What each may use.
 BELOW: Dict[str, List[str]] = {
     "base": [],
@@ -66,9 +83,17 @@ BELOW: Dict[str, List[str]] = {
         "planes/openvswitch/openflow",
         "planes/openvswitch/compile",
     ],
+    "planes/openvswitch/rows": [
+        "events",
+        "planes/openvswitch/transport",
+        "planes/openvswitch/ovsdb",
+    ],
     "planes/openvswitch/processes": ["events"],
+    "planes/openvswitch/line": ["events"],
+    "planes/openvswitch/caller": CALLER,
     "scenario": ["base", "storage", "clock", "faults", "model"],
-    "abi": ["base", "storage", "clock", "faults", "model", "planes/stored", "scenario"],
+    "abi": [*CALLER, "faults", "planes/stored", "planes/openvswitch/caller", "scenario"],
+    "daemon": [one for one in HEADERS if one not in ("daemon", "cli")],
     # Of the layers below, only what any program may use.
     "cli": [],
 }

@@ -16,8 +16,10 @@
 #include "clock/clock.h"
 #include "faults/faults.h"
 #include "model/counters/counters.h"
+#include "model/devices/devices.h"
 #include "model/lookup.h"
 #include "model/plane.h"
+#include "scenario/document.h"
 #include "scenario/lifecycle.h"
 #include "scenario/scenario.h"
 #include "scenario/texts.h"
@@ -101,16 +103,31 @@ void refuse_unlearned(Sighting sighting) {
   }
 }
 
-VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
-  auto const bytes = scenario::mac_from(mac);
+storage::MacBytes mac_from(std::string const &text) {
+  auto const bytes = scenario::mac_from(text);
   if (!bytes) {
-    throw Refused(QEX_INVALID_ADDRESS, "'" + mac + "' is no address such as 02:00:00:00:00:01");
+    throw Refused(QEX_INVALID_ADDRESS, "'" + text + "' is no address such as 02:00:00:00:00:01");
   }
+  return *bytes;
+}
+
+VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
+  auto const bytes = mac_from(mac);
   VSMACEntry source{};
-  std::memcpy(source.macAddress, bytes->data(), bytes->size());
+  std::memcpy(source.macAddress, bytes.data(), bytes.size());
   source.vid = vlan;
   source.vni = vni;
   return source;
+}
+
+std::string in_force_text(openvswitch::InForce const &found) {
+  auto const or_null = [](auto const &number) {
+    return number ? scenario::Json(*number) : scenario::Json();
+  };
+  scenario::Json const said{{"change", or_null(found.wanted)},
+                            {"in_force", or_null(found.done)},
+                            {"said", found.wanted ? scenario::Json(found.said) : scenario::Json()}};
+  return said.dump();
 }
 
 Fault fault_on(char const *function, uint32_t nth, uint32_t times) {
@@ -190,7 +207,8 @@ SIMHOST_API int64_t simhost_clock_now() {
 }
 
 SIMHOST_API int simhost_clock_stop() {
-  return changing([](storage::ChangingTransaction &transaction) { stop_clock(transaction); });
+  return changing(
+      [](storage::ChangingTransaction &transaction) { stop_clock_without_devices(transaction); });
 }
 
 SIMHOST_API int simhost_clock_run() {
@@ -212,11 +230,39 @@ SIMHOST_API int simhost_clock_set(int64_t milliseconds) {
 SIMHOST_API int simhost_set_link(char const *uplink, int up) {
   return changing([&](storage::ChangingTransaction &transaction) {
     auto const name = get_uplink(transaction, given(uplink)).name;
-    auto &wires = get_wires();
+    auto &wires = get_wires(transaction, name);
     auto link = wires.link_of(transaction, name);
     link.carrier = up != 0;
     wires.change_link(transaction, name, link);
   });
+}
+
+SIMHOST_API int simhost_connect(char const *switchName, char const *port, char const *device,
+                                char const *mac) {
+  return changing([&](storage::ChangingTransaction &transaction) {
+    auto const key = get_switch(transaction, given(switchName)).key;
+    auto const client = mac == nullptr ? std::nullopt : std::optional(mac_from(mac));
+    connect(transaction, get_port(transaction, key, given(port)), given(device), client);
+  });
+}
+
+SIMHOST_API int simhost_disconnect(char const *switchName, char const *port) {
+  return changing([&](storage::ChangingTransaction &transaction) {
+    auto const key = get_switch(transaction, given(switchName)).key;
+    disconnect(transaction, get_port(transaction, key, given(port)));
+  });
+}
+
+SIMHOST_API size_t simhost_plane(char *text, size_t size) {
+  size_t length = 0;
+  reading([&](storage::Transaction &transaction) {
+    openvswitch::InForce found;
+    if (auto *const plane = this_host().find_openvswitch_plane()) {
+      found = plane->in_force(transaction);
+    }
+    length = copy_out(in_force_text(found), text, size);
+  });
+  return length;
 }
 
 SIMHOST_API int simhost_learn(char const *switchName, char const *port, char const *mac,
@@ -224,8 +270,9 @@ SIMHOST_API int simhost_learn(char const *switchName, char const *port, char con
   auto sighting = Sighting::learned;
   auto const status = changing([&](storage::ChangingTransaction &transaction) {
     get_running_switch(transaction, given(switchName));
-    sighting = get_wires().learn(transaction, place_of(transaction, switchName, port),
-                                 source_of(given(mac), vlan, vni));
+    auto const place = place_of(transaction, switchName, port);
+    sighting =
+        get_wires(transaction, place).learn(transaction, place, source_of(given(mac), vlan, vni));
   });
   if (status != QEX_OK) {
     return status;

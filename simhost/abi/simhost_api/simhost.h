@@ -91,6 +91,28 @@ int simhost_learn(char const *switchName, char const *port, char const *mac, uin
 int simhost_set_counter(char const *switchName, char const *port, char const *session,
                         char const *name, uint64_t value);
 
+/* The devices through which real frames come and go. What has one is no longer told what comes over
+ * its wires: the functions above are QEX_NOT_SUPPORTED for it. */
+
+/**
+ * Gives a port a network device, in place of the one that it had.
+ *
+ * QEX_BUSY for a device that is somewhere else, QEX_INVALID_NAME for a name that none can have.
+ *
+ * @param device as Linux calls it
+ * @param mac the address of its client, six bytes in hexadecimal; null if it is not known
+ */
+int simhost_connect(char const *switchName, char const *port, char const *device, char const *mac);
+/**
+ * Tells what moves the frames, as an object in JSON: `change` is the number of the last change of
+ * the host, `in_force` that of the last one that frames obey, null while no daemon says so, and
+ * `said` what stands in the way. All are null while no daemon ever took the host: no frames move
+ * then. Parameters and result as of simhost_describe.
+ */
+size_t simhost_plane(char *text, size_t size);
+/** QEX_IS_DISCONNECTED for a port without a device. */
+int simhost_disconnect(char const *switchName, char const *port);
+
 /* Faults: what is to happen to calls of a function. `nth` is the first call that is hit, 1 for the
  * next; `times` is how many are, 0 for all that follow. Panic and QEX_ReturnStatusToString cannot
  * be hit. */

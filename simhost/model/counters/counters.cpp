@@ -6,6 +6,7 @@
 #include <algorithm>
 
 #include "base/outcomes.h"
+#include "model/devices/devices.h"
 #include "model/plane.h"
 #include "storage/store.h"
 
@@ -81,7 +82,8 @@ void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &
   if (value > counter->greatest) {
     throw Refused(QEX_BAD_PARAM, fmt::format("{} is above {}", value, counter->greatest));
   }
-  get_wires().set_counter(transaction, owner, *counter, value);
+  Place const place{.switch_key = owner.switch_key, .port = owner.port};
+  get_wires(transaction, place).set_counter(transaction, owner, *counter, value);
 }
 
 }  // namespace simhost

@@ -103,6 +103,8 @@ class StoredPlane : public Plane {
     storage::remove_counters(transaction);
   }
 
+  void check_device(storage::Transaction & /*transaction*/, std::string_view /*device*/) override {}
+
   // The state is all that is running: whatever it says, it says to whoever asks next.
   void prepare(storage::ChangingTransaction & /*transaction*/) override {}
   void committed() noexcept override {}

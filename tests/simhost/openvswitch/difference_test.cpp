@@ -7,6 +7,9 @@
 #include <random>
 #include <vector>
 
+#include "planes/openvswitch/openflow/text.h"
+#include "planes/openvswitch/reconcile/relearning.h"
+
 namespace {
 
 using simhost::openflow::Flow;
@@ -86,6 +89,60 @@ TEST(ADifference, LeavesWhatWasLearnedByWantedFlowsAlone) {
   // When nobody teaches it any more, it goes.
   EXPECT_THAT(difference(Flows{teaches, learned}, Groups{}, Flows{}, Groups{}).removed_flows,
               ElementsAre(teaches, learned));
+}
+
+Flow teacher(std::uint32_t out, std::uint16_t hard_timeout) {
+  auto teaches = flow(3, 1, 2);
+  Learn learn{.table = 6, .cookie = 7, .hard_timeout = hard_timeout, .specs = {}};
+  learn.specs.emplace_back(simhost::openflow::LearnedLoad{
+      .destination = simhost::openflow::whole(simhost::openflow::Field::reg6), .content = out});
+  teaches.actions = {learn};
+  return teaches;
+}
+
+TEST(ADifference, ForgetsWhatIsLearnedOtherwiseNow) {
+  auto const learned = flow(6, 9, 1, 7);
+  Flows const present{teacher(1, 300), learned};
+  auto const forgotten = [&](Flow const &wanted) {
+    return difference(present, Groups{}, Flows{wanted}, Groups{}).forgotten;
+  };
+  EXPECT_THAT(forgotten(teacher(2, 300)),
+              ElementsAre(simhost::openvswitch::LearnedFlows{.table = 6, .cookie = 7}));
+  // How long it stays makes it nothing else.
+  EXPECT_THAT(forgotten(teacher(1, 60)), IsEmpty());
+}
+
+TEST(WhatWasLearned, IsLearnedAnewAsItWouldBeNow) {
+  using simhost::openflow::Field;
+  using simhost::openvswitch::how_learned;
+  using simhost::openvswitch::relearned;
+  Learn learn{.table = 6, .priority = 5, .cookie = 7, .hard_timeout = 300, .specs = {}};
+  learn.specs.emplace_back(
+      simhost::openflow::LearnedMatch{.field = simhost::openflow::whole(Field::eth_dst),
+                                      .content = simhost::openflow::whole(Field::eth_src)});
+  learn.specs.emplace_back(
+      simhost::openflow::LearnedMatch{.field = simhost::openflow::part(Field::reg4, 0, 11),
+                                      .content = simhost::openflow::Value{7}});
+  learn.specs.emplace_back(
+      simhost::openflow::LearnedLoad{.destination = simhost::openflow::whole(Field::reg6),
+                                     .content = simhost::openflow::Value{3}});
+  Flow before;
+  before.match.with(Field::eth_dst, 0x020000000001).with(Field::reg4, 1, 0xfff);
+  auto const after = relearned(learn, before);
+  ASSERT_TRUE(after);
+  EXPECT_EQ(to_text(*after),
+            "cookie=0x7, table=6, hard_timeout=300, priority=5,reg4=0x7/0xfff,"
+            "dl_dst=02:00:00:00:00:01 actions=set_field:0x3->reg6");
+  // One that does not tell whom it is about tells too little.
+  EXPECT_FALSE(relearned(learn, Flow()));
+
+  auto teaches = flow(3, 1, 2);
+  teaches.actions = {learn};
+  Flows const one{teaches};
+  EXPECT_EQ(how_learned(one, {.table = 6, .cookie = 7}), learn);
+  EXPECT_FALSE(how_learned(one, {.table = 6, .cookie = 8}));
+  Flows const two{teaches, teaches};
+  EXPECT_FALSE(how_learned(two, {.table = 6, .cookie = 7}));
 }
 
 // A switch that does what it is told.

@@ -83,6 +83,11 @@ class FarPlane : public simhost::Plane {
   void restart(ChangingTransaction & /*transaction*/) override {
     told.push_back(told_or_refused(std::string("restart")));
   }
+  void check_device(Transaction & /*transaction*/, std::string_view device) override {
+    if (device == "gone0") {
+      throw Refused(QEX_NOT_FOUND, "there is no device gone0");
+    }
+  }
   void prepare(ChangingTransaction &transaction) override {
     if (!can_run) {
       throw Refused(QEX_NO_RESOURCES, "there are no more flows");

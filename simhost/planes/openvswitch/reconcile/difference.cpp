@@ -2,6 +2,7 @@
 #include "planes/openvswitch/reconcile/difference.h"
 
 #include <algorithm>
+#include <map>
 #include <set>
 #include <utility>
 #include <variant>
@@ -12,13 +13,15 @@ namespace {
 using openflow::Flow;
 using openflow::Group;
 
-// Where something is learned, and by which cookie it is known.
-using Learned = std::set<std::pair<std::uint8_t, std::uint64_t>>;
+using Specs = decltype(openflow::Learn::specs);
+// What is learned where, by the cookies that it is known by: how long it stays, and how much of it
+// there may be, makes it nothing else.
+using Learned = std::map<LearnedFlows, std::set<Specs>>;
 
 void add_learned(openflow::Actions const &actions, Learned &learned) {
   for (auto const &action : actions) {
     if (auto const *const learn = std::get_if<openflow::Learn>(&action)) {
-      learned.emplace(learn->table, learn->cookie);
+      learned[{.table = learn->table, .cookie = learn->cookie}].insert(learn->specs);
     } else if (auto const *const clone = std::get_if<openflow::Clone>(&action)) {
       add_learned(clone->actions, learned);
     }
@@ -31,6 +34,18 @@ Learned learned_by(std::span<Flow const> flows) {
     add_learned(flow.actions, learned);
   }
   return learned;
+}
+
+// What is learned now and was before, in another way.
+std::vector<LearnedFlows> learned_otherwise(Learned const &before, Learned const &after) {
+  std::vector<LearnedFlows> changed;
+  for (auto const &[flows, specs] : before) {
+    auto const found = after.find(flows);
+    if (found != after.end() && !std::ranges::includes(found->second, specs)) {
+      changed.push_back(flows);
+    }
+  }
+  return changed;
 }
 
 template <typename Value, typename Less>
@@ -74,8 +89,9 @@ bool differ_only_in_actions(Flow const &one, Flow const &other) {
 }  // namespace
 
 bool Difference::empty() const {
-  return added_groups.empty() && changed_groups.empty() && added_flows.empty() &&
-         changed_flows.empty() && removed_flows.empty() && removed_groups.empty();
+  return forgotten.empty() && added_groups.empty() && changed_groups.empty() &&
+         added_flows.empty() && changed_flows.empty() && removed_flows.empty() &&
+         removed_groups.empty();
 }
 
 Difference difference(std::span<Flow const> present_flows, std::span<Group const> present_groups,
@@ -92,11 +108,12 @@ Difference difference(std::span<Flow const> present_flows, std::span<Group const
         }
       });
   auto const learned = learned_by(wanted_flows);
+  all.forgotten = learned_otherwise(learned_by(present_flows), learned);
   side_by_side(
       present_flows, wanted_flows,
       [](Flow const &one, Flow const &other) { return place(one) < place(other); },
       [&](Flow const &flow) {
-        if (!learned.contains({flow.table, flow.cookie})) {
+        if (!learned.contains({.table = flow.table, .cookie = flow.cookie})) {
           all.removed_flows.push_back(flow);
         }
       },

@@ -2,6 +2,8 @@
 // what nobody wants changed stays with its counters.
 #pragma once
 
+#include <compare>
+#include <cstdint>
 #include <span>
 #include <vector>
 
@@ -10,8 +12,19 @@
 
 namespace simhost::openvswitch {
 
+/// All flows of a table that a cookie knows.
+struct LearnedFlows {
+  std::uint8_t table;
+  std::uint64_t cookie;
+
+  friend auto operator<=>(LearnedFlows const &, LearnedFlows const &) = default;
+};
+
 /// To be done in the order of the members, all of it or nothing.
 struct Difference {
+  /// What was learned by flows that teach otherwise now: it would stand in the way of what is to be
+  /// learned, or say what is no longer true.
+  std::vector<LearnedFlows> forgotten;
   std::vector<openflow::Group> added_groups;
   std::vector<openflow::Group> changed_groups;
   /// At places that have none, or one that is other than by its actions; that one goes.
@@ -24,9 +37,9 @@ struct Difference {
   [[nodiscard]] bool empty() const;
 };
 
-/// What the switch learned by a wanted flow stays: what is in the table of one of their Learn
-/// actions, with its cookie. No two flows of either list have one place, and no two groups one
-/// number.
+/// What the switch learned by a wanted flow that teaches as it did stays: what is in the table of
+/// one of their Learn actions, with its cookie. No two flows of either list have one place, and no
+/// two groups one number.
 Difference difference(std::span<openflow::Flow const> present_flows,
                       std::span<openflow::Group const> present_groups,
                       std::span<openflow::Flow const> wanted_flows,

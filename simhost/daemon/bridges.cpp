@@ -1,0 +1,284 @@
+// Reading what is there once for each connection, and telling no more than what differs.
+#include "daemon/bridges.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <iterator>
+#include <ranges>
+#include <stdexcept>
+#include <utility>
+
+#include "planes/openvswitch/compile/pipeline.h"
+#include "planes/openvswitch/ovsdb/configuration.h"
+#include "planes/openvswitch/reconcile/difference.h"
+#include "planes/openvswitch/reconcile/relearning.h"
+
+namespace simhost::daemon {
+namespace {
+
+using namespace std::chrono_literals;
+using openflow::Flow;
+using openflow::FlowCommand;
+using openflow::Group;
+using openflow::GroupCommand;
+using openvswitch::Deadline;
+
+constexpr auto kPatience = 5s;
+constexpr auto *kLock = "simhostd";
+
+Deadline soon() {
+  return Deadline::clock::now() + kPatience;
+}
+
+bool is_marker(Flow const &flow) {
+  return flow.table == openvswitch::table::kGeneration;
+}
+
+// In the order in which nothing refers to what is not there.
+openflow::Changes changes_of(openvswitch::Difference const &difference) {
+  openflow::Changes changes;
+  auto const change_group = [&](GroupCommand command, Group const &group) {
+    changes.emplace_back(openflow::GroupChange{.command = command, .group = group});
+  };
+  auto const change_flow = [&](FlowCommand command, Flow const &flow) {
+    changes.emplace_back(openflow::FlowChange{.command = command, .flow = flow});
+  };
+  for (auto const &[table, cookie] : difference.forgotten) {
+    Flow learned;
+    learned.table = table;
+    learned.cookie = cookie;
+    changes.emplace_back(openflow::FlowChange{
+        .command = FlowCommand::remove, .flow = learned, .cookie_mask = ~std::uint64_t{0}});
+  }
+  for (auto const &group : difference.added_groups) {
+    change_group(GroupCommand::add, group);
+  }
+  for (auto const &group : difference.changed_groups) {
+    change_group(GroupCommand::modify, group);
+  }
+  for (auto const &flow : difference.removed_flows) {
+    change_flow(FlowCommand::remove_strict, flow);
+  }
+  for (auto const &flow : difference.added_flows) {
+    change_flow(FlowCommand::add, flow);
+  }
+  for (auto const &flow : difference.changed_flows) {
+    change_flow(FlowCommand::modify_strict, flow);
+  }
+  for (auto const number : difference.removed_groups) {
+    change_group(GroupCommand::remove, {.id = number, .buckets = {}});
+  }
+  return changes;
+}
+
+std::size_t count_without_markers(openvswitch::Difference const &difference) {
+  auto const flows = [](std::vector<Flow> const &all) {
+    return static_cast<std::size_t>(
+        std::ranges::count_if(all, [](Flow const &flow) { return !is_marker(flow); }));
+  };
+  return difference.added_groups.size() + difference.changed_groups.size() +
+         difference.removed_groups.size() + flows(difference.added_flows) +
+         flows(difference.changed_flows) + flows(difference.removed_flows);
+}
+
+std::set<std::string> added_devices(openvswitch::PresentRows const &present,
+                                    std::vector<openvswitch::BridgeRow> const &wanted) {
+  std::set<std::string> added;
+  for (auto const &bridge : wanted) {
+    for (auto const &[device, number] : bridge.devices) {
+      added.insert(device);
+    }
+  }
+  for (auto const &bridge : present.bridges) {
+    for (auto const &[device, id] : bridge.ports) {
+      added.erase(device);
+    }
+  }
+  return added;
+}
+
+// A client need not speak before it is reached in another VLAN: who it is was learned already.
+void add_relearned(openflow::Connection &connection, WantedBridge const &wanted,
+                   openvswitch::Difference &difference, Deadline deadline) {
+  for (auto const &learned : difference.forgotten) {
+    auto const learn = openvswitch::how_learned(wanted.compiled.flows, learned);
+    if (!learn) {
+      continue;
+    }
+    for (auto const &entry : connection.flows(
+             {.table = learned.table, .cookie = learned.cookie, .cookie_mask = ~std::uint64_t{0}},
+             deadline)) {
+      if (auto flow = openvswitch::relearned(*learn, entry.flow)) {
+        difference.added_flows.push_back(std::move(*flow));
+      }
+    }
+  }
+}
+
+// Another client may have come with a device, with an address of its own.
+std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wanted,
+                                                       std::set<std::string> const &added) {
+  std::vector<openvswitch::LearnedFlows> forgotten;
+  for (auto const &[device, port] : wanted.ports) {
+    if (added.contains(device)) {
+      forgotten.push_back(
+          {.table = openvswitch::table::kFirstAddresses,
+           .cookie = openvswitch::cookie(openvswitch::Counted::first_address, port)});
+    }
+  }
+  return forgotten;
+}
+
+}  // namespace
+
+struct Bridges::Bridge {
+  Bridge(std::filesystem::path const &socket, Deadline deadline) : connection(socket, deadline) {}
+
+  openflow::Connection connection;
+  events::Loop::Watch watch;
+  std::vector<Flow> flows;
+  std::vector<Group> groups;
+};
+
+Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, Told told)
+    : loop_(loop),
+      folder_(socket.parent_path()),
+      told_(std::move(told)),
+      database_(socket, "Open_vSwitch", soon()) {
+  take_ownership();
+  ovsdb::Selected progress;
+  ovsdb::select_configuration(progress);
+  database_.monitor(progress, soon());
+  database_watch_ = loop_.watch(database_.fd(), [this] { read_database_events(); });
+}
+
+Bridges::~Bridges() = default;
+
+void Bridges::take_ownership() {
+  if (!database_.lock(kLock, soon())) {
+    auto const present =
+        openvswitch::present_rows(database_.transact(openvswitch::questions(), soon()), told_.host);
+    throw std::runtime_error(fmt::format("{} writes to this Open vSwitch",
+                                         present.owner.empty() ? "another one" : present.owner));
+  }
+}
+
+void Bridges::read_database_events() {
+  try {
+    database_.receive();
+    while (database_.next_event()) {
+    }
+  } catch (std::runtime_error const &) {
+    database_watch_.end();
+    told_.disturbed();
+  }
+}
+
+std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadline) {
+  auto const present =
+      openvswitch::present_rows(database_.transact(openvswitch::questions(), deadline), told_.host);
+  std::vector<openvswitch::BridgeRow> rows;
+  for (auto const &bridge : wanted.bridges) {
+    rows.push_back(bridge.row);
+  }
+  auto operations =
+      openvswitch::operations(present, rows, told_.host, told_.owner, wanted.most_tags);
+  auto added = added_devices(present, rows);
+  if (operations.empty()) {
+    return added;
+  }
+  ovsdb::raise_configuration(operations);
+  auto const number = ovsdb::raised_configuration(database_.transact(operations, deadline));
+  ovsdb::wait_for_configuration(database_, number, deadline);
+  return added;
+}
+
+Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadline) {
+  auto &bridge = bridges_[wanted.key];
+  if (bridge == nullptr) {
+    auto made = std::make_unique<Bridge>(folder_ / (wanted.row.name + ".mgmt"), deadline);
+    for (auto const &entry : made->connection.flows({}, deadline)) {
+      made->flows.push_back(entry.flow);
+    }
+    for (auto const &entry : made->connection.groups(deadline)) {
+      made->groups.push_back(entry.group);
+    }
+    bridge = std::move(made);
+    bridge->watch =
+        loop_.watch(bridge->connection.fd(), [this, raw = bridge.get()] { read_events(*raw); });
+  }
+  return *bridge;
+}
+
+void Bridges::read_events(Bridge &bridge) const {
+  try {
+    bridge.connection.receive();
+    while (bridge.connection.next_event()) {
+    }
+  } catch (std::runtime_error const &) {
+    bridge.watch.end();
+    told_.disturbed();
+  }
+}
+
+std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
+                                 Deadline deadline) {
+  auto &bridge = connected(wanted, deadline);
+  auto difference = openvswitch::difference(bridge.flows, bridge.groups, wanted.compiled.flows,
+                                            wanted.compiled.groups);
+  add_relearned(bridge.connection, wanted, difference, deadline);
+  std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
+  if (!difference.empty()) {
+    bridge.connection.change(changes_of(difference), deadline);
+    bridge.flows = wanted.compiled.flows;
+    bridge.groups = wanted.compiled.groups;
+  }
+  return count_without_markers(difference);
+}
+
+std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
+  std::vector<Learned> all;
+  auto const found = bridges_.find(key);
+  if (found == bridges_.end()) {
+    return all;
+  }
+  auto const entries =
+      found->second->connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon());
+  for (auto const &entry : entries) {
+    auto const &fields = entry.flow.match.fields();
+    auto const address = fields.find(openflow::Field::eth_dst);
+    auto const vlan = fields.find(openvswitch::field::kDomain);
+    if (address == fields.end() || vlan == fields.end()) {
+      continue;
+    }
+    Learned one{.address = {},
+                .vlan = static_cast<std::uint16_t>(vlan->second.value),
+                .port = static_cast<std::uint32_t>(entry.flow.cookie),
+                .age = static_cast<std::uint32_t>(
+                    std::chrono::duration_cast<std::chrono::seconds>(entry.age).count())};
+    auto left = address->second.value;
+    for (auto &byte : std::ranges::reverse_view(one.address)) {
+      byte = static_cast<std::uint8_t>(left);
+      left >>= 8U;
+    }
+    all.push_back(one);
+  }
+  return all;
+}
+
+std::size_t Bridges::apply(Wanted const &wanted) {
+  auto const deadline = soon();
+  auto const added = apply_rows(wanted, deadline);
+  std::erase_if(bridges_, [&](auto const &bridge) {
+    return std::ranges::none_of(wanted.bridges,
+                                [&](auto const &one) { return one.key == bridge.first; });
+  });
+  std::size_t changed = 0;
+  for (auto const &bridge : wanted.bridges) {
+    changed += apply_flows(bridge, added, deadline);
+  }
+  return changed;
+}
+
+}  // namespace simhost::daemon

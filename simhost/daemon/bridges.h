@@ -1,0 +1,74 @@
+// The bridges of an Open vSwitch, made as they are wanted: rows by its database, flows and groups
+// by a connection to each bridge.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <functional>
+#include <map>
+#include <memory>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "daemon/wanted.h"
+#include "events/loop.h"
+#include "planes/openvswitch/openflow/connection.h"
+#include "planes/openvswitch/ovsdb/client.h"
+
+namespace simhost::daemon {
+
+/// An address that a bridge has learned.
+struct Learned {
+  openflow::EthernetAddress address;
+  std::uint16_t vlan;
+  std::uint32_t port;  ///< its number in the state; 0 beyond the uplinks
+  std::uint32_t age;   ///< seconds
+};
+
+/// Whatever goes wrong with an Open vSwitch is thrown, and what is known of it is of no more use:
+/// its owner makes another one.
+class Bridges {
+ public:
+  struct Told {
+    std::string
+        owner;  ///< how this process is called in words, for another one that wants to write
+    std::string host;
+    /// Something changed that nobody here changed, or a connection ended.
+    std::function<void()> disturbed;
+  };
+
+  /// Connects to the database at `socket`; the sockets of bridges are beside it. Throws
+  /// std::runtime_error, which says who writes to the database if somebody else does.
+  Bridges(events::Loop &loop, std::filesystem::path const &socket, Told told);
+  ~Bridges();
+  Bridges(Bridges const &) = delete;
+  Bridges &operator=(Bridges const &) = delete;
+
+  /// Makes everything as it is wanted, and returns when it is in force. Returns how many flows and
+  /// groups it changed, markers not counted.
+  std::size_t apply(Wanted const &wanted);
+  /// What the bridge of a switch has learned.
+  std::vector<Learned> learned(storage::SwitchKey key);
+
+ private:
+  struct Bridge;
+
+  void take_ownership();
+  void read_database_events();
+  // Returns the devices that were put at bridges.
+  std::set<std::string> apply_rows(Wanted const &wanted, openvswitch::Deadline deadline);
+  std::size_t apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
+                          openvswitch::Deadline deadline);
+  Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
+  void read_events(Bridge &bridge) const;
+
+  events::Loop &loop_;
+  std::filesystem::path folder_;
+  Told told_;
+  ovsdb::Client database_;
+  events::Loop::Watch database_watch_;
+  std::map<storage::SwitchKey, std::unique_ptr<Bridge>> bridges_;
+};
+
+}  // namespace simhost::daemon

@@ -1,0 +1,221 @@
+// One look at the state and the devices at a time, however many told of a change meanwhile.
+#include "daemon/daemon.h"
+
+#include <fmt/format.h>
+#include <unistd.h>
+
+#include <utility>
+#include <vector>
+
+#include "abi/fresh_host.h"
+#include "daemon/links.h"
+#include "daemon/only_one.h"
+#include "daemon/wanted.h"
+#include "model/plane.h"
+#include "planes/stored/stored_plane.h"
+#include "storage/running/devices.h"
+#include "storage/running/frames.h"
+
+namespace simhost::daemon {
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr auto kBetweenAttempts = 50ms;
+
+std::filesystem::path beside(std::filesystem::path file, char const *suffix) {
+  file += suffix;
+  return file;
+}
+
+storage::Store opened(std::filesystem::path const &state) {
+  run_on(stored::plane());
+  return {state, populate_fresh_host};
+}
+
+}  // namespace
+
+Daemon::Daemon(events::Loop &loop, Options options, Say say)
+    : loop_(loop),
+      options_(std::move(options)),
+      say_(std::move(say)),
+      lock_(lock(beside(options_.state, "-simhostd.lock"))),
+      store_(opened(options_.state)),
+      host_(options_.state.string()),
+      state_watch_(loop, options_.state, [this] { sync_soon(); }),
+      device_watch_(loop, [this] { sync_soon(); }),
+      server_(loop, openvswitch::socket_of(options_.state),
+              [this](Json const &question, Reply const &reply) { handle(question, reply); }) {
+  storage::ChangingTransaction transaction(store_);
+  storage::take_frames(transaction);
+  transaction.commit();
+}
+
+void Daemon::connect() {
+  next_connect_.end();
+  bridges_.reset();
+  try {
+    bridges_.emplace(
+        loop_, options_.database,
+        Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
+                      .host = host_,
+                      .disturbed = [this] { connect_later(); }});
+    sync();
+  } catch (std::runtime_error const &error) {
+    fail(error.what());
+  }
+}
+
+void Daemon::connect_later() {
+  next_connect_ = loop_.after(kBetweenAttempts, [this] { connect(); });
+}
+
+void Daemon::fail(std::string const &why) {
+  bridges_.reset();
+  say_once(why);
+  connect_later();
+}
+
+void Daemon::say_once(std::string const &why) {
+  if (said_ != why) {
+    said_ = why;
+    say_(why);
+  }
+}
+
+void Daemon::sync_soon() {
+  if (!next_sync_) {
+    next_sync_ = loop_.after(0ms, [this] {
+      try {
+        sync();
+      } catch (std::runtime_error const &error) {
+        fail(error.what());
+      }
+    });
+  }
+}
+
+void Daemon::follow_devices() {
+  bool differ = false;
+  {
+    storage::ReadingTransaction transaction(store_);
+    switch_devices(transaction, [this](std::string const &why) { say_once(why); });
+    differ = links_differ(transaction);
+  }
+  if (differ) {
+    storage::ChangingTransaction transaction(store_);
+    put_links(transaction);
+    storage::advance_frames_change(transaction);
+    transaction.commit();
+  }
+}
+
+// A device that was made anew under its name has to be put at its bridge anew.
+bool Daemon::is_new_device(std::string const &device) {
+  auto const found = find_network_device(device);
+  auto const known = devices_.find(device);
+  return found && known != devices_.end() && known->second != found->index;
+}
+
+void Daemon::sync() {
+  if (!bridges_) {
+    return;
+  }
+  follow_devices();
+  storage::ReadingTransaction transaction(store_);
+  auto const is_there = [](std::string const &device) {
+    return find_network_device(device).has_value();
+  };
+  auto const all = wanted_of(transaction, host_, options_.datapath, is_there);
+  transaction.commit();
+  auto without_new = all;
+  bool has_new = false;
+  for (auto &bridge : without_new.bridges) {
+    has_new |= std::erase_if(bridge.row.devices,
+                             [&](auto const &device) { return is_new_device(device.first); }) > 0;
+  }
+  if (has_new) {
+    bridges_->apply(without_new);
+  }
+  auto const changed = bridges_->apply(all);
+  if (changed > 0) {
+    say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
+  }
+  settle(all);
+}
+
+void Daemon::settle(Wanted const &wanted) {
+  devices_.clear();
+  for (auto const &bridge : wanted.bridges) {
+    for (auto const &[device, number] : bridge.row.devices) {
+      if (auto const found = find_network_device(device)) {
+        devices_[device] = found->index;
+      }
+    }
+  }
+  in_force_ = wanted.change;
+  if (wanted.unfit.empty()) {
+    said_.clear();
+  }
+  for (auto const &unfit : wanted.unfit) {
+    say_once(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
+  }
+  reply_to_waiting();
+  if (auto const ready = std::exchange(ready_, nullptr)) {
+    ready();
+  }
+}
+
+void Daemon::reply_to_waiting() {
+  while (!waiting_.empty() && waiting_.begin()->first <= in_force_) {
+    waiting_.begin()->second({{"change", in_force_}});
+    waiting_.erase(waiting_.begin());
+  }
+}
+
+void Daemon::handle_in_force(std::uint64_t change, Reply const &reply) {
+  if (change <= in_force_) {
+    reply({{"change", in_force_}});
+    return;
+  }
+  waiting_.emplace(change, reply);
+  sync_soon();
+}
+
+Json Daemon::addresses(Json const &question) {
+  if (!bridges_) {
+    return {{"refused", "Open vSwitch cannot be reached: " + said_}};
+  }
+  auto const port = question.at("port").get<std::uint32_t>();
+  Json entries = Json::array();
+  for (auto const &one :
+       bridges_->learned(storage::SwitchKey{question.at("switch").get<std::int64_t>()})) {
+    if (one.port == port) {
+      entries.push_back({{"mac", one.address}, {"vlan", one.vlan}, {"age", one.age}});
+    }
+  }
+  return {{"addresses", entries}};
+}
+
+void Daemon::handle(Json const &question, Reply const &reply) {
+  try {
+    auto const what = question.at("ask").get<std::string>();
+    if (what == "in force") {
+      handle_in_force(question.at("change").get<std::uint64_t>(), reply);
+    } else if (what == "device") {
+      reply({{"there", find_network_device(question.at("name").get<std::string>()).has_value()}});
+    } else if (what == "addresses") {
+      reply(addresses(question));
+    } else if (what == "status") {
+      reply({{"change", in_force_}, {"said", said_}, {"process", getpid()}});
+    } else {
+      reply({{"refused", "nobody here knows '" + what + "'"}});
+    }
+  } catch (Json::exception const &) {
+    reply({{"refused", "that is no question"}});
+  } catch (std::runtime_error const &error) {
+    reply({{"refused", error.what()}});
+  }
+}
+
+}  // namespace simhost::daemon

@@ -1,0 +1,80 @@
+// The daemon of one state: it looks at what the state wants whenever somebody wrote to it, and
+// makes Open vSwitch so.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <functional>
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "daemon/bridges.h"
+#include "daemon/network_devices.h"
+#include "daemon/server.h"
+#include "daemon/state_watch.h"
+#include "events/loop.h"
+#include "storage/store.h"
+
+namespace simhost::daemon {
+
+struct Options {
+  std::filesystem::path state;
+  std::filesystem::path database;  ///< the socket of Open vSwitch's
+  std::string datapath;
+};
+
+/// For operators: one line for each thing that they may want to know.
+using Say = std::function<void(std::string const &)>;
+
+class Daemon {
+ public:
+  /// Opens the state, and becomes its daemon. Throws std::runtime_error if it has one.
+  Daemon(events::Loop &loop, Options options, Say say);
+
+  /// Open vSwitch is there, or there anew: connects to it.
+  void connect();
+  /// Done when what is wanted is in force for the first time.
+  void when_ready(std::function<void()> ready) { ready_ = std::move(ready); }
+
+ private:
+  struct Waiting {
+    Reply reply;
+    events::Loop::Timer too_late;
+  };
+
+  void connect_later();
+  void sync_soon();
+  void sync();
+  void follow_devices();
+  void settle(Wanted const &wanted);
+  void fail(std::string const &why);
+  void say_once(std::string const &why);
+  void reply_to_waiting();
+
+  void handle(Json const &question, Reply const &reply);
+  void handle_in_force(std::uint64_t change, Reply const &reply);
+  [[nodiscard]] Json addresses(Json const &question);
+  [[nodiscard]] bool is_new_device(std::string const &device);
+
+  events::Loop &loop_;
+  Options options_;
+  Say say_;
+  events::Descriptor lock_;
+  storage::Store store_;
+  std::string host_;
+  StateWatch state_watch_;
+  NetworkDeviceWatch device_watch_;
+  Server server_;
+  std::optional<Bridges> bridges_;
+  std::uint64_t in_force_ = 0;
+  std::string said_;                             // the last thing that stood in the way
+  std::map<std::string, unsigned> devices_;      // the index of each that is at a bridge
+  std::multimap<std::uint64_t, Reply> waiting_;  // for a change to be in force
+  std::function<void()> ready_;
+  events::Loop::Timer next_sync_;
+  events::Loop::Timer next_connect_;
+};
+
+}  // namespace simhost::daemon

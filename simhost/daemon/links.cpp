@@ -1,0 +1,96 @@
+// The plane without frames keeps the links, whoever they are told by.
+#include "daemon/links.h"
+
+#include <fmt/format.h>
+
+#include <system_error>
+#include <vector>
+
+#include "daemon/network_devices.h"
+#include "planes/stored/stored_plane.h"
+#include "storage/running/devices.h"
+#include "storage/running/links.h"
+
+namespace simhost::daemon {
+namespace {
+
+using storage::Link;
+
+// The link as it is in the state, with what the device says in place of it.
+Link link_by_device(Link link, std::string const &device) {
+  auto const found = find_network_device(device);
+  link.driver = found.has_value();
+  link.carrier = found && found->has_link;
+  if (found) {
+    link.full_duplex = found->full_duplex;
+    link.speed = found->speed.value_or(link.speed);
+  }
+  return link;
+}
+
+bool is_same(Link const &one, Link const &other) {
+  return one.carrier == other.carrier && one.driver == other.driver && one.speed == other.speed &&
+         one.full_duplex == other.full_duplex;
+}
+
+struct Changed {
+  std::string uplink;
+  Link link;
+};
+
+std::vector<Changed> changed_links(storage::Transaction &transaction) {
+  std::vector<Changed> changed;
+  for (auto const &uplink : storage::all_uplinks(transaction)) {
+    if (auto const device = storage::device_of(transaction, uplink.name)) {
+      auto const known = storage::find_link(transaction, uplink.name).value_or(Link{});
+      auto const link = link_by_device(known, device->name);
+      if (!is_same(link, known)) {
+        changed.push_back({.uplink = uplink.name, .link = link});
+      }
+    }
+  }
+  return changed;
+}
+
+void switch_to(std::string const &device, bool up,
+               std::function<void(std::string const &)> const &say) {
+  auto const found = find_network_device(device);
+  if (!found || found->is_up == up) {
+    return;
+  }
+  try {
+    switch_network_device(device, up);
+  } catch (std::system_error const &error) {
+    say(fmt::format("the device {} cannot be switched {}: {}", device, up ? "on" : "off",
+                    error.code().message()));
+  }
+}
+
+}  // namespace
+
+void switch_devices(storage::Transaction &transaction,
+                    std::function<void(std::string const &)> const &say) {
+  for (auto const &uplink : storage::all_uplinks(transaction)) {
+    if (auto const device = storage::device_of(transaction, uplink.name)) {
+      auto const link = storage::find_link(transaction, uplink.name).value_or(Link{});
+      switch_to(device->name, link.admin, say);
+    }
+  }
+  for (auto const &[key, row] : storage::all_switches(transaction)) {
+    for (auto const &[port, device] : storage::port_devices(transaction, key)) {
+      switch_to(device.name, true, say);
+    }
+  }
+}
+
+bool links_differ(storage::Transaction &transaction) {
+  return !changed_links(transaction).empty();
+}
+
+void put_links(storage::ChangingTransaction &transaction) {
+  for (auto const &[uplink, link] : changed_links(transaction)) {
+    stored::plane().find_wires()->change_link(transaction, uplink, link);
+  }
+}
+
+}  // namespace simhost::daemon

@@ -1,0 +1,21 @@
+// The links of uplinks that have a device: from the device to the state, so that whoever asks there
+// gets what is; and the host's own switch from the state to the device.
+#pragma once
+
+#include <functional>
+#include <string>
+
+#include "storage/store.h"
+
+namespace simhost::daemon {
+
+/// Switches devices of uplinks on or off as the state says, and devices of ports on. What cannot be
+/// switched is told.
+void switch_devices(storage::Transaction &transaction,
+                    std::function<void(std::string const &)> const &say);
+/// Whether a link in the state is not as its device is.
+bool links_differ(storage::Transaction &transaction);
+/// Puts them right, and lets the teams follow.
+void put_links(storage::ChangingTransaction &transaction);
+
+}  // namespace simhost::daemon

@@ -1,0 +1,45 @@
+// The daemon's end of the line to the processes that use its state.
+#pragma once
+
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <set>
+
+#include "events/loop.h"
+#include "planes/openvswitch/line/line.h"
+
+namespace simhost::daemon {
+
+using openvswitch::Json;
+
+/// Replies to a question, at once or later. The process that asked may be gone by then.
+using Reply = std::function<void(Json const &)>;
+
+class Server {
+ public:
+  using Handle = std::function<void(Json const &question, Reply const &reply)>;
+
+  /// Listens at `socket`, in place of a daemon that is gone. Throws std::runtime_error.
+  Server(events::Loop &loop, std::filesystem::path socket, Handle handle);
+  ~Server();
+  Server(Server const &) = delete;
+  Server &operator=(Server const &) = delete;
+
+ private:
+  struct Client;
+
+  void accept_one();
+  void read_from(std::shared_ptr<Client> const &client);
+  void handle(std::shared_ptr<Client> const &client, std::string const &line);
+
+  events::Loop &loop_;
+  std::filesystem::path path_;
+  Handle handle_;
+  events::Descriptor folder_;
+  events::Descriptor socket_;
+  events::Loop::Watch watch_;
+  std::set<std::shared_ptr<Client>> clients_;
+};
+
+}  // namespace simhost::daemon

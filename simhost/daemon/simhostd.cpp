@@ -1,0 +1,128 @@
+// simhostd: moves the frames of a simulated host through Open vSwitch.
+#include <fmt/chrono.h>
+#include <fmt/format.h>
+
+#include <CLI/CLI.hpp>
+#include <chrono>
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <exception>
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "daemon/daemon.h"
+#include "daemon/notify.h"
+#include "events/loop.h"
+#include "events/signals.h"
+#include "planes/openvswitch/processes/private_openvswitch.h"
+
+namespace simhost::daemon {
+namespace {
+
+using openvswitch::Datapath;
+using openvswitch::PrivateOpenVswitch;
+
+constexpr std::string_view kPrivate = "private:";
+constexpr std::string_view kUnix = "unix:";
+constexpr auto *kSystemSocket = "/var/run/openvswitch/db.sock";
+
+struct Words {
+  std::string state;
+  std::string openvswitch;
+  std::string datapath = "netdev";
+};
+
+// The journal has times of its own.
+void say(std::string const &text) {
+  if (std::getenv("JOURNAL_STREAM") == nullptr) {
+    auto const now = std::chrono::floor<std::chrono::seconds>(std::chrono::system_clock::now());
+    fmt::print(stderr, "{:%FT%TZ} ", fmt::gmtime(now));
+  }
+  fmt::print(stderr, "simhostd: {}\n", text);
+}
+
+void tell_ready(Words const &words) {
+  notify(fmt::format("READY=1\nSTATUS=moves the frames of {}", words.state));
+  fmt::print("ready\n");
+  std::fflush(stdout);
+}
+
+std::optional<std::filesystem::path> folder_of_own(Words const &words) {
+  if (words.openvswitch.starts_with(kPrivate)) {
+    return words.openvswitch.substr(kPrivate.size());
+  }
+  return std::nullopt;
+}
+
+std::filesystem::path socket_of(Words const &words) {
+  if (auto const folder = folder_of_own(words)) {
+    return std::filesystem::absolute(*folder) / "db.sock";
+  }
+  return words.openvswitch.starts_with(kUnix) ? words.openvswitch.substr(kUnix.size())
+                                              : std::string(kSystemSocket);
+}
+
+void serve(Words const &words) {
+  events::Loop loop;
+  events::Signals const signals(loop, {SIGTERM, SIGINT, SIGHUP}, [&](int number) {
+    if (number != SIGHUP) {
+      loop.stop();
+    }
+  });
+  Daemon daemon(loop,
+                {.state = std::filesystem::absolute(words.state),
+                 .database = socket_of(words),
+                 .datapath = words.datapath},
+                say);
+  daemon.when_ready([&] { tell_ready(words); });
+  // Ends before the daemon does.
+  std::optional<PrivateOpenVswitch> own;
+  if (auto const folder = folder_of_own(words)) {
+    own.emplace(loop, *folder, words.datapath == "netdev" ? Datapath::netdev : Datapath::system,
+                PrivateOpenVswitch::Told{.started = [&] { daemon.connect(); }, .said = say});
+    own->start();
+  } else {
+    daemon.connect();
+  }
+  loop.run();
+  notify("STOPPING=1");
+  say("ends");
+}
+
+std::string wrong_openvswitch(std::string const &text) {
+  bool const is_known = text == "system" ||
+                        (text.starts_with(kPrivate) && text.size() > kPrivate.size()) ||
+                        (text.starts_with(kUnix) && text.size() > kUnix.size());
+  return is_known ? std::string() : "must be private:DIR, system or unix:SOCKET";
+}
+
+int run(int count, char **given) {
+  CLI::App app("Moves the frames of a simulated host through Open vSwitch.", "simhostd");
+  Words words;
+  app.add_option("--state", words.state, "the file that holds the state of the host")->required();
+  app.add_option("--openvswitch", words.openvswitch,
+                 "private:DIR runs one of its own in DIR; system uses the one of the machine, and "
+                 "unix:SOCKET the one whose database listens there")
+      ->required()
+      ->check(wrong_openvswitch);
+  app.add_option("--datapath", words.datapath,
+                 "netdev moves frames in ovs-vswitchd, system in the kernel")
+      ->check(CLI::IsMember({"netdev", "system"}));
+  app.set_version_flag("--version", std::string("simhostd ") + SIMHOST_VERSION);
+  CLI11_PARSE(app, count, given);
+  serve(words);
+  return 0;
+}
+
+}  // namespace
+}  // namespace simhost::daemon
+
+int main(int count, char **words) try {
+  return simhost::daemon::run(count, words);
+} catch (std::exception const &error) {
+  fmt::print(stderr, "simhostd: {}\n", error.what());
+  return 1;
+}

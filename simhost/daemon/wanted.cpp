@@ -1,0 +1,90 @@
+// Reading and compiling one switch after the other.
+#include "daemon/wanted.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+
+#include "base/outcomes.h"
+#include "model/teaming/team.h"
+#include "planes/openvswitch/compile/pipeline.h"
+#include "planes/openvswitch/reading/read_network.h"
+#include "storage/running/devices.h"
+#include "storage/running/frames.h"
+#include "storage/running/links.h"
+#include "storage/store.h"
+
+namespace simhost::daemon {
+namespace {
+
+void add_devices(storage::Transaction &transaction, WantedBridge &bridge) {
+  for (auto const &[port, device] : storage::port_devices(transaction, bridge.key)) {
+    bridge.row.devices.emplace(device.name, device.number);
+    bridge.ports.emplace(device.name, static_cast<std::uint32_t>(port));
+  }
+  for (auto const &uplink : storage::uplinks_of(transaction, bridge.key)) {
+    if (auto const device = storage::device_of(transaction, uplink.name)) {
+      bridge.row.devices.emplace(device->name, device->number);
+    }
+  }
+}
+
+// Linux has room for fifteen bytes, and an alias may change.
+std::string bridge_name(std::string_view host, std::string const &identifier) {
+  auto const whole = fingerprint(fmt::format("{}/{}", host, identifier));
+  return fmt::format("vs{:012x}", whole >> 16U);
+}
+
+openvswitch::Compiled compiled(storage::Transaction &transaction, storage::SwitchKey key) {
+  auto const team =
+      teaming::team_of(transaction, key, [](storage::Transaction &from, std::string_view uplink) {
+        auto link = storage::find_link(from, uplink).value_or(storage::Link{});
+        // Whatever stands in for its wires, no frame comes or goes.
+        link.carrier = link.carrier && storage::device_of(from, uplink).has_value();
+        return link;
+      });
+  return openvswitch::compile(openvswitch::read_network(transaction, key, team, {}));
+}
+
+}  // namespace
+
+std::uint64_t fingerprint(std::string_view text) {
+  // FNV-1a.
+  std::uint64_t hash = 0xcbf29ce484222325;
+  for (auto const character : text) {
+    hash = (hash ^ static_cast<unsigned char>(character)) * 0x100000001b3;
+  }
+  return hash;
+}
+
+Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
+                 std::string const &datapath, IsThere const &is_there) {
+  Wanted wanted;
+  wanted.change = storage::frames_change(transaction).value_or(0);
+  for (auto const &[key, row] : storage::all_switches(transaction)) {
+    WantedBridge bridge{.key = key,
+                        .alias = row.alias,
+                        .row = {.name = bridge_name(host, row.identifier), .datapath = datapath},
+                        .ports = {},
+                        .compiled = {}};
+    add_devices(transaction, bridge);
+    if (!row.associated || bridge.row.devices.empty()) {
+      continue;
+    }
+    try {
+      bridge.compiled = compiled(transaction, key);
+      std::erase_if(bridge.row.devices,
+                    [&](auto const &device) { return !is_there(device.first); });
+      bridge.row.limits = {
+          {openvswitch::table::kLearnedAddresses, bridge.compiled.rows.most_learned}};
+      bridge.compiled.flows.push_back(openvswitch::generation_marker(wanted.change));
+      wanted.most_tags = std::max(wanted.most_tags, bridge.compiled.rows.most_tags);
+      wanted.bridges.push_back(std::move(bridge));
+    } catch (Refused const &refused) {
+      wanted.unfit.push_back({.alias = row.alias, .why = refused.what()});
+    }
+  }
+  return wanted;
+}
+
+}  // namespace simhost::daemon

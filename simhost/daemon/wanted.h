@@ -1,0 +1,48 @@
+// What a state wants of an Open vSwitch: a bridge for each switch that runs and has a device.
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <map>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "planes/openvswitch/compile/compile.h"
+#include "planes/openvswitch/rows/rows.h"
+#include "storage/ports.h"
+
+namespace simhost::daemon {
+
+struct WantedBridge {
+  storage::SwitchKey key;
+  std::string alias;
+  openvswitch::BridgeRow row;
+  std::map<std::string, std::uint32_t> ports;  ///< the numbers of those that devices are at
+  openvswitch::Compiled compiled;              ///< with the marker of the change
+};
+
+/// A switch that cannot be run as it is, and why.
+struct Unfit {
+  std::string alias;
+  std::string why;
+};
+
+struct Wanted {
+  std::uint64_t change = 0;
+  std::vector<WantedBridge> bridges;
+  std::vector<Unfit> unfit;
+  std::uint32_t most_tags = 0;
+};
+
+/// Whether a device can be put at a bridge.
+using IsThere = std::function<bool(std::string const &device)>;
+
+/// `host` tells the bridges of this host from those of others in one namespace.
+Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
+                 std::string const &datapath, IsThere const &is_there);
+
+/// A number that is another one for another text, as good as always.
+std::uint64_t fingerprint(std::string_view text);
+
+}  // namespace simhost::daemon

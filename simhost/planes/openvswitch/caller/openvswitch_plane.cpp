@@ -1,0 +1,234 @@
+// What the state knows is asked of the plane without frames, and the rest of the daemon.
+#include "planes/openvswitch/caller/openvswitch_plane.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <array>
+#include <cstring>
+#include <utility>
+
+#include "base/outcomes.h"
+#include "model/teaming/team.h"
+#include "planes/openvswitch/compile/compile.h"
+#include "planes/openvswitch/line/line.h"
+#include "planes/openvswitch/reading/read_network.h"
+#include "storage/running/devices.h"
+#include "storage/running/frames.h"
+#include "storage/store.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using namespace std::chrono_literals;
+
+// How long a call waits for its change to be in force, and for replies to its questions.
+constexpr auto kPatience = 2000ms;
+
+Json asked(std::filesystem::path const &file, Json const &question) {
+  try {
+    auto reply = ask(file, question, kPatience);
+    if (reply.contains("refused")) {
+      throw Refused(QEX_IO_ERROR, reply["refused"].get<std::string>());
+    }
+    return reply;
+  } catch (NoDaemon const &none) {
+    throw Refused(QEX_TIMEOUT, none.what());
+  } catch (Json::exception const &error) {
+    throw Refused(QEX_IO_ERROR,
+                  fmt::format("simhostd says what nobody understands: {}", error.what()));
+  }
+}
+
+// Six numbers of 0 to 255.
+void put_mac(Json const &said, VSMACEntry &entry) {
+  auto const bytes = said.get<std::array<std::uint8_t, sizeof entry.macAddress>>();
+  std::memcpy(entry.macAddress, bytes.data(), bytes.size());
+}
+
+std::vector<VSMACEntry> learned_in(Json const &said) {
+  std::vector<VSMACEntry> entries;
+  for (auto const &one : said) {
+    VSMACEntry entry{};
+    put_mac(one.at("mac"), entry);
+    entry.vid = one.at("vlan").get<std::uint16_t>();
+    entry.macAddrType = VS_MAC_ADDR_TYPE_LEARNED;
+    entry.aging = 1;
+    entry.elapsed = one.at("age").get<std::uint32_t>();
+    entries.push_back(entry);
+  }
+  return entries;
+}
+
+bool comes_before(VSMACEntry const &one, VSMACEntry const &other) {
+  auto const order = std::memcmp(one.macAddress, other.macAddress, sizeof one.macAddress);
+  return order != 0 ? order < 0 : one.vid < other.vid;
+}
+
+Json question_about(std::string_view what, Place const &place) {
+  return {{"ask", what},
+          {"switch", static_cast<std::int64_t>(place.switch_key)},
+          {"port", place.port ? static_cast<std::uint32_t>(*place.port) : 0}};
+}
+
+// Refuses what no flows can be made of.
+void check(storage::Transaction &transaction) {
+  auto const links = [](storage::Transaction &from, std::string_view uplink) {
+    return storage::find_link(from, uplink).value_or(Link{});
+  };
+  for (auto const &[key, row] : storage::all_switches(transaction)) {
+    if (row.associated && !storage::port_devices(transaction, key).empty()) {
+      auto const team = teaming::team_of(transaction, key, links);
+      static_cast<void>(compile(read_network(transaction, key, team, {})));
+    }
+  }
+}
+
+}  // namespace
+
+OpenVswitchPlane::OpenVswitchPlane(Plane &stored, std::filesystem::path file)
+    : stored_(stored), file_(std::move(file)) {}
+
+bool OpenVswitchPlane::has_frames(storage::Transaction &transaction, Place const &place) const {
+  if (!storage::frames_change(transaction)) {
+    return false;
+  }
+  if (place.port) {
+    return storage::device_of(transaction, *place.port).has_value();
+  }
+  auto const uplinks = storage::uplinks_of(transaction, place.switch_key);
+  return std::ranges::any_of(uplinks, [&](auto const &uplink) {
+    return storage::device_of(transaction, uplink.name).has_value();
+  });
+}
+
+bool OpenVswitchPlane::link_is_up(storage::Transaction &transaction, std::string_view uplink) {
+  return stored_.link_is_up(transaction, uplink);
+}
+
+bool OpenVswitchPlane::lacp_is_up(storage::Transaction &transaction, std::string_view uplink) {
+  return stored_.lacp_is_up(transaction, uplink);
+}
+
+std::string OpenVswitchPlane::team_uplink(storage::Transaction &transaction,
+                                          storage::Port const &port) {
+  return stored_.team_uplink(transaction, port);
+}
+
+std::vector<VSMACEntry> OpenVswitchPlane::addresses(storage::Transaction &transaction,
+                                                    Place const &place, VSMACAddrType type) {
+  auto entries = stored_.addresses(transaction, place, type);
+  bool const asks_for_learned = type == VS_MAC_ADDR_TYPE_LEARNED || type == VS_MAC_ADDR_TYPE_ALL;
+  if (asks_for_learned && has_frames(transaction, place)) {
+    auto const reply = asked(file_, question_about("addresses", place));
+    for (auto const &entry : learned_in(reply.at("addresses"))) {
+      entries.push_back(entry);
+    }
+    std::ranges::sort(entries, comes_before);
+  }
+  return entries;
+}
+
+VSPMACLearningStats OpenVswitchPlane::learning_stats(storage::Transaction &transaction,
+                                                     Place const &place) {
+  auto stats = stored_.learning_stats(transaction, place);
+  if (has_frames(transaction, place)) {
+    auto const reply = asked(file_, question_about("addresses", place));
+    stats.numMACsLearned = static_cast<std::uint32_t>(reply.at("addresses").size());
+  }
+  return stats;
+}
+
+std::vector<AddressBytes> OpenVswitchPlane::groups(storage::Transaction &transaction,
+                                                   storage::PortNumber port, std::size_t length) {
+  return stored_.groups(transaction, port, length);
+}
+
+std::optional<McastGroup> OpenVswitchPlane::group(storage::Transaction &transaction,
+                                                  storage::PortNumber port,
+                                                  AddressBytes const &address) {
+  return stored_.group(transaction, port, address);
+}
+
+Counters OpenVswitchPlane::counters(storage::Transaction &transaction, CounterOwner const &owner) {
+  return stored_.counters(transaction, owner);
+}
+
+std::vector<std::string> OpenVswitchPlane::counting_sessions(storage::Transaction &transaction,
+                                                             storage::SwitchKey key) {
+  return stored_.counting_sessions(transaction, key);
+}
+
+void OpenVswitchPlane::set_admin_state(storage::ChangingTransaction &transaction,
+                                       std::string_view uplink, bool up) {
+  stored_.set_admin_state(transaction, uplink, up);
+}
+
+void OpenVswitchPlane::put_address(storage::ChangingTransaction &transaction, Place const &place,
+                                   VSMACEntry const &entry) {
+  stored_.put_address(transaction, place, entry);
+}
+
+void OpenVswitchPlane::remove_address(storage::ChangingTransaction &transaction, Place const &place,
+                                      VSMACEntry const &entry) {
+  stored_.remove_address(transaction, place, entry);
+}
+
+void OpenVswitchPlane::restart(storage::ChangingTransaction &transaction) {
+  stored_.restart(transaction);
+}
+
+void OpenVswitchPlane::check_device(storage::Transaction &transaction, std::string_view device) {
+  if (!storage::frames_change(transaction)) {
+    return;
+  }
+  try {
+    auto const reply = ask(file_, {{"ask", "device"}, {"name", device}}, kPatience);
+    if (!reply.value("there", true)) {
+      throw Refused(QEX_NOT_FOUND, fmt::format("simhostd sees no device {}", device));
+    }
+  } catch (NoDaemon const &) {
+    // It is looked for when a daemon is there.
+  }
+}
+
+void OpenVswitchPlane::prepare(storage::ChangingTransaction &transaction) {
+  prepared_.reset();
+  if (!storage::frames_change(transaction)) {
+    return;
+  }
+  check(transaction);
+  storage::advance_frames_change(transaction);
+  prepared_ = storage::frames_change(transaction);
+}
+
+void OpenVswitchPlane::committed() noexcept {
+  if (!prepared_) {
+    return;
+  }
+  try {
+    ask(file_, {{"ask", "in force"}, {"change", *prepared_}}, kPatience);
+  } catch (std::exception const &) {
+    // It is pending then, which those who ask are told.
+  }
+}
+
+Wires *OpenVswitchPlane::find_wires() {
+  return stored_.find_wires();
+}
+
+InForce OpenVswitchPlane::in_force(storage::Transaction &transaction) {
+  InForce all{.wanted = storage::frames_change(transaction), .done = std::nullopt, .said = {}};
+  if (all.wanted) {
+    try {
+      auto const reply = ask(file_, {{"ask", "status"}}, kPatience);
+      all.done = reply.at("change").get<std::uint64_t>();
+      all.said = reply.at("said").get<std::string>();
+    } catch (std::exception const &error) {
+      all.said = error.what();
+    }
+  }
+  return all;
+}
+
+}  // namespace simhost::openvswitch

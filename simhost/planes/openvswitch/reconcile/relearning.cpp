@@ -1,0 +1,78 @@
+// What a frame said is what the flow that was learned of it matches.
+#include "planes/openvswitch/reconcile/relearning.h"
+
+#include <variant>
+
+namespace simhost::openvswitch {
+namespace {
+
+using openflow::Flow;
+using openflow::Learn;
+using openflow::Value;
+
+void add_ways(openflow::Actions const &actions, LearnedFlows const &learned,
+              std::vector<Learn> &ways) {
+  for (auto const &action : actions) {
+    if (auto const *const learn = std::get_if<Learn>(&action)) {
+      if (learn->table == learned.table && learn->cookie == learned.cookie) {
+        ways.push_back(*learn);
+      }
+    } else if (auto const *const clone = std::get_if<openflow::Clone>(&action)) {
+      add_ways(clone->actions, learned, ways);
+    }
+  }
+}
+
+bool add(openflow::LearnedMatch const &spec, Flow const &before, Flow &flow) {
+  if (auto const *const number = std::get_if<Value>(&spec.content)) {
+    flow.match.with(spec.field.field, *number << spec.field.first,
+                    openflow::ones(spec.field.bits) << spec.field.first);
+    return true;
+  }
+  auto const found = before.match.fields().find(spec.field.field);
+  if (found == before.match.fields().end()) {
+    return false;
+  }
+  flow.match.with(found->first, found->second.value, found->second.mask);
+  return true;
+}
+
+bool add(openflow::LearnedLoad const &spec, Flow const & /*before*/, Flow &flow) {
+  auto const *const number = std::get_if<Value>(&spec.content);
+  if (number != nullptr) {
+    flow.actions.emplace_back(openflow::load(spec.destination, *number));
+  }
+  return number != nullptr;
+}
+
+bool add(openflow::LearnedOutput const & /*spec*/, Flow const & /*before*/, Flow & /*flow*/) {
+  return false;
+}
+
+}  // namespace
+
+std::optional<Learn> how_learned(std::span<Flow const> flows, LearnedFlows const &learned) {
+  std::vector<Learn> ways;
+  for (auto const &flow : flows) {
+    add_ways(flow.actions, learned, ways);
+  }
+  return ways.size() == 1 ? std::optional(ways.front()) : std::nullopt;
+}
+
+std::optional<Flow> relearned(Learn const &learn, Flow const &before) {
+  Flow flow;
+  flow.table = learn.table;
+  flow.priority = learn.priority;
+  flow.cookie = learn.cookie;
+  flow.idle_timeout = learn.idle_timeout;
+  flow.hard_timeout = learn.hard_timeout;
+  flow.tells_removal = learn.tells_removal;
+  for (auto const &spec : learn.specs) {
+    if (!std::visit([&](auto const &one) { return add(one, before, flow); }, spec)) {
+      return std::nullopt;
+    }
+  }
+  return flow;
+}
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,55 @@
+// The rows of Open vSwitch's database that are this host's: bridges and the devices at them. What
+// is asked for, read from replies, and told, as operations of the OVSDB protocol (RFC 7047).
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "planes/openvswitch/ovsdb/json.h"
+
+namespace simhost::openvswitch {
+
+using ovsdb::Json;
+
+struct BridgeRow {
+  std::string name;      ///< unique among all bridges
+  std::string datapath;  ///< "netdev" or "system"
+  /// Devices by their names, and the OpenFlow port that each has.
+  std::map<std::string, std::uint16_t> devices = {};
+  /// How many flows each of these tables may have; the switch learns no more.
+  std::map<std::uint8_t, std::uint32_t> limits = {};
+
+  bool operator==(BridgeRow const &) const = default;
+};
+
+/// One that is there, with how the database knows its parts.
+struct PresentBridge {
+  std::string id;
+  BridgeRow row;
+  std::map<std::string, std::string> ports;  ///< identifiers of the rows, by device
+};
+
+/// What of a whole database is this host's, and what all hosts have in common.
+struct PresentRows {
+  bool is_new = true;  ///< without the one row of Open_vSwitch that each has
+  std::vector<PresentBridge> bridges;
+  std::string owner;            ///< who writes them; empty if nobody does
+  std::uint32_t most_tags = 0;  ///< of the frames that the switch tells apart
+};
+
+/// Asks for what present_rows() reads.
+Json questions();
+/// Of the replies to them; the bridges are those of `host`. Throws std::runtime_error for what is
+/// no such reply.
+PresentRows present_rows(Json const &replies, std::string_view host);
+
+/// Makes the present ones as they are wanted; none for those that are so already. `owner` is who
+/// tells, in words.
+Json operations(PresentRows const &present, std::span<BridgeRow const> wanted,
+                std::string_view host, std::string_view owner, std::uint32_t most_tags);
+
+}  // namespace simhost::openvswitch

@@ -1,0 +1,122 @@
+// From what a database holds to what it is told, and no further.
+#include "planes/openvswitch/rows/rows.h"
+
+#include <gmock/gmock.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+using simhost::openvswitch::BridgeRow;
+using simhost::openvswitch::Json;
+using simhost::openvswitch::operations;
+using simhost::openvswitch::present_rows;
+using simhost::openvswitch::PresentRows;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::SizeIs;
+
+constexpr auto *kHost = "/h.db";
+constexpr auto *kOwner = "simhostd of /h.db, process 7";
+using Rows = std::vector<BridgeRow>;
+
+// As a database replies that has a bridge of this host with the device c1, and one of nobody's.
+Json replies() {
+  return Json::parse(R"json([
+    {"rows": [{"_uuid": ["uuid", "o"],
+               "external_ids": ["map", [["simhostd", "simhostd of /h.db, process 7"]]],
+               "other_config": ["map", [["vlan-limit", "2"]]]}]},
+    {"rows": [{"_uuid": ["uuid", "b1"], "name": "vs1", "datapath_type": "netdev",
+               "ports": ["set", [["uuid", "p0"], ["uuid", "p1"]]],
+               "external_ids": ["map", [["simhost", "/h.db"]]],
+               "flow_tables": ["map", [[32, ["uuid", "t"]]]]},
+              {"_uuid": ["uuid", "b2"], "name": "br0", "datapath_type": "",
+               "ports": ["set", []], "external_ids": ["map", []], "flow_tables": ["map", []]}]},
+    {"rows": [{"_uuid": ["uuid", "p0"], "name": "vs1", "interfaces": ["uuid", "i0"]},
+              {"_uuid": ["uuid", "p1"], "name": "c1", "interfaces": ["uuid", "i1"]}]},
+    {"rows": [{"_uuid": ["uuid", "i0"], "name": "vs1", "ofport_request": ["set", []]},
+              {"_uuid": ["uuid", "i1"], "name": "c1", "ofport_request": 5}]},
+    {"rows": [{"_uuid": ["uuid", "t"], "flow_limit": 100}]}
+  ])json");
+}
+
+BridgeRow vs1() {
+  return {.name = "vs1", .datapath = "netdev", .devices = {{"c1", 5}}, .limits = {{32, 100}}};
+}
+
+std::vector<std::string> told(PresentRows const &present, Rows const &wanted) {
+  std::vector<std::string> all;
+  for (auto const &operation : operations(present, wanted, kHost, kOwner, 2)) {
+    all.push_back(operation["op"].get<std::string>() + " " + operation["table"].get<std::string>());
+  }
+  return all;
+}
+
+TEST(TheRows, OfThisHostAreReadAndNoOthers) {
+  auto const present = present_rows(replies(), kHost);
+  ASSERT_THAT(present.bridges, SizeIs(1));
+  EXPECT_EQ(present.bridges[0].row, vs1());
+  EXPECT_EQ(present.owner, kOwner);
+  EXPECT_EQ(present.most_tags, 2U);
+  EXPECT_FALSE(present.is_new);
+  EXPECT_THAT(present_rows(replies(), "/other.db").bridges, SizeIs(0));
+}
+
+TEST(TheRows, ThatAreAsTheyAreWantedAreLeftAlone) {
+  EXPECT_THAT(told(present_rows(replies(), kHost), {vs1()}), SizeIs(0));
+}
+
+TEST(TheRows, ChangeInPlace) {
+  auto const present = present_rows(replies(), kHost);
+  auto more = vs1();
+  more.devices["c2"] = 6;
+  EXPECT_THAT(told(present, {more}),
+              ElementsAre("insert Interface", "insert Port", "mutate Bridge"));
+  auto fewer = vs1();
+  fewer.devices.clear();
+  EXPECT_THAT(told(present, {fewer}), ElementsAre("mutate Bridge"));
+  // A device whose number is another is put at the bridge anew.
+  auto renumbered = vs1();
+  renumbered.devices["c1"] = 9;
+  auto const all = operations(present, Rows{renumbered}, kHost, kOwner, 2);
+  EXPECT_EQ(all[0]["row"]["ofport_request"], 9);
+  EXPECT_THAT(all[2]["mutations"].dump(),
+              HasSubstr(R"(["ports","delete",["set",[["uuid","p1"]]])"));
+  auto limited = vs1();
+  limited.limits[32] = 7;
+  EXPECT_THAT(told(present, {limited}), ElementsAre("insert Flow_Table", "update Bridge"));
+}
+
+TEST(TheRows, OfBridgesThatNobodyWantsGoWithAllThatIsTheirs) {
+  EXPECT_THAT(told(present_rows(replies(), kHost), {}), ElementsAre("mutate Open_vSwitch"));
+}
+
+TEST(TheRows, OfABridgeWithAnotherDataPathAreMadeAnew) {
+  auto other = vs1();
+  other.datapath = "system";
+  auto const all = told(present_rows(replies(), kHost), {other});
+  EXPECT_THAT(all, testing::Contains("insert Bridge"));
+  EXPECT_EQ(all.back(), "mutate Open_vSwitch");
+}
+
+TEST(TheRows, OfANewDatabaseBeginWithItsOnlyRow) {
+  auto const present = present_rows(
+      Json::parse(R"([{"rows": []}, {"rows": []}, {"rows": []}, {"rows": []}, {"rows": []}])"),
+      kHost);
+  EXPECT_TRUE(present.is_new);
+  EXPECT_EQ(told(present, {vs1()}).front(), "insert Open_vSwitch");
+}
+
+TEST(TheRows, ThatAreNoneAreRefusedInWords) {
+  for (auto const *said : {"[]", R"([{"rows": 1}])", R"([{"rows": [{}]}])", "[1, 2]"}) {
+    try {
+      present_rows(Json::parse(said), kHost);
+      ADD_FAILURE() << said;
+    } catch (std::runtime_error const &error) {
+      EXPECT_THAT(error.what(), HasSubstr("Open vSwitch's database"));
+    }
+  }
+}
+
+}  // namespace

@@ -1,0 +1,169 @@
+"""Frames go on, or come back, whatever ends; configuration and counters stay as they are."""
+
+import os
+import re
+import signal
+import subprocess
+from typing import Dict, List
+
+import pytest
+
+from frame_lab import Lab
+
+
+def test_without_a_daemon_changes_are_pending(idle: Lab) -> None:
+    assert idle.plane() == {"change": None, "in_force": None, "said": None}
+    idle.start()
+    one, other = idle.client("lab", "a"), idle.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    idle.stop()
+    before = idle.plane()["change"]
+    idle.set_port("lab", "a", vlan=7)
+    plane = idle.plane()
+    assert plane["change"] == before + 1 and plane["in_force"] is None
+    assert "no simhostd" in plane["said"]
+    assert f"change {before + 1} is pending: no simhostd" in idle.ctl("plane")
+    idle.start()
+    assert idle.plane()["in_force"] == before + 1
+    assert not one.reaches(other)
+    idle.set_port("lab", "b", vlan=7)
+    assert one.reaches(other, attempts=5)
+
+
+@pytest.mark.parametrize("program", ["ovs-vswitchd", "ovsdb-server"])
+def test_either_process_of_open_vswitch_may_be_killed(lab: Lab, program: str) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    lab.set_port("lab", "a", vlan=7)
+    lab.set_port("lab", "b", vlan=7)
+    assert one.reaches(other, attempts=5)
+    os.kill(lab.processes()[program], signal.SIGKILL)
+    assert one.comes_to_reach(other)
+    assert f"{program} was ended by signal 9" in lab.log()
+    lab.set_port("lab", "b", vlan=8)
+    assert not one.reaches(other)
+
+
+def test_a_killed_daemon_leaves_nothing_running_and_another_takes_over(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    lab.stop(signal.SIGKILL)
+    lab.start()
+    assert len(lab.processes()) == 2
+    assert one.comes_to_reach(other)
+    lab.stop()
+    assert not lab.processes()
+
+
+def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> None:
+    with OpenVSwitch(idle):
+        where = f"unix:{idle.run_folder()}/db.sock"
+        idle.start(where)
+        one, other = idle.client("lab", "a"), idle.client("lab", "b")
+        assert one.reaches(other, attempts=5)
+        idle.stop()
+        # Frames go on without it, and count.
+        assert one.reaches(other, attempts=5)
+        said, before = idle.log(), counted(idle)
+        idle.start(where)
+        assert "in force" not in idle.log().replace(said, "")
+        kept(before, counted(idle))
+        # An unrelated change leaves what was counted and learned alone.
+        idle.set_port("lab", "c", vlan=9)
+        kept(before, counted(idle))
+        assert one.reaches(other, attempts=5)
+
+
+def counted(lab: Lab) -> Dict[str, int]:
+    """How many frames each flow counted, but for the one that says which change is in force."""
+    found = (re.fullmatch(r"(.*), n_packets=(\d+), n_bytes=\d+(.*)", one) for one in lab.flows())
+    flows = {one.group(1) + one.group(3): int(one.group(2)) for one in found if one}
+    return {flow: count for flow, count in flows.items() if "table=250" not in flow}
+
+
+def kept(before: Dict[str, int], after: Dict[str, int]) -> None:
+    assert before.keys() == after.keys()
+    assert any(before.values())
+    assert all(after[flow] >= count for flow, count in before.items())
+
+
+class OpenVSwitch:
+    """One that no daemon started, in the lab's run folder."""
+
+    def __init__(self, lab: Lab) -> None:
+        self._lab = lab
+        self._processes: List["subprocess.Popen[str]"] = []
+
+    def __enter__(self) -> None:
+        folder = self._lab.run_folder()
+        folder.mkdir()
+        database, schema = f"{folder}/conf.db", "/usr/share/openvswitch/vswitch.ovsschema"
+        subprocess.run(["ovsdb-tool", "create", database, schema], check=True)
+        socket = f"{folder}/db.sock"
+        self._start("ovsdb-server", database, f"--remote=punix:{socket}")
+        while not os.path.exists(socket):
+            assert self._processes[0].poll() is None
+        self._start("ovs-vswitchd", f"unix:{socket}", "--disable-system")
+
+    def _start(self, program: str, *words: str) -> None:
+        folder = str(self._lab.run_folder())
+        options = [f"--unixctl={folder}/{program}.ctl", f"--log-file={folder}/{program}.log"]
+        environment = {**os.environ, "OVS_RUNDIR": folder}
+        self._processes.append(
+            self._lab.host.start(
+                program, "-vconsole:off", "-vsyslog:off", *words, *options, env=environment
+            )
+        )
+
+    def __exit__(self, *_: object) -> None:
+        for process in reversed(self._processes):
+            process.kill()
+            process.communicate()
+
+
+def test_a_second_daemon_says_who_is_there(idle: Lab) -> None:
+    with OpenVSwitch(idle):
+        where = f"unix:{idle.run_folder()}/db.sock"
+        idle.start(where)
+        assert idle.daemon is not None
+        second = idle.simhostd(where, stderr=subprocess.PIPE)
+        _, said = second.communicate()
+        assert second.returncode == 1
+        assert said == (f"simhostd: the process {idle.daemon.pid} has {idle.state}-simhostd.lock\n")
+
+
+def test_a_device_may_vanish_and_return(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    lab.host.run("ip", "link", "delete", "c1")
+    assert not one.reaches(other)
+    lab.wire("c1", one.namespace, "eth0")
+    one.set_address()
+    assert one.comes_to_reach(other)
+
+
+def test_a_device_that_is_not_there_is_refused(lab: Lab) -> None:
+    change = lab.plane()["change"]
+    done = lab.try_ctl("connect", "lab", "a", "nowhere0")
+    assert done.returncode == 1
+    assert done.stdout == ("simhostctl: simhostd sees no device nowhere0 (QEX_NOT_FOUND)\n")
+    assert lab.plane()["change"] == change
+
+
+def test_a_caller_that_is_killed_leaves_old_or_new(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    program = (
+        "import itertools\n"
+        "from libvswitch import checked\n"
+        "print(flush=True)\n"
+        "for mtu in itertools.cycle((1500, 1600)): checked.VSDVS_SetMTU('lab', mtu)"
+    )
+    caller = subprocess.Popen(
+        ["/usr/bin/python3", "-c", program], env=lab.environment, stdout=subprocess.PIPE
+    )
+    assert caller.stdout is not None and caller.stdout.readline()
+    assert one.reaches(other, attempts=5)
+    caller.kill()
+    caller.communicate()
+    assert one.comes_to_reach(other)
+    plane = lab.plane()
+    assert plane["change"] == plane["in_force"]

@@ -1,0 +1,113 @@
+"""Frames go as the settings say."""
+
+import json
+import re
+import subprocess
+import sys
+from pathlib import Path
+
+from frame_lab import ONE_SWITCH, Lab
+
+
+def test_a_vlan_cuts_and_joins(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    lab.set_port("lab", "a", vlan=7)
+    assert not one.reaches(other)
+    lab.set_port("lab", "b", vlan=7)
+    assert one.reaches(other, attempts=5)
+    lab.ctl("disconnect", "lab", "b")
+    assert not one.reaches(other)
+
+
+def test_it_takes_no_privileges_where_namespaces_of_users_are_allowed(tmp_path: Path) -> None:
+    with Lab(tmp_path, ONE_SWITCH, own_user=True) as lab:
+        lab.start()
+        one, other = lab.client("lab", "a"), lab.client("lab", "b")
+        assert one.reaches(other, attempts=5)
+
+
+def test_an_uplink_fails_and_frames_go_on(lab: Lab) -> None:
+    far, near = lab.far_client("nic0", "nic1"), lab.client("lab", "a")
+    assert near.comes_to_reach(far)
+    assert "sends over nic0" in lab.ctl("show")
+    far.pull("w0")
+    assert near.comes_to_reach(far)
+    assert "sends over nic1" in lab.ctl("show")
+    far.plug("w0")
+    far.pull("w1")
+    assert near.comes_to_reach(far)
+    assert "sends over nic0" in lab.ctl("show")
+
+
+def test_an_uplink_that_the_host_switches_off_is_off(lab: Lab) -> None:
+    far, near = lab.far_client("nic0", "nic1"), lab.client("lab", "a")
+    assert near.comes_to_reach(far)
+    lab.python(
+        "from libvswitch import checked, enums\n"
+        "checked.VSQEX_SetUplinkAdminLinkState('lab', 'nic0', enums.LinkState.DOWN)"
+    )
+    assert near.comes_to_reach(far)
+    assert "sends over nic1" in lab.ctl("show")
+    assert "state DOWN" in lab.host.run("ip", "link", "show", "u0")
+
+
+MADE_BY_CALLS = """
+from libvswitch import checked
+checked.VSDVS_CreateVSwitch("made", None, None, 8, True, 0, 1500, 0)
+checked.VSDVS_AddDVPort("made", "x", 0)
+checked.VSDVS_AddDVPort("made", "y", 0)
+"""
+
+
+def test_a_switch_made_by_calls_moves_frames(lab: Lab) -> None:
+    lab.python(MADE_BY_CALLS)
+    one, other = lab.client("made", "x"), lab.client("made", "y")
+    assert one.reaches(other, attempts=5)
+    lab.python("from libvswitch import checked; checked.VSDVS_DestroyVSwitch('made')")
+    assert not one.reaches(other)
+
+
+def test_learned_addresses_are_asked_of_the_data_path(lab: Lab) -> None:
+    management = {"learning": True, "flooding": True}
+    lab.set_port("lab", "a", mac_learning=management)
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    (device,) = json.loads(one.namespace.run("ip", "-json", "link", "show", "eth0"))
+    assert f"{device['address']} learned" in lab.ctl("show")
+
+
+LISTENS = """
+import socket
+sniffer = socket.socket(socket.AF_PACKET, socket.SOCK_RAW, socket.htons(0x0806))
+sniffer.bind(("eth0", 0))
+sniffer.settimeout(30)
+print(flush=True)
+while not sniffer.recv(2000).endswith(bytes([10, 9, 0, 2])): pass
+"""
+
+
+def test_a_mirror_shows_frames_of_others(lab: Lab) -> None:
+    one, other, third = (lab.client("lab", port) for port in "abc")
+    # Only what is mirrored reaches it: it is in another VLAN.
+    lab.set_port("lab", "c", vlan=99)
+    session = {"sid": "s", "to": [{"port": "c"}], "sent_by": [{"port": "a"}]}
+    lab.set_port("lab", "a", mirror_sessions=[session])
+    listener = third.namespace.start(sys.executable, "-c", LISTENS, stdout=subprocess.PIPE)
+    assert listener.stdout is not None and listener.stdout.readline()
+    one.namespace.run("ip", "neighbour", "flush", "dev", "eth0")
+    assert one.reaches(other, attempts=5)
+    assert listener.wait(timeout=30) == 0
+    listener.stdout.close()
+
+
+def test_the_demo_shows_what_it_says() -> None:
+    demo = str(Path(__file__).with_name("frames_demo.py"))
+    done = subprocess.run(
+        [sys.executable, demo], stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True
+    )
+    assert done.returncode == 0, done.stdout
+    joined, cut, joined_again, _, mirrored = re.findall(r"(\d+) received", done.stdout)
+    assert (joined, cut, joined_again, mirrored) == ("3", "0", "3", "3"), done.stdout
+    assert "nic0       link down" in done.stdout and "sends over nic1" in done.stdout
+    assert done.stdout.count("probe: ") == 2
