@@ -43,8 +43,9 @@ def samples(kind):
     limit = getattr(results.kind(kind), "limit", None)
     return [one for one in found if limit is None or len(one.split(b"\\0")[0]) <= limit]
 
-# A sample of one form of address, with the name of a longer one: what lies beyond it is chance.
-LEFT_OUT = {"VSQEX_GetMcastFilterStats"}
+# A sample of one form of address, with the name of a longer one, and options that say that they are
+# longer than their memory: what lies beyond it is chance.
+LEFT_OUT = {"VSQEX_GetMcastFilterStats", "VSQEX_SetRuntimeOptions"}
 
 def places(call):
     # Where a caller has room for a pointer, nothing comes out; else it would be one to nowhere.
@@ -93,7 +94,7 @@ def test_every_call_gets_what_it_got(recording: Recording, playing: Playing) -> 
     assert playing.stderr == ""
     assert playing.status == 0
     before, now = by_call(recording.stdout), by_call(playing.stdout)
-    assert len(before) == 145 and sum(map(len, before.values())) > 1500
+    assert len(before) == 144 and sum(map(len, before.values())) > 1500
     for name, results in before.items():
         assert now[name] == results, name
     assert (playing.left, playing.has_failed) == ([], False)
