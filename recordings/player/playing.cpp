@@ -40,7 +40,7 @@ Playing::Playing(std::string const &trace, std::string const &ledger, By by)
     for (std::size_t at = 0; at < script_.events().size(); ++at) {
       Event const &event = script_.events()[at];
       if (event.call != nullptr) {
-        alike_[key_of(event.part, *event.call, inputs_of(event))].push_back(at);
+        alike_[key_of(event.part, *event.call, inputs_of(event))].events.push_back(at);
       }
     }
   }
@@ -142,15 +142,22 @@ InProgress Playing::by_arguments(Call const &call, Json const &asked) {
     if (alike == alike_.end()) {
       continue;
     }
-    for (auto const at : alike->second) {
-      Event const &event = script_.events()[at];
-      // The last one is looked at in any case, for it is made again when none is left.
-      bool const is_made = ledger_.is_made(event.number);
-      if ((!is_made || at == alike->second.back()) && is_it(event, call, asked)) {
-        if (!is_made) {
-          return {nullptr, at, 0, std::nullopt, false};
+    auto const &events = alike->second.events;
+    auto &made = alike->second.made;
+    auto const is_made = [&](std::size_t at) {
+      return ledger_.is_made(script_.events()[events[at]].number);
+    };
+    // The last one is looked at in any case, for it is made again when none is left.
+    while (made + 1 < events.size() && is_made(made)) {
+      ++made;
+    }
+    for (auto at = made; at < events.size(); ++at) {
+      bool const is_last = at + 1 == events.size();
+      if ((!is_made(at) || is_last) && is_it(script_.events()[events[at]], call, asked)) {
+        if (!is_made(at)) {
+          return {nullptr, events[at], 0, std::nullopt, false};
         }
-        last = at;
+        last = events[at];
       }
     }
   }

@@ -52,6 +52,12 @@ struct Callback {
   std::uint64_t second;
 };
 
+/// Calls that are asked for in the same words.
+struct Alike {
+  std::vector<std::size_t> events;
+  std::size_t made = 0;  ///< how many of them, from the first on, need no more look
+};
+
 class Playing {
  public:
   Playing(std::string const &trace, std::string const &ledger, By by);
@@ -111,7 +117,7 @@ class Playing {
   std::optional<std::size_t> part_;
   std::set<std::uint64_t> taken_threads_;
   /// By process, function and inputs.
-  std::unordered_map<std::string, std::vector<std::size_t>> alike_;
+  std::unordered_map<std::string, Alike> alike_;
   std::string first_failure_;
 };
 
