@@ -14,7 +14,7 @@ from dataclasses import dataclass, field
 from pathlib import Path
 from typing import IO, Any, Dict, Iterator, List, Optional, Tuple, Union
 
-__all__ = ["Call", "Callback", "Process", "Trace", "TraceError", "Trap"]
+__all__ = ["Call", "Callback", "Process", "Trace", "TraceError", "Trap", "has_calls"]
 
 MARK = "vswitch trace"
 VERSION = 1
@@ -230,6 +230,12 @@ class Trace:
             texts = [None if trap[one] is None else _text(trap, one) for one in ("type", "text")]
             begun.trap = Trap(texts[0], texts[1], _whole(trap, "value"))
         return begun
+
+
+def has_calls(path: Union[str, Path]) -> bool:
+    """Whether a trace has any."""
+    with Trace(path) as trace:
+        return any(True for _ in trace)
 
 
 def _whole(event: Dict[str, Any], name: str) -> int:

@@ -83,6 +83,10 @@ def test_strict():
 def test_recorded_while_it_fails():
     assert flat.VSDVS_SetMTU("vswitch0", 1281) == 7
 
+@pytest.mark.recording("made.jsonl", mode="all")
+def test_recorded_but_asks_nothing():
+    pass
+
 @pytest.mark.recording("none.jsonl")
 def test_no_file():
     pass
@@ -110,7 +114,7 @@ def run(pytester: pytest.Pytester, ini: str, *options: str) -> pytest.RunResult:
 
 def test_tests_with_and_without_the_mark(pytester: pytest.Pytester) -> None:
     done = run(pytester, INI, "-rA")
-    done.assert_outcomes(passed=7, failed=2, errors=6, warnings=1)
+    done.assert_outcomes(passed=8, failed=2, errors=6, warnings=2)
     path = pytester.path
     done.stdout.fnmatch_lines_random(
         [
@@ -127,6 +131,7 @@ def test_tests_with_and_without_the_mark(pytester: pytest.Pytester) -> None:
             "0 of * calls of made.jsonl were made; the first that was not is VSDVS_SetMTU*",
             "ERROR test_marked.py::test_strict*",
             "FAILED test_marked.py::test_recorded_while_it_fails*",
+            "*PytestWarning: the test made no call, so that nothing is recorded in made.jsonl",
             f"the mark recording: there is no {path / 'none.jsonl'}; mode='once' records it",
             f"the mark recording: {path / 'damaged.jsonl'}: line 1: a trace of version 7, and this"
             " program reads those up to 1",

@@ -15,7 +15,7 @@ from vswitch.command.recording import run
 from vswitch.command.session import is_real
 from vswitch.exits import REFUSED
 from vswitch.playing import Ledger, played
-from vswitch.trace import Trace, TraceError
+from vswitch.trace import Trace, TraceError, has_calls
 from vswitch.words import printable
 
 __all__ = ["play"]
@@ -104,7 +104,7 @@ def _record(trace: Path, command: List[str]) -> int:
             print(f"vswitch: {trace} is left as it was: {printable(why)}", file=sys.stderr)
             return status or REFUSED
         # A tool that could not be started, say, has made none, which has been told.
-        if _has_calls(made):
+        if has_calls(made):
             made.replace(trace)
         return status
     finally:
@@ -122,11 +122,6 @@ def _beside(trace: Path) -> Path:
         raise OSError(error.errno, error.strerror, str(trace)) from None
     os.close(descriptor)
     return Path(name)
-
-
-def _has_calls(trace: Path) -> bool:
-    with Trace(trace) as read:
-        return any(True for _ in read)
 
 
 def _unfinished(trace: Path) -> str:

@@ -91,11 +91,20 @@ class RecordedTest:
             self._runtime.forward()
             # What a test that failed has asked is not what it is to ask.
             if self._has_passed:
-                made.replace(self._trace)
+                self._keep(made)
         finally:
             self._runtime.forward()
             if made.exists():
                 made.unlink()
+
+    def _keep(self, made: Path) -> None:
+        from vswitch.trace import has_calls
+
+        if has_calls(made):
+            made.replace(self._trace)
+        else:
+            words = f"the test made no call, so that nothing is recorded in {self._trace.name}"
+            self._item.warn(pytest.PytestWarning(words))
 
     @contextlib.contextmanager
     def _played(self) -> Iterator[None]:
