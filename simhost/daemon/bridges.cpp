@@ -5,7 +5,6 @@
 
 #include <algorithm>
 #include <iterator>
-#include <ranges>
 #include <stdexcept>
 #include <utility>
 
@@ -252,17 +251,11 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
     if (address == fields.end() || vlan == fields.end()) {
       continue;
     }
-    Learned one{.address = {},
-                .vlan = static_cast<std::uint16_t>(vlan->second.value),
-                .port = static_cast<std::uint32_t>(entry.flow.cookie),
-                .age = static_cast<std::uint32_t>(
-                    std::chrono::duration_cast<std::chrono::seconds>(entry.age).count())};
-    auto left = address->second.value;
-    for (auto &byte : std::ranges::reverse_view(one.address)) {
-      byte = static_cast<std::uint8_t>(left);
-      left >>= 8U;
-    }
-    all.push_back(one);
+    all.push_back({.address = openflow::to_address<6>(address->second.value),
+                   .vlan = static_cast<std::uint16_t>(vlan->second.value),
+                   .port = static_cast<std::uint32_t>(entry.flow.cookie),
+                   .age = static_cast<std::uint32_t>(
+                       std::chrono::duration_cast<std::chrono::seconds>(entry.age).count())});
   }
   return all;
 }

@@ -23,18 +23,8 @@ constexpr std::array<std::pair<Port, std::string_view>, 8> kNames{{
 }};
 
 template <std::size_t Size>
-std::array<std::uint8_t, Size> bytes_of(Value value) {
-  std::array<std::uint8_t, Size> bytes{};
-  for (auto byte = bytes.rbegin(); byte != bytes.rend(); ++byte) {
-    *byte = static_cast<std::uint8_t>(value);
-    value >>= 8U;
-  }
-  return bytes;
-}
-
-template <std::size_t Size>
 std::string address_text(int family, Value value) {
-  auto const bytes = bytes_of<Size>(value);
+  auto const bytes = to_address<Size>(value);
   std::array<char, INET6_ADDRSTRLEN> text{};
   ::inet_ntop(family, bytes.data(), text.data(), text.size());
   return text.data();
@@ -83,7 +73,7 @@ std::string content_text(Field field, Value value) {
     case Form::port:
       return port_text(static_cast<Port>(value));
     case Form::ethernet:
-      return fmt::format("{:02x}", fmt::join(bytes_of<6>(value), ":"));
+      return fmt::format("{:02x}", fmt::join(to_address<6>(value), ":"));
     case Form::ipv4:
       return address_text<4>(AF_INET, value);
     case Form::ipv6:

@@ -25,6 +25,17 @@ constexpr Value to_value(std::array<std::uint8_t, Size> const &address) {
   return value;
 }
 
+/// The address that is the content of a field; higher bits are left out.
+template <std::size_t Size>
+constexpr std::array<std::uint8_t, Size> to_address(Value value) {
+  std::array<std::uint8_t, Size> address{};
+  for (auto at = Size; at > 0; --at) {
+    address.at(at - 1) = static_cast<std::uint8_t>(value);
+    value >>= 8U;
+  }
+  return address;
+}
+
 /// So many ones, the lowest bits of a number; at most 128.
 constexpr Value ones(unsigned bits) {
   return bits == 0 ? 0 : ~Value{0} >> (8 * sizeof(Value) - bits);
