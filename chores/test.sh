@@ -17,8 +17,8 @@
 #   -- ARGUMENTS    given to each run of pytest as they are
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
-# Without them clang-tidy passes over the tests' own C++ and that of simhostctl, and over clang's
-# analyzer for the simulated host and the recorder, which take long; ./dev lint does not.
+# Without them clang-tidy passes over the tests' own C++ and that of simhostctl, and over its analyzer
+# and its bugprone checks for the simulated host and recordings, which take long; ./dev lint does not.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
@@ -83,9 +83,9 @@ cmd_test() {
     report
   fi
   # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
-  # parses the command line with a library of templates. The module and its helpers are analyzed,
-  # too.
-  untidied='^\./\(tests\|simhost/cli\)/' unanalyzed='^\./\(simhost\|recordings\)/'
+  # parses the command line with a library of templates. The module and its helpers are read with
+  # all checks.
+  untidied='^\./\(tests\|simhost/cli\)/' lightly='^\./\(simhost\|recordings\)/'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
@@ -97,8 +97,9 @@ cmd_test() {
     cxx_tests
   fi
   leave_out_tests
+  # First the files that take longest, or one processor would end with them alone.
   # shellcheck disable=SC2086 # a list of words
-  other_tests tests $deselected "$@"
+  other_tests tests/robustness tests $deselected "$@"
   # shellcheck disable=SC2086 # a list of words
   pytest "Class tests" classes.xml '' tests/classes $deselected "$@"
   pytest "Object tests" objects.xml '' tests/vswitch "$@"
