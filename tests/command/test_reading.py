@@ -217,6 +217,7 @@ def test_a_call_that_fails(lab: SharedHost, refused: Refused) -> None:
 
 def test_help(vswitch: Vswitch) -> None:
     nothing: List[str] = []
+    without_json = ("draw", "record", "play", "completion")
     for words in (nothing, ["--help"], ["-h"]):
         done = vswitch(*words)
         assert (done.status, done.stderr) == (0, "")
@@ -226,7 +227,7 @@ def test_help(vswitch: Vswitch) -> None:
         name = line.split()[0]
         told = vswitch(name, "--help")
         assert told.status == 0 and told.lines[0].startswith(f"Usage: vswitch {name} ")
-        assert ("--json" in told.stdout) is (name not in ("draw", "record", "completion"))
+        assert ("--json" in told.stdout) is (name not in without_json)
         assert "--real" in told.stdout
 
 
