@@ -93,10 +93,11 @@ configure_fuzzers() {
     -DSANITIZE=fuzzer-no-link,address,undefined -DBUILD_FUZZERS=ON >/dev/null
 }
 
+# build_fuzzers TARGET: all of them, or brief_fuzzers.
 build_fuzzers() {
   configure_fuzzers || return
   step "Building the fuzzers in build-fuzzers/"
-  flock "$FUZZERS_DIR/.lock" nice cmake --build "$FUZZERS_DIR" --target fuzzers
+  flock "$FUZZERS_DIR/.lock" nice cmake --build "$FUZZERS_DIR" --target "$1"
 }
 
 build_peers() {

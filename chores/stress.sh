@@ -39,7 +39,7 @@ cmd_stress() {
   need $build_packages $test_packages
   build
   # They embed the plain interpreter, whichever the module is built for.
-  build_fuzzers
+  build_fuzzers fuzzers
   unset LD_LIBRARY_PATH SIMHOST_STATE SIMHOST_SCENARIO PYTHONHOME
   export BUILD_DIR="$root/$folder"
   PYTHONPATH=$BUILD_DIR/python:$BUILD_DIR/tests/python

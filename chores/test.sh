@@ -17,8 +17,9 @@
 #   -- ARGUMENTS    given to each run of pytest as they are
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
-# Without them clang-tidy passes over the tests' own C++ and that of simhostctl, and over its analyzer
+# Without them clang-tidy passes over the tests' own C++ and that of simhostctl and of what talks to Open vSwitch, and over its analyzer
 # and its bugprone checks for the simulated host and recordings, which take long; ./dev lint does not.
+# The fuzzers that link the whole simulated host are left to ./dev stress.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
@@ -83,9 +84,9 @@ cmd_test() {
     report
   fi
   # The slower half of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
-  # parses the command line with a library of templates. The module and its helpers are read with
-  # all checks.
-  untidied='^\./\(tests\|simhost/cli\)/' lightly='^\./\(simhost\|recordings\)/'
+  # parses the command line or JSON with libraries of templates. The module and its helpers are read
+  # with all checks.
+  untidied='^\./\(tests\|simhost/\(cli\|planes/openvswitch\)\)/' lightly='^\./\(simhost\|recordings\)/'
   [ -n "$expression" ] || [ "$folder" != build ] || lint
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
@@ -174,9 +175,10 @@ test_recorded() {
     tests/contract/test_traps_of_calls.py
 }
 
+# Those of the whole simulated host are for ./dev stress.
 test_fuzzers() {
-  if build_fuzzers; then
-    pytest "Fuzzers" fuzz.xml '' tests/fuzz "$@"
+  if build_fuzzers brief_fuzzers; then
+    pytest "Fuzzers" fuzz.xml '' tests/fuzz -k 'not of_the_host' "$@"
   else
     tally "Fuzzers" 0 1
   fi
