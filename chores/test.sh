@@ -17,9 +17,10 @@
 #   -- ARGUMENTS    given to each run of pytest as they are
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
-# Without them clang-tidy passes over the tests' own C++ and that of simhostctl and of what talks to Open vSwitch, and over its analyzer
-# and its bugprone checks for the simulated host and recordings, which take long; ./dev lint does not.
-# The fuzzers that link the whole simulated host are left to ./dev stress.
+# Without them clang-tidy passes over the tests' own C++, that of simhostctl and what talks to Open
+# vSwitch, and, of the simulated host and of recordings, over its analyzer and its bugprone checks:
+# these take long, and ./dev lint has them. The fuzzers that link the whole simulated host are left to
+# ./dev stress.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
