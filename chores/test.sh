@@ -88,7 +88,10 @@ cmd_test() {
   # parses the command line or JSON with libraries of templates. The module and its helpers are read
   # with all checks.
   untidied='^\./\(tests\|simhost/\(cli\|planes/openvswitch\)\)/' lightly='^\./\(simhost\|recordings\)/'
-  [ -n "$expression" ] || [ "$folder" != build ] || lint
+  [ -n "$expression" ] || [ "$folder" != build ] || {
+    lint
+    summarize "Left to ./dev lint: what clang-tidy passes over here"
+  }
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
   "$python" -m pytest --version >/dev/null 2>&1 || lend_pytest
 
@@ -152,8 +155,10 @@ leave_out() {
   not_for_this_build "$1"
 }
 
-not_for_this_build() {
-  summary="${summary}Not for this build: $1
+not_for_this_build() { summarize "Not for this build: $1"; }
+
+summarize() {
+  summary="$summary$1
 "
 }
 
@@ -176,8 +181,8 @@ test_recorded() {
     tests/contract/test_traps_of_calls.py
 }
 
-# Those of the whole simulated host are for ./dev stress.
 test_fuzzers() {
+  summarize "Left to ./dev stress: the fuzzers that link the whole simulated host"
   if build_fuzzers brief_fuzzers; then
     pytest "Fuzzers" fuzz.xml '' tests/fuzz -k 'not of_the_host' "$@"
   else
