@@ -103,6 +103,8 @@ int simhost_set_counter(char const *switchName, char const *port, char const *se
  * @param mac the address of its client, six bytes in hexadecimal; null if it is not known
  */
 int simhost_connect(char const *switchName, char const *port, char const *device, char const *mac);
+/** QEX_IS_DISCONNECTED for a port without a device. */
+int simhost_disconnect(char const *switchName, char const *port);
 /**
  * Tells what moves the frames, as an object in JSON: `change` is the number of the last change of
  * the host, `in_force` that of the last one that frames obey, null while no daemon says so, and
@@ -110,8 +112,6 @@ int simhost_connect(char const *switchName, char const *port, char const *device
  * then. Parameters and result as of simhost_describe.
  */
 size_t simhost_plane(char *text, size_t size);
-/** QEX_IS_DISCONNECTED for a port without a device. */
-int simhost_disconnect(char const *switchName, char const *port);
 
 /* Faults: what is to happen to calls of a function. `nth` is the first call that is hit, 1 for the
  * next; `times` is how many are, 0 for all that follow. Panic and QEX_ReturnStatusToString cannot
