@@ -33,7 +33,6 @@ class Meanings:
         return {
             "number": number,
             "asks": call.asks,
-            "has_status": call.has_status,
             "takes_more": call.takes_more,
             "releases": call.releases.name if call.releases else "",
             "volatile": {path: kind.name for path, kind, _ in found if kind},
