@@ -2,7 +2,7 @@
 
     with played(Path("trace.jsonl")) as recording:
         subprocess.run(["./tool.py"], env=recording.environment)
-        print(len(recording.calls) - len(recording.left), "calls were made")
+        print(recording.ledger.said_of("recorded calls"))
 
 Nothing here loads a host, nor needs one.
 """
@@ -55,6 +55,14 @@ class Ledger:
         made = self.file.read_bytes()[1 + self._processes :]
         return [call for call, is_made in zip(self.calls, made) if not is_made]
 
+    def said_of(self, calls: str) -> str:
+        """How many of the calls were made, and which is the first that was not."""
+        left = self.left
+        words = f"{len(self.calls) - len(left)} of {len(self.calls)} {calls} were made"
+        if left:
+            words += f"; the first that was not is {left[0].function} in line {left[0].line}"
+        return words
+
     @property
     def has_failed(self) -> bool:
         """Whether a call could not be played."""
@@ -80,6 +88,8 @@ def played(trace: Path, by: str = "order") -> Iterator[Played]:
     `by` says which recorded call a call is: the next one in the "order" of its thread, or the next
     one with the same "arguments".
     """
+    if by not in BY:
+        raise ValueError(f"by is one of {', '.join(BY)}")
     with tempfile.TemporaryDirectory(prefix="vswitch-play-") as made:
         ledger = Ledger(trace, Path(made, "ledger"))
         _front.place(Path(made), {})

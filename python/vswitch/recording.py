@@ -10,6 +10,7 @@ recording.
 
 import contextlib
 import ctypes
+import errno
 import hashlib
 import importlib.metadata
 import json
@@ -25,7 +26,7 @@ from vswitch import _front
 from vswitch.trace import MARK, VERSION
 from libvswitch.errors import HostError
 
-__all__ = ["begin", "host_libraries", "recorded"]
+__all__ = ["anew", "begin", "host_libraries", "recorded"]
 
 # A function of each library.
 _FUNCTIONS = {"libvswitch.so": "VSDVS_SetMTU", "libnebPublic.so": "DVSQEX_StateGet"}
@@ -85,6 +86,27 @@ def begin(trace: Path, command: Sequence[str], libraries: Dict[str, Path]) -> No
     descriptor = os.open(trace, os.O_WRONLY | os.O_CREAT | os.O_TRUNC, 0o600)
     with open(descriptor, "w", encoding="utf-8") as file:
         file.write(json.dumps(header) + "\n")
+
+
+@contextlib.contextmanager
+def anew(trace: Path) -> Iterator[Path]:
+    """A new file in the folder of a trace, to replace it if what is recorded there is to stay.
+
+    What is wrong with the place is told of the trace.
+    """
+    if trace.is_dir():
+        raise IsADirectoryError(errno.EISDIR, os.strerror(errno.EISDIR), str(trace))
+    try:
+        descriptor, name = tempfile.mkstemp(prefix=f".{trace.name}.", dir=str(trace.parent))
+    except OSError as error:
+        raise OSError(error.errno, error.strerror, str(trace)) from None
+    os.close(descriptor)
+    made = Path(name)
+    try:
+        yield made
+    finally:
+        if made.exists():
+            made.unlink()
 
 
 def _identity(library: Path) -> Dict[str, str]:

@@ -9,7 +9,7 @@ from typing import Any, Callable, Dict, List
 
 import pytest
 from command_line import PROGRAM, Done, Vswitch
-from vswitch.playing import Ledger
+from vswitch.playing import Ledger, played
 from vswitch.recording import recorded
 from vswitch.trace import TraceError
 
@@ -126,6 +126,12 @@ def test_by_arguments_the_order_is_the_tools(play: Callable[..., Done]) -> None:
         "  trace.jsonl: no call of VSDVS_DestroyVSwitch was recorded",
         '  trace.jsonl: line 3: next would be VSDVS_SetMTU(switchName="vswitch0", mtu=9000)',
     ]
+
+
+def test_no_other_word_for_which_call_a_call_is(trace: Path) -> None:
+    with pytest.raises(ValueError, match="^by is one of order, arguments$"):
+        with played(trace, "chance"):
+            pass
 
 
 def test_calls_that_nobody_made(play: Callable[..., Done]) -> None:

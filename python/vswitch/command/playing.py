@@ -1,10 +1,7 @@
 """The command that runs a tool over a trace in place of a host."""
 
-import errno
-import os
 import subprocess
 import sys
-import tempfile
 from enum import Enum
 from pathlib import Path
 from typing import List
@@ -14,7 +11,8 @@ import typer
 from vswitch.command.recording import run
 from vswitch.command.session import is_real
 from vswitch.exits import REFUSED
-from vswitch.playing import Ledger, played
+from vswitch.playing import played
+from vswitch.recording import anew
 from vswitch.trace import Trace, TraceError, has_calls
 from vswitch.words import printable
 
@@ -70,29 +68,21 @@ def play(
     try:
         with played(trace, by.value) as recording:
             status = run(command, recording.environment)
-            left = _tell(recording.ledger)
-            if recording.ledger.has_failed:
+            ledger = recording.ledger
+            print(f"vswitch: {ledger.said_of('recorded calls')}", file=sys.stderr)
+            if ledger.has_failed:
                 status = NOT_PLAYED
+            elif not status and all_used and ledger.left:
+                status = REFUSED
     except TraceError as error:
         print(f"vswitch: {printable(str(error))}", file=sys.stderr)
         raise SystemExit(REFUSED) from None
-    raise SystemExit(status or (REFUSED if left and all_used else 0))
-
-
-def _tell(ledger: Ledger) -> int:
-    """Says how many calls were made; how many were not."""
-    left = ledger.left
-    words = f"{len(ledger.calls) - len(left)} of {len(ledger.calls)} recorded calls were made"
-    if left:
-        words += f"; the first that was not is {left[0].function} in line {left[0].line}"
-    print(f"vswitch: {words}", file=sys.stderr)
-    return len(left)
+    raise SystemExit(status)
 
 
 def _record(trace: Path, command: List[str]) -> int:
     """Records the tool; what there was is replaced by a trace that is whole, and by no other."""
-    made = _beside(trace)
-    try:
+    with anew(trace) as made:
         # A program of its own: this one has no host.
         words = [sys.executable, "-m", "vswitch", "record", "-o", str(made)]
         status = subprocess.call([*words, *(["--real"] if is_real() else []), "--", *command])
@@ -107,21 +97,6 @@ def _record(trace: Path, command: List[str]) -> int:
         if has_calls(made):
             made.replace(trace)
         return status
-    finally:
-        if made.exists():
-            made.unlink()
-
-
-def _beside(trace: Path) -> Path:
-    """A new file in the folder of a trace; what is wrong there is told before the tool runs."""
-    if trace.is_dir():
-        raise IsADirectoryError(errno.EISDIR, os.strerror(errno.EISDIR), str(trace))
-    try:
-        descriptor, name = tempfile.mkstemp(prefix=f".{trace.name}.", dir=str(trace.parent))
-    except OSError as error:
-        raise OSError(error.errno, error.strerror, str(trace)) from None
-    os.close(descriptor)
-    return Path(name)
 
 
 def _unfinished(trace: Path) -> str:

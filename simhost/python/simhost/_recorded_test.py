@@ -6,7 +6,6 @@ So they are loaded as early as pytest can, and forward the calls of all other te
 
 import contextlib
 import json
-import os
 import subprocess
 import sys
 import tempfile
@@ -18,7 +17,7 @@ import pytest
 if TYPE_CHECKING:
     from vswitch.playing import Ledger
 
-_BY, _MODES = ("order", "arguments"), ("none", "once", "all")
+_MODES = ("none", "once", "all")
 _FIND = """
 import json
 from vswitch.recording import host_libraries
@@ -50,10 +49,11 @@ class RecordedTest:
         mode: str = "none",
         all_used: bool = False,
     ) -> None:
-        if by not in _BY or mode not in _MODES:
-            raise ValueError(f"by is one of {', '.join(_BY)}, and mode one of {', '.join(_MODES)}")
         from vswitch._front import Runtime
+        from vswitch.playing import BY
 
+        if by not in BY or mode not in _MODES:
+            raise ValueError(f"by is one of {', '.join(BY)}, and mode one of {', '.join(_MODES)}")
         self._item = item
         self._trace = item.path.parent / file
         self._by_arguments = by == "arguments"
@@ -81,21 +81,18 @@ class RecordedTest:
 
     @contextlib.contextmanager
     def _recorded(self) -> Iterator[None]:
-        from vswitch.recording import begin
+        from vswitch.recording import anew, begin
 
-        made = self._beside()
-        try:
+        with anew(self._trace) as made:
             begin(made, [self._item.nodeid], _hosts)
-            self._runtime.record(made)
-            yield
-            self._runtime.forward()
+            try:
+                self._runtime.record(made)
+                yield
+            finally:
+                self._runtime.forward()
             # What a test that failed has asked is not what it is to ask.
             if self._has_passed:
                 self._keep(made)
-        finally:
-            self._runtime.forward()
-            if made.exists():
-                made.unlink()
 
     def _keep(self, made: Path) -> None:
         from vswitch.trace import has_calls
@@ -129,18 +126,8 @@ class RecordedTest:
     def _look_back(self, failure: str, ledger: "Ledger") -> None:
         if failure:
             pytest.fail(f"a fixture of the test: {failure}", pytrace=False)
-        left = ledger.left
-        if left:
-            first = f"the first that was not is {left[0].function} in line {left[0].line}"
-            words = f"{len(ledger.calls) - len(left)} of {len(ledger.calls)} calls of"
-            words += f" {self._trace.name} were made; {first}"
+        if ledger.left:
+            words = ledger.said_of(f"calls of {self._trace.name}")
             if self._all_used:
                 pytest.fail(words, pytrace=False)
             self._item.warn(pytest.PytestWarning(words))
-
-    def _beside(self) -> Path:
-        descriptor, name = tempfile.mkstemp(
-            prefix=f".{self._trace.name}.", dir=str(self._trace.parent)
-        )
-        os.close(descriptor)
-        return Path(name)
