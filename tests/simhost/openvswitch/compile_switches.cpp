@@ -105,7 +105,6 @@ Json compiled(Json const &said) {
               {"numbers", numbers_of_ports(transaction, key)},
               {"most_learned", made.rows.most_learned},
               {"most_tags", made.rows.most_tags},
-              {"ages_elsewhere", made.ages_elsewhere},
               {"flows", Json::array()},
               {"groups", Json::array()}};
   for (auto const &flow : made.flows) {

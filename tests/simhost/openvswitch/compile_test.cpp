@@ -17,7 +17,9 @@ namespace simhost::openvswitch {
 namespace {
 
 using testing::ElementsAre;
+using testing::HasSubstr;
 using testing::IsEmpty;
+using testing::Not;
 
 Port access_port(openflow::Port number, std::uint16_t vlan) {
   Port port;
@@ -145,12 +147,29 @@ TEST(Compiling, ChangesGroupsOnlyWhenAnotherUplinkComesFirst) {
   EXPECT_NE(compile(after).groups, compile(before).groups);
 }
 
-TEST(Compiling, SaysWhatTheSwitchDoesNotAge) {
+// The flows of a network by which a port learns.
+std::vector<std::string> teachers_in(Network const &network) {
+  std::vector<std::string> found;
+  for (auto const &flow : compile(network).flows) {
+    if (flow.table == table::kLearning && flow.cookie == cookie(Counted::port, 1) &&
+        flow.priority == 100) {
+      found.push_back(to_text(flow));
+    }
+  }
+  return found;
+}
+
+TEST(Compiling, KeepsForEverWhatAgesLaterThanAFlowCan) {
   auto network = with_ports(1);
+  network.ports[0].learning = Learning{.limit = 1};
   network.addresses.aging = 65535;
-  EXPECT_FALSE(compile(network).ages_elsewhere);
+  EXPECT_THAT(teachers_in(network), ElementsAre(HasSubstr(",hard_timeout=65535,")));
   network.addresses.aging = 65536;
-  EXPECT_TRUE(compile(network).ages_elsewhere);
+  EXPECT_THAT(teachers_in(network), ElementsAre(Not(HasSubstr("timeout"))));
+}
+
+TEST(Compiling, HasTheTableLearnAsManyAsTheSwitchMay) {
+  auto network = with_ports(1);
   network.addresses.limit = 12;
   EXPECT_EQ(compile(network).rows, (Rows{.most_tags = 2, .most_learned = 12}));
 }

@@ -93,11 +93,9 @@ Compiled compile(Network const &network) {
   }
   std::sort(program.flows.begin(), program.flows.end());
   std::sort(program.groups.begin(), program.groups.end());
-  bool const ages = network.addresses.aging != 0;
   return {.rows = {.most_learned = network.addresses.limit},
           .flows = std::move(program.flows),
-          .groups = std::move(program.groups),
-          .ages_elsewhere = ages && plan.hard_timeout() == 0};
+          .groups = std::move(program.groups)};
 }
 
 openflow::Flow generation_marker(std::uint64_t generation) {

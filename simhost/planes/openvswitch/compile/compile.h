@@ -29,9 +29,6 @@ struct Compiled {
   Rows rows;
   std::vector<openflow::Flow> flows;    ///< in their order
   std::vector<openflow::Group> groups;  ///< likewise
-  /// Learned addresses that the switch keeps for ever: the ageing time is longer than a flow can
-  /// tell, and somebody else has to remove them in time.
-  bool ages_elsewhere = false;
 };
 
 /// Refuses, in words, what no flows can be made of (QEX_LIMIT_EXCEEDED, QEX_BAD_PARAM).
