@@ -53,15 +53,24 @@ inline openflow::SubField vlan_bits(openflow::Field field) {
   return {.field = field, .first = 0, .bits = kVlanBits};
 }
 
-/// A match with some bits of a field.
-inline Match &with_bits(Match &match, openflow::SubField bits, openflow::Value value) {
-  return match.with(bits.field, value << bits.first, openflow::ones(bits.bits) << bits.first);
+/// Frames that come in at a device.
+inline Match from(openflow::Port port) {
+  return Match().with(openflow::Field::in_port, port);
 }
 
-/// A frame to more than one receiver.
-inline Match &to_many(Match &match) {
-  auto constexpr kGroupBit = openflow::Value{1} << 40U;
-  return match.with(openflow::Field::eth_dst, kGroupBit, kGroupBit);
+/// A match with some bits of a field.
+inline Match with_bits(Match match, openflow::SubField bits, openflow::Value value) {
+  match.with(bits.field, value << bits.first, openflow::ones(bits.bits) << bits.first);
+  return match;
+}
+
+/// Of an address: it is that of many.
+inline constexpr openflow::Value kGroupBit = openflow::Value{1} << 40U;
+
+/// A match with frames to more than one receiver.
+inline Match to_many(Match match) {
+  match.with(openflow::Field::eth_dst, kGroupBit, kGroupBit);
+  return match;
 }
 
 /// Adds the tag that a frame has outside, from registers; `vlan` has the VLAN. Takes it away again

@@ -8,7 +8,6 @@ using openflow::Field;
 
 constexpr openflow::EthernetAddress kLinkLocal{0x01, 0x80, 0xc2, 0, 0, 0};
 constexpr openflow::Value kLinkLocalMask = openflow::ones(48) ^ openflow::ones(4);
-constexpr openflow::Value kGroupBit = openflow::Value{1} << 40U;
 constexpr std::uint16_t kReservedVlan = 4095;
 
 // The type of a frame's content is that of a tag where there are more of them than are looked at.
@@ -31,7 +30,7 @@ void refuse_malformed(Program &program) {
 }
 
 void admit(Program &program, Port const &port) {
-  auto const match = Match().with(Field::in_port, port.port);
+  auto const match = from(port.port);
   if (!sends_frames(port)) {
     refuse(program, 500, match, cookie(Counted::blocked, port.number));
     return;
@@ -43,7 +42,7 @@ void admit(Program &program, Port const &port) {
 }
 
 void admit(Program &program, Uplink const &uplink) {
-  auto const match = Match().with(Field::in_port, uplink.port);
+  auto const match = from(uplink.port);
   if (uplink.blocked) {
     refuse(program, 500, match, cookie(Counted::blocked, uplink.number));
     return;

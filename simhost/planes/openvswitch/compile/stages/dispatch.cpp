@@ -7,8 +7,6 @@
 namespace simhost::openvswitch {
 namespace {
 
-using openflow::Field;
-
 Actions to_list(List list) {
   return {openflow::set(field::kList, static_cast<openflow::Value>(list)),
           openflow::set(field::kPiece, 0), go_to(table::kLists)};
@@ -32,8 +30,7 @@ class Dispatch {
     for (auto const &port : plan_.network.ports) {
       compile_port(port);
     }
-    Match many;
-    to_ports_and_uplinks(200, to_many(many), to_list(List::all));
+    to_ports_and_uplinks(200, to_many(Match()), to_list(List::all));
     to_ports_and_uplinks(150, Match().with(field::kDestination, kBeyond), promiscuous_);
     to_ports_and_uplinks(150, Match().with(field::kDestination, 0), to_list(List::unknown));
     // To a port of another way.
@@ -44,7 +41,7 @@ class Dispatch {
  private:
   void compile_port(Port const &port) {
     if (port.transmits_by_uplink && sends_frames(port)) {
-      add(300, Match().with(Field::in_port, port.port), to_uplinks_);
+      add(300, from(port.port), to_uplinks_);
     }
     auto const to_it = Match().with(field::kDestination, port.port);
     if (port.promiscuous) {

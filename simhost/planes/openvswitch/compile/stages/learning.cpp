@@ -10,10 +10,6 @@ namespace {
 
 using openflow::Field;
 
-Match from(Port const &port) {
-  return Match().with(Field::in_port, port.port);
-}
-
 // The frame's source, in its VLAN, as a destination.
 openflow::LearnedMatch in_domain() {
   return {.field = vlan_bits(field::kDomain), .content = vlan_bits(field::kDomain)};
@@ -83,7 +79,7 @@ void pass_over_fixed(Plan const &plan, Program &program) {
 // One that moves when it is seen elsewhere moves back when it is seen here.
 void learn_own_again(Plan const &plan, Program &program) {
   for (auto const &own : plan.own_addresses()) {
-    add(program, 200, own_source(own, from(*own.port)),
+    add(program, 200, own_source(own, from(own.port->port)),
         {learn(plan, own.port->number, own.port->port, 0), go_to(table::kLookup)},
         own.port->number);
   }
@@ -105,10 +101,9 @@ openflow::Action count_for_switch(Plan const &plan) {
 }
 
 void judge(Program &program, std::uint8_t where, Port const &port) {
-  auto match = from(port);
   bool const allows = port.learning->when_full == WhenFull::allow;
   program.add(where, {.priority = 100,
-                      .match = with_bits(match, field::kVerdict, 0),
+                      .match = with_bits(from(port.port), field::kVerdict, 0),
                       .actions = allows ? Actions{go_to(table::kLookup)} : Actions{},
                       .cookie = cookie(allows ? Counted::limit_allowed : Counted::limit_dropped,
                                        port.number)});
@@ -122,7 +117,7 @@ void learn_at(Plan const &plan, Program &program, Port const &port) {
   }
   remember_recent(plan, port, actions);
   actions.push_back(go_to(table::kLimits));
-  add(program, 100, from(port), std::move(actions), port.number);
+  add(program, 100, from(port.port), std::move(actions), port.number);
   judge(program, table::kLimits, port);
   judge(program, table::kSwitchLimit, port);
 }
@@ -134,9 +129,8 @@ bool ports_learn(Plan const &plan) {
 }
 
 void learn_beyond(Plan const &plan, Program &program) {
-  Match on_way;
   add(program, 300,
-      with_bits(on_way, field::kRecent, static_cast<openflow::Value>(Recent::is_on_way)),
+      with_bits(Match(), field::kRecent, static_cast<openflow::Value>(Recent::is_on_way)),
       {go_to(table::kLookup)}, 0);
   auto const &addresses = plan.network.addresses;
   if (addresses.uplink_limit != 0 && addresses.limit != 0) {
@@ -158,7 +152,7 @@ void learn_at_ports(Plan const &plan, Program &program) {
       Actions actions;
       remember_recent(plan, port, actions);
       actions.push_back(go_to(table::kLookup));
-      add(program, 100, from(port), std::move(actions), port.number);
+      add(program, 100, from(port.port), std::move(actions), port.number);
     }
   }
 }

@@ -14,8 +14,6 @@
 namespace simhost::openvswitch {
 namespace {
 
-using openflow::Field;
-
 // An action takes 16 bytes, a port two of them at most, and a flow has 65,535 bytes.
 constexpr std::size_t kMostPorts = 1000;
 // In kPiece: the ports that may be in many VLANs, which are on the lists of all; then their pieces.

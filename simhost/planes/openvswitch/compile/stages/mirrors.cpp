@@ -20,11 +20,11 @@ void add_if_any(Program &program, std::uint8_t where, Match match, Actions actio
 
 void copy_by_port(Plan const &plan, Program &program) {
   for (auto const &port : plan.network.ports) {
-    add_if_any(program, table::kMirrorsOfPorts, Match().with(Field::in_port, port.port),
+    add_if_any(program, table::kMirrorsOfPorts, from(port.port),
                copies(plan, &Mirror::sent, &MirrorSources::ports, port.port));
   }
   for (auto const &uplink : plan.network.uplinks) {
-    add_if_any(program, table::kMirrorsOfPorts, Match().with(Field::in_port, uplink.port),
+    add_if_any(program, table::kMirrorsOfPorts, from(uplink.port),
                copies(plan, &Mirror::received, &MirrorSources::uplinks, uplink.port));
   }
 }

@@ -36,9 +36,8 @@ void compile_own_frames(Plan const &plan, Program &program) {
                 {.priority = 100,
                  .match = from_uplink(),
                  .actions = {go_to(table::kRecentSources), go_to(table::kMirroring)}});
-    Match recent;
     program.add(table::kMirroring, {.priority = 200,
-                                    .match = with_bits(recent, field::kRecent,
+                                    .match = with_bits(Match(), field::kRecent,
                                                        static_cast<openflow::Value>(Recent::drops)),
                                     .cookie = cookie(Counted::own_frame)});
   }

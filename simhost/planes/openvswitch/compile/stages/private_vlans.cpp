@@ -4,9 +4,8 @@
 namespace simhost::openvswitch {
 
 void compile_private_vlans(Plan const &plan, Program &program) {
-  Match too_large;
   program.add(table::kPrivateVlans, {.priority = 1000,
-                                     .match = with_bits(too_large, field::kTooLarge, 1),
+                                     .match = with_bits(Match(), field::kTooLarge, 1),
                                      .cookie = cookie(Counted::too_large)});
   for (auto const vlan : plan.private_vlans()) {
     auto const &kind = plan.kind_of(vlan);

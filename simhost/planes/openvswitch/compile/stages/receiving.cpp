@@ -9,8 +9,6 @@
 namespace simhost::openvswitch {
 namespace {
 
-using openflow::Field;
-
 bool uses(Way const &way, openflow::Port uplink) {
   return std::any_of(way.slots.begin(), way.slots.end(), [&](Slot const &slot) {
     return std::find(slot.begin(), slot.end(), uplink) != slot.end();
@@ -42,7 +40,7 @@ Actions receive(Plan const &plan, Uplink const &uplink, bool may_be_a_copy) {
 }
 
 void receive_at(Plan const &plan, Program &program, Uplink const &uplink) {
-  auto const at = Match().with(Field::in_port, uplink.port);
+  auto const at = from(uplink.port);
   auto const of_port = cookie(Counted::port, uplink.number);
   auto const known = receive(plan, uplink, false);
   auto const copied = receive(plan, uplink, true);
@@ -52,8 +50,7 @@ void receive_at(Plan const &plan, Program &program, Uplink const &uplink) {
         {.priority = priority, .match = std::move(match), .actions = actions, .cookie = of_port});
   };
   if (known != copied) {
-    auto many = at;
-    add(200, to_many(many), copied);
+    add(200, to_many(at), copied);
     add(200, Match(at).with(field::kDestination, 0), copied);
   }
   add(100, at, known);
@@ -87,11 +84,10 @@ void compile_election(Plan const &plan, Program &program) {
       }
     }
     for (auto const name : names) {
-      program.add(table::kElection,
-                  {.priority = 100,
-                   .match = Match().with(Field::in_port, uplink.port).with(field::kElected, name),
-                   .actions = {go_to(table::kDispatch)},
-                   .cookie = cookie(Counted::port, uplink.number)});
+      program.add(table::kElection, {.priority = 100,
+                                     .match = from(uplink.port).with(field::kElected, name),
+                                     .actions = {go_to(table::kDispatch)},
+                                     .cookie = cookie(Counted::port, uplink.number)});
     }
   }
 }

@@ -8,10 +8,6 @@ namespace {
 
 using openflow::Field;
 
-Match from(Port const &port) {
-  return Match().with(Field::in_port, port.port);
-}
-
 openflow::Action learn_first_address(Plan const &plan, Port const &port) {
   openflow::Learn learn{
       .table = table::kFirstAddresses,
@@ -38,28 +34,28 @@ void drop_forged(Program &program, std::uint8_t where, Match const &match, Port 
 }
 
 void compile(Plan const &plan, Program &program, Port const &port) {
+  auto const at_port = from(port.port);
   if (port.address_changed) {
     program.add(table::kSources, {.priority = 300,
-                                  .match = from(port),
+                                  .match = at_port,
                                   .cookie = cookie(Counted::address_changed, port.number)});
   } else if (!port.address) {
     program.add(table::kSources,
                 {.priority = 100,
-                 .match = from(port),
+                 .match = at_port,
                  .actions = {openflow::load(field::kVerdict, 1), learn_first_address(plan, port),
                              go_to(table::kFirstAddress)},
                  .cookie = cookie(Counted::port, port.number)});
     if (!port.may_forge) {
-      auto match = from(port);
-      drop_forged(program, table::kFirstAddress, with_bits(match, field::kVerdict, 0), port);
+      drop_forged(program, table::kFirstAddress, with_bits(at_port, field::kVerdict, 0), port);
     }
   } else if (!port.may_forge) {
     program.add(table::kSources,
                 {.priority = 200,
-                 .match = from(port).with(Field::eth_src, openflow::to_value(*port.address)),
+                 .match = Match(at_port).with(Field::eth_src, openflow::to_value(*port.address)),
                  .actions = {go_to(table::kTags)},
                  .cookie = cookie(Counted::port, port.number)});
-    drop_forged(program, table::kSources, from(port), port);
+    drop_forged(program, table::kSources, at_port, port);
   }
 }
 

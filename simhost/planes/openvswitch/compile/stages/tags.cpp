@@ -63,20 +63,20 @@ class PortTags {
 
   void take_untagged(std::uint16_t vlan) {
     auto const priority = port_.vlan.priority;
-    add(200, from().untagged(), put_in(vlan, priority, Tag::none));
-    add(200, from().vlan(0), put_in(vlan, priority, Tag::goes));
+    add(200, at_port().untagged(), put_in(vlan, priority, Tag::none));
+    add(200, at_port().vlan(0), put_in(vlan, priority, Tag::goes));
   }
   void take_as_second_tag(std::uint16_t vlan) {
-    add(100, from().tagged(), put_above_tag(vlan, port_.vlan.priority));
+    add(100, at_port().tagged(), put_above_tag(vlan, port_.vlan.priority));
   }
   void take_tagged(VlanMask const &mask) {
-    add(100, from().vlan(mask.vlan, mask.mask), put_where_tagged(port_.vlan.priority));
+    add(100, at_port().vlan(mask.vlan, mask.mask), put_where_tagged(port_.vlan.priority));
   }
-  void drop_priority_tagged() { drop(200, from().vlan(0)); }
-  void drop_others() { drop(50, from()); }
+  void drop_priority_tagged() { drop(200, at_port().vlan(0)); }
+  void drop_others() { drop(50, at_port()); }
 
  private:
-  [[nodiscard]] Match from() const { return Match().with(Field::in_port, port_.port); }
+  [[nodiscard]] Match at_port() const { return from(port_.port); }
   void add(std::uint16_t priority, Match const &match, Actions actions) {
     program_.add(table::kTags, {.priority = priority,
                                 .match = match,
@@ -162,7 +162,7 @@ void compile_nested_tags(Plan const &plan, Program &program) {
   for (auto const &port : plan.network.ports) {
     if (port.vlan.nested && sends_frames(port)) {
       program.add(table::kNestedTags, {.priority = 200,
-                                       .match = Match().with(Field::in_port, port.port).tagged(),
+                                       .match = from(port.port).tagged(),
                                        .actions = {check_size(plan), go_to(table::kPrivateVlans)},
                                        .cookie = cookie(Counted::port, port.number)});
     }

@@ -78,7 +78,7 @@ void compile_teams(Plan const &plan, Program &program) {
                           ? over(way->slots.front().front())
                           : Actions{openflow::ToGroup{.group = kSendingGroups | way->number}};
     program.add(table::kTeams, {.priority = 100,
-                                .match = Match().with(Field::in_port, port.port),
+                                .match = from(port.port),
                                 .actions = send,
                                 .cookie = cookie(Counted::port, port.number)});
   }
