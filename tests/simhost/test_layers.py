@@ -64,8 +64,11 @@ BELOW: Dict[str, List[str]] = {
     "planes/openvswitch/transport": ["events"],
     "planes/openvswitch/openflow": ["planes/openvswitch/transport", "events"],
     "planes/openvswitch/ovsdb": ["planes/openvswitch/transport", "events"],
-    "planes/openvswitch/reconcile": ["planes/openvswitch/openflow", "planes/openvswitch/transport"]
-    + ["events"],
+    "planes/openvswitch/reconcile": [
+        "events",
+        "planes/openvswitch/transport",
+        "planes/openvswitch/openflow",
+    ],
     # A pure function, which cannot look at the state.
     "planes/openvswitch/compile": [
         "base",

@@ -11,8 +11,8 @@
 
 namespace simhost::openvswitch {
 
-/// What the rows of Open vSwitch's database have to say. The bridge itself forwards nothing by
-/// itself (fail_mode=secure).
+/// What the rows of Open vSwitch's database have to say. The bridge forwards nothing by itself
+/// (fail_mode=secure).
 struct Rows {
   /// In Open_vSwitch other_config:vlan-limit, for all bridges.
   std::uint32_t most_tags = 2;

@@ -107,10 +107,10 @@ inline constexpr auto kElected = openflow::Field::reg10;
 inline constexpr auto kWire = openflow::Field::reg11;
 /// The number of a mirror session.
 inline constexpr auto kSession = openflow::Field::reg12;
-/// The OpenFlow port of a client that is to get the frame; a list has many.
-inline constexpr auto kReceiver = openflow::Field::reg14;
 /// A tag, as it was in the frame.
 inline constexpr auto kClientTag = openflow::Field::reg13;
+/// The OpenFlow port of a client that is to get the frame; a list has many.
+inline constexpr auto kReceiver = openflow::Field::reg14;
 
 }  // namespace field
 

@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <exception>
 #include <set>
 #include <stdexcept>
 #include <utility>
@@ -57,6 +58,11 @@ std::string text_under(Json const &column, std::string const &wanted) {
 
 std::string id_in(Json const &column) {
   return column.at(1).get<std::string>();
+}
+
+[[noreturn]] void refuse(std::exception const &error) {
+  throw std::runtime_error(
+      fmt::format("Open vSwitch's database says what nobody asked for: {}", error.what()));
 }
 
 // The rows of one reply, by their identifiers.
@@ -270,11 +276,9 @@ PresentRows present_rows(Json const &replies, std::string_view host) {
     }
     return present;
   } catch (std::logic_error const &error) {
-    throw std::runtime_error(
-        fmt::format("Open vSwitch's database says what nobody asked for: {}", error.what()));
+    refuse(error);
   } catch (Json::exception const &error) {
-    throw std::runtime_error(
-        fmt::format("Open vSwitch's database says what nobody asked for: {}", error.what()));
+    refuse(error);
   }
 }
 

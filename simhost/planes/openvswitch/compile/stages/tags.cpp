@@ -109,8 +109,7 @@ void compile_trunk(PortTags &tags, PortVlan const &vlan) {
     tags.drop_priority_tagged();
   }
   // A tag may also say the VLAN of frames without one.
-  auto tagged = *vlan.carried;
-  for (auto const &mask : masks_of(tagged)) {
+  for (auto const &mask : masks_of(*vlan.carried)) {
     tags.take_tagged(mask);
   }
 }
