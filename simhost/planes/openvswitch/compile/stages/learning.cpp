@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "planes/openvswitch/compile/stages/own_addresses.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -50,11 +51,6 @@ void remember_recent(Plan const &plan, Port const &port, Actions &actions) {
                                       .content = static_cast<openflow::Value>(recent)}}});
 }
 
-Match own_source(OwnAddress const &own, Match match) {
-  match.with(Field::eth_src, openflow::to_value(own.address));
-  return own.domain ? match.with(field::kDomain, *own.domain) : match;
-}
-
 void add(Program &program, std::uint16_t priority, Match const &match, Actions actions,
          std::uint32_t number) {
   program.add(table::kLearning, {.priority = priority,
@@ -66,7 +62,8 @@ void add(Program &program, std::uint16_t priority, Match const &match, Actions a
 // An address that stays where it is teaches nothing.
 void pass_over_fixed(Plan const &plan, Program &program) {
   for (auto const &own : plan.own_addresses()) {
-    add(program, 200, own_source(own, Match()), {go_to(table::kLookup)}, own.port->number);
+    add(program, 200, with_address(Match(), Field::eth_src, own), {go_to(table::kLookup)},
+        own.port->number);
   }
   for (auto const &fixed : plan.fixed_places()) {
     auto const match = Match()
@@ -79,7 +76,7 @@ void pass_over_fixed(Plan const &plan, Program &program) {
 // One that moves when it is seen elsewhere moves back when it is seen here.
 void learn_own_again(Plan const &plan, Program &program) {
   for (auto const &own : plan.own_addresses()) {
-    add(program, 200, own_source(own, from(own.port->port)),
+    add(program, 200, with_address(from(own.port->port), Field::eth_src, own),
         {learn(plan, own.port->number, own.port->port, 0), go_to(table::kLookup)},
         own.port->number);
   }

@@ -1,6 +1,7 @@
 // Where a frame's destination is.
 #include <utility>
 
+#include "planes/openvswitch/compile/stages/own_addresses.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -28,12 +29,10 @@ void put(Program &program, std::uint16_t priority, Match match, openflow::Port p
                                        .cookie = cookie(Counted::port, number)});
 }
 
-Match to(EthernetAddress const &address) {
-  return Match().with(Field::eth_dst, openflow::to_value(address));
-}
-
 void put(Plan const &plan, Program &program, FixedPlace const &fixed) {
-  auto const match = to(fixed.address).with(field::kDomain, fixed.domain);
+  auto const match = Match()
+                         .with(Field::eth_dst, openflow::to_value(fixed.address))
+                         .with(field::kDomain, fixed.domain);
   if (!fixed.port) {
     put(program, 300, match, kBeyond, 0);
     return;
@@ -53,12 +52,8 @@ void compile_lookup(Plan const &plan, Program &program) {
                                .actions = look_up(plan, table::kReceiving)});
   program.add(table::kLookup, {.actions = look_up(plan, table::kDispatch)});
   for (auto const &own : plan.own_addresses()) {
-    auto match = to(own.address);
-    if (own.domain) {
-      put(program, 200, match.with(field::kDomain, *own.domain), own.port->port, own.port->number);
-    } else {
-      put(program, 100, match, own.port->port, own.port->number);
-    }
+    put(program, own.domain ? 200 : 100, with_address(Match(), Field::eth_dst, own), own.port->port,
+        own.port->number);
   }
   for (auto const &fixed : plan.fixed_places()) {
     put(plan, program, fixed);

@@ -1,6 +1,7 @@
 // Frames of this switch that the network sends back, over another uplink than they took: a client's
 // own address does not come from outside. Of addresses that are learned, or not known, the last
 // second or two count, so that a client that moved to another host is soon heard there.
+#include "planes/openvswitch/compile/stages/own_addresses.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -13,13 +14,9 @@ Match from_uplink() {
 }
 
 void drop_known(Program &program, OwnAddress const &own) {
-  auto match = from_uplink().with(Field::eth_src, openflow::to_value(own.address));
-  if (own.domain) {
-    match.with(field::kDomain, *own.domain);
-  }
-  program.add(
-      table::kOwnFrames,
-      {.priority = 200, .match = match, .cookie = cookie(Counted::own_frame, own.port->number)});
+  program.add(table::kOwnFrames, {.priority = 200,
+                                  .match = with_address(from_uplink(), Field::eth_src, own),
+                                  .cookie = cookie(Counted::own_frame, own.port->number)});
 }
 
 }  // namespace
