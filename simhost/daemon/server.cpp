@@ -1,4 +1,4 @@
-// Accepting connections and reading questions from them; who does not take a reply loses it.
+// One thing at a time for each connection: its questions wait until it has taken its replies.
 #include "daemon/server.h"
 
 #include <fcntl.h>
@@ -6,8 +6,11 @@
 #include <sys/stat.h>
 #include <sys/un.h>
 
-#include <array>
+#include <cstdint>
 #include <utility>
+#include <vector>
+
+#include "planes/openvswitch/transport/unix_stream.h"
 
 namespace simhost::daemon {
 namespace {
@@ -37,15 +40,21 @@ Descriptor listening(Descriptor const &folder, std::filesystem::path const &path
 }  // namespace
 
 struct Server::Client {
-  Descriptor socket;
+  Client(std::filesystem::path const &path, Descriptor accepted)
+      : stream(path, std::move(accepted)) {}
+
+  openvswitch::UnixStream stream;
   events::Loop::Watch watch;
+  events::Loop::Timer too_late;
   openvswitch::Lines lines;
 };
 
-Server::Server(events::Loop &loop, std::filesystem::path socket, Handle handle)
+Server::Server(events::Loop &loop, std::filesystem::path socket, Handle handle,
+               events::Clock::duration patience)
     : loop_(loop),
       path_(std::move(socket)),
       handle_(std::move(handle)),
+      patience_(patience),
       folder_(events::owned(open(path_.parent_path().c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC),
                             path_.c_str())),
       socket_(listening(folder_, path_)),
@@ -60,44 +69,68 @@ void Server::accept_one() {
   if (!accepted) {
     return;  // gone again, or the next turn finds it
   }
-  auto const client = std::make_shared<Client>();
-  client->socket = std::move(accepted);
-  client->watch =
-      loop_.watch(client->socket.number(), [this, weak = std::weak_ptr<Client>(client)] {
-        if (auto const alive = weak.lock()) {
-          read_from(alive);
-        }
-      });
+  auto const client = std::make_shared<Client>(path_, std::move(accepted));
+  client->watch = loop_.watch(client->stream.fd(), [this, weak = std::weak_ptr<Client>(client)] {
+    if (auto const alive = weak.lock()) {
+      serve(alive);
+    }
+  });
   clients_.insert(client);
 }
 
-void Server::read_from(std::shared_ptr<Client> const &client) {
-  std::array<char, 16384> part{};
-  auto const size = recv(client->socket.number(), part.data(), part.size(), 0);
-  if (size < 0 && (errno == EAGAIN || errno == EINTR)) {
-    return;
-  }
-  if (size <= 0) {
-    clients_.erase(client);
-    return;
-  }
-  client->lines.add({part.data(), static_cast<std::size_t>(size)});
+void Server::serve(std::shared_ptr<Client> const &client) {
   try {
-    while (auto const line = client->lines.next()) {
+    if (client->stream.has_unsent()) {
+      client->stream.send({});
+      wait_for(client);
+    } else {
+      std::vector<std::uint8_t> bytes;
+      client->stream.receive(bytes);
+      client->lines.add({reinterpret_cast<char const *>(bytes.data()), bytes.size()});
+    }
+    while (!client->stream.has_unsent()) {
+      auto const line = client->lines.next();
+      if (!line) {
+        break;
+      }
       handle(client, *line);
     }
+  } catch (openvswitch::Disconnected const &) {
+    clients_.erase(client);
   } catch (openvswitch::NoDaemon const &) {
     clients_.erase(client);
   }
 }
 
+void Server::send(std::shared_ptr<Client> const &client, Json const &said) {
+  auto const text = said.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
+  try {
+    client->stream.send({reinterpret_cast<std::uint8_t const *>(text.data()), text.size()});
+    wait_for(client);
+  } catch (openvswitch::Disconnected const &) {
+    clients_.erase(client);
+  }
+}
+
+// For it to take what is left, or to say more.
+void Server::wait_for(std::shared_ptr<Client> const &client) {
+  if (!client->stream.has_unsent()) {
+    client->too_late.end();
+    client->watch.wait_for(events::Loop::Ready::to_read);
+    return;
+  }
+  client->watch.wait_for(events::Loop::Ready::to_write);
+  if (!client->too_late) {
+    client->too_late = loop_.after(
+        patience_, [this, weak = std::weak_ptr<Client>(client)] { clients_.erase(weak.lock()); });
+  }
+}
+
 void Server::handle(std::shared_ptr<Client> const &client, std::string const &line) {
   auto const question = Json::parse(line, nullptr, false);
-  auto const reply = [weak = std::weak_ptr<Client>(client)](Json const &said) {
+  auto const reply = [this, weak = std::weak_ptr<Client>(client)](Json const &said) {
     if (auto const alive = weak.lock()) {
-      auto const text = said.dump(-1, ' ', false, Json::error_handler_t::replace) + "\n";
-      static_cast<void>(
-          send(alive->socket.number(), text.data(), text.size(), MSG_NOSIGNAL | MSG_DONTWAIT));
+      send(alive, said);
     }
   };
   if (question.is_object()) {

@@ -1,6 +1,7 @@
 // The daemon's end of the line to the processes that use its state.
 #pragma once
 
+#include <chrono>
 #include <filesystem>
 #include <functional>
 #include <memory>
@@ -20,8 +21,10 @@ class Server {
  public:
   using Handle = std::function<void(Json const &question, Reply const &reply)>;
 
-  /// Listens at `socket`, in place of a daemon that is gone. Throws std::runtime_error.
-  Server(events::Loop &loop, std::filesystem::path socket, Handle handle);
+  /// Listens at `socket`, in place of a daemon that is gone. Who does not take what is said to them
+  /// in the time of `patience` is dropped. Throws std::runtime_error.
+  Server(events::Loop &loop, std::filesystem::path socket, Handle handle,
+         events::Clock::duration patience = std::chrono::seconds(10));
   ~Server();
   Server(Server const &) = delete;
   Server &operator=(Server const &) = delete;
@@ -30,12 +33,15 @@ class Server {
   struct Client;
 
   void accept_one();
-  void read_from(std::shared_ptr<Client> const &client);
+  void serve(std::shared_ptr<Client> const &client);
+  void send(std::shared_ptr<Client> const &client, Json const &said);
+  void wait_for(std::shared_ptr<Client> const &client);
   void handle(std::shared_ptr<Client> const &client, std::string const &line);
 
   events::Loop &loop_;
   std::filesystem::path path_;
   Handle handle_;
+  events::Clock::duration patience_;
   events::Descriptor folder_;
   events::Descriptor socket_;
   events::Loop::Watch watch_;

@@ -81,6 +81,15 @@ Loop::Watch &Loop::Watch::operator=(Watch &&other) noexcept {
   return *this;
 }
 
+void Loop::Watch::wait_for(Ready what) {
+  epoll_event event{};
+  event.events = what == Ready::to_write ? EPOLLOUT : EPOLLIN;
+  event.data.fd = descriptor_;
+  if (epoll_ctl(loop_->epoll_.number(), EPOLL_CTL_MOD, descriptor_, &event) != 0) {
+    fail_with_errno("epoll_ctl");
+  }
+}
+
 void Loop::Watch::end() {
   if (auto *const loop = std::exchange(loop_, nullptr)) {
     epoll_ctl(loop->epoll_.number(), EPOLL_CTL_DEL, descriptor_, nullptr);

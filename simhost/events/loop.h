@@ -16,6 +16,8 @@ using Clock = std::chrono::steady_clock;
 class Loop {
  public:
   using Work = std::function<void()>;
+  /// What a descriptor is waited for.
+  enum class Ready { to_read, to_write };
   /// Waits as long as it lives, which is no longer than the loop does.
   class Watch;
   class Timer;
@@ -60,6 +62,8 @@ class Loop::Watch {
   Watch(Watch const &) = delete;
   Watch &operator=(Watch const &) = delete;
 
+  /// Waits for that in place of what it waits for.
+  void wait_for(Ready what);
   void end();
 
  private:

@@ -60,6 +60,21 @@ TEST(ALoop, DoesWhatADescriptorIsWatchedFor) {
   EXPECT_EQ(seen, 1);
 }
 
+TEST(ALoop, WaitsForWhatAWatchIsToWaitFor) {
+  Loop loop;
+  Pipe const pipe;
+  int seen = 0;
+  auto watch = loop.watch(pipe.in.number(), [&] { ++seen; });
+  loop.turn(0ms);
+  EXPECT_EQ(seen, 0);
+  watch.wait_for(Loop::Ready::to_write);
+  loop.turn(10s);
+  EXPECT_EQ(seen, 1);
+  watch.wait_for(Loop::Ready::to_read);
+  loop.turn(0ms);
+  EXPECT_EQ(seen, 1);
+}
+
 TEST(ALoop, LeavesOneAloneThatAnotherEndedInTheSameTurn) {
   Loop loop;
   Pipe const one;

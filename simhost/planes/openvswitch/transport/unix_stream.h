@@ -7,6 +7,7 @@
 #include <span>
 #include <stdexcept>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "events/descriptor.h"
@@ -30,6 +31,9 @@ class UnixStream {
  public:
   /// Throws Disconnected, and TimedOut where nobody accepts.
   UnixStream(std::filesystem::path path, Deadline deadline);
+  /// Over a socket that somebody has connected to at `path`.
+  UnixStream(std::filesystem::path path, events::Descriptor accepted)
+      : path_(std::move(path)), socket_(std::move(accepted)) {}
 
   /// For poll(2): readable when there is something to receive.
   [[nodiscard]] int fd() const { return socket_.number(); }

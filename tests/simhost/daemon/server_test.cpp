@@ -1,0 +1,126 @@
+// Replies arrive whole, and nobody who does not take one holds the daemon up.
+#include "daemon/server.h"
+
+#include <gmock/gmock.h>
+#include <poll.h>
+
+#include <cstdint>
+#include <filesystem>
+#include <future>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "planes/openvswitch/transport/unix_stream.h"
+#include "temporary_folder.h"
+
+namespace {
+
+using simhost::daemon::Reply;
+using simhost::daemon::Server;
+using simhost::events::Clock;
+using simhost::events::Loop;
+using simhost::openvswitch::Deadline;
+using simhost::openvswitch::Json;
+using simhost::openvswitch::UnixStream;
+using namespace std::chrono_literals;
+
+constexpr auto kPatience = 20s;
+
+// Far more than a socket holds.
+std::string large_text() {
+  return std::string(std::size_t{4} << 20, 'x');
+}
+
+struct AServer : testing::Test {
+  void listen(Clock::duration patience = kPatience) {
+    server.emplace(
+        loop, simhost::openvswitch::socket_of(state),
+        [this](Json const &question, Reply const &reply) {
+          if (question.at("ask") == "later") {
+            kept = reply;
+          } else {
+            reply({{"text", large_text()}});
+          }
+        },
+        patience);
+  }
+
+  [[nodiscard]] UnixStream client(std::string_view question) const {
+    UnixStream stream(simhost::openvswitch::socket_of(state), Deadline::clock::now() + kPatience);
+    stream.send({reinterpret_cast<std::uint8_t const *>(question.data()), question.size()});
+    return stream;
+  }
+
+  // Runs the loop until then, and returns whether that came.
+  template <typename Condition>
+  bool comes(Condition const &condition) {
+    auto const deadline = Clock::now() + kPatience;
+    while (!condition() && Clock::now() < deadline) {
+      loop.turn(1ms);
+    }
+    return condition();
+  }
+
+  std::string asked() {
+    auto reply = std::async(std::launch::async, [this] {
+      return simhost::openvswitch::ask(state, {{"ask", "now"}}, kPatience);
+    });
+    comes([&] { return reply.wait_for(0s) == std::future_status::ready; });
+    return reply.get().at("text").get<std::string>();
+  }
+
+  TemporaryFolder folder;
+  std::filesystem::path state = folder.file("h.db");
+  Loop loop;
+  std::optional<Server> server;
+  Reply kept;
+};
+
+bool is_dropped(UnixStream const &client) {
+  pollfd polled{.fd = client.fd(), .events = 0, .revents = 0};
+  return poll(&polled, 1, 0) == 1 && (polled.revents & POLLHUP) != 0;
+}
+
+TEST_F(AServer, SendsAReplyThatIsLargerThanASocketHolds) {
+  listen();
+  EXPECT_TRUE(asked() == large_text());
+}
+
+TEST_F(AServer, DropsAClientThatTakesNothing) {
+  listen(1ms);
+  auto const idle = client("{\"ask\": \"now\"}\n");
+  EXPECT_TRUE(comes([&] { return is_dropped(idle); }));
+}
+
+TEST_F(AServer, LetsQuestionsWaitUntilTheirClientHasTakenItsReply) {
+  listen();
+  auto stream = client("{\"ask\": \"now\"}\n{\"ask\": \"later\"}\n");
+  std::vector<std::uint8_t> taken;
+  auto const is_readable = [&] {
+    pollfd polled{.fd = stream.fd(), .events = POLLIN, .revents = 0};
+    return poll(&polled, 1, 0) == 1;
+  };
+  ASSERT_TRUE(comes(is_readable));
+  EXPECT_FALSE(kept);
+  EXPECT_TRUE(comes([&] {
+    stream.receive(taken);
+    return static_cast<bool>(kept);
+  }));
+}
+
+TEST_F(AServer, GoesOnWhenAClientIsGoneBeforeItsReply) {
+  listen();
+  std::optional<UnixStream> gone(client("{\"ask\": \"later\"}\n"));
+  ASSERT_TRUE(comes([&] { return static_cast<bool>(kept); }));
+  gone.reset();
+  kept({{"text", large_text()}});
+  kept({{"text", "again"}});
+  gone.emplace(client("{\"ask\": \"now\"}\n"));
+  loop.turn(kPatience);
+  gone.reset();
+  EXPECT_TRUE(asked() == large_text());
+}
+
+}  // namespace
