@@ -39,11 +39,6 @@ class Daemon {
   void when_ready(std::function<void()> ready) { ready_ = std::move(ready); }
 
  private:
-  struct Waiting {
-    Reply reply;
-    events::Loop::Timer too_late;
-  };
-
   void connect_later();
   void sync_soon();
   void sync();
