@@ -66,6 +66,11 @@ std::filesystem::path socket_of(Words const &words) {
 }
 
 void serve(Words const &words) {
+  auto const own_folder = folder_of_own(words);
+  if (own_folder) {
+    // Before the state is taken: what changes in it is pending then until a daemon is there.
+    openvswitch::require_package();
+  }
   events::Loop loop;
   events::Signals const signals(loop, {SIGTERM, SIGINT, SIGHUP}, [&](int number) {
     if (number != SIGHUP) {
@@ -80,8 +85,8 @@ void serve(Words const &words) {
   daemon.when_ready([&] { tell_ready(words); });
   // Ends before the daemon does.
   std::optional<PrivateOpenVswitch> own;
-  if (auto const folder = folder_of_own(words)) {
-    own.emplace(loop, *folder, words.datapath == "netdev" ? Datapath::netdev : Datapath::system,
+  if (own_folder) {
+    own.emplace(loop, *own_folder, words.datapath == "netdev" ? Datapath::netdev : Datapath::system,
                 PrivateOpenVswitch::Told{.started = [&] { daemon.connect(); }, .said = say});
     own->start();
   } else {

@@ -8,7 +8,7 @@ from typing import Dict, List
 
 import pytest
 
-from frame_lab import Lab
+from frame_lab import TOOLS, Lab
 
 
 def test_without_a_daemon_changes_are_pending(idle: Lab) -> None:
@@ -129,6 +129,31 @@ def test_a_second_daemon_says_who_is_there(idle: Lab) -> None:
         _, said = second.communicate()
         assert second.returncode == 1
         assert said == (f"simhostd: the process {idle.daemon.pid} has {idle.state}-simhostd.lock\n")
+
+
+@pytest.mark.parametrize(
+    "file",
+    [
+        "/usr/bin/ovsdb-tool",
+        "/usr/sbin/ovsdb-server",
+        "/usr/sbin/ovs-vswitchd",
+        "/usr/share/openvswitch/vswitch.ovsschema",
+    ],
+)
+def test_without_its_package_it_says_which(idle: Lab, file: str) -> None:
+    # The daemon sees something else in place of the file.
+    hide = 'mount --bind /dev/null "$0" && exec "$@"'
+    done = idle.host.try_run(
+        *("unshare", "--mount", "sh", "-c", hide, file),
+        *(str(TOOLS / "simhostd"), "--state", str(idle.state)),
+        *("--openvswitch", f"private:{idle.run_folder()}"),
+    )
+    assert done.returncode == 1
+    assert done.stdout == (
+        "simhostd: a private Open vSwitch needs Debian's package openvswitch-switch: "
+        f"there is no {file}\n"
+    )
+    assert idle.plane()["change"] is None
 
 
 def test_a_device_may_vanish_and_return(lab: Lab) -> None:

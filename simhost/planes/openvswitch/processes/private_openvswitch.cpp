@@ -17,6 +17,9 @@ namespace {
 
 using namespace std::chrono_literals;
 
+constexpr auto *kTool = "/usr/bin/ovsdb-tool";
+constexpr auto *kDatabase = "/usr/sbin/ovsdb-server";
+constexpr auto *kSwitch = "/usr/sbin/ovs-vswitchd";
 constexpr auto *kSchema = "/usr/share/openvswitch/vswitch.ovsschema";
 constexpr auto kPatience = 1s;
 // Between two starts of what does not stay up.
@@ -72,6 +75,17 @@ bool takes_connections(std::filesystem::path const &socket_file) {
 
 }  // namespace
 
+void require_package() {
+  for (auto const *const file : {kTool, kDatabase, kSwitch, kSchema}) {
+    std::error_code error;
+    if (!std::filesystem::is_regular_file(file, error)) {
+      throw std::runtime_error(fmt::format(
+          "a private Open vSwitch needs Debian's package openvswitch-switch: there is no {}",
+          file));
+    }
+  }
+}
+
 PrivateOpenVswitch::PrivateOpenVswitch(events::Loop &loop, std::filesystem::path const &folder,
                                        Datapath datapath, Told told)
     : loop_(loop),
@@ -82,7 +96,7 @@ PrivateOpenVswitch::PrivateOpenVswitch(events::Loop &loop, std::filesystem::path
   // What is to be there is told anew, so that nothing of a former run is believed.
   std::filesystem::remove(folder_ / "conf.db");
   std::filesystem::remove(folder_ / ".conf.db.~lock~");
-  events::run(command("ovsdb-tool", {"create", "conf.db", kSchema}));
+  events::run(command(kTool, {"create", "conf.db", kSchema}));
 }
 
 PrivateOpenVswitch::~PrivateOpenVswitch() {
@@ -116,13 +130,12 @@ void PrivateOpenVswitch::start() {
 void PrivateOpenVswitch::start_database() {
   std::filesystem::remove(folder_ / "db.sock");
   auto const folder = folder_.string();
-  database_.emplace(
-      loop_,
-      command("/usr/sbin/ovsdb-server",
-              {"-vconsole:off", "-vsyslog:off", "conf.db", "--remote=punix:" + folder + "/db.sock",
-               "--unixctl=" + folder + "/ovsdb-server.ctl",
-               "--log-file=" + folder + "/ovsdb-server.log"}),
-      [this](std::string const &how) { restart("ovsdb-server " + how); });
+  database_.emplace(loop_,
+                    command(kDatabase, {"-vconsole:off", "-vsyslog:off", "conf.db",
+                                        "--remote=punix:" + folder + "/db.sock",
+                                        "--unixctl=" + folder + "/ovsdb-server.ctl",
+                                        "--log-file=" + folder + "/ovsdb-server.log"}),
+                    [this](std::string const &how) { restart("ovsdb-server " + how); });
 }
 
 void PrivateOpenVswitch::start_switch_when_database_is_there() {
@@ -142,7 +155,7 @@ void PrivateOpenVswitch::start_switch() {
   if (datapath_ == Datapath::netdev) {
     words.emplace_back("--disable-system");
   }
-  switch_.emplace(loop_, command("/usr/sbin/ovs-vswitchd", std::move(words)),
+  switch_.emplace(loop_, command(kSwitch, std::move(words)),
                   [this](std::string const &how) { restart("ovs-vswitchd " + how); });
   told_.started();
 }

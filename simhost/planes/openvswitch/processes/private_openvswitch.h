@@ -13,6 +13,10 @@ namespace simhost::openvswitch {
 /// Which of Open vSwitch's data paths moves the frames.
 enum class Datapath { netdev, system };
 
+/// Throws std::runtime_error, which names the package to install, if a private Open vSwitch cannot
+/// be run for want of it.
+void require_package();
+
 /// If one of the two processes ends by itself, both are started anew: the switch without its
 /// database stops all frames, and finds back to it more slowly than it starts.
 class PrivateOpenVswitch {
