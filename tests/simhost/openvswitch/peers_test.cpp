@@ -6,6 +6,8 @@
 #include <functional>
 
 #include "peer.h"
+#include "planes/openvswitch/openflow/codec/foreign.h"
+#include "planes/openvswitch/openflow/codec/oxm.h"
 #include "planes/openvswitch/openflow/codec/wire.h"
 #include "planes/openvswitch/openflow/connection.h"
 #include "planes/openvswitch/ovsdb/client.h"
@@ -62,6 +64,20 @@ TEST(Switch, ThatDoesNotKeepToTheProtocolIsNotBelieved) {
   EXPECT_EQ(words_about_switch<Malformed>(hello() + message(kBarrierReply, 2, 5)),
             "a message is of another version of OpenFlow");
   EXPECT_EQ(words_about_switch<Malformed>(hello() + message(10, 0)), "it ends early");
+}
+
+/// The words about a match with this content of vlan_pcp, which has 3 bits.
+std::string words_about_priority(std::uint8_t content) {
+  openflow::Bytes const match{0, 1, 0, 9, 0x80, 0, 7U << 1U, 1, content, 0, 0, 0, 0, 0, 0, 0};
+  return words_of<openflow::Foreign>([&] {
+    openflow::Reader in(match);
+    openflow::take_match(in);
+  });
+}
+
+TEST(Switch, ThatHasMoreBitsInAFieldThanThereAreIsNotMisread) {
+  EXPECT_EQ(words_about_priority(7), "nothing is wrong");
+  EXPECT_EQ(words_about_priority(8), "a content that vlan_pcp cannot have");
 }
 
 TEST(Switch, IsToldThatSomebodyIsThere) {

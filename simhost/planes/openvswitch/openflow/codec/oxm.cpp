@@ -54,7 +54,10 @@ Field get_field(FieldId id) {
 
 Masked take_content(Reader &in, std::size_t bytes, bool has_mask, Value whole) {
   auto const value = in.value(bytes);
-  auto const mask = has_mask ? in.value(bytes) : whole;
+  if (!has_mask) {
+    return {value, whole};
+  }
+  auto const mask = in.value(bytes);
   return {value & mask, mask & whole};
 }
 
