@@ -1,9 +1,15 @@
-// The numbers of actions that both directions need.
+// The numbers of flows and their actions that both directions need.
 #pragma once
 
 #include <cstdint>
 
 namespace simhost::openflow {
+
+/// The instruction that a flow has its actions in.
+inline constexpr std::uint16_t kApplyActions = 4;
+
+/// The flag of a flow that tells of its removal.
+inline constexpr std::uint16_t kSendFlowRemoved = 1;
 
 enum class ActionType : std::uint16_t {
   output = 0,

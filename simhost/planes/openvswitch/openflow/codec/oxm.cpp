@@ -5,11 +5,11 @@
 #include <stdexcept>
 
 #include "planes/openvswitch/openflow/codec/foreign.h"
+#include "planes/openvswitch/openflow/codec/numbers.h"
 
 namespace simhost::openflow {
 namespace {
 
-constexpr std::uint32_t kExperimenter = 0x2320;
 // Open vSwitch tells registers in pairs, of which the first is the upper half.
 constexpr std::uint16_t kPairClass = 0x8001;
 constexpr unsigned kPairs = 8;
@@ -34,9 +34,9 @@ void put_header(Writer &out, Field field, bool has_mask, unsigned length) {
   out.u16(id.oxm_class);
   out.u8(static_cast<std::uint8_t>(id.number << 1U | (has_mask ? 1U : 0U)));
   bool const is_experimenters = id.oxm_class == kExperimenterClass;
-  out.u8(static_cast<std::uint8_t>(length + (is_experimenters ? sizeof kExperimenter : 0)));
+  out.u8(static_cast<std::uint8_t>(length + (is_experimenters ? sizeof kOpenVswitch : 0)));
   if (is_experimenters) {
-    out.u32(kExperimenter);
+    out.u32(kOpenVswitch);
   }
 }
 
@@ -64,7 +64,7 @@ Masked take_content(Reader &in, std::size_t bytes, bool has_mask, Value whole) {
 // What follows a header.
 Reader take_payload(Reader &in, Header const &header) {
   Reader payload(in.take(header.length));
-  if (header.id.oxm_class == kExperimenterClass && payload.u32() != kExperimenter) {
+  if (header.id.oxm_class == kExperimenterClass && payload.u32() != kOpenVswitch) {
     throw_foreign(header.id);
   }
   return payload;

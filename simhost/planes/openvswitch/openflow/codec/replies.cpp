@@ -5,6 +5,7 @@
 #include "planes/openvswitch/openflow/codec/actions.h"
 #include "planes/openvswitch/openflow/codec/foreign.h"
 #include "planes/openvswitch/openflow/codec/groups.h"
+#include "planes/openvswitch/openflow/codec/numbers.h"
 #include "planes/openvswitch/openflow/codec/oxm.h"
 
 namespace simhost::openflow {
@@ -12,8 +13,6 @@ namespace {
 
 using std::chrono::nanoseconds;
 using std::chrono::seconds;
-
-constexpr std::uint16_t kSendFlowRemoved = 1;
 
 /// Runs what reads a part of a flow, and keeps in words what there is no value for.
 template <typename Read>
@@ -32,7 +31,6 @@ void take_match_of(Reader &in, ReadFlow &read) {
 }
 
 void take_instructions(Reader &in, ReadFlow &read) {
-  constexpr std::uint16_t kApplyActions = 4;
   constexpr std::size_t kInstructionHeader = 8;
   while (!in.empty()) {
     auto instruction = take_item(in, 2, kInstructionHeader);

@@ -2,6 +2,7 @@
 
 #include "planes/openvswitch/openflow/codec/actions.h"
 #include "planes/openvswitch/openflow/codec/groups.h"
+#include "planes/openvswitch/openflow/codec/numbers.h"
 #include "planes/openvswitch/openflow/codec/oxm.h"
 
 namespace simhost::openflow {
@@ -9,8 +10,6 @@ namespace {
 
 constexpr std::uint32_t kNoBuffer = 0xffffffff;
 constexpr std::uint32_t kAllBuckets = 0xffffffff;
-constexpr std::uint16_t kApplyActions = 4;
-constexpr std::uint16_t kSendFlowRemoved = 1;
 constexpr std::uint16_t kAtomic = 1;
 constexpr std::uint16_t kOrdered = 2;
 constexpr std::uint8_t kAddMonitor = 0;

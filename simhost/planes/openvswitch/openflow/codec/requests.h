@@ -15,7 +15,7 @@ void put_echo_reply(Writer &out, Xid xid, BytesView payload);
 void put_barrier_request(Writer &out, Xid xid);
 
 // Throw std::invalid_argument for what has no form on the wire, and std::length_error for what is
-// too long; nothing is put then.
+// too long. What is put by then is no message: none of it is to be sent.
 
 void put_change(Writer &out, Xid xid, Change const &change);
 void put_packet_out(Writer &out, Xid xid, PacketOut const &packet);
