@@ -132,7 +132,9 @@ TEST(Compiling, ChangesNoFlowOfAnotherPort) {
   auto const before = with_uplinks();
   auto after = before;
   after.ports[0].vlan.priority = 5;
-  for (auto const &flow : only_in(after, before)) {
+  auto const changed = only_in(after, before);
+  EXPECT_THAT(changed, Not(IsEmpty()));
+  for (auto const &flow : changed) {
     EXPECT_EQ(flow.cookie, cookie(Counted::port, 1)) << to_text(flow);
   }
   after.disabled = true;
