@@ -1,6 +1,7 @@
 // What a switch may send: any bytes are read or refused, and what is read as a change of flows or
 // groups is put and read again as the same.
 
+#include "planes/openvswitch/openflow/codec/groups.h"
 #include "planes/openvswitch/openflow/codec/messages.h"
 #include "planes/openvswitch/openflow/codec/replies.h"
 #include "planes/openvswitch/openflow/codec/requests.h"
@@ -67,15 +68,46 @@ void check(FlowEntry const &entry) {
   require(again.foreign.empty() && again.flow == entry.flow, "a flow is read again as it was");
 }
 
-void check(GroupEntry const &entry) {
-  require(!to_text(entry.group).empty(), "a group has a text");
-  if (entry.foreign.empty()) {
-    try {
-      put_group(entry.group);
-    } catch (std::length_error const &) {
-    } catch (std::invalid_argument const &) {
+/// What of a group is put: weights where they count, and how it selects if a method says so.
+Group put_part(Group group) {
+  if (group.type != GroupType::select) {
+    for (auto &bucket : group.buckets) {
+      bucket.weight = Bucket().weight;
     }
   }
+  if (group.selection.method.empty()) {
+    group.selection = {};
+  }
+  return group;
+}
+
+/// A group that is put, as far as a reply has the same form.
+Group read_again(Group const &group) {
+  constexpr std::size_t kBeforeSize = 16;
+  auto const change = put_group(group);
+  Reader in(BytesView(change).subspan(kBeforeSize));
+  auto const size = in.u16();
+  in.skip(6);
+  Reader buckets(in.take(size));
+  Group again{group.id, group.type, {}, take_buckets(buckets)};
+  again.selection = take_group_properties(in);
+  return again;
+}
+
+void check(GroupEntry const &entry) {
+  require(!to_text(entry.group).empty(), "a group has a text");
+  if (!entry.foreign.empty()) {
+    return;
+  }
+  Group again;
+  try {
+    again = read_again(entry.group);
+  } catch (std::length_error const &) {
+    return;
+  } catch (std::invalid_argument const &) {
+    return;
+  }
+  require(again == put_part(entry.group), "a group is read again as it was");
 }
 
 template <typename Item>

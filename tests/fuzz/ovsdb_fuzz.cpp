@@ -48,12 +48,6 @@ Outcome split(std::uint8_t const *data, std::size_t size, std::size_t step) {
   return outcome;
 }
 
-void require_order(Json const &value) {
-  if (value.is_array() && value.size() == 2 && value[0] == "set") {
-    require(set(atoms_of(value)) == value, "a set is in order");
-  }
-}
-
 void follow(std::vector<Json> const &messages) {
   Replica replica(followed());
   try {
@@ -70,7 +64,8 @@ void follow(std::vector<Json> const &messages) {
       require(row.size() == followed().at(table).size(), "a row has all columns");
       for (auto const &[name, column] : followed().at(table)) {
         if (column.kind == Column::Kind::set) {
-          require_order(row.at(name));
+          auto const &value = row.at(name);
+          require(set(atoms_of(value)) == value, "a set is one, and in order");
         }
       }
     }
