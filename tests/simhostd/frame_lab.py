@@ -10,7 +10,7 @@ import sys
 import time
 from pathlib import Path
 from types import TracebackType
-from typing import Any, Dict, Iterator, List, Mapping, Optional, Type
+from typing import Any, Callable, Dict, Iterator, List, Mapping, Optional, Type
 
 from namespaces import PATIENCE, Namespace, own_user_needed
 
@@ -29,6 +29,15 @@ ONE_SWITCH: Dict[str, Any] = {
 }
 # Both ends of a wire must have another index: a lost carrier is told late otherwise.
 _INDEXES = itertools.count(1000)
+
+
+def comes_true(condition: Callable[[], bool]) -> bool:
+    """Whether it is true at some time."""
+    deadline = time.monotonic() + PATIENCE
+    while time.monotonic() < deadline:
+        if condition():
+            return True
+    return False
 
 
 class Client:
@@ -57,11 +66,7 @@ class Client:
 
     def comes_to_reach(self, other: "Client") -> bool:
         """Likewise, at some time."""
-        deadline = time.monotonic() + PATIENCE
-        while time.monotonic() < deadline:
-            if self.reaches(other):
-                return True
-        return False
+        return comes_true(lambda: self.reaches(other))
 
 
 class Lab:
@@ -144,6 +149,10 @@ class Lab:
     def plane(self) -> Dict[str, Any]:
         said: Dict[str, Any] = json.loads(self.ctl("plane", "--json"))
         return said
+
+    def is_in_force(self) -> bool:
+        plane = self.plane()
+        return bool(plane["change"] == plane["in_force"])
 
     # The daemon.
 
