@@ -1,10 +1,8 @@
 // One thing at a time for each connection: its questions wait until it has taken its replies.
 #include "daemon/server.h"
 
-#include <fcntl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/un.h>
 
 #include <cstdint>
 #include <utility>
@@ -17,19 +15,12 @@ namespace {
 
 using events::Descriptor;
 
-// The folder is looked at through a descriptor, because an address of a socket is short.
-Descriptor listening(Descriptor const &folder, std::filesystem::path const &path) {
+Descriptor listening(events::UnixAddress const &address, std::filesystem::path const &path) {
   auto socket_ =
       events::owned(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0), "socket");
-  sockaddr_un address{};
-  address.sun_family = AF_UNIX;
-  openvswitch::short_path(folder.number(), path)
-      .string()
-      .copy(static_cast<char *>(address.sun_path), sizeof address.sun_path - 1);
-  unlinkat(folder.number(), path.filename().c_str(), 0);
+  unlinkat(address.folder(), path.filename().c_str(), 0);
   auto const before = umask(S_IRWXG | S_IRWXO);
-  auto const bound =
-      bind(socket_.number(), reinterpret_cast<sockaddr const *>(&address), sizeof address);
+  auto const bound = bind(socket_.number(), address.get(), address.size());
   umask(before);
   if (bound != 0 || listen(socket_.number(), SOMAXCONN) != 0) {
     events::fail_with_errno(path.string());
@@ -55,13 +46,12 @@ Server::Server(events::Loop &loop, std::filesystem::path socket, Handle handle,
       path_(std::move(socket)),
       handle_(std::move(handle)),
       patience_(patience),
-      folder_(events::owned(open(path_.parent_path().c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC),
-                            path_.c_str())),
-      socket_(listening(folder_, path_)),
+      address_(path_),
+      socket_(listening(address_, path_)),
       watch_(loop_.watch(socket_.number(), [this] { accept_one(); })) {}
 
 Server::~Server() {
-  unlinkat(folder_.number(), path_.filename().c_str(), 0);
+  unlinkat(address_.folder(), path_.filename().c_str(), 0);
 }
 
 void Server::accept_one() {

@@ -8,6 +8,7 @@
 #include <set>
 
 #include "events/loop.h"
+#include "events/unix_address.h"
 #include "planes/openvswitch/line/line.h"
 
 namespace simhost::daemon {
@@ -42,7 +43,7 @@ class Server {
   std::filesystem::path path_;
   Handle handle_;
   events::Clock::duration patience_;
-  events::Descriptor folder_;
+  events::UnixAddress address_;
   events::Descriptor socket_;
   events::Loop::Watch watch_;
   std::set<std::shared_ptr<Client>> clients_;

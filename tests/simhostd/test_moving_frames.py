@@ -27,6 +27,15 @@ def test_it_takes_no_privileges_where_namespaces_of_users_are_allowed(tmp_path: 
         assert one.reaches(other, attempts=5)
 
 
+def test_a_folder_may_have_a_name_longer_than_the_address_of_a_socket(tmp_path: Path) -> None:
+    folder = tmp_path / ("d" * 150)
+    folder.mkdir()
+    with Lab(folder, ONE_SWITCH) as lab:
+        lab.start()
+        one, other = lab.client("lab", "a"), lab.client("lab", "b")
+        assert one.reaches(other, attempts=5)
+
+
 def test_an_uplink_fails_and_frames_go_on(lab: Lab) -> None:
     far, near = lab.far_client("nic0", "nic1"), lab.client("lab", "a")
     assert near.comes_to_reach(far)

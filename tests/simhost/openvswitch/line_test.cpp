@@ -3,13 +3,13 @@
 
 #include <gmock/gmock.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 #include <unistd.h>
 
 #include <filesystem>
 #include <string>
 #include <thread>
 
+#include "events/unix_address.h"
 #include "temporary_folder.h"
 
 namespace {
@@ -43,11 +43,8 @@ class Peer {
  public:
   Peer(std::filesystem::path const &state, std::string said)
       : socket_(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
-    sockaddr_un address{};
-    address.sun_family = AF_UNIX;
-    simhost::openvswitch::socket_of(state).string().copy(static_cast<char *>(address.sun_path),
-                                                         sizeof address.sun_path - 1);
-    bind(socket_, reinterpret_cast<sockaddr const *>(&address), sizeof address);
+    simhost::events::UnixAddress const address(simhost::openvswitch::socket_of(state));
+    bind(socket_, address.get(), address.size());
     listen(socket_, 1);
     thread_ = std::thread([this, said = std::move(said)] {
       int const client = accept(socket_, nullptr, nullptr);
@@ -88,6 +85,10 @@ TEST(AQuestion, IsRepliedTo) {
 TEST(AQuestion, ToNobodyIsToldAtOnce) {
   TemporaryFolder const folder;
   EXPECT_THAT(refusal(folder.file("h.db")), StrEq("no simhostd: No such file or directory"));
+  EXPECT_THAT(refusal(folder.file("none") / "h.db"),
+              StrEq("no simhostd: No such file or directory"));
+  EXPECT_THAT(refusal(folder.file(std::string(120, 'h').c_str())),
+              StrEq("no simhostd: File name too long"));
 }
 
 TEST(AQuestion, ToOneThatEndsOrSaysAnythingIsTold) {
@@ -104,8 +105,10 @@ TEST(AQuestion, GoesToASocketWhateverItsFolderIsCalled) {
   TemporaryFolder const folder;
   auto const deep = folder.file("x") / std::string(120, 'd');
   std::filesystem::create_directories(deep);
-  // No address of a socket is that long.
   EXPECT_THAT(refusal(deep / "h.db"), HasSubstr("No such file"));
+  // No address of a socket is that long.
+  Peer const peer(deep / "h.db", "{\"change\": 7}\n");
+  EXPECT_EQ(ask(deep / "h.db", {{"ask", "status"}}, 10s)["change"], 7);
 }
 
 }  // namespace

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <sys/socket.h>
-#include <sys/un.h>
 
 #include <algorithm>
 #include <array>
@@ -13,6 +12,7 @@
 #include <utility>
 
 #include "events/descriptor.h"
+#include "events/unix_address.h"
 #include "temporary_folder.h"
 
 namespace simhost::openvswitch {
@@ -22,14 +22,10 @@ class Peer {
   /// Says this to whoever connects first, and listens until that closes the connection.
   explicit Peer(std::string said)
       : listener_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)), said_(std::move(said)) {
-    sockaddr_un address{};
-    address.sun_family = AF_UNIX;
-    auto const path = socket();
-    path.native().copy(std::begin(address.sun_path), sizeof address.sun_path - 1);
-    auto const *const generic = reinterpret_cast<sockaddr const *>(&address);
-    if (::bind(listener_.number(), generic, sizeof address) != 0 ||
+    events::UnixAddress const address(socket());
+    if (::bind(listener_.number(), address.get(), address.size()) != 0 ||
         ::listen(listener_.number(), 1) != 0) {
-      events::fail_with_errno(path.native());
+      events::fail_with_errno(socket().native());
     }
     thread_ = std::thread([this] { serve(); });
   }

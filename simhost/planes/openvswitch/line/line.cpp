@@ -1,17 +1,16 @@
 // Asking over a connection for each question, so that a fork shares none.
 #include "planes/openvswitch/line/line.h"
 
-#include <fcntl.h>
 #include <fmt/format.h>
 #include <poll.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 
 #include <array>
 #include <cerrno>
 #include <system_error>
 
 #include "events/descriptor.h"
+#include "events/unix_address.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -24,21 +23,17 @@ using Clock = std::chrono::steady_clock;
 }
 
 Descriptor connected(std::filesystem::path const &path) {
-  Descriptor const folder(open(path.parent_path().c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-  if (!folder) {
-    fail("no simhostd", errno);
+  try {
+    events::UnixAddress const address(path);
+    auto socket_ =
+        events::owned(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0), "socket");
+    if (connect(socket_.number(), address.get(), address.size()) != 0) {
+      fail("no simhostd", errno);
+    }
+    return socket_;
+  } catch (std::system_error const &error) {
+    fail("no simhostd", error.code().value());
   }
-  Descriptor socket_(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
-  sockaddr_un address{};
-  address.sun_family = AF_UNIX;
-  short_path(folder.number(), path)
-      .string()
-      .copy(static_cast<char *>(address.sun_path), sizeof address.sun_path - 1);
-  if (connect(socket_.number(), reinterpret_cast<sockaddr const *>(&address), sizeof address) !=
-      0) {
-    fail("no simhostd", errno);
-  }
-  return socket_;
 }
 
 // Waits until the socket is ready for `event`.
@@ -99,10 +94,6 @@ std::filesystem::path socket_of(std::filesystem::path const &state) {
   auto socket = state;
   socket += "-simhostd";
   return socket;
-}
-
-std::filesystem::path short_path(int folder, std::filesystem::path const &socket) {
-  return std::filesystem::path("/proc/self/fd") / std::to_string(folder) / socket.filename();
 }
 
 std::optional<std::string> Lines::next() {

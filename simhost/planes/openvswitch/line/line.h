@@ -42,8 +42,4 @@ class Lines {
 Json ask(std::filesystem::path const &state, Json const &question,
          std::chrono::milliseconds patience);
 
-/// The address of a unix socket, however long the name of its folder is: through a descriptor of
-/// the folder, which must be open while the address is in use.
-std::filesystem::path short_path(int folder, std::filesystem::path const &socket);
-
 }  // namespace simhost::openvswitch

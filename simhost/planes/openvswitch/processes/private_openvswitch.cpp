@@ -4,13 +4,14 @@
 #include <fcntl.h>
 #include <fmt/format.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 
 #include <algorithm>
 #include <cstring>
 #include <stdexcept>
 #include <system_error>
 #include <utility>
+
+#include "events/unix_address.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -36,13 +37,6 @@ std::filesystem::path made(std::filesystem::path const &folder) {
     throw std::runtime_error(fmt::format("the folder {} of the Open vSwitch cannot be used: {}",
                                          folder.string(), error.message()));
   }
-  // Sockets of bridges are in it, and no address of one may be longer.
-  constexpr std::size_t kLongestFolder = sizeof(sockaddr_un::sun_path) - 32;
-  if (absolute.string().size() > kLongestFolder) {
-    throw std::runtime_error(fmt::format(
-        "the folder {} of the Open vSwitch cannot be used: its name has more than {} bytes",
-        folder.string(), kLongestFolder));
-  }
   return absolute;
 }
 
@@ -64,13 +58,12 @@ events::Descriptor locked(std::filesystem::path const &folder) {
   return lock;
 }
 
-bool takes_connections(std::filesystem::path const &socket_file) {
-  sockaddr_un address{};
-  address.sun_family = AF_UNIX;
-  socket_file.string().copy(static_cast<char *>(address.sun_path), sizeof address.sun_path - 1);
+bool takes_connections(std::filesystem::path const &socket_file) try {
+  events::UnixAddress const address(socket_file);
   events::Descriptor const client(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  return connect(client.number(), reinterpret_cast<sockaddr const *>(&address), sizeof address) ==
-         0;
+  return connect(client.number(), address.get(), address.size()) == 0;
+} catch (std::system_error const &) {
+  return false;  // without its folder the database ends, which is seen
 }
 
 }  // namespace

@@ -2,13 +2,15 @@
 
 #include <poll.h>
 #include <sys/socket.h>
-#include <sys/un.h>
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <system_error>
 #include <thread>
 #include <utility>
+
+#include "events/unix_address.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -23,15 +25,12 @@ events::Descriptor make_socket() {
   return events::Descriptor(number);
 }
 
-sockaddr_un address_of(std::filesystem::path const &path) {
-  sockaddr_un address{};
-  address.sun_family = AF_UNIX;
-  auto const &text = path.native();
-  if (text.size() >= sizeof address.sun_path) {
-    throw Disconnected(text + ": a socket's path has at most 107 bytes");
+events::UnixAddress address_of(std::filesystem::path const &path) {
+  try {
+    return events::UnixAddress(path);
+  } catch (std::system_error const &error) {
+    throw Disconnected(path.native() + ": " + error_words(error.code().value()));
   }
-  std::copy(text.begin(), text.end(), std::begin(address.sun_path));
-  return address;
 }
 
 }  // namespace
@@ -39,8 +38,7 @@ sockaddr_un address_of(std::filesystem::path const &path) {
 UnixStream::UnixStream(std::filesystem::path path, Deadline deadline)
     : path_(std::move(path)), socket_(make_socket()) {
   auto const address = address_of(path_);
-  auto const *const generic = reinterpret_cast<sockaddr const *>(&address);
-  while (::connect(fd(), generic, sizeof address) != 0) {
+  while (::connect(fd(), address.get(), address.size()) != 0) {
     // A full backlog tells nobody when there is room again.
     if (errno != EAGAIN && errno != EINTR) {
       fail(errno);
