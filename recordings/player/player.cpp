@@ -5,7 +5,6 @@
 
 #include <algorithm>
 #include <atomic>
-#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <deque>
@@ -13,6 +12,7 @@
 #include <mutex>
 #include <string_view>
 
+#include "recordings/core/kept_errno.h"
 #include "recordings/core/of_thread.h"
 #include "recordings/core/process.h"
 #include "recordings/core/signatures.h"
@@ -55,18 +55,6 @@ struct Thread {
   pid_t process = 0;
   ThreadPlace place;
   std::vector<InProgress> calls;
-};
-
-/// The tool may look at it after a call that does not touch it.
-class KeptErrno {
- public:
-  KeptErrno() : value_(errno) {}
-  KeptErrno(KeptErrno const &) = delete;
-  KeptErrno &operator=(KeptErrno const &) = delete;
-  ~KeptErrno() { errno = value_; }
-
- private:
-  int value_;
 };
 
 /// What is played in this process; the trace that the environment names is read when it is needed.

@@ -1,10 +1,10 @@
 #include "recordings/recorder/frames.h"
 
 #include <atomic>
-#include <cerrno>
 #include <cstring>
 
 #include "recordings/core/identities.h"
+#include "recordings/core/kept_errno.h"
 #include "recordings/core/of_thread.h"
 #include "recordings/core/process.h"
 #include "recordings/core/trap.h"
@@ -69,18 +69,6 @@ bool take_trap(Thread const &thread, std::uint64_t &before) {
 bool trap_is_there() {
   return &exception_buffer != nullptr && &exceptionType != nullptr && &exceptionMsg != nullptr;
 }
-
-/// Tools may look at errno after a call, and hosts after a callback.
-class KeptErrno {
- public:
-  KeptErrno() : value_(errno) {}
-  KeptErrno(KeptErrno const &) = delete;
-  KeptErrno &operator=(KeptErrno const &) = delete;
-  ~KeptErrno() { errno = value_; }
-
- private:
-  int value_;
-};
 
 Line &start_line(Thread &thread, std::string_view what, std::uint64_t number) {
   thread.line.clear();
