@@ -3,17 +3,15 @@
 
 #include <cstdint>
 
-struct _object;
-
 namespace recordings {
 
 struct Ending {
   enum class Way : std::uint8_t { returns, traps, fails };
 
   Way way;
-  std::uint64_t word;  ///< what is returned
-  int value;           ///< of the jump
-  _object *type;       ///< of what is raised; borrowed
+  std::uint64_t word;      ///< what is returned
+  int value;               ///< of the jump
+  char const *class_name;  ///< of what is raised, which stays; null for none
 };
 
 }  // namespace recordings

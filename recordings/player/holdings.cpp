@@ -79,10 +79,8 @@ void Holdings::retire(std::uint64_t address) {
   }
 }
 
-std::uint64_t Holdings::text(Bytes const &text) {
-  // With its NUL, which ends what a tool reads.
-  auto const &kept = *texts_.emplace(text.begin(), text.end()).first;
-  return reinterpret_cast<std::uint64_t>(kept.data());
+char const *Holdings::text(std::string const &text) {
+  return texts_.insert(text).first->c_str();
 }
 
 void Holdings::keep_functions(std::uint64_t list, ListFunctions functions) {

@@ -47,7 +47,7 @@ class Holdings {
   void release(std::uint64_t address);
 
   /// A text that stays where it is.
-  [[nodiscard]] std::uint64_t text(Bytes const &text);
+  [[nodiscard]] char const *text(std::string const &text);
 
   void keep_functions(std::uint64_t list, ListFunctions functions);
   [[nodiscard]] ListFunctions functions_of(std::uint64_t list) const;

@@ -19,11 +19,6 @@
 #include "recordings/player/playing.h"
 #include "recordings/player/trap.h"
 
-extern "C" {
-// NOLINTNEXTLINE(readability-identifier-naming): the interpreter's own name
-extern struct _object *PyExc_RuntimeError __attribute__((weak));
-}
-
 namespace recordings {
 namespace {
 
@@ -122,11 +117,11 @@ Ending failed(std::string const &words) {
     state().playing->note_failure(words);
   }
   keep_trap_text(in_one_line(words));
-  auto *const type = &PyExc_RuntimeError == nullptr ? nullptr : PyExc_RuntimeError;
-  return {Ending::Way::fails, 1, 1, type};
+  return {Ending::Way::fails, 1, 1, "RuntimeError"};
 }
 
-/// Does a part of a call; whatever is wrong ends the call.
+/// Does a part of a call; whatever is wrong ends the call. No part may wait for the interpreter: a
+/// thread that has its lock may be waiting for this one.
 template <typename Part>
 Ending carefully(Part part) noexcept {
   KeptErrno const kept;
@@ -206,7 +201,7 @@ std::uint64_t call_back(Callback const &callback) {
 /// Jumps, or ends the process where nothing leads anywhere.
 [[noreturn]] void raise(Call const &call, SavedTrap const &trap, Ending const &ending) noexcept {
   if (call.is_armed && is_armed(trap)) {
-    spring_trap(trap, ending.type, ending.word != 0, ending.value);
+    spring_trap(trap, ending.class_name, ending.word != 0, ending.value);
   }
   if (ending.way == Ending::Way::traps) {
     tell(kept_trap_text());

@@ -349,7 +349,7 @@ Ending Playing::end(InProgress const &progress, Words words) {
     return {.way = Ending::Way::traps,
             .word = text.is_string() ? 1U : 0U,
             .value = value.is_number_integer() ? value.get<int>() : 1,
-            .type = type.is_string() ? exception_named(type.get<std::string>()) : nullptr};
+            .class_name = type.is_string() ? holdings_.text(type.get<std::string>()) : nullptr};
   }
   try {
     if (succeeded(call, end)) {
@@ -413,7 +413,9 @@ std::uint64_t Playing::returned(Call const &call, Json const &end) {
   if (call.result == Result::handle) {
     return holdings_.address_of(result.word);
   }
-  return call.result == Result::text ? holdings_.text(result.bytes) : 0;
+  return call.result == Result::text
+             ? reinterpret_cast<std::uint64_t>(holdings_.text(result.bytes.data()))
+             : 0;
 }
 
 void Playing::note_failure(std::string const &words) {

@@ -16,7 +16,6 @@ extern "C" {
 #pragma weak exceptionType
 #pragma weak exceptionMsg
 // NOLINTBEGIN(readability-identifier-naming): the interpreter's own names
-extern struct _object *PyExc_RuntimeError __attribute__((weak));
 extern struct _object *PyErr_NewException(char const *name, struct _object *base,
                                           struct _object *dict) __attribute__((weak));
 extern int PyGILState_Ensure(void) __attribute__((weak));
@@ -39,14 +38,25 @@ _object *made_exception(std::string const &name) {
   if (PyErr_NewException == nullptr || PyGILState_Ensure == nullptr) {
     return nullptr;
   }
-  static std::map<std::string, _object *> made;
   int const state = PyGILState_Ensure();
+  // No other lock is held. Never destroyed: tools call until the very end of their process.
+  static auto &made = *new std::map<std::string, _object *>;
   _object *&type = made[name];
   if (type == nullptr) {
     type = PyErr_NewException(("recorded." + name).c_str(), nullptr, nullptr);
   }
   PyGILState_Release(state);
   return type;
+}
+
+/// The class of that name; null without an interpreter.
+_object *exception_named(std::string_view name) {
+  auto const symbol = "PyExc_" + std::string(name);
+  if (void *const own = dlsym(RTLD_DEFAULT, symbol.c_str())) {
+    return *static_cast<_object **>(own);
+  }
+  auto const plain = name.substr(name.rfind('.') + 1);
+  return made_exception(std::string(plain));
 }
 
 }  // namespace
@@ -84,20 +94,14 @@ char *kept_trap_text() noexcept {
   return the_text.data();
 }
 
-void spring_trap(SavedTrap const &saved, _object *type, bool has_text, int value) noexcept {
+void spring_trap(SavedTrap const &saved, char const *class_name, bool has_text,
+                 int value) noexcept {
+  auto *const type = class_name == nullptr ? nullptr : exception_named(class_name);
+  // After that, in which other threads may have had their turn.
   restore_trap(saved);
   exceptionType = type;
   exceptionMsg = has_text ? the_text.data() : nullptr;
   longjmp(exception_buffer, value);
-}
-
-_object *exception_named(std::string_view name) {
-  auto const symbol = "PyExc_" + std::string(name);
-  if (void *const own = dlsym(RTLD_DEFAULT, symbol.c_str())) {
-    return *static_cast<_object **>(own);
-  }
-  auto const plain = name.substr(name.rfind('.') + 1);
-  return made_exception(std::string(plain));
 }
 
 }  // namespace recordings

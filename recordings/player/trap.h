@@ -5,8 +5,6 @@
 
 #include <string_view>
 
-struct _object;
-
 namespace recordings {
 
 /// Where the trap leads. Plain memory, so that a jump may cross it.
@@ -27,12 +25,10 @@ void restore_trap(SavedTrap const &saved) noexcept;
 void keep_trap_text(std::string_view text) noexcept;
 char *kept_trap_text() noexcept;
 
-/// Jumps. `has_text` is false for a trap that was recorded without one.
-[[noreturn]] void spring_trap(SavedTrap const &saved, _object *type, bool has_text,
+/// Jumps, with the class of that name: the interpreter's own, or one that is made for it, which may
+/// wait for the interpreter. The name is null, and `has_text` false, for a trap that was recorded
+/// without.
+[[noreturn]] void spring_trap(SavedTrap const &saved, char const *class_name, bool has_text,
                               int value) noexcept;
-
-/// The class of that name: the interpreter's own, or one that is made for it. Null without an
-/// interpreter.
-_object *exception_named(std::string_view name);
 
 }  // namespace recordings
