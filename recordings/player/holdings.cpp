@@ -50,18 +50,22 @@ std::optional<std::uint64_t> Holdings::number_of(std::uint64_t address) const {
 }
 
 void Holdings::release(std::uint64_t address) {
-  auto const found = held_.find(address);
-  if (found == held_.end()) {
-    return;
+  if (auto const number = forget(address)) {
+    functions_.erase(*number);
+    retire(address);
   }
-  auto const number = found->second.number;
-  held_.erase(found);
-  if (auto const known = addresses_.find(number);
-      known != addresses_.end() && known->second == address) {
-    addresses_.erase(known);
+}
+
+std::optional<std::uint64_t> Holdings::forget(std::uint64_t address) {
+  auto const number = number_of(address);
+  if (number) {
+    held_.erase(address);
+    if (auto const known = addresses_.find(*number);
+        known != addresses_.end() && known->second == address) {
+      addresses_.erase(known);
+    }
   }
-  functions_.erase(number);
-  retire(address);
+  return number;
 }
 
 void Holdings::retire(std::uint64_t address) {
@@ -102,8 +106,10 @@ std::uint64_t Holdings::allocate(std::size_t size) {
 }
 
 void Holdings::remember(std::uint64_t number, std::uint64_t address, std::size_t size) {
+  // A tool may have released memory of its own that nobody saw it release, and get it again.
+  forget(address);
   addresses_[number] = address;
-  held_.insert_or_assign(address, Held{number, size});
+  held_.emplace(address, Held{number, size});
 }
 
 }  // namespace recordings

@@ -66,6 +66,7 @@ class Holdings {
   };
 
   std::uint64_t allocate(std::size_t size);
+  std::optional<std::uint64_t> forget(std::uint64_t address);
   void retire(std::uint64_t address);
   void remember(std::uint64_t number, std::uint64_t address, std::size_t size);
 
@@ -73,6 +74,7 @@ class Holdings {
   std::deque<std::uint64_t> released_;               ///< of those, the oldest first
   std::size_t released_bytes_ = 0;
   std::unordered_map<std::uint64_t, Held> held_;  ///< by address, what is given out
+  /// By number; each address of these is in held_, with that number.
   std::unordered_map<std::uint64_t, std::uint64_t> addresses_;
   std::unordered_map<std::uint64_t, std::uint64_t> own_;
   std::unordered_set<std::string> texts_;
