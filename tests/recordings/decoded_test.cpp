@@ -117,10 +117,20 @@ TEST(Decoded, APackedListComesOutAsItWasWritten) {
 }
 
 struct Refused {
-  char const *record;
+  char const *name;  ///< of the record, or of the call
   char const *given;
   char const *said;
 };
+
+template <typename Decode>
+void expect_refused(char const *given, char const *said, Decode decode) {
+  try {
+    decode(Json::parse(given));
+    ADD_FAILURE() << "nobody refused " << given;
+  } catch (Misfit const &misfit) {
+    EXPECT_STREQ(misfit.what(), said);
+  }
+}
 
 TEST(Decoded, WhatDoesNotFitARecordIsRefused) {
   std::vector<Refused> const all{
@@ -179,12 +189,9 @@ TEST(Decoded, WhatDoesNotFitARecordIsRefused) {
        "VSRuntimeOptions.VSRuntimeOptionHeader[0].data: has 0 bytes, and not 1"},
   };
   for (Refused const &one : all) {
-    try {
-      decode_record(record_named(one.record), Json::parse(one.given), no_form);
-      ADD_FAILURE() << "nobody refused " << one.given;
-    } catch (Misfit const &misfit) {
-      EXPECT_STREQ(misfit.what(), one.said);
-    }
+    expect_refused(one.given, one.said, [&](Json const &given) {
+      decode_record(record_named(one.name), given, no_form);
+    });
   }
 }
 
@@ -204,14 +211,8 @@ TEST(Decoded, InputsAreWhatTheCallerGave) {
   EXPECT_EQ(static_cast<std::int64_t>(negative[2].word), -1);
 }
 
-struct RefusedInput {
-  char const *call;
-  char const *given;
-  char const *said;
-};
-
 TEST(Decoded, WhatDoesNotFitTheInputsIsRefused) {
-  std::vector<RefusedInput> const all{
+  std::vector<Refused> const all{
       {"VSDVS_SetMTU", R"([])", "in: is no object: []"},
       {"VSDVS_SetMTU", R"({"switchName": "lab"})", "in: lacks mtu"},
       {"VSQEX_GetRuntimeOptions", R"({"ids": {"unread": "it is longer"}, "count": 3})",
@@ -235,13 +236,9 @@ TEST(Decoded, WhatDoesNotFitTheInputsIsRefused) {
        R"({"switchName": "lab", "port": 1, "mode": 3, "group": {"bytes": "ef010203"}})",
        "in.group.bytes: has 4 bytes, and not 16"},
   };
-  for (RefusedInput const &one : all) {
-    try {
-      decode_inputs(call_named(one.call), Json::parse(one.given));
-      ADD_FAILURE() << "nobody refused " << one.given;
-    } catch (Misfit const &misfit) {
-      EXPECT_STREQ(misfit.what(), one.said);
-    }
+  for (Refused const &one : all) {
+    expect_refused(one.given, one.said,
+                   [&](Json const &given) { decode_inputs(call_named(one.name), given); });
   }
 }
 
@@ -278,12 +275,7 @@ TEST(Decoded, WhatDoesNotFitTheOutputsIsRefused) {
       {R"({"data": null, "length": 4, "switchId": "a"})", R"(out: there is no "switchId")"},
   };
   for (auto const &[given, said] : all) {
-    try {
-      decode_outputs(call, in, Json::parse(given), Json());
-      ADD_FAILURE() << "nobody refused " << given;
-    } catch (Misfit const &misfit) {
-      EXPECT_STREQ(misfit.what(), said);
-    }
+    expect_refused(given, said, [&](Json const &out) { decode_outputs(call, in, out, Json()); });
   }
 }
 
