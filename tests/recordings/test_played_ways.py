@@ -7,6 +7,7 @@ from pathlib import Path
 import pytest
 from recordings import LEAVING, SIMULATED, play, program, record, record_tool
 from test_recorded_shapes import SCENARIO, TOOL
+from tools import DATA_LISTS, TRAP_IN_A_WALK, WALK_IN_A_WALK
 from vswitch.playing import BY
 
 WAYS = {
@@ -24,60 +25,27 @@ WAYS = {
         except RuntimeError as error:
             print(error.args[0].split(" at ")[0])
         """,
-    "walks": """
-        import libvswitch as vs
-        names = []
-        def visit(switch, context):
-            def visit_port(port, context):
-                names.append(vs.DVS_PortId(port))
-                return len(names) < 2
-            vs.DVSState_PortForEach(switch, visit_port, None)
-            names.append(vs.DVS_SwitchName(switch))
-            return True
-        vs.DVSState_SwitchForEach(visit, None)
-        print(names)
-        """,
-    "a trap in a walk": """
-        import libvswitch as vs
-        def visit(switch, context):
-            flat = __import__("_libvswitch")
-            memory = vs.VSQEX_GetUplinks("vswitch0")[1].this
-            flat.VSQEX_FreeMemory(memory)
-            try:
-                flat.VSQEX_FreeMemory(memory)
-            except RuntimeError as error:
-                print(str(error).split(":")[0])
-            return True
-        vs.DVSState_SwitchForEach(visit, None)
-        print(vs.VSDVS_SetMTU("vswitch0", 9000))
-        """,
-    "allocators": """
-        import ctypes
-        from libvswitch import checked
-        libc = ctypes.CDLL(None)
-        taken, given = [], []
-        libc.malloc.restype, libc.free.argtypes = ctypes.c_void_p, [ctypes.c_void_p]
-        def alloc(size):
-            taken.append(size)
-            return libc.malloc(size)
-        def release(memory):
-            given.append(memory)
-            libc.free(memory)
-        functions = (ctypes.CFUNCTYPE(ctypes.c_void_p, ctypes.c_size_t)(alloc),
-                     ctypes.CFUNCTYPE(None, ctypes.c_void_p)(release))
-        host = ctypes.CDLL("libnebPublic.so")
-        host.DVSData_Update.argtypes = [ctypes.c_void_p, ctypes.c_char_p, ctypes.c_char_p,
-                                        ctypes.c_uint, ctypes.c_uint]
-        host.DVSData_Free.argtypes = [ctypes.c_void_p]
-        made = ctypes.c_void_p()
-        print(host.DVSData_Alloc(ctypes.byref(made), *functions))
-        print(host.DVSData_Update(made, b"name", b"four", 4, 16))
-        image, length = ctypes.c_void_p(), ctypes.c_uint()
-        print(host.DVSData_Serialize(made, ctypes.byref(image), ctypes.byref(length), 4),
-              ctypes.string_at(image, length.value))
-        host.DVSData_Free(made)
-        print(taken, len(given))
-        """,
+    "walks": WALK_IN_A_WALK,
+    "a trap in a walk": TRAP_IN_A_WALK,
+    "allocators": f"""{DATA_LISTS}
+taken, given = [], []
+libc.malloc.restype, libc.free.argtypes = ctypes.c_void_p, [ctypes.c_void_p]
+def alloc(size):
+    taken.append(size)
+    return libc.malloc(size)
+def release(memory):
+    given.append(memory)
+    libc.free(memory)
+functions = (ctypes.CFUNCTYPE(ctypes.c_void_p, ctypes.c_size_t)(alloc),
+             ctypes.CFUNCTYPE(None, ctypes.c_void_p)(release))
+print(host.DVSData_Alloc(ctypes.byref(made), *functions))
+print(host.DVSData_Update(made, b"name", b"four", 4, 16))
+image, length = ctypes.c_void_p(), ctypes.c_uint()
+print(host.DVSData_Serialize(made, ctypes.byref(image), ctypes.byref(length), 4),
+      ctypes.string_at(image, length.value))
+host.DVSData_Free(made)
+print(taken, len(given))
+""",
     "threads": """
         import ctypes, threading
         import _libvswitch

@@ -7,6 +7,7 @@ from typing import Any, List
 
 import pytest
 from recordings import FORMATTING, LEAVING, RECORDING, record, record_tool
+from tools import DATA_LISTS, TRAP_IN_A_WALK, WALK_IN_A_WALK
 from vswitch.trace import Trace, Trap
 
 
@@ -42,24 +43,14 @@ def test_a_trap_passes_through_and_the_next_call_works(trace: Path) -> None:
 
 
 def test_callbacks_are_there_with_what_was_called_meanwhile(trace: Path) -> None:
-    program = """
-    import libvswitch as vs
-    names = []
-    def visit(switch, context):
-        def visit_port(port, context):
-            names.append(vs.DVS_PortId(port))
-            return len(names) < 2
-        vs.DVSState_PortForEach(switch, visit_port, None)
-        return True
-    vs.DVSState_SwitchForEach(visit, None)
-    print(names)
-    """
-    made = record(program, trace)
+    made = record(WALK_IN_A_WALK, trace)
     assert made.status == 0, made.stderr
     calls = {one.number: one for one in made.calls}
     outer, inner = made.call("DVSState_SwitchForEach"), made.call("DVSState_PortForEach")
     (switch,) = outer.callbacks
-    assert (switch.argument, switch.result, switch.calls) == ("callback", 1, [inner.number])
+    named = made.call("DVS_SwitchName")
+    assert (switch.argument, switch.result) == ("callback", 1)
+    assert switch.calls == [inner.number, named.number]
     assert inner.inputs["handle"] == switch.inputs["reached"]
     # The tool ends the walk at the second port.
     assert [one.result for one in inner.callbacks] == [1, 0]
@@ -68,26 +59,11 @@ def test_callbacks_are_there_with_what_was_called_meanwhile(trace: Path) -> None
     assert [one.inputs["handle"] for one in asked] == [
         one.inputs["reached"] for one in inner.callbacks
     ]
-    assert str([one.result for one in asked]) == made.stdout.strip()
+    assert str([one.result for one in [*asked, named]]) == made.stdout.strip()
 
 
 def test_a_trap_in_a_callback_ends_the_inner_call_alone(trace: Path) -> None:
-    program = """
-    import libvswitch as vs
-    def visit(switch, context):
-        cell = vs.VSQEX_GetUplinks("vswitch0")[1]
-        flat = __import__("_libvswitch")
-        memory = cell.this
-        flat.VSQEX_FreeMemory(memory)
-        try:
-            flat.VSQEX_FreeMemory(memory)
-        except RuntimeError as error:
-            print(str(error).split(":")[0])
-        return True
-    vs.DVSState_SwitchForEach(visit, None)
-    print(vs.VSDVS_SetMTU("vswitch0", 9000))
-    """
-    made = record(program, trace)
+    made = record(TRAP_IN_A_WALK, trace)
     assert (made.status, made.stdout) == (0, "VSQEX_FreeMemory\n0\n"), made.stderr
     second = made.call("VSQEX_FreeMemory", 1)
     assert second.trap is not None and second.trap.type == "RuntimeError"
@@ -108,20 +84,12 @@ def test_no_call_is_lost_after_jumps_of_the_tools_own_and_at_its_exit(trace: Pat
 
 
 def test_allocators_are_recorded_beyond_the_call_that_they_were_given_with(trace: Path) -> None:
-    program = """
-    import ctypes
-    from libvswitch import checked
-    libc = ctypes.CDLL(None)
-    host = ctypes.CDLL("libnebPublic.so")
-    host.DVSData_Update.argtypes = [ctypes.c_void_p, ctypes.c_char_p, ctypes.c_char_p,
-                                    ctypes.c_uint, ctypes.c_uint]
-    host.DVSData_Free.argtypes = [ctypes.c_void_p]
-    made = ctypes.c_void_p()
-    print(host.DVSData_Alloc(ctypes.byref(made), libc.malloc, libc.free))
-    print(host.DVSData_Update(made, b"name", b"four", 4, 16))
-    host.DVSData_Free(made)
-    """
-    made = record(program, trace)
+    filled = """
+print(host.DVSData_Alloc(ctypes.byref(made), libc.malloc, libc.free))
+print(host.DVSData_Update(made, b"name", b"four", 4, 16))
+host.DVSData_Free(made)
+"""
+    made = record(DATA_LISTS + filled, trace)
     assert (made.status, made.stdout) == (0, "0\n0\n"), made.stderr
     allocated = [one for call in made.calls for one in call.callbacks if one.argument == "alloc"]
     released = made.call("DVSData_Free").callbacks

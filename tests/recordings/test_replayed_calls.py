@@ -13,6 +13,7 @@ from test_recorded_calls import EVERY_CALL
 from test_meanings import SNAPSHOT
 from test_recorded_shapes import SCENARIO, TOOL
 from test_replaying import WALKS
+from tools import DATA_LISTS
 from vswitch.likeness import unread_in
 from vswitch.playing import played
 from vswitch.trace import Call, Trace
@@ -50,15 +51,7 @@ alike = sum(of.alike for of in functions)
 print(json.dumps([alike, sorted({{path for of in functions for path in of.paths}})]))
 """
 
-LISTS = """
-import ctypes
-from libvswitch import checked
-libc = ctypes.CDLL(None)
-host = ctypes.CDLL("libnebPublic.so")
-host.DVSData_Update.argtypes = [ctypes.c_void_p, ctypes.c_char_p, ctypes.c_char_p,
-                                ctypes.c_uint, ctypes.c_uint]
-host.DVSData_Free.argtypes = [ctypes.c_void_p]
-made = ctypes.c_void_p()
+LISTS = f"""{DATA_LISTS}
 host.DVSData_Alloc(ctypes.byref(made), libc.malloc, libc.free)
 host.DVSData_Update(made, b"a", b"xy", 2, 16)
 host.DVSData_Update(made, b"a", b"xyz", 3, 16)
