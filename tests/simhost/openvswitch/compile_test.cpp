@@ -176,19 +176,48 @@ TEST(Compiling, HasTheTableLearnAsManyAsTheSwitchMay) {
   EXPECT_EQ(compile(network).rows, (Rows{.most_tags = 2, .most_learned = 12}));
 }
 
-TEST(Compiling, CutsLongListsIntoPieces) {
-  std::vector<std::size_t> outputs;
-  for (auto const &flow : compile(with_ports(3001)).flows) {
-    auto const count =
-        std::count_if(flow.actions.begin(), flow.actions.end(), [](openflow::Action const &action) {
-          return std::holds_alternative<openflow::Output>(action);
-        });
+// How many actions of each flow of lists are such, of those that have some.
+template <typename Is>
+std::vector<std::size_t> in_lists(Network const &network, Is const &is) {
+  std::vector<std::size_t> counts;
+  for (auto const &flow : compile(network).flows) {
+    auto const count = std::count_if(flow.actions.begin(), flow.actions.end(), is);
     if (flow.table == table::kLists && count != 0) {
-      outputs.push_back(static_cast<std::size_t>(count));
+      counts.push_back(static_cast<std::size_t>(count));
     }
   }
-  std::sort(outputs.begin(), outputs.end());
-  EXPECT_THAT(outputs, ElementsAre(1, 1000, 1000, 1000));
+  std::sort(counts.begin(), counts.end());
+  return counts;
+}
+
+bool counts_and_sends(openflow::Action const &action) {
+  return action == openflow::Action(openflow::Resubmit{.table = table::kSending});
+}
+
+bool only_sends(openflow::Action const &action) {
+  return std::holds_alternative<openflow::Output>(action);
+}
+
+TEST(Compiling, CutsLongListsIntoPieces) {
+  EXPECT_THAT(in_lists(with_ports(3001), counts_and_sends), ElementsAre(1, 1000, 1000, 1000));
+  EXPECT_THAT(in_lists(with_ports(3001), only_sends), IsEmpty());
+}
+
+TEST(Compiling, CountsNoMoreThanAFrameHasLookups) {
+  EXPECT_THAT(in_lists(with_ports(4100), counts_and_sends), ElementsAre(900, 1000, 1000, 1000));
+  EXPECT_THAT(in_lists(with_ports(4100), only_sends), ElementsAre(100, 100));
+  // A port of which something is looked at takes two, if it is counted.
+  auto network = with_ports(3000);
+  for (auto &port : network.ports) {
+    port.transmits_by_uplink = true;
+  }
+  auto const flows = compile(network).flows;
+  EXPECT_EQ(std::count_if(flows.begin(), flows.end(),
+                          [](openflow::Flow const &flow) {
+                            return flow.table == table::kSending &&
+                                   flow.cookie >> 56U == std::uint64_t{0x15};
+                          }),
+            900);
 }
 
 TEST(GenerationMarker, IsAFlowThatNoFrameReaches) {

@@ -2,6 +2,7 @@
 // what a flow counted is known. README.md has the picture.
 #pragma once
 
+#include <array>
 #include <cstdint>
 
 #include "planes/openvswitch/openflow/field.h"
@@ -36,7 +37,7 @@ inline constexpr std::uint8_t kLearning = 8;
 inline constexpr std::uint8_t kLimits = 9;
 /// Likewise past that of the switch.
 inline constexpr std::uint8_t kSwitchLimit = 19;
-/// Asks the three tables of addresses; they write kDestination.
+/// Counts what was let in; asks the three tables of addresses, which write kDestination.
 inline constexpr std::uint8_t kLookup = 10;
 /// Which ports an uplink's frames are for; writes kWay.
 inline constexpr std::uint8_t kReceiving = 11;
@@ -52,6 +53,11 @@ inline constexpr std::uint8_t kDelivery = 15;
 inline constexpr std::uint8_t kTeams = 16;
 /// Out to the uplink in kWire, with its tag.
 inline constexpr std::uint8_t kWires = 17;
+
+/// Out to the device of the port or uplink in kReceiver; counts it.
+inline constexpr std::uint8_t kSending = 23;
+/// Where frames end that are not let in; counts them by where they came in.
+inline constexpr std::uint8_t kDropped = 24;
 
 /// Sessions by the port that a frame came in at, and by its VLAN.
 inline constexpr std::uint8_t kMirrorsOfPorts = 20;
@@ -109,7 +115,7 @@ inline constexpr auto kWire = openflow::Field::reg11;
 inline constexpr auto kSession = openflow::Field::reg12;
 /// A tag, as it was in the frame.
 inline constexpr auto kClientTag = openflow::Field::reg13;
-/// The OpenFlow port of a client that is to get the frame; a list has many.
+/// The OpenFlow port of a client or an uplink that is to get the frame; a list has many.
 inline constexpr auto kReceiver = openflow::Field::reg14;
 
 }  // namespace field
@@ -158,11 +164,22 @@ enum class Counted : std::uint8_t {
   counted_source = 15,  ///< what kCountedSources holds
   mirrored = 16,        ///< copies of a mirror session
   port = 17,            ///< of a port, for nothing that is counted
+  in_unicast = 18,      ///< let in at a port, of an uplink as well
+  in_multicast = 19,
+  in_broadcast = 20,
+  out_unicast = 21,  ///< sent out at one
+  out_multicast = 22,
+  out_broadcast = 23,
+  dropped = 24,  ///< not let in, for whichever reason
 };
 
 constexpr std::uint64_t cookie(Counted counted, std::uint32_t number = 0) {
   return static_cast<std::uint64_t>(counted) << 56U | number;
 }
+
+/// The tables whose flows count what callers are told of: by ports and sessions, in their cookies.
+inline constexpr std::array kCountingTables{table::kLimits,  table::kLookup,  table::kSwitchLimit,
+                                            table::kMirrors, table::kSending, table::kDropped};
 
 /// Groups of a way: the low bits are its number.
 inline constexpr openflow::GroupId kSendingGroups = 0x10000000;

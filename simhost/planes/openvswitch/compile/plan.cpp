@@ -1,6 +1,7 @@
 // Private VLANs by their numbers, and the addresses of the clients.
 #include "planes/openvswitch/compile/plan.h"
 
+#include <algorithm>
 #include <set>
 #include <utility>
 
@@ -10,12 +11,31 @@ namespace {
 // A timeout of a flow has 16 bits.
 constexpr std::uint32_t kLongestTimeout = 65535;
 
+// Of the 4,096 that a frame has, those which lists may take.
+constexpr std::size_t kMostLookups = 3900;
+
+bool is_mirrored_to(Network const &network, Port const &port) {
+  return std::ranges::any_of(network.mirrors, [&](Mirror const &mirror) {
+    auto const &ports = mirror.received.ports;
+    return std::ranges::find(ports, port.port) != ports.end();
+  });
+}
+
 }  // namespace
 
 Plan::Plan(Network const &given) : network(given), ways(given) {
   note_private_vlans();
   note_addresses();
   note_fixed_addresses();
+  note_lookups();
+}
+
+bool Plan::is_looked_at(Port const &port) const {
+  return looked_at_[index_of(port)];
+}
+
+bool Plan::counts_sent(Port const &port) const {
+  return index_of(port) < counted_ports_;
 }
 
 std::uint16_t Plan::hard_timeout() const {
@@ -59,6 +79,15 @@ void Plan::note_fixed_addresses() {
       fixed_places_.push_back({.address = fixed.address, .domain = domain, .port = fixed.port});
     }
   }
+}
+
+void Plan::note_lookups() {
+  for (auto const &port : network.ports) {
+    looked_at_.push_back(port.vlan.carried || kind_of(port.vlan.vlan).kind != PrivateKind::none ||
+                         port.transmits_by_uplink || is_mirrored_to(network, port));
+  }
+  auto const taken = static_cast<std::size_t>(std::ranges::count(looked_at_, true));
+  counted_ports_ = kMostLookups - std::min(taken, kMostLookups);
 }
 
 bool has_vlan(Plan const &plan, Port const &port) {

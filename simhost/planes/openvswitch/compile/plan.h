@@ -53,6 +53,12 @@ class Plan {
   [[nodiscard]] std::vector<FixedPlace> const &fixed_places() const { return fixed_places_; }
   /// Whether a switch outside may send this one's frames back.
   [[nodiscard]] bool frames_may_return() const { return network.uplinks.size() > 1; }
+  /// Whether something of a port has to be looked at when a frame of its VLAN comes, in table
+  /// kDelivery.
+  [[nodiscard]] bool is_looked_at(Port const &port) const;
+  /// Whether what is sent to a port is counted, in table kSending: a flood takes a lookup more for
+  /// each such port, and a frame has so many.
+  [[nodiscard]] bool counts_sent(Port const &port) const;
   /// How long a learned address stays, in seconds; 0 for as long as nobody takes it.
   [[nodiscard]] std::uint16_t hard_timeout() const;
 
@@ -60,11 +66,17 @@ class Plan {
   void note_private_vlans();
   void note_addresses();
   void note_fixed_addresses();
+  void note_lookups();
+  [[nodiscard]] std::size_t index_of(Port const &port) const {
+    return static_cast<std::size_t>(&port - network.ports.data());
+  }
 
   std::array<VlanKind, 4096> kinds_{};
   std::vector<std::uint16_t> private_vlans_;
   std::vector<OwnAddress> own_addresses_;
   std::vector<FixedPlace> fixed_places_;
+  std::vector<bool> looked_at_;    // in the order of the ports
+  std::size_t counted_ports_ = 0;  // the first of them
 };
 
 /// Whether a port has a VLAN at all, and takes part in what happens there.

@@ -11,7 +11,22 @@ openflow::Action priority_from_register() {
                         .destination = openflow::whole(Field::vlan_pcp)};
 }
 
+constexpr openflow::Value kAllReceivers = openflow::ones(48);
+
 }  // namespace
+
+void add_by_receivers(Program &program, std::uint8_t table, Rule const &rule,
+                      ByReceivers const &counted, std::uint32_t number) {
+  auto const add = [&](std::uint16_t above, Match match, Counted kind) {
+    program.add(table, {.priority = static_cast<std::uint16_t>(rule.priority + above),
+                        .match = std::move(match),
+                        .actions = rule.actions,
+                        .cookie = cookie(kind, number)});
+  };
+  add(0, rule.match, counted.one);
+  add(1, to_many(rule.match), counted.several);
+  add(2, Match(rule.match).with(Field::eth_dst, kAllReceivers), counted.all);
+}
 
 Actions with_tag(Field vlan, Actions const &output) {
   Actions actions{

@@ -21,7 +21,7 @@ using openflow::Match;
 struct Rule {
   std::uint16_t priority = 0;
   Match match = {};
-  Actions actions = {};  ///< none: the frame is dropped
+  Actions actions = {};  ///< none: nothing more becomes of the frame here
   std::uint64_t cookie = 0;
 };
 
@@ -40,6 +40,11 @@ struct Program {
 
 inline openflow::Action go_to(std::uint8_t table) {
   return openflow::Resubmit{.table = table};
+}
+
+/// For a frame that is not let in.
+inline Actions drop() {
+  return {go_to(table::kDropped)};
 }
 
 /// `more` after `actions`.
@@ -72,6 +77,21 @@ inline Match to_many(Match match) {
   match.with(openflow::Field::eth_dst, kGroupBit, kGroupBit);
   return match;
 }
+
+/// Out to the device of a port or an uplink.
+inline Actions send_to(openflow::Port port) {
+  return {openflow::set(field::kReceiver, port), go_to(table::kSending)};
+}
+
+/// Frames for one receiver, for several and for all are counted apart: adds a flow for each, of
+/// `rule` but for the cookies.
+struct ByReceivers {
+  Counted one;
+  Counted several;
+  Counted all;
+};
+void add_by_receivers(Program &program, std::uint8_t table, Rule const &rule,
+                      ByReceivers const &counted, std::uint32_t number);
 
 /// Adds the tag that a frame has outside, from registers; `vlan` has the VLAN. Takes it away again
 /// after `output`, for those that come after.

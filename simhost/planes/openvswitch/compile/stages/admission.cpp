@@ -14,7 +14,8 @@ constexpr std::uint16_t kReservedVlan = 4095;
 constexpr std::uint16_t kTagTypes[]{0x8100, 0x88a8};
 
 void refuse(Program &program, std::uint16_t priority, Match const &match, std::uint64_t cookie) {
-  program.add(table::kAdmission, {.priority = priority, .match = match, .cookie = cookie});
+  program.add(table::kAdmission,
+              {.priority = priority, .match = match, .actions = drop(), .cookie = cookie});
 }
 
 void refuse_malformed(Program &program) {

@@ -127,7 +127,8 @@ class Delivery {
   Program &program_;
   Port const &port_;
   Actions copies_;  ///< of the frame as it is inside
-  Actions const out_{openflow::Output{.port = port_.port}};
+  Actions const out_ = plan_.counts_sent(port_) ? Actions{go_to(table::kSending)}
+                                                : Actions{openflow::Output{.port = port_.port}};
 };
 
 }  // namespace

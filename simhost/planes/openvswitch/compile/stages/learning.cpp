@@ -101,7 +101,7 @@ void judge(Program &program, std::uint8_t where, Port const &port) {
   bool const allows = port.learning->when_full == WhenFull::allow;
   program.add(where, {.priority = 100,
                       .match = with_bits(from(port.port), field::kVerdict, 0),
-                      .actions = allows ? Actions{go_to(table::kLookup)} : Actions{},
+                      .actions = allows ? Actions{go_to(table::kLookup)} : drop(),
                       .cookie = cookie(allows ? Counted::limit_allowed : Counted::limit_dropped,
                                        port.number)});
 }

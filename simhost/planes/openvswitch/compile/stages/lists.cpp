@@ -1,14 +1,14 @@
 // Lists of ports: all of a VLAN, those for unknown addresses, promiscuous ones; each for what
 // clients send, and for what comes over each way. One flow holds no more than so many ports and one
 // frame takes no more than 4,096 lookups: so lists are cut into pieces, and a port of which nothing
-// is to be looked at when a frame of its VLAN comes is put into the list as an output.
+// is to be looked at when a frame of its VLAN comes is sent to from the list, or is an output in it
+// where there are too many to count what each is sent.
 #include <algorithm>
 #include <cstdint>
 #include <map>
 #include <utility>
 #include <vector>
 
-#include "planes/openvswitch/compile/stages/mirrors.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -18,12 +18,6 @@ namespace {
 constexpr std::size_t kMostPorts = 1000;
 // In kPiece: the ports that may be in many VLANs, which are on the lists of all; then their pieces.
 constexpr std::uint32_t kTrunks = 0x10000;
-
-bool is_looked_at(Plan const &plan, Port const &port) {
-  return port.vlan.carried || plan.kind_of(port.vlan.vlan).kind != PrivateKind::none ||
-         port.transmits_by_uplink ||
-         !copies(plan, &Mirror::received, &MirrorSources::ports, port.port).empty();
-}
 
 bool is_on(List list, Port const &port) {
   switch (list) {
@@ -119,9 +113,11 @@ class Lists {
     Actions actions;
     for (; from != to; ++from) {
       auto const &port = **from;
-      if (is_looked_at(plan_, port)) {
+      if (plan_.is_looked_at(port)) {
         actions.emplace_back(openflow::set(field::kReceiver, port.port));
         actions.push_back(go_to(table::kDelivery));
+      } else if (plan_.counts_sent(port)) {
+        append(actions, send_to(port.port));
       } else {
         actions.emplace_back(openflow::Output{.port = port.port});
       }

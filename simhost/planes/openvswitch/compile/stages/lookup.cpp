@@ -21,6 +21,14 @@ Actions look_up(Plan const &plan, std::uint8_t next) {
   return actions;
 }
 
+template <typename Device>
+void let_in(Program &program, Device const &device, Actions const &actions) {
+  add_by_receivers(
+      program, table::kLookup, {.priority = 100, .match = from(device.port), .actions = actions},
+      {.one = Counted::in_unicast, .several = Counted::in_multicast, .all = Counted::in_broadcast},
+      device.number);
+}
+
 void put(Program &program, std::uint16_t priority, Match match, openflow::Port place,
          std::uint32_t number) {
   program.add(table::kFixedAddresses, {.priority = priority,
@@ -47,10 +55,16 @@ void put(Plan const &plan, Program &program, FixedPlace const &fixed) {
 }  // namespace
 
 void compile_lookup(Plan const &plan, Program &program) {
-  program.add(table::kLookup, {.priority = 100,
-                               .match = Match().with(field::kOrigin, kFromUplink),
-                               .actions = look_up(plan, table::kReceiving)});
-  program.add(table::kLookup, {.actions = look_up(plan, table::kDispatch)});
+  for (auto const &port : plan.network.ports) {
+    if (sends_frames(port)) {
+      let_in(program, port, look_up(plan, table::kDispatch));
+    }
+  }
+  for (auto const &uplink : plan.network.uplinks) {
+    if (!uplink.blocked) {
+      let_in(program, uplink, look_up(plan, table::kReceiving));
+    }
+  }
   for (auto const &own : plan.own_addresses()) {
     put(program, own.domain ? 200 : 100, with_address(Match(), Field::eth_dst, own), own.port->port,
         own.port->number);

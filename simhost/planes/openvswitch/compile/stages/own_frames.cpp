@@ -16,6 +16,7 @@ Match from_uplink() {
 void drop_known(Program &program, OwnAddress const &own) {
   program.add(table::kOwnFrames, {.priority = 200,
                                   .match = with_address(from_uplink(), Field::eth_src, own),
+                                  .actions = drop(),
                                   .cookie = cookie(Counted::own_frame, own.port->number)});
 }
 
@@ -36,6 +37,7 @@ void compile_own_frames(Plan const &plan, Program &program) {
     program.add(table::kMirroring, {.priority = 200,
                                     .match = with_bits(Match(), field::kRecent,
                                                        static_cast<openflow::Value>(Recent::drops)),
+                                    .actions = drop(),
                                     .cookie = cookie(Counted::own_frame)});
   }
   program.add(table::kOwnFrames, {.actions = {go_to(table::kMirroring)}});

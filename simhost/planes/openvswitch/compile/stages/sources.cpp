@@ -29,8 +29,10 @@ openflow::Action learn_first_address(Plan const &plan, Port const &port) {
 }
 
 void drop_forged(Program &program, std::uint8_t where, Match const &match, Port const &port) {
-  program.add(where,
-              {.priority = 100, .match = match, .cookie = cookie(Counted::forged, port.number)});
+  program.add(where, {.priority = 100,
+                      .match = match,
+                      .actions = drop(),
+                      .cookie = cookie(Counted::forged, port.number)});
 }
 
 void compile(Plan const &plan, Program &program, Port const &port) {
@@ -38,6 +40,7 @@ void compile(Plan const &plan, Program &program, Port const &port) {
   if (port.address_changed) {
     program.add(table::kSources, {.priority = 300,
                                   .match = at_port,
+                                  .actions = drop(),
                                   .cookie = cookie(Counted::address_changed, port.number)});
   } else if (!port.address) {
     program.add(table::kSources,

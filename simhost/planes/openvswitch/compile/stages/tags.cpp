@@ -72,8 +72,8 @@ class PortTags {
   void take_tagged(VlanMask const &mask) {
     add(100, at_port().vlan(mask.vlan, mask.mask), put_where_tagged(port_.vlan.priority));
   }
-  void drop_priority_tagged() { drop(200, at_port().vlan(0)); }
-  void drop_others() { drop(50, at_port()); }
+  void drop_priority_tagged() { drop_frames(200, at_port().vlan(0)); }
+  void drop_others() { drop_frames(50, at_port()); }
 
  private:
   [[nodiscard]] Match at_port() const { return from(port_.port); }
@@ -83,10 +83,11 @@ class PortTags {
                                 .actions = std::move(actions),
                                 .cookie = cookie(Counted::port, port_.number)});
   }
-  void drop(std::uint16_t priority, Match const &match) {
-    program_.add(
-        table::kTags,
-        {.priority = priority, .match = match, .cookie = cookie(Counted::wrong_tag, port_.number)});
+  void drop_frames(std::uint16_t priority, Match const &match) {
+    program_.add(table::kTags, {.priority = priority,
+                                .match = match,
+                                .actions = drop(),
+                                .cookie = cookie(Counted::wrong_tag, port_.number)});
   }
 
   Program &program_;
@@ -137,8 +138,10 @@ void compile_uplinks(Program &program) {
 }
 
 void compile_client_tags(Program &program) {
-  program.add(table::kClientTags,
-              {.priority = 100, .match = Match().tagged(), .cookie = cookie(Counted::nested_tag)});
+  program.add(table::kClientTags, {.priority = 100,
+                                   .match = Match().tagged(),
+                                   .actions = drop(),
+                                   .cookie = cookie(Counted::nested_tag)});
   program.add(table::kClientTags,
               {.actions = {openflow::PushVlan{},
                            openflow::Move{.source = vlan_bits(field::kClientTag),
@@ -157,6 +160,7 @@ openflow::Action check_size(Plan const &plan) {
 void compile_nested_tags(Plan const &plan, Program &program) {
   program.add(table::kNestedTags, {.priority = 300,
                                    .match = Match().with(field::kVlan, 0).tagged(),
+                                   .actions = drop(),
                                    .cookie = cookie(Counted::nested_tag)});
   for (auto const &port : plan.network.ports) {
     if (port.vlan.nested && sends_frames(port)) {
@@ -168,6 +172,7 @@ void compile_nested_tags(Plan const &plan, Program &program) {
   }
   program.add(table::kNestedTags, {.priority = 100,
                                    .match = Match().with(field::kOrigin, kFromClient).tagged(),
+                                   .actions = drop(),
                                    .cookie = cookie(Counted::nested_tag)});
   program.add(table::kNestedTags, {.actions = {check_size(plan), go_to(table::kPrivateVlans)}});
 }

@@ -60,7 +60,7 @@ void compile_wire(Plan const &plan, Program &program, Uplink const &uplink) {
     auto actions = copied;
     add(priority, match, append(actions, out));
   };
-  Actions const out{openflow::Output{.port = uplink.port}};
+  auto const out = send_to(uplink.port);
   send(300, Match(on_wire).with(field::kVlan, 0).with(field::kPriority, 0), out);
   send(200, Match(on_wire).with(field::kVlan, 0), with_priority_tag(out));
   send(100, on_wire, with_tag(field::kVlan, out));
