@@ -6,7 +6,8 @@ from pathlib import Path
 
 import pytest
 
-sys.path.append(str(Path(__file__).resolve().parents[1] / "tests" / "surface"))
+for _folder in "surface", "simhostd":
+    sys.path.append(str(Path(__file__).resolve().parents[1] / "tests" / _folder))
 
 
 @pytest.fixture(name="build", scope="session")

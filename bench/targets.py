@@ -83,6 +83,18 @@ MODULES: Dict[str, Dict[str, float]] = {
 HOST: Dict[str, float] = {"change a link": 4.0, "ask for a port's uplink": 1.5}
 """For a figure of the simulated host: to the same with ten ports, and to a look-up of the port."""
 
+FRAMES: Dict[str, Dict[str, float]] = {
+    "throughput": {"least": 0.95},
+    "round trip": {"most": 1.1},
+    "added to a change": {"most": 1.0},
+    "question": {"most": 1.0},
+    "change, 100 ports": {"most": 2.0},
+    "change, 1,000 ports": {"most": 20.0},
+    "from nothing": {"most": 2.0},
+    "resync": {"most": 0.2},
+}
+"""For a figure of real frames, in its own unit: what it is to be at least, and at most."""
+
 
 def met(ratio: float, target: float) -> bool:
     """Whether a ratio reaches its target, noise allowed for."""

@@ -9,9 +9,10 @@
 #             measured of whole modules
 #
 # Prints tables of ratios, of checked calls to checks by hand and of objects to flat calls too, what
-# the recorder adds to a call, and what the simulated host does in a second; leaves results.json,
-# calls.svg, host.json and host_curve.svg in build/bench/. bench/README.md says how it measures and
-# how to read it. On a machine with other work to do it takes longer, and ratios stay ratios.
+# the recorder adds to a call, what real frames cost, and what the simulated host does in a second;
+# leaves results.json, calls.svg, host.json and host_curve.svg in build/bench/. bench/README.md says
+# how it measures and how to read it. On a machine with other work to do it takes longer, and ratios
+# stay ratios.
 cmd_bench() {
   quick='' full=surfaces
   case ${1-} in
@@ -22,9 +23,9 @@ cmd_bench() {
   esac
   [ $# -eq 0 ] || die "bench: unknown option '$1'; see ./dev bench --help"
   # shellcheck disable=SC2086 # lists of words
-  need $build_packages $bench_packages
+  need $build_packages $bench_packages $frame_packages
   asked_python='' benching=yes
-  build_peers objects recordings_vswitch recordings_nebPublic ${full:+"$full"}
+  build_peers objects recordings_vswitch recordings_nebPublic simhostd simhostctl ${full:+"$full"}
   # A target that is missed ends nothing: what remains is measured, and the chore fails at its end.
   missed=''
   step "Measuring the module and its peers"
@@ -36,6 +37,9 @@ cmd_bench() {
   step "Measuring the recorder"
   LD_LIBRARY_PATH=$root/$folder/bench/null_host PYTHONPATH=$root/$folder/python \
     "$python" bench/recorder.py ${quick:+"$quick"} || missed=1
+  step "Measuring real frames"
+  BUILD_DIR=$root/$folder PYTHONPATH=$root/$folder/python:$root/tests/simhostd \
+    "$python" bench/frames.py ${quick:+"$quick"} || missed=1
   step "Measuring the simulated host"
   "$python" bench/host_curve.py ${quick:+"$quick"} "$folder" || missed=1
   [ -z "$missed" ] || {

@@ -4,11 +4,12 @@ import os
 import re
 import signal
 import subprocess
-from typing import Dict, List
+from typing import Dict
 
 import pytest
 
 from frame_lab import TOOLS, Lab, comes_true
+from lasting_open_vswitch import LastingOpenVSwitch
 
 
 def test_without_a_daemon_changes_are_pending(idle: Lab) -> None:
@@ -55,16 +56,15 @@ def test_a_killed_daemon_leaves_nothing_running_and_another_takes_over(lab: Lab)
 
 
 def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> None:
-    with OpenVSwitch(idle):
-        where = f"unix:{idle.run_folder()}/db.sock"
-        idle.start(where)
+    with LastingOpenVSwitch(idle) as open_vswitch:
+        idle.start(open_vswitch.where)
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
         assert one.reaches(other, attempts=5)
         idle.stop()
         # Frames go on without it, and count.
         assert one.reaches(other, attempts=5)
         said, before = idle.log(), counted(idle)
-        idle.start(where)
+        idle.start(open_vswitch.where)
         assert "in force" not in idle.log().replace(said, "")
         kept(before, counted(idle))
         # An unrelated change leaves what was counted and learned alone.
@@ -86,46 +86,11 @@ def kept(before: Dict[str, int], after: Dict[str, int]) -> None:
     assert all(after[flow] >= count for flow, count in before.items())
 
 
-class OpenVSwitch:
-    """One that no daemon started, in the lab's run folder."""
-
-    def __init__(self, lab: Lab) -> None:
-        self._lab = lab
-        self._processes: List["subprocess.Popen[str]"] = []
-
-    def __enter__(self) -> None:
-        folder = self._lab.run_folder()
-        folder.mkdir()
-        database, schema = f"{folder}/conf.db", "/usr/share/openvswitch/vswitch.ovsschema"
-        subprocess.run(["ovsdb-tool", "create", database, schema], check=True)
-        socket = f"{folder}/db.sock"
-        self._start("ovsdb-server", database, f"--remote=punix:{socket}")
-        while not os.path.exists(socket):
-            assert self._processes[0].poll() is None
-        self._start("ovs-vswitchd", f"unix:{socket}", "--disable-system")
-
-    def _start(self, program: str, *words: str) -> None:
-        folder = str(self._lab.run_folder())
-        options = [f"--unixctl={folder}/{program}.ctl", f"--log-file={folder}/{program}.log"]
-        environment = {**os.environ, "OVS_RUNDIR": folder}
-        self._processes.append(
-            self._lab.host.start(
-                program, "-vconsole:off", "-vsyslog:off", *words, *options, env=environment
-            )
-        )
-
-    def __exit__(self, *_: object) -> None:
-        for process in reversed(self._processes):
-            process.kill()
-            process.communicate()
-
-
 def test_a_second_daemon_says_who_is_there(idle: Lab) -> None:
-    with OpenVSwitch(idle):
-        where = f"unix:{idle.run_folder()}/db.sock"
-        idle.start(where)
+    with LastingOpenVSwitch(idle) as open_vswitch:
+        idle.start(open_vswitch.where)
         assert idle.daemon is not None
-        second = idle.simhostd(where, stderr=subprocess.PIPE)
+        second = idle.simhostd(open_vswitch.where, stderr=subprocess.PIPE)
         _, said = second.communicate()
         assert second.returncode == 1
         assert said == (f"simhostd: the process {idle.daemon.pid} has {idle.state}-simhostd.lock\n")

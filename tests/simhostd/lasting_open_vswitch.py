@@ -1,0 +1,48 @@
+"""An Open vSwitch that no daemon starts, in a lab's run folder: it is there before a daemon comes,
+and stays when that goes."""
+
+import os
+import subprocess
+from typing import List
+
+from frame_lab import Lab
+
+
+class LastingOpenVSwitch:
+    """Its two processes."""
+
+    def __init__(self, lab: Lab) -> None:
+        self._lab = lab
+        self._processes: List["subprocess.Popen[str]"] = []
+
+    @property
+    def where(self) -> str:
+        """What a daemon is told of it."""
+        return f"unix:{self._lab.run_folder()}/db.sock"
+
+    def __enter__(self) -> "LastingOpenVSwitch":
+        folder = self._lab.run_folder()
+        folder.mkdir()
+        database, schema = f"{folder}/conf.db", "/usr/share/openvswitch/vswitch.ovsschema"
+        subprocess.run(["ovsdb-tool", "create", database, schema], check=True)
+        socket = f"{folder}/db.sock"
+        self._start("ovsdb-server", database, f"--remote=punix:{socket}")
+        while not os.path.exists(socket):
+            assert self._processes[0].poll() is None
+        self._start("ovs-vswitchd", self.where, "--disable-system")
+        return self
+
+    def _start(self, program: str, *words: str) -> None:
+        folder = str(self._lab.run_folder())
+        options = [f"--unixctl={folder}/{program}.ctl", f"--log-file={folder}/{program}.log"]
+        environment = {**os.environ, "OVS_RUNDIR": folder}
+        self._processes.append(
+            self._lab.host.start(
+                program, "-vconsole:off", "-vsyslog:off", *words, *options, env=environment
+            )
+        )
+
+    def __exit__(self, *_: object) -> None:
+        for process in reversed(self._processes):
+            process.kill()
+            process.communicate()
