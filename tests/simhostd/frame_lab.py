@@ -1,7 +1,6 @@
-"""A host whose frames are real: simhostd with an Open vSwitch of its own in a network namespace,
-clients in others, and wires between them."""
+"""A host whose frames are real, with a daemon of its own that tests may end: simhostd with an Open
+vSwitch in a network namespace, and what the plug-in puts around it."""
 
-import itertools
 import json
 import os
 import signal
@@ -12,7 +11,10 @@ from pathlib import Path
 from types import TracebackType
 from typing import Any, Callable, Dict, Iterator, List, Mapping, Optional, Type
 
-from namespaces import PATIENCE, Namespace, own_user_needed
+from simhost import Client, Frames, Network, SharedHost
+from simhost._daemon import Daemon, start_simhostd
+from simhost._frames import Cabling
+from simhost._namespaces import PATIENCE, Namespace, own_user_needed
 
 TOOLS = Path(os.environ["BUILD_DIR"]) / "simhost"
 # A switch with three ports for clients and two uplinks.
@@ -27,8 +29,6 @@ ONE_SWITCH: Dict[str, Any] = {
         }
     ],
 }
-# Both ends of a wire must have another index: a lost carrier is told late otherwise.
-_INDEXES = itertools.count(1000)
 
 
 def comes_true(condition: Callable[[], bool]) -> bool:
@@ -40,52 +40,19 @@ def comes_true(condition: Callable[[], bool]) -> bool:
     return False
 
 
-class Client:
-    """A machine with one device, eth0."""
-
-    def __init__(self, namespace: Namespace, address: str) -> None:
-        self.namespace = namespace
-        self.address = address
-
-    def set_address(self) -> None:
-        run = self.namespace.run
-        run("ip", "address", "add", f"{self.address}/24", "dev", "eth0")
-        # Nobody puts right the checksums that a device would.
-        run("ethtool", "--offload", "eth0", "tx", "off")
-
-    def pull(self, wire: str) -> None:
-        self.namespace.run("ip", "link", "set", wire, "down")
-
-    def plug(self, wire: str) -> None:
-        self.namespace.run("ip", "link", "set", wire, "up")
-
-    def reaches(self, other: "Client", attempts: int = 1) -> bool:
-        """Whether a ping is replied to, each waited for a while."""
-        words = ["ping", "-c", "1", "-W", "1" if attempts > 1 else "0.3", other.address]
-        return any(self.namespace.try_run(*words).returncode == 0 for _ in range(attempts))
-
-    def comes_to_reach(self, other: "Client") -> bool:
-        """Likewise, at some time."""
-        return comes_true(lambda: self.reaches(other))
-
-
 class Lab:
     """The host with its state, and everything around it; gone when it is left."""
 
     def __init__(self, folder: Path, document: Mapping[str, Any], own_user: bool = False) -> None:
         self.folder = folder
         self.state = folder / "host.db"
-        self.environment = {**os.environ, "SIMHOST_STATE": str(self.state)}
-        self.environment.pop("SIMHOST_SCENARIO", None)
-        scenario = folder / "scenario.json"
-        scenario.write_text(json.dumps(document), encoding="utf-8")
-        self._namespaces: List[Namespace] = []
-        self._own_user = own_user or own_user_needed()
-        self.host = self._keep(Namespace(own_user=self._own_user))
-        self._clients = itertools.count(1)
-        self._scenario = str(scenario)
-        self.daemon: Optional["subprocess.Popen[str]"] = None
-        self.ctl("show")
+        shared = SharedHost(self.state, document, folder)
+        self.environment = shared.environment
+        own_user = own_user or own_user_needed()
+        self.host = Namespace(own_user=own_user)
+        self._cabling = Cabling(self.host)
+        self.frames = Frames(shared, self._cabling, own_user)
+        self.daemon: Optional[Daemon] = None
 
     def __enter__(self) -> "Lab":
         return self
@@ -97,22 +64,15 @@ class Lab:
         trace: Optional[TracebackType],
     ) -> None:
         self.stop()
-        for namespace in reversed(self._namespaces):
-            namespace.close()
-
-    def _keep(self, namespace: Namespace) -> Namespace:
-        self._namespaces.append(namespace)
-        return namespace
-
-    def namespace(self) -> Namespace:
-        return self._keep(Namespace(self.host if self._own_user else None))
+        self.frames.close()
+        self.host.close()
 
     # The host.
 
     def try_ctl(self, *words: str, given: str = "") -> "subprocess.CompletedProcess[str]":
         return subprocess.run(
             [TOOLS / "simhostctl", *words],
-            env={**self.environment, "SIMHOST_SCENARIO": self._scenario},
+            env=self.environment,
             input=given,
             stdout=subprocess.PIPE,
             stderr=subprocess.STDOUT,
@@ -157,20 +117,16 @@ class Lab:
     # The daemon.
 
     def simhostd(self, where: str, **options: Any) -> "subprocess.Popen[str]":
-        words = [str(TOOLS / "simhostd"), "--state", str(self.state), "--openvswitch", where]
-        return self.host.start(*words, stdout=subprocess.PIPE, **options)
+        return start_simhostd(self.host, self.state, where, stdout=subprocess.PIPE, **options)
 
     def start(self, where: str = "") -> None:
         """Returns when it says that it is ready."""
-        with open(self.folder / "simhostd.log", "a", encoding="utf-8") as log:
-            self.daemon = self.simhostd(where or f"private:{self.folder}/ovs", stderr=log)
-        assert self.daemon.stdout is not None
-        assert self.daemon.stdout.readline() == "ready\n", self.log()
+        where = where or f"private:{self.folder}/ovs"
+        self.daemon = Daemon(self.host, self.state, where, self.folder / "simhostd.log")
 
     def stop(self, number: int = signal.SIGTERM) -> None:
         if self.daemon is not None:
-            self.daemon.send_signal(number)
-            self.daemon.communicate(timeout=PATIENCE)
+            self.daemon.stop(number)
             self.daemon = None
 
     def log(self) -> str:
@@ -200,35 +156,15 @@ class Lab:
 
     def wire(self, near: str, far: Namespace, name: str) -> None:
         """A wire from a device of the host to one in a namespace, both switched on."""
-        one, other = next(_INDEXES), next(_INDEXES)
-        self.host.run(
-            *("ip", "link", "add", near, "index", str(one), "type", "veth"),
-            *("peer", "name", name, "index", str(other), "netns", str(far.pid)),
-        )
-        self.host.run("ip", "link", "set", near, "up")
-        far.run("ip", "link", "set", name, "up")
+        self._cabling.lay(near, far, name)
 
     def client(self, switch: str, port: str) -> Client:
-        """A client at a port."""
-        number = next(self._clients)
-        client = Client(self.namespace(), f"10.9.0.{number}")
-        self.wire(f"c{number}", client.namespace, "eth0")
-        client.set_address()
-        self.ctl("connect", switch, port, f"c{number}")
-        return client
+        """A client at a port, whose devices at the host are c1, c2, ..."""
+        return self.frames.client(switch, port)
 
-    def far_client(self, *uplinks: str) -> Client:
-        """A client that all of these uplinks lead to, over a bridge with the ports w0, w1, ..."""
-        far = self.namespace()
-        far.run("ip", "link", "add", "eth0", "type", "bridge")
-        for number, uplink in enumerate(uplinks):
-            self.wire(f"u{number}", far, f"w{number}")
-            far.run("ip", "link", "set", f"w{number}", "master", "eth0")
-            self.ctl("uplink", uplink, "--device", f"u{number}")
-        far.run("ip", "link", "set", "eth0", "up")
-        client = Client(far, "10.9.0.200")
-        client.set_address()
-        return client
+    def network(self, *uplinks: str) -> Network:
+        """What these uplinks lead to, whose devices at the host are u0, u1, ..."""
+        return self.frames.network(*uplinks)
 
 
 def _command_of(process: Path) -> Iterator[str]:

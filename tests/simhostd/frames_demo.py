@@ -8,7 +8,9 @@ import time
 from pathlib import Path
 from typing import Callable
 
-from frame_lab import ONE_SWITCH, Client, Lab
+from simhost import Client
+
+from frame_lab import ONE_SWITCH, Lab
 
 
 def say(text: str) -> None:
@@ -23,14 +25,14 @@ def show(lab: Lab, *words: str) -> None:
 def ping(client: Client, other: Client, count: int = 3) -> None:
     words = ["ping", "-c", str(count), "-i", "0.1", "-W", "0.3", other.address]
     print(f"$ {' '.join(words)}")
-    lines = client.namespace.try_run(*words).stdout.splitlines()
+    lines = client.run(*words).stdout.splitlines()
     print("\n".join(line for line in lines if re.search("bytes from|received", line)), flush=True)
 
 
 def ping_while(client: Client, other: Client, meanwhile: Callable[[], None]) -> None:
     """Three seconds of pings, and something that happens in the middle."""
     words = ["ping", "-c", "30", "-i", "0.1", "-W", "0.3", other.address]
-    with client.namespace.start(*words, stdout=-1) as pinging:
+    with client.start(*words, stdout=-1) as pinging:
         time.sleep(1)
         meanwhile()
         said = pinging.communicate()[0]
@@ -71,11 +73,12 @@ def cut_and_join(lab: Lab, one: Client, other: Client) -> None:
 
 
 def fail_over(lab: Lab, one: Client) -> None:
-    far = lab.far_client("nic0", "nic1")
+    network = lab.network("nic0", "nic1")
+    far = network.client()
     lab.apply({"switches": [{"alias": "rack", "teaming": {"balance": "explicit"}}]})
     one.comes_to_reach(far)
     say("A client beyond the uplinks; one uplink loses its link while pings go on:")
-    ping_while(one, far, lambda: far.pull("w0"))
+    ping_while(one, far, lambda: network.pull("nic0"))
     show(lab, "show")
 
 
@@ -85,7 +88,7 @@ def mirror(lab: Lab, one: Client, other: Client) -> None:
     lab.set_port("rack", "probe", vlan=99)
     session = {"sid": "look", "to": [{"port": "probe"}], "sent_by": [{"port": "web-1"}]}
     lab.set_port("rack", "web-1", mirror_sessions=[session])
-    with probe.namespace.start("/usr/bin/python3", "-c", LISTEN, stdout=-1) as listening:
+    with probe.start("/usr/bin/python3", "-c", LISTEN, stdout=-1) as listening:
         assert listening.stdout is not None
         time.sleep(0.3)
         ping(one, other)

@@ -1,7 +1,6 @@
 """A simulated host in a file, through simhostctl."""
 
 import os
-import shutil
 import subprocess
 from pathlib import Path
 from typing import Dict, List, Optional
@@ -18,7 +17,7 @@ class InFileControl(Control):
             name: value for name, value in os.environ.items() if not name.startswith("SIMHOST_")
         }
         self.environment["SIMHOST_STATE"] = str(state_file)
-        self._simhostctl = _simhostctl()
+        self._simhostctl = _loaded.program("simhostctl", package="libvswitch-simhost")
 
     def reset(self, *, empty: bool) -> None:
         more = {"SIMHOST_SCENARIO": str(EMPTY)} if empty else {}
@@ -85,15 +84,6 @@ class InFileControl(Control):
             why = done.stderr.replace("simhostctl: ", "", 1)
             raise HostRefused(why.replace("Run with --help for more information.", "").strip())
         return done.stdout
-
-
-def _simhostctl() -> str:
-    """Beside the loaded host, whose version it has; a system may keep it with its commands."""
-    beside = _loaded.library_file().with_name("simhostctl")
-    found = str(beside) if beside.exists() else shutil.which("simhostctl")
-    if found is None:
-        raise _loaded.NotSimulated(f"simhostctl is neither {beside} nor in PATH")
-    return found
 
 
 def _option(name: str, value: Optional[str]) -> List[str]:

@@ -9,6 +9,7 @@ import ctypes
 import functools
 import importlib
 import os
+import shutil
 from pathlib import Path
 from typing import Any, Iterator, List, Optional
 
@@ -143,6 +144,20 @@ class LoadedControl(Control):
 def library_file() -> Path:
     """The file of the simulated host's core; NotSimulated if the host is another."""
     return _file_of(_library().simhost_error)
+
+
+def program(name: str, package: str) -> Path:
+    """A program beside the loaded host, whose version it has; a system may keep it with its
+    commands. NotSimulated if it is nowhere."""
+    beside = library_file().with_name(name)
+    if beside.exists():
+        return beside
+    found = shutil.which(name)
+    if found is None:
+        raise NotSimulated(
+            f"{name} is neither {beside} nor in PATH: Debian's package {package} has it"
+        )
+    return Path(found)
 
 
 @functools.lru_cache(maxsize=None)

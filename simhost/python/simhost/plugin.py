@@ -9,8 +9,10 @@ from typing import Any, FrozenSet, Iterator, Optional, Type, TypeVar
 
 import pytest
 
-from simhost import Block, Host, HostRefused, MemoryLeftOut, NotSimulated, SharedHost
+from simhost import Block, Frames, Host, HostRefused, MemoryLeftOut, NotSimulated, SharedHost
+from simhost._frames import FramesHost
 from simhost._host import Document
+from simhost._namespaces import NoFrames
 from simhost._recorded_test import RecordedTest, stand_in_front
 from simhost._loaded import LoadedControl
 
@@ -154,6 +156,33 @@ def shared_host(
         request.path.parent,
         may_leave_memory=_may_leave_memory(request),
     )
+
+
+@pytest.fixture(scope="session")
+def _frames_host(tmp_path_factory: pytest.TempPathFactory) -> Iterator[FramesHost]:
+    try:
+        made = FramesHost(tmp_path_factory.mktemp("frames"))
+    except (NoFrames, NotSimulated) as error:
+        pytest.fail(str(error), pytrace=False)
+    yield made
+    made.close()
+
+
+@pytest.fixture
+def frames(
+    request: pytest.FixtureRequest, scenario: Optional[Document], _frames_host: FramesHost
+) -> Iterator[Frames]:
+    """Real frames on a fresh host in a file, whose switches have nothing of other tests."""
+    host = _made(
+        SharedHost,
+        _frames_host.state,
+        _scenario(request, scenario),
+        request.path.parent,
+        may_leave_memory=_may_leave_memory(request),
+    )
+    frames = _frames_host.frames(host)
+    yield frames
+    frames.close()
 
 
 @pytest.hookimpl(trylast=True)  # type: ignore[misc]  # pluggy is not typed
