@@ -42,7 +42,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       lock_(lock(beside(options_.state, "-simhostd.lock"))),
       store_(opened(options_.state)),
       host_(options_.state.string()),
-      state_watch_(loop, options_.state, [this] { sync_soon(); }),
+      state_watch_(loop, store_, options_.state, [this] { sync_soon(); }),
       device_watch_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state),
               [this](Json const &question, Reply const &reply) { handle(question, reply); }) {
