@@ -181,8 +181,16 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadlin
   for (auto const &bridge : wanted.bridges) {
     rows.push_back(bridge.row);
   }
-  auto operations =
-      openvswitch::operations(present, rows, told_.host, told_.owner, wanted.most_tags);
+  for (auto const &bridge : present.bridges) {
+    if (std::ranges::any_of(wanted.unfit,
+                            [&](Unfit const &one) { return one.bridge == bridge.row.name; })) {
+      rows.push_back(bridge.row);
+    }
+  }
+  // As many as those need that stay as they are, too.
+  auto const most_tags =
+      wanted.unfit.empty() ? wanted.most_tags : std::max(wanted.most_tags, present.most_tags);
+  auto operations = openvswitch::operations(present, rows, told_.host, told_.owner, most_tags);
   auto added = added_devices(present, rows);
   if (operations.empty()) {
     return added;
@@ -264,8 +272,8 @@ std::size_t Bridges::apply(Wanted const &wanted) {
   auto const deadline = soon();
   auto const added = apply_rows(wanted, deadline);
   std::erase_if(bridges_, [&](auto const &bridge) {
-    return std::ranges::none_of(wanted.bridges,
-                                [&](auto const &one) { return one.key == bridge.first; });
+    auto const is_it = [&](auto const &one) { return one.key == bridge.first; };
+    return std::ranges::none_of(wanted.bridges, is_it) && std::ranges::none_of(wanted.unfit, is_it);
   });
   std::size_t changed = 0;
   for (auto const &bridge : wanted.bridges) {

@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <utility>
 #include <vector>
 
@@ -21,7 +22,9 @@ namespace {
 
 using namespace std::chrono_literals;
 
-constexpr auto kBetweenAttempts = 50ms;
+// Between two attempts to connect.
+constexpr events::Clock::duration kFirstPause = 50ms;
+constexpr events::Clock::duration kLongestPause = 500ms;
 
 std::filesystem::path beside(std::filesystem::path file, char const *suffix) {
   file += suffix;
@@ -39,6 +42,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
     : loop_(loop),
       options_(std::move(options)),
       say_(std::move(say)),
+      troubles_(say_),
       lock_(lock(beside(options_.state, "-simhostd.lock"))),
       store_(opened(options_.state)),
       host_(options_.state.string()),
@@ -54,44 +58,47 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
 void Daemon::connect() {
   next_connect_.end();
   bridges_.reset();
-  try {
+  attempt([this] {
     bridges_.emplace(
         loop_, options_.database,
         Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
                       .host = host_,
                       .disturbed = [this] { connect_later(); }});
     sync();
-  } catch (std::runtime_error const &error) {
-    fail(error.what());
-  }
+  });
 }
 
 void Daemon::connect_later() {
-  next_connect_ = loop_.after(kBetweenAttempts, [this] { connect(); });
+  pause_ = std::clamp(2 * pause_, kFirstPause, kLongestPause);
+  next_connect_ = loop_.after(pause_, [this] { connect(); });
 }
 
-void Daemon::fail(std::string const &why) {
-  bridges_.reset();
-  say_once(why);
-  connect_later();
-}
-
-void Daemon::say_once(std::string const &why) {
-  if (said_ != why) {
-    said_ = why;
-    say_(why);
+void Daemon::attempt(std::function<void()> const &work) {
+  troubles_.look_again();
+  try {
+    work();
+    pause_ = {};
+  } catch (std::runtime_error const &error) {
+    bridges_.reset();
+    troubles_.add(error.what());
+    connect_later();
   }
 }
 
 void Daemon::sync_soon() {
   if (!next_sync_) {
     next_sync_ = loop_.after(0ms, [this] {
-      try {
-        sync();
-      } catch (std::runtime_error const &error) {
-        fail(error.what());
+      if (bridges_) {
+        attempt([this] { sync(); });
       }
     });
+  }
+}
+
+void Daemon::sync_after(std::optional<ClockTime> const &wait) {
+  next_settling_.end();
+  if (wait) {
+    next_settling_ = loop_.after(*wait, [this] { sync_soon(); });
   }
 }
 
@@ -99,7 +106,7 @@ void Daemon::follow_devices() {
   bool differ = false;
   {
     storage::ReadingTransaction transaction(store_);
-    switch_devices(transaction, [this](std::string const &why) { say_once(why); });
+    switch_devices(transaction, [this](std::string const &why) { troubles_.add(why); });
     differ = links_differ(transaction);
   }
   if (differ) {
@@ -118,9 +125,6 @@ bool Daemon::is_new_device(std::string const &device) {
 }
 
 void Daemon::sync() {
-  if (!bridges_) {
-    return;
-  }
   follow_devices();
   storage::ReadingTransaction transaction(store_);
   auto const is_there = [](std::string const &device) {
@@ -154,11 +158,9 @@ void Daemon::settle(Wanted const &wanted) {
     }
   }
   in_force_ = wanted.change;
-  if (wanted.unfit.empty()) {
-    said_.clear();
-  }
+  sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {
-    say_once(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
+    troubles_.add(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
   }
   reply_to_waiting();
   if (auto const ready = std::exchange(ready_, nullptr)) {
@@ -184,7 +186,7 @@ void Daemon::handle_in_force(std::uint64_t change, Reply const &reply) {
 
 Json Daemon::addresses(Json const &question) {
   if (!bridges_) {
-    return {{"refused", "Open vSwitch cannot be reached: " + said_}};
+    return {{"refused", "Open vSwitch cannot be reached: " + troubles_.text()}};
   }
   auto const port = question.at("port").get<std::uint32_t>();
   Json entries = Json::array();
@@ -207,7 +209,7 @@ void Daemon::handle(Json const &question, Reply const &reply) {
     } else if (what == "addresses") {
       reply(addresses(question));
     } else if (what == "status") {
-      reply({{"change", in_force_}, {"said", said_}, {"process", getpid()}});
+      reply({{"change", in_force_}, {"said", troubles_.text()}, {"process", getpid()}});
     } else {
       reply({{"refused", "nobody here knows '" + what + "'"}});
     }

@@ -14,6 +14,7 @@
 #include "daemon/network_devices.h"
 #include "daemon/server.h"
 #include "daemon/state_watch.h"
+#include "daemon/troubles.h"
 #include "events/loop.h"
 #include "storage/store.h"
 
@@ -24,9 +25,6 @@ struct Options {
   std::filesystem::path database;  ///< the socket of Open vSwitch's
   std::string datapath;
 };
-
-/// For operators: one line for each thing that they may want to know.
-using Say = std::function<void(std::string const &)>;
 
 class Daemon {
  public:
@@ -39,13 +37,13 @@ class Daemon {
   void when_ready(std::function<void()> ready) { ready_ = std::move(ready); }
 
  private:
+  void attempt(std::function<void()> const &work);
   void connect_later();
   void sync_soon();
+  void sync_after(std::optional<ClockTime> const &wait);
   void sync();
   void follow_devices();
   void settle(Wanted const &wanted);
-  void fail(std::string const &why);
-  void say_once(std::string const &why);
   void reply_to_waiting();
 
   void handle(Json const &question, Reply const &reply);
@@ -56,6 +54,7 @@ class Daemon {
   events::Loop &loop_;
   Options options_;
   Say say_;
+  Troubles troubles_;
   events::Descriptor lock_;
   storage::Store store_;
   std::string host_;
@@ -64,12 +63,13 @@ class Daemon {
   Server server_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
-  std::string said_;                             // the last thing that stood in the way
   std::map<std::string, unsigned> devices_;      // the index of each that is at a bridge
   std::multimap<std::uint64_t, Reply> waiting_;  // for a change to be in force
   std::function<void()> ready_;
   events::Loop::Timer next_sync_;
+  events::Loop::Timer next_settling_;
   events::Loop::Timer next_connect_;
+  events::Clock::duration pause_ = {};  // before the next attempt to connect
 };
 
 }  // namespace simhost::daemon

@@ -35,15 +35,20 @@ std::string bridge_name(std::string_view host, std::string const &identifier) {
   return fmt::format("vs{:012x}", whole >> 16U);
 }
 
-openvswitch::Compiled compiled(storage::Transaction &transaction, storage::SwitchKey key) {
-  auto const team =
-      teaming::team_of(transaction, key, [](storage::Transaction &from, std::string_view uplink) {
+teaming::Team team_with_devices(storage::Transaction &transaction, storage::SwitchKey key) {
+  return teaming::team_of(
+      transaction, key, [](storage::Transaction &from, std::string_view uplink) {
         auto link = storage::find_link(from, uplink).value_or(storage::Link{});
         // Whatever stands in for its wires, no frame comes or goes.
         link.carrier = link.carrier && storage::device_of(from, uplink).has_value();
         return link;
       });
-  return openvswitch::compile(openvswitch::read_network(transaction, key, team, {}));
+}
+
+void shorten(std::optional<ClockTime> &lasts, std::optional<ClockTime> const &other) {
+  if (other) {
+    lasts = std::min(lasts.value_or(*other), *other);
+  }
 }
 
 }  // namespace
@@ -72,16 +77,19 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       continue;
     }
     try {
-      bridge.compiled = compiled(transaction, key);
+      auto const team = team_with_devices(transaction, key);
+      bridge.compiled = openvswitch::compile(openvswitch::read_network(transaction, key, team, {}));
       std::erase_if(bridge.row.devices,
                     [&](auto const &device) { return !is_there(device.first); });
       bridge.row.limits = {
           {openvswitch::table::kLearnedAddresses, bridge.compiled.rows.most_learned}};
       bridge.compiled.flows.push_back(openvswitch::generation_marker(wanted.change));
       wanted.most_tags = std::max(wanted.most_tags, bridge.compiled.rows.most_tags);
+      shorten(wanted.lasts, teaming::until_next_settles(team));
       wanted.bridges.push_back(std::move(bridge));
     } catch (Refused const &refused) {
-      wanted.unfit.push_back({.alias = row.alias, .why = refused.what()});
+      wanted.unfit.push_back(
+          {.key = key, .alias = row.alias, .bridge = bridge.row.name, .why = refused.what()});
     }
   }
   return wanted;

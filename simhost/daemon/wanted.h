@@ -4,10 +4,12 @@
 #include <cstdint>
 #include <functional>
 #include <map>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "clock/clock.h"
 #include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/rows/rows.h"
 #include "storage/ports.h"
@@ -22,9 +24,11 @@ struct WantedBridge {
   openvswitch::Compiled compiled;              ///< with the marker of the change
 };
 
-/// A switch that cannot be run as it is, and why.
+/// A switch that cannot be run as it is, and why. Its bridge goes on as it was.
 struct Unfit {
+  storage::SwitchKey key;
   std::string alias;
+  std::string bridge;
   std::string why;
 };
 
@@ -33,6 +37,8 @@ struct Wanted {
   std::vector<WantedBridge> bridges;
   std::vector<Unfit> unfit;
   std::uint32_t most_tags = 0;
+  /// When something else is wanted although nobody changes anything.
+  std::optional<ClockTime> lasts = std::nullopt;
 };
 
 /// Whether a device can be put at a bridge.

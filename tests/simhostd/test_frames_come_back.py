@@ -3,6 +3,7 @@
 import os
 import re
 import signal
+import sqlite3
 import subprocess
 from typing import Dict
 
@@ -158,3 +159,44 @@ def test_a_caller_that_is_killed_leaves_old_or_new(lab: Lab) -> None:
     assert one.comes_to_reach(other)
     # What it wrote last is on its way.
     assert comes_true(lab.is_in_force)
+
+
+def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    # No flows can be made of such a session; it is accepted where no frames go.
+    session = {
+        "sid": "far",
+        "type": "encapsulated",
+        "to": [{"ip": "192.0.2.1"}],
+        "encapsulation": {"type": "gre", "key": 9},
+    }
+    spare = {"alias": "spare", "ports": [{"id": "s", "mirror_sessions": [session]}]}
+    second = {"alias": "second", "ports": [{"id": "x"}, {"id": "y"}]}
+    lab.apply({"switches": [spare, second]})
+    third, fourth = lab.client("second", "x"), lab.client("second", "y")
+    move_mirror_sessions(lab, "s", "a")
+    why = "the switch 'lab' cannot be run: the mirror session 'far'"
+    assert comes_true(lambda: why in lab.plane()["said"])
+    assert lab.log().count(why) == 1
+    assert one.reaches(other)
+    assert third.reaches(fourth, attempts=5)
+    move_mirror_sessions(lab, "a", "s")
+    assert comes_true(lambda: not lab.plane()["said"])
+    lab.set_port("lab", "a", vlan=7)
+    assert not one.reaches(other)
+
+
+def move_mirror_sessions(lab: Lab, one: str, other: str) -> None:
+    """From one port to another, as no call can."""
+    state = sqlite3.connect(lab.state)
+    moved = state.execute(
+        "UPDATE property SET (switch, port) ="
+        " (SELECT switch, number FROM port WHERE identifier = ?)"
+        " WHERE name = 'com.quorix.vswitch.port.mirrorSessions' AND port ="
+        " (SELECT number FROM port WHERE identifier = ?)",
+        (other, one),
+    )
+    assert moved.rowcount == 1
+    state.commit()
+    state.close()

@@ -130,6 +130,17 @@ Team team_of(storage::Transaction &transaction, storage::SwitchKey key, LinkOf c
   return team;
 }
 
+std::optional<ClockTime> until_next_settles(Team const &team) {
+  std::optional<ClockTime> least;
+  for (auto const &uplink : team.uplinks) {
+    if (uplink.link.up() && !is_settled(team, uplink.link)) {
+      auto const left = uplink.link.up_since + team.up_delay - team.now;
+      least = std::min(least.value_or(left), left);
+    }
+  }
+  return least;
+}
+
 UsableSlots usable_slots(Team const &team, VSTeamPolicy const &policy) {
   auto const named = named_by(team, policy);
   std::vector<Slot> slots;

@@ -47,6 +47,10 @@ using LinkOf = std::function<Link(storage::Transaction &transaction, std::string
 SIMHOST_API Team team_of(storage::Transaction &transaction, storage::SwitchKey key,
                          LinkOf const &link_of);
 
+/// When the team is another one although nothing changes: how long from its `now` until the next
+/// uplink that came up has been so for the up-delay.
+SIMHOST_API std::optional<ClockTime> until_next_settles(Team const &team);
+
 /// What a policy has in use under one name: an uplink, or the uplinks of a group.
 struct Slot {
   std::vector<std::size_t> uplinks;  ///< where they are in Team::uplinks; not empty

@@ -123,15 +123,15 @@ class Wire:
     def __init__(self, near: str, far: Namespace, name: str) -> None:
         self.near = near
         self._far = far
-        self._name = name
+        self.name = name
 
     def pull(self) -> None:
         """Takes the link from both ends."""
-        self._far.run("ip", "link", "set", self._name, "down")
+        self._far.run("ip", "link", "set", self.name, "down")
 
     def plug(self) -> None:
         """Links them again."""
-        self._far.run("ip", "link", "set", self._name, "up")
+        self._far.run("ip", "link", "set", self.name, "up")
 
 
 class Cabling:
@@ -195,6 +195,12 @@ class Network:
         self._frames.cabling.connect(self._namespace, name, far, _DEVICE)
         self._namespace.run("ip", "link", "set", name, *self._bridge)
         return self._frames.new_client(far)
+
+    def came_over(self, mac: str) -> str:
+        """The uplink over which the last frame from an address came; empty if none did."""
+        said = self._namespace.run("bridge", "-json", "fdb", "show", "br", "bridge")
+        wires = [entry["ifname"] for entry in json.loads(said) if entry["mac"] == mac]
+        return "".join(name for name, wire in self._wires.items() if wire.name in wires)
 
     def pull(self, uplink: str) -> None:
         """Pulls the cable of an uplink.

@@ -1,0 +1,124 @@
+"""Which uplink frames take as links come and go."""
+
+import signal
+from typing import Any
+
+import pytest
+
+from frame_lab import Lab, comes_true
+from simhost import Client, Network
+
+
+def set_teaming(lab: Lab, **teaming: Any) -> None:
+    team = {"balance": "explicit", "active": ["nic0"], "standby": ["nic1"], **teaming}
+    lab.apply({"switches": [{"alias": "lab", "teaming": team}]})
+
+
+@pytest.fixture
+def network(lab: Lab) -> Network:
+    return lab.network("nic0", "nic1")
+
+
+@pytest.fixture
+def far(network: Network) -> Client:
+    return network.client()
+
+
+@pytest.fixture
+def near(lab: Lab, far: Client) -> Client:
+    client = lab.client("lab", "a")
+    assert client.comes_to_reach(far)
+    return client
+
+
+def test_an_uplink_that_comes_up_is_used_after_its_delay(
+    lab: Lab, network: Network, far: Client, near: Client
+) -> None:
+    an_hour = 3_600_000
+    lab.apply({"runtime_options": {"TeamPolicyUpDelay": an_hour}})
+    network.pull("nic0")
+    assert near.comes_to_reach(far)
+    network.plug("nic0")
+    assert comes_true(lambda: "nic0       link up" in lab.ctl("show"))
+    assert near.reaches(far, attempts=5)
+    assert network.came_over(near.mac) == "nic1"
+    network.pull("nic1")
+    assert comes_true(lambda: "nic1       link down" in lab.ctl("show"))
+    assert not near.reaches(far)
+    lab.ctl("clock", "step", "3600")
+    assert near.comes_to_reach(far)
+    assert network.came_over(near.mac) == "nic0"
+
+
+def test_nobody_has_to_ask_for_the_delay_to_end(
+    lab: Lab, network: Network, far: Client, near: Client
+) -> None:
+    lab.apply({"runtime_options": {"TeamPolicyUpDelay": 300}})
+    network.pull("nic0")
+    network.pull("nic1")
+    assert comes_true(lambda: "nic1       link down" in lab.ctl("show"))
+    network.plug("nic0")
+    assert near.comes_to_reach(far)
+
+
+def test_an_uplink_that_returns_is_used_again(network: Network, far: Client, near: Client) -> None:
+    network.pull("nic0")
+    assert near.comes_to_reach(far)
+    assert network.came_over(near.mac) == "nic1"
+    network.plug("nic0")
+    assert comes_true(lambda: near.reaches(far) and network.came_over(near.mac) == "nic0")
+
+
+def test_a_rolling_team_stays_where_it_is(
+    lab: Lab, network: Network, far: Client, near: Client
+) -> None:
+    set_teaming(lab, flags=["rolling"])
+    network.pull("nic0")
+    assert near.comes_to_reach(far)
+    network.plug("nic0")
+    assert comes_true(lambda: "nic0       link up" in lab.ctl("show"))
+    assert near.reaches(far, attempts=5)
+    assert network.came_over(near.mac) == "nic1"
+    # Also for a daemon that comes later.
+    lab.stop(signal.SIGTERM)
+    lab.start()
+    assert near.comes_to_reach(far)
+    assert network.came_over(near.mac) == "nic1"
+    network.pull("nic1")
+    assert near.comes_to_reach(far)
+    assert network.came_over(near.mac) == "nic0"
+
+
+# What a device of this kind has: 10 Gbit/s in both directions at once.
+@pytest.mark.parametrize(
+    "unmet, met",
+    [
+        ({"criteria": ["speed"], "speed": 1000}, {"criteria": ["speed"], "speed": 10000}),
+        (
+            {"criteria": ["speed_at_least"], "speed": 10001},
+            {"criteria": ["speed_at_least"], "speed": 1000},
+        ),
+        (
+            {"criteria": ["duplex"], "full_duplex": False},
+            {"criteria": ["duplex"], "full_duplex": True},
+        ),
+    ],
+)
+def test_an_uplink_that_does_not_meet_the_criteria_is_not_used(
+    lab: Lab, network: Network, far: Client, near: Client, unmet: Any, met: Any
+) -> None:
+    set_teaming(lab, **unmet)
+    assert not near.reaches(far)
+    set_teaming(lab, **met)
+    assert near.reaches(far, attempts=5)
+
+
+def test_an_uplink_whose_port_is_blocked_is_not_used(
+    lab: Lab, network: Network, far: Client, near: Client
+) -> None:
+    set_teaming(lab, criteria=["blocked"])
+    lab.apply(
+        {"switches": [{"alias": "lab", "uplink_ports": [{"id": "uplink1", "blocked": True}]}]}
+    )
+    assert near.reaches(far, attempts=5)
+    assert network.came_over(near.mac) == "nic1"
