@@ -145,28 +145,41 @@ Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, Told t
       folder_(socket.parent_path()),
       told_(std::move(told)),
       database_(socket, "Open_vSwitch", soon()) {
+  ovsdb::Selected followed;
+  ovsdb::select_configuration(followed);
+  openvswitch::select_rows(followed);
+  database_.monitor(followed, soon());
   take_ownership();
-  ovsdb::Selected progress;
-  ovsdb::select_configuration(progress);
-  database_.monitor(progress, soon());
   database_watch_ = loop_.watch(database_.fd(), [this] { read_database_events(); });
 }
 
 Bridges::~Bridges() = default;
 
+openvswitch::PresentRows const &Bridges::present() {
+  if (!present_) {
+    present_ = openvswitch::present_rows(database_.replica(), told_.host);
+  }
+  return *present_;
+}
+
 void Bridges::take_ownership() {
   if (!database_.lock(kLock, soon())) {
-    auto const present =
-        openvswitch::present_rows(database_.transact(openvswitch::questions(), soon()), told_.host);
-    throw std::runtime_error(fmt::format("{} writes to this Open vSwitch",
-                                         present.owner.empty() ? "another one" : present.owner));
+    auto const &owner = present().owner;
+    throw std::runtime_error(
+        fmt::format("{} writes to this Open vSwitch", owner.empty() ? "another one" : owner));
   }
 }
 
 void Bridges::read_database_events() {
   try {
     database_.receive();
+    bool has_changed = false;
     while (database_.next_event()) {
+      has_changed = true;
+    }
+    if (has_changed) {
+      present_.reset();
+      told_.changed();
     }
   } catch (std::runtime_error const &) {
     database_watch_.end();
@@ -175,13 +188,11 @@ void Bridges::read_database_events() {
 }
 
 std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadline) {
-  auto const present =
-      openvswitch::present_rows(database_.transact(openvswitch::questions(), deadline), told_.host);
   std::vector<openvswitch::BridgeRow> rows;
   for (auto const &bridge : wanted.bridges) {
     rows.push_back(bridge.row);
   }
-  for (auto const &bridge : present.bridges) {
+  for (auto const &bridge : present().bridges) {
     if (std::ranges::any_of(wanted.unfit,
                             [&](Unfit const &one) { return one.bridge == bridge.row.name; })) {
       rows.push_back(bridge.row);
@@ -189,15 +200,18 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadlin
   }
   // As many as those need that stay as they are, too.
   auto const most_tags =
-      wanted.unfit.empty() ? wanted.most_tags : std::max(wanted.most_tags, present.most_tags);
-  auto operations = openvswitch::operations(present, rows, told_.host, told_.owner, most_tags);
-  auto added = added_devices(present, rows);
+      wanted.unfit.empty() ? wanted.most_tags : std::max(wanted.most_tags, present().most_tags);
+  auto operations = openvswitch::operations(present(), rows, told_.host, told_.owner, most_tags);
   if (operations.empty()) {
-    return added;
+    return {};
   }
+  auto added = added_devices(present(), rows);
   ovsdb::raise_configuration(operations);
   auto const number = ovsdb::raised_configuration(database_.transact(operations, deadline));
   ovsdb::wait_for_configuration(database_, number, deadline);
+  // What others changed meanwhile was told to that wait.
+  present_.reset();
+  told_.changed();
   return added;
 }
 

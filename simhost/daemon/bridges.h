@@ -7,6 +7,7 @@
 #include <functional>
 #include <map>
 #include <memory>
+#include <optional>
 #include <set>
 #include <string>
 #include <vector>
@@ -15,6 +16,7 @@
 #include "events/loop.h"
 #include "planes/openvswitch/openflow/connection.h"
 #include "planes/openvswitch/ovsdb/client.h"
+#include "planes/openvswitch/rows/rows.h"
 
 namespace simhost::daemon {
 
@@ -34,7 +36,9 @@ class Bridges {
     std::string
         owner;  ///< how this process is called in words, for another one that wants to write
     std::string host;
-    /// Something changed that nobody here changed, or a connection ended.
+    /// The database has rows that are others than before, whoever changed them.
+    std::function<void()> changed;
+    /// A connection ended.
     std::function<void()> disturbed;
   };
 
@@ -56,6 +60,7 @@ class Bridges {
 
   void take_ownership();
   void read_database_events();
+  openvswitch::PresentRows const &present();
   // Returns the devices that were put at bridges.
   std::set<std::string> apply_rows(Wanted const &wanted, openvswitch::Deadline deadline);
   std::size_t apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
@@ -67,6 +72,8 @@ class Bridges {
   std::filesystem::path folder_;
   Told told_;
   ovsdb::Client database_;
+  // None once the database has changed: most changes are none of rows, and take no look at them.
+  std::optional<openvswitch::PresentRows> present_;
   events::Loop::Watch database_watch_;
   std::map<storage::SwitchKey, std::unique_ptr<Bridge>> bridges_;
 };

@@ -63,6 +63,7 @@ void Daemon::connect() {
         loop_, options_.database,
         Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
                       .host = host_,
+                      .changed = [this] { sync_soon(); },
                       .disturbed = [this] { connect_later(); }});
     sync();
   });

@@ -123,6 +123,18 @@ def test_without_its_package_it_says_which(idle: Lab, file: str) -> None:
     assert idle.plane()["change"] is None
 
 
+def test_a_device_that_somebody_takes_out_of_open_vswitch_comes_back(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    database = f"--db=unix:{lab.run_folder()}/db.sock"
+    lab.host.run("ovs-vsctl", database, "del-port", "c1")
+    assert one.comes_to_reach(other)
+    # One that nobody here put there stays.
+    lab.host.run("ovs-vsctl", database, "add-br", "theirs")
+    lab.set_port("lab", "a", vlan=7)
+    assert "theirs" in lab.host.run("ovs-vsctl", database, "list-br")
+
+
 def test_a_device_may_vanish_and_return(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     assert one.reaches(other, attempts=5)

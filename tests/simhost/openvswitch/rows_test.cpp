@@ -13,6 +13,9 @@ using simhost::openvswitch::Json;
 using simhost::openvswitch::operations;
 using simhost::openvswitch::present_rows;
 using simhost::openvswitch::PresentRows;
+using simhost::ovsdb::Column;
+using simhost::ovsdb::Replica;
+using simhost::ovsdb::Schema;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::SizeIs;
@@ -21,24 +24,50 @@ constexpr auto *kHost = "/h.db";
 constexpr auto *kOwner = "simhostd of /h.db, process 7";
 using Rows = std::vector<BridgeRow>;
 
-// As a database replies that has a bridge of this host with the device c1, and one of nobody's.
-Json replies() {
-  return Json::parse(R"json([
-    {"rows": [{"_uuid": ["uuid", "o"],
-               "external_ids": ["map", [["simhostd", "simhostd of /h.db, process 7"]]],
-               "other_config": ["map", [["vlan-limit", "2"]]]}]},
-    {"rows": [{"_uuid": ["uuid", "b1"], "name": "vs1", "datapath_type": "netdev",
-               "ports": ["set", [["uuid", "p0"], ["uuid", "p1"]]],
-               "external_ids": ["map", [["simhost", "/h.db"]]],
-               "flow_tables": ["map", [[32, ["uuid", "t"]]]]},
-              {"_uuid": ["uuid", "b2"], "name": "br0", "datapath_type": "",
-               "ports": ["set", []], "external_ids": ["map", []], "flow_tables": ["map", []]}]},
-    {"rows": [{"_uuid": ["uuid", "p0"], "name": "vs1", "interfaces": ["uuid", "i0"]},
-              {"_uuid": ["uuid", "p1"], "name": "c1", "interfaces": ["uuid", "i1"]}]},
-    {"rows": [{"_uuid": ["uuid", "i0"], "name": "vs1", "ofport_request": ["set", []]},
-              {"_uuid": ["uuid", "i1"], "name": "c1", "ofport_request": 5}]},
-    {"rows": [{"_uuid": ["uuid", "t"], "flow_limit": 100}]}
-  ])json");
+Schema schema() {
+  using Kind = Column::Kind;
+  Column const single{.kind = Kind::single, .is_optional = false, .usual = ""};
+  Column const set{.kind = Kind::set, .is_optional = false, .usual = simhost::ovsdb::set({})};
+  Column const optional{.kind = Kind::set, .is_optional = true, .usual = simhost::ovsdb::set({})};
+  Column const map{.kind = Kind::map, .is_optional = false, .usual = simhost::ovsdb::map({})};
+  return {{"Open_vSwitch", {{"external_ids", map}, {"other_config", map}}},
+          {"Bridge",
+           {{"name", single},
+            {"datapath_type", single},
+            {"ports", set},
+            {"external_ids", map},
+            {"flow_tables", map}}},
+          {"Port", {{"name", single}, {"interfaces", set}}},
+          {"Interface", {{"name", single}, {"ofport_request", optional}}},
+          {"Flow_Table", {{"flow_limit", optional}}}};
+}
+
+Replica replica_of(char const *updates) {
+  Replica replica(schema());
+  replica.apply(Json::parse(updates));
+  return replica;
+}
+
+// Of a database that has a bridge of this host with the device c1, and one of nobody's.
+Replica replica() {
+  return replica_of(R"json({
+    "Open_vSwitch": {
+      "o": {"initial": {"external_ids": ["map", [["simhostd", "simhostd of /h.db, process 7"]]],
+                        "other_config": ["map", [["vlan-limit", "2"]]]}}},
+    "Bridge": {
+      "b1": {"initial": {"name": "vs1", "datapath_type": "netdev",
+                         "ports": ["set", [["uuid", "p0"], ["uuid", "p1"]]],
+                         "external_ids": ["map", [["simhost", "/h.db"]]],
+                         "flow_tables": ["map", [[32, ["uuid", "t"]]]]}},
+      "b2": {"initial": {"name": "br0"}}},
+    "Port": {
+      "p0": {"initial": {"name": "vs1", "interfaces": ["uuid", "i0"]}},
+      "p1": {"initial": {"name": "c1", "interfaces": ["uuid", "i1"]}}},
+    "Interface": {
+      "i0": {"initial": {"name": "vs1"}},
+      "i1": {"initial": {"name": "c1", "ofport_request": 5}}},
+    "Flow_Table": {"t": {"initial": {"flow_limit": 100}}}
+  })json");
 }
 
 BridgeRow vs1() {
@@ -54,21 +83,21 @@ std::vector<std::string> told(PresentRows const &present, Rows const &wanted) {
 }
 
 TEST(TheRows, OfThisHostAreReadAndNoOthers) {
-  auto const present = present_rows(replies(), kHost);
+  auto const present = present_rows(replica(), kHost);
   ASSERT_THAT(present.bridges, SizeIs(1));
   EXPECT_EQ(present.bridges[0].row, vs1());
   EXPECT_EQ(present.owner, kOwner);
   EXPECT_EQ(present.most_tags, 2U);
   EXPECT_FALSE(present.is_new);
-  EXPECT_THAT(present_rows(replies(), "/other.db").bridges, SizeIs(0));
+  EXPECT_THAT(present_rows(replica(), "/other.db").bridges, SizeIs(0));
 }
 
 TEST(TheRows, ThatAreAsTheyAreWantedAreLeftAlone) {
-  EXPECT_THAT(told(present_rows(replies(), kHost), {vs1()}), SizeIs(0));
+  EXPECT_THAT(told(present_rows(replica(), kHost), {vs1()}), SizeIs(0));
 }
 
 TEST(TheRows, ChangeInPlace) {
-  auto const present = present_rows(replies(), kHost);
+  auto const present = present_rows(replica(), kHost);
   auto more = vs1();
   more.devices["c2"] = 6;
   EXPECT_THAT(told(present, {more}),
@@ -89,33 +118,35 @@ TEST(TheRows, ChangeInPlace) {
 }
 
 TEST(TheRows, OfBridgesThatNobodyWantsGoWithAllThatIsTheirs) {
-  EXPECT_THAT(told(present_rows(replies(), kHost), {}), ElementsAre("mutate Open_vSwitch"));
+  EXPECT_THAT(told(present_rows(replica(), kHost), {}), ElementsAre("mutate Open_vSwitch"));
 }
 
 TEST(TheRows, OfABridgeWithAnotherDataPathAreMadeAnew) {
   auto other = vs1();
   other.datapath = "system";
-  auto const all = told(present_rows(replies(), kHost), {other});
+  auto const all = told(present_rows(replica(), kHost), {other});
   EXPECT_THAT(all, testing::Contains("insert Bridge"));
   EXPECT_EQ(all.back(), "mutate Open_vSwitch");
 }
 
 TEST(TheRows, OfANewDatabaseBeginWithItsOnlyRow) {
-  auto const present = present_rows(
-      Json::parse(R"([{"rows": []}, {"rows": []}, {"rows": []}, {"rows": []}, {"rows": []}])"),
-      kHost);
+  auto const present = present_rows(replica_of("{}"), kHost);
   EXPECT_TRUE(present.is_new);
   EXPECT_EQ(told(present, {vs1()}).front(), "insert Open_vSwitch");
 }
 
-TEST(TheRows, ThatAreNoneAreRefusedInWords) {
-  for (auto const *said : {"[]", R"([{"rows": 1}])", R"([{"rows": [{}]}])", "[1, 2]"}) {
-    try {
-      present_rows(Json::parse(said), kHost);
-      ADD_FAILURE() << said;
-    } catch (std::runtime_error const &error) {
-      EXPECT_THAT(error.what(), HasSubstr("Open vSwitch's database"));
-    }
+TEST(TheRows, ThatDoNotFitTogetherAreRefusedInWords) {
+  for (
+      auto const *said :
+      {R"({"Bridge": {"b1": {"modify": {"ports": ["set", [["uuid", "gone"]]]}}}})",
+       R"({"Port": {"p1": {"delete": null}}})", R"({"Interface": {"i1": {"delete": null}}})",
+       R"({"Flow_Table": {"t": {"delete": null}}})",
+       R"({"Open_vSwitch": {"o": {"modify": {"other_config": ["map", [["vlan-limit", "x"]]]}}}})"}) {
+    auto changed = replica();
+    changed.apply(Json::parse(said));
+    EXPECT_THAT([&] { present_rows(changed, kHost); },
+                testing::ThrowsMessage<std::runtime_error>(HasSubstr("Open vSwitch's database")))
+        << said;
   }
 }
 

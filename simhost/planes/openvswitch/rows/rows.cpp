@@ -1,4 +1,4 @@
-// Reading replies and writing operations.
+// Reading rows and writing operations.
 #include "planes/openvswitch/rows/rows.h"
 
 #include <fmt/format.h>
@@ -26,10 +26,6 @@ Json map_of(std::map<std::string, std::string> const &entries) {
 
 Json is(Json const &id) {
   return Json::array({{"_uuid", "==", id}});
-}
-
-Json select(std::string const &table, std::vector<std::string> const &columns) {
-  return {{"op", "select"}, {"table", table}, {"where", kEverywhere}, {"columns", columns}};
 }
 
 Json insert(std::string const &table, std::string const &name, Json row) {
@@ -62,25 +58,13 @@ std::string id_in(Json const &column) {
 
 [[noreturn]] void refuse(std::exception const &error) {
   throw std::runtime_error(
-      fmt::format("Open vSwitch's database says what nobody asked for: {}", error.what()));
-}
-
-// The rows of one reply, by their identifiers.
-std::map<std::string, Json> rows_in(Json const &reply) {
-  if (reply.contains("error")) {
-    throw std::runtime_error("Open vSwitch's database refuses a question: " + reply.dump());
-  }
-  std::map<std::string, Json> all;
-  for (auto const &row : reply.at("rows")) {
-    all.emplace(id_in(row.at("_uuid")), row);
-  }
-  return all;
+      fmt::format("Open vSwitch's database has rows that do not fit together: {}", error.what()));
 }
 
 struct Tables {
-  std::map<std::string, Json> ports;
-  std::map<std::string, Json> interfaces;
-  std::map<std::string, Json> flow_tables;
+  ovsdb::Rows const &ports;
+  ovsdb::Rows const &interfaces;
+  ovsdb::Rows const &flow_tables;
 };
 
 void add_device(PresentBridge &bridge, std::string const &port_id, Tables const &tables) {
@@ -95,7 +79,7 @@ void add_device(PresentBridge &bridge, std::string const &port_id, Tables const 
   bridge.row.devices[name] = requested.empty() ? 0 : requested.front().get<std::uint16_t>();
 }
 
-PresentBridge bridge_of(std::string const &id, Json const &row, Tables const &tables) {
+PresentBridge bridge_of(std::string const &id, ovsdb::Row const &row, Tables const &tables) {
   PresentBridge bridge{.id = id,
                        .row = {.name = row.at("name").get<std::string>(),
                                .datapath = row.at("datapath_type").get<std::string>()},
@@ -248,28 +232,32 @@ bool is_same_bridge(PresentBridge const &present, BridgeRow const &wanted) {
 
 }  // namespace
 
-Json questions() {
-  return Json::array(
-      {select("Open_vSwitch", {"_uuid", "external_ids", "other_config"}),
-       select("Bridge", {"_uuid", "name", "datapath_type", "ports", "external_ids", "flow_tables"}),
-       select("Port", {"_uuid", "name", "interfaces"}),
-       select("Interface", {"_uuid", "name", "ofport_request"}),
-       select("Flow_Table", {"_uuid", "flow_limit"})});
+void select_rows(ovsdb::Selected &selected) {
+  ovsdb::Selected const read{
+      {"Open_vSwitch", {"external_ids", "other_config"}},
+      {"Bridge", {"name", "datapath_type", "ports", "external_ids", "flow_tables"}},
+      {"Port", {"name", "interfaces"}},
+      {"Interface", {"name", "ofport_request"}},
+      {"Flow_Table", {"flow_limit"}}};
+  for (auto const &[table, columns] : read) {
+    auto &known = selected[table];
+    known.insert(known.end(), columns.begin(), columns.end());
+  }
 }
 
-PresentRows present_rows(Json const &replies, std::string_view host) {
+PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host) {
   try {
     PresentRows present;
-    for (auto const &[id, row] : rows_in(replies.at(0))) {
+    for (auto const &[id, row] : replica.rows("Open_vSwitch")) {
       present.is_new = false;
       present.owner = text_under(row.at("external_ids"), kOwner);
       auto const tags = text_under(row.at("other_config"), kMostTags);
       present.most_tags = tags.empty() ? 0 : static_cast<std::uint32_t>(std::stoul(tags));
     }
-    Tables const tables{.ports = rows_in(replies.at(2)),
-                        .interfaces = rows_in(replies.at(3)),
-                        .flow_tables = rows_in(replies.at(4))};
-    for (auto const &[id, row] : rows_in(replies.at(1))) {
+    Tables const tables{.ports = replica.rows("Port"),
+                        .interfaces = replica.rows("Interface"),
+                        .flow_tables = replica.rows("Flow_Table")};
+    for (auto const &[id, row] : replica.rows("Bridge")) {
       if (text_under(row.at("external_ids"), kHost) == host) {
         present.bridges.push_back(bridge_of(id, row, tables));
       }

@@ -1,5 +1,5 @@
 // The rows of Open vSwitch's database that are this host's: bridges and the devices at them. What
-// is asked for, read from replies, and told, as operations of the OVSDB protocol (RFC 7047).
+// is followed of it, read from a replica, and told, as operations of the OVSDB protocol (RFC 7047).
 #pragma once
 
 #include <cstdint>
@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "planes/openvswitch/ovsdb/json.h"
+#include "planes/openvswitch/ovsdb/replica.h"
 
 namespace simhost::openvswitch {
 
@@ -41,11 +42,10 @@ struct PresentRows {
   std::uint32_t most_tags = 0;  ///< of the frames that the switch tells apart
 };
 
-/// Asks for what present_rows() reads.
-Json questions();
-/// Of the replies to them; the bridges are those of `host`. Throws std::runtime_error for what is
-/// no such reply.
-PresentRows present_rows(Json const &replies, std::string_view host);
+/// The columns that present_rows() reads.
+void select_rows(ovsdb::Selected &selected);
+/// The bridges are those of `host`. Throws std::runtime_error for rows that do not fit together.
+PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host);
 
 /// Makes the present ones as they are wanted; none for those that are so already. `owner` is who
 /// tells, in words.
