@@ -20,9 +20,10 @@ from typing import Dict, Iterator, List, NamedTuple, Sequence, Tuple
 
 from targets import FRAMES, NOISE
 
-from frame_lab import Client, Lab
+from frame_lab import Lab
 from lasting_open_vswitch import LastingOpenVSwitch
 from many_ports import SWITCH, ManyPorts, many_ports
+from simhost import Client
 
 
 class Effort(NamedTuple):
@@ -102,29 +103,34 @@ def round_trip(one: Client, other: Client, pings: int) -> float:
     return float(found.group(1)) * 1e3
 
 
+def switch_clients(lab: Lab) -> Tuple[Client, Client]:
+    """Two at a switch of the host."""
+    return lab.client(SWITCH, "a"), lab.client(SWITCH, "b")
+
+
 def normal_clients(lab: Lab) -> Tuple[Client, Client]:
     """Two at a bridge beside the host's, in the same data path, that forwards by itself."""
-    clients = []
-    for number in (1, 2):
-        client = Client(lab.namespace(), f"10.9.1.{number}")
-        lab.wire(f"n{number}", client.namespace, "eth0")
-        client.set_address()
-        clients.append(client)
+    far = [lab.frames.new_namespace() for _ in range(2)]
+    for number, namespace in enumerate(far):
+        lab.wire(f"n{number}", namespace, "eth0")
     lab.host.run(
         *("ovs-vsctl", f"--db=unix:{lab.run_folder()}/db.sock", "add-br", "normal"),
         *("--", "set", "Bridge", "normal", "datapath_type=netdev"),
-        *("--", "add-port", "normal", "n1", "--", "add-port", "normal", "n2"),
+        *("--", "add-port", "normal", "n0", "--", "add-port", "normal", "n1"),
     )
-    return clients[0], clients[1]
+    return lab.frames.new_client(far[0]), lab.frames.new_client(far[1])
 
 
 def frame_rows(effort: Effort) -> Iterator[Row]:
     document = {"switches": [{"alias": SWITCH, "ports": [{"id": "a"}, {"id": "b"}]}]}
     with tempfile.TemporaryDirectory() as folder, Lab(Path(folder), document) as lab:
         lab.start()
-        pairs = [(lab.client(SWITCH, "a"), lab.client(SWITCH, "b")), normal_clients(lab)]
+        pairs = [switch_clients(lab), normal_clients(lab)]
         for one, other in pairs:
             assert one.comes_to_reach(other)
+            for client in one, other:
+                # Nobody takes the frames that it would keep.
+                client.close()
         streams: List[List[float]] = []
         trips: List[List[float]] = []
         for turn in range(effort.turns):

@@ -9,7 +9,7 @@ from pathlib import Path
 from typing import Any, Dict, Iterator, List
 
 from frame_lab import Lab
-from namespaces import Namespace
+from simhost._namespaces import Namespace
 
 SWITCH = "rack"
 _FIRST_INDEX, _FIRST_FAR_INDEX = 10_000, 30_000
@@ -27,10 +27,7 @@ class ManyPorts:
 
     def __init__(self, lab: Lab, ports: int) -> None:
         self.lab = lab
-        self.far = lab.namespace()
-        for namespace in lab.host, self.far:
-            # Nothing speaks by itself.
-            namespace.run("sysctl", "-q", "-w", "net.ipv6.conf.default.disable_ipv6=1")
+        self.far = lab.frames.new_namespace()
         wires = [
             f"link add n{number} index {_FIRST_INDEX + number} up type veth"
             f" peer name f{number} index {_FIRST_FAR_INDEX + number} netns {self.far.pid}"
