@@ -43,13 +43,13 @@ Address address_at(Query const &row) {
   return address;
 }
 
+std::optional<PortNumber> port_at(Query const &row, int column) {
+  auto const port = PortNumber(row.number<std::uint32_t>(column));
+  return port == PortNumber{} ? std::nullopt : std::optional(port);
+}
+
 FoundAddress found_at(Query const &row) {
-  FoundAddress found{
-      .row = AddressRow(row.integer(0)), .port = std::nullopt, .type = type_at(row, 2)};
-  if (auto const port = PortNumber(row.number<std::uint32_t>(1)); port != PortNumber{}) {
-    found.port = port;
-  }
-  return found;
+  return {.row = AddressRow(row.integer(0)), .port = port_at(row, 1), .type = type_at(row, 2)};
 }
 
 std::int64_t count_at(Transaction &transaction, SwitchKey key, std::int64_t place) {
@@ -67,6 +67,17 @@ std::vector<Address> addresses_at(Transaction &transaction, Place const &place, 
                             " AND NOT (ages AND seen <= ?) ORDER BY mac, vid, vni");
   select.with(place.switch_key).with(port_or_none(place));
   return select.with(type).with(VS_MAC_ADDR_TYPE_ALL).with(gone.count()).all(address_at);
+}
+
+std::vector<PlacedAddress> fixed_addresses(Transaction &transaction, SwitchKey key) {
+  Query select(transaction, "SELECT " ADDRESS_COLUMNS
+                            ", ifnull(port, 0) FROM address"
+                            " WHERE switch = ? AND type IN (?, ?)"
+                            " ORDER BY port IS NULL, port, type, mac, vid, vni");
+  select.with(key).with(VS_MAC_ADDR_TYPE_STATIC).with(VS_MAC_ADDR_TYPE_USER);
+  return select.all([](Query const &row) {
+    return PlacedAddress{.port = port_at(row, 6), .address = address_at(row)};
+  });
 }
 
 std::optional<FoundAddress> find_address(Transaction &transaction, SwitchKey key,

@@ -46,6 +46,13 @@ struct FoundAddress {
 /// without what ages and was last seen at `gone` or before.
 std::vector<Address> addresses_at(Transaction &transaction, Place const &place, VSMACAddrType type,
                                   std::chrono::milliseconds gone);
+struct PlacedAddress {
+  std::optional<PortNumber> port;  ///< none: the team
+  Address address;
+};
+
+/// The static and user addresses of a switch, in the order of their ports, those of the team last.
+std::vector<PlacedAddress> fixed_addresses(Transaction &transaction, SwitchKey key);
 /// An address of a switch, wherever it is.
 std::optional<FoundAddress> find_address(Transaction &transaction, SwitchKey key,
                                          AddressName const &name);

@@ -156,9 +156,9 @@ class Reader {
     read_uplinks();
     read_ports();
     read_promiscuous();
-    read_fixed_addresses({.switch_key = key_, .port = std::nullopt}, std::nullopt);
+    read_fixed_addresses();
     read_mirrors(transaction_, key_, network_);
-    return network_;
+    return std::move(network_);
   }
 
  private:
@@ -212,7 +212,6 @@ class Reader {
     read_address(settings, connected, observed_, port);
     read_learning(settings.management.of(number).portMACLearning, port);
     read_filter(settings, number, port);
-    read_fixed_addresses({.switch_key = key_, .port = number}, port.number);
     network_.ports.push_back(port);
   }
 
@@ -279,14 +278,17 @@ class Reader {
     }
   }
 
-  void read_fixed_addresses(storage::Place const &place, std::optional<std::uint32_t> port) {
-    for (auto const type : {VS_MAC_ADDR_TYPE_STATIC, VS_MAC_ADDR_TYPE_USER}) {
-      for (auto const &address : storage::addresses_at(transaction_, place, type, {})) {
-        // Virtual networks are none of this switch's.
-        if (address.name.vni == 0) {
-          network_.fixed_addresses.push_back(
-              {.address = address_of(address.name.mac), .vlan = address.name.vid, .port = port});
-        }
+  void read_fixed_addresses() {
+    for (auto const &[at, address] : storage::fixed_addresses(transaction_, key_)) {
+      bool const is_here =
+          !at || std::ranges::binary_search(network_.ports, static_cast<std::uint32_t>(*at), {},
+                                            &Port::number);
+      // Virtual networks are none of this switch's.
+      if (is_here && address.name.vni == 0) {
+        network_.fixed_addresses.push_back(
+            {.address = address_of(address.name.mac),
+             .vlan = address.name.vid,
+             .port = at ? std::optional(static_cast<std::uint32_t>(*at)) : std::nullopt});
       }
     }
   }
