@@ -71,15 +71,15 @@ Json question_about(std::string_view what, Place const &place) {
           {"port", place.port ? static_cast<std::uint32_t>(*place.port) : 0}};
 }
 
-// Refuses what no flows can be made of.
-void check(storage::Transaction &transaction) {
+// Refuses what no flows can be made of; that they are made is the daemon's matter.
+void check_switches(storage::Transaction &transaction) {
   auto const links = [](storage::Transaction &from, std::string_view uplink) {
     return storage::find_link(from, uplink).value_or(Link{});
   };
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     if (row.associated && !storage::port_devices(transaction, key).empty()) {
       auto const team = teaming::team_of(transaction, key, links);
-      static_cast<void>(compile(read_network(transaction, key, team, {})));
+      check(read_network(transaction, key, team, {}));
     }
   }
 }
@@ -197,7 +197,7 @@ void OpenVswitchPlane::prepare(storage::ChangingTransaction &transaction) {
   if (!storage::frames_change(transaction)) {
     return;
   }
-  check(transaction);
+  check_switches(transaction);
   storage::advance_frames_change(transaction);
   prepared_ = storage::frames_change(transaction);
 }

@@ -78,11 +78,14 @@ void check_mirrors(Network const &network) {
 
 }  // namespace
 
-Compiled compile(Network const &network) {
+void check(Network const &network) {
   check_ports(network);
   check_teams(network);
   check_mirrors(network);
+}
 
+Compiled compile(Network const &network) {
+  check(network);
   Plan const plan(network);
   Program program;
   for (auto *stage :

@@ -32,6 +32,8 @@ struct Compiled {
 };
 
 /// Refuses, in words, what no flows can be made of (QEX_LIMIT_EXCEEDED, QEX_BAD_PARAM).
+void check(Network const &network);
+/// Likewise.
 Compiled compile(Network const &network);
 
 /// The flow that says which change of the configuration is in force.
