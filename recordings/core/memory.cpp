@@ -13,6 +13,13 @@ namespace {
 
 constexpr std::size_t page = 4096;
 
+#ifdef __SANITIZE_ADDRESS__
+// It watches over what lies between the variables of a frame.
+constexpr bool reads_own_stack = false;
+#else
+constexpr bool reads_own_stack = true;
+#endif
+
 /// Where the stack of a thread ends, which every frame that is in use lies below.
 std::uint64_t end_of_stack() {
   pthread_attr_t attributes;
@@ -27,19 +34,14 @@ std::uint64_t end_of_stack() {
 }
 
 /// Whether bytes lie in frames of this thread, which need no look from outside.
-bool is_on_stack([[maybe_unused]] std::uint64_t address, [[maybe_unused]] std::size_t size) {
-#ifdef __SANITIZE_ADDRESS__
-  // It watches over what lies between the variables of a frame.
-  return false;
-#else
+bool is_on_stack(std::uint64_t address, std::size_t size) {
   static thread_local std::uint64_t const end = end_of_stack();
   auto const here = reinterpret_cast<std::uint64_t>(__builtin_frame_address(0));
   return address >= here && address < end && size <= end - address;
-#endif
 }
 
 bool copy(char *into, std::uint64_t address, std::size_t size) {
-  if (is_on_stack(address, size)) {
+  if (reads_own_stack && is_on_stack(address, size)) {
     std::memcpy(into, reinterpret_cast<void const *>(address), size);
     return true;
   }
