@@ -224,7 +224,7 @@ def forwarded(call: Call, number: int) -> List[str]:
     parameters = ", ".join(map(spelled, call.arguments)) or "void"
     given = "".join(f", {one.name}" for one in call.arguments)
     return [
-        f"{call.result.c_type} {call.name}({parameters}) {{".replace("* ", "*"),
+        f"RECORDINGS_API {call.result.c_type} {call.name}({parameters}) {{".replace("* ", "*"),
         f"  return recordings::forward<{number}>(&{call.name}{given});",
         "}",
     ]

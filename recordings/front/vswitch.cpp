@@ -54,7 +54,7 @@ void panic(Reports host, char const *format, std::va_list more) {
 
 }  // namespace
 
-extern "C" void Panic(char const *format, ...) {
+extern "C" RECORDINGS_API void Panic(char const *format, ...) {
   recordings::Call const &call = recordings::calls[recordings::number_of_Panic];
   recordings::Frame frame;
   frame.words[0] = recordings::word_of(format);
