@@ -276,6 +276,9 @@ std::optional<Callback> Playing::next_callback(InProgress &call, Words words) {
   } else if (argument == "release") {
     callback.kind = Callback::Kind::release;
     callback.first = pointer(member_of(in, "memory"));
+    if (holdings_.is_of_this(callback.first)) {
+      throw Unplayed(line_of(called) + ": the tool is to release what it has not allocated");
+    }
     holdings_.release(callback.first);
   } else {
     throw Unplayed(line_of(called) + ": no function of a tool is called " + argument);

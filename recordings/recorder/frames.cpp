@@ -28,6 +28,8 @@ struct Entry {
   void *callback;    ///< that the tool gave to the call
   std::uint64_t number;
   std::uint64_t armed_before;
+  std::uint64_t released;         ///< what the call ends, for the host to release meanwhile
+  std::uint64_t released_number;  ///< which nothing else may have by then
   pid_t process;
   bool is_armed;
 };
@@ -149,10 +151,13 @@ void write_begin(Thread &thread, Frame const &frame, Entry const &entry, std::in
   finish_line(line, "call", entry.number);
 }
 
-void forget_released(Frame const &frame, Call const &call) {
+void forget_released(Entry &entry, Frame const &frame) {
+  Call const &call = *entry.call;
   for (std::size_t at = 0; at < call.arguments.size(); ++at) {
-    if (call.arguments[at].passing == Passing::released) {
-      forget(frame.words[at]);
+    if (call.arguments[at].passing == Passing::released && frame.words[at] != 0) {
+      entry.released = frame.words[at];
+      entry.released_number = identity_of(entry.released);
+      forget(entry.released);
     }
   }
 }
@@ -186,9 +191,13 @@ void end_with_trap(Frame &frame, int value) noexcept {
   std::memcpy(&exception_buffer, &frame.caller, sizeof frame.caller);
 }
 
-void write_given(Line &line, Given const &given) {
+void write_given(Line &line, Thread const &thread, Given const &given) {
+  Entry const *const around = thread.top();
   line.member(given.name);
-  if (given.is_pointer) {
+  if (given.is_pointer && given.value != 0 && around != nullptr &&
+      around->released == given.value) {
+    line.raw("{").member("at").number(around->released_number).raw("}");
+  } else if (given.is_pointer) {
     write_pointer(line, given.value);
   } else {
     line.number(static_cast<std::int64_t>(given.value));
@@ -207,10 +216,10 @@ bool begin(Frame &frame, Call const &call) noexcept {
   if (thread.depth > 0 && thread.top()->call != nullptr) {
     return false;
   }
-  Entry const entry{&frame, &call, nullptr, next_number(), 0, process_id(), false};
+  Entry entry{&frame, &call, nullptr, next_number(), 0, 0, 0, process_id(), false};
   frame.began = now();
   write_begin(thread, frame, entry, frame.began);
-  forget_released(frame, call);
+  forget_released(entry, frame);
   if (!push(thread, entry)) {
     return false;
   }
@@ -282,13 +291,13 @@ std::uint64_t begin_callback(void const *here, std::string_view argument, Given 
   line.member("argument").raw("\"").raw(argument).raw("\"");
   line.member("at").number(since_start(now()));
   line.member("in").raw("{");
-  write_given(line, first);
+  write_given(line, thread, first);
   if (second != nullptr) {
-    write_given(line, *second);
+    write_given(line, thread, *second);
   }
   line.raw("}");
   finish_line(line, "callback", number);
-  return push(thread, {here, nullptr, nullptr, number, 0, process_id(), false}) ? number : 0;
+  return push(thread, {here, nullptr, nullptr, number, 0, 0, 0, process_id(), false}) ? number : 0;
 }
 
 void end_callback(std::uint64_t number, Given const *result) noexcept {
@@ -304,7 +313,7 @@ void end_callback(std::uint64_t number, Given const *result) noexcept {
   }
   Line &line = start_line(thread, "end", number);
   if (result != nullptr) {
-    write_given(line, *result);
+    write_given(line, thread, *result);
   }
   finish_line(line, "end", number);
 }

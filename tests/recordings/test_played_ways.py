@@ -1,6 +1,7 @@
 """Whatever way a call takes, it takes again without a host."""
 
 import json
+import re
 import textwrap
 from pathlib import Path
 
@@ -31,10 +32,10 @@ WAYS = {
 taken, given = [], []
 libc.malloc.restype, libc.free.argtypes = ctypes.c_void_p, [ctypes.c_void_p]
 def alloc(size):
-    taken.append(size)
-    return libc.malloc(size)
+    taken.append((libc.malloc(size), size))
+    return taken[-1][0]
 def release(memory):
-    given.append(memory)
+    given.append([one for one, _ in taken].index(memory))
     libc.free(memory)
 functions = (ctypes.CFUNCTYPE(ctypes.c_void_p, ctypes.c_size_t)(alloc),
              ctypes.CFUNCTYPE(None, ctypes.c_void_p)(release))
@@ -44,7 +45,7 @@ image, length = ctypes.c_void_p(), ctypes.c_uint()
 print(host.DVSData_Serialize(made, ctypes.byref(image), ctypes.byref(length), 4),
       ctypes.string_at(image, length.value))
 host.DVSData_Free(made)
-print(taken, len(given))
+print([size for _, size in taken], given)
 """,
     "threads": """
         import ctypes, threading
@@ -112,6 +113,19 @@ def test_a_way(way: str, tmp_path: Path, alone: Path) -> None:
     assert sorted(done.stdout.splitlines()) == sorted(made.stdout.splitlines()), done.stderr
     assert (done.status, done.stderr) == (0, made.stderr)
     assert (done.left, done.has_failed) == ([], False)
+
+
+def test_a_tool_is_not_to_release_what_it_has_not_allocated(tmp_path: Path, alone: Path) -> None:
+    source = f"""{DATA_LISTS}
+host.DVSData_Alloc(ctypes.byref(made), libc.malloc, libc.free)
+host.DVSData_Free(made)
+"""
+    trace = record(source, tmp_path / "trace.jsonl").trace
+    text = re.sub(r'"memory":{"at":\d+}', '"memory":{"at":99}', trace.read_text())
+    trace.write_text(text)
+    done = play(program(source), trace, alone)
+    assert (done.status, done.has_failed) == (125, True)
+    assert "the tool is to release what it has not allocated" in done.stderr
 
 
 @pytest.mark.parametrize("by", BY)

@@ -96,9 +96,9 @@ host.DVSData_Free(made)
     assert made.call("DVSData_Update").callbacks
     assert {one.argument for one in released} == {"release"}
     assert len(released) == len(allocated)
-    # The list itself ended with its call.
-    given = {one.inputs["memory"]["at"] for one in released}
-    assert given & {one.result["at"] for one in allocated}
+    # The list among them, which ends with the call.
+    numbers = {one.inputs["memory"]["at"] for one in released}
+    assert numbers == {one.result["at"] for one in allocated}
 
 
 def test_threads_are_told_apart(trace: Path) -> None:
