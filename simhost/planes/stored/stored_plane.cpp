@@ -119,7 +119,8 @@ class StoredPlane : public Plane {
 }  // namespace
 
 Plane &plane() {
-  static StoredPlane plane;
+  // Never destroyed: other threads and the exit handlers of others may still call.
+  static auto &plane = *new StoredPlane;
   return plane;
 }
 
