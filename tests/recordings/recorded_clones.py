@@ -18,18 +18,22 @@ import drawn_documents  # noqa: E402  (after the path is set)
 import seeds  # noqa: E402
 import simhost  # noqa: E402
 from hypothesis import given, seed  # noqa: E402
-from recordings import record  # noqa: E402
+from hypothesis import strategies as st  # noqa: E402
+from recordings import record_made  # noqa: E402
 from saying import say  # noqa: E402
 from steering import differences, replayed  # noqa: E402
 from vswitch import Host  # noqa: E402
 
 
-def make(number: int, count: int) -> None:
+Documents = st.SearchStrategy[Dict[str, Any]]
+
+
+def make(number: int, count: int, documents: Optional[Documents] = None) -> None:
     """Has so many hosts told of, and before each says what its clone is to be."""
 
     @seed(number)
     @seeds.options(count, shrink=False)
-    @given(drawn_documents.documents())
+    @given(documents or drawn_documents.documents())
     def each(document: Dict[str, Any]) -> None:
         try:
             host = drawn_documents.host_of(document)
@@ -55,12 +59,9 @@ def begun(document: Optional[Dict[str, Any]] = None) -> simhost.Host:
 def run(number: int, count: int = 20) -> Tuple[int, List[str]]:
     """Records so many hosts and replays them on their clones; how many there were, and what
     differed."""
-    path = f"import sys; sys.path[:0] = {sys.path!r}"
     with tempfile.TemporaryDirectory() as folder:
         trace = Path(folder, "trace.jsonl")
-        made = record(f"{path}; import recorded_clones as it; it.make({number}, {count})", trace)
-        if made.status != 0:
-            raise RuntimeError(made.stderr)
+        record_made("recorded_clones.make", number, count, trace)
         reports = list(replayed(trace, begun))[2::2]
     return len(reports), [one for report in reports for one in differences(report)]
 

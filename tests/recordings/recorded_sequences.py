@@ -9,7 +9,7 @@ Prints what differs, and at the end how many sequences there were.
 import sys
 import tempfile
 from pathlib import Path
-from typing import Any, Callable, Dict, List, Tuple
+from typing import Any, Callable, Dict, List, Tuple, Type
 
 import libvswitch as vs
 
@@ -18,7 +18,7 @@ sys.path.append(str(Path(__file__).parents[1] / "sequences"))
 import host_machine  # noqa: E402  (after the path is set)
 import seeds  # noqa: E402
 import sequences  # noqa: E402
-from recordings import record  # noqa: E402
+from recordings import record_made  # noqa: E402
 from saying import say  # noqa: E402
 from simhost import Host  # noqa: E402
 from steering import SteeredHost, differences, replayed  # noqa: E402
@@ -39,19 +39,11 @@ class RecordedMachine(host_machine.HostMachine):
         return super()._described(alias)
 
 
-def make(seed: int, count: int) -> None:
+def make(seed: int, count: int, machine: Type[host_machine.HostMachine] = RecordedMachine) -> None:
     """Makes so many sequences."""
-    _, wrong = sequences.run(RecordedMachine, seed, count, shrink=False)
+    _, wrong = sequences.run(machine, seed, count, shrink=False)
     if wrong:
         raise RuntimeError(wrong[0])
-
-
-def recorded(trace: Path, seed: int, count: int) -> None:
-    """Records so many sequences, in a process of their own."""
-    path = f"import sys; sys.path[:0] = {sys.path!r}"
-    made = record(f"{path}; import recorded_sequences as it; it.make({seed}, {count})", trace)
-    if made.status != 0:
-        raise RuntimeError(made.stderr)
 
 
 def begun() -> Host:
@@ -69,7 +61,7 @@ def run(seed: int, count: int = 20) -> Tuple[int, List[str]]:
     """Records so many sequences, and replays them."""
     with tempfile.TemporaryDirectory() as folder:
         trace = Path(folder, "trace.jsonl")
-        recorded(trace, seed, count)
+        record_made("recorded_sequences.make", seed, count, trace)
         return found_in(trace)
 
 

@@ -22,6 +22,7 @@ __all__ = [
     "play",
     "program",
     "record",
+    "record_made",
     "record_tool",
 ]
 
@@ -71,6 +72,16 @@ def program(source: str) -> List[str]:
 def record(source: str, trace: Path, host: Path = SIMULATED, **variables: str) -> Recording:
     """Runs a program in Python, and records it."""
     return record_tool(program(source), trace, host, **variables)
+
+
+def record_made(maker: str, seed: int, count: int, trace: Path) -> None:
+    """Records what a function makes by chance, in a process of its own; it is one of a module that
+    can be imported here."""
+    module = maker.split(".")[0]
+    path = f"import sys; sys.path[:0] = {sys.path!r}"
+    made = record(f"{path}; import {module}; {maker}({seed}, {count})", trace)
+    if made.status != 0:
+        raise RuntimeError(made.stderr)
 
 
 def record_tool(

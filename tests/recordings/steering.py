@@ -1,16 +1,16 @@
 """Recordings of tools that steer their simulated host, and replays that steer theirs likewise."""
 
 from pathlib import Path
-from typing import Any, Callable, Dict, Iterator, List
+from typing import Any, Callable, Dict, Iterator, List, Optional
 
 from saying import said_in, say
-from simhost import Host
+from simhost import Host, SimulatedHost
 from vswitch._replayer import PresentHost
 from vswitch.likeness import Difference
-from vswitch.replay import NOT_MADE, Replay, Report
+from vswitch.replay import NOT_MADE, Allows, Replay, Report
 from vswitch.trace import Trace
 
-__all__ = ["SteeredHost", "differences", "replayed"]
+__all__ = ["SteeredHost", "differences", "replayed", "steer"]
 
 _STEERING = ("apply", "clear_faults", "fault", "learn", "reset", "restart")
 _OF_CLOCK = ("run", "set", "step", "stop")
@@ -46,7 +46,7 @@ class SteeredHost(_Saying):
         self.clock = _Saying(host.clock, _OF_CLOCK, "clock.")
 
 
-def _steer(host: Host, what: str, arguments: List[Any], more: Dict[str, Any]) -> None:
+def steer(host: SimulatedHost, what: str, arguments: List[Any], more: Dict[str, Any]) -> None:
     if what == "fault" and "panic" in more:
         name, text = more["panic"]
         more = {**more, "panic": (_ERRORS[name], text)}
@@ -57,20 +57,27 @@ def _steer(host: Host, what: str, arguments: List[Any], more: Dict[str, Any]) ->
 
 
 def replayed(
-    trace: Path, begin: Callable[..., Host], steer: Callable[..., None] = _steer
+    trace: Path,
+    begin: Callable[..., SimulatedHost],
+    steer: Callable[..., None] = steer,
+    present: Optional[PresentHost] = None,
+    allows: Allows = lambda function, difference: False,
 ) -> Iterator[Report]:
     """Replays what a tool did with each host that it said to begin with."""
-    present = PresentHost()
-    host, replay = begin(), Replay(present, _is_known, questions_only=False)
+    made = present or PresentHost()
+
+    def is_known(function: str, difference: Difference) -> bool:
+        return _is_known(function, difference) or allows(function, difference)
+
+    host, replay = begin(), Replay(made, is_known, questions_only=False)
     with Trace(trace) as read:
         for call in read:
             said = said_in(call.function, call.inputs)
             if said is not None and said.what == "begin":
                 replay.end()
                 yield replay.report
-                host, replay = begin(*said.arguments), Replay(
-                    present, _is_known, questions_only=False
-                )
+                host = begin(*said.arguments)
+                replay = Replay(made, is_known, questions_only=False)
             elif said is not None:
                 steer(host, *said)
             else:

@@ -6,66 +6,33 @@ import os
 import subprocess
 import sys
 from pathlib import Path
-from typing import Dict, List
 
 import pytest
 import recorded_clones
 import recorded_sequences
+from corpus import EXAMPLE, NO_EXAMPLE, record_example, record_tour
 from programs import EXAMPLES
-from recordings import SIMULATED, record
+from recordings import SIMULATED, record_made
 from simhost import Host
 from steering import differences, replayed
-
-DOCUMENT = EXAMPLES.parent / "tests" / "examples" / "document.json"
-PROGRAMS: Dict[str, List[str]] = {
-    "apply": [str(DOCUMENT)],
-    "compliance": ["--mtu", "9000", "--forbids", "forged_transmits", "--fix"],
-    "failover_drill": ["vswitch0"],
-    "find_mac": ["02:00:00:00:01:02"],
-    "first_steps": [],
-    "inventory": [],
-    "mirror": ["vswitch0", "web-1", "web-2", "--for", "0"],
-}
-NO_PROGRAMS = {"private_host", "records", "tour"}
-"""What asks nothing of the host, and what is recorded in a way of its own."""
 
 SEED = 16
 SEQUENCES = 20
 CLONES = 8
 
-_RUN = """
-import runpy, sys
-sys.argv = {words!r}
-sys.path.insert(0, {folder!r})
-runpy.run_path({words!r}[0], run_name="__main__")
-"""
-
-
-def program(name: str, *words: str) -> str:
-    return _RUN.format(words=[str(EXAMPLES / f"{name}.py"), *words], folder=str(EXAMPLES))
-
 
 def test_every_example_is_here() -> None:
-    assert {one.stem for one in EXAMPLES.glob("*.py")} == {*PROGRAMS, *NO_PROGRAMS}
+    assert {one.stem for one in EXAMPLES.glob("*.py")} == {*EXAMPLE, *NO_EXAMPLE}
 
 
-@pytest.mark.parametrize("name", PROGRAMS)
+@pytest.mark.parametrize("name", EXAMPLE)
 def test_an_example_goes_as_it_was_recorded(name: str, tmp_path: Path) -> None:
     trace = tmp_path / "trace.jsonl"
-    made = record(program(name, *PROGRAMS[name]), trace)
-    assert made.status == 0, made.stderr
+    record_example(name, trace)
     (report,) = replayed(trace, lambda: Host(None, tmp_path))
     assert differences(report) == []
     assert sum(of.alike for of in report.functions.values()) > 10
 
-
-# In place of simhostctl: the trace says what it does.
-_SAYING = """#!{python}
-import os, sys
-from saying import say
-say("simhostctl", *sys.argv[1:])
-os.execv({simhostctl!r}, ["simhostctl", *sys.argv[1:]])
-"""
 
 _REPLAY = """
 import json, subprocess, sys
@@ -82,15 +49,10 @@ print(json.dumps([alike, differences(report)]))
 
 
 def test_the_tour_goes_as_it_was_recorded(tmp_path: Path) -> None:
-    simhostctl, shown = str(SIMULATED / "simhostctl"), tmp_path / "bin" / "simhostctl"
-    shown.parent.mkdir()
-    shown.write_text(_SAYING.format(python=sys.executable, simhostctl=simhostctl))
-    shown.chmod(0o755)
-    here = os.pathsep.join([os.environ["PYTHONPATH"], str(Path(__file__).parent)])
-    path = os.pathsep.join([str(shown.parent), os.environ["PATH"]])
     trace = tmp_path / "trace.jsonl"
-    made = record(program("tour"), trace, PATH=path, PYTHONPATH=here)
-    assert made.status == 0, made.stderr
+    record_tour(trace)
+    simhostctl = str(SIMULATED / "simhostctl")
+    here = os.pathsep.join([os.environ["PYTHONPATH"], str(Path(__file__).parent)])
     state = str(tmp_path / "host.db")
     done = subprocess.run(
         [sys.executable, "-c", _REPLAY, str(trace), simhostctl],
@@ -114,7 +76,7 @@ def test_clones_tell_what_their_hosts_told() -> None:
 def fixture_sequences(tmp_path_factory: pytest.TempPathFactory) -> Path:
     print("seed", SEED)
     trace = tmp_path_factory.mktemp("sequences") / "trace.jsonl"
-    recorded_sequences.recorded(trace, SEED, SEQUENCES)
+    record_made("recorded_sequences.make", SEED, SEQUENCES, trace)
     return trace
 
 
