@@ -3,19 +3,21 @@
 
 #@ stress Look for crashes, hangs and leaks for as long as you have time
 #
-# Usage: ./dev stress [--minutes N] [--seed N] [--python PATH] [--debug-python] [--no-fast-paths]
+# Usage: ./dev stress [--minutes N] [--seed N] [--no-frames]
+#                     [--python PATH] [--debug-python] [--no-fast-paths]
 #
 #   --minutes N   how long; 20 by default. The sweep of wrong values runs once, with a million calls
 #                 of every kind in the same memory, or fewer if there is less time; fuzzers,
-#                 sequences of calls, replays of such, clones of random hosts, killed processes and
-#                 random pairs of values share what is left
+#                 sequences of calls, replays of such, without frames and with them, clones of random
+#                 hosts, killed processes and random pairs of values share what is left
 #   --seed N      what chance chose in an earlier run, which printed its seed
+#   --no-frames   without replays over real frames, where network namespaces cannot be made
 #
 # A line for each part says how much it did and what was wrong; the status is 1 if anything was.
 # What a fuzzer learns stays in build-fuzzers/corpus, and the next run goes on from there.
 # tests/README.md says how to run a part by itself.
 cmd_stress() {
-  options=
+  options='' frames=yes
   while [ $# -gt 0 ]; do
     case $1 in
     --minutes | --seed)
@@ -27,6 +29,10 @@ cmd_stress() {
       options="$options $1 $2"
       shift 2
       ;;
+    --no-frames)
+      options="$options $1" frames=
+      shift
+      ;;
     *)
       build_option "$@" || die "stress: unknown option '$1'; see ./dev stress --help"
       shift "$taken"
@@ -34,6 +40,8 @@ cmd_stress() {
     esac
   done
   [ -z "$sanitizers" ] || die "stress: --sanitize is for build and test"
+  [ -z "$frames" ] || may_make_namespaces ||
+    die "stress: neither root nor user namespaces make a network namespace here; see --no-frames"
   testing=yes
   # shellcheck disable=SC2086 # lists of words
   need $build_packages $test_packages

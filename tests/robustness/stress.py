@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Runs everything that looks for crashes, hangs and leaks for as long as it is told, and reports.
 
-    stress.py [--minutes N] [--seed N]
+    stress.py [--minutes N] [--seed N] [--no-frames]
 
 First what has an end: every batch of the sweep, then a million calls of every kind and a million
 traps of each call, fewer in less than twenty minutes. What has none shares the time that is left:
@@ -33,9 +33,9 @@ ROUNDS = 20
 """Of killed processes, before one looks at the time."""
 
 SHARES = {
-    "fuzzing": 0.4,
+    "fuzzing": 0.35,
     "sequences": 0.15,
-    "replays": 0.05,
+    "replays": 0.1,
     "clones": 0.05,
     "kills": 0.1,
     "pairs": 0.25,
@@ -111,7 +111,7 @@ def whole(run: Callable[..., Outcome], *arguments: object) -> Callable[[float], 
     return lambda _: run(*arguments)
 
 
-def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
+def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Iterator[Part]:
     """All of them, what has an end first."""
     for batch in test_sweep.BATCHES:
         if batch != "pairs":
@@ -129,9 +129,11 @@ def parts(seed: int, minutes: float, folder: Path) -> Iterator[Part]:
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
     sequences = partial(by_chance, "sequences/sequences.py", seed)
     yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
-    for what, unit in (("sequences", "sequences"), ("clones", "hosts")):
-        replays = partial(by_chance, f"recordings/recorded_{what}.py", seed)
-        yield Part(f"replays, {what}", unit, replays, SHARES["replays"] / 2)
+    replays = [("sequences", "recorded_sequences"), ("clones", "recorded_clones")]
+    replays += [("on frames", "replayed_on_frames")] * frames
+    for what, name in replays:
+        replay = partial(by_chance, f"recordings/{name}.py", seed)
+        yield Part(f"replays, {what}", "hosts", replay, SHARES["replays"] / len(replays))
     clones = partial(by_chance, "vswitch/drawn_documents.py", seed)
     yield Part("clones of hosts", "documents", clones, SHARES["clones"])
     yield Part("killed processes", "rounds", killed, SHARES["kills"])
@@ -188,12 +190,12 @@ class Progress:
             print(f"\r\033[K{self._line()}", end="", flush=True)
 
 
-def run_all(seed: int, minutes: float, progress: Progress) -> List[Result]:
+def run_all(seed: int, minutes: float, frames: bool, progress: Progress) -> List[Result]:
     results: List[Result] = []
     end = time.monotonic() + minutes * 60
     with tempfile.TemporaryDirectory() as folder:
         shares = 0.0
-        for part in parts(seed, minutes, Path(folder)):
+        for part in parts(seed, minutes, Path(folder), frames):
             wrong = sum(len(result.wrong) for result in results)
             progress.show(part.name + (f" ({wrong} wrong so far)" if wrong else ""))
             if part.share:
@@ -224,10 +226,11 @@ def main() -> int:
     parser = argparse.ArgumentParser()
     parser.add_argument("--minutes", type=float, default=float(WHOLE))
     parser.add_argument("--seed", type=int, default=int(time.time()))
+    parser.add_argument("--no-frames", action="store_false", dest="frames")
     options = parser.parse_args()
     print(f"seed {options.seed}, {options.minutes:g} minutes", flush=True)
     with Progress(options.minutes) as progress:
-        results = run_all(options.seed, options.minutes, progress)
+        results = run_all(options.seed, options.minutes, options.frames, progress)
     print(report(results))
     problems = sum(len(result.wrong) for result in results)
     print(f"\n{problems} wrong, seed {options.seed}")

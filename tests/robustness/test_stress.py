@@ -17,7 +17,7 @@ def _found(*wrong: str) -> "stress.Part":
 
 
 def _ended(monkeypatch: pytest.MonkeyPatch, *parts: "stress.Part") -> int:
-    def planted(seed: int, minutes: float, folder: Path) -> Iterator["stress.Part"]:
+    def planted(seed: int, minutes: float, folder: Path, frames: bool) -> Iterator["stress.Part"]:
         return iter(parts)
 
     monkeypatch.setattr(stress, "parts", planted)
@@ -57,7 +57,8 @@ def test_a_program_that_ends_early_is_found() -> None:
     assert len(wrong) == 1 and "ValueError" in wrong[0]
 
 
-def test_all_parts_share_the_time() -> None:
-    parts = list(stress.parts(1, 20.0, Path()))
+@pytest.mark.parametrize("frames", [True, False])
+def test_all_parts_share_the_time(frames: bool) -> None:
+    parts = list(stress.parts(1, 20.0, Path(), frames))
     assert sum(part.share for part in parts) == pytest.approx(1.0)
     assert len({part.name for part in parts}) == len(parts) > 25
