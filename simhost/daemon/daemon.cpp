@@ -47,7 +47,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       store_(opened(options_.state)),
       host_(options_.state.string()),
       state_watch_(loop, store_, options_.state, [this] { sync_soon(); }),
-      device_watch_(loop, [this] { sync_soon(); }),
+      devices_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state),
               [this](Json const &question, Reply const &reply) { handle(question, reply); }) {
   storage::ChangingTransaction transaction(store_);
@@ -105,43 +105,52 @@ void Daemon::sync_after(std::optional<ClockTime> const &wait) {
 
 void Daemon::follow_devices() {
   bool differ = false;
+  devices_.refresh();
   {
     storage::ReadingTransaction transaction(store_);
-    switch_devices(transaction, [this](std::string const &why) { troubles_.add(why); });
-    differ = links_differ(transaction);
+    switch_devices(transaction, devices_, [this](std::string const &why) { troubles_.add(why); });
+    devices_.refresh();
+    differ = links_differ(transaction, devices_);
   }
   if (differ) {
     storage::ChangingTransaction transaction(store_);
-    put_links(transaction);
+    put_links(transaction, devices_);
     storage::advance_frames_change(transaction);
     transaction.commit();
   }
 }
 
 // A device that was made anew under its name has to be put at its bridge anew.
-bool Daemon::is_new_device(std::string const &device) {
-  auto const found = find_network_device(device);
-  auto const known = devices_.find(device);
-  return found && known != devices_.end() && known->second != found->index;
+bool Daemon::is_new_device(std::string const &name) const {
+  auto const device = devices_.find(name);
+  auto const known = at_bridges_.find(name);
+  return device && known != at_bridges_.end() && known->second != device->index;
+}
+
+void Daemon::take_out_new_devices(Wanted const &wanted) {
+  bool const has_new = std::ranges::any_of(wanted.bridges, [&](auto const &bridge) {
+    return std::ranges::any_of(bridge.row.devices,
+                               [&](auto const &device) { return is_new_device(device.first); });
+  });
+  if (has_new) {
+    auto others = wanted;
+    for (auto &bridge : others.bridges) {
+      std::erase_if(bridge.row.devices,
+                    [&](auto const &device) { return is_new_device(device.first); });
+    }
+    bridges_->apply(others);
+  }
 }
 
 void Daemon::sync() {
   follow_devices();
   storage::ReadingTransaction transaction(store_);
-  auto const is_there = [](std::string const &device) {
-    return find_network_device(device).has_value();
+  auto const is_there = [this](std::string const &device) {
+    return devices_.find(device).has_value();
   };
   auto const all = wanted_of(transaction, host_, options_.datapath, is_there);
   transaction.commit();
-  auto without_new = all;
-  bool has_new = false;
-  for (auto &bridge : without_new.bridges) {
-    has_new |= std::erase_if(bridge.row.devices,
-                             [&](auto const &device) { return is_new_device(device.first); }) > 0;
-  }
-  if (has_new) {
-    bridges_->apply(without_new);
-  }
+  take_out_new_devices(all);
   auto const changed = bridges_->apply(all);
   if (changed > 0) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
@@ -150,11 +159,11 @@ void Daemon::sync() {
 }
 
 void Daemon::settle(Wanted const &wanted) {
-  devices_.clear();
+  at_bridges_.clear();
   for (auto const &bridge : wanted.bridges) {
-    for (auto const &[device, number] : bridge.row.devices) {
-      if (auto const found = find_network_device(device)) {
-        devices_[device] = found->index;
+    for (auto const &[name, number] : bridge.row.devices) {
+      if (auto const device = devices_.find(name)) {
+        at_bridges_[name] = device->index;
       }
     }
   }
@@ -200,13 +209,20 @@ Json Daemon::addresses(Json const &question) {
   return {{"addresses", entries}};
 }
 
+Json Daemon::is_there(std::string const &device) {
+  if (devices_.refresh()) {
+    sync_soon();
+  }
+  return {{"there", devices_.find(device).has_value()}};
+}
+
 void Daemon::handle(Json const &question, Reply const &reply) {
   try {
     auto const what = question.at("ask").get<std::string>();
     if (what == "in force") {
       handle_in_force(question.at("change").get<std::uint64_t>(), reply);
     } else if (what == "device") {
-      reply({{"there", find_network_device(question.at("name").get<std::string>()).has_value()}});
+      reply(is_there(question.at("name").get<std::string>()));
     } else if (what == "addresses") {
       reply(addresses(question));
     } else if (what == "status") {

@@ -43,13 +43,15 @@ class Daemon {
   void sync_after(std::optional<ClockTime> const &wait);
   void sync();
   void follow_devices();
+  void take_out_new_devices(Wanted const &wanted);
   void settle(Wanted const &wanted);
   void reply_to_waiting();
 
   void handle(Json const &question, Reply const &reply);
   void handle_in_force(std::uint64_t change, Reply const &reply);
+  [[nodiscard]] Json is_there(std::string const &device);
   [[nodiscard]] Json addresses(Json const &question);
-  [[nodiscard]] bool is_new_device(std::string const &device);
+  [[nodiscard]] bool is_new_device(std::string const &name) const;
 
   events::Loop &loop_;
   Options options_;
@@ -59,11 +61,11 @@ class Daemon {
   storage::Store store_;
   std::string host_;
   StateWatch state_watch_;
-  NetworkDeviceWatch device_watch_;
+  NetworkDevices devices_;
   Server server_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
-  std::map<std::string, unsigned> devices_;      // the index of each that is at a bridge
+  std::map<std::string, unsigned> at_bridges_;   // the index of each device
   std::multimap<std::uint64_t, Reply> waiting_;  // for a change to be in force
   std::function<void()> ready_;
   events::Loop::Timer next_sync_;

@@ -6,7 +6,6 @@
 #include <system_error>
 #include <vector>
 
-#include "daemon/network_devices.h"
 #include "planes/stored/stored_plane.h"
 #include "storage/running/devices.h"
 #include "storage/running/links.h"
@@ -17,13 +16,14 @@ namespace {
 using storage::Link;
 
 // The link as it is in the state, with what the device says in place of it.
-Link link_by_device(Link link, std::string const &device) {
-  auto const found = find_network_device(device);
+Link link_by_device(Link link, std::string const &device, NetworkDevices const &devices) {
+  auto const found = devices.find(device);
   link.driver = found.has_value();
   link.carrier = found && found->has_link;
   if (found) {
-    link.full_duplex = found->full_duplex;
-    link.speed = found->speed.value_or(link.speed);
+    auto const speed = wire_speed(device);
+    link.full_duplex = speed.full_duplex;
+    link.speed = speed.mbits.value_or(link.speed);
   }
   return link;
 }
@@ -38,12 +38,13 @@ struct Changed {
   Link link;
 };
 
-std::vector<Changed> changed_links(storage::Transaction &transaction) {
+std::vector<Changed> changed_links(storage::Transaction &transaction,
+                                   NetworkDevices const &devices) {
   std::vector<Changed> changed;
   for (auto const &uplink : storage::all_uplinks(transaction)) {
     if (auto const device = storage::device_of(transaction, uplink.name)) {
       auto const known = storage::find_link(transaction, uplink.name).value_or(Link{});
-      auto const link = link_by_device(known, device->name);
+      auto const link = link_by_device(known, device->name, devices);
       if (!is_same(link, known)) {
         changed.push_back({.uplink = uplink.name, .link = link});
       }
@@ -52,9 +53,9 @@ std::vector<Changed> changed_links(storage::Transaction &transaction) {
   return changed;
 }
 
-void switch_to(std::string const &device, bool up,
+void switch_to(std::string const &device, bool up, NetworkDevices const &devices,
                std::function<void(std::string const &)> const &say) {
-  auto const found = find_network_device(device);
+  auto const found = devices.find(device);
   if (!found || found->is_up == up) {
     return;
   }
@@ -68,27 +69,27 @@ void switch_to(std::string const &device, bool up,
 
 }  // namespace
 
-void switch_devices(storage::Transaction &transaction,
+void switch_devices(storage::Transaction &transaction, NetworkDevices const &devices,
                     std::function<void(std::string const &)> const &say) {
   for (auto const &uplink : storage::all_uplinks(transaction)) {
     if (auto const device = storage::device_of(transaction, uplink.name)) {
       auto const link = storage::find_link(transaction, uplink.name).value_or(Link{});
-      switch_to(device->name, link.admin, say);
+      switch_to(device->name, link.admin, devices, say);
     }
   }
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     for (auto const &[port, device] : storage::port_devices(transaction, key)) {
-      switch_to(device.name, true, say);
+      switch_to(device.name, true, devices, say);
     }
   }
 }
 
-bool links_differ(storage::Transaction &transaction) {
-  return !changed_links(transaction).empty();
+bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices) {
+  return !changed_links(transaction, devices).empty();
 }
 
-void put_links(storage::ChangingTransaction &transaction) {
-  for (auto const &[uplink, link] : changed_links(transaction)) {
+void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices) {
+  for (auto const &[uplink, link] : changed_links(transaction, devices)) {
     stored::plane().find_wires()->change_link(transaction, uplink, link);
   }
 }

@@ -5,17 +5,18 @@
 #include <functional>
 #include <string>
 
+#include "daemon/network_devices.h"
 #include "storage/store.h"
 
 namespace simhost::daemon {
 
 /// Switches devices of uplinks on or off as the state says, and devices of ports on. What cannot be
 /// switched is told.
-void switch_devices(storage::Transaction &transaction,
+void switch_devices(storage::Transaction &transaction, NetworkDevices const &devices,
                     std::function<void(std::string const &)> const &say);
 /// Whether a link in the state is not as its device is.
-bool links_differ(storage::Transaction &transaction);
+bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices);
 /// Puts them right, and lets the teams follow.
-void put_links(storage::ChangingTransaction &transaction);
+void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices);
 
 }  // namespace simhost::daemon

@@ -1,5 +1,5 @@
-// Devices by ioctl, and their changes by netlink: both are of the namespace, as files in /sys need
-// not be.
+// What the kernel tells by netlink, and what can only be asked by ioctl: both are of the namespace,
+// as files in /sys need not be.
 #include "daemon/network_devices.h"
 
 #include <linux/ethtool.h>
@@ -7,10 +7,14 @@
 #include <linux/rtnetlink.h>
 #include <linux/sockios.h>
 #include <net/if.h>
+#include <poll.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
 
 #include <array>
+#include <cerrno>
+#include <cstring>
+#include <stdexcept>
 #include <utility>
 
 namespace simhost::daemon {
@@ -28,22 +32,7 @@ ifreq request_for(std::string_view name) {
   return request;
 }
 
-void add_speed(Descriptor const &socket, std::string_view name, NetworkDevice &device) {
-  ethtool_cmd settings{};
-  settings.cmd = ETHTOOL_GSET;
-  auto request = request_for(name);
-  request.ifr_data = reinterpret_cast<char *>(&settings);
-  if (ioctl(socket.number(), SIOCETHTOOL, &request) != 0) {
-    return;
-  }
-  auto const speed = ethtool_cmd_speed(&settings);
-  if (speed != 0 && speed != static_cast<std::uint32_t>(SPEED_UNKNOWN)) {
-    device.speed = speed;
-  }
-  device.full_duplex = settings.duplex != DUPLEX_HALF;
-}
-
-Descriptor link_events() {
+Descriptor told_of_links() {
   auto socket_ = events::owned(
       socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_ROUTE), "socket");
   sockaddr_nl address{};
@@ -55,32 +44,169 @@ Descriptor link_events() {
   return socket_;
 }
 
+// The counters of each are not asked for.
+struct QuestionForAll {
+  nlmsghdr header{.nlmsg_len = sizeof(QuestionForAll),
+                  .nlmsg_type = RTM_GETLINK,
+                  .nlmsg_flags = NLM_F_REQUEST | NLM_F_DUMP,
+                  .nlmsg_seq = 0,
+                  .nlmsg_pid = 0};
+  ifinfomsg info{};
+  rtattr mask{.rta_len = RTA_LENGTH(sizeof(std::uint32_t)), .rta_type = IFLA_EXT_MASK};
+  std::uint32_t filter = RTEXT_FILTER_SKIP_STATS;
+};
+
+void wait_to_receive(Descriptor const &socket) {
+  pollfd polled{.fd = socket.number(), .events = POLLIN, .revents = 0};
+  poll(&polled, 1, -1);
+}
+
 }  // namespace
 
-std::optional<NetworkDevice> find_network_device(std::string_view name) {
-  auto const socket = any_socket();
-  auto request = request_for(name);
-  if (name.size() >= sizeof request.ifr_name ||
-      ioctl(socket.number(), SIOCGIFINDEX, &request) != 0) {
-    return std::nullopt;
+NetworkDevices::NetworkDevices(events::Loop &loop, std::function<void()> changed)
+    : socket_(told_of_links()),
+      changed_(std::move(changed)),
+      watch_(loop.watch(socket_.number(), [this] {
+        if (refresh()) {
+          changed_();
+        }
+      })) {
+  ask_for_all();
+  refresh();
+}
+
+void NetworkDevices::ask_for_all() {
+  devices_.clear();
+  names_.clear();
+  QuestionForAll const question;
+  if (send(socket_.number(), &question, sizeof question, 0) < 0) {
+    events::fail_with_errno("netlink");
   }
-  NetworkDevice device{.index = static_cast<unsigned>(request.ifr_ifindex),
-                       .is_up = false,
-                       .has_link = false,
-                       .mtu = 0,
-                       .speed = std::nullopt,
-                       .full_duplex = true};
-  if (ioctl(socket.number(), SIOCGIFFLAGS, &request) != 0) {
-    return std::nullopt;
+  is_asked_ = true;
+}
+
+bool NetworkDevices::refresh() {
+  bool has_changed = false;
+  alignas(nlmsghdr) std::array<char, 65536> part;
+  while (true) {
+    auto const size = recv(socket_.number(), part.data(), part.size(), 0);
+    if (size >= 0) {
+      has_changed |= take({part.data(), static_cast<std::size_t>(size)});
+    } else if (errno == ENOBUFS) {
+      // Some were lost.
+      has_changed = true;
+      ask_for_all_again();
+    } else if (errno == EAGAIN && is_asked_) {
+      wait_to_receive(socket_);
+    } else if (errno == EAGAIN) {
+      return has_changed;
+    } else if (errno != EINTR) {
+      events::fail_with_errno("netlink");
+    }
   }
-  auto const flags = static_cast<unsigned short>(request.ifr_flags);
-  device.is_up = (flags & IFF_UP) != 0;
-  device.has_link = (flags & IFF_RUNNING) != 0;
-  if (ioctl(socket.number(), SIOCGIFMTU, &request) == 0) {
-    device.mtu = static_cast<std::uint32_t>(request.ifr_mtu);
+}
+
+// The kernel replies to one question after the other.
+void NetworkDevices::ask_for_all_again() {
+  if (is_asked_) {
+    is_to_be_asked_again_ = true;
+  } else {
+    ask_for_all();
   }
-  add_speed(socket, name, device);
-  return device;
+}
+
+bool NetworkDevices::take(std::span<char const> messages) {
+  bool has_changed = false;
+  auto size = messages.size();
+  for (auto const *header = reinterpret_cast<nlmsghdr const *>(messages.data());
+       NLMSG_OK(header, size); header = NLMSG_NEXT(header, size)) {
+    if ((header->nlmsg_flags & NLM_F_DUMP_INTR) != 0) {
+      is_to_be_asked_again_ = true;
+    }
+    if (header->nlmsg_type == NLMSG_DONE) {
+      is_asked_ = false;
+      if (std::exchange(is_to_be_asked_again_, false)) {
+        ask_for_all();
+      }
+    } else if (header->nlmsg_type == NLMSG_ERROR) {
+      throw std::runtime_error("the kernel does not tell its network devices");
+    } else {
+      has_changed |= take_device(*header);
+    }
+  }
+  return has_changed;
+}
+
+bool NetworkDevices::take_device(nlmsghdr const &header) {
+  auto const &info = *static_cast<ifinfomsg const *>(NLMSG_DATA(&header));
+  // Others are of a bridge, about one of its ports.
+  if (info.ifi_family != AF_UNSPEC) {
+    return false;
+  }
+  auto const index = static_cast<unsigned>(info.ifi_index);
+  if (header.nlmsg_type == RTM_DELLINK) {
+    return remove(index);
+  }
+  NetworkDevice device{.index = index,
+                       .is_up = (info.ifi_flags & IFF_UP) != 0,
+                       .has_link = (info.ifi_flags & IFF_RUNNING) != 0,
+                       .mtu = 0};
+  std::string name;
+  auto size = IFLA_PAYLOAD(&header);
+  for (auto const *attribute = IFLA_RTA(&info); RTA_OK(attribute, size);
+       attribute = RTA_NEXT(attribute, size)) {
+    if (attribute->rta_type == IFLA_IFNAME) {
+      name = static_cast<char const *>(RTA_DATA(attribute));
+    } else if (attribute->rta_type == IFLA_MTU) {
+      std::memcpy(&device.mtu, RTA_DATA(attribute), sizeof device.mtu);
+    }
+  }
+  return put(name, device);
+}
+
+bool NetworkDevices::put(std::string const &name, NetworkDevice const &device) {
+  auto const known = names_.find(device.index);
+  bool const is_new = known == names_.end() || known->second != name;
+  if (is_new) {
+    remove(device.index);
+    names_[device.index] = name;
+  }
+  auto &present = devices_[name];
+  return std::exchange(present, device) != device || is_new;
+}
+
+bool NetworkDevices::remove(unsigned index) {
+  auto const name = names_.find(index);
+  if (name == names_.end()) {
+    return false;
+  }
+  auto const device = devices_.find(name->second);
+  if (device != devices_.end() && device->second.index == index) {
+    devices_.erase(device);
+  }
+  names_.erase(name);
+  return true;
+}
+
+std::optional<NetworkDevice> NetworkDevices::find(std::string_view name) const {
+  auto const found = devices_.find(name);
+  return found == devices_.end() ? std::nullopt : std::optional(found->second);
+}
+
+WireSpeed wire_speed(std::string_view device) {
+  WireSpeed speed{.mbits = std::nullopt, .full_duplex = true};
+  ethtool_cmd settings{};
+  settings.cmd = ETHTOOL_GSET;
+  auto request = request_for(device);
+  request.ifr_data = reinterpret_cast<char *>(&settings);
+  if (ioctl(any_socket().number(), SIOCETHTOOL, &request) == 0) {
+    auto const mbits = ethtool_cmd_speed(&settings);
+    if (mbits != 0 && mbits != static_cast<std::uint32_t>(SPEED_UNKNOWN)) {
+      speed.mbits = mbits;
+    }
+    speed.full_duplex = settings.duplex != DUPLEX_HALF;
+  }
+  return speed;
 }
 
 void switch_network_device(std::string_view name, bool up) {
@@ -96,16 +222,5 @@ void switch_network_device(std::string_view name, bool up) {
     events::fail_with_errno(std::string(name));
   }
 }
-
-NetworkDeviceWatch::NetworkDeviceWatch(events::Loop &loop, std::function<void()> changed)
-    : socket_(link_events()),
-      changed_(std::move(changed)),
-      watch_(loop.watch(socket_.number(), [this] {
-        // What they say is looked up when it is needed, so that none can be missed.
-        std::array<char, 16384> part{};
-        while (recv(socket_.number(), part.data(), part.size(), 0) > 0) {
-        }
-        changed_();
-      })) {}
 
 }  // namespace simhost::daemon

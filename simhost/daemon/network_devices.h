@@ -3,11 +3,15 @@
 
 #include <cstdint>
 #include <functional>
+#include <map>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 
 #include "events/loop.h"
+
+struct nlmsghdr;
 
 namespace simhost::daemon {
 
@@ -16,24 +20,48 @@ struct NetworkDevice {
   bool is_up;      ///< switched on
   bool has_link;
   std::uint32_t mtu;
-  /// Mbit/s and both directions at once; nothing for a device that has no such thing.
-  std::optional<std::uint32_t> speed;
+
+  bool operator==(NetworkDevice const &) const = default;
+};
+
+/// What a device says of its wire.
+struct WireSpeed {
+  std::optional<std::uint32_t> mbits;  ///< per second; nothing for a device that has no such thing
   bool full_duplex;
 };
 
-std::optional<NetworkDevice> find_network_device(std::string_view name);
-/// Switches it on or off. Throws std::system_error.
-void switch_network_device(std::string_view name, bool up);
-
-/// Tells when a device came, went or changed.
-class NetworkDeviceWatch {
+/// All of them, as the kernel tells of them: asking for each of a thousand takes longer than all
+/// else that a change takes.
+class NetworkDevices {
  public:
-  NetworkDeviceWatch(events::Loop &loop, std::function<void()> changed);
+  /// `changed` is told when one came, went or changed.
+  NetworkDevices(events::Loop &loop, std::function<void()> changed);
+
+  /// Takes over what the kernel told: what was done to a device before is known after it. Returns
+  /// whether that was anything.
+  bool refresh();
+  [[nodiscard]] std::optional<NetworkDevice> find(std::string_view name) const;
 
  private:
+  void ask_for_all();
+  void ask_for_all_again();
+  // These return whether something is another now.
+  bool take(std::span<char const> messages);
+  bool take_device(nlmsghdr const &header);
+  bool put(std::string const &name, NetworkDevice const &device);
+  bool remove(unsigned index);
+
   events::Descriptor socket_;
   std::function<void()> changed_;
+  std::map<std::string, NetworkDevice, std::less<>> devices_;
+  std::map<unsigned, std::string> names_;
+  bool is_asked_ = false;  // for all, of which some are still to be told
+  bool is_to_be_asked_again_ = false;
   events::Loop::Watch watch_;
 };
+
+WireSpeed wire_speed(std::string_view device);
+/// Switches it on or off. Throws std::system_error.
+void switch_network_device(std::string_view name, bool up);
 
 }  // namespace simhost::daemon

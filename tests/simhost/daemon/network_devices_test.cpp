@@ -1,0 +1,121 @@
+// What is known of network devices, in a namespace of the test's own.
+#include "daemon/network_devices.h"
+
+#include <gtest/gtest.h>
+#include <sched.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <string>
+
+namespace {
+
+using simhost::daemon::NetworkDevices;
+using namespace std::chrono_literals;
+
+// Of users as well, unless the test may make one of networks without.
+void enter_namespace() {
+  int const kinds = geteuid() == 0 ? CLONE_NEWNET : CLONE_NEWNET | CLONE_NEWUSER;
+  auto const user = geteuid();
+  ASSERT_EQ(unshare(kinds), 0) << "namespaces are not allowed here";
+  if (user != 0) {
+    std::ofstream("/proc/self/uid_map") << "0 " << user << " 1";
+  }
+}
+
+void ip(std::string const &words) {
+  ASSERT_EQ(std::system(("ip " + words).c_str()), 0) << words;
+}
+
+class TheNetworkDevices : public testing::Test {
+ protected:
+  void SetUp() override { enter_namespace(); }
+
+  simhost::events::Loop loop;
+  int changes = 0;
+};
+
+TEST_F(TheNetworkDevices, AreKnownAsSoonAsTheyAreMade) {
+  ip("link add before type veth peer name other");
+  NetworkDevices devices(loop, [] {});
+  ASSERT_TRUE(devices.find("before"));
+  EXPECT_EQ(devices.find("before")->mtu, 1500U);
+  EXPECT_FALSE(devices.find("before")->is_up);
+  EXPECT_FALSE(devices.find("after"));
+  EXPECT_FALSE(devices.refresh());
+
+  ip("link add after type veth peer name another");
+  EXPECT_TRUE(devices.refresh());
+  EXPECT_TRUE(devices.find("after"));
+}
+
+TEST_F(TheNetworkDevices, AreFollowed) {
+  ip("link add one type veth peer name other");
+  NetworkDevices devices(loop, [] {});
+  auto const index = devices.find("one")->index;
+  ip("link set one up mtu 9000");
+  ip("link set other up");
+  devices.refresh();
+  EXPECT_TRUE(devices.find("one")->is_up);
+  EXPECT_TRUE(devices.find("one")->has_link);
+  EXPECT_EQ(devices.find("one")->mtu, 9000U);
+
+  ip("link set other down");
+  devices.refresh();
+  EXPECT_FALSE(devices.find("one")->has_link);
+
+  ip("link set one down");
+  ip("link set one name two");
+  devices.refresh();
+  EXPECT_FALSE(devices.find("one"));
+  EXPECT_EQ(devices.find("two")->index, index);
+
+  ip("link delete two");
+  ip("link add two type veth peer name other");
+  devices.refresh();
+  EXPECT_NE(devices.find("two")->index, index);
+}
+
+TEST_F(TheNetworkDevices, OfBridgesGoOnBeingThereAsPorts) {
+  ip("link add one type veth peer name other");
+  ip("link add bridge type bridge");
+  NetworkDevices devices(loop, [] {});
+  ip("link set one master bridge");
+  ip("link set one nomaster");
+  devices.refresh();
+  EXPECT_TRUE(devices.find("one"));
+}
+
+TEST_F(TheNetworkDevices, AreTold) {
+  NetworkDevices devices(loop, [this] { ++changes; });
+  ip("link add one type veth peer name other");
+  loop.turn(1s);
+  EXPECT_EQ(changes, 1);
+  ip("link set one promisc on");
+  loop.turn(1s);
+  EXPECT_EQ(changes, 1);
+  EXPECT_TRUE(devices.find("one"));
+}
+
+// More than the kernel keeps for who does not listen.
+TEST_F(TheNetworkDevices, AreKnownThoughSomeOfWhatIsToldWasLost) {
+  ip("link add gone type veth peer name other");
+  NetworkDevices devices(loop, [] {});
+  auto *const batch = popen("ip -batch -", "w");
+  ASSERT_NE(batch, nullptr);
+  std::fputs("link delete gone\nlink add one type veth peer name other\n", batch);
+  for (int time = 0; time < 3000; ++time) {
+    std::fputs(time % 2 == 0 ? "link set one mtu 1400\n" : "link set one mtu 1401\n", batch);
+  }
+  std::fputs("link set one mtu 1300\n", batch);
+  ASSERT_EQ(pclose(batch), 0);
+  EXPECT_TRUE(devices.refresh());
+  EXPECT_FALSE(devices.find("gone"));
+  ASSERT_TRUE(devices.find("one"));
+  EXPECT_EQ(devices.find("one")->mtu, 1300U);
+}
+
+}  // namespace
