@@ -62,7 +62,8 @@ std::string description();
 
 /// show, apply, link, uplink, learn, counter: the host and what comes to it from outside.
 void add_world_commands(CLI::App &app);
-/// connect, disconnect, plane: the devices through which real frames go, and what moves them.
+/// connect, disconnect, plane, trace: the devices through which real frames go, what moves them,
+/// and what becomes of one.
 void add_frame_commands(CLI::App &app);
 /// clock, restart, reset.
 void add_time_commands(CLI::App &app);

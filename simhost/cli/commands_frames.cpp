@@ -1,10 +1,12 @@
-// What moves real frames: the devices of ports.
+// What moves real frames: the devices of ports, and what becomes of a frame.
 #include <iostream>
 #include <memory>
 #include <nlohmann/json.hpp>
 #include <string>
+#include <vector>
 
 #include "cli/commands.h"
+#include "cli/frame_words.h"
 
 namespace simhost::cli {
 namespace {
@@ -87,12 +89,126 @@ void add_plane(CLI::App &app) {
   });
 }
 
+struct TraceWords {
+  std::string station;
+  std::vector<std::string> frame;
+  bool json = false;
+};
+
+nlohmann::ordered_json trace_of(std::string const &switch_name, std::string const &station,
+                                std::vector<std::uint8_t> const &frame) {
+  constexpr std::size_t kEnough = 1 << 20;
+  std::string text(kEnough, '\0');
+  auto const size = simhost_trace(switch_name.c_str(), station.c_str(), frame.data(), frame.size(),
+                                  text.data(), text.size());
+  if (size == 0 || size >= text.size()) {
+    throw Failure(simhost_error());
+  }
+  text.resize(size);
+  return nlohmann::ordered_json::parse(text);
+}
+
+// The one of a list that has this value under a key; null if none has.
+nlohmann::ordered_json find_in(nlohmann::ordered_json const &list, char const *key,
+                               nlohmann::ordered_json const &value) {
+  for (auto const &one : list) {
+    if (one.value(key, nlohmann::ordered_json()) == value) {
+      return one;
+    }
+  }
+  return nullptr;
+}
+
+// What the document of the host says of a setting that a step names; null where it is not set.
+nlohmann::ordered_json value_of(nlohmann::ordered_json const &of_switch,
+                                nlohmann::ordered_json const &setting) {
+  auto const &port = setting.at("port");
+  auto const owner = port.is_null()
+                         ? of_switch
+                         : find_in(of_switch.value("ports", nlohmann::ordered_json()), "id", port);
+  return owner.is_object()
+             ? owner.value(setting.at("name").get<std::string>(), nlohmann::ordered_json())
+             : nullptr;
+}
+
+// Gives each setting its value.
+void add_values(nlohmann::ordered_json &steps, std::string const &switch_name) {
+  auto const host = nlohmann::ordered_json::parse(description());
+  auto const of_switch =
+      find_in(host.value("switches", nlohmann::ordered_json()), "alias", switch_name);
+  for (auto &step : steps) {
+    if (auto &setting = step.at("setting"); !setting.is_null()) {
+      setting["value"] = value_of(of_switch, setting);
+    }
+  }
+}
+
+// Values that are longer tell nothing at a glance.
+std::string value_words(nlohmann::ordered_json const &value) {
+  constexpr std::size_t kLongest = 60;
+  auto const text = value.is_null() ? "not set" : value.dump();
+  return text.size() > kLongest ? std::string() : " " + text;
+}
+
+std::string step_words(nlohmann::ordered_json const &step, std::string const &switch_name) {
+  auto text = step.at("text").get<std::string>();
+  auto const &setting = step.at("setting");
+  if (setting.is_null()) {
+    return text;
+  }
+  auto const &port = setting.at("port");
+  auto const owner = port.is_null() ? switch_name : switch_name + "/" + port.get<std::string>();
+  return text + " (" + owner + "/" + setting.at("name").get<std::string>() +
+         value_words(setting.at("value")) + ")";
+}
+
+void trace(TraceWords const &given) {
+  auto const slash = given.station.find('/');
+  if (slash == std::string::npos) {
+    throw Failure("'" + given.station + "' is no port such as vswitch0/web-1");
+  }
+  auto const switch_name = given.station.substr(0, slash);
+  auto const frame = frame_from(given.frame);
+  auto steps = trace_of(switch_name, given.station.substr(slash + 1), frame);
+  add_values(steps, switch_name);
+  if (given.json) {
+    std::cout << steps.dump(2) << "\n";
+    return;
+  }
+  for (auto const &step : steps) {
+    std::cout << printable(step_words(step, switch_name)) << "\n";
+  }
+}
+
+void add_trace(CLI::App &app) {
+  auto *const command =
+      app.add_subcommand("trace", "Tell what becomes of a frame, and which settings decide it");
+  auto const given = words_of_command<TraceWords>();
+  command
+      ->add_option(
+          "place", given->station,
+          "where it comes in: a switch and a port or an uplink of it, as in vswitch0/web-1")
+      ->required();
+  command
+      ->add_option(
+          "frame", given->frame,
+          "in hexadecimal, or in words: dst= and src=, vlan= and priority= for a tag, type=,"
+          " size=")
+      ->required();
+  command->add_flag("--json", given->json, "as JSON");
+  command->footer(
+      "Open vSwitch is asked, and sends nothing. Settings are told with their values.\n"
+      "  dst=ff:ff:ff:ff:ff:ff src=02:00:00:00:01:02 vlan=7  a frame in words");
+  command->callback([given] { trace(*given); });
+}
+
 }  // namespace
 
 void add_frame_commands(CLI::App &app) {
   add_connect(app);
   add_disconnect(app);
   add_plane(app);
+  add_trace(app);
 }
 
 }  // namespace simhost::cli

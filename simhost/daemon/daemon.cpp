@@ -225,6 +225,9 @@ void Daemon::handle(Json const &question, Reply const &reply) {
       reply(is_there(question.at("name").get<std::string>()));
     } else if (what == "addresses") {
       reply(addresses(question));
+    } else if (what == "bridge") {
+      reply({{"name", bridge_name(host_, question.at("switch").get<std::string>())},
+             {"folder", options_.database.parent_path().string()}});
     } else if (what == "status") {
       reply({{"change", in_force_}, {"said", troubles_.text()}, {"process", getpid()}});
     } else {

@@ -29,12 +29,6 @@ void add_devices(storage::Transaction &transaction, WantedBridge &bridge) {
   }
 }
 
-// Linux has room for fifteen bytes, and an alias may change.
-std::string bridge_name(std::string_view host, std::string const &identifier) {
-  auto const whole = fingerprint(fmt::format("{}/{}", host, identifier));
-  return fmt::format("vs{:012x}", whole >> 16U);
-}
-
 teaming::Team team_with_devices(storage::Transaction &transaction, storage::SwitchKey key) {
   return teaming::team_of(
       transaction, key, [](storage::Transaction &from, std::string_view uplink) {
@@ -52,6 +46,12 @@ void shorten(std::optional<ClockTime> &lasts, std::optional<ClockTime> const &ot
 }
 
 }  // namespace
+
+// Linux has room for fifteen bytes, and an alias may change.
+std::string bridge_name(std::string_view host, std::string const &identifier) {
+  auto const whole = fingerprint(fmt::format("{}/{}", host, identifier));
+  return fmt::format("vs{:012x}", whole >> 16U);
+}
 
 std::uint64_t fingerprint(std::string_view text) {
   // FNV-1a.

@@ -48,6 +48,9 @@ using IsThere = std::function<bool(std::string const &device)>;
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                  std::string const &datapath, IsThere const &is_there);
 
+/// The bridge of a switch.
+std::string bridge_name(std::string_view host, std::string const &identifier);
+
 /// A number that is another one for another text, as good as always.
 std::uint64_t fingerprint(std::string_view text);
 

@@ -1,11 +1,15 @@
 // simhost_*: looking into the host of this process, and changing it from outside.
 #include "abi/simhost_api/simhost.h"
 
+#include <array>
+#include <cstdint>
 #include <cstring>
 #include <mutex>
 #include <optional>
 #include <span>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "abi/fresh_host.h"
 #include "abi/host.h"
@@ -149,6 +153,39 @@ int add_fault_on(char const *function, uint32_t nth, uint32_t times,
   });
 }
 
+std::vector<std::uint8_t> frame_from(unsigned char const *bytes, size_t length) {
+  constexpr size_t kHeader = 14;
+  constexpr size_t kLongest = 65535;
+  if (bytes == nullptr || length < kHeader || length > kLongest) {
+    throw Refused(QEX_BAD_PARAM, "a frame has 14 to 65535 bytes");
+  }
+  return {bytes, bytes + length};
+}
+
+scenario::Json setting_json(openvswitch::SettingOf const &setting) {
+  if (setting.name.empty()) {
+    return nullptr;
+  }
+  auto const port = setting.port.empty() ? scenario::Json() : scenario::Json(setting.port);
+  return {{"port", port}, {"name", setting.name}};
+}
+
+std::string story_text(std::vector<openvswitch::StoryStep> const &steps) {
+  constexpr std::array kDoes{"passes", "dropped", "delivered", "copied"};
+  auto all = scenario::Json::array();
+  for (auto const &step : steps) {
+    scenario::Json said{{"does", kDoes.at(static_cast<std::size_t>(step.kind))},
+                        {"text", step.text},
+                        {"setting", setting_json(step.setting)}};
+    if (!step.to.empty()) {
+      said["to"] = step.to;
+      said["vlans"] = step.vlans;
+    }
+    all.push_back(std::move(said));
+  }
+  return all.dump();
+}
+
 }  // namespace
 
 extern "C" {
@@ -263,6 +300,22 @@ SIMHOST_API size_t simhost_plane(char *text, size_t size) {
     length = copy_out(in_force_text(found), text, size);
   });
   return length;
+}
+
+SIMHOST_API size_t simhost_trace(char const *switchName, char const *station,
+                                 unsigned char const *frame, size_t length, char *text,
+                                 size_t size) {
+  size_t found = 0;
+  reading([&](storage::Transaction &transaction) {
+    auto *const plane = this_host().find_openvswitch_plane();
+    if (plane == nullptr) {
+      throw Refused(QEX_NOT_SUPPORTED, "no frames move: the host is kept in memory");
+    }
+    auto const traced = plane->trace(transaction, get_switch(transaction, given(switchName)),
+                                     given(station), frame_from(frame, length));
+    found = copy_out(story_text(traced), text, size);
+  });
+  return found;
 }
 
 SIMHOST_API int simhost_learn(char const *switchName, char const *port, char const *mac,

@@ -6,8 +6,12 @@
 #include <cstdint>
 #include <filesystem>
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "model/plane.h"
+#include "planes/openvswitch/trace/story.h"
+#include "storage/switches.h"
 
 namespace simhost::openvswitch {
 
@@ -50,6 +54,11 @@ class OpenVswitchPlane : public Plane {
   Wires *find_wires() override;
 
   InForce in_force(storage::Transaction &transaction);
+  /// What becomes of a frame that comes in at a port or an uplink of a switch. Refuses one without
+  /// a device (QEX_IS_DISCONNECTED), and what Open vSwitch refuses (QEX_IO_ERROR).
+  std::vector<StoryStep> trace(storage::Transaction &transaction,
+                               storage::FoundSwitch const &of_switch, std::string const &station,
+                               std::vector<std::uint8_t> const &frame);
 
  private:
   [[nodiscard]] bool has_frames(storage::Transaction &transaction, Place const &place) const;

@@ -140,6 +140,13 @@ class Sessions {
 
 }  // namespace
 
+SessionAt session_at(std::uint32_t id) {
+  auto const owner = id >> kSessionBits;
+  auto const number = id & ((1U << kSessionBits) - 1);
+  return {.port = owner == 0 ? std::nullopt : std::optional(storage::PortNumber{owner}),
+          .index = std::size_t{number} - 1};
+}
+
 void read_mirrors(storage::Transaction &transaction, storage::SwitchKey key, Network &network) {
   Sessions sessions(transaction, key, network);
   sessions.add_table(

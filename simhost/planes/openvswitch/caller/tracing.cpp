@@ -1,0 +1,150 @@
+// What becomes of a frame: ovs-vswitchd is asked, and the state has the names.
+#include <fmt/format.h>
+
+#include <chrono>
+#include <optional>
+#include <utility>
+
+#include "base/bytes.h"
+#include "base/outcomes.h"
+#include "model/mirror/properties.h"
+#include "model/ports/properties.h"
+#include "model/properties/properties.h"
+#include "model/teaming/properties.h"
+#include "planes/openvswitch/caller/openvswitch_plane.h"
+#include "planes/openvswitch/line/line.h"
+#include "planes/openvswitch/reading/read_mirrors.h"
+#include "planes/openvswitch/trace/control.h"
+#include "storage/running/devices.h"
+#include "storage/running/frames.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr auto kPatience = 2000ms;
+
+class Stations {
+ public:
+  Stations(storage::Transaction &transaction, storage::SwitchKey key)
+      : transaction_(transaction), key_(key) {
+    for (auto const &[number, device] : storage::port_devices(transaction, key)) {
+      auto const port = storage::get_port_row(transaction, number);
+      add(device.number, {.name = port.identifier, .is_uplink = false}, number);
+    }
+    for (auto const &uplink : storage::uplinks_of(transaction, key)) {
+      if (auto const device = storage::device_of(transaction, uplink.name)) {
+        add(device->number, {.name = uplink.name, .is_uplink = true}, uplink.port);
+      }
+    }
+  }
+
+  struct Found {
+    openflow::Port device;
+    Station station;
+    storage::PortNumber port;
+  };
+
+  [[nodiscard]] Found const *find(std::string_view name) const {
+    for (auto const &known : all_) {
+      if (known.station.name == name) {
+        return &known;
+      }
+    }
+    return nullptr;
+  }
+  [[nodiscard]] Station named(openflow::Port device) const {
+    for (auto const &known : all_) {
+      if (known.device == device) {
+        return known.station;
+      }
+    }
+    return {.name = fmt::format("with the number {}", device), .is_uplink = false};
+  }
+
+  [[nodiscard]] Session session(std::uint32_t id) const {
+    auto const at = session_at(id);
+    auto const owner = at.port ? storage::PropertyOwner::port(key_, *at.port)
+                               : storage::PropertyOwner::global(key_);
+    auto const table =
+        effective(transaction_, at.port ? mirror::sessions : mirror::uplink_sessions, owner);
+    auto const name = at.index < table.sessions.size()
+                          ? std::string(text_in(table.sessions[at.index].record.sid))
+                          : std::string();
+    if (!at.port) {
+      return {.name = name, .setting = {.port = {}, .name = "uplink_mirror_sessions"}};
+    }
+    return {.name = name,
+            .setting = {.port = storage::get_port_row(transaction_, *at.port).identifier,
+                        .name = "mirror_sessions"}};
+  }
+
+  [[nodiscard]] Entry entry(Found const &at) const {
+    auto const of_port = [&](std::string_view name) {
+      return SettingOf{at.station.name, std::string(name)};
+    };
+    auto const owner = storage::PropertyOwner::port(key_, at.port);
+    bool const is_blocked = effective(transaction_, ports::blocked, owner) != 0;
+    Entry entry{.station = at.station,
+                .teaming = {.port = {}, .name = "teaming"},
+                .blocked = is_blocked ? of_port("blocked") : SettingOf{}};
+    if (at.station.is_uplink) {
+      return entry;
+    }
+    if (find_bytes(transaction_, teaming::bound_uplink, owner)) {
+      entry.teaming = of_port("uplink");
+    } else if (find_bytes(transaction_, teaming::policy, owner)) {
+      entry.teaming = of_port("teaming");
+    }
+    return entry;
+  }
+
+ private:
+  void add(std::uint16_t device, Station station, storage::PortNumber port) {
+    all_.push_back({.device = device, .station = std::move(station), .port = port});
+  }
+
+  storage::Transaction &transaction_;
+  storage::SwitchKey key_;
+  std::vector<Found> all_;
+};
+
+std::string hexadecimal(std::vector<std::uint8_t> const &bytes) {
+  return fmt::format("{:02x}", fmt::join(bytes, ""));
+}
+
+}  // namespace
+
+std::vector<StoryStep> OpenVswitchPlane::trace(storage::Transaction &transaction,
+                                               storage::FoundSwitch const &of_switch,
+                                               std::string const &station,
+                                               std::vector<std::uint8_t> const &frame) {
+  if (!storage::frames_change(transaction)) {
+    throw Refused(QEX_NOT_SUPPORTED, "no frames move: no simhostd ever took this host");
+  }
+  Stations const stations(transaction, of_switch.key);
+  auto const *at = stations.find(station);
+  if (at == nullptr) {
+    throw Refused(QEX_IS_DISCONNECTED,
+                  "no frames come in at '" + station + "': it is no port or uplink with a device");
+  }
+  try {
+    auto const bridge =
+        ask(file_, {{"ask", "bridge"}, {"switch", of_switch.row.identifier}}, kPatience);
+    auto const text =
+        ask_control(find_control_socket(bridge.at("folder").get<std::string>()), "ofproto/trace",
+                    {bridge.at("name").get<std::string>(), fmt::format("in_port={}", at->device),
+                     hexadecimal(frame)},
+                    Deadline::clock::now() + kPatience);
+    return tell(text, frame, stations.entry(*at),
+                {.station = [&](openflow::Port device) { return stations.named(device); },
+                 .session = [&](std::uint32_t id) { return stations.session(id); }});
+  } catch (NoDaemon const &none) {
+    throw Refused(QEX_TIMEOUT, none.what());
+  } catch (std::runtime_error const &error) {
+    throw Refused(QEX_IO_ERROR, error.what());
+  }
+}
+
+}  // namespace simhost::openvswitch
