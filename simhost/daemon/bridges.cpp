@@ -7,6 +7,7 @@
 #include <iterator>
 #include <stdexcept>
 #include <utility>
+#include <variant>
 
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/ovsdb/configuration.h"
@@ -132,17 +133,22 @@ std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wante
 }  // namespace
 
 struct Bridges::Bridge {
-  Bridge(std::filesystem::path const &socket, Deadline deadline) : connection(socket, deadline) {}
+  Bridge(WantedBridge const &wanted, std::filesystem::path const &socket, Deadline deadline)
+      : key(wanted.key), name(wanted.row.name), connection(socket, deadline) {}
 
+  storage::SwitchKey key;
+  std::string name;
   openflow::Connection connection;
   events::Loop::Watch watch;
   std::vector<Flow> flows;
   std::vector<Group> groups;
+  bool is_altered = false;  // by somebody else, so that the two before are none of it any more
 };
 
-Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, Told told)
+Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, Memory &memory, Told told)
     : loop_(loop),
       folder_(socket.parent_path()),
+      memory_(memory),
       told_(std::move(told)),
       database_(socket, "Open_vSwitch", soon()) {
   ovsdb::Selected followed;
@@ -218,13 +224,8 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadlin
 Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadline) {
   auto &bridge = bridges_[wanted.key];
   if (bridge == nullptr) {
-    auto made = std::make_unique<Bridge>(folder_ / (wanted.row.name + ".mgmt"), deadline);
-    for (auto const &entry : made->connection.flows({}, deadline)) {
-      made->flows.push_back(entry.flow);
-    }
-    for (auto const &entry : made->connection.groups(deadline)) {
-      made->groups.push_back(entry.group);
-    }
+    auto made = std::make_unique<Bridge>(wanted, folder_ / (wanted.row.name + ".mgmt"), deadline);
+    read_flows(*made, deadline);
     bridge = std::move(made);
     bridge->watch =
         loop_.watch(bridge->connection.fd(), [this, raw = bridge.get()] { read_events(*raw); });
@@ -232,11 +233,52 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
   return *bridge;
 }
 
-void Bridges::read_events(Bridge &bridge) const {
+// Once it is told of changes, so that none is missed.
+void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
+  bridge.connection.set_async({.group_changes = true}, deadline);
+  for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
+    bool const is_learned = openvswitch::table::is_learned(number);
+    // These are recent for a second, and many.
+    if (number != openvswitch::table::kRecentSources) {
+      auto const own = is_learned ? openflow::OwnChanges::told : openflow::OwnChanges::untold;
+      auto const there =
+          bridge.connection.monitor_flows(number + 1U, {.table = number}, deadline, own);
+      for (auto const &update : there) {
+        if (is_learned) {
+          memory_.follow(bridge.key, update);
+        }
+      }
+    }
+  }
+  for (auto const &entry : bridge.connection.flows({}, deadline)) {
+    bridge.flows.push_back(entry.flow);
+  }
+  for (auto const &entry : bridge.connection.groups(deadline)) {
+    bridge.groups.push_back(entry.group);
+  }
+}
+
+void Bridges::follow_events(Bridge &bridge) {
+  bool is_altered = false;
+  while (auto const event = bridge.connection.next_event()) {
+    auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
+    if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
+      memory_.follow(bridge.key, *update);
+    } else if (update != nullptr) {
+      is_altered = is_altered || update->event != openflow::FlowUpdate::Event::own;
+    } else if (std::holds_alternative<openflow::GroupsChanged>(*event)) {
+      is_altered = true;
+    }
+  }
+  if (is_altered && !std::exchange(bridge.is_altered, true)) {
+    told_.altered(bridge.name);
+  }
+}
+
+void Bridges::read_events(Bridge &bridge) {
   try {
     bridge.connection.receive();
-    while (bridge.connection.next_event()) {
-    }
+    follow_events(bridge);
   } catch (std::runtime_error const &) {
     bridge.watch.end();
     told_.disturbed();
@@ -246,14 +288,23 @@ void Bridges::read_events(Bridge &bridge) const {
 std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
                                  Deadline deadline) {
   auto &bridge = connected(wanted, deadline);
+  // A bridge without a marker was made just before.
+  bool const is_new = std::ranges::none_of(bridge.flows, is_marker);
+  memory_.follow_devices(wanted.key, wanted.ports);
   auto difference = openvswitch::difference(bridge.flows, bridge.groups, wanted.compiled.flows,
                                             wanted.compiled.groups);
   add_relearned(bridge.connection, wanted, difference, deadline);
-  std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
+  if (is_new) {
+    std::ranges::move(memory_.recall(wanted.key, wanted.compiled.flows),
+                      std::back_inserter(difference.added_flows));
+  } else {
+    std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
+  }
   if (!difference.empty()) {
     bridge.connection.change(changes_of(difference), deadline);
     bridge.flows = wanted.compiled.flows;
     bridge.groups = wanted.compiled.groups;
+    follow_events(bridge);
   }
   return count_without_markers(difference);
 }
@@ -285,6 +336,7 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
 std::size_t Bridges::apply(Wanted const &wanted) {
   auto const deadline = soon();
   auto const added = apply_rows(wanted, deadline);
+  std::erase_if(bridges_, [](auto const &bridge) { return bridge.second->is_altered; });
   std::erase_if(bridges_, [&](auto const &bridge) {
     auto const is_it = [&](auto const &one) { return one.key == bridge.first; };
     return std::ranges::none_of(wanted.bridges, is_it) && std::ranges::none_of(wanted.unfit, is_it);

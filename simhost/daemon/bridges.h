@@ -12,6 +12,7 @@
 #include <string>
 #include <vector>
 
+#include "daemon/memory.h"
 #include "daemon/wanted.h"
 #include "events/loop.h"
 #include "planes/openvswitch/openflow/connection.h"
@@ -38,13 +39,16 @@ class Bridges {
     std::string host;
     /// The database has rows that are others than before, whoever changed them.
     std::function<void()> changed;
+    /// Somebody else changed flows or groups of the bridge of that name.
+    std::function<void(std::string const &)> altered;
     /// A connection ended.
     std::function<void()> disturbed;
   };
 
   /// Connects to the database at `socket`; the sockets of bridges are beside it. Throws
   /// std::runtime_error, which says who writes to the database if somebody else does.
-  Bridges(events::Loop &loop, std::filesystem::path const &socket, Told told);
+  /// `memory` outlives it.
+  Bridges(events::Loop &loop, std::filesystem::path const &socket, Memory &memory, Told told);
   ~Bridges();
   Bridges(Bridges const &) = delete;
   Bridges &operator=(Bridges const &) = delete;
@@ -66,10 +70,13 @@ class Bridges {
   std::size_t apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
                           openvswitch::Deadline deadline);
   Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
-  void read_events(Bridge &bridge) const;
+  void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
+  void read_events(Bridge &bridge);
+  void follow_events(Bridge &bridge);
 
   events::Loop &loop_;
   std::filesystem::path folder_;
+  Memory &memory_;
   Told told_;
   ovsdb::Client database_;
   // None once the database has changed: most changes are none of rows, and take no look at them.

@@ -60,10 +60,16 @@ void Daemon::connect() {
   bridges_.reset();
   attempt([this] {
     bridges_.emplace(
-        loop_, options_.database,
+        loop_, options_.database, memory_,
         Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
                       .host = host_,
                       .changed = [this] { sync_soon(); },
+                      .altered =
+                          [this](std::string const &bridge) {
+                            say_(fmt::format(
+                                "somebody else changed flows or groups of the bridge {}", bridge));
+                            mend_soon();
+                          },
                       .disturbed = [this] { connect_later(); }});
     sync();
   });
@@ -72,6 +78,17 @@ void Daemon::connect() {
 void Daemon::connect_later() {
   pause_ = std::clamp(2 * pause_, kFirstPause, kLongestPause);
   next_connect_ = loop_.after(pause_, [this] { connect(); });
+}
+
+// Whoever goes on changing what is ours shall not keep this busy.
+void Daemon::mend_soon() {
+  constexpr events::Clock::duration kLeastPause = 1s;
+  auto const now = events::Clock::now();
+  auto const due = std::max(now, mended_ + kLeastPause);
+  next_mend_ = loop_.after(due - now, [this, due] {
+    mended_ = due;
+    sync_soon();
+  });
 }
 
 void Daemon::attempt(std::function<void()> const &work) {

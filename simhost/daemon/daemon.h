@@ -39,6 +39,7 @@ class Daemon {
  private:
   void attempt(std::function<void()> const &work);
   void connect_later();
+  void mend_soon();
   void sync_soon();
   void sync_after(std::optional<ClockTime> const &wait);
   void sync();
@@ -63,6 +64,7 @@ class Daemon {
   StateWatch state_watch_;
   NetworkDevices devices_;
   Server server_;
+  Memory memory_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
   std::map<std::string, unsigned> at_bridges_;   // the index of each device
@@ -71,6 +73,8 @@ class Daemon {
   events::Loop::Timer next_sync_;
   events::Loop::Timer next_settling_;
   events::Loop::Timer next_connect_;
+  events::Loop::Timer next_mend_;
+  events::Clock::time_point mended_;    // when the last one was due
   events::Clock::duration pause_ = {};  // before the next attempt to connect
 };
 

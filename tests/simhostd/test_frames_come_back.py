@@ -11,6 +11,7 @@ import pytest
 
 from frame_lab import TOOLS, Lab, comes_true
 from lasting_open_vswitch import LastingOpenVSwitch
+from simhost import Client, frame
 
 
 def test_without_a_daemon_changes_are_pending(idle: Lab) -> None:
@@ -44,6 +45,32 @@ def test_either_process_of_open_vswitch_may_be_killed(lab: Lab, program: str) ->
     assert f"{program} was ended by signal 9" in lab.log()
     lab.set_port("lab", "b", vlan=8)
     assert not one.reaches(other)
+
+
+def test_clients_that_say_nothing_are_reached_after_a_kill(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    to_other = frame(other.mac, one.mac, payload=b"are you there?")
+    # It is not to ask who was there.
+    other.run("ip", "neighbour", "flush", "dev", "eth0")
+    os.kill(lab.processes()["ovs-vswitchd"], signal.SIGKILL)
+    expect_sooner_or_later(one, other, to_other)
+    # Another client at the port is another one: nobody knows it yet.
+    lab.ctl("disconnect", "lab", "b")
+    os.kill(lab.processes()["ovs-vswitchd"], signal.SIGKILL)
+    third = lab.client("lab", "b")
+    assert third.reaches(one, attempts=5)
+
+
+def expect_sooner_or_later(one: Client, other: Client, sent: bytes) -> None:
+    def comes() -> bool:
+        one.send(sent)
+        try:
+            return other.expect(sent, timeout=0.05) == sent
+        except AssertionError:
+            return False
+
+    assert comes_true(comes)
 
 
 def test_a_killed_daemon_leaves_nothing_running_and_another_takes_over(lab: Lab) -> None:

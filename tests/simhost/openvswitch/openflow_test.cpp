@@ -386,6 +386,35 @@ TEST(OpenFlow, MonitorsFlows) {
   EXPECT_FALSE(connection.next_event());
 }
 
+TEST(OpenFlow, MonitorsFlowsThatItChangesItself) {
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  EXPECT_TRUE(connection.monitor_flows(1, {5}, soon(), OwnChanges::told).empty());
+  auto const flow = flow_of_table(5, {Output{1}});
+  connection.change(to_add({}, {flow}), soon());
+  auto event = next_event(connection);
+  EXPECT_EQ(std::get<FlowUpdate>(event).event, FlowUpdate::Event::added);
+  EXPECT_EQ(std::get<FlowUpdate>(event).flow, flow);
+  connection.change({FlowChange{FlowCommand::remove_strict, flow}}, soon());
+  event = next_event(connection);
+  EXPECT_EQ(std::get<FlowUpdate>(event).event, FlowUpdate::Event::removed);
+  EXPECT_EQ(std::get<FlowUpdate>(event).flow.match, flow.match);
+}
+
+TEST(OpenFlow, IsToldOfGroupsThatOthersChange) {
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  connection.set_async({.group_changes = true}, soon());
+  Group const group{.id = 1, .type = GroupType::all, .buckets = {}};
+  connection.change(to_add({group}, {}), soon());
+  EXPECT_FALSE(connection.next_event());
+  Connection other(bridge.socket(), soon());
+  other.change({GroupChange{.command = GroupCommand::modify, .group = group}}, soon());
+  EXPECT_TRUE(std::holds_alternative<GroupsChanged>(next_event(connection)));
+  other.change({GroupChange{.command = GroupCommand::remove, .group = group}}, soon());
+  EXPECT_TRUE(std::holds_alternative<GroupsChanged>(next_event(connection)));
+}
+
 TEST(OpenFlow, IsToldOfAFrameThatIsRefused) {
   Bridge const bridge;
   Connection connection(bridge.socket(), soon());

@@ -76,6 +76,11 @@ inline constexpr std::uint8_t kRecentSources = 33;
 /// Sources that are learned, as many as the switch may have; filled by the switch itself.
 inline constexpr std::uint8_t kCountedSources = 34;
 
+/// Whether the switch fills the table by itself.
+constexpr bool is_learned(std::uint8_t table) {
+  return table >= kFirstAddresses && table <= kCountedSources;
+}
+
 /// Reached by no frame: the cookie of its one flow is the number of the change that is in force.
 inline constexpr std::uint8_t kGeneration = 250;
 

@@ -110,6 +110,9 @@ bool Connection::is_handled(Message const &message, Xid first_xid, Xid last_xid)
     case MessageType::flow_removed:
       events_.emplace_back(take_flow_removed(in));
       return true;
+    case MessageType::request_forward:
+      events_.emplace_back(GroupsChanged{});
+      return true;
     case MessageType::port_status:
       events_.emplace_back(take_port_status(in));
       return true;
@@ -300,9 +303,9 @@ std::vector<GroupStatistics> Connection::group_statistics(Deadline deadline) {
 }
 
 std::vector<FlowUpdate> Connection::monitor_flows(std::uint32_t monitor, FlowFilter const &filter,
-                                                  Deadline deadline) {
+                                                  Deadline deadline, OwnChanges own) {
   return ask<FlowUpdate>(
-      [&](Writer &out, Xid xid) { put_flow_monitor_request(out, xid, monitor, filter); },
+      [&](Writer &out, Xid xid) { put_flow_monitor_request(out, xid, monitor, filter, own); },
       take_flow_update, deadline);
 }
 

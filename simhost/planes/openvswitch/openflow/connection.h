@@ -62,7 +62,7 @@ class Connection {
   /// From now on each change of such flows, its own too, is an event. Returns what there is.
   /// `monitor` is a number of one's own.
   std::vector<FlowUpdate> monitor_flows(std::uint32_t monitor, FlowFilter const &filter,
-                                        Deadline deadline);
+                                        Deadline deadline, OwnChanges own = OwnChanges::untold);
   /// Ends one that there is. For others Open vSwitch has no reply that tells what it is about.
   void cancel_monitor(std::uint32_t monitor, Deadline deadline);
 

@@ -119,7 +119,11 @@ struct FlowUpdate : ReadFlow {
   FlowRemoved::Reason reason{};  // of a removal
 };
 
+/// Somebody else changed groups; how, is to be asked.
+struct GroupsChanged {};
+
 /// What a switch sends by itself. An ErrorReply is of a message that nobody waits for a reply to.
-using Event = std::variant<PacketIn, FlowRemoved, PortStatus, FlowUpdate, ErrorReply>;
+using Event =
+    std::variant<PacketIn, FlowRemoved, PortStatus, FlowUpdate, GroupsChanged, ErrorReply>;
 
 }  // namespace simhost::openflow

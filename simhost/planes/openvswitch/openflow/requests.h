@@ -26,11 +26,15 @@ struct PacketOut {
   std::vector<std::uint8_t> frame{};
 };
 
+/// Whether a monitor says what a change of its own connection changed.
+enum class OwnChanges { untold, told };
+
 /// Messages that a switch sends by itself.
 struct AsyncMessages {
   bool packet_in = false;
   bool port_status = false;
   bool flow_removed = false;
+  bool group_changes = false;  ///< by others
 };
 
 }  // namespace simhost::openflow

@@ -16,6 +16,8 @@ constexpr std::uint8_t kAddMonitor = 0;
 constexpr std::uint8_t kRemoveMonitor = 2;
 // What is there, what is added, removed and modified, with instructions.
 constexpr std::uint16_t kMonitorAll = 0x1f;
+// Changes of the connection's own are not cut short.
+constexpr std::uint16_t kMonitorOwn = 0x40;
 
 template <typename Payload>
 void put_message(Writer &out, MessageType type, Xid xid, Payload const &payload) {
@@ -167,6 +169,7 @@ void put_set_async(Writer &out, Xid xid, AsyncMessages const &wanted) {
   constexpr std::uint16_t kPacketIn = 0;
   constexpr std::uint16_t kPortStatus = 2;
   constexpr std::uint16_t kFlowRemoved = 4;
+  constexpr std::uint16_t kRequestForward = 10;
   constexpr std::uint32_t kAllReasons = 0x3f;
   put_message(out, MessageType::set_async, xid, [&] {
     auto const put = [&](std::uint16_t type, std::uint32_t reasons) {
@@ -177,6 +180,7 @@ void put_set_async(Writer &out, Xid xid, AsyncMessages const &wanted) {
     put(kPacketIn + 1, wanted.packet_in ? kAllReasons : 0);
     put(kPortStatus + 1, wanted.port_status ? 0x7 : 0);
     put(kFlowRemoved + 1, wanted.flow_removed ? kAllReasons : 0);
+    put(kRequestForward + 1, wanted.group_changes ? 0x1 : 0);
   });
 }
 
@@ -207,9 +211,10 @@ void put_groups_request(Writer &out, Xid xid, MultipartType type, GroupId group)
   });
 }
 
-void put_flow_monitor_request(Writer &out, Xid xid, std::uint32_t monitor,
-                              FlowFilter const &filter) {
-  put_monitor(out, xid, monitor, kAddMonitor, kMonitorAll, filter);
+void put_flow_monitor_request(Writer &out, Xid xid, std::uint32_t monitor, FlowFilter const &filter,
+                              OwnChanges own) {
+  auto const flags = own == OwnChanges::told ? kMonitorAll | kMonitorOwn : kMonitorAll;
+  put_monitor(out, xid, monitor, kAddMonitor, static_cast<std::uint16_t>(flags), filter);
 }
 
 void put_flow_monitor_cancel(Writer &out, Xid xid, std::uint32_t monitor) {

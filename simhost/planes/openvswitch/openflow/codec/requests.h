@@ -34,8 +34,8 @@ void put_flows_request(Writer &out, Xid xid, MultipartType type, FlowFilter cons
 void put_ports_request(Writer &out, Xid xid, MultipartType type, Port port);
 /// `type` is groups or group_statistics.
 void put_groups_request(Writer &out, Xid xid, MultipartType type, GroupId group);
-void put_flow_monitor_request(Writer &out, Xid xid, std::uint32_t monitor,
-                              FlowFilter const &filter);
+void put_flow_monitor_request(Writer &out, Xid xid, std::uint32_t monitor, FlowFilter const &filter,
+                              OwnChanges own);
 void put_flow_monitor_cancel(Writer &out, Xid xid, std::uint32_t monitor);
 
 }  // namespace simhost::openflow

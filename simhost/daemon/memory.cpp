@@ -1,0 +1,67 @@
+// A flow is made anew by the one that taught it, as that is now.
+#include "daemon/memory.h"
+
+#include <optional>
+#include <utility>
+
+#include "planes/openvswitch/reconcile/relearning.h"
+
+namespace simhost::daemon {
+namespace {
+
+using openflow::Flow;
+using openvswitch::LearnedFlows;
+
+// The number of the port that a cookie names.
+std::uint32_t port_in(std::uint64_t cookie) {
+  return static_cast<std::uint32_t>(cookie);
+}
+
+}  // namespace
+
+void Memory::follow(storage::SwitchKey key, openflow::FlowUpdate const &update) {
+  using Event = openflow::FlowUpdate::Event;
+  auto &flows = bridges_[key].flows;
+  if (update.event == Event::removed) {
+    flows.erase(openflow::place(update.flow));
+  } else if (update.event < Event::own) {
+    flows.insert_or_assign(openflow::place(update.flow), update.flow);
+  }
+}
+
+void Memory::follow_devices(storage::SwitchKey key,
+                            std::map<std::string, std::uint32_t> const &devices) {
+  auto &bridge = bridges_[key];
+  for (auto const &[device, port] : std::exchange(bridge.devices, devices)) {
+    auto const now = devices.find(device);
+    if (now == devices.end() || now->second != port) {
+      std::erase_if(bridge.flows, [gone = port](auto const &flow) {
+        return port_in(flow.second.cookie) == gone;
+      });
+    }
+  }
+}
+
+std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted) const {
+  std::vector<Flow> recalled;
+  auto const found = bridges_.find(key);
+  if (found == bridges_.end()) {
+    return recalled;
+  }
+  std::map<LearnedFlows, std::optional<openflow::Learn>> ways;
+  for (auto const &[place, flow] : found->second.flows) {
+    LearnedFlows const learned{.table = flow.table, .cookie = flow.cookie};
+    auto const way = ways.try_emplace(learned, std::nullopt);
+    if (way.second) {
+      way.first->second = openvswitch::how_learned(wanted, learned);
+    }
+    if (way.first->second) {
+      if (auto again = openvswitch::relearned(*way.first->second, flow)) {
+        recalled.push_back(*std::move(again));
+      }
+    }
+  }
+  return recalled;
+}
+
+}  // namespace simhost::daemon

@@ -1,0 +1,40 @@
+// What bridges have learned, kept past their end: Open vSwitch forgets it when it is started anew,
+// and a client that says nothing would not be reached until it does.
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <span>
+#include <string>
+#include <tuple>
+#include <vector>
+
+#include "planes/openvswitch/openflow/flow.h"
+#include "planes/openvswitch/openflow/replies.h"
+#include "storage/switches.h"
+
+namespace simhost::daemon {
+
+class Memory {
+ public:
+  /// A bridge was told, or learned, a flow of a table that it fills by itself; or lost one.
+  void follow(storage::SwitchKey key, openflow::FlowUpdate const &update);
+  /// The devices of a bridge, with the numbers of their ports. What was learned at a port that has
+  /// another device than before is forgotten.
+  void follow_devices(storage::SwitchKey key, std::map<std::string, std::uint32_t> const &devices);
+  /// What a bridge that is to have these flows knows once more.
+  [[nodiscard]] std::vector<openflow::Flow> recall(storage::SwitchKey key,
+                                                   std::span<openflow::Flow const> wanted) const;
+
+ private:
+  using Place = std::tuple<std::uint8_t, std::uint16_t, openflow::Match>;
+
+  struct OfBridge {
+    std::map<std::string, std::uint32_t> devices;
+    std::map<Place, openflow::Flow> flows;
+  };
+
+  std::map<storage::SwitchKey, OfBridge> bridges_;
+};
+
+}  // namespace simhost::daemon
