@@ -7,6 +7,7 @@
       reason: the laboratory has jumbo frames
 """
 
+import re
 from dataclasses import dataclass
 from typing import Any, List, Optional
 
@@ -28,7 +29,7 @@ class Allowance:
     reason: str
     function: Optional[str] = None
     path: Optional[str] = None
-    """Of a value or of what holds it; [] stands for any place in a list."""
+    """Of a value or of what holds it; [] stands for any place in a list, and so does nothing."""
     recorded: Any = _ANY
     present: Any = _ANY
     used: int = 0
@@ -44,9 +45,8 @@ class Allowance:
     def _leads_to(self, difference: Difference) -> bool:
         if self.path is None:
             return True
-        plain = self.path.replace("[]", "")
-        found = difference.pattern if "[]" in self.path or "[" not in self.path else difference.path
-        return found == plain or found.startswith((f"{plain}.", f"{plain}["))
+        parts = [_expression(one) for one in re.split(r"(\[\d*\])", self.path)]
+        return re.fullmatch("".join(parts) + r"([.\[].*)?", difference.path) is not None
 
     def __str__(self) -> str:
         values = [] if self.recorded is self.present is _ANY else [self._values()]
@@ -55,6 +55,15 @@ class Allowance:
     def _values(self) -> str:
         there, here = ("any" if one is _ANY else one for one in (self.recorded, self.present))
         return f"{there} -> {here}"
+
+
+def _expression(part: str) -> str:
+    """A regular expression for a place, or for what stands before one or after it."""
+    if part == "[]":
+        return r"(\[\d+\])+"
+    if part.startswith("["):
+        return re.escape(part)
+    return r"(\[\d+\])*\.".join(re.escape(name) for name in part.split("."))
 
 
 class Allowances:

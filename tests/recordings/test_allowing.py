@@ -26,6 +26,9 @@ def covers(entry: Dict[str, Any], function: str, difference: Difference) -> bool
         ({"path": "out.table.VSMACTable.macEntries.vid"}, True),
         ({"path": "out.table.VSMACTable.macEntries[0].vid"}, False),
         ({"path": "out.table.VSMACTable.macEntries[1]"}, True),
+        ({"path": "out.table.VSMACTable.macEntries[]"}, True),
+        ({"path": "out.table.VSMACTable.macEntries[1]vid"}, False),
+        ({"path": "out.tableXVSMACTable"}, False),
         ({"path": "out.table"}, True),
         ({"path": "out.tab"}, False),
         ({"path": "status"}, False),
@@ -38,6 +41,23 @@ def covers(entry: Dict[str, Any], function: str, difference: Difference) -> bool
 )
 def test_what_an_entry_covers(entry: Dict[str, Any], covered: bool) -> None:
     assert covers(entry, "VSQEX_GetTeamMACTable", Difference(ENTRY, 7, 8)) is covered
+
+
+@pytest.mark.parametrize(
+    "path, covered",
+    [
+        ("out.groups[].sources[1]", True),
+        ("out.groups[2].sources[]", True),
+        ("out.groups.sources[1].port", True),
+        ("out.groups[2].sources", True),
+        ("out.groups[].sources[0]", False),
+        ("out.groups[0].sources[]", False),
+        ("out.groups[].sources.address", False),
+    ],
+)
+def test_places_in_a_list_of_lists(path: str, covered: bool) -> None:
+    found = Difference("out.groups[2].sources[1].port", 7, 8)
+    assert covers({"path": path}, "VSQEX_GetMcastFilters", found) is covered
 
 
 def test_statuses_are_named() -> None:
