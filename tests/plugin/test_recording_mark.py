@@ -159,6 +159,30 @@ def test_without_the_line_in_the_ini_file(pytester: pytest.Pytester) -> None:
     done.stdout.fnmatch_lines(["the mark recording needs a line vswitch_recordings = true in the*"])
 
 
+def test_a_recording_that_has_no_place(pytester: pytest.Pytester) -> None:
+    pytester.makepyfile(
+        test_nowhere="""
+        import pytest
+        @pytest.mark.recording("nowhere/made.jsonl", mode="once")
+        def test_nowhere(): pass
+        @pytest.mark.recording(".", mode="all")
+        def test_a_folder(): pass
+        """
+    )
+    pytester.makeini(INI)
+    done = pytester.runpytest_subprocess("test_nowhere.py")
+    done.assert_outcomes(errors=2)
+    made = pytester.path / "nowhere" / "made.jsonl"
+    done.stdout.fnmatch_lines(
+        [
+            f"the mark recording: [[]Errno 2[]] No such file or directory: '{made}'",
+            f"the mark recording: [[]Errno 21[]] Is a directory: '{pytester.path}'",
+        ]
+    )
+    done.stdout.no_fnmatch_line("*Traceback*")
+    done.stdout.no_fnmatch_line("*_recorded_test.py*")
+
+
 def test_a_module_that_is_loaded_already_is_too_late(pytester: pytest.Pytester) -> None:
     pytester.makepyfile(early="import _libvswitch")
     pytester.syspathinsert()

@@ -83,8 +83,12 @@ class RecordedTest:
     def _recorded(self) -> Iterator[None]:
         from vswitch.recording import anew, begin
 
-        with anew(self._trace) as made:
-            begin(made, [self._item.nodeid], _hosts)
+        with contextlib.ExitStack() as stack:
+            try:
+                made = stack.enter_context(anew(self._trace))
+                begin(made, [self._item.nodeid], _hosts)
+            except OSError as error:
+                pytest.fail(f"the mark recording: {error}", pytrace=False)
             try:
                 self._runtime.record(made)
                 yield
