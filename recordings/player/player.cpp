@@ -198,6 +198,14 @@ std::uint64_t call_back(Callback const &callback) {
   return 0;
 }
 
+/// What the tool has printed by then is not lost. A stream in which a thread waits is let be.
+void flush_printed() noexcept {
+  if (ftrylockfile(stdout) == 0) {
+    std::fflush(stdout);
+    funlockfile(stdout);
+  }
+}
+
 /// Jumps, or ends the process where nothing leads anywhere.
 [[noreturn]] void raise(Call const &call, SavedTrap const &trap, Ending const &ending) noexcept {
   if (call.is_armed && is_armed(trap)) {
@@ -206,7 +214,7 @@ std::uint64_t call_back(Callback const &callback) {
   if (ending.way == Ending::Way::traps) {
     tell(kept_trap_text());
   }
-  std::fflush(nullptr);
+  flush_printed();
   _exit(exit_status);
 }
 

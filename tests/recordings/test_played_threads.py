@@ -38,3 +38,24 @@ def test_a_trap_with_a_class_of_the_tools_waits_for_nobody_who_waits_for_it(
         """
     done = play(program(played), made.trace, alone, "arguments")
     assert (done.status, done.stderr) == (125, "vswitch play: it is too late\n")
+
+
+def test_a_process_ends_while_a_thread_waits_for_input(tmp_path: Path, alone: Path) -> None:
+    made = record("import libvswitch", tmp_path / "trace.jsonl", RECORDING)
+    assert made.status == 0, made.stderr
+    # Nobody writes into the pipe that is its input, and the thread has that locked.
+    played = """
+        import ctypes, os, threading
+        import _libvswitch
+        libc, host = ctypes.CDLL(None), ctypes.CDLL("libvswitch.so")
+        os.dup2(os.pipe()[0], 0)
+        threading.Thread(target=libc.getchar, daemon=True).start()
+        stdin = ctypes.c_void_p.in_dll(libc, "stdin")
+        while libc.ftrylockfile(stdin) == 0:
+            libc.funlockfile(stdin)
+        libc.printf(b"printed")
+        host.VSDVS_GetMTU(b"lab", None)
+        """
+    done = play(program(played), made.trace, alone, "arguments")
+    assert (done.status, done.stdout) == (125, "printed")
+    assert "VSDVS_GetMTU" in done.stderr
