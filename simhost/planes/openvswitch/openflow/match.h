@@ -2,7 +2,8 @@
 #pragma once
 
 #include <cstdint>
-#include <map>
+#include <utility>
+#include <vector>
 
 #include "planes/openvswitch/openflow/field.h"
 
@@ -14,6 +15,27 @@ struct Masked {
   Value mask;   // the bits that count
 
   friend auto operator<=>(Masked const &, Masked const &) = default;
+};
+
+/// What some fields are: as a map, but in one piece of memory, for a switch has tens of thousands
+/// of them, which are made, sorted and compared at each change.
+class MaskedFields {
+ public:
+  using value_type = std::pair<Field, Masked>;
+  using const_iterator = std::vector<value_type>::const_iterator;
+
+  /// In the order of the fields.
+  [[nodiscard]] const_iterator begin() const { return all_.begin(); }
+  [[nodiscard]] const_iterator end() const { return all_.end(); }
+  [[nodiscard]] const_iterator find(Field field) const;
+
+  void put(Field field, Masked const &content);
+  void erase(Field field);
+
+  friend auto operator<=>(MaskedFields const &, MaskedFields const &) = default;
+
+ private:
+  std::vector<value_type> all_;
 };
 
 /// The frames whose fields have these contents; an empty one is for all. The switch refuses a field
@@ -37,12 +59,12 @@ class Match {
   /// No tag.
   Match &untagged() { return with(Field::vlan_vid, 0); }
 
-  [[nodiscard]] std::map<Field, Masked> const &fields() const { return fields_; }
+  [[nodiscard]] MaskedFields const &fields() const { return fields_; }
 
   friend auto operator<=>(Match const &, Match const &) = default;
 
  private:
-  std::map<Field, Masked> fields_;
+  MaskedFields fields_;
 };
 
 }  // namespace simhost::openflow

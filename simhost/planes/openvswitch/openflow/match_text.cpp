@@ -48,7 +48,7 @@ constexpr Value kPriorityBits = 0xe000;
 
 class MatchText {
  public:
-  explicit MatchText(Match const &match) : left_(match.fields()) {}
+  explicit MatchText(Match const &match) : left_(match.fields().begin(), match.fields().end()) {}
 
   std::string whole() {
     add_protocol();
