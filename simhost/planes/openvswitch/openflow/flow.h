@@ -29,4 +29,9 @@ inline auto place(Flow const &flow) {
   return std::tie(flow.table, flow.priority, flow.match);
 }
 
+/// What else there is to a flow but its place and its actions.
+inline auto settings(Flow const &flow) {
+  return std::tie(flow.cookie, flow.idle_timeout, flow.hard_timeout, flow.tells_removal);
+}
+
 }  // namespace simhost::openflow
