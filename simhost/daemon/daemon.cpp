@@ -16,6 +16,7 @@
 #include "planes/stored/stored_plane.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
+#include "storage/running/generations.h"
 
 namespace simhost::daemon {
 namespace {
@@ -46,7 +47,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       lock_(lock(beside(options_.state, "-simhostd.lock"))),
       store_(opened(options_.state)),
       host_(options_.state.string()),
-      state_watch_(loop, store_, options_.state, [this] { sync_soon(); }),
+      state_watch_(loop, store_, options_.state, [this] { look_at_commits(); }),
       devices_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state),
               [this](Json const &question, Reply const &reply) { handle(question, reply); }) {
@@ -100,6 +101,18 @@ void Daemon::attempt(std::function<void()> const &work) {
     bridges_.reset();
     troubles_.add(error.what());
     connect_later();
+  }
+}
+
+// Whoever waits for a change has told of it already, most of the time.
+void Daemon::look_at_commits() {
+  try {
+    storage::ReadingTransaction transaction(store_);
+    if (storage::commits_of_others(transaction) != commits_) {
+      sync_soon();
+    }
+  } catch (std::runtime_error const &) {
+    sync_soon();  // which says what is wrong with the state
   }
 }
 
@@ -162,6 +175,7 @@ void Daemon::take_out_new_devices(Wanted const &wanted) {
 void Daemon::sync() {
   follow_devices();
   storage::ReadingTransaction transaction(store_);
+  commits_ = storage::commits_of_others(transaction);
   auto const is_there = [this](std::string const &device) {
     return devices_.find(device).has_value();
   };

@@ -40,6 +40,7 @@ class Daemon {
   void attempt(std::function<void()> const &work);
   void connect_later();
   void mend_soon();
+  void look_at_commits();
   void sync_soon();
   void sync_after(std::optional<ClockTime> const &wait);
   void sync();
@@ -67,6 +68,7 @@ class Daemon {
   Memory memory_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
+  std::optional<std::int64_t> commits_;          // to the state, at the last look
   std::map<std::string, unsigned> at_bridges_;   // the index of each device
   std::multimap<std::uint64_t, Reply> waiting_;  // for a change to be in force
   std::function<void()> ready_;

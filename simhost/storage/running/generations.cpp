@@ -11,4 +11,10 @@ Generations get_generations(Transaction &transaction, SwitchKey key) {
   return {.team = select.integer(0), .ports = select.integer(1)};
 }
 
+std::int64_t commits_of_others(Transaction &transaction) {
+  Query select(transaction, "PRAGMA data_version");
+  select.require_row();
+  return select.integer(0);
+}
+
 }  // namespace simhost::storage

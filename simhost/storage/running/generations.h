@@ -21,4 +21,7 @@ struct Generations {
 /// The switch must be there.
 Generations get_generations(Transaction &transaction, SwitchKey key);
 
+/// Another number for a state that another store committed something to, whatever it was.
+std::int64_t commits_of_others(Transaction &transaction);
+
 }  // namespace simhost::storage

@@ -15,6 +15,7 @@
 
 #include "storage/ports.h"
 #include "storage/query.h"
+#include "storage/running/generations.h"
 #include "storage/schema.h"
 #include "storage/switches.h"
 #include "temporary_folder.h"
@@ -107,6 +108,25 @@ TEST(Store, ConnectionsSeeEachOthersCommitsAtOnce) {
   EXPECT_TRUE(has(second, "a"));
   add(second, "b");
   EXPECT_TRUE(has(first, "b"));
+}
+
+TEST(Store, CommitsOfOthersAreToldApartAndOnesOwnAreNone) {
+  TemporaryFolder const folder;
+  Store ours(folder.file("host.db"), populate_nothing);
+  Store theirs(folder.file("host.db"), populate_nothing);
+  auto const commits = [&] {
+    ReadingTransaction transaction(ours);
+    return simhost::storage::commits_of_others(transaction);
+  };
+  auto const before = commits();
+  EXPECT_EQ(commits(), before);
+  add(ours, "a");
+  EXPECT_EQ(commits(), before);
+  add(theirs, "b");
+  auto const after = commits();
+  EXPECT_NE(after, before);
+  add(ours, "c");
+  EXPECT_EQ(commits(), after);
 }
 
 TEST(Store, AReaderDoesNotWaitForAWriterAndSeesTheStateBefore) {
