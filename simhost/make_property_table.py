@@ -56,6 +56,13 @@ def name_of(known: Property) -> str:
     return f"`{known['name']}`" if "name" in known else ""
 
 
+def frames_of(known: Property) -> str:
+    """What frames make of it, where a daemon moves some."""
+    if known["frames"] == "kept":
+        return "kept, without effect"
+    return "obeyed" + (f"; not {known['beyond_frames']}" if "beyond_frames" in known else "")
+
+
 def row_of(known: Property) -> List[str]:
     """A property as a row."""
     return [
@@ -66,13 +73,15 @@ def row_of(known: Property) -> List[str]:
         default_of(known),
         known["type"],
         access_to(known),
+        frames_of(known),
         known["words"],
     ]
 
 
 def table(properties: List[Property]) -> List[str]:
     """The lines of a table."""
-    head = ["Key", "In documents", "Bytes", "Accepted", "Unless set", "Type", "Access", ""]
+    head = ["Key", "In documents", "Bytes", "Accepted", "Unless set", "Type", "Access"]
+    head += ["By frames", ""]
     rows = [head, ["---"] * len(head), *map(row_of, properties)]
     return ["| " + " | ".join(row) + " |" for row in rows]
 

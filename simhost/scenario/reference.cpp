@@ -79,6 +79,10 @@ Json property_to_json(Descriptor const &descriptor) {
   add_names(said, descriptor);
   add_default(said, descriptor);
   said["words"] = descriptor.words;
+  said["frames"] = descriptor.frames_obey_it ? "obey" : "kept";
+  if (!descriptor.beyond_frames.empty()) {
+    said["beyond_frames"] = descriptor.beyond_frames;
+  }
   return said;
 }
 

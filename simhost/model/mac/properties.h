@@ -52,6 +52,7 @@ inline constexpr auto learning =
                       .macLimit = VS_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT})
         .obeys<check_learning>()
         .json("mac_learning", form::record<VSMACLearning>(kLearningMembers))
+        .frames_obey()
         .says("MAC learning of the switch, instead of the host's");
 
 inline constexpr std::array<Word, 2> kLimitPolicies{
@@ -64,8 +65,9 @@ using LearningOfPort = form::In<&VSPMACManagement::portMACLearning, form::Number
 inline constexpr std::array kManagementMembers{
     form::member("learning", form::boolean<LearningOfPort<&VSPMACLearning::learning>>(),
                  "whether the port learns addresses"),
-    form::member("flooding", form::boolean<LearningOfPort<&VSPMACLearning::flooding>>(),
-                 "whether frames for unknown addresses go out; kept without effect"),
+    form::member(
+        "flooding", form::boolean<LearningOfPort<&VSPMACLearning::flooding>>(),
+        "whether frames for unknown addresses go out; without effect where no frames move"),
     form::member("limit",
                  form::number<LearningOfPort<&VSPMACLearning::macLimit>>(
                      0, VSPORT_MAC_LEARNING_LIMIT_ENTRIES_MAX),
@@ -74,7 +76,7 @@ inline constexpr std::array kManagementMembers{
                  form::choice<LearningOfPort<&VSPMACLearning::macLimitPolicy>>(kLimitPolicies),
                  "what becomes of frames from an address past the limit"),
     form::member("mac_change", form::boolean<&VSPMACManagement::macChangeAllowed>(),
-                 "whether the client may change its address; kept without effect"),
+                 "whether the client may change its address; without effect where no frames move"),
 };
 
 /// Refuses an unknown policy (QEX_BAD_PARAM) and a limit past
@@ -93,6 +95,7 @@ inline constexpr auto management =
                                  .macLimitPolicy = VSPORT_MAC_LEARNING_LIMIT_POLICY_ALLOW}})
         .obeys<check_management>()
         .json("mac_learning", form::record<VSPMACManagement>(kManagementMembers))
+        .frames_obey()
         .says("MAC learning of the port, and whether its client may change its address");
 
 inline constexpr auto learning_stats = property<VSPMACLearningStats>(VSPROP_PORT_MAC_LEARNING_STATS)
@@ -154,7 +157,10 @@ inline constexpr auto ethernet_filter =
         .defaults_to({})
         .obeys<check_filter>()
         .json("ethernet_filter", form::record<VSExtraEthFilter>(kFilterMembers))
-        .says("frames that the port takes beside those for its client; kept without effect");
+        .frames_obey()
+        .says(
+            "frames that the port takes beside those for its client; without effect where no "
+            "frames move");
 
 inline constexpr std::array<Descriptor const *, 4> kProperties{&learning, &management,
                                                                &ethernet_filter, &learning_stats};

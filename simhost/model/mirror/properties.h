@@ -168,17 +168,24 @@ inline constexpr auto kSession = form::record<Session>(kSessionMembers);
 inline constexpr auto kTable =
     form::list<form::VectorField<&Table::sessions>>(kSession, kMostSessions);
 
-inline constexpr auto sessions = property<Table>(VSPROP_PORT_MIRROR_SESSIONS)
-                                     .of_port()
-                                     .typed()
-                                     .json("mirror_sessions", kTable)
-                                     .says("the mirror sessions of the port, all of them");
+inline constexpr auto sessions =
+    property<Table>(VSPROP_PORT_MIRROR_SESSIONS)
+        .of_port()
+        .typed()
+        .json("mirror_sessions", kTable)
+        .frames_obey()
+        .frames_cannot("`sampling_rate`: Open vSwitch mirrors every frame")
+        .says("the mirror sessions of the port, all of them");
 
 inline constexpr auto uplink_sessions =
     property<Table>(VSPROP_SWITCH_UPLINK_MIRROR_SESSIONS)
         .of_switch()
         .json("uplink_mirror_sessions", kTable)
-        .says("the mirror sessions of the switch's uplinks, all of them; kept without effect");
+        .frames_obey()
+        .frames_cannot("`sampling_rate`: Open vSwitch mirrors every frame")
+        .says(
+            "the mirror sessions of the switch's uplinks, all of them; without effect where no "
+            "frames move");
 
 inline constexpr std::array<Descriptor const *, 2> kProperties{&sessions, &uplink_sessions};
 

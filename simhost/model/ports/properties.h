@@ -38,7 +38,8 @@ inline constexpr auto blocked =
         .defaults_to(0)
         .json("blocked")
         .json_of_uplink_port("blocked")
-        .says("whether the port is blocked; frames do not go here, but its status says so");
+        .frames_obey()
+        .says("whether the port is blocked, which its status says as well");
 
 inline constexpr auto type = property<qex_uint32>(QEX_NEBPROP_PORT_TYPE)
                                  .of_port()

@@ -83,8 +83,10 @@ struct Descriptor {
   Form form;
   Companion companion;
 
-  std::string_view bytes;  ///< what they are, for the reference
-  std::string_view words;  ///< what it means; of one of any bytes, why it takes them
+  std::string_view bytes;       ///< what they are, for the reference
+  std::string_view words;       ///< what it means; of one of any bytes, why it takes them
+  bool frames_obey_it = false;  ///< where frames move; others are kept, and no frame looks at them
+  std::string_view beyond_frames;  ///< the member that frames cannot obey all the same, and why
   QEX_ReturnStatus outside = QEX_BAD_PARAM;  ///< for a number out of its bounds
 
   [[nodiscard]] constexpr bool is_computed() const { return read != nullptr; }
@@ -245,6 +247,19 @@ struct Property : Descriptor {
             [](void *value, BytesView part) {
               std::invoke(kJoin, *static_cast<Value *>(value), Codec<Other>::value(part));
             }};
+    return made;
+  }
+
+  /// What becomes of frames depends on it.
+  [[nodiscard]] constexpr Property frames_obey() const {
+    auto made = *this;
+    made.frames_obey_it = true;
+    return made;
+  }
+  /// But not on that member of it.
+  [[nodiscard]] constexpr Property frames_cannot(std::string_view member_and_reason) const {
+    auto made = *this;
+    made.beyond_frames = member_and_reason;
     return made;
   }
 

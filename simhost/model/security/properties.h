@@ -20,9 +20,10 @@ inline constexpr auto forbids =
         .typed()
         .defaults_to({.flags = 0})
         .json("forbids", form::bits<&VSPropSecurity::flags>(kForbidden))
+        .frames_obey()
         .says(
             "what the client of the port may not do; `promiscuous` keeps it out of promiscuous "
-            "mirror sessions, the others are kept without effect");
+            "mirror sessions, the others are without effect where no frames move");
 
 inline constexpr std::array<Descriptor const *, 1> kProperties{&forbids};
 

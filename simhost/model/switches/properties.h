@@ -33,11 +33,13 @@ inline constexpr auto mtu = property<qex_uint32>(VSPROP_MTU)
                                 .defaults_to(1500)
                                 .json("mtu")
                                 .always_said()
+                                .frames_obey()
                                 .says("bytes of the largest packet");
 inline constexpr auto disabled = property<qex_Bool>(VSPROP_SWITCH_FORWARDING_DISABLED)
                                      .of_switch()
                                      .defaults_to(0)
                                      .json("disabled")
+                                     .frames_obey()
                                      .says(
                                          "whether the switch forwards nothing; kept without "
                                          "effect");

@@ -107,6 +107,7 @@ inline constexpr auto of_switch =
                       .uplinkPortName = {}})
         .obeys<check_policy>()
         .json("teaming", form::record<VSTeamPolicy>(kMembers))
+        .frames_obey()
         .says("which uplinks carry what the ports of the switch send");
 
 inline constexpr auto policy = property<VSTeamPolicy>(VSPROP_PORT_TEAMING_POLICY)
@@ -115,6 +116,7 @@ inline constexpr auto policy = property<VSTeamPolicy>(VSPROP_PORT_TEAMING_POLICY
                                    .inherits(of_switch)
                                    .obeys<check_policy>()
                                    .json("teaming", form::record<VSTeamPolicy>(kMembers))
+                                   .frames_obey()
                                    .says("the port's own teaming, instead of its switch's");
 
 /// One more than the name of an uplink port has: what callers have room for.
@@ -126,15 +128,18 @@ inline constexpr auto bound_uplink =
         .of_uplinks()
         .defaults_to("")
         .json("uplink")
+        .frames_obey()
         .says("the one uplink that the port uses whatever its teaming says");
 
-inline constexpr auto transmit_uplink =
-    property<qex_Bool>(VSPROP_PORT_TX_UPLINK)
-        .of_port()
-        .typed()
-        .defaults_to(0)
-        .json("transmit_uplink")
-        .says("whether what the port sends always goes out over an uplink; kept without effect");
+inline constexpr auto transmit_uplink = property<qex_Bool>(VSPROP_PORT_TX_UPLINK)
+                                            .of_port()
+                                            .typed()
+                                            .defaults_to(0)
+                                            .json("transmit_uplink")
+                                            .frames_obey()
+                                            .says(
+                                                "whether what the port sends always goes out over "
+                                                "an uplink; without effect where no frames move");
 
 inline constexpr std::array<Descriptor const *, 4> kProperties{&of_switch, &policy, &bound_uplink,
                                                                &transmit_uplink};

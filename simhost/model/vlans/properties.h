@@ -73,7 +73,8 @@ inline constexpr auto priority =
         .typed()
         .within(QEX_VLAN_PRIORITY_MINIMUM, QEX_VLAN_PRIORITY_MAXIMUM)
         .defaults_to(kNoPriority)
-        .says("the priority of the port's frames; kept without effect");
+        .frames_obey()
+        .says("the priority of the port's frames; without effect where no frames move");
 
 inline constexpr auto kRange =
     form::range<&qex_NEBPortVIDRange::minVID, &qex_NEBPortVIDRange::maxVID>(0, kGreatest);
@@ -101,6 +102,7 @@ inline constexpr auto of_port =
         .json_of_uplink_port("vlan")
         .together_with<std::int32_t, &PortVlans::priority_if_any, &PortVlans::join_priority>(
             priority, "priority")
+        .frames_obey()
         .says("the VLANs of the port, all of them; a number is the `id` alone");
 
 inline constexpr auto nested_tag = property<qex_Bool>(VSPROP_PORT_VLAN_NESTEDTAG)
@@ -109,6 +111,7 @@ inline constexpr auto nested_tag = property<qex_Bool>(VSPROP_PORT_VLAN_NESTEDTAG
                                        .defaults_to(0)
                                        .json("nested_tag")
                                        .json_of_uplink_port("nested_tag")
+                                       .frames_obey()
                                        .says(
                                            "whether frames of the port may have two tags; kept "
                                            "without effect");
@@ -149,6 +152,7 @@ inline constexpr auto private_vlans =
         .obeys<check_private_vlans>()
         .in_bytes("VSPvlanMapEntry for each entry")
         .json("private_vlans", form::list<form::WholeVector<PrivateVlans>>(kEntry, kNumbers))
+        .frames_obey()
         .says("the private VLANs of the switch, all of them");
 
 inline constexpr std::array<Descriptor const *, 6> kProperties{
