@@ -2,7 +2,7 @@
 
 import re
 from pathlib import Path
-from typing import Any, Counter as Counts, Dict, List, Mapping, Optional, Sequence
+from typing import Any, Callable, Counter as Counts, Dict, List, Mapping, Optional, Sequence
 
 from compiler import Compiler
 from frames import Copy, Frame, copies
@@ -32,13 +32,19 @@ class Bench:
         names = {f"{bridge}{number}": number for number in numbers}
         open_vswitch.add_bridge(bridge, names, sent_to)
 
-    def load(self, switch: Mapping[str, Any], clients: Sequence[Mapping[str, Any]]) -> Rules:
-        """Makes the bridge that switch; its rules."""
+    def load(
+        self,
+        switch: Mapping[str, Any],
+        clients: Sequence[Mapping[str, Any]],
+        change: Callable[[str], Optional[str]] = str,
+    ) -> Rules:
+        """Makes the bridge that switch, with each flow changed or left out first; its rules."""
         made = self._compiler.compile(switch, clients)
-        self._open_vswitch.load(self._bridge, [*made["flows"], *self.more_flows], made["groups"])
+        changed = (change(flow) for flow in made["flows"])
+        flows = [flow for flow in changed if flow is not None]
+        self._open_vswitch.load(self._bridge, [*flows, *self.more_flows], made["groups"])
         self.devices = made["devices"]
-        macs = {client["port"]: client["mac"] for client in clients if "mac" in client}
-        return Rules(switch, made["numbers"], macs)
+        return Rules(switch, made["numbers"], clients)
 
     def send(self, at: str, frame: Frame) -> "Counts[Copy]":
         """What comes out where of a frame that comes in there, which the switch remembers."""

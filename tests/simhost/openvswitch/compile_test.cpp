@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <set>
 #include <string>
 #include <utility>
 
@@ -88,6 +89,35 @@ TEST(Compiling, RefusesTeamsOfOtherSwitches) {
   network.ports[1].team = 1;
   EXPECT_EQ(refusal(network),
             std::pair(QEX_BAD_PARAM, std::string("port 2 uses a team that the switch has not")));
+}
+
+TEST(Compiling, RefusesMoreUplinksThanAreAggregated) {
+  auto network = with_ports(2);
+  Slot slot;
+  for (openflow::Port uplink = 11; uplink < 11 + kMostInSlot; ++uplink) {
+    network.uplinks.push_back({.port = uplink, .number = uplink});
+    slot.push_back(uplink);
+  }
+  network.teams.push_back({.balance = Balance::first, .in_use = {slot}, .standby = {}});
+  EXPECT_EQ(refusal(network).first, QEX_OK);
+  network.uplinks.push_back({.port = 100, .number = 100});
+  network.teams[0].in_use[0].push_back(100);
+  EXPECT_EQ(refusal(network), std::pair(QEX_LIMIT_EXCEEDED,
+                                        std::string("a team aggregates 33 uplinks, more than 32")));
+}
+
+TEST(Compiling, RefusesCopiesOfLessThanAHeader) {
+  auto network = with_ports(1);
+  network.mirrors.resize(1);
+  network.mirrors[0].id = 5;
+  for (std::uint16_t const enough : {0, 14}) {
+    network.mirrors[0].most_bytes = enough;
+    EXPECT_EQ(refusal(network).first, QEX_OK);
+  }
+  network.mirrors[0].most_bytes = 13;
+  EXPECT_EQ(refusal(network),
+            std::pair(QEX_BAD_PARAM, std::string("mirror session 5: fewer than 14 bytes of a frame "
+                                                 "cannot be mirrored")));
 }
 
 TEST(Compiling, RefusesSessionsThatCannotBeToldApart) {
@@ -239,6 +269,8 @@ TEST(VlanMasks, AreAsFewAsTheyCanBe) {
   EXPECT_THAT(set({{1, 4094}}), ElementsAre(VlanMask{0, 0}));
   EXPECT_THAT(set({{1, 1}}), ElementsAre(VlanMask{0, 0xffe}));
   EXPECT_THAT(set({{4, 7}}), ElementsAre(VlanMask{4, 0xffc}));
+  EXPECT_THAT(masks_with_0_of(Vlans(0b11)), ElementsAre(VlanMask{0, 0xffe}));
+  EXPECT_THAT(masks_with_0_of(Vlans(0b10)), ElementsAre(VlanMask{1, 0xfff}));
   EXPECT_THAT(set({{3, 5}, {4094, 4094}}),
               ElementsAre(VlanMask{3, 0xfff}, VlanMask{4, 0xffe}, VlanMask{0xffe, 0xffe}));
 }
@@ -252,6 +284,28 @@ TEST(TheWays, AreOneWhereUplinksAndOrderAre) {
   EXPECT_NE(ways.of(network.ports[0]), ways.of(network.ports[1]));
   network.ports[2].team = std::nullopt;
   EXPECT_EQ(Ways(network).of(network.ports[2]), nullptr);
+}
+
+// More than the names of a policy are: those of a switch that names none.
+TEST(TheWays, OfManyUplinksAllHaveNumbersOfTheirOwn) {
+  auto network = with_ports(3000);
+  Team team{.balance = Balance::share, .in_use = {}, .standby = {}};
+  for (openflow::Port uplink = 10001; uplink <= 13000; ++uplink) {
+    network.uplinks.push_back({.port = uplink, .number = uplink});
+    team.in_use.push_back({uplink});
+  }
+  network.teams = {team, {.balance = Balance::first, .in_use = {{10001, 10002}}, .standby = {}}};
+  for (auto &port : network.ports) {
+    port.team = 0;
+  }
+  network.ports.push_back(access_port(1, 7));
+  network.ports.back().team = 1;
+  std::set<std::uint32_t> numbers;
+  for (auto const &way : Ways(network).all()) {
+    EXPECT_LT(way.number, kSendingGroups);
+    numbers.insert(way.number);
+  }
+  EXPECT_EQ(numbers.size(), 3001);
 }
 
 TEST(TheWays, SpreadPortsOverTheUplinksOfAGroup) {

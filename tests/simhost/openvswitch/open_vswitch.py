@@ -4,15 +4,53 @@ are made up, and gone with this process whatever becomes of it."""
 import json
 import os
 import socket
+import struct
 import subprocess
 import time
 from pathlib import Path
-from typing import Any, List, Mapping, Optional, Sequence
+from typing import Any, Dict, List, Mapping, Optional, Sequence
 
 SCHEMA = "/usr/share/openvswitch/vswitch.ovsschema"
 PATIENCE = 30.0
 # The tables that a switch fills by itself.
 LEARNED = (31, 32, 33, 34)
+
+
+class _Forgetting:
+    """A connection that makes a bridge forget what it learned, by OpenFlow 1.5 and at once."""
+
+    _VERSION = 6
+    _HELLO, _ECHO_REQUEST, _FLOW_MOD, _BARRIER_REQUEST, _BARRIER_REPLY = 0, 2, 14, 20, 21
+    _DELETE = 3
+    _ANY = 0xFFFFFFFF
+    _EMPTY_MATCH = struct.pack("!HHI", 1, 4, 0)
+
+    def __init__(self, path: Path) -> None:
+        self._socket = socket.socket(socket.AF_UNIX)
+        self._socket.settimeout(PATIENCE)
+        self._socket.connect(str(path))
+        self._stream = self._socket.makefile("rb")
+        self._send(self._HELLO)
+
+    def close(self) -> None:
+        self._stream.close()
+        self._socket.close()
+
+    def forget(self) -> None:
+        for table in LEARNED:
+            body = struct.pack("!QQBBHHH", 0, 0, table, self._DELETE, 0, 0, 0)
+            body += struct.pack("!IIIHH", self._ANY, self._ANY, self._ANY, 0, 0)
+            self._send(self._FLOW_MOD, body + self._EMPTY_MATCH)
+        self._send(self._BARRIER_REQUEST)
+        while True:
+            _, kind, length, _ = struct.unpack("!BBHI", self._stream.read(8))
+            self._stream.read(length - 8)
+            assert kind in (self._HELLO, self._ECHO_REQUEST, self._BARRIER_REPLY), kind
+            if kind == self._BARRIER_REPLY:
+                return
+
+    def _send(self, kind: int, body: bytes = b"") -> None:
+        self._socket.sendall(struct.pack("!BBHI", self._VERSION, kind, 8 + len(body), 0) + body)
 
 
 class OpenVSwitch:
@@ -24,6 +62,7 @@ class OpenVSwitch:
         for name in ("RUN", "LOG", "DB", "SYSCONF"):
             self._environment[f"OVS_{name}DIR"] = str(folder)
         self._processes: List["subprocess.Popen[bytes]"] = []
+        self._forgetting: Dict[str, _Forgetting] = {}
         self._database = f"unix:{folder}/db.sock"
         database = str(folder / "conf.db")
         subprocess.run(["ovsdb-tool", "create", database, SCHEMA], check=True)
@@ -43,6 +82,8 @@ class OpenVSwitch:
 
     def close(self) -> None:
         """Ends both processes."""
+        for connection in self._forgetting.values():
+            connection.close()
         for process in reversed(self._processes):
             process.kill()
             process.wait()
@@ -112,7 +153,9 @@ class OpenVSwitch:
         words = ["add-br", bridge, *self._settings(bridge)]
         for name, number in devices.items():
             words += ["--", "add-port", bridge, name]
+            # No device drops what the switch lets through.
             words += ["--", "set", "Interface", name, "type=dummy", f"ofport_request={number}"]
+            words += ["mtu_request=9190"]
             words += [f"options:tx_pcap={sent_to / name}"] if sent_to else []
         self._vsctl(*words)
 
@@ -134,6 +177,13 @@ class OpenVSwitch:
         lines += [f"group add {group}" for group in groups]
         lines += [f"flow add {flow}" for flow in flows]
         self._ofctl("bundle", bridge, "-", given="\n".join(lines) + "\n")
+
+    def forget(self, bridge: str) -> None:
+        """Makes a bridge forget what it learned, and its data path what came of it."""
+        if bridge not in self._forgetting:
+            self._forgetting[bridge] = _Forgetting(self._folder / f"{bridge}.mgmt")
+        self._forgetting[bridge].forget()
+        self.ask("revalidator/purge")
 
     def flows(self, bridge: str) -> List[str]:
         """What it has, but for what it learned; a line of text each, sorted."""

@@ -3,32 +3,78 @@ is told of them: where a frame must come out, and with which tags. Of a switch t
 nothing, all of whose links are up."""
 
 from collections import Counter
-from typing import Any, Counter as Counts, Dict, List, Mapping, Optional, Set, Tuple
+from dataclasses import dataclass
+from itertools import chain
+from typing import (
+    Any,
+    Counter as Counts,
+    Dict,
+    Iterable,
+    Iterator,
+    List,
+    Mapping,
+    Optional,
+    Sequence,
+    Set,
+    Tuple,
+)
 
-from frames import TAG, Copy, Frame, Tags
+from frames import TAG, TAG_TYPES, Copy, Frame, Tag, Tags
+
+# The tag of the VLAN that a frame is in, and those that are left.
+Entered = Tuple[Tag, Tags]
 
 GREATEST_VLAN = 4094
 LARGEST_TAGS = 2
 HEADER = 14
+# Of the place of an address that is known: past the uplinks.
+BEYOND = "beyond"
 
 
 def is_multicast(address: str) -> bool:
     return bool(int(address[:2], 16) & 1)
 
 
+@dataclass(frozen=True)
+class Inside:
+    """A frame while the tag of its VLAN is off, with the tags that are left."""
+
+    vlan: int
+    priority: int
+    rest: Tags
+    size: int
+
+    def cut(self, most: int, tags: Tags) -> Optional[int]:
+        """The length of a copy of so many bytes, without what was added to its tags; nothing if it
+        is whole."""
+        return most + TAG * (len(tags) - len(self.rest)) if 0 < most < self.size else None
+
+
 class Rules:
-    """A switch as a scenario document says it, with the numbers and the addresses of its ports."""
+    """A switch as a scenario document says it, with the numbers of its ports and their clients: the
+    address that is configured for one, and the one that was seen."""
 
     def __init__(
-        self, switch: Mapping[str, Any], numbers: Mapping[str, int], macs: Mapping[str, str]
+        self,
+        switch: Mapping[str, Any],
+        numbers: Mapping[str, int],
+        clients: Sequence[Mapping[str, Any]],
     ) -> None:
         self.switch = switch
         self.numbers = numbers
-        self.macs = macs
         self.uplinks: List[str] = list(switch.get("uplinks", []))
         self.ports: Dict[str, Mapping[str, Any]] = {
             port["id"]: port for port in switch.get("ports", [])
         }
+        self.macs: Dict[str, str] = {}
+        self.changed: Set[str] = set()
+        for client in clients:
+            seen = client.get("seen", client.get("mac"))
+            if seen is not None:
+                self.macs[client["port"]] = seen
+            if "mac" in client and seen != client["mac"]:
+                self.changed.add(client["port"])
+        self.connected = [client["port"] for client in clients]
 
     # VLANs
 
@@ -81,35 +127,31 @@ class Rules:
 
     # In
 
-    def enters(self, at: str, frame: Frame) -> Optional[Tuple[int, int, Tags]]:
-        """The VLAN and the priority of a frame, and the tags that are left."""
-        if self.switch.get("disabled"):
+    def enters(self, at: str, frame: Frame) -> Optional[Inside]:
+        """A frame as one of the switch's; nothing if it is none."""
+        if self.switch.get("disabled") or _is_malformed(frame):
             return None
-        if frame.destination.startswith("01:80:c2:00:00:0") or is_multicast(frame.source):
-            return None
-        if len(frame.tags) > LARGEST_TAGS or frame.source == "00:00:00:00:00:00":
-            return None
-        if frame.tags and frame.tags[0][0] > GREATEST_VLAN:
+        if frame.destination.startswith("01:80:c2:00:00:0"):
             return None
         if at in self.uplinks:
-            entered = (*frame.tags[0], frame.tags[1:]) if frame.tags else (0, 0, ())
+            entered: Optional[Entered] = ((frame.tags or ((0, 0),))[0], frame.tags[1:])
         else:
-            found = self._enters_port(at, frame)
-            if found is None:
-                return None
-            entered = found
+            entered = self._enters_port(at, frame)
+        if entered is None:
+            return None
+        (vlan, priority), rest = entered
         # The tag of its VLAN is no part of a packet, the next one is.
-        size = frame.size + TAG * len(entered[2])
-        if size > self.switch.get("mtu", 1500) + HEADER:
+        tags = TAG * len(rest)
+        too_large = frame.counted_size + tags > self.switch.get("mtu", 1500) + HEADER
+        if (rest and vlan == 0) or too_large:
             return None
-        return None if entered[2] and entered[0] == 0 else entered
+        return Inside(vlan, priority, rest, frame.size + tags)
 
-    def _enters_port(self, at: str, frame: Frame) -> Optional[Tuple[int, int, Tags]]:
-        port = self.ports[at]
+    def _enters_port(self, at: str, frame: Frame) -> Optional[Entered]:
         forged = at in self.macs and frame.source != self.macs[at]
-        if port.get("blocked") or (forged and "forged_transmits" in port.get("forbids", [])):
+        if not self._sends(at) or (forged and self._forbids(at, "forged_transmits")):
             return None
-        nested = port.get("nested_tag", False)
+        nested = self.ports[at].get("nested_tag", False)
         vid, incoming = frame.tags[0] if frame.tags else (0, 0)
         priority = self.vlans(at).get("priority", incoming)
         if vid == 0:
@@ -117,21 +159,42 @@ class Rules:
             rest = frame.tags[1:]
             if native is None or (rest and not nested):
                 return None
-            return native, priority, rest
+            return (native, priority), rest
         carried = self.carried(at)
         if carried is None:
             # The client's tag is the second one.
             allowed = nested and self.vlan(at) != 0 and len(frame.tags) == 1
-            return (self.vlan(at), priority, frame.tags) if allowed else None
+            return ((self.vlan(at), priority), frame.tags) if allowed else None
         if vid not in carried or (frame.tags[1:] and not nested):
             return None
-        return vid, priority, frame.tags[1:]
+        return (vid, priority), frame.tags[1:]
+
+    def _has_vlan(self, port: str) -> bool:
+        must_be_private = self.vlans(port).get("private", False)
+        return not must_be_private or self.private(self.vlan(port))[0] != "none"
+
+    def _forbids(self, port: str, what: str) -> bool:
+        return what in self.ports[port].get("forbids", [])
+
+    def _is_cut_off(self, port: str) -> bool:
+        """Whether nothing passes a port."""
+        management = self.ports[port].get("mac_learning")
+        may_change = management is None or management.get("mac_change", False)
+        forbidden = not may_change or self._forbids(port, "mac_changes")
+        return bool(self.ports[port].get("blocked") or (port in self.changed and forbidden))
+
+    def _sends(self, port: str) -> bool:
+        return not self._is_cut_off(port) and not self._is_destination(port, "no_input")
+
+    def _takes(self, port: str) -> bool:
+        return not self._is_cut_off(port) and not self._is_destination(port, "no_output")
 
     # Out
 
-    def leaves(self, port: str, vlan: int, priority: int, rest: Tags) -> Optional[Tags]:
+    def leaves(self, port: str, inside: Inside) -> Optional[Tags]:
         """The tags with which a port gets a frame; nothing if it does not."""
-        if self.ports[port].get("blocked") or (rest and not self.ports[port].get("nested_tag")):
+        vlan, priority, rest = inside.vlan, inside.priority, inside.rest
+        if not self._takes(port) or (rest and not self.ports[port].get("nested_tag")):
             return None
         carried = self.carried(port)
         if carried is None:
@@ -146,8 +209,11 @@ class Rules:
                 return ((candidate, priority), *rest)
         return None
 
-    def wire(self, vlan: int, priority: int, rest: Tags) -> Tags:
-        return ((vlan, priority), *rest) if vlan or priority else rest
+    @staticmethod
+    def wire(inside: Inside) -> Tags:
+        if inside.vlan == 0 and inside.priority == 0:
+            return inside.rest
+        return ((inside.vlan, inside.priority), *inside.rest)
 
     # Teams
 
@@ -171,12 +237,13 @@ class Rules:
             return uplink in uplinks
         return uplinks[:1] == [uplink]
 
-    # All of it
+    # What ports want
 
     def _takes_all(self, port: str) -> bool:
         said = self.ports[port]
         wanted = "promiscuous" in said.get("ethernet_filter", {}).get("frames", [])
-        return wanted and "promiscuous" not in said.get("forbids", [])
+        wanted = wanted or self._is_destination(port, "promiscuous")
+        return wanted and not self._forbids(port, "promiscuous")
 
     def _takes_unknown(self, port: str) -> bool:
         said = self.ports[port]
@@ -184,63 +251,137 @@ class Rules:
         floods = said.get("mac_learning", {}).get("flooding", False)
         return bool(sink or floods or self._takes_all(port))
 
-    def _owner(self, address: str, vlan: int) -> Optional[str]:
-        """The port whose client has an address."""
+    # Addresses
+
+    def _domains(self, port: str) -> Set[int]:
+        """The VLANs in which a client's address is known."""
+        carried = self.carried(port)
+        if carried is None:
+            return {self.private(self.vlan(port))[1]}
+        native = self.native(port)
+        vlans = carried - {0} | ({native} if native is not None else set())
+        return {self.private(vlan)[1] for vlan in vlans}
+
+    def _own(self) -> Iterator[Tuple[str, Set[int], str]]:
+        """Addresses of clients, with the VLANs in which they are known, and places."""
+        for port in self.ports:
+            if port in self.macs and self._has_vlan(port):
+                yield self.macs[port], self._domains(port), port
+
+    def _fixed(self) -> Iterator[Tuple[str, Set[int], str]]:
+        """Likewise those that stay where they are put."""
+        for port, said in self.ports.items():
+            for entry in said.get("addresses", []):
+                yield entry["mac"], {self.private(entry.get("vlan", 0))[1]}, port
+        for entry in self.switch.get("addresses", []):
+            yield entry["mac"], {self.private(entry.get("vlan", 0))[1]}, BEYOND
+
+    def _place(
+        self, address: str, vlan: int, known: Iterable[Tuple[str, Set[int], str]]
+    ) -> Optional[str]:
+        """The port at which an address is, or BEYOND."""
         domain = self.private(vlan)[1]
-        owners = [port for port, mac in self.macs.items() if mac == address and port in self.ports]
-        for port in owners:
-            if self.carried(port) is None and self.private(self.vlan(port))[1] == domain:
-                return port
-        for port in owners:
-            if self.carried(port) is not None:
-                return port
-        return None
+        places = (place for mac, domains, place in known if mac == address and domain in domains)
+        return next(places, None)
 
     def _is_back(self, frame: Frame, vlan: int) -> bool:
-        """Whether a frame from an uplink is one of this switch's."""
-        domain = self.private(vlan)[1]
-        for port, mac in self.macs.items():
-            if mac == frame.source and not self.ports[port].get("transmit_uplink"):
-                if self.carried(port) is not None:
-                    return True
-                if self.private(self.vlan(port))[1] == domain:
-                    return True
-        return False
+        """Whether a frame from an uplink is one of this switch: its address is here."""
+        moves = self.switch.get("mac_learning", {}).get("learn_static", False)
+        known = chain(() if moves else self._fixed(), self._own())
+        place = self._place(frame.source, vlan, known)
+        is_here = place is not None and place in self.connected
+        return is_here and not self.ports[str(place)].get("transmit_uplink")
 
     def _sent_by_wire(self, port: str, frame: Frame) -> bool:
         """Whether a frame from an uplink is one that a port had to send there."""
         by_wire_only = self.ports[port].get("transmit_uplink", False)
         return bool(by_wire_only and self.macs.get(port) == frame.source)
 
-    def comes_out(self, at: str, frame: Frame) -> Tuple[Counts[Copy], Set[str]]:
-        """What each port gets, and the uplinks of which one gets the frame; its tags there are
-        under the name "wire"."""
+    # Mirrors
+
+    def _sessions(self) -> Iterator[Mapping[str, Any]]:
+        for said in self.ports.values():
+            for session in said.get("mirror_sessions", []):
+                if not session.get("disabled"):
+                    yield session
+
+    def _is_destination(self, port: str, flag: str) -> bool:
+        return any(
+            session.get(flag) and {"port": port} in session["to"] for session in self._sessions()
+        )
+
+    def _mirrored(
+        self, direction: str, source: Mapping[str, Any], inside: Inside, at: str
+    ) -> Counts[Copy]:
+        """The copies of a frame that came in at `at`, for what mirrors that source."""
         out: Counts[Copy] = Counter()
-        entered = self.enters(at, frame)
-        if entered is None:
-            return out, set()
-        vlan, priority, rest = entered
+        for session in self._sessions():
+            if source not in session.get(direction, []):
+                continue
+            most = session.get("snap_length", 0)
+            for to in session["to"]:
+                place = to.get("port", to.get("uplink"))
+                tags = inside.rest
+                if "uplink" in to:
+                    tags = ((session.get("encapsulation", {}).get("vlan", 0), 0), *tags)
+                elif session.get("keeps_vlan") and inside.vlan:
+                    tags = ((inside.vlan, inside.priority), *tags)
+                # The switch sends nothing to where it came from.
+                reached = "uplink" in to or (
+                    place in self.connected and not self._is_cut_off(place)
+                )
+                if reached and place != at:
+                    out[(place, tags, inside.cut(most, tags))] += 1
+        return out
+
+    # All of it
+
+    def comes_out(self, at: str, frame: Frame) -> List[Counts[Copy]]:
+        """What comes out of a frame: one of these, for the uplink that carries it may be one of
+        several."""
+        inside = self.enters(at, frame)
         from_uplink = at in self.uplinks
-        if from_uplink and self._is_back(frame, vlan):
-            return out, set()
+        if inside is None or (from_uplink and self._is_back(frame, inside.vlan)):
+            return [Counter()]
+        direction, source = ("received_by", "uplink") if from_uplink else ("sent_by", "port")
+        out = self._mirrored(direction, {source: at}, inside, at)
+        out += self._mirrored(direction, {"vlan": inside.vlan}, inside, at)
         to_many = is_multicast(frame.destination)
-        owner = None if to_many else self._owner(frame.destination, vlan)
+        known = chain(self._fixed(), self._own())
+        place = None if to_many else self._place(frame.destination, inside.vlan, known)
         by_wire_only = not from_uplink and self.ports[at].get("transmit_uplink", False)
         for port in [] if by_wire_only else self.ports:
-            wanted = to_many or port == owner or self._takes_all(port)
-            wanted = wanted or (owner is None and self._takes_unknown(port))
-            if not wanted or port == at:
-                continue
-            if from_uplink and not self.receives_at(port, at, to_many or owner is None):
-                continue
-            if from_uplink and self._sent_by_wire(port, frame):
-                continue
-            tags = self.leaves(port, vlan, priority, rest)
-            if tags is not None:
-                out[(port, tags, None)] += 1
-        uplinks: Set[str] = set()
-        if not from_uplink and (by_wire_only or owner is None):
-            uplinks = set(self.uplinks_of(at))
-            if uplinks:
-                out[("wire", self.wire(vlan, priority, rest), None)] += 1
-        return out, uplinks
+            if self._is_for(port, at, frame, place):
+                tags = self.leaves(port, inside)
+                if tags is not None:
+                    out[(port, tags, None)] += 1
+                    out += self._mirrored("received_by", {"port": port}, inside, at)
+        uplinks = [] if from_uplink else self.uplinks_of(at)
+        if not uplinks or (place not in (None, BEYOND) and not by_wire_only):
+            return [out]
+        return [
+            out
+            + Counter({(uplink, self.wire(inside), None): 1})
+            + self._mirrored("sent_by", {"uplink": uplink}, inside, at)
+            for uplink in uplinks
+        ]
+
+    def _is_for(self, port: str, at: str, frame: Frame, place: Optional[str]) -> bool:
+        """Whether a port wants a frame, and is one for which it may come in there."""
+        to_many = is_multicast(frame.destination)
+        wanted = to_many or port == place or self._takes_all(port)
+        wanted = wanted or (place is None and self._takes_unknown(port))
+        if not wanted or port == at or port not in self.connected:
+            return False
+        if at not in self.uplinks:
+            return True
+        may_be_a_copy = to_many or place not in self.connected
+        return self.receives_at(port, at, may_be_a_copy) and not self._sent_by_wire(port, frame)
+
+
+def _is_malformed(frame: Frame) -> bool:
+    if is_multicast(frame.source) or frame.source == "00:00:00:00:00:00":
+        return True
+    if len(frame.tags) > LARGEST_TAGS or frame.type in TAG_TYPES:
+        return True
+    return bool(frame.tags and frame.tags[0][0] > GREATEST_VLAN)

@@ -164,6 +164,32 @@ def test_own_frames_do_not_come_back(clock: Clock, port: Any) -> None:
     assert reached(clock, "nic0", BROADCAST, A) == {"p1", "p2"}
 
 
+@pytest.mark.parametrize("aging", [0, 300])
+def test_nor_do_frames_from_addresses_that_are_not_the_client_s(bench: Bench, aging: int) -> None:
+    """Of a port that learns nothing; the other one would hear them twice, over its own uplink."""
+    other = {"teaming": {"balance": "explicit", "active": ["nic1"]}}
+    fixed = {"addresses": [{"mac": C, "type": "static"}], "mac_learning": {"aging_time": aging}}
+    load(bench, at_two_uplinks({}, other, **fixed), CLIENT, B)
+    for source in (A, C):
+        assert reached(bench, "p1", BROADCAST, source) == {"p2", "nic0"}
+        assert reached(bench, "nic1", BROADCAST, source) == set()
+
+
+def test_a_port_does_not_hear_what_it_had_to_send(bench: Bench) -> None:
+    load(bench, at_two_uplinks({"transmit_uplink": True}, {}), CLIENT, B)
+    for source in (CLIENT, A):
+        assert reached(bench, "p1", BROADCAST, source) == {"nic0"}
+        assert reached(bench, "nic0", BROADCAST, source) == {"p2"}
+
+
+def test_what_comes_back_over_the_only_uplink_teaches_nothing(bench: Bench) -> None:
+    switch = at_two_uplinks({**learner(), "transmit_uplink": True}, {})
+    load(bench, {**switch, "uplinks": ["nic0"], "teaming": {}}, CLIENT, B)
+    assert reached(bench, "p1", B, A) == {"nic0"}
+    assert reached(bench, "nic0", B, A) == {"p2"}
+    assert reached(bench, "p2", A, B) == {"p1"}
+
+
 def test_what_had_to_go_over_an_uplink_comes_back(bench: Bench) -> None:
     load(bench, at_two_uplinks({**learner(), "transmit_uplink": True}, {}), CLIENT, B)
     for source in (CLIENT, A):
@@ -187,6 +213,14 @@ def test_or_moves_where_the_switch_says_so(bench: Bench) -> None:
     assert reached(bench, "p3", CLIENT, C) == {"p2"}
     reached(bench, "p1", BROADCAST, CLIENT)
     assert reached(bench, "p3", CLIENT, C) == {"p1"}
+
+
+def test_one_of_a_port_without_a_device_is_nowhere(bench: Bench) -> None:
+    away = {"addresses": [{"mac": A, "type": "static"}]}
+    switch = at_two_uplinks({"mac_learning": {"flooding": True}}, {}, away)
+    bench.load(switch, [{"port": "p1"}, {"port": "p2"}])
+    for at in ("nic0", "p2"):
+        assert reached(bench, at, A, B) == set()
 
 
 def test_addresses_beyond_the_uplinks_can_be_fixed(bench: Bench) -> None:

@@ -44,10 +44,11 @@ def session(**said: Any) -> Dict[str, Any]:
 def test_two_sessions_at_once(bench: Bench) -> None:
     document, _ = read(Path(__file__).parent / "goldens" / "mirrors.txt")
     bench.load(document["switch"], document["clients"])
-    to_p3 = ("p3", ((7, 0),), 96)
+    # The tag is none of the 96 bytes.
+    cut, to_p3 = ("p3", ((7, 0),), 100), ("p3", ((7, 0),), None)
     remote = ("nic1", ((50, 0),), None)
     p1, p2, wire = ("p1", (), None), ("p2", (), None), ("nic0", ((7, 0),), None)
-    assert bench.look("p1", Frame(P2, P1)) == {to_p3: 1, p2: 1, remote: 1}
+    assert bench.look("p1", Frame(P2, P1, (), 200)) == {cut: 1, p2: 1, remote: 1}
     # What the uplink sends, and what p2 gets.
     assert bench.look("p1", Frame(BROADCAST, P1)) == {to_p3: 1, p2: 1, wire: 1, remote: 2}
     assert bench.look("p2", Frame(BROADCAST, P2)) == {p1: 1, wire: 1, remote: 1}
@@ -89,6 +90,25 @@ def test_what_an_uplink_sends(bench: Bench) -> None:
     assert bench.look("nic0", Frame(P1, STRANGER, ((7, 0),)))[copy] == 0
 
 
+def test_a_copy_is_cut_by_itself(bench: Bench) -> None:
+    """Whatever went out before, and with which tags."""
+    everywhere = {"to": [{"port": "p2"}, {"port": "p3"}], "sent_by": [{"uplink": "nic0"}]}
+    load(bench, session(snap_length=20, keeps_vlan=True, **everywhere))
+    out = bench.look("p1", Frame(STRANGER, P1))
+    cut = ((7, 0),), 24
+    assert out == {("p2", *cut): 1, ("p3", *cut): 1, ("nic0", ((7, 0),), None): 1}
+
+
+def test_one_that_nothing_passes_gets_no_copies(bench: Bench) -> None:
+    ports = [
+        {"id": "p1", "mirror_sessions": [session(sent_by=[{"port": "p1"}])]},
+        {"id": "p2"},
+        {"id": "p3", "blocked": True},
+    ]
+    bench.load({"ports": ports}, [{"port": port} for port in PORTS])
+    assert bench.look("p1", Frame(BROADCAST, P1)) == {("p2", (), None): 1}
+
+
 def test_what_is_dropped_is_not_copied(bench: Bench) -> None:
     load(bench, session(sent_by=[{"port": "p1"}]))
     assert bench.look("p1", Frame(BROADCAST, P1, ((9, 0),))) == {}
@@ -109,6 +129,8 @@ def test_a_session_that_stands_for_a_promiscuous_port(bench: Bench) -> None:
     assert bench.look("p1", Frame(P2, P1)) == {("p2", (), None): 1}
 
 
+OF_A_KIND = "mirrors clients of a kind, which are not told apart here"
+SOME_TRAFFIC = "mirrors some traffic of uplinks, which is not told apart here"
 WRAPS = "wraps what it mirrors, which is not done here"
 
 
@@ -120,6 +142,11 @@ WRAPS = "wraps what it mirrors, which is not done here"
         ({"to": [{"ip": "192.0.2.1"}]}, "mirrors to what is no port and no uplink"),
         ({"to": [{"vlan": 7}]}, "mirrors to what is no port and no uplink"),
         ({"sent_by": [{"ip": "192.0.2.1"}]}, "mirrors from an address"),
+        *(({"received_from": [kind]}, OF_A_KIND) for kind in ("vmm", "cos", "tcpip", "test")),
+        ({"sent_from": ["uplinks", "vmm"]}, OF_A_KIND),
+        ({"mirrors_uplinks": True}, SOME_TRAFFIC),
+        ({"uplink_filter": "normal"}, SOME_TRAFFIC),
+        ({"stack": True}, "mirrors on the side of the stack, which is not here"),
     ],
 )
 def test_what_is_not_mirrored_here_is_refused(

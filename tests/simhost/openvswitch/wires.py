@@ -3,14 +3,17 @@
 import time
 from collections import Counter
 from pathlib import Path
-from typing import Any, Counter as Counts, List, Mapping, Sequence, Tuple
+from typing import Any, Callable, Counter as Counts, Dict, List, Mapping, Optional, Sequence, Tuple
 
 from bench import Bench
 from compiler import Compiler
-from frames import Copy, Frame, from_bytes
+from frames import Frame, plain
 from open_vswitch import PATIENCE, OpenVSwitch
 from rules import Rules
 
+# A device and a frame that it sent.
+Arrived = Tuple[str, bytes]
+FENCE = Frame("02:00:00:00:00:fe", "02:00:00:00:00:ff")
 _FILE_HEADER = 24
 _FRAME_HEADER = 16
 
@@ -25,52 +28,59 @@ class Wires(Bench):
         super().__init__(open_vswitch, compiler, "wires", devices + 2, sent_to=folder)
         self._folder = folder
         self._devices = devices
-        self._last: Tuple[Mapping[str, Any], Sequence[Mapping[str, Any]]] = ({}, ())
-
-    def load(self, switch: Mapping[str, Any], clients: Sequence[Mapping[str, Any]]) -> Rules:
-        self._last = (switch, clients)
-        fence, end = self._devices + 1, self._devices + 2
+        self._seen: Dict[int, int] = {}
+        fence, end = devices + 1, devices + 2
         self.more_flows = [f"priority=65535,in_port={fence} actions=output:{end}"]
-        rules = super().load(switch, clients)
+
+    def load(
+        self,
+        switch: Mapping[str, Any],
+        clients: Sequence[Mapping[str, Any]],
+        change: Callable[[str], Optional[str]] = str,
+    ) -> Rules:
+        rules = super().load(switch, clients, change)
         # What the data path keeps of the flows before goes with them, but not at that moment.
         self.ask("revalidator/purge")
         return rules
 
     def forget(self) -> None:
         """Makes the switch one that has learned nothing."""
-        self.load(*self._last)
+        self._open_vswitch.forget(self._bridge)
 
-    def transmit(self, at: str, frame: Frame) -> "Counts[Copy]":
+    def transmit(self, at: str, data: bytes) -> "Counts[Arrived]":
         """What comes out where of a frame that comes in there."""
-        before = {name: self._sent(number) for name, number in self.devices.items()}
-        self._receive(self.devices[at], frame)
+        self._receive(self.devices[at], data)
         for _ in range(2):
             self._pass_fence()
-        found: Counts[Copy] = Counter()
-        for name, number in self.devices.items():
-            for sent in self._sent(number)[len(before[name]) :]:
-                found[(name, from_bytes(frame, sent), None)] += 1
-        return found
+        return Counter(
+            (name, plain(sent))
+            for name, number in self.devices.items()
+            for sent in self._newly_sent(number)
+        )
 
-    def _receive(self, number: int, frame: Frame) -> None:
-        self.ask("netdev-dummy/receive", f"wires{number}", frame.to_bytes().hex())
+    def _receive(self, number: int, data: bytes) -> None:
+        self.ask("netdev-dummy/receive", f"wires{number}", data.hex())
 
     def _pass_fence(self) -> None:
-        end = self._devices + 2
-        passed = len(self._sent(end))
-        self._receive(self._devices + 1, Frame("02:00:00:00:00:fe", "02:00:00:00:00:ff"))
+        self._receive(self._devices + 1, FENCE.to_bytes())
         deadline = time.monotonic() + PATIENCE
-        while len(self._sent(end)) == passed:
+        while not self._newly_sent(self._devices + 2):
             assert time.monotonic() < deadline, "no frame passes the bridge"
-            time.sleep(0.001)
+            time.sleep(0.0005)
 
-    def _sent(self, number: int) -> List[bytes]:
-        """All that a device has sent."""
-        data = (self._folder / f"wires{number}").read_bytes()
+    def _newly_sent(self, number: int) -> List[bytes]:
+        """What a device has sent since the last time."""
         frames = []
-        at = _FILE_HEADER
-        while at < len(data):
-            length = int.from_bytes(data[at + 8 : at + 12], "little")
-            frames.append(data[at + _FRAME_HEADER : at + _FRAME_HEADER + length])
-            at += _FRAME_HEADER + length
+        with open(self._folder / f"wires{number}", "rb") as capture:
+            at = self._seen.get(number, _FILE_HEADER)
+            capture.seek(at)
+            data = capture.read()
+        while len(data) >= _FRAME_HEADER:
+            end = _FRAME_HEADER + int.from_bytes(data[8:12], "little")
+            if len(data) < end:
+                break
+            frames.append(data[_FRAME_HEADER:end])
+            data = data[end:]
+            at += end
+        self._seen[number] = at
         return frames

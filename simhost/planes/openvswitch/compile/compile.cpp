@@ -38,6 +38,18 @@ void check_ports(Network const &network) {
   }
 }
 
+void check_slot(Slot const &slot, std::set<openflow::Port> const &uplinks) {
+  bool const all_there = std::all_of(slot.begin(), slot.end(),
+                                     [&](openflow::Port port) { return uplinks.contains(port); });
+  if (slot.empty() || !all_there) {
+    refuse(QEX_BAD_PARAM, "a team uses an uplink that the switch has not");
+  }
+  if (slot.size() > kMostInSlot) {
+    refuse(QEX_LIMIT_EXCEEDED, "a team aggregates " + std::to_string(slot.size()) +
+                                   " uplinks, more than " + std::to_string(kMostInSlot));
+  }
+}
+
 void check_teams(Network const &network) {
   std::set<openflow::Port> uplinks;
   for (auto const &uplink : network.uplinks) {
@@ -46,11 +58,7 @@ void check_teams(Network const &network) {
   for (auto const &team : network.teams) {
     for (auto const *slots : {&team.in_use, &team.standby}) {
       for (auto const &slot : *slots) {
-        bool const all_there = std::all_of(
-            slot.begin(), slot.end(), [&](openflow::Port port) { return uplinks.contains(port); });
-        if (slot.empty() || !all_there) {
-          refuse(QEX_BAD_PARAM, "a team uses an uplink that the switch has not");
-        }
+        check_slot(slot, uplinks);
       }
     }
   }

@@ -31,6 +31,8 @@ inline constexpr std::uint8_t kPrivateVlans = 5;
 inline constexpr std::uint8_t kOwnFrames = 6;
 /// Asks the sessions; a frame that has come this far is one of the switch's.
 inline constexpr std::uint8_t kMirroring = 7;
+/// Sources that an uplink should not have for a while; fills kRecentSources.
+inline constexpr std::uint8_t kRemembering = 25;
 /// Where an address is; writes kVerdict.
 inline constexpr std::uint8_t kLearning = 8;
 /// What becomes of frames from addresses past the limit of their port; reads and writes kVerdict.
@@ -105,7 +107,7 @@ inline constexpr auto kPrivateKind = openflow::Field::reg3;
 /// The VLAN under which addresses are known: the primary one of a private VLAN, else its own.
 inline constexpr auto kDomain = openflow::Field::reg4;
 inline constexpr auto kPriority = openflow::Field::reg5;
-/// The OpenFlow port of a client; 0 while the address is not known, kBeyond past the uplinks.
+/// The OpenFlow port of a client; 0 while the address is not known; kBeyond, kNowhere.
 inline constexpr auto kDestination = openflow::Field::reg6;
 /// The number of the way over which an uplink's frame comes; 0 for frames of clients.
 inline constexpr auto kWay = openflow::Field::reg7;
@@ -122,6 +124,8 @@ inline constexpr auto kSession = openflow::Field::reg12;
 inline constexpr auto kClientTag = openflow::Field::reg13;
 /// The OpenFlow port of a client or an uplink that is to get the frame; a list has many.
 inline constexpr auto kReceiver = openflow::Field::reg14;
+/// The OpenFlow port of a client whose frame went over an uplink and may have come back.
+inline constexpr auto kSender = openflow::Field::reg15;
 
 }  // namespace field
 
@@ -132,6 +136,8 @@ inline constexpr std::uint64_t kFromClient = 0;
 inline constexpr std::uint64_t kFromUplink = 1;
 /// In kDestination: no port has this number.
 inline constexpr openflow::Port kBeyond = 0xffff;
+/// Likewise: at a port without a device.
+inline constexpr openflow::Port kNowhere = 0xff00;
 /// The last that Open vSwitch gives a device.
 inline constexpr openflow::Port kGreatestPort = 0xfeff;
 

@@ -2,7 +2,9 @@
 #include "planes/openvswitch/compile/plan.h"
 
 #include <algorithm>
+#include <map>
 #include <set>
+#include <unordered_map>
 #include <utility>
 
 namespace simhost::openvswitch {
@@ -56,27 +58,62 @@ void Plan::note_private_vlans() {
   private_vlans_.assign(named.begin(), named.end());
 }
 
+bool Plan::frames_may_return() const {
+  auto const &uplinks = network.uplinks;
+  auto const &ports = network.ports;
+  return uplinks.size() > 1 ||
+         (!uplinks.empty() && std::any_of(ports.begin(), ports.end(), [](Port const &port) {
+           return port.transmits_by_uplink;
+         }));
+}
+
+Vlans Plan::domains_of(Port const &port) const {
+  Vlans domains;
+  auto const carried = carried_by(port.vlan);
+  for (std::size_t vlan = 0; vlan < carried.tagged.size(); ++vlan) {
+    if (carried.tagged[vlan] || vlan == carried.untagged) {
+      domains.set(kinds_[vlan].domain);
+    }
+  }
+  return domains;
+}
+
 void Plan::note_addresses() {
-  std::set<std::pair<EthernetAddress, std::optional<std::uint16_t>>> taken;
+  std::map<EthernetAddress, Vlans> all_taken;
   for (auto const &port : network.ports) {
     if (!port.address || !has_vlan(*this, port)) {
       continue;
     }
-    auto const domain =
-        port.vlan.carried ? std::nullopt : std::optional(kind_of(port.vlan.vlan).domain);
-    if (taken.insert({*port.address, domain}).second) {
-      own_addresses_.push_back({.port = &port, .address = *port.address, .domain = domain});
+    auto const add = [&](VlanMask const &domains) {
+      own_addresses_.push_back({.port = &port, .address = *port.address, .domains = domains});
+    };
+    auto &taken = all_taken[*port.address];
+    if (port.vlan.carried) {
+      auto const domains = domains_of(port) & ~taken;
+      std::ranges::for_each(masks_with_0_of(domains), add);
+      taken |= domains;
+    } else if (auto const domain = kind_of(port.vlan.vlan).domain; !taken[domain]) {
+      add({.vlan = domain, .mask = kWholeVlan});
+      taken.set(domain);
     }
   }
 }
 
 // Two private VLANs of one primary are one to addresses.
 void Plan::note_fixed_addresses() {
+  std::unordered_map<std::uint32_t, Port const *> ports;
+  for (auto const &port : network.ports) {
+    ports.emplace(port.number, &port);
+  }
   std::set<std::pair<EthernetAddress, std::uint16_t>> taken;
   for (auto const &fixed : network.fixed_addresses) {
     auto const domain = kind_of(fixed.vlan).domain;
     if (taken.insert({fixed.address, domain}).second) {
-      fixed_places_.push_back({.address = fixed.address, .domain = domain, .port = fixed.port});
+      auto const found = fixed.port ? ports.find(*fixed.port) : ports.end();
+      fixed_places_.push_back({.address = fixed.address,
+                               .domain = domain,
+                               .is_beyond = !fixed.port,
+                               .port = found == ports.end() ? nullptr : found->second});
     }
   }
 }
@@ -90,12 +127,16 @@ void Plan::note_lookups() {
   counted_ports_ = kMostLookups - std::min(taken, kMostLookups);
 }
 
+bool is_closed(Port const &port) {
+  return port.blocked || port.address_changed;
+}
+
 bool has_vlan(Plan const &plan, Port const &port) {
   return !port.vlan.must_be_private || plan.kind_of(port.vlan.vlan).kind != PrivateKind::none;
 }
 
 bool takes_frames(Plan const &plan, Port const &port) {
-  return !port.blocked && !port.address_changed && !port.mirrors_only && has_vlan(plan, port);
+  return !is_closed(port) && !port.mirrors_only && has_vlan(plan, port);
 }
 
 bool sends_frames(Port const &port) {

@@ -24,18 +24,20 @@ struct Carried {
   Vlans tagged;  ///< neither 0 nor `untagged` among them
 };
 
-/// The known address of a client. Of several ports with one address in one VLAN the first has it.
+/// The known address of a client in some of its VLANs. Of several ports with one address in one
+/// VLAN the first has it.
 struct OwnAddress {
   Port const *port;
   EthernetAddress address;
-  std::optional<std::uint16_t> domain;  ///< none: in all VLANs of the port
+  VlanMask domains;
 };
 
 /// Likewise an address that stays where it is put.
 struct FixedPlace {
   EthernetAddress address;
   std::uint16_t domain;
-  std::optional<std::uint32_t> port;  ///< as FixedAddress::port
+  bool is_beyond;    ///< the uplinks
+  Port const *port;  ///< null also for one without a device
 };
 
 class Plan {
@@ -51,20 +53,22 @@ class Plan {
   [[nodiscard]] std::vector<std::uint16_t> const &private_vlans() const { return private_vlans_; }
   [[nodiscard]] std::vector<OwnAddress> const &own_addresses() const { return own_addresses_; }
   [[nodiscard]] std::vector<FixedPlace> const &fixed_places() const { return fixed_places_; }
-  /// Whether a switch outside may send this one's frames back.
-  [[nodiscard]] bool frames_may_return() const { return network.uplinks.size() > 1; }
   /// Whether something of a port has to be looked at when a frame of its VLAN comes, in table
   /// kDelivery.
   [[nodiscard]] bool is_looked_at(Port const &port) const;
   /// Whether what is sent to a port is counted, in table kSending: a flood takes a lookup more for
   /// each such port, and a frame has so many.
   [[nodiscard]] bool counts_sent(Port const &port) const;
+  /// Whether a switch outside may send this one's frames back: over another uplink, or because
+  /// their receiver is here.
+  [[nodiscard]] bool frames_may_return() const;
   /// How long a learned address stays, in seconds; 0 for as long as nobody takes it.
   [[nodiscard]] std::uint16_t hard_timeout() const;
 
  private:
   void note_private_vlans();
   void note_addresses();
+  [[nodiscard]] Vlans domains_of(Port const &port) const;
   void note_fixed_addresses();
   void note_lookups();
   [[nodiscard]] std::size_t index_of(Port const &port) const {
@@ -79,6 +83,8 @@ class Plan {
   std::size_t counted_ports_ = 0;  // the first of them
 };
 
+/// Whether nothing passes a port.
+bool is_closed(Port const &port);
 /// Whether a port has a VLAN at all, and takes part in what happens there.
 bool has_vlan(Plan const &plan, Port const &port);
 bool takes_frames(Plan const &plan, Port const &port);

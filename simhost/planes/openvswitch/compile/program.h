@@ -58,6 +58,11 @@ inline openflow::SubField vlan_bits(openflow::Field field) {
   return {.field = field, .first = 0, .bits = kVlanBits};
 }
 
+/// In a flow that is learned: frames of the VLAN of the one that teaches.
+inline openflow::LearnedMatch in_domain() {
+  return {.field = vlan_bits(field::kDomain), .content = vlan_bits(field::kDomain)};
+}
+
 /// Frames that come in at a device.
 inline Match from(openflow::Port port) {
   return Match().with(openflow::Field::in_port, port);

@@ -1,6 +1,8 @@
 // Halves of halves, until one is full or empty.
 #include "planes/openvswitch/compile/vlan_masks.h"
 
+#include <algorithm>
+
 #include "base/vlan.h"
 
 namespace simhost::openvswitch {
@@ -8,47 +10,58 @@ namespace {
 
 constexpr unsigned kNumbers = 4096;
 
-bool is_vlan(unsigned number) {
-  return number != 0 && number <= kGreatestVlan;
-}
-
 struct Found {
   bool any = false;
   bool all = true;
 };
 
-Found look_at(Vlans const &vlans, unsigned first, unsigned count) {
-  Found found;
-  for (auto number = first; number < first + count; ++number) {
-    if (is_vlan(number)) {
-      found.any = found.any || vlans[number];
-      found.all = found.all && vlans[number];
-    }
+// Of a set, as far as somebody asks for its members.
+class Masks {
+ public:
+  Masks(Vlans const &vlans, unsigned first_asked_for) : vlans_(vlans), first_(first_asked_for) {
+    collect(0, kNumbers);
   }
-  return found;
-}
 
-// `count` is a power of 2.
-void collect(Vlans const &vlans, unsigned first, unsigned count, std::vector<VlanMask> &masks) {
-  auto const found = look_at(vlans, first, count);
-  if (!found.any) {
-    return;
+  std::vector<VlanMask> found;
+
+ private:
+  [[nodiscard]] Found look_at(unsigned first, unsigned count) const {
+    Found found;
+    for (auto number = std::max(first, first_);
+         number < std::min<unsigned>(first + count, kGreatestVlan + 1); ++number) {
+      found.any = found.any || vlans_[number];
+      found.all = found.all && vlans_[number];
+    }
+    return found;
   }
-  if (found.all) {
-    masks.push_back({.vlan = static_cast<std::uint16_t>(first),
-                     .mask = static_cast<std::uint16_t>(kNumbers - count)});
-    return;
+
+  // `count` is a power of 2.
+  void collect(unsigned first, unsigned count) {
+    auto const inside = look_at(first, count);
+    if (!inside.any) {
+      return;
+    }
+    if (inside.all) {
+      found.push_back({.vlan = static_cast<std::uint16_t>(first),
+                       .mask = static_cast<std::uint16_t>(kNumbers - count)});
+      return;
+    }
+    collect(first, count / 2);
+    collect(first + count / 2, count / 2);
   }
-  collect(vlans, first, count / 2, masks);
-  collect(vlans, first + count / 2, count / 2, masks);
-}
+
+  Vlans const &vlans_;
+  unsigned const first_;
+};
 
 }  // namespace
 
 std::vector<VlanMask> masks_of(Vlans const &vlans) {
-  std::vector<VlanMask> masks;
-  collect(vlans, 0, kNumbers, masks);
-  return masks;
+  return Masks(vlans, 1).found;
+}
+
+std::vector<VlanMask> masks_with_0_of(Vlans const &vlans) {
+  return Masks(vlans, 0).found;
 }
 
 }  // namespace simhost::openvswitch

@@ -4,13 +4,16 @@
 #include <algorithm>
 #include <utility>
 
+#include "planes/openvswitch/compile/pipeline.h"
+
 namespace simhost::openvswitch {
 namespace {
 
-// Of a slot.
-constexpr std::uint32_t kMostUplinks = 32;
-// Past the numbers of the ways of a switch's own team.
-constexpr std::uint32_t kOwnTeams = 0x10000;
+// Past the numbers of the ways of a switch's own team, which has as many slots as there are
+// devices.
+constexpr std::uint32_t kOwnTeams = 0x1000000;
+static_assert((kGreatestPort + 1) * kMostInSlot < kOwnTeams);
+static_assert(kOwnTeams + kGreatestPort < kSendingGroups);
 
 // Where a port begins: at a slot of those in use, and at an uplink of each slot.
 struct Begin {
@@ -52,7 +55,7 @@ std::vector<Slot> slots_of(Team const &team, Begin const &begin) {
 }
 
 std::uint32_t number_of(Port const &port, Begin const &begin) {
-  return port.team == 0 ? begin.slot * kMostUplinks + begin.uplink + 1 : kOwnTeams + port.port;
+  return port.team == 0 ? begin.slot * kMostInSlot + begin.uplink + 1 : kOwnTeams + port.port;
 }
 
 }  // namespace

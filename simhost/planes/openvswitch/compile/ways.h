@@ -25,6 +25,9 @@ struct Way {
   }
 };
 
+/// The uplinks of a slot: no more are ever aggregated.
+inline constexpr std::uint32_t kMostInSlot = 32;
+
 /// How a slot is known: its uplinks may be in another order elsewhere.
 openflow::Port name_of(Slot const &slot);
 

@@ -42,10 +42,7 @@ class Sessions {
   void add(std::uint32_t id, mirror::Session const &session) {
     auto const &record = session.record;
     name_ = text_in(record.sid);
-    auto const wraps = (record.flags & VS_DVMIRROR_FLAG_DST_ENCAP) != 0;
-    if (wraps || record.type == VS_DVMIRROR_SESSIONTYPE_ERMIRROR_SRC) {
-      refuse_session("wraps what it mirrors, which is not done here");
-    }
+    check(record);
     Mirror mirror;
     mirror.id = id;
     mirror.received = sources(session.received_by, record.wildIn);
@@ -57,6 +54,23 @@ class Sessions {
       add_destination(mirror, record.flags, entity);
     }
     network_.mirrors.push_back(std::move(mirror));
+  }
+
+  void check(DVMirrorSession const &record) const {
+    auto const wraps = (record.flags & VS_DVMIRROR_FLAG_DST_ENCAP) != 0;
+    if (wraps || record.type == VS_DVMIRROR_SESSIONTYPE_ERMIRROR_SRC) {
+      refuse_session("wraps what it mirrors, which is not done here");
+    }
+    if (((record.wildIn | record.wildOut) & ~VS_DVMIRROR_WILDCARD_PNIC) != 0) {
+      refuse_session("mirrors clients of a kind, which are not told apart here");
+    }
+    auto const by_flag = (record.flags & VS_DVMIRROR_FLAG_SRC_UPLINK_MIRROR) != 0;
+    if (by_flag || record.uplinkFilter != MIRROR_UPLINK_FILTER_NONE) {
+      refuse_session("mirrors some traffic of uplinks, which is not told apart here");
+    }
+    if (record.stack != 0) {
+      refuse_session("mirrors on the side of the stack, which is not here");
+    }
   }
 
   MirrorSources sources(std::vector<DVMirrorEntity> const &entities, std::uint32_t wild) {

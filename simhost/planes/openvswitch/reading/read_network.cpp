@@ -280,11 +280,8 @@ class Reader {
 
   void read_fixed_addresses() {
     for (auto const &[at, address] : storage::fixed_addresses(transaction_, key_)) {
-      bool const is_here =
-          !at || std::ranges::binary_search(network_.ports, static_cast<std::uint32_t>(*at), {},
-                                            &Port::number);
       // Virtual networks are none of this switch's.
-      if (is_here && address.name.vni == 0) {
+      if (address.name.vni == 0) {
         network_.fixed_addresses.push_back(
             {.address = address_of(address.name.mac),
              .vlan = address.name.vid,

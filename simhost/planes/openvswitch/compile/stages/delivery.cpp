@@ -36,6 +36,9 @@ class Delivery {
     if (!copies_.empty()) {
       add(400, to_port().with(Field::in_port, port_.port), {});
     }
+    if (port_.transmits_by_uplink) {
+      add(400, to_port().with(field::kSender, port_.port), {});
+    }
     if (port_.transmits_by_uplink && port_.address) {
       add(400,
           to_port()

@@ -11,11 +11,6 @@ namespace {
 
 using openflow::Field;
 
-// The frame's source, in its VLAN, as a destination.
-openflow::LearnedMatch in_domain() {
-  return {.field = vlan_bits(field::kDomain), .content = vlan_bits(field::kDomain)};
-}
-
 openflow::Action learn(Plan const &plan, std::uint32_t number, openflow::Port place,
                        std::uint32_t limit) {
   return openflow::Learn{
@@ -33,24 +28,6 @@ openflow::Action learn(Plan const &plan, std::uint32_t number, openflow::Port pl
                                       .content = openflow::Value{place}}}};
 }
 
-void remember_recent(Plan const &plan, Port const &port, Actions &actions) {
-  if (!plan.frames_may_return()) {
-    return;
-  }
-  auto const recent = port.transmits_by_uplink ? Recent::is_on_way : Recent::drops;
-  actions.emplace_back(openflow::Learn{
-      .table = table::kRecentSources,
-      .priority = 100,
-      .cookie = cookie(Counted::recent_source, port.number),
-      .hard_timeout = 1,
-      .deletes_learned = true,
-      .specs = {in_domain(),
-                openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
-                                       .content = openflow::whole(Field::eth_src)},
-                openflow::LearnedLoad{.destination = field::kRecent,
-                                      .content = static_cast<openflow::Value>(recent)}}});
-}
-
 void add(Program &program, std::uint16_t priority, Match const &match, Actions actions,
          std::uint32_t number) {
   program.add(table::kLearning, {.priority = priority,
@@ -66,10 +43,7 @@ void pass_over_fixed(Plan const &plan, Program &program) {
         own.port->number);
   }
   for (auto const &fixed : plan.fixed_places()) {
-    auto const match = Match()
-                           .with(Field::eth_src, openflow::to_value(fixed.address))
-                           .with(field::kDomain, fixed.domain);
-    add(program, 210, match, {go_to(table::kLookup)}, 0);
+    add(program, 210, with_address(Match(), Field::eth_src, fixed), {go_to(table::kLookup)}, 0);
   }
 }
 
@@ -112,7 +86,6 @@ void learn_at(Plan const &plan, Program &program, Port const &port) {
   if (may_have_some) {
     actions.push_back(learn(plan, port.number, port.port, port.learning->limit));
   }
-  remember_recent(plan, port, actions);
   actions.push_back(go_to(table::kLimits));
   add(program, 100, from(port.port), std::move(actions), port.number);
   judge(program, table::kLimits, port);
@@ -140,16 +113,8 @@ void learn_beyond(Plan const &plan, Program &program) {
 
 void learn_at_ports(Plan const &plan, Program &program) {
   for (auto const &port : plan.network.ports) {
-    if (!sends_frames(port)) {
-      continue;
-    }
-    if (port.learning) {
+    if (sends_frames(port) && port.learning) {
       learn_at(plan, program, port);
-    } else if (!port.address && plan.frames_may_return()) {
-      Actions actions;
-      remember_recent(plan, port, actions);
-      actions.push_back(go_to(table::kLookup));
-      add(program, 100, from(port.port), std::move(actions), port.number);
     }
   }
 }

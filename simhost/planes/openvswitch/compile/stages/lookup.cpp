@@ -37,18 +37,12 @@ void put(Program &program, std::uint16_t priority, Match match, openflow::Port p
                                        .cookie = cookie(Counted::port, number)});
 }
 
-void put(Plan const &plan, Program &program, FixedPlace const &fixed) {
-  auto const match = Match()
-                         .with(Field::eth_dst, openflow::to_value(fixed.address))
-                         .with(field::kDomain, fixed.domain);
-  if (!fixed.port) {
-    put(program, 300, match, kBeyond, 0);
-    return;
-  }
-  for (auto const &port : plan.network.ports) {
-    if (port.number == *fixed.port) {
-      put(program, 300, match, port.port, port.number);
-    }
+void put(Program &program, FixedPlace const &fixed) {
+  auto const match = with_address(Match(), Field::eth_dst, fixed);
+  if (fixed.port != nullptr) {
+    put(program, 300, match, fixed.port->port, fixed.port->number);
+  } else {
+    put(program, 300, match, fixed.is_beyond ? kBeyond : kNowhere, 0);
   }
 }
 
@@ -66,11 +60,10 @@ void compile_lookup(Plan const &plan, Program &program) {
     }
   }
   for (auto const &own : plan.own_addresses()) {
-    put(program, own.domain ? 200 : 100, with_address(Match(), Field::eth_dst, own), own.port->port,
-        own.port->number);
+    put(program, 200, with_address(Match(), Field::eth_dst, own), own.port->port, own.port->number);
   }
   for (auto const &fixed : plan.fixed_places()) {
-    put(plan, program, fixed);
+    put(program, fixed);
   }
 }
 

@@ -51,44 +51,76 @@ openflow::Action output(Mirror const &mirror, openflow::Port port) {
   return openflow::Output{.port = port};
 }
 
-Actions outputs(Mirror const &mirror, std::vector<openflow::Port> const &ports) {
+// What nothing passes gets no copies either.
+std::set<openflow::Port> closed_ones(Network const &network) {
+  std::set<openflow::Port> closed;
+  for (auto const &port : network.ports) {
+    if (is_closed(port)) {
+      closed.insert(port.port);
+    }
+  }
+  for (auto const &uplink : network.uplinks) {
+    if (uplink.blocked) {
+      closed.insert(uplink.port);
+    }
+  }
+  return closed;
+}
+
+Actions outputs(Mirror const &mirror, std::vector<openflow::Port> const &ports,
+                std::set<openflow::Port> const &closed) {
   Actions actions;
   for (auto const port : ports) {
-    actions.push_back(output(mirror, port));
+    if (!closed.contains(port)) {
+      actions.push_back(output(mirror, port));
+    }
   }
   return actions;
 }
 
-Actions to_uplinks(Mirror const &mirror) {
-  if (mirror.to_uplinks.empty()) {
-    return {};
-  }
+Actions without_tag(Mirror const & /*mirror*/, Actions const &output) {
+  return output;
+}
+Actions with_own_tag(Mirror const & /*mirror*/, Actions const &output) {
+  return with_tag(field::kVlan, output);
+}
+Actions with_remote_tag(Mirror const &mirror, Actions const &output) {
   Actions actions{openflow::PushVlan{},
                   openflow::set(Field::vlan_vid, openflow::kVlanPresent | mirror.remote_vlan)};
-  append(actions, outputs(mirror, mirror.to_uplinks)).emplace_back(openflow::PopVlan{});
+  append(actions, output).emplace_back(openflow::PopVlan{});
   return actions;
 }
 
-void copy_out(Program &program, Mirror const &mirror) {
-  auto const counted = cookie(Counted::mirrored, mirror.id);
-  auto const of_session = Match().with(field::kSession, mirror.id);
-  auto const remote = to_uplinks(mirror);
-  auto plain = outputs(mirror, mirror.to_ports);
-  if (mirror.keeps_vlan && !plain.empty()) {
-    auto tagged = with_tag(field::kVlan, plain);
-    program.add(table::kMirrors, {.priority = 100,
-                                  .match = of_session,
-                                  .actions = append(tagged, remote),
-                                  .cookie = counted});
-    program.add(table::kMirrors, {.priority = 200,
-                                  .match = Match(of_session).with(field::kVlan, 0),
-                                  .actions = append(plain, remote),
-                                  .cookie = counted});
+// A frame is cut as it is when the tags that it had elsewhere are really gone, and before it has
+// those of the copy: at the beginning of a clone.
+Actions copies_to(Mirror const &mirror, Actions const &outputs,
+                  Actions (*tagged)(Mirror const &, Actions const &)) {
+  if (mirror.most_bytes == 0) {
+    return outputs.empty() ? Actions{} : tagged(mirror, outputs);
+  }
+  Actions actions;
+  for (auto const &output : outputs) {
+    actions.emplace_back(openflow::Clone{tagged(mirror, {output})});
+  }
+  return actions;
+}
+
+void copy_out(Program &program, Mirror const &mirror, std::set<openflow::Port> const &closed) {
+  auto const to_ports = outputs(mirror, mirror.to_ports, closed);
+  auto const to_uplinks = outputs(mirror, mirror.to_uplinks, closed);
+  auto add = [&](std::uint16_t priority, Match const &match, auto *tagged) {
+    auto actions = copies_to(mirror, to_ports, tagged);
+    append(actions, copies_to(mirror, to_uplinks, with_remote_tag));
+    program.add(table::kMirrors, {.priority = priority,
+                                  .match = Match(match).with(field::kSession, mirror.id),
+                                  .actions = std::move(actions),
+                                  .cookie = cookie(Counted::mirrored, mirror.id)});
+  };
+  if (mirror.keeps_vlan) {
+    add(100, Match(), with_own_tag);
+    add(200, Match().with(field::kVlan, 0), without_tag);
   } else {
-    program.add(table::kMirrors, {.priority = 100,
-                                  .match = of_session,
-                                  .actions = append(plain, remote),
-                                  .cookie = counted});
+    add(100, Match(), without_tag);
   }
 }
 
@@ -99,12 +131,13 @@ void compile_mirrors(Plan const &plan, Program &program) {
   if (!plan.network.mirrors.empty()) {
     mirroring = {go_to(table::kMirrorsOfPorts), go_to(table::kMirrorsOfVlans)};
   }
-  mirroring.push_back(go_to(table::kLearning));
+  mirroring.push_back(go_to(table::kRemembering));
   program.add(table::kMirroring, {.actions = mirroring});
   copy_by_port(plan, program);
   copy_by_vlan(plan, program);
+  auto const closed = closed_ones(plan.network);
   for (auto const &mirror : plan.network.mirrors) {
-    copy_out(program, mirror);
+    copy_out(program, mirror, closed);
   }
 }
 

@@ -1,4 +1,4 @@
-// Matches with the known addresses of clients.
+// Matches with addresses that are known.
 #pragma once
 
 #include "planes/openvswitch/compile/plan.h"
@@ -10,10 +10,13 @@ namespace simhost::openvswitch {
 /// known in.
 inline Match with_address(Match match, openflow::Field field, OwnAddress const &own) {
   match.with(field, openflow::to_value(own.address));
-  if (own.domain) {
-    match.with(field::kDomain, *own.domain);
+  if (own.domains.mask == kWholeVlan) {
+    return match.with(field::kDomain, own.domains.vlan);
   }
-  return match;
+  return match.with(field::kDomain, own.domains.vlan, own.domains.mask);
+}
+inline Match with_address(Match match, openflow::Field field, FixedPlace const &fixed) {
+  return match.with(field, openflow::to_value(fixed.address)).with(field::kDomain, fixed.domain);
 }
 
 }  // namespace simhost::openvswitch

@@ -1,5 +1,5 @@
-// Frames of this switch that the network sends back, over another uplink than they took: a client's
-// own address does not come from outside. Of addresses that are learned, or not known, the last
+// Frames of this switch that the network sends back, over another uplink than they took: an address
+// that is here does not come from outside. Of addresses that are learned, or not known, the last
 // second or two count, so that a client that moved to another host is soon heard there.
 #include "planes/openvswitch/compile/stages/own_addresses.h"
 #include "planes/openvswitch/compile/stages/stages.h"
@@ -13,34 +13,100 @@ Match from_uplink() {
   return Match().with(field::kOrigin, kFromUplink);
 }
 
-void drop_known(Program &program, OwnAddress const &own) {
-  program.add(table::kOwnFrames, {.priority = 200,
-                                  .match = with_address(from_uplink(), Field::eth_src, own),
+// What goes out although its receiver is here has to come back.
+bool never_returns(Port const &port) {
+  return !port.transmits_by_uplink;
+}
+
+void drop_own(Program &program, std::uint16_t priority, Match const &match, Port const &port) {
+  program.add(table::kOwnFrames, {.priority = priority,
+                                  .match = match,
                                   .actions = drop(),
-                                  .cookie = cookie(Counted::own_frame, own.port->number)});
+                                  .cookie = cookie(Counted::own_frame, port.number)});
+}
+
+void drop_known(Plan const &plan, Program &program, Actions const &others) {
+  for (auto const &own : plan.own_addresses()) {
+    if (never_returns(*own.port)) {
+      drop_own(program, 200, with_address(from_uplink(), Field::eth_src, own), *own.port);
+    }
+  }
+  if (plan.network.addresses.fixed_ones_move) {
+    return;
+  }
+  for (auto const &fixed : plan.fixed_places()) {
+    auto const match = with_address(from_uplink(), Field::eth_src, fixed);
+    if (fixed.port != nullptr && never_returns(*fixed.port)) {
+      drop_own(program, 210, match, *fixed.port);
+    } else {
+      program.add(table::kOwnFrames, {.priority = 210, .match = match, .actions = others});
+    }
+  }
+}
+
+openflow::Action remember(Port const &port) {
+  auto const recent = port.transmits_by_uplink ? Recent::is_on_way : Recent::drops;
+  openflow::Learn learn{
+      .table = table::kRecentSources,
+      .priority = 100,
+      .cookie = cookie(Counted::recent_source, port.number),
+      .hard_timeout = 1,
+      .deletes_learned = true,
+      .specs = {in_domain(),
+                openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
+                                       .content = openflow::whole(Field::eth_src)},
+                openflow::LearnedLoad{.destination = field::kRecent,
+                                      .content = static_cast<openflow::Value>(recent)}}};
+  if (port.transmits_by_uplink) {
+    learn.specs.emplace_back(
+        openflow::LearnedLoad{.destination = openflow::part(field::kSender, 0, 15),
+                              .content = openflow::Value{port.port}});
+  }
+  return learn;
+}
+
+// Of a port that sends from its known address only, nothing has to be remembered.
+bool is_remembered(Port const &port) {
+  return sends_frames(port) && (port.transmits_by_uplink || port.may_forge || !port.address);
+}
+
+void remember_at_ports(Plan const &plan, Program &program) {
+  for (auto const &port : plan.network.ports) {
+    if (is_remembered(port)) {
+      program.add(table::kRemembering, {.priority = 100,
+                                        .match = from(port.port),
+                                        .actions = {remember(port), go_to(table::kLearning)},
+                                        .cookie = cookie(Counted::port, port.number)});
+    }
+  }
+  for (auto const &own : plan.own_addresses()) {
+    if (never_returns(*own.port)) {
+      program.add(table::kRemembering,
+                  {.priority = 200,
+                   .match = with_address(from(own.port->port), Field::eth_src, own),
+                   .actions = {go_to(table::kLearning)},
+                   .cookie = cookie(Counted::port, own.port->number)});
+    }
+  }
 }
 
 }  // namespace
 
 void compile_own_frames(Plan const &plan, Program &program) {
-  for (auto const &own : plan.own_addresses()) {
-    // What goes out although its receiver is here has to come back.
-    if (!own.port->transmits_by_uplink) {
-      drop_known(program, own);
-    }
-  }
+  Actions others{go_to(table::kMirroring)};
   if (plan.frames_may_return()) {
-    program.add(table::kOwnFrames,
-                {.priority = 100,
-                 .match = from_uplink(),
-                 .actions = {go_to(table::kRecentSources), go_to(table::kMirroring)}});
+    others.insert(others.begin(), go_to(table::kRecentSources));
+    program.add(table::kOwnFrames, {.priority = 100, .match = from_uplink(), .actions = others});
     program.add(table::kMirroring, {.priority = 200,
                                     .match = with_bits(Match(), field::kRecent,
                                                        static_cast<openflow::Value>(Recent::drops)),
                                     .actions = drop(),
                                     .cookie = cookie(Counted::own_frame)});
+    remember_at_ports(plan, program);
   }
+  drop_known(plan, program, others);
   program.add(table::kOwnFrames, {.actions = {go_to(table::kMirroring)}});
+  program.add(table::kRemembering, {.actions = {go_to(table::kLearning)}});
 }
 
 }  // namespace simhost::openvswitch

@@ -51,7 +51,10 @@ void receive_at(Plan const &plan, Program &program, Uplink const &uplink) {
   };
   if (known != copied) {
     add(200, to_many(at), copied);
-    add(200, Match(at).with(field::kDestination, 0), copied);
+    // The network may not know it either.
+    for (auto const nobody_here : {openflow::Port{0}, kBeyond, kNowhere}) {
+      add(200, Match(at).with(field::kDestination, nobody_here), copied);
+    }
   }
   add(100, at, known);
 }
