@@ -8,8 +8,9 @@
 #
 #   --minutes N   how long; 20 by default. The sweep of wrong values runs once, with a million calls
 #                 of every kind in the same memory, or fewer if there is less time; fuzzers,
-#                 sequences of calls, replays of such, without frames and with them, clones of random
-#                 hosts, killed processes and random pairs of values share what is left
+#                 frames of any content at random switches, sequences of calls, replays of such,
+#                 without frames and with them, clones of random hosts, killed processes and random
+#                 pairs of values share what is left
 #   --seed N      what chance chose in an earlier run, which printed its seed
 #   --no-frames   without replays over real frames, where network namespaces cannot be made
 #

@@ -5,8 +5,8 @@
 
 First what has an end: every batch of the sweep, then a million calls of every kind and a million
 traps of each call, fewer in less than twenty minutes. What has none shares the time that is left:
-fuzzers, sequences, replays of such, clones of random hosts, killed processes and random pairs of
-values.
+fuzzers, real frames at random switches, sequences, replays of such, clones of random hosts, killed
+processes and random pairs of values.
 """
 
 import argparse
@@ -34,7 +34,8 @@ ROUNDS = 20
 
 SHARES = {
     "fuzzing": 0.35,
-    "sequences": 0.15,
+    "frames": 0.05,
+    "sequences": 0.1,
     "replays": 0.1,
     "clones": 0.05,
     "kills": 0.1,
@@ -127,6 +128,8 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
     yield Part("damaged states", "states", states, share)
     for name in fuzzing.NAMES:
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
+    sent = partial(by_chance, "simhost/openvswitch/frames_by_chance.py", seed)
+    yield Part("frames of any content", "frames", sent, SHARES["frames"])
     sequences = partial(by_chance, "sequences/sequences.py", seed)
     yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
     replays = [("sequences", "recorded_sequences"), ("clones", "recorded_clones")]
