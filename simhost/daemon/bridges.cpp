@@ -309,6 +309,19 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::set<std::strin
   return count_without_markers(difference);
 }
 
+bool Bridges::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) {
+  auto const found = bridges_.find(key);
+  if (found == bridges_.end()) {
+    return false;
+  }
+  auto &connection = found->second->connection;
+  for (auto const &frame : frames) {
+    connection.send(frame);
+  }
+  connection.barrier(soon());
+  return true;
+}
+
 std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
   std::vector<Learned> all;
   auto const found = bridges_.find(key);

@@ -56,6 +56,8 @@ class Bridges {
   /// Makes everything as it is wanted, and returns when it is in force. Returns how many flows and
   /// groups it changed, markers not counted.
   std::size_t apply(Wanted const &wanted);
+  /// Sends frames from the bridge of a switch; returns whether there is one.
+  bool send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
   /// What the bridge of a switch has learned.
   std::vector<Learned> learned(storage::SwitchKey key);
 

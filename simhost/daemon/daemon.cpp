@@ -13,6 +13,7 @@
 #include "daemon/only_one.h"
 #include "daemon/wanted.h"
 #include "model/plane.h"
+#include "planes/stored/counters.h"
 #include "planes/stored/stored_plane.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
@@ -37,6 +38,17 @@ storage::Store opened(std::filesystem::path const &state) {
   return {state, populate_fresh_host};
 }
 
+void count_announced(storage::ChangingTransaction &transaction, storage::SwitchKey key,
+                     std::uint64_t sent) {
+  if (!storage::find_switch(transaction, key)) {
+    return;  // gone meanwhile
+  }
+  CounterOwner const owner{.switch_key = key};
+  stored::add_to_counter(transaction, owner, counter_in(&VSRARPStats::rarpPktsSent), sent);
+  stored::set_counter(transaction, owner, counter_in(&VSRARPStats::rarpTime),
+                      static_cast<std::uint64_t>(clock_now(transaction).count()));
+}
+
 }  // namespace
 
 Daemon::Daemon(events::Loop &loop, Options options, Say say)
@@ -50,7 +62,8 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       state_watch_(loop, store_, options_.state, [this] { look_at_commits(); }),
       devices_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state),
-              [this](Json const &question, Reply const &reply) { handle(question, reply); }) {
+              [this](Json const &question, Reply const &reply) { handle(question, reply); }),
+      announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }) {
   storage::ChangingTransaction transaction(store_);
   storage::take_frames(transaction);
   transaction.commit();
@@ -186,7 +199,26 @@ void Daemon::sync() {
   if (changed > 0) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
+  announcer_.follow(all, memory_);
   settle(all);
+}
+
+// From a timer, too, so that nothing is thrown.
+void Daemon::announce(storage::SwitchKey key,
+                      std::vector<openvswitch::Announced> const &clients) try {
+  std::vector<openflow::PacketOut> frames;
+  frames.reserve(clients.size());
+  for (auto const &client : clients) {
+    frames.push_back(openvswitch::announcement(client));
+  }
+  if (bridges_ && bridges_->send(key, frames)) {
+    storage::ChangingTransaction transaction(store_);
+    count_announced(transaction, key, clients.size());
+    transaction.commit();
+  }
+} catch (std::runtime_error const &error) {
+  troubles_.add(error.what());
+  connect_later();
 }
 
 void Daemon::settle(Wanted const &wanted) {

@@ -10,6 +10,7 @@
 #include <optional>
 #include <string>
 
+#include "daemon/announcer.h"
 #include "daemon/bridges.h"
 #include "daemon/network_devices.h"
 #include "daemon/server.h"
@@ -41,6 +42,7 @@ class Daemon {
   void connect_later();
   void mend_soon();
   void look_at_commits();
+  void announce(storage::SwitchKey key, std::vector<openvswitch::Announced> const &clients);
   void sync_soon();
   void sync_after(std::optional<ClockTime> const &wait);
   void sync();
@@ -66,6 +68,7 @@ class Daemon {
   NetworkDevices devices_;
   Server server_;
   Memory memory_;
+  Announcer announcer_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
   std::optional<std::int64_t> commits_;          // to the state, at the last look

@@ -1,4 +1,4 @@
-// The plane without frames keeps the links, whoever they are told by.
+// Teams follow what is kept of the links, and who is moved by that is announced when frames go so.
 #include "daemon/links.h"
 
 #include <fmt/format.h>
@@ -6,7 +6,7 @@
 #include <system_error>
 #include <vector>
 
-#include "planes/stored/stored_plane.h"
+#include "model/teaming/team.h"
 #include "storage/running/devices.h"
 #include "storage/running/links.h"
 
@@ -90,7 +90,7 @@ bool links_differ(storage::Transaction &transaction, NetworkDevices const &devic
 
 void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices) {
   for (auto const &[uplink, link] : changed_links(transaction, devices)) {
-    stored::plane().find_wires()->change_link(transaction, uplink, link);
+    teaming::set_link(transaction, uplink, link);
   }
 }
 

@@ -42,6 +42,18 @@ void Memory::follow_devices(storage::SwitchKey key,
   }
 }
 
+std::vector<Flow> Memory::learned_at(storage::SwitchKey key, std::uint32_t port) const {
+  std::vector<Flow> learned;
+  if (auto const found = bridges_.find(key); found != bridges_.end()) {
+    for (auto const &[place, flow] : found->second.flows) {
+      if (port_in(flow.cookie) == port) {
+        learned.push_back(flow);
+      }
+    }
+  }
+  return learned;
+}
+
 std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted) const {
   std::vector<Flow> recalled;
   auto const found = bridges_.find(key);

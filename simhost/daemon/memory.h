@@ -22,6 +22,9 @@ class Memory {
   /// The devices of a bridge, with the numbers of their ports. What was learned at a port that has
   /// another device than before is forgotten.
   void follow_devices(storage::SwitchKey key, std::map<std::string, std::uint32_t> const &devices);
+  /// What was learned at a port of a bridge.
+  [[nodiscard]] std::vector<openflow::Flow> learned_at(storage::SwitchKey key,
+                                                       std::uint32_t port) const;
   /// What a bridge that is to have these flows knows once more.
   [[nodiscard]] std::vector<openflow::Flow> recall(storage::SwitchKey key,
                                                    std::span<openflow::Flow const> wanted) const;

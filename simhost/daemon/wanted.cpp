@@ -6,8 +6,13 @@
 #include <algorithm>
 
 #include "base/outcomes.h"
+#include "model/options/runtime_options.h"
+#include "model/properties/properties.h"
+#include "model/teaming/properties.h"
 #include "model/teaming/team.h"
 #include "planes/openvswitch/compile/pipeline.h"
+#include "planes/openvswitch/compile/plan.h"
+#include "planes/openvswitch/compile/ways.h"
 #include "planes/openvswitch/reading/read_network.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
@@ -39,6 +44,50 @@ teaming::Team team_with_devices(storage::Transaction &transaction, storage::Swit
       });
 }
 
+bool notifies(VSTeamPolicy const &policy) {
+  return (policy.flags & TEAM_FRP_FLAG_NOTIFY_SWITCH) != 0;
+}
+
+// The uplinks that may carry a frame of a port: where a team looks into frames, any in use.
+std::vector<openflow::Port> uplinks_of(openvswitch::Way const *way) {
+  if (way == nullptr) {
+    return {};
+  }
+  if (!way->spreads_frames()) {
+    return {way->slots.front().front()};
+  }
+  std::vector<openflow::Port> all;
+  for (auto const &slot : way->slots) {
+    all.insert(all.end(), slot.begin(), slot.end());
+  }
+  return all;
+}
+
+void add_carried(storage::Transaction &transaction, openvswitch::Network const &network,
+                 VSTeamPolicy const &shared, WantedBridge &bridge) {
+  std::map<std::uint32_t, bool> own;
+  for (auto const &[port, bytes] : list_stored_at_ports(transaction, teaming::policy, bridge.key)) {
+    own[static_cast<std::uint32_t>(port)] = notifies(Codec<VSTeamPolicy>::value(bytes));
+  }
+  openvswitch::Ways const ways(network);
+  std::map<std::uint32_t, std::string> devices;
+  for (auto const &[device, number] : bridge.ports) {
+    devices[number] = device;
+  }
+  for (auto const &port : network.ports) {
+    auto const set = own.find(port.number);
+    bridge.carried.push_back(
+        {.number = port.number,
+         .device = devices[port.number],
+         .uplinks = uplinks_of(openvswitch::sends_frames(port) ? ways.of(port) : nullptr),
+         .is_announced = set == own.end() ? notifies(shared) : set->second,
+         .client = {.port = port.port,
+                    .number = port.number,
+                    .address = port.address.value_or(openflow::EthernetAddress{}),
+                    .vlan = port.vlan.vlan}});
+  }
+}
+
 void shorten(std::optional<ClockTime> &lasts, std::optional<ClockTime> const &other) {
   if (other) {
     lasts = std::min(lasts.value_or(*other), *other);
@@ -66,6 +115,10 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                  std::string const &datapath, IsThere const &is_there) {
   Wanted wanted;
   wanted.change = storage::frames_change(transaction).value_or(0);
+  wanted.most_announced =
+      static_cast<std::uint32_t>(runtime_number(transaction, VS_RT_OPT_MAX_RARPS_PER_INTERVAL));
+  wanted.announced_for =
+      std::chrono::seconds(runtime_number(transaction, VS_RT_OPT_RARP_ADVERTISEMENT_DURATION));
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     WantedBridge bridge{.key = key,
                         .alias = row.alias,
@@ -78,7 +131,9 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
     }
     try {
       auto const team = team_with_devices(transaction, key);
-      bridge.compiled = openvswitch::compile(openvswitch::read_network(transaction, key, team, {}));
+      auto const network = openvswitch::read_network(transaction, key, team, {});
+      bridge.compiled = openvswitch::compile(network);
+      add_carried(transaction, network, team.policy, bridge);
       std::erase_if(bridge.row.devices,
                     [&](auto const &device) { return !is_there(device.first); });
       bridge.row.limits = {

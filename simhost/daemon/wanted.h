@@ -1,6 +1,7 @@
 // What a state wants of an Open vSwitch: a bridge for each switch that runs and has a device.
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <functional>
 #include <map>
@@ -10,11 +11,23 @@
 #include <vector>
 
 #include "clock/clock.h"
+#include "planes/openvswitch/compile/announcement.h"
 #include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/rows/rows.h"
 #include "storage/ports.h"
 
 namespace simhost::daemon {
+
+/// How what a client sends leaves a bridge, as far as others have to be told of it.
+struct Carried {
+  std::uint32_t number;                 ///< of its port of the switch
+  std::string device;                   ///< of the port
+  std::vector<openflow::Port> uplinks;  ///< none: it reaches nobody beyond
+  bool is_announced;                    ///< when that changes
+  openvswitch::Announced client;        ///< with its address if that is known, else zero
+
+  [[nodiscard]] bool has_address() const { return client.address != openflow::EthernetAddress{}; }
+};
 
 struct WantedBridge {
   storage::SwitchKey key;
@@ -22,6 +35,7 @@ struct WantedBridge {
   openvswitch::BridgeRow row;
   std::map<std::string, std::uint32_t> ports;  ///< the numbers of those that devices are at
   openvswitch::Compiled compiled;              ///< with the marker of the change
+  std::vector<Carried> carried = {};
 };
 
 /// A switch that cannot be run as it is, and why. Its bridge goes on as it was.
@@ -37,6 +51,9 @@ struct Wanted {
   std::vector<WantedBridge> bridges;
   std::vector<Unfit> unfit;
   std::uint32_t most_tags = 0;
+  /// How many moves of a switch are announced in a second, and for how long one is tried.
+  std::uint32_t most_announced = 0;
+  std::chrono::seconds announced_for{};
   /// When something else is wanted although nobody changes anything.
   std::optional<ClockTime> lasts = std::nullopt;
 };

@@ -12,6 +12,7 @@
 #include "model/ports/properties.h"
 #include "model/properties/properties.h"
 #include "model/teaming/properties.h"
+#include "storage/store.h"
 
 namespace simhost::teaming {
 namespace {
@@ -110,6 +111,14 @@ Named named_by(Team const &team, VSTeamPolicy const &policy) {
 }
 
 }  // namespace
+
+void set_link(storage::ChangingTransaction &transaction, std::string_view uplink,
+              Link const &link) {
+  auto const before = storage::find_link(transaction, uplink).value_or(Link{});
+  auto changed = link;
+  changed.up_since = link.up() && !before.up() ? clock_now(transaction) : before.up_since;
+  storage::put_link(transaction, uplink, changed);
+}
 
 Team team_of(storage::Transaction &transaction, storage::SwitchKey key, LinkOf const &link_of) {
   Team team{.uplinks = {},

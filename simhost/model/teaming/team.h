@@ -23,6 +23,10 @@ inline bool would_aggregate(Link const &link) {
   return link.up() && link.partner;
 }
 
+/// Changes a link; its up_since is kept by the clock, whatever `link` says.
+SIMHOST_API void set_link(storage::ChangingTransaction &transaction, std::string_view uplink,
+                          Link const &link);
+
 struct TeamUplink {
   std::string name;
   std::string port;        ///< name of the uplink port it is at,

@@ -9,7 +9,6 @@ namespace simhost::stored {
 
 Link link_of(storage::Transaction &transaction, std::string_view uplink);
 /// Changes a link. Its up_since is kept by the clock, whatever `link` says.
-void set_link(storage::ChangingTransaction &transaction, std::string_view uplink, Link const &link);
 
 /// See Plane::lacp_is_up.
 bool lacp_is_up(storage::Transaction &transaction, std::string_view uplink);

@@ -186,13 +186,13 @@ void Teaming::change_link(storage::ChangingTransaction &transaction, std::string
                           Link const &link) {
   auto const running = switch_running_over(transaction, uplink);
   if (!running) {
-    set_link(transaction, uplink, link);
+    teaming::set_link(transaction, uplink, link);
     return;
   }
   auto const key = *running;
   auto const generations = storage::get_generations(transaction, key);
   auto const before = team_of_switch(transaction, key, generations);
-  set_link(transaction, uplink, link);
+  teaming::set_link(transaction, uplink, link);
   auto const &after = team_of_switch(transaction, key, storage::get_generations(transaction, key));
 
   auto const most =

@@ -161,7 +161,14 @@ std::vector<std::string> OpenVswitchPlane::counting_sessions(storage::Transactio
 
 void OpenVswitchPlane::set_admin_state(storage::ChangingTransaction &transaction,
                                        std::string_view uplink, bool up) {
-  stored_.set_admin_state(transaction, uplink, up);
+  if (!storage::frames_change(transaction) || !storage::device_of(transaction, uplink)) {
+    stored_.set_admin_state(transaction, uplink, up);
+    return;
+  }
+  // Who is moved is announced where frames go.
+  auto link = storage::find_link(transaction, uplink).value_or(Link{});
+  link.admin = up;
+  teaming::set_link(transaction, uplink, link);
 }
 
 void OpenVswitchPlane::put_address(storage::ChangingTransaction &transaction, Place const &place,

@@ -2,6 +2,7 @@
 // that is here does not come from outside. Of addresses that are learned, or not known, the last
 // second or two count, so that a client that moved to another host is soon heard there.
 #include "planes/openvswitch/compile/stages/own_addresses.h"
+#include "planes/openvswitch/compile/stages/recent_sources.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -45,18 +46,8 @@ void drop_known(Plan const &plan, Program &program, Actions const &others) {
 }
 
 openflow::Action remember(Port const &port) {
-  auto const recent = port.transmits_by_uplink ? Recent::is_on_way : Recent::drops;
-  openflow::Learn learn{
-      .table = table::kRecentSources,
-      .priority = 100,
-      .cookie = cookie(Counted::recent_source, port.number),
-      .hard_timeout = 1,
-      .deletes_learned = true,
-      .specs = {in_domain(),
-                openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
-                                       .content = openflow::whole(Field::eth_src)},
-                openflow::LearnedLoad{.destination = field::kRecent,
-                                      .content = static_cast<openflow::Value>(recent)}}};
+  auto learn =
+      recent_source(port.number, port.transmits_by_uplink ? Recent::is_on_way : Recent::drops);
   if (port.transmits_by_uplink) {
     learn.specs.emplace_back(
         openflow::LearnedLoad{.destination = openflow::part(field::kSender, 0, 15),
@@ -91,6 +82,19 @@ void remember_at_ports(Plan const &plan, Program &program) {
 }
 
 }  // namespace
+
+openflow::Learn recent_source(std::uint32_t number, Recent recent) {
+  return {.table = table::kRecentSources,
+          .priority = 100,
+          .cookie = cookie(Counted::recent_source, number),
+          .hard_timeout = 1,
+          .deletes_learned = true,
+          .specs = {in_domain(),
+                    openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
+                                           .content = openflow::whole(Field::eth_src)},
+                    openflow::LearnedLoad{.destination = field::kRecent,
+                                          .content = static_cast<openflow::Value>(recent)}}};
+}
 
 void compile_own_frames(Plan const &plan, Program &program) {
   Actions others{go_to(table::kMirroring)};

@@ -1,0 +1,58 @@
+// Tells the network beyond the uplinks of clients that are reached over another one than before: by
+// reverse-ARP packets, no more in a second than the host's options allow.
+#pragma once
+
+#include <deque>
+#include <functional>
+#include <map>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "daemon/memory.h"
+#include "daemon/wanted.h"
+#include "events/loop.h"
+
+namespace simhost::daemon {
+
+class Announcer {
+ public:
+  /// Sends the packets of a switch; those that it has sent are counted there.
+  using Send = std::function<void(storage::SwitchKey, std::vector<openvswitch::Announced> const &)>;
+
+  Announcer(events::Loop &loop, Send send) : loop_(loop), send_(std::move(send)) {}
+
+  /// This is in force. What is so when it is told first is no news; clients whose address is not
+  /// known are announced by what `memory` has learned of them.
+  void follow(Wanted const &wanted, Memory const &memory);
+
+ private:
+  // Where a client was.
+  struct Place {
+    std::string device;
+    std::vector<openflow::Port> uplinks;
+  };
+  struct Due {
+    openvswitch::Announced announced;
+    events::Clock::time_point until;
+  };
+  struct OfSwitch {
+    std::map<std::uint32_t, Place> places;
+    std::deque<Due> due;
+  };
+
+  void follow(WantedBridge const &bridge, Memory const &memory);
+  void announce(storage::SwitchKey key, OfSwitch &known, Carried const &carried,
+                Memory const &memory) const;
+  void send();
+
+  events::Loop &loop_;
+  Send send_;
+  std::map<storage::SwitchKey, OfSwitch> switches_;
+  bool has_begun_ = false;
+  std::uint32_t most_ = 0;
+  std::chrono::seconds duration_{};
+  events::Loop::Timer next_interval_;
+};
+
+}  // namespace simhost::daemon

@@ -1,0 +1,121 @@
+"""Clients that move to another uplink, or come to a port, are announced to the network."""
+
+from typing import Tuple
+
+import pytest
+
+from frame_lab import Lab, comes_true
+from simhost import Client, Network, frame
+
+# Source and sender, a reverse request, and nothing of IP.
+BEFORE, BETWEEN = bytes.fromhex("80350001080006040003"), bytes(4)
+
+
+def reverse_arp(mac: str) -> bytes:
+    address = bytes.fromhex(mac.replace(":", ""))
+    packet = b"\xff" * 6 + address + BEFORE + address + BETWEEN + address + BETWEEN
+    return packet.ljust(60, b"\0")
+
+
+def sent(lab: Lab) -> int:
+    program = (
+        "from libvswitch import checked; print(checked.VSQEX_GetRARPStats('lab').rarpPktsSent)"
+    )
+    return int(lab.python(program))
+
+
+Around = Tuple[Network, Client]
+
+
+@pytest.fixture
+def around(lab: Lab) -> Around:
+    """What is beyond the uplinks."""
+    network = lab.network("nic0", "nic1")
+    return network, network.client()
+
+
+def test_a_client_that_is_moved_is_announced(lab: Lab, around: Around) -> None:
+    network, far = around
+    near, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert near.comes_to_reach(far)
+    assert network.came_over(near.mac) == "nic0"
+    network.pull("nic0")
+    far.expect(reverse_arp(near.mac), timeout=30)
+    assert network.came_over(near.mac) == "nic1"
+    # Nobody here is told, and the silent other one, of whom nothing is known, is not announced.
+    near.expect_none(reverse_arp(near.mac))
+    other.expect_none(reverse_arp(near.mac), timeout=0.0)
+    far.expect_none(reverse_arp(other.mac), timeout=0.0)
+    assert comes_true(lambda: sent(lab) == 1)
+    network.plug("nic0")
+    far.expect(reverse_arp(near.mac), timeout=30)
+    assert comes_true(lambda: network.came_over(near.mac) == "nic0")
+    # What comes back over the other uplink has taught this switch nothing.
+    hello = frame(near.mac, far.mac, payload=b"hello")
+    far.send(hello)
+    near.expect(hello)
+    far.expect_none(reverse_arp(near.mac))
+    assert comes_true(lambda: sent(lab) == 2)
+
+
+def test_a_client_is_announced_when_its_device_is_connected(lab: Lab, around: Around) -> None:
+    network, far = around
+    lab.set_port("lab", "a", vlan=7)
+    mac = "02:00:00:00:00:77"
+    lab.frames.client("lab", "a", mac=mac)
+    tagged = reverse_arp(mac)
+    tagged = tagged[:12] + bytes.fromhex("81000007") + tagged[12:]
+    far.expect(tagged, timeout=30)
+    assert network.came_over(mac) == "nic0"
+    # A daemon that comes later has no news.
+    lab.stop()
+    lab.start()
+    far.expect_none(tagged)
+
+
+def test_addresses_that_a_port_learned_are_announced(lab: Lab, around: Around) -> None:
+    network, far = around
+    lab.set_port("lab", "a", mac_learning={"learning": True, "flooding": True})
+    near = lab.client("lab", "a")
+    beyond_it = [f"02:00:00:00:01:0{number}" for number in range(3)]
+    for mac in beyond_it:
+        hello = frame(far.mac, mac, payload=b"hello")
+        near.send(hello)
+        far.expect(hello)
+    network.pull("nic0")
+    for mac in beyond_it:
+        far.expect(reverse_arp(mac), timeout=30)
+        far.expect_none(reverse_arp(mac), timeout=0.0)
+
+
+def test_who_does_not_want_it_is_not_announced(lab: Lab, around: Around) -> None:
+    network, far = around
+    quiet = {"balance": "explicit", "active": ["nic0"], "standby": ["nic1"], "flags": []}
+    lab.set_port("lab", "b", teaming=quiet)
+    loud, silent = lab.client("lab", "a"), lab.client("lab", "b")
+    assert loud.comes_to_reach(far) and silent.comes_to_reach(far)
+    network.pull("nic0")
+    far.expect(reverse_arp(loud.mac), timeout=30)
+    far.expect_none(reverse_arp(silent.mac))
+
+
+def test_no_more_than_so_many_are_announced_at_once(lab: Lab, around: Around) -> None:
+    network, far = around
+    lab.apply({"runtime_options": {"MaxRARPsPerInterval": 1}})
+    assert sent(lab) == 0
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.comes_to_reach(far) and other.comes_to_reach(far)
+    network.pull("nic0")
+    for client in (one, other):
+        far.expect(reverse_arp(client.mac), timeout=30)
+    assert comes_true(lambda: sent(lab) == 2)
+    # Who has to wait longer than that is not announced.
+    lab.apply({"runtime_options": {"RARPAdvertisementDuration": 0}})
+    network.plug("nic0")
+    far.expect(reverse_arp(one.mac), timeout=30)
+    assert comes_true(lambda: sent(lab) == 3)
+    lab.apply({"runtime_options": {"MaxRARPsPerInterval": 0}})
+    network.pull("nic0")
+    assert comes_true(lambda: "sends over nic0" not in lab.ctl("show"))
+    far.expect_none(lambda frame: frame[12:14] == b"\x80\x35")
+    assert sent(lab) == 3
