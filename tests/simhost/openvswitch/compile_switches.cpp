@@ -91,15 +91,30 @@ Json numbers_of_devices(ChangingTransaction &transaction, simhost::storage::Swit
   return numbers;
 }
 
+// A caller looks no further than may_be_refused() says.
+simhost::openvswitch::Compiled made_of(ChangingTransaction &transaction,
+                                       simhost::storage::SwitchKey key,
+                                       simhost::openvswitch::Observed const &observed) {
+  try {
+    auto const team = simhost::teaming::team_of(transaction, key, simhost::stored::link_of);
+    return simhost::openvswitch::compile(
+        simhost::openvswitch::read_network(transaction, key, team, observed));
+  } catch (simhost::Refused const &refused) {
+    if (!simhost::openvswitch::may_be_refused(transaction, key)) {
+      throw std::logic_error("no caller expects this to be refused: " +
+                             std::string(refused.what()));
+    }
+    throw;
+  }
+}
+
 Json compiled(Json const &said) {
   simhost::storage::Store store(std::nullopt, [](ChangingTransaction &) {});
   ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, said.at("host").dump());
   auto const key = simhost::get_switch(transaction, "s").key;
   auto const observed = connect(transaction, key, said);
-  auto const team = simhost::teaming::team_of(transaction, key, simhost::stored::link_of);
-  auto const network = simhost::openvswitch::read_network(transaction, key, team, observed);
-  auto const made = simhost::openvswitch::compile(network);
+  auto const made = made_of(transaction, key, observed);
 
   Json answer{{"devices", numbers_of_devices(transaction, key)},
               {"numbers", numbers_of_ports(transaction, key)},

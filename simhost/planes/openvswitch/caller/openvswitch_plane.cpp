@@ -77,7 +77,8 @@ void check_switches(storage::Transaction &transaction) {
     return storage::find_link(from, uplink).value_or(Link{});
   };
   for (auto const &[key, row] : storage::all_switches(transaction)) {
-    if (row.associated && !storage::port_devices(transaction, key).empty()) {
+    if (row.associated && may_be_refused(transaction, key) &&
+        !storage::port_devices(transaction, key).empty()) {
       auto const team = teaming::team_of(transaction, key, links);
       check(read_network(transaction, key, team, {}));
     }

@@ -170,4 +170,10 @@ void read_mirrors(storage::Transaction &transaction, storage::SwitchKey key, Net
   }
 }
 
+bool has_mirror_sessions(storage::Transaction &transaction, storage::SwitchKey key) {
+  auto const owner = storage::PropertyOwner::global(key);
+  return !effective(transaction, mirror::uplink_sessions, owner).sessions.empty() ||
+         !list_stored_at_ports(transaction, mirror::sessions, key).empty();
+}
+
 }  // namespace simhost::openvswitch

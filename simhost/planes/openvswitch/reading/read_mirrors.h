@@ -21,4 +21,6 @@ struct SessionAt {
 };
 SessionAt session_at(std::uint32_t id);
 
+bool has_mirror_sessions(storage::Transaction &transaction, storage::SwitchKey key);
+
 }  // namespace simhost::openvswitch

@@ -304,4 +304,8 @@ Network read_network(storage::Transaction &transaction, storage::SwitchKey key,
   return Reader(transaction, key, team, observed).read();
 }
 
+bool may_be_refused(storage::Transaction &transaction, storage::SwitchKey key) {
+  return has_mirror_sessions(transaction, key);
+}
+
 }  // namespace simhost::openvswitch
