@@ -1,0 +1,115 @@
+"""How simhostd is started, tells that it is ready, and ends; and who else is there."""
+
+import os
+import signal
+import socket
+import subprocess
+from pathlib import Path
+
+import pytest
+
+from frame_lab import ONE_SWITCH, TOOLS, Lab
+from lasting_open_vswitch import LastingOpenVSwitch
+
+READY = "READY=1\nSTATUS=moves the frames of "
+
+
+def told_to(manager: socket.socket) -> str:
+    manager.settimeout(30)
+    return manager.recv(4096).decode()
+
+
+def test_a_service_manager_is_told(
+    idle: Lab, tmp_path: Path, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    folder = tmp_path / ("d" * 120)
+    folder.mkdir()
+    with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as manager:
+        # An address of a socket is short.
+        inside = os.open(folder, os.O_PATH)
+        manager.bind(f"/proc/self/fd/{inside}/notify")
+        os.close(inside)
+        monkeypatch.setenv("NOTIFY_SOCKET", str(folder / "notify"))
+        idle.start()
+        assert told_to(manager) == f"{READY}{idle.state}"
+        idle.stop()
+        assert told_to(manager) == "STOPPING=1"
+
+
+@pytest.mark.parametrize("number", [signal.SIGTERM, signal.SIGINT])
+def test_it_ends_in_order(idle: Lab, number: int) -> None:
+    with open(idle.folder / "simhostd.log", "w", encoding="utf-8") as log:
+        daemon = idle.simhostd(f"private:{idle.run_folder()}", stderr=log)
+    assert daemon.stdout is not None and daemon.stdout.readline() == "ready\n"
+    assert len(idle.processes()) == 2
+    # A terminal that closes is no reason to end.
+    daemon.send_signal(signal.SIGHUP)
+    assert idle.plane()["in_force"] is not None
+    daemon.send_signal(number)
+    daemon.communicate(timeout=30)
+    assert daemon.returncode == 0
+    assert idle.log().endswith("simhostd: ends\n")
+    assert not idle.processes()
+    assert not (idle.folder / "host.db-simhostd").exists()
+
+
+def test_the_open_vswitch_of_the_machine(idle: Lab) -> None:
+    with LastingOpenVSwitch(idle):
+        # The daemon sees this one where the machine's own is.
+        mount = (
+            "mount -t tmpfs none /run && mkdir -p /run/openvswitch &&"
+            ' mount --bind "$0" /run/openvswitch && exec "$@"'
+        )
+        daemon = idle.host.start(
+            *("unshare", "--mount", "sh", "-c", mount, str(idle.run_folder())),
+            *(str(TOOLS / "simhostd"), "--state", str(idle.state), "--openvswitch", "system"),
+            stdout=subprocess.PIPE,
+        )
+        assert daemon.stdout is not None and daemon.stdout.readline() == "ready\n"
+        one, other = idle.client("lab", "a"), idle.client("lab", "b")
+        assert one.reaches(other, attempts=5)
+        daemon.terminate()
+        daemon.communicate(timeout=30)
+        # Frames go on without it.
+        assert one.reaches(other)
+
+
+def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
+    with LastingOpenVSwitch(idle) as open_vswitch:
+        idle.start(open_vswitch.where)
+        assert idle.daemon is not None
+        (tmp_path / "second").mkdir()
+        with Lab(tmp_path / "second", ONE_SWITCH) as second:
+            log = open(second.folder / "simhostd.log", "w", encoding="utf-8")
+            with log:
+                waiting = second.simhostd(open_vswitch.where, stderr=log)
+            who = f"simhostd of {idle.state}, process {idle.daemon.pid} writes to this Open vSwitch"
+            while who not in second.log():
+                assert waiting.poll() is None
+            assert second.log().count(who) == 1
+            # It takes over when the first one ends.
+            idle.stop()
+            assert waiting.stdout is not None and waiting.stdout.readline() == "ready\n"
+            waiting.terminate()
+            waiting.communicate(timeout=30)
+
+
+def test_a_private_open_vswitch_is_one_daemon_s(lab: Lab, tmp_path: Path) -> None:
+    assert lab.daemon is not None
+    (tmp_path / "second").mkdir()
+    with Lab(tmp_path / "second", ONE_SWITCH) as second:
+        refused = second.simhostd(f"private:{lab.run_folder()}", stderr=subprocess.PIPE)
+        said = refused.communicate(timeout=30)[1]
+    assert refused.returncode == 1
+    where = lab.run_folder()
+    assert said == f"simhostd: the process {lab.daemon.pid} runs an Open vSwitch in {where}\n"
+    assert len(lab.processes()) == 2
+
+
+def test_a_folder_that_cannot_be_used_is_told(idle: Lab) -> None:
+    done = idle.host.try_run(
+        *(str(TOOLS / "simhostd"), "--state", str(idle.state), "--openvswitch", "private:/proc/no")
+    )
+    assert done.returncode == 1
+    why = "the folder /proc/no of the Open vSwitch cannot be used: No such file or directory"
+    assert done.stdout == f"simhostd: {why}\n"
