@@ -141,8 +141,14 @@ TEST(WhatWasLearned, IsLearnedAnewAsItWouldBeNow) {
   Flows const one{teaches};
   EXPECT_EQ(how_learned(one, {.table = 6, .cookie = 7}), learn);
   EXPECT_FALSE(how_learned(one, {.table = 6, .cookie = 8}));
-  Flows const two{teaches, teaches};
-  EXPECT_FALSE(how_learned(two, {.table = 6, .cookie = 7}));
+  auto other = learn;
+  auto teaches_too = teaches;
+  other.limit = 4096;
+  teaches_too.actions = {other};
+  EXPECT_EQ(how_learned(Flows{teaches, teaches_too}, {.table = 6, .cookie = 7}), learn);
+  other.hard_timeout = 20;
+  teaches_too.actions = {other};
+  EXPECT_FALSE(how_learned(Flows{teaches, teaches_too}, {.table = 6, .cookie = 7}));
 }
 
 // A switch that does what it is told.

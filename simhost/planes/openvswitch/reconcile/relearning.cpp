@@ -1,6 +1,7 @@
 // What a frame said is what the flow that was learned of it matches.
 #include "planes/openvswitch/reconcile/relearning.h"
 
+#include <algorithm>
 #include <variant>
 
 namespace simhost::openvswitch {
@@ -21,6 +22,13 @@ void add_ways(openflow::Actions const &actions, LearnedFlows const &learned,
       add_ways(clone->actions, learned, ways);
     }
   }
+}
+
+// Whether two make the same flow of a frame, each as long as it may.
+bool make_the_same(Learn one, Learn const &other) {
+  one.limit = other.limit;
+  one.result = other.result;
+  return one == other;
 }
 
 bool add(openflow::LearnedMatch const &spec, Flow const &before, Flow &flow) {
@@ -56,7 +64,9 @@ std::optional<Learn> how_learned(std::span<Flow const> flows, LearnedFlows const
   for (auto const &flow : flows) {
     add_ways(flow.actions, learned, ways);
   }
-  return ways.size() == 1 ? std::optional(ways.front()) : std::nullopt;
+  bool const is_one_way =
+      std::ranges::all_of(ways, [&](Learn const &way) { return make_the_same(way, ways.front()); });
+  return is_one_way && !ways.empty() ? std::optional(ways.front()) : std::nullopt;
 }
 
 std::optional<Flow> relearned(Learn const &learn, Flow const &before) {

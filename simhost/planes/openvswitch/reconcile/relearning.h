@@ -11,7 +11,8 @@
 
 namespace simhost::openvswitch {
 
-/// The one way in which some of the flows teach those; nothing if there are several.
+/// The one way in which some of the flows teach those, whatever their limits; nothing if there are
+/// several.
 std::optional<openflow::Learn> how_learned(std::span<openflow::Flow const> flows,
                                            LearnedFlows const &learned);
 
