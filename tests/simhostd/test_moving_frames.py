@@ -1,5 +1,6 @@
 """Frames go as the settings say."""
 
+import json
 import re
 import subprocess
 import sys
@@ -77,6 +78,62 @@ def test_a_switch_made_by_calls_moves_frames(lab: Lab) -> None:
     assert one.reaches(other, attempts=5)
     lab.python("from libvswitch import checked; checked.VSDVS_DestroyVSwitch('made')")
     assert not one.reaches(other)
+
+
+def test_a_disabled_switch_moves_nothing_and_an_enabled_one_does(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    lab.apply({"switches": [{"alias": "lab", "disabled": True}]})
+    assert not one.reaches(other)
+    lab.apply({"switches": [{"alias": "lab", "disabled": False}]})
+    assert one.reaches(other, attempts=5)
+
+
+def test_a_port_that_is_removed_moves_nothing_and_a_new_one_does(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    lab.python("from libvswitch import checked; checked.VSDVS_RemoveDVPort('lab', 'b')")
+    assert not one.reaches(other)
+    lab.python("from libvswitch import checked; checked.VSDVS_AddDVPort('lab', 'b', 0)")
+    assert not one.reaches(other)
+    lab.ctl("connect", "lab", "b", "c2")
+    # Who it is is known again when it speaks.
+    assert other.reaches(one, attempts=5)
+
+
+def test_a_restart_of_the_host_leaves_what_is_persistent(lab: Lab) -> None:
+    transient = MADE_BY_CALLS.replace("8, True", "8, False")
+    lab.python(transient)
+    stays = lab.client("lab", "a"), lab.client("lab", "b")
+    goes = lab.client("made", "x"), lab.client("made", "y")
+    for one, other in (stays, goes):
+        assert one.reaches(other, attempts=5)
+    lab.ctl("restart")
+    one, other = stays
+    assert one.reaches(other, attempts=5)
+    one, other = goes
+    assert not one.reaches(other)
+
+
+def shown(lab: Lab) -> str:
+    return re.sub("clock .*", "", lab.ctl("show"))
+
+
+def test_what_cannot_be_done_is_refused_and_nothing_has_changed(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    before, change = shown(lab), lab.plane()["change"]
+    wraps = {"sid": "s", "to": [{"port": "c"}], "type": "encapsulated"}
+    document = {
+        "alias": "lab",
+        "ports": [{"id": "b", "vlan": 7}, {"id": "a", "mirror_sessions": [wraps]}],
+    }
+    done = lab.try_ctl("apply", "-", given=json.dumps({"switches": [document]}))
+    assert done.returncode == 1
+    why = "the mirror session 's' wraps what it mirrors, which is not done here"
+    assert f"{why} (QEX_NOT_SUPPORTED)" in done.stdout
+    assert lab.plane()["change"] == change
+    assert shown(lab) == before
+    assert one.reaches(other, attempts=5)
 
 
 def test_learned_addresses_are_asked_of_the_data_path(lab: Lab) -> None:
