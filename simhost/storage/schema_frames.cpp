@@ -23,4 +23,17 @@ char const *const kFramesSchema = R"sql(
   ) STRICT;
 )sql";
 
+char const *const kReadingSchema = R"sql(
+  -- What the data path had counted when its counters were last added to those of the host: what it
+  -- counted since is what is above. The source 0, which counts nothing, is there from the first
+  -- reading until the counters go.
+  CREATE TABLE reading (
+    switch      INTEGER NOT NULL REFERENCES switch ON DELETE CASCADE,
+    source      INTEGER NOT NULL,
+    frames      INTEGER NOT NULL,
+    bytes       INTEGER NOT NULL,
+    PRIMARY KEY (switch, source)
+  ) STRICT, WITHOUT ROWID;
+)sql";
+
 }  // namespace simhost::storage

@@ -16,8 +16,8 @@ namespace simhost::storage {
 namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
-std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{kGenerationSchema,
-                                                                      kFramesSchema};
+std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
+    kGenerationSchema, kFramesSchema, kReadingSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -111,6 +111,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kRunningSchema);
   database.exec(kGenerationSchema);
   database.exec(kFramesSchema);
+  database.exec(kReadingSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

@@ -52,6 +52,7 @@ std::vector<std::string> sessions_with_counters(Transaction &transaction, Switch
 
 void remove_counters(ChangingTransaction &transaction) {
   Change(transaction, "DELETE FROM counter").run();
+  Change(transaction, "DELETE FROM reading").run();
 }
 
 }  // namespace simhost::storage

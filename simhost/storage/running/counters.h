@@ -32,6 +32,7 @@ void put_counter(ChangingTransaction &transaction, CounterOwner const &owner, st
                  std::uint64_t value);
 /// The mirror sessions of a switch that have counted, in the order of their names.
 std::vector<std::string> sessions_with_counters(Transaction &transaction, SwitchKey key);
+/// What the data path had counted is forgotten with them.
 void remove_counters(ChangingTransaction &transaction);
 
 }  // namespace simhost::storage
