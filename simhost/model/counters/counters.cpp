@@ -82,8 +82,7 @@ void set_counter(storage::ChangingTransaction &transaction, CounterOwner const &
   if (value > counter->greatest) {
     throw Refused(QEX_BAD_PARAM, fmt::format("{} is above {}", value, counter->greatest));
   }
-  Place const place{.switch_key = owner.switch_key, .port = owner.port};
-  get_wires(transaction, place).set_counter(transaction, owner, *counter, value);
+  get_wires(transaction, owner).set_counter(transaction, owner, *counter, value);
 }
 
 }  // namespace simhost

@@ -122,10 +122,21 @@ Wires &get_wires(storage::Transaction &transaction, Place const &place) {
     for (auto const &uplink : storage::uplinks_of(transaction, place.switch_key)) {
       get_wires(transaction, uplink.name);
     }
+  } else if (auto const uplink = storage::uplink_at(transaction, *place.port)) {
+    get_wires(transaction, *uplink);
   } else if (auto const device = storage::device_of(transaction, *place.port)) {
     refuse_wires(text_of(transaction, {.uplink = std::nullopt, .port = place.port}), device->name);
   }
   return get_wires();
+}
+
+Wires &get_wires(storage::Transaction &transaction, CounterOwner const &owner) {
+  if (!owner.session.empty()) {
+    for (auto const &[port, device] : storage::port_devices(transaction, owner.switch_key)) {
+      get_wires(transaction, Place{.switch_key = owner.switch_key, .port = port});
+    }
+  }
+  return get_wires(transaction, Place{.switch_key = owner.switch_key, .port = owner.port});
 }
 
 void stop_clock_without_devices(storage::ChangingTransaction &transaction) {

@@ -29,6 +29,8 @@ SIMHOST_API void disconnect(storage::ChangingTransaction &transaction,
 /// switch's uplinks has a device. Refuses, naming it, what has a device (QEX_NOT_SUPPORTED).
 SIMHOST_API Wires &get_wires(storage::Transaction &transaction, std::string_view uplink);
 SIMHOST_API Wires &get_wires(storage::Transaction &transaction, Place const &place);
+/// Likewise of what counts; a mirror session may see the frames of any device of its switch.
+SIMHOST_API Wires &get_wires(storage::Transaction &transaction, CounterOwner const &owner);
 /// Refuses to stop the clock while frames flow, naming a device (QEX_NOT_SUPPORTED).
 SIMHOST_API void stop_clock_without_devices(storage::ChangingTransaction &transaction);
 
