@@ -70,10 +70,23 @@ Json object_to_json(std::span<Member const> members, Object const &object) {
   return said;
 }
 
-Json addresses_to_json(Transaction &transaction, Place const &place) {
+Json addresses_to_json(Transaction &transaction, Place const &place, VSMACAddrType type) {
   return each_to_json(
-      running_plane().addresses(transaction, place, VS_MAC_ADDR_TYPE_ALL),
+      running_plane().addresses(transaction, place, type),
       [](VSMACEntry const &entry) { return object_to_json(kAddressMembers, entry); });
+}
+
+// A host is described also while nobody can tell what it has learned.
+void describe_addresses(Json &described, Transaction &transaction, Place const &place) {
+  auto &list = described[keys::addresses];
+  try {
+    list = addresses_to_json(transaction, place, VS_MAC_ADDR_TYPE_ALL);
+  } catch (Refused const &refused) {
+    list = addresses_to_json(transaction, place, VS_MAC_ADDR_TYPE_STATIC);
+    auto const more = addresses_to_json(transaction, place, VS_MAC_ADDR_TYPE_USER);
+    list.insert(list.end(), more.begin(), more.end());
+    described[std::string(kObserved)]["not_learned"] = refusal_text(refused);
+  }
 }
 
 Json groups_to_json(Transaction &transaction, storage::PortNumber port) {
@@ -114,19 +127,19 @@ Json port_to_json(Transaction &transaction, storage::Port const &port) {
   if (auto const device = storage::device_of(transaction, port.number)) {
     described[keys::device] = device_to_json(*device);
   }
-  described[keys::addresses] = addresses_to_json(transaction, place);
+  describe_addresses(described, transaction, place);
   described[keys::groups] = groups_to_json(transaction, port.number);
   described[keys::counters] =
       counters_to_json(transaction, {.switch_key = port.switch_key, .port = port.number});
   describe_raw(described, transaction, owner, SettingOwner::of_port);
-  Json observed{{"number", static_cast<std::uint32_t>(port.number)}};
+  auto &observed = described[std::string(kObserved)];
+  observed["number"] = static_cast<std::uint32_t>(port.number);
   try {
     observed["uplink"] = running_plane().team_uplink(transaction, port);
   } catch (Refused const &refused) {
     observed["uplink"] = nullptr;
     observed["why"] = refusal_text(refused);
   }
-  described[std::string(kObserved)] = std::move(observed);
   return described;
 }
 
@@ -185,8 +198,7 @@ Json switch_to_json(Transaction &transaction, storage::FoundSwitch const &known)
   described[keys::lags] = each_to_json(lags_of(transaction, key), lag_to_json);
   describe_named(described, transaction, owner, SettingOwner::of_switch);
   described[keys::ports] = ports_to_json(transaction, key);
-  described[keys::addresses] =
-      addresses_to_json(transaction, {.switch_key = key, .port = std::nullopt});
+  describe_addresses(described, transaction, {.switch_key = key, .port = std::nullopt});
   described[keys::counters] = counters_to_json(transaction, {.switch_key = key});
   described[keys::mirror_counters] = session_counters_to_json(transaction, key);
   describe_raw(described, transaction, owner, SettingOwner::of_switch);
