@@ -26,6 +26,8 @@ using openvswitch::Deadline;
 
 constexpr auto kPatience = 5s;
 constexpr auto *kLock = "simhostd";
+// What Open vSwitch says of its flows is older than that anyway.
+constexpr auto kBetweenCounts = 100ms;
 
 Deadline soon() {
   return Deadline::clock::now() + kPatience;
@@ -70,6 +72,16 @@ openflow::Changes changes_of(openvswitch::Difference const &difference) {
     change_group(GroupCommand::remove, {.id = number, .buckets = {}});
   }
   return changes;
+}
+
+// Whether flows go, or begin anew, that count for others.
+bool ends_counting(openvswitch::Difference const &difference) {
+  auto const counts = [](Flow const &flow) {
+    return std::ranges::find(openvswitch::kCountingTables, flow.table) !=
+           openvswitch::kCountingTables.end();
+  };
+  return std::ranges::any_of(difference.removed_flows, counts) ||
+         std::ranges::any_of(difference.added_flows, counts);
 }
 
 std::size_t count_without_markers(openvswitch::Difference const &difference) {
@@ -143,6 +155,10 @@ struct Bridges::Bridge {
   std::vector<Flow> flows;
   std::vector<Group> groups;
   bool is_altered = false;  // by somebody else, so that the two before are none of it any more
+  // Of the flows as they are.
+  PortNumbers numbers;
+  openvswitch::CountedSessions sessions;
+  Deadline counted{};
 };
 
 Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, Memory &memory, Told told)
@@ -226,6 +242,10 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
   if (bridge == nullptr) {
     auto made = std::make_unique<Bridge>(wanted, folder_ / (wanted.row.name + ".mgmt"), deadline);
     read_flows(*made, deadline);
+    made->numbers = wanted.numbers;
+    made->sessions = wanted.sessions;
+    // What counted while nobody was here, before any of it is changed.
+    count(*made, deadline);
     bridge = std::move(made);
     bridge->watch =
         loop_.watch(bridge->connection.fd(), [this, raw = bridge.get()] { read_events(*raw); });
@@ -263,7 +283,9 @@ void Bridges::follow_events(Bridge &bridge) {
   while (auto const event = bridge.connection.next_event()) {
     auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
     if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
-      memory_.follow(bridge.key, *update);
+      if (auto const port = memory_.follow(bridge.key, *update)) {
+        told_.moved(bridge.key, *port);
+      }
     } else if (update != nullptr) {
       is_altered = is_altered || update->event != openflow::FlowUpdate::Event::own;
     } else if (std::holds_alternative<openflow::GroupsChanged>(*event)) {
@@ -285,6 +307,26 @@ void Bridges::read_events(Bridge &bridge) {
   }
 }
 
+void Bridges::count(Bridge &bridge, Deadline deadline) {
+  told_.counted(bridge.key, totals_of(bridge.connection, bridge.numbers, deadline),
+                bridge.sessions);
+  bridge.counted = Deadline::clock::now();
+  follow_events(bridge);
+}
+
+void Bridges::count() {
+  for (auto const &[key, bridge] : bridges_) {
+    count(*bridge, soon());
+  }
+}
+
+void Bridges::count(storage::SwitchKey key) {
+  auto const found = bridges_.find(key);
+  if (found != bridges_.end() && found->second->counted + kBetweenCounts < Deadline::clock::now()) {
+    count(*found->second, soon());
+  }
+}
+
 std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
                                  Deadline deadline) {
   auto &bridge = connected(wanted, deadline);
@@ -300,12 +342,17 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::set<std::strin
   } else {
     std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
   }
+  if (bridge.sessions != wanted.sessions || ends_counting(difference)) {
+    count(bridge, deadline);
+  }
   if (!difference.empty()) {
     bridge.connection.change(changes_of(difference), deadline);
     bridge.flows = wanted.compiled.flows;
     bridge.groups = wanted.compiled.groups;
     follow_events(bridge);
   }
+  bridge.numbers = wanted.numbers;
+  bridge.sessions = wanted.sessions;
   return count_without_markers(difference);
 }
 
@@ -348,12 +395,18 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
 
 std::size_t Bridges::apply(Wanted const &wanted) {
   auto const deadline = soon();
-  auto const added = apply_rows(wanted, deadline);
-  std::erase_if(bridges_, [](auto const &bridge) { return bridge.second->is_altered; });
-  std::erase_if(bridges_, [&](auto const &bridge) {
+  auto const goes = [&](auto const &bridge) {
     auto const is_it = [&](auto const &one) { return one.key == bridge.first; };
     return std::ranges::none_of(wanted.bridges, is_it) && std::ranges::none_of(wanted.unfit, is_it);
-  });
+  };
+  for (auto const &bridge : bridges_) {
+    if (goes(bridge)) {
+      count(*bridge.second, deadline);
+    }
+  }
+  auto const added = apply_rows(wanted, deadline);
+  std::erase_if(bridges_, [](auto const &bridge) { return bridge.second->is_altered; });
+  std::erase_if(bridges_, goes);
   std::size_t changed = 0;
   for (auto const &bridge : wanted.bridges) {
     changed += apply_flows(bridge, added, deadline);

@@ -37,6 +37,12 @@ class Bridges {
     std::string
         owner;  ///< how this process is called in words, for another one that wants to write
     std::string host;
+    /// What a bridge counted, and for which mirror sessions; see Tally.
+    std::function<void(storage::SwitchKey, openvswitch::Totals const &,
+                       openvswitch::CountedSessions const &)>
+        counted;
+    /// An address moved to a port, or beyond the uplinks (0).
+    std::function<void(storage::SwitchKey, std::uint32_t port)> moved;
     /// The database has rows that are others than before, whoever changed them.
     std::function<void()> changed;
     /// Somebody else changed flows or groups of the bridge of that name.
@@ -58,6 +64,10 @@ class Bridges {
   std::size_t apply(Wanted const &wanted);
   /// Sends frames from the bridge of a switch; returns whether there is one.
   bool send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
+  /// Tells what all bridges counted, and where addresses moved.
+  void count();
+  /// Likewise of the bridge of a switch, unless that was told just before.
+  void count(storage::SwitchKey key);
   /// What the bridge of a switch has learned.
   std::vector<Learned> learned(storage::SwitchKey key);
 
@@ -75,6 +85,7 @@ class Bridges {
   void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
   void read_events(Bridge &bridge);
   void follow_events(Bridge &bridge);
+  void count(Bridge &bridge, openvswitch::Deadline deadline);
 
   events::Loop &loop_;
   std::filesystem::path folder_;

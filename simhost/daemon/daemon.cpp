@@ -27,10 +27,16 @@ using namespace std::chrono_literals;
 // Between two attempts to connect.
 constexpr events::Clock::duration kFirstPause = 50ms;
 constexpr events::Clock::duration kLongestPause = 500ms;
+// What was counted since the last time is lost when Open vSwitch is killed.
+constexpr auto kBetweenCounts = 2s;
 
 std::filesystem::path beside(std::filesystem::path file, char const *suffix) {
   file += suffix;
   return file;
+}
+
+storage::SwitchKey switch_in(Json const &question) {
+  return storage::SwitchKey{question.at("switch").get<std::int64_t>()};
 }
 
 storage::Store opened(std::filesystem::path const &state) {
@@ -63,10 +69,34 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       devices_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state),
               [this](Json const &question, Reply const &reply) { handle(question, reply); }),
-      announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }) {
+      announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }),
+      counting_(store_) {
   storage::ChangingTransaction transaction(store_);
   storage::take_frames(transaction);
   transaction.commit();
+  count_from_now_on();
+}
+
+void Daemon::count() {
+  try {
+    if (bridges_) {
+      bridges_->count();
+    }
+  } catch (std::runtime_error const &error) {
+    fail(error.what());
+  }
+  try {
+    counting_.save();
+  } catch (std::runtime_error const &error) {
+    troubles_.add(error.what());
+  }
+}
+
+void Daemon::count_from_now_on() {
+  next_count_ = loop_.after(kBetweenCounts, [this] {
+    count();
+    count_from_now_on();
+  });
 }
 
 void Daemon::connect() {
@@ -75,16 +105,25 @@ void Daemon::connect() {
   attempt([this] {
     bridges_.emplace(
         loop_, options_.database, memory_,
-        Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
-                      .host = host_,
-                      .changed = [this] { sync_soon(); },
-                      .altered =
-                          [this](std::string const &bridge) {
-                            say_(fmt::format(
-                                "somebody else changed flows or groups of the bridge {}", bridge));
-                            mend_soon();
-                          },
-                      .disturbed = [this] { connect_later(); }});
+        Bridges::Told{
+            .owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
+            .host = host_,
+            .counted = [this](auto key, auto const &totals,
+                              auto const &sessions) { counting_.count(key, totals, sessions); },
+            .moved =
+                [this](auto key, auto port) {
+                  if (port != 0) {
+                    counting_.count_move(key, port);
+                  }
+                },
+            .changed = [this] { sync_soon(); },
+            .altered =
+                [this](std::string const &bridge) {
+                  say_(fmt::format("somebody else changed flows or groups of the bridge {}",
+                                   bridge));
+                  mend_soon();
+                },
+            .disturbed = [this] { connect_later(); }});
     sync();
   });
 }
@@ -111,9 +150,7 @@ void Daemon::attempt(std::function<void()> const &work) {
     work();
     pause_ = {};
   } catch (std::runtime_error const &error) {
-    bridges_.reset();
-    troubles_.add(error.what());
-    connect_later();
+    fail(error.what());
   }
 }
 
@@ -127,6 +164,12 @@ void Daemon::look_at_commits() {
   } catch (std::runtime_error const &) {
     sync_soon();  // which says what is wrong with the state
   }
+}
+
+void Daemon::fail(std::string const &why) {
+  bridges_.reset();
+  troubles_.add(why);
+  connect_later();
 }
 
 void Daemon::sync_soon() {
@@ -193,7 +236,11 @@ void Daemon::sync() {
     return devices_.find(device).has_value();
   };
   auto const all = wanted_of(transaction, host_, options_.datapath, is_there);
+  bool const counts_anew = counting_.follow(transaction);
   transaction.commit();
+  if (counts_anew) {
+    bridges_->count();
+  }
   take_out_new_devices(all);
   auto const changed = bridges_->apply(all);
   if (changed > 0) {
@@ -201,6 +248,7 @@ void Daemon::sync() {
   }
   announcer_.follow(all, memory_);
   settle(all);
+  counting_.save_new();
 }
 
 // From a timer, too, so that nothing is thrown.
@@ -263,8 +311,7 @@ Json Daemon::addresses(Json const &question) {
   }
   auto const port = question.at("port").get<std::uint32_t>();
   Json entries = Json::array();
-  for (auto const &one :
-       bridges_->learned(storage::SwitchKey{question.at("switch").get<std::int64_t>()})) {
+  for (auto const &one : bridges_->learned(switch_in(question))) {
     if (one.port == port) {
       entries.push_back({{"mac", one.address}, {"vlan", one.vlan}, {"age", one.age}});
     }
@@ -279,6 +326,40 @@ Json Daemon::is_there(std::string const &device) {
   return {{"there", devices_.find(device).has_value()}};
 }
 
+// What goes wrong with it is no reason to say nothing of what is known.
+void Daemon::count_of(storage::SwitchKey key) {
+  try {
+    if (bridges_) {
+      bridges_->count(key);
+    }
+  } catch (std::runtime_error const &error) {
+    fail(error.what());
+  }
+}
+
+Json Daemon::counters(Json const &question) {
+  CounterOwner owner{.switch_key = switch_in(question),
+                     .port = std::nullopt,
+                     .session = question.at("session").get<std::string>()};
+  if (auto const port = question.at("port").get<std::uint32_t>()) {
+    owner.port = storage::PortNumber{port};
+  }
+  count_of(owner.switch_key);
+  storage::ReadingTransaction transaction(store_);
+  counting_.follow(transaction);
+  Json values = Json::object();
+  for (auto const &[name, value] : counting_.counters_of(transaction, owner)) {
+    values[std::string(name)] = value;
+  }
+  return {{"counters", values}};
+}
+
+Json Daemon::counting_sessions(Json const &question) {
+  auto const key = switch_in(question);
+  count_of(key);
+  return {{"sessions", counting_.unsaved_sessions(key)}};
+}
+
 void Daemon::handle(Json const &question, Reply const &reply) {
   try {
     auto const what = question.at("ask").get<std::string>();
@@ -288,6 +369,10 @@ void Daemon::handle(Json const &question, Reply const &reply) {
       reply(is_there(question.at("name").get<std::string>()));
     } else if (what == "addresses") {
       reply(addresses(question));
+    } else if (what == "counters") {
+      reply(counters(question));
+    } else if (what == "sessions") {
+      reply(counting_sessions(question));
     } else if (what == "bridge") {
       reply({{"name", bridge_name(host_, question.at("switch").get<std::string>())},
              {"folder", options_.database.parent_path().string()}});

@@ -12,6 +12,7 @@
 
 #include "daemon/announcer.h"
 #include "daemon/bridges.h"
+#include "daemon/counting/counting.h"
 #include "daemon/network_devices.h"
 #include "daemon/server.h"
 #include "daemon/state_watch.h"
@@ -36,9 +37,12 @@ class Daemon {
   void connect();
   /// Done when what is wanted is in force for the first time.
   void when_ready(std::function<void()> ready) { ready_ = std::move(ready); }
+  /// Puts into the state what was counted, as it does from time to time.
+  void count();
 
  private:
   void attempt(std::function<void()> const &work);
+  void fail(std::string const &why);
   void connect_later();
   void mend_soon();
   void look_at_commits();
@@ -55,6 +59,10 @@ class Daemon {
   void handle_in_force(std::uint64_t change, Reply const &reply);
   [[nodiscard]] Json is_there(std::string const &device);
   [[nodiscard]] Json addresses(Json const &question);
+  void count_of(storage::SwitchKey key);
+  [[nodiscard]] Json counters(Json const &question);
+  [[nodiscard]] Json counting_sessions(Json const &question);
+  void count_from_now_on();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
 
   events::Loop &loop_;
@@ -69,6 +77,7 @@ class Daemon {
   Server server_;
   Memory memory_;
   Announcer announcer_;
+  Counting counting_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
   std::optional<std::int64_t> commits_;          // to the state, at the last look
@@ -81,6 +90,7 @@ class Daemon {
   events::Loop::Timer next_mend_;
   events::Clock::time_point mended_;    // when the last one was due
   events::Clock::duration pause_ = {};  // before the next attempt to connect
+  events::Loop::Timer next_count_;
 };
 
 }  // namespace simhost::daemon

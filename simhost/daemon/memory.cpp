@@ -1,9 +1,9 @@
 // A flow is made anew by the one that taught it, as that is now.
 #include "daemon/memory.h"
 
-#include <optional>
 #include <utility>
 
+#include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/reconcile/relearning.h"
 
 namespace simhost::daemon {
@@ -19,14 +19,23 @@ std::uint32_t port_in(std::uint64_t cookie) {
 
 }  // namespace
 
-void Memory::follow(storage::SwitchKey key, openflow::FlowUpdate const &update) {
+std::optional<std::uint32_t> Memory::follow(storage::SwitchKey key,
+                                            openflow::FlowUpdate const &update) {
   using Event = openflow::FlowUpdate::Event;
   auto &flows = bridges_[key].flows;
+  auto const place = openflow::place(update.flow);
   if (update.event == Event::removed) {
-    flows.erase(openflow::place(update.flow));
-  } else if (update.event < Event::own) {
-    flows.insert_or_assign(openflow::place(update.flow), update.flow);
+    flows.erase(place);
   }
+  if (update.event == Event::removed || update.event >= Event::own) {
+    return std::nullopt;
+  }
+  auto const known = flows.find(place);
+  auto const port = port_in(update.flow.cookie);
+  bool const moved = update.flow.table == openvswitch::table::kLearnedAddresses &&
+                     known != flows.end() && port_in(known->second.cookie) != port;
+  flows.insert_or_assign(place, update.flow);
+  return moved ? std::optional(port) : std::nullopt;
 }
 
 void Memory::follow_devices(storage::SwitchKey key,

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <map>
+#include <optional>
 #include <span>
 #include <string>
 #include <tuple>
@@ -17,8 +18,9 @@ namespace simhost::daemon {
 
 class Memory {
  public:
-  /// A bridge was told, or learned, a flow of a table that it fills by itself; or lost one.
-  void follow(storage::SwitchKey key, openflow::FlowUpdate const &update);
+  /// A bridge was told, or learned, a flow of a table that it fills by itself; or lost one. Returns
+  /// the port at which an address is learned that was learned elsewhere; 0 beyond the uplinks.
+  std::optional<std::uint32_t> follow(storage::SwitchKey key, openflow::FlowUpdate const &update);
   /// The devices of a bridge, with the numbers of their ports. What was learned at a port that has
   /// another device than before is forgotten.
   void follow_devices(storage::SwitchKey key, std::map<std::string, std::uint32_t> const &devices);

@@ -94,6 +94,7 @@ void serve(Words const &words) {
   }
   loop.run();
   notify("STOPPING=1");
+  daemon.count();
   say("ends");
 }
 

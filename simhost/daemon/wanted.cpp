@@ -26,10 +26,12 @@ void add_devices(storage::Transaction &transaction, WantedBridge &bridge) {
   for (auto const &[port, device] : storage::port_devices(transaction, bridge.key)) {
     bridge.row.devices.emplace(device.name, device.number);
     bridge.ports.emplace(device.name, static_cast<std::uint32_t>(port));
+    bridge.numbers.emplace(device.number, static_cast<std::uint32_t>(port));
   }
   for (auto const &uplink : storage::uplinks_of(transaction, bridge.key)) {
     if (auto const device = storage::device_of(transaction, uplink.name)) {
       bridge.row.devices.emplace(device->name, device->number);
+      bridge.numbers.emplace(device->number, static_cast<std::uint32_t>(uplink.port));
     }
   }
 }
@@ -94,6 +96,15 @@ void shorten(std::optional<ClockTime> &lasts, std::optional<ClockTime> const &ot
   }
 }
 
+openvswitch::CountedSessions sessions_of(openvswitch::Network const &network) {
+  openvswitch::CountedSessions sessions;
+  for (auto const &mirror : network.mirrors) {
+    sessions[mirror.id] = {.sid = mirror.sid,
+                           .copies = mirror.to_ports.size() + mirror.to_uplinks.size()};
+  }
+  return sessions;
+}
+
 }  // namespace
 
 // Linux has room for fifteen bytes, and an alias may change.
@@ -124,6 +135,8 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                         .alias = row.alias,
                         .row = {.name = bridge_name(host, row.identifier), .datapath = datapath},
                         .ports = {},
+                        .numbers = {},
+                        .sessions = {},
                         .compiled = {}};
     add_devices(transaction, bridge);
     if (!row.associated || bridge.row.devices.empty()) {
@@ -134,6 +147,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       auto const network = openvswitch::read_network(transaction, key, team, {});
       bridge.compiled = openvswitch::compile(network);
       add_carried(transaction, network, team.policy, bridge);
+      bridge.sessions = sessions_of(network);
       std::erase_if(bridge.row.devices,
                     [&](auto const &device) { return !is_there(device.first); });
       bridge.row.limits = {

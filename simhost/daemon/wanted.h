@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "clock/clock.h"
+#include "daemon/counting/bridge_totals.h"
 #include "planes/openvswitch/compile/announcement.h"
 #include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/rows/rows.h"
@@ -34,7 +35,9 @@ struct WantedBridge {
   std::string alias;
   openvswitch::BridgeRow row;
   std::map<std::string, std::uint32_t> ports;  ///< the numbers of those that devices are at
-  openvswitch::Compiled compiled;              ///< with the marker of the change
+  PortNumbers numbers;                         ///< likewise, of uplink ports too
+  openvswitch::CountedSessions sessions;
+  openvswitch::Compiled compiled;  ///< with the marker of the change
   std::vector<Carried> carried = {};
 };
 

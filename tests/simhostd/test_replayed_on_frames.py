@@ -33,7 +33,7 @@ _ALL = """
     for made in frames.examples, sequences, clones:
         found.append(made())
         connected.append(frames.connected)
-    unused = [str(one) for one in frames.allowances.unused]
+    unused = [one.reason for one in frames.allowances.unused]
     return [found, connected, unused, frames.lab.plane()]
 """
 
@@ -81,7 +81,8 @@ def test_nothing_differs_but_what_is_known(tmp_path: Path) -> None:
     assert [wrong for _, wrong in found] == [[], [], []]
     examples, sequences, clones = (count for count, _ in found)
     assert examples == 8 and sequences >= 4 and clones > 0
-    assert unused == []
+    # Open vSwitch adds up what it counted every half a second.
+    assert [reason for reason in unused if "sooner or later" not in reason] == []
     # It was simhostd's plane, and in each part there were ports with devices.
     assert 0 < connected[0] < connected[1] < connected[2]
     assert plane["change"] == plane["in_force"] > 50

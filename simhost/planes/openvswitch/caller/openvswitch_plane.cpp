@@ -40,6 +40,29 @@ Json asked(std::filesystem::path const &file, Json const &question) {
   }
 }
 
+// Nothing without a daemon.
+std::optional<Json> asked_if_there(std::filesystem::path const &file, Json const &question) {
+  try {
+    return asked(file, question);
+  } catch (Refused const &refused) {
+    if (refused.status() != QEX_TIMEOUT) {
+      throw;
+    }
+    return std::nullopt;
+  }
+}
+
+Counters counters_in(Json const &said, CounterKind kind) {
+  Counters counters;
+  for (auto const &counter : counters_of(kind)) {
+    auto const value = said.find(counter.name);
+    if (value != said.end()) {
+      counters.set(counter, value->get<std::uint64_t>());
+    }
+  }
+  return counters;
+}
+
 // Six numbers of 0 to 255.
 void put_mac(Json const &said, VSMACEntry &entry) {
   auto const bytes = said.get<std::array<std::uint8_t, sizeof entry.macAddress>>();
@@ -95,12 +118,26 @@ bool OpenVswitchPlane::has_frames(storage::Transaction &transaction, Place const
     return false;
   }
   if (place.port) {
-    return storage::device_of(transaction, *place.port).has_value();
+    auto const uplink = storage::uplink_at(transaction, *place.port);
+    return uplink ? storage::device_of(transaction, *uplink).has_value()
+                  : storage::device_of(transaction, *place.port).has_value();
   }
   auto const uplinks = storage::uplinks_of(transaction, place.switch_key);
   return std::ranges::any_of(uplinks, [&](auto const &uplink) {
     return storage::device_of(transaction, uplink.name).has_value();
   });
+}
+
+// What a switch itself counts, no frames do.
+bool OpenVswitchPlane::counts_frames(storage::Transaction &transaction,
+                                     CounterOwner const &owner) const {
+  Place const place{.switch_key = owner.switch_key, .port = owner.port};
+  if (owner.session.empty()) {
+    return owner.port && has_frames(transaction, place);
+  }
+  return has_frames(transaction, place) ||
+         (storage::frames_change(transaction) &&
+          !storage::port_devices(transaction, owner.switch_key).empty());
 }
 
 bool OpenVswitchPlane::link_is_up(storage::Transaction &transaction, std::string_view uplink) {
@@ -136,6 +173,7 @@ VSPMACLearningStats OpenVswitchPlane::learning_stats(storage::Transaction &trans
   if (has_frames(transaction, place)) {
     auto const reply = asked(file_, question_about("addresses", place));
     stats.numMACsLearned = static_cast<std::uint32_t>(reply.at("addresses").size());
+    show(counters(transaction, {.switch_key = place.switch_key, .port = place.port}), stats);
   }
   return stats;
 }
@@ -151,13 +189,31 @@ std::optional<McastGroup> OpenVswitchPlane::group(storage::Transaction &transact
   return stored_.group(transaction, port, address);
 }
 
+// Without a daemon they are what they were when it counted last.
 Counters OpenVswitchPlane::counters(storage::Transaction &transaction, CounterOwner const &owner) {
-  return stored_.counters(transaction, owner);
+  if (!counts_frames(transaction, owner)) {
+    return stored_.counters(transaction, owner);
+  }
+  auto question = question_about("counters", {.switch_key = owner.switch_key, .port = owner.port});
+  question["session"] = owner.session;
+  auto const reply = asked_if_there(file_, question);
+  return reply ? counters_in(reply->at("counters"), kind_of(owner))
+               : stored_.counters(transaction, owner);
 }
 
 std::vector<std::string> OpenVswitchPlane::counting_sessions(storage::Transaction &transaction,
                                                              storage::SwitchKey key) {
-  return stored_.counting_sessions(transaction, key);
+  auto sessions = stored_.counting_sessions(transaction, key);
+  if (counts_frames(transaction, {.switch_key = key, .session = "any"})) {
+    auto const question = question_about("sessions", {.switch_key = key, .port = std::nullopt});
+    if (auto const reply = asked_if_there(file_, question)) {
+      auto const more = reply->at("sessions").get<std::vector<std::string>>();
+      sessions.insert(sessions.end(), more.begin(), more.end());
+      std::ranges::sort(sessions);
+      sessions.erase(std::unique(sessions.begin(), sessions.end()), sessions.end());
+    }
+  }
+  return sessions;
 }
 
 void OpenVswitchPlane::set_admin_state(storage::ChangingTransaction &transaction,

@@ -62,6 +62,8 @@ class OpenVswitchPlane : public Plane {
 
  private:
   [[nodiscard]] bool has_frames(storage::Transaction &transaction, Place const &place) const;
+  [[nodiscard]] bool counts_frames(storage::Transaction &transaction,
+                                   CounterOwner const &owner) const;
 
   Plane &stored_;
   std::filesystem::path file_;

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <string>
 #include <vector>
 
 #include "planes/openvswitch/openflow/port.h"
@@ -110,6 +111,7 @@ struct MirrorSources {
 
 struct Mirror {
   std::uint32_t id = 0;  ///< not 0, and of no other session of the switch
+  std::string sid = {};  ///< for those who count
   MirrorSources
       received;        ///< to clients of ports; from the wires of uplinks; over uplinks in VLANs
   MirrorSources sent;  ///< by clients of ports; to the wires of uplinks; by ports in VLANs

@@ -182,10 +182,21 @@ enum class Counted : std::uint8_t {
   out_multicast = 22,
   out_broadcast = 23,
   dropped = 24,  ///< not let in, for whichever reason
+  out_lost = 25,  ///< by the device itself, like the next ones
+  in_damaged = 26,
+  out_damaged = 27,
 };
 
 constexpr std::uint64_t cookie(Counted counted, std::uint32_t number = 0) {
   return static_cast<std::uint64_t>(counted) << 56U | number;
+}
+
+constexpr Counted kind_of(std::uint64_t cookie) {
+  return static_cast<Counted>(cookie >> 56U);
+}
+
+constexpr std::uint32_t number_of(std::uint64_t cookie) {
+  return static_cast<std::uint32_t>(cookie);
 }
 
 /// The tables whose flows count what callers are told of: by ports and sessions, in their cookies.

@@ -45,6 +45,7 @@ class Sessions {
     check(record);
     Mirror mirror;
     mirror.id = id;
+    mirror.sid = name_;
     mirror.received = sources(session.received_by, record.wildIn);
     mirror.sent = sources(session.sent_by, record.wildOut);
     mirror.remote_vlan = record.encapVlan;

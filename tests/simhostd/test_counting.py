@@ -1,0 +1,183 @@
+"""What frames leave behind: counters, exact, whatever ends or changes in between."""
+
+import json
+import os
+import signal
+import time
+from typing import Any, Dict
+
+from frame_lab import Lab
+from lasting_open_vswitch import LastingOpenVSwitch
+from simhost import Client
+
+BROADCAST, MULTICAST = "ff:ff:ff:ff:ff:ff", "01:00:5e:01:02:03"
+LENGTH = 60
+# A type of Ethernet that is nobody's.
+PLAIN, IN_VLAN_5 = "88b5", "8100000588b5"
+
+
+def send(client: Client, times: int, to: str, source: str = "", head: str = PLAIN) -> None:
+    addresses = to + (source or client.mac)
+    frame = bytes.fromhex(addresses.replace(":", "") + head).ljust(LENGTH, b".")
+    for _ in range(times):
+        client.send(frame)
+
+
+def counters(lab: Lab, port: str) -> Dict[str, int]:
+    (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
+    (found,) = (one for one in switch["ports"] if one["id"] == port)
+    return dict(found["counters"])
+
+
+def come_to(read: Any, wanted: Any) -> None:
+    """Open vSwitch adds up what it counted every half a second."""
+    deadline = time.monotonic() + 5
+    while (found := read()) != wanted and time.monotonic() < deadline:
+        time.sleep(0.05)
+    assert found == wanted
+
+
+def test_frames_count_where_they_come_in_and_go_out(lab: Lab) -> None:
+    one, other, _ = (lab.client("lab", port) for port in "abc")
+    send(other, 1, BROADCAST)
+    send(one, 5, other.mac)
+    send(one, 3, BROADCAST)
+    send(one, 2, MULTICAST)
+    come_to(
+        lambda: counters(lab, "a"),
+        {
+            **{"pktsInUnicast": 5, "bytesInUnicast": 5 * LENGTH},
+            **{"pktsInBroadcast": 3, "bytesInBroadcast": 3 * LENGTH},
+            **{"pktsInMulticast": 2, "bytesInMulticast": 2 * LENGTH},
+            **{"pktsOutBroadcast": 1, "bytesOutBroadcast": LENGTH},
+        },
+    )
+    come_to(
+        lambda: counters(lab, "b"),
+        {
+            **{"pktsInBroadcast": 1, "bytesInBroadcast": LENGTH},
+            **{"pktsOutUnicast": 5, "bytesOutUnicast": 5 * LENGTH},
+            **{"pktsOutBroadcast": 3, "bytesOutBroadcast": 3 * LENGTH},
+            **{"pktsOutMulticast": 2, "bytesOutMulticast": 2 * LENGTH},
+        },
+    )
+    come_to(
+        lambda: counters(lab, "c"),
+        {
+            **{"pktsOutBroadcast": 4, "bytesOutBroadcast": 4 * LENGTH},
+            **{"pktsOutMulticast": 2, "bytesOutMulticast": 2 * LENGTH},
+        },
+    )
+
+
+def test_what_is_not_let_in_is_dropped(lab: Lab) -> None:
+    lab.set_port("lab", "a", forbids=["forged_transmits"])
+    one = lab.client("lab", "a")
+    lab.ctl("connect", "lab", "a", "c1", "--mac", one.mac)
+    send(one, 1, BROADCAST)
+    send(one, 4, BROADCAST, head=IN_VLAN_5)
+    send(one, 2, "01:80:c2:00:00:0e")
+    send(one, 3, BROADCAST, source="02:00:00:00:99:99")
+    counted = {"pktsInBroadcast": 1, "bytesInBroadcast": LENGTH}
+    come_to(lambda: counters(lab, "a"), {**counted, "pktsInDropped": 9})
+    lab.set_port("lab", "a", blocked=True)
+    send(one, 2, BROADCAST)
+    come_to(lambda: counters(lab, "a"), {**counted, "pktsInDropped": 11})
+
+
+def come_to_count(lab: Lab, frames: int) -> None:
+    """What port a was let send, to all."""
+    counted = {"pktsInBroadcast": frames, "bytesInBroadcast": frames * LENGTH}
+    come_to(lambda: counters(lab, "a"), counted if frames else {})
+
+
+def test_counters_go_on_when_flows_and_processes_begin_anew(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    send(one, 3, BROADCAST)
+    come_to_count(lab, 3)
+    lab.ctl("disconnect", "lab", "a")
+    come_to_count(lab, 3)
+    lab.ctl("connect", "lab", "a", "c1")
+    send(one, 4, BROADCAST)
+    come_to_count(lab, 7)
+    os.kill(lab.processes()["ovs-vswitchd"], signal.SIGKILL)
+    come_to_count(lab, 7)
+    come_to(lambda: lab.processes().keys(), {"ovs-vswitchd", "ovsdb-server"})
+    lab.set_port("lab", "a", vlan=7)
+    send(one, 5, BROADCAST)
+    come_to_count(lab, 12)
+
+
+def test_counters_go_on_when_the_daemon_does(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    send(one, 3, BROADCAST)
+    come_to_count(lab, 3)
+    lab.stop()
+    # What was known at the end.
+    come_to_count(lab, 3)
+    lab.start()
+    send(one, 4, BROADCAST)
+    come_to_count(lab, 7)
+
+
+def test_counters_of_a_restarted_host_begin_anew(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    send(one, 3, BROADCAST)
+    come_to_count(lab, 3)
+    lab.ctl("restart")
+    come_to_count(lab, 0)
+    send(one, 2, BROADCAST)
+    come_to_count(lab, 2)
+
+
+def test_what_an_open_vswitch_that_stays_counts_without_a_daemon_is_counted(idle: Lab) -> None:
+    with LastingOpenVSwitch(idle) as lasting:
+        idle.start(lasting.where)
+        one = idle.client("lab", "a")
+        send(one, 3, BROADCAST)
+        come_to_count(idle, 3)
+        idle.stop(signal.SIGKILL)
+        send(one, 4, BROADCAST)
+        idle.start(lasting.where)
+        come_to_count(idle, 7)
+
+
+def test_mirror_sessions_count_what_they_copy(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    lab.client("lab", "b")
+    to = [{"port": "b"}, {"port": "c"}]
+    session = {"sid": "s", "to": to, "sent_by": [{"port": "a"}]}
+    lab.set_port("lab", "b", vlan=99)
+    lab.set_port("lab", "a", mirror_sessions=[session])
+
+    def counted() -> Any:
+        (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
+        return switch["mirror_counters"]
+
+    send(one, 3, BROADCAST)
+    # No device is at c.
+    come_to(counted, {"s": {"mirroredPkts": 3, "mirrorPktCnt": 3}})
+
+
+REFUSED = "simhostctl: {} has the device {}: what comes over it cannot be set (QEX_NOT_SUPPORTED)\n"
+
+
+def test_no_counter_of_what_has_a_device_is_set(idle: Lab) -> None:
+    idle.ctl("connect", "lab", "a", "c1")
+    port = REFUSED.format("the port 'a' of the switch 'lab'", "c1")
+
+    def said(*words: str) -> str:
+        return idle.try_ctl("counter", "lab", *words).stdout
+
+    assert said("pktsInUnicast", "7", "--port", "a") == port
+    assert said("mirroredPkts", "7", "--session", "s") == port
+    # These have no device, and nothing that one brings.
+    assert said("pktsInUnicast", "7", "--port", "b") == ""
+    assert said("rarpPktsSent", "7") == ""
+    idle.ctl("uplink", "nic0", "--device", "u0")
+    uplink = REFUSED.format("the uplink 'nic0'", "u0")
+    (switch,) = json.loads(idle.ctl("show", "--json"))["switches"]
+    (at,) = (one["id"] for one in switch["uplink_ports"] if one["uplink"] == "nic0")
+    assert said("pktsInUnicast", "7", "--port", at) == uplink
+    assert said("rarpPktsSent", "7") == uplink
+    assert counters(idle, "b") == {"pktsInUnicast": 7}
