@@ -184,6 +184,11 @@ openvswitch::PresentRows const &Bridges::present() {
   return *present_;
 }
 
+std::optional<std::string> Bridges::elsewhere(std::string const &device) {
+  auto const found = present().elsewhere.find(device);
+  return found == present().elsewhere.end() ? std::nullopt : std::optional(found->second);
+}
+
 void Bridges::take_ownership() {
   if (!database_.lock(kLock, soon())) {
     auto const &owner = present().owner;
@@ -213,6 +218,8 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadlin
   std::vector<openvswitch::BridgeRow> rows;
   for (auto const &bridge : wanted.bridges) {
     rows.push_back(bridge.row);
+    std::erase_if(rows.back().devices,
+                  [&](auto const &device) { return present().elsewhere.contains(device.first); });
   }
   for (auto const &bridge : present().bridges) {
     if (std::ranges::any_of(wanted.unfit,

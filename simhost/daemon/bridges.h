@@ -59,6 +59,8 @@ class Bridges {
   Bridges(Bridges const &) = delete;
   Bridges &operator=(Bridges const &) = delete;
 
+  /// The bridge of somebody else that has a device.
+  std::optional<std::string> elsewhere(std::string const &device);
   /// Makes everything as it is wanted, and returns when it is in force. Returns how many flows and
   /// groups it changed, markers not counted.
   std::size_t apply(Wanted const &wanted);

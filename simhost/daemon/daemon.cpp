@@ -278,6 +278,14 @@ void Daemon::settle(Wanted const &wanted) {
       }
     }
   }
+  for (auto const &bridge : wanted.bridges) {
+    for (auto const &[name, number] : bridge.row.devices) {
+      if (auto const other = bridges_->elsewhere(name)) {
+        troubles_.add(
+            fmt::format("the device {} is at the bridge {} of somebody else", name, *other));
+      }
+    }
+  }
   in_force_ = wanted.change;
   sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {
@@ -323,7 +331,12 @@ Json Daemon::is_there(std::string const &device) {
   if (devices_.refresh()) {
     sync_soon();
   }
-  return {{"there", devices_.find(device).has_value()}};
+  auto at = bridges_ ? bridges_->elsewhere(device).value_or("") : std::string();
+  // One that is at a bridge of Open vSwitch may have a master because of that.
+  if (at.empty() && !at_bridges_.contains(device)) {
+    at = devices_.master_of(device);
+  }
+  return {{"there", devices_.find(device).has_value()}, {"at", at}};
 }
 
 // What goes wrong with it is no reason to say nothing of what is known.

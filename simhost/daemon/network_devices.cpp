@@ -159,6 +159,8 @@ bool NetworkDevices::take_device(nlmsghdr const &header) {
       name = static_cast<char const *>(RTA_DATA(attribute));
     } else if (attribute->rta_type == IFLA_MTU) {
       std::memcpy(&device.mtu, RTA_DATA(attribute), sizeof device.mtu);
+    } else if (attribute->rta_type == IFLA_MASTER) {
+      std::memcpy(&device.master, RTA_DATA(attribute), sizeof device.master);
     }
   }
   return put(name, device);
@@ -191,6 +193,12 @@ bool NetworkDevices::remove(unsigned index) {
 std::optional<NetworkDevice> NetworkDevices::find(std::string_view name) const {
   auto const found = devices_.find(name);
   return found == devices_.end() ? std::nullopt : std::optional(found->second);
+}
+
+std::string NetworkDevices::master_of(std::string_view name) const {
+  auto const device = devices_.find(name);
+  auto const master = device == devices_.end() ? names_.end() : names_.find(device->second.master);
+  return master == names_.end() ? std::string() : master->second;
 }
 
 WireSpeed wire_speed(std::string_view device) {

@@ -20,6 +20,7 @@ struct NetworkDevice {
   bool is_up;      ///< switched on
   bool has_link;
   std::uint32_t mtu;
+  unsigned master = 0;  ///< the index of the bridge or bond that it is at; 0 for none
 
   bool operator==(NetworkDevice const &) const = default;
 };
@@ -41,6 +42,8 @@ class NetworkDevices {
   /// whether that was anything.
   bool refresh();
   [[nodiscard]] std::optional<NetworkDevice> find(std::string_view name) const;
+  /// The name of the bridge or bond of the kernel that a device is at; empty if it is at none.
+  [[nodiscard]] std::string master_of(std::string_view name) const;
 
  private:
   void ask_for_all();

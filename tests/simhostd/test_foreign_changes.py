@@ -1,10 +1,13 @@
-"""What somebody else changes in the same Open vSwitch is put right where it is the host's."""
+"""What somebody else changes in the same Open vSwitch: put right where it is the host's, left alone
+where it is not."""
 
-from typing import List
+from pathlib import Path
+from typing import Iterator, List
 
 import pytest
 
 from frame_lab import Lab, comes_true
+from lasting_open_vswitch import LastingOpenVSwitch
 
 
 class Meddler:
@@ -18,6 +21,10 @@ class Meddler:
     def ofctl(self, command: str, *words: str) -> str:
         target = f"unix:{self.socket}"
         return self._lab.host.run("ovs-ofctl", "-OOpenFlow15", command, target, *words)
+
+    def vsctl(self, *words: str) -> str:
+        database = f"--db=unix:{self._lab.run_folder()}/db.sock"
+        return self._lab.host.run("ovs-vsctl", database, *words)
 
     def flows(self) -> List[str]:
         """Those that the host made, without what they counted."""
@@ -71,3 +78,103 @@ def test_a_group_is_put_right(meddler: Meddler) -> None:
     number = before[0].split("group_id=")[1].split(",")[0]
     meddler.ofctl("mod-group", f"group_id={number},type=all,bucket=actions=drop")
     assert comes_true(lambda: meddler.groups() == before)
+
+
+@pytest.mark.parametrize(
+    "change",
+    [
+        ["set", "Bridge", "{}", "fail_mode=standalone"],
+        ["set", "Bridge", "{}", "protocols=OpenFlow13"],
+        ["set-controller", "{}", "tcp:127.0.0.1:6653"],
+        ["add-port", "{}", "lo"],
+        ["del-port", "c1"],
+        ["set", "Port", "c1", "tag=7"],
+        ["set", "Port", "c1", "trunks=7"],
+        ["set", "Interface", "c1", "ofport_request=99"],
+        ["set", "Interface", "c1", "ingress_policing_rate=1"],
+        ["del-br", "{}"],
+    ],
+)
+def test_rows_are_put_right(meddler: Meddler, change: List[str]) -> None:
+    def rows() -> List[str]:
+        tables = (
+            ("Bridge", "name fail_mode protocols controller"),
+            ("Port", "name tag trunks"),
+            (
+                "Interface",
+                "name ofport_request ingress_policing_rate",
+            ),
+        )
+        said = []
+        for table, columns in tables:
+            said += meddler.vsctl(
+                "--format=csv", f"--columns={columns.replace(' ', ',')}", "list", table
+            ).splitlines()
+        return sorted(said)
+
+    before = rows()
+    meddler.vsctl(*(word.format(meddler.bridge) for word in change))
+    assert comes_true(lambda: rows() == before)
+
+
+@pytest.fixture
+def lasting(idle: Lab) -> Iterator[LastingOpenVSwitch]:
+    with LastingOpenVSwitch(idle) as open_vswitch:
+        yield open_vswitch
+
+
+def test_bridges_of_others_are_left_alone(idle: Lab, lasting: LastingOpenVSwitch) -> None:
+    others = "other0", "other-port"
+    idle.start(lasting.where)
+    one, other = idle.client("lab", "a"), idle.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    meddler = Meddler(idle)
+    meddler.vsctl(
+        *("add-br", others[0], "--", "set", "Bridge", others[0], "datapath_type=netdev"),
+        *("--", "add-port", *others, "--", "set", "Interface", others[1], "type=internal"),
+    )
+    flows = ["ovs-ofctl", "dump-flows", "--no-stats", f"unix:{idle.run_folder()}/{others[0]}.mgmt"]
+    before = idle.host.run(*flows)
+    idle.set_port("lab", "a", vlan=7)
+    idle.ctl("disconnect", "lab", "b")
+    idle.stop()
+    idle.start(lasting.where)
+    assert idle.host.run(*flows) == before
+    assert others[1] in meddler.vsctl("list-ports", others[0])
+    assert meddler.vsctl("get", "Bridge", others[0], "external_ids").strip() == "{}"
+
+
+def test_a_device_of_another_bridge_is_left_there(idle: Lab, lasting: LastingOpenVSwitch) -> None:
+    idle.start(lasting.where)
+    one, other = idle.client("lab", "a"), idle.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    meddler = Meddler(idle)
+    meddler.vsctl("add-br", "other0", "--", "set", "Bridge", "other0", "datapath_type=netdev")
+    idle.host.run("ip", "link", "add", "taken0", "type", "veth", "peer", "name", "taken1")
+    meddler.vsctl("add-port", "other0", "taken0")
+    change = idle.plane()["change"]
+    done = idle.try_ctl("connect", "lab", "c", "taken0")
+    assert done.returncode == 1
+    assert done.stdout == "simhostctl: the device taken0 is at the bridge other0 (QEX_BUSY)\n"
+    assert idle.plane()["change"] == change
+    # One that is taken away later stays away, and nothing else stops for it.
+    meddler.vsctl("del-port", "c1", "--", "add-port", "other0", "c1")
+    why = "the device c1 is at the bridge other0 of somebody else"
+    assert comes_true(lambda: why in idle.plane()["said"])
+    idle.set_port("lab", "b", vlan=7)
+    assert idle.is_in_force()
+    assert "c1" in meddler.vsctl("list-ports", "other0")
+    meddler.vsctl("del-port", "other0", "c1")
+    assert comes_true(lambda: not idle.plane()["said"])
+    idle.set_port("lab", "a", vlan=7)
+    assert one.comes_to_reach(other)
+
+
+def test_a_device_of_a_linux_bridge_is_refused(lab: Lab, tmp_path: Path) -> None:
+    run = lab.host.run
+    run("ip", "link", "add", "linux0", "type", "bridge")
+    run("ip", "link", "add", "taken0", "type", "veth", "peer", "name", "taken1")
+    run("ip", "link", "set", "taken0", "master", "linux0")
+    done = lab.try_ctl("uplink", "nic0", "--device", "taken0")
+    assert done.returncode == 1
+    assert "the device taken0 is at the bridge linux0 (QEX_BUSY)\n" in done.stdout

@@ -27,6 +27,7 @@ using Rows = std::vector<BridgeRow>;
 Schema schema() {
   using Kind = Column::Kind;
   Column const single{.kind = Kind::single, .is_optional = false, .usual = ""};
+  Column const number{.kind = Kind::single, .is_optional = false, .usual = 0};
   Column const set{.kind = Kind::set, .is_optional = false, .usual = simhost::ovsdb::set({})};
   Column const optional{.kind = Kind::set, .is_optional = true, .usual = simhost::ovsdb::set({})};
   Column const map{.kind = Kind::map, .is_optional = false, .usual = simhost::ovsdb::map({})};
@@ -36,9 +37,23 @@ Schema schema() {
             {"datapath_type", single},
             {"ports", set},
             {"external_ids", map},
-            {"flow_tables", map}}},
-          {"Port", {{"name", single}, {"interfaces", set}}},
-          {"Interface", {{"name", single}, {"ofport_request", optional}}},
+            {"flow_tables", map},
+            {"fail_mode", optional},
+            {"protocols", set},
+            {"controller", set},
+            {"mirrors", set},
+            {"other_config", map}}},
+          {"Port",
+           {{"name", single},
+            {"interfaces", set},
+            {"tag", optional},
+            {"trunks", set},
+            {"vlan_mode", optional}}},
+          {"Interface",
+           {{"name", single},
+            {"ofport_request", optional},
+            {"type", single},
+            {"ingress_policing_rate", number}}},
           {"Flow_Table", {{"flow_limit", optional}}}};
 }
 
@@ -58,14 +73,18 @@ Replica replica() {
       "b1": {"initial": {"name": "vs1", "datapath_type": "netdev",
                          "ports": ["set", [["uuid", "p0"], ["uuid", "p1"]]],
                          "external_ids": ["map", [["simhost", "/h.db"]]],
-                         "flow_tables": ["map", [[32, ["uuid", "t"]]]]}},
-      "b2": {"initial": {"name": "br0"}}},
+                         "flow_tables": ["map", [[32, ["uuid", "t"]]]],
+                         "fail_mode": "secure", "protocols": "OpenFlow15",
+                         "other_config": ["map", [["disable-in-band", "true"]]]}},
+      "b2": {"initial": {"name": "br0", "ports": ["uuid", "p2"]}}},
     "Port": {
       "p0": {"initial": {"name": "vs1", "interfaces": ["uuid", "i0"]}},
-      "p1": {"initial": {"name": "c1", "interfaces": ["uuid", "i1"]}}},
+      "p1": {"initial": {"name": "c1", "interfaces": ["uuid", "i1"]}},
+      "p2": {"initial": {"name": "eth7", "interfaces": ["uuid", "i2"]}}},
     "Interface": {
       "i0": {"initial": {"name": "vs1"}},
-      "i1": {"initial": {"name": "c1", "ofport_request": 5}}},
+      "i1": {"initial": {"name": "c1", "ofport_request": 5}},
+      "i2": {"initial": {"name": "eth7"}}},
     "Flow_Table": {"t": {"initial": {"flow_limit": 100}}}
   })json");
 }
@@ -115,6 +134,25 @@ TEST(TheRows, ChangeInPlace) {
   auto limited = vs1();
   limited.limits[32] = 7;
   EXPECT_THAT(told(present, {limited}), ElementsAre("insert Flow_Table", "update Bridge"));
+}
+
+TEST(TheRows, OfOthersSayWhichDevicesAreThere) {
+  EXPECT_THAT(present_rows(replica(), kHost).elsewhere,
+              ElementsAre(std::pair<std::string const, std::string>("eth7", "br0")));
+}
+
+TEST(TheRows, ThatSomebodyElseChangedAreMadeAsTheyWere) {
+  auto standalone = replica();
+  standalone.apply(
+      Json::parse(R"json({"Bridge": {"b1": {"modify": {"fail_mode": "standalone"}}}})json"));
+  EXPECT_THAT(told(present_rows(standalone, kHost), {vs1()}), ElementsAre("update Bridge"));
+  for (auto const *change : {R"json({"Port": {"p1": {"modify": {"tag": 7}}}})json",
+                             R"json({"Interface": {"i1": {"modify": {"type": "tap"}}}})json"}) {
+    auto altered = replica();
+    altered.apply(Json::parse(change));
+    EXPECT_THAT(told(present_rows(altered, kHost), {vs1()}),
+                ElementsAre("insert Interface", "insert Port", "mutate Bridge"));
+  }
 }
 
 TEST(TheRows, OfBridgesThatNobodyWantsGoWithAllThatIsTheirs) {

@@ -251,6 +251,9 @@ void OpenVswitchPlane::check_device(storage::Transaction &transaction, std::stri
     if (!reply.value("there", true)) {
       throw Refused(QEX_NOT_FOUND, fmt::format("simhostd sees no device {}", device));
     }
+    if (auto const at = reply.value("at", std::string()); !at.empty()) {
+      throw Refused(QEX_BUSY, fmt::format("the device {} is at the bridge {}", device, at));
+    }
   } catch (NoDaemon const &) {
     // It is looked for when a daemon is there.
   }

@@ -61,6 +61,29 @@ std::string id_in(Json const &column) {
       fmt::format("Open vSwitch's database has rows that do not fit together: {}", error.what()));
 }
 
+// What each row of this host's says, whoever else writes there; as a replica has it.
+ovsdb::Row const kBridge{{"fail_mode", ovsdb::set({"secure"})},
+                         {"protocols", ovsdb::set({"OpenFlow15"})},
+                         {"controller", ovsdb::set({})},
+                         {"mirrors", ovsdb::set({})},
+                         {"other_config", map_of({{"disable-in-band", "true"}})}};
+ovsdb::Row const kPort{
+    {"tag", ovsdb::set({})}, {"trunks", ovsdb::set({})}, {"vlan_mode", ovsdb::set({})}};
+ovsdb::Row const kInterface{{"type", ""}, {"ingress_policing_rate", 0}};
+
+bool says(ovsdb::Row const &row, ovsdb::Row const &what) {
+  return std::ranges::all_of(
+      what, [&](auto const &column) { return row.at(column.first) == column.second; });
+}
+
+Json json_of(ovsdb::Row const &row) {
+  Json all = Json::object();
+  for (auto const &[column, value] : row) {
+    all[column] = value;
+  }
+  return all;
+}
+
 struct Tables {
   ovsdb::Rows const &ports;
   ovsdb::Rows const &interfaces;
@@ -74,16 +97,21 @@ void add_device(PresentBridge &bridge, std::string const &port_id, Tables const 
     return;  // the bridge's own
   }
   bridge.ports.emplace(name, port_id);
-  auto const &interface = tables.interfaces.at(id_in(ovsdb::atoms_of(port.at("interfaces")).at(0)));
+  auto const interfaces = ovsdb::atoms_of(port.at("interfaces"));
+  auto const &interface = tables.interfaces.at(id_in(interfaces.at(0)));
   auto const requested = ovsdb::atoms_of(interface.at("ofport_request"));
-  bridge.row.devices[name] = requested.empty() ? 0 : requested.front().get<std::uint16_t>();
+  bool const is_ours = interfaces.size() == 1 && !requested.empty() && says(port, kPort) &&
+                       says(interface, kInterface);
+  // No device is wanted with that number, so that one that is not as it should be is put anew.
+  bridge.row.devices[name] = is_ours ? requested.front().get<std::uint16_t>() : 0;
 }
 
 PresentBridge bridge_of(std::string const &id, ovsdb::Row const &row, Tables const &tables) {
   PresentBridge bridge{.id = id,
                        .row = {.name = row.at("name").get<std::string>(),
                                .datapath = row.at("datapath_type").get<std::string>()},
-                       .ports = {}};
+                       .ports = {},
+                       .is_altered = !says(row, kBridge)};
   for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
     add_device(bridge, id_in(port), tables);
   }
@@ -116,15 +144,13 @@ class Writer {
     auto ports = added_ports(wanted.devices, {});
     ports.push_back(ovsdb::named_uuid(own));
     auto const name = names_.next();
-    told_.push_back(insert("Bridge", name,
-                           {{"name", wanted.name},
-                            {"datapath_type", wanted.datapath},
-                            {"fail_mode", "secure"},
-                            {"protocols", "OpenFlow15"},
-                            {"external_ids", map_of({{kHost, host_}})},
-                            {"other_config", map_of({{"disable-in-band", "true"}})},
-                            {"flow_tables", flow_tables(wanted)},
-                            {"ports", ovsdb::set(ports)}}));
+    auto row = json_of(kBridge);
+    row.update({{"name", wanted.name},
+                {"datapath_type", wanted.datapath},
+                {"external_ids", map_of({{kHost, host_}})},
+                {"flow_tables", flow_tables(wanted)},
+                {"ports", ovsdb::set(ports)}});
+    told_.push_back(insert("Bridge", name, std::move(row)));
     told_.push_back(
         mutate("Open_vSwitch", kEverywhere,
                Json::array({{"bridges", "insert", ovsdb::set({ovsdb::named_uuid(name)})}})));
@@ -138,6 +164,9 @@ class Writer {
   }
 
   void change(PresentBridge const &present, BridgeRow const &wanted) {
+    if (present.is_altered) {
+      told_.push_back(update("Bridge", is(ovsdb::uuid(present.id)), json_of(kBridge)));
+    }
     Json mutations = Json::array();
     std::vector<Json> gone;
     for (auto const &[device, number] : present.row.devices) {
@@ -235,9 +264,11 @@ bool is_same_bridge(PresentBridge const &present, BridgeRow const &wanted) {
 void select_rows(ovsdb::Selected &selected) {
   ovsdb::Selected const read{
       {"Open_vSwitch", {"external_ids", "other_config"}},
-      {"Bridge", {"name", "datapath_type", "ports", "external_ids", "flow_tables"}},
-      {"Port", {"name", "interfaces"}},
-      {"Interface", {"name", "ofport_request"}},
+      {"Bridge",
+       {"name", "datapath_type", "ports", "external_ids", "flow_tables", "fail_mode", "protocols",
+        "controller", "mirrors", "other_config"}},
+      {"Port", {"name", "interfaces", "tag", "trunks", "vlan_mode"}},
+      {"Interface", {"name", "ofport_request", "type", "ingress_policing_rate"}},
       {"Flow_Table", {"flow_limit"}}};
   for (auto const &[table, columns] : read) {
     auto &known = selected[table];
@@ -260,6 +291,11 @@ PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host) {
     for (auto const &[id, row] : replica.rows("Bridge")) {
       if (text_under(row.at("external_ids"), kHost) == host) {
         present.bridges.push_back(bridge_of(id, row, tables));
+      } else {
+        auto const name = row.at("name").get<std::string>();
+        for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
+          present.elsewhere[tables.ports.at(id_in(port)).at("name").get<std::string>()] = name;
+        }
       }
     }
     return present;

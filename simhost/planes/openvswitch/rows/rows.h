@@ -32,14 +32,16 @@ struct PresentBridge {
   std::string id;
   BridgeRow row;
   std::map<std::string, std::string> ports;  ///< identifiers of the rows, by device
+  bool is_altered = false;                   ///< not as this host makes its bridges
 };
 
 /// What of a whole database is this host's, and what all hosts have in common.
 struct PresentRows {
   bool is_new = true;  ///< without the one row of Open_vSwitch that each has
   std::vector<PresentBridge> bridges;
-  std::string owner;            ///< who writes them; empty if nobody does
-  std::uint32_t most_tags = 0;  ///< of the frames that the switch tells apart
+  std::string owner;                                  ///< who writes them; empty if nobody does
+  std::uint32_t most_tags = 0;                        ///< of the frames that the switch tells apart
+  std::map<std::string, std::string> elsewhere = {};  ///< devices of others' bridges, with these
 };
 
 /// The columns that present_rows() reads.
