@@ -3,10 +3,14 @@
 import json
 import os
 import signal
+import socket
+import subprocess
 import time
 from typing import Any, Dict
 
-from frame_lab import Lab
+import pytest
+
+from frame_lab import TOOLS, Lab
 from lasting_open_vswitch import LastingOpenVSwitch
 from simhost import Client
 
@@ -181,3 +185,50 @@ def test_no_counter_of_what_has_a_device_is_set(idle: Lab) -> None:
     assert said("pktsInUnicast", "7", "--port", at) == uplink
     assert said("rarpPktsSent", "7") == uplink
     assert counters(idle, "b") == {"pktsInUnicast": 7}
+
+
+def test_an_address_that_moves_counts_where_it_comes_to(lab: Lab) -> None:
+    learns = {"learning": True, "flooding": True}
+    for port in "ab":
+        lab.set_port("lab", port, mac_learning=learns)
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    moving = "02:00:00:00:77:01"
+    send(one, 1, BROADCAST, source=moving)
+    send(other, 1, BROADCAST, source=moving)
+    come_to(lambda: counters(lab, "b").get("numMACsMoved"), 1)
+    assert "numMACsMoved" not in counters(lab, "a")
+
+
+ASKS = """
+from libvswitch import checked
+checked.VSQEX_GetUplinks("lab"), checked.VSQEX_GetUplinkLinkState("lab", "nic0")
+checked.VSDVS_GetMTU("lab"), checked.VSQEX_GetRARPStats("lab"), checked.VSQEX_GetVSInfo("lab")
+checked.VSQEX_GetPortMACTable("lab", "b", 0)
+"""
+
+
+def test_only_what_frames_leave_behind_is_asked_of_the_daemon(
+    idle: Lab, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    idle.start()
+    idle.client("lab", "a")
+    idle.stop()
+    with socket.socket(socket.AF_UNIX) as line:
+        # An address of a socket is short.
+        monkeypatch.chdir(idle.folder)
+        line.bind(f"{idle.state.name}-simhostd")
+        line.listen()
+        line.setblocking(False)
+        idle.python(ASKS)
+        with pytest.raises(BlockingIOError):
+            line.accept()
+        # It hangs up on whoever asks; they are told what was known last.
+        line.settimeout(10)
+        asking = subprocess.Popen([TOOLS / "simhostctl", "show"], env=idle.environment)
+        while asking.poll() is None:
+            try:
+                line.settimeout(0.1)
+                line.accept()[0].close()
+            except socket.timeout:
+                pass
+        assert asking.returncode == 0
