@@ -16,7 +16,7 @@ from importlib.machinery import EXTENSION_SUFFIXES, PathFinder
 from pathlib import Path
 from typing import Any, Dict, List, Optional, Set
 
-from libvswitch import _children, _elf, _examined, _loader
+from libvswitch import _children, _elf, _examined, _frames_examined, _loader
 
 MODULE = "_libvswitch"
 HOST = ("libvswitch.so", "libnebPublic.so")
@@ -63,6 +63,8 @@ def examine() -> Report:
     _load(report)
     if report.simulated:
         _simulation(report)
+        for found in _frames_examined.examine(report.simulation[_STATE]):
+            report.add(*found)
     return report
 
 

@@ -390,7 +390,10 @@ void Daemon::handle(Json const &question, Reply const &reply) {
       reply({{"name", bridge_name(host_, question.at("switch").get<std::string>())},
              {"folder", options_.database.parent_path().string()}});
     } else if (what == "status") {
-      reply({{"change", in_force_}, {"said", troubles_.text()}, {"process", getpid()}});
+      reply({{"change", in_force_},
+             {"said", troubles_.text()},
+             {"process", getpid()},
+             {"datapath", options_.datapath}});
     } else {
       reply({{"refused", "nobody here knows '" + what + "'"}});
     }

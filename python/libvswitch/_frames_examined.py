@@ -1,0 +1,117 @@
+"""Whether real frames can move on this machine, and what moves those of a state."""
+
+import json
+import os
+import re
+import shutil
+import socket
+import subprocess
+from pathlib import Path
+from typing import Any, Dict, Iterator, List, NamedTuple, Optional, Tuple
+
+NOTE, OK, WARNING = "note", "ok", "warning"
+_ABOUT = "frames"
+_OLDEST = (3, 1)
+_INSTALL = "install Debian's package openvswitch-switch where frames are to move"
+_PATIENCE = 2.0
+# Root's own, and where users may have one.
+_USERS: Tuple[List[str], ...] = ([], ["--user", "--map-root-user"])
+
+
+class Found(NamedTuple):
+    level: str
+    about: str
+    text: str
+    advice: str = ""
+
+
+def examine(state: Optional[str]) -> Iterator[Found]:
+    """What holds on this machine, and of the host that is kept in `state`."""
+    yield _open_vswitch()
+    yield _namespaces()
+    status = _status(Path(state)) if state else None
+    if status is not None:
+        yield from _daemon(status)
+
+
+def _open_vswitch() -> Found:
+    program = shutil.which("ovs-vswitchd", path=f"{os.environ.get('PATH', '')}:/usr/sbin")
+    if program is None:
+        return Found(NOTE, _ABOUT, "there is no Open vSwitch, so no frames can move", _INSTALL)
+    said = _said_by(program, "--version")
+    found = re.search(r"\(Open vSwitch\) (\d+)\.(\d+)", said)
+    if found is None:
+        return Found(WARNING, _ABOUT, f"{program} does not say its version", _INSTALL)
+    version = int(found.group(1)), int(found.group(2))
+    text = f"Open vSwitch {_in_words(version)}, {program}"
+    if version < _OLDEST:
+        advice = f"get {_in_words(_OLDEST)} or later: simhostd was tried with no older one"
+        return Found(WARNING, _ABOUT, f"{text}, is too old", advice)
+    return Found(OK, _ABOUT, text)
+
+
+def _in_words(version: Tuple[int, int]) -> str:
+    return ".".join(str(number) for number in version)
+
+
+def _said_by(*words: str) -> str:
+    try:
+        done = subprocess.run(
+            words, stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, timeout=_PATIENCE, check=False
+        )
+    except (OSError, subprocess.SubprocessError):
+        return ""
+    return done.stdout.decode("utf-8", "replace")
+
+
+def _namespaces() -> Found:
+    for user in _USERS:
+        if _said_by("unshare", *user, "--net", "echo", "made"):
+            how = "namespaces of users" if user else "root"
+            return Found(OK, _ABOUT, f"network namespaces can be made, by {how}")
+    return Found(
+        NOTE,
+        _ABOUT,
+        "no network namespace can be made, so tests have no clients for frames",
+        "be root, or have the system allow namespaces of users",
+    )
+
+
+def _status(state: Path) -> Optional[Dict[str, Any]]:
+    """What the daemon of a state says of itself; None if there is none."""
+    try:
+        folder = os.open(str(state.resolve().parent), os.O_PATH | os.O_DIRECTORY)
+        try:
+            with socket.socket(socket.AF_UNIX) as line:
+                line.settimeout(_PATIENCE)
+                # The address of a socket has room for short names only.
+                line.connect(f"/proc/self/fd/{folder}/{state.resolve().name}-simhostd")
+                line.sendall(b'{"ask": "status"}\n')
+                said = line.makefile().readline()
+        finally:
+            os.close(folder)
+        status: Dict[str, Any] = json.loads(said)
+        return status
+    except (OSError, ValueError):
+        return None
+
+
+def _daemon(status: Dict[str, Any]) -> Iterator[Found]:
+    text = f"simhostd, process {status.get('process')}, moves them"
+    if status.get("datapath") == "system":
+        yield Found(
+            WARNING,
+            _ABOUT,
+            f"{text} in the kernel, which is untested",
+            "--datapath netdev has ovs-vswitchd move them",
+        )
+    else:
+        yield Found(OK, _ABOUT, f"{text} in ovs-vswitchd")
+        yield Found(
+            NOTE,
+            _ABOUT,
+            "clients whose devices leave checksums to others get no TCP through it",
+            "run ethtool --offload DEVICE tx off at each client",
+        )
+    if status.get("said"):
+        yield Found(WARNING, _ABOUT, f"it says: {status['said']}", "simhostctl plane has more")

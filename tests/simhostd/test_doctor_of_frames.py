@@ -1,0 +1,88 @@
+"""What the doctor says of frames: Open vSwitch, namespaces, and the daemon of a state."""
+
+import json
+import os
+import subprocess
+import sys
+from pathlib import Path
+from typing import Dict, List, Mapping, Optional
+
+import pytest
+
+from frame_lab import Lab
+
+Finding = Dict[str, str]
+
+
+def findings(changes: Mapping[str, Optional[str]]) -> List[Finding]:
+    """Those about frames, of a doctor with these variables."""
+    environment = {**os.environ, **{name: value for name, value in changes.items() if value}}
+    done = subprocess.run(
+        [sys.executable, "-m", "libvswitch.doctor", "--json"],
+        env=environment,
+        stdout=subprocess.PIPE,
+        text=True,
+        check=False,
+    )
+    found: List[Finding] = json.loads(done.stdout)["findings"]
+    assert done.returncode == 0, found
+    return [one for one in found if one["about"] == "frames"]
+
+
+def test_a_machine_on_which_frames_can_move() -> None:
+    vswitch, namespaces = findings({})
+    assert vswitch["level"] == namespaces["level"] == "ok"
+    assert vswitch["text"].startswith("Open vSwitch ")
+
+
+@pytest.mark.parametrize(
+    "said, level, text",
+    [
+        ("ovs-vswitchd (Open vSwitch) 2.17.3", "warning", "Open vSwitch 2.17, "),
+        ("something else", "warning", " does not say its version"),
+    ],
+)
+def test_an_open_vswitch_that_is_not_known(
+    tmp_path: Path, said: str, level: str, text: str
+) -> None:
+    program(tmp_path / "ovs-vswitchd", f"echo '{said}'")
+    vswitch = findings({"PATH": f"{tmp_path}:{os.environ['PATH']}"})[0]
+    assert vswitch["level"] == level and text in vswitch["text"]
+    assert vswitch["advice"]
+
+
+def test_no_namespaces(tmp_path: Path) -> None:
+    program(tmp_path / "unshare", "exit 1")
+    found = findings({"PATH": f"{tmp_path}:{os.environ['PATH']}"})[1]
+    assert found["level"] == "note"
+    assert found["text"].startswith("no network namespace can be made")
+
+
+def program(file: Path, does: str) -> None:
+    file.write_text(f"#!/bin/sh\n{does}\n", encoding="ascii")
+    file.chmod(0o755)
+
+
+def test_no_open_vswitch(tmp_path: Path) -> None:
+    hide = 'mount --bind "$0" /usr/sbin && exec "$@"'
+    doctor = [sys.executable, "-m", "libvswitch.doctor", "--json"]
+    user = [] if os.geteuid() == 0 else ["--user", "--map-root-user"]
+    done = subprocess.run(
+        ["unshare", *user, "--mount", "sh", "-c", hide, str(tmp_path), *doctor],
+        stdout=subprocess.PIPE,
+        text=True,
+        check=False,
+    )
+    (found,) = (
+        one for one in json.loads(done.stdout)["findings"] if "no Open vSwitch" in one["text"]
+    )
+    assert found["level"] == "note" and "openvswitch-switch" in found["advice"]
+
+
+def test_the_daemon_of_a_state(lab: Lab) -> None:
+    _, _, moves, checksums = findings({"SIMHOST_STATE": str(lab.state)})
+    assert lab.daemon is not None
+    assert moves["text"] == f"simhostd, process {lab.daemon.pid}, moves them in ovs-vswitchd"
+    assert "no TCP" in checksums["text"] and "ethtool" in checksums["advice"]
+    lab.stop()
+    assert len(findings({"SIMHOST_STATE": str(lab.state)})) == 2
