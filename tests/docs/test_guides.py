@@ -79,6 +79,7 @@ def test_sessions_of_python(guide: Path, tmp_path: Path) -> None:
     assert int(done.stdout) > 0 or guide.stem in (
         "command",
         "describing_a_host",
+        "frames",
         "performance",
         "record_once",
         "recording",

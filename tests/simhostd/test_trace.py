@@ -1,7 +1,9 @@
 """What simhostctl says of a frame is what becomes of it, and it names the setting that decides."""
 
 import json
+import re
 import time
+from pathlib import Path
 from typing import Any, Dict, List, Mapping, Optional, Sequence, Tuple
 
 import pytest
@@ -290,6 +292,15 @@ def test_words_for_frames_and_for_people(traced: Traced) -> None:
         "comes in at port a, with the tag of VLAN 9\n"
         "is dropped: the port has no such VLAN (lab/a/vlan 7)\n"
     )
+
+
+def test_the_guide_shows_what_is_said(traced: Traced) -> None:
+    guide = Path(__file__).parents[2] / "docs" / "guides" / "frames.md"
+    blocks = re.findall(r"console\n(.*?)```", guide.read_text(encoding="utf-8"), re.DOTALL)
+    shown = re.findall(r"\$ simhostctl (trace .*)\n([^$]*)", "".join(blocks))
+    assert len(shown) == 2
+    for command, said in shown:
+        assert traced.ctl(*command.split()) == said
 
 
 @pytest.mark.parametrize(
