@@ -62,10 +62,16 @@ junit() {
   tally "$title" $counts
 }
 
-# cxx_tests [NUMBERS]: all C++ tests, or those with these numbers of ctest, a comma before each.
+# cxx_tests [NUMBERS]: all C++ tests but what $cxx_left_out matches, or those with these numbers of
+# ctest, a comma before each.
 cxx_tests() {
+  if [ $# -gt 0 ]; then
+    set -- -I "0,0,0$1"
+  elif [ -n "${cxx_left_out-}" ]; then
+    set -- -E "$cxx_left_out"
+  fi
   junit "C++ tests" ctest.xml ctest --test-dir "$folder" --output-on-failure --no-tests=error \
-    -j "$jobs" ${1:+-I "0,0,0$1"} --output-junit "$root/$folder/ctest.xml"
+    -j "$jobs" "$@" --output-junit "$root/$folder/ctest.xml"
 }
 
 # select_tests WHICH...: what chores/select_tests.py chooses, in the file that $selected names; then

@@ -79,7 +79,8 @@ cmd_test() {
   testing=yes benching=yes
   # shellcheck disable=SC2086 # lists of words
   need $build_packages $test_packages $lint_packages $bench_packages
-  passed=0 failed=0 summary='' deselected=''
+  passed=0 failed=0 summary='' deselected='' cxx_left_out=
+  [ -n "$frames" ] || leave_out_frames
   if ! build; then
     tally build 0 1
     report
@@ -130,7 +131,7 @@ cmd_test() {
 # Some tests are not for every build, which the summary says.
 leave_out_tests() {
   # The programs of the frames' tests run beside Open vSwitch, which is nobody's to instrument.
-  if [ -z "$frames" ] || [ -n "$sanitizers" ]; then leave_out tests/simhostd; fi
+  if [ -n "$frames" ] && [ -n "$sanitizers" ]; then leave_out tests/simhostd; fi
   if [ -n "$sanitizers" ]; then
     # Valgrind and AddressSanitizer cannot both watch over memory.
     not_for_this_build "valgrind.helpers, valgrind.finds_what_is_planted"
@@ -144,6 +145,12 @@ leave_out_tests() {
     leave_out tests/classes/test_stubs.py::test_stubs_and_modules_have_no_difference
     leave_out tests/classes/test_stubs.py::test_a_difference_would_be_found
   fi
+}
+
+leave_out_frames() {
+  cxx_left_out='^TheNetworkDevices\.'
+  deselected="$deselected --deselect tests/simhostd"
+  summarize "Left out by --no-frames: tests/simhostd, TheNetworkDevices"
 }
 
 may_make_namespaces() {
