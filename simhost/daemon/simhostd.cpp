@@ -107,6 +107,9 @@ std::string wrong_openvswitch(std::string const &text) {
 
 int run(int count, char **given) {
   CLI::App app("Moves the frames of a simulated host through Open vSwitch.", "simhostd");
+  // Room for the longest option, from which what is said of it is to be told.
+  constexpr std::size_t kColumn = 40;
+  app.get_formatter()->column_width(kColumn);
   Words words;
   app.add_option("--state", words.state, "the file that holds the state of the host")->required();
   app.add_option("--openvswitch", words.openvswitch,

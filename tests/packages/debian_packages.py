@@ -7,7 +7,13 @@ from typing import List, Set
 
 from roots import Root
 
-NAMES = ("libvswitch-command", "libvswitch-dev", "libvswitch-simhost", "python3-libvswitch")
+NAMES = (
+    "libvswitch-command",
+    "libvswitch-dev",
+    "libvswitch-simhost",
+    "libvswitch-simhostd",
+    "python3-libvswitch",
+)
 
 
 def field(deb: Path, name: str) -> str:
