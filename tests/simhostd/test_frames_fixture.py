@@ -51,7 +51,7 @@ def test_frames_beyond_uplinks_have_their_tag(frames: simhost.Frames) -> None:
     far.send(back)
     near.expect(simhost.frame(near.mac, far.mac))
     network.plug("nic0")
-    far.expect_none(timeout=0)
+    far.expect_none(back, timeout=0)
 
 
 def simhostctl() -> Path:
