@@ -6,6 +6,7 @@ import signal
 import subprocess
 import sys
 import time
+from contextlib import ExitStack
 from pathlib import Path
 from typing import Any, Callable, Dict, Iterator, List
 
@@ -209,14 +210,18 @@ def test_nothing_is_left_of_a_run_that_is_interrupted(
     mark = f"FRAMES_RUN={pytester.path}"
     processes = processes_with(mark)
     assert {"simhostd", "ovsdb-server", "ovs-vswitchd", "sleep"} <= set(processes.values())
-    namespaces = {of(process) for process in processes} - {of(os.getpid())}
-    # The host, the network, and three clients.
-    assert len(namespaces) == 5
-    os.killpg(interrupted.pid, number)
-    interrupted.wait(timeout=PATIENCE)
-    for _ in waiting_for(lambda: not processes_with(mark)):
-        pass
-    assert not namespaces & {of(int(entry.name)) for entry in entries()}
+    with ExitStack() as stack:
+        # Whoever holds a namespace open keeps its number from another one.
+        for process in processes:
+            stack.enter_context(open(f"/proc/{process}/ns/net", "rb"))
+        namespaces = {of(process) for process in processes} - {of(os.getpid())}
+        # The host, the network, and three clients.
+        assert len(namespaces) == 5
+        os.killpg(interrupted.pid, number)
+        interrupted.wait(timeout=PATIENCE)
+        for _ in waiting_for(lambda: not processes_with(mark)):
+            pass
+        assert not namespaces & {of(int(entry.name)) for entry in entries()}
 
 
 def waiting_for(done: Callable[[], bool]) -> Iterator[None]:
