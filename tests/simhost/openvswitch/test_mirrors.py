@@ -83,6 +83,21 @@ def test_what_an_uplink_receives(bench: Bench, sources: Mapping[str, Any]) -> No
     assert bench.look("p1", Frame(STRANGER, P1))[copy] == 0
 
 
+def test_an_uplink_by_its_port(bench: Bench) -> None:
+    """And one that is named twice gets one copy."""
+    to = [{"port": "u1"}, {"uplink": "nic1"}]
+    said = session(received_by=[{"port": "u0"}], to=to, encapsulation={"vlan": 50})
+    switch = {
+        "uplinks": ["nic0", "nic1"],
+        "uplink_ports": [{"id": "u0", "uplink": "nic0"}, {"id": "u1", "uplink": "nic1"}],
+        "teaming": {"balance": "explicit", "active": ["nic0"]},
+        "ports": [{"id": "p1", "vlan": 7, "mirror_sessions": [said]}],
+    }
+    bench.load(switch, [{"port": "p1", "mac": P1}])
+    out = bench.look("nic0", Frame(P1, STRANGER, ((7, 0),)))
+    assert out == {("p1", (), None): 1, ("nic1", ((50, 0),), None): 1}
+
+
 def test_what_an_uplink_sends(bench: Bench) -> None:
     load(bench, session(sent_by=[{"uplink": "nic0"}]))
     copy = ("p3", (), None)

@@ -1,9 +1,11 @@
 // From the sessions in the tables of ports and of uplinks to what frames have to know of them.
 #include "planes/openvswitch/reading/read_mirrors.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -21,6 +23,12 @@ namespace {
 // The numbers of a table's sessions begin with 1; the rest of an id is the table's port.
 constexpr unsigned kSessionBits = 11;
 static_assert(mirror::kMostSessions < 1U << kSessionBits);
+
+// A device that a session names, by its port or as an uplink.
+struct Place {
+  openflow::Port port;
+  bool is_uplink;
+};
 
 class Sessions {
  public:
@@ -82,10 +90,8 @@ class Sessions {
       }
       if (entity.type == MIRROR_ENTTYPE_VLAN) {
         sources.vlans.push_back(entity.vlan);
-      } else if (entity.type == MIRROR_ENTTYPE_UPLINK) {
-        append_if_any(sources.uplinks, uplink_of(entity));
-      } else {
-        append_if_any(sources.ports, port_of(entity));
+      } else if (auto const place = place_of(entity)) {
+        (place->is_uplink ? sources.uplinks : sources.ports).push_back(place->port);
       }
     }
     if ((wild & VS_DVMIRROR_WILDCARD_PNIC) != 0) {
@@ -101,14 +107,16 @@ class Sessions {
     if (entity.type == MIRROR_ENTTYPE_IP || entity.type == MIRROR_ENTTYPE_VLAN) {
       refuse_session("mirrors to what is no port and no uplink");
     }
-    if (entity.type == MIRROR_ENTTYPE_UPLINK) {
-      append_if_any(mirror.to_uplinks, uplink_of(entity));
+    auto const place = place_of(entity);
+    if (!place) {
       return;
     }
-    auto const port = port_of(entity);
-    append_if_any(mirror.to_ports, port);
+    auto &places = place->is_uplink ? mirror.to_uplinks : mirror.to_ports;
+    if (std::ranges::find(places, place->port) == places.end()) {
+      places.push_back(place->port);
+    }
     for (auto &known : network_.ports) {
-      if (known.port == port) {
+      if (known.port == place->port) {
         known.mirrors_only = known.mirrors_only || (flags & VS_DVMIRROR_FLAG_DST_NO_OUTPUT) != 0;
         known.sends_nothing = known.sends_nothing || (flags & VS_DVMIRROR_FLAG_DST_NO_INPUT) != 0;
       }
@@ -116,29 +124,32 @@ class Sessions {
   }
 
   // Without a device there is nothing to mirror.
-  std::optional<openflow::Port> port_of(DVMirrorEntity const &entity) {
+  std::optional<Place> place_of(DVMirrorEntity const &entity) {
+    if (entity.type == MIRROR_ENTTYPE_UPLINK) {
+      auto const name = text_in(entity.uplink.string);
+      auto const uplink = storage::find_uplink(transaction_, name);
+      bool const is_here = uplink && uplink->port &&
+                           storage::get_port_row(transaction_, *uplink->port).switch_key == key_;
+      return is_here ? place_of_uplink(name) : std::nullopt;
+    }
     auto const port =
         entity.type == MIRROR_ENTTYPE_DVPORT
             ? storage::find_port(transaction_, key_, text_in(entity.dvPortId))
             : storage::find_port(transaction_, key_, storage::PortNumber{entity.portId});
-    auto const device = port ? storage::device_of(transaction_, port->number) : std::nullopt;
-    return device ? std::optional(openflow::Port{device->number}) : std::nullopt;
+    if (!port) {
+      return std::nullopt;
+    }
+    if (auto const uplink = storage::uplink_at(transaction_, port->number)) {
+      return place_of_uplink(*uplink);
+    }
+    auto const device = storage::device_of(transaction_, port->number);
+    return device ? std::optional(Place{.port = device->number, .is_uplink = false}) : std::nullopt;
   }
-  std::optional<openflow::Port> uplink_of(DVMirrorEntity const &entity) {
-    auto const name = text_in(entity.uplink.string);
-    auto const uplink = storage::find_uplink(transaction_, name);
-    bool const is_here = uplink && uplink->port &&
-                         storage::get_port_row(transaction_, *uplink->port).switch_key == key_;
-    auto const device = is_here ? storage::device_of(transaction_, name) : std::nullopt;
-    return device ? std::optional(openflow::Port{device->number}) : std::nullopt;
+  std::optional<Place> place_of_uplink(std::string_view uplink) {
+    auto const device = storage::device_of(transaction_, uplink);
+    return device ? std::optional(Place{.port = device->number, .is_uplink = true}) : std::nullopt;
   }
 
-  static void append_if_any(std::vector<openflow::Port> &ports,
-                            std::optional<openflow::Port> port) {
-    if (port) {
-      ports.push_back(*port);
-    }
-  }
   // What no frame reaches is all of each.
   static std::uint16_t snap_length(std::uint32_t bytes) {
     return bytes < UINT16_MAX ? static_cast<std::uint16_t>(bytes) : 0;
