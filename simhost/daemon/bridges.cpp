@@ -25,12 +25,15 @@ using openflow::GroupCommand;
 using openvswitch::Deadline;
 
 constexpr auto kPatience = 5s;
+// More for each device at a bridge: a machine that has other work to do takes so long, and another
+// attempt would begin at the beginning.
+constexpr auto kPatienceForEach = 10ms;
 constexpr auto *kLock = "simhostd";
 // What Open vSwitch says of its flows is older than that anyway.
 constexpr auto kBetweenCounts = 100ms;
 
-Deadline soon() {
-  return Deadline::clock::now() + kPatience;
+Deadline soon(std::size_t devices = 0) {
+  return Deadline::clock::now() + kPatience + devices * kPatienceForEach;
 }
 
 bool is_marker(Flow const &flow) {
@@ -84,14 +87,10 @@ bool ends_counting(openvswitch::Difference const &difference) {
          std::ranges::any_of(difference.added_flows, counts);
 }
 
-std::size_t count_without_markers(openvswitch::Difference const &difference) {
-  auto const flows = [](std::vector<Flow> const &all) {
-    return static_cast<std::size_t>(
-        std::ranges::count_if(all, [](Flow const &flow) { return !is_marker(flow); }));
-  };
+std::size_t size_of(openvswitch::Difference const &difference) {
   return difference.added_groups.size() + difference.changed_groups.size() +
-         difference.removed_groups.size() + flows(difference.added_flows) +
-         flows(difference.changed_flows) + flows(difference.removed_flows);
+         difference.removed_groups.size() + difference.added_flows.size() +
+         difference.changed_flows.size() + difference.removed_flows.size();
 }
 
 std::set<std::string> added_devices(openvswitch::PresentRows const &present,
@@ -110,11 +109,18 @@ std::set<std::string> added_devices(openvswitch::PresentRows const &present,
   return added;
 }
 
+openvswitch::Difference difference_between(openvswitch::Compiled const &present,
+                                           openvswitch::Compiled const &wanted) {
+  return &present == &wanted
+             ? openvswitch::Difference{}
+             : openvswitch::difference(present.flows, present.groups, wanted.flows, wanted.groups);
+}
+
 // A client need not speak before it is reached in another VLAN: who it is was learned already.
 void add_relearned(openflow::Connection &connection, WantedBridge const &wanted,
                    openvswitch::Difference &difference, Deadline deadline) {
   for (auto const &learned : difference.forgotten) {
-    auto const learn = openvswitch::how_learned(wanted.compiled.flows, learned);
+    auto const learn = openvswitch::how_learned(wanted.flows->flows, learned);
     if (!learn) {
       continue;
     }
@@ -152,8 +158,8 @@ struct Bridges::Bridge {
   std::string name;
   openflow::Connection connection;
   events::Loop::Watch watch;
-  std::vector<Flow> flows;
-  std::vector<Group> groups;
+  Flows flows;                          // that it has
+  std::optional<std::uint64_t> change;  // that is in force
   bool is_altered = false;  // by somebody else, so that the two before are none of it any more
   // Of the flows as they are.
   PortNumbers numbers;
@@ -277,12 +283,18 @@ void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
       }
     }
   }
+  openvswitch::Compiled there;
   for (auto const &entry : bridge.connection.flows({}, deadline)) {
-    bridge.flows.push_back(entry.flow);
+    if (is_marker(entry.flow)) {
+      bridge.change = entry.flow.cookie;
+    } else {
+      there.flows.push_back(entry.flow);
+    }
   }
   for (auto const &entry : bridge.connection.groups(deadline)) {
-    bridge.groups.push_back(entry.group);
+    there.groups.push_back(entry.group);
   }
+  bridge.flows = std::make_shared<openvswitch::Compiled const>(std::move(there));
 }
 
 void Bridges::follow_events(Bridge &bridge) {
@@ -334,17 +346,16 @@ void Bridges::count(storage::SwitchKey key) {
   }
 }
 
-std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
-                                 Deadline deadline) {
+std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t change,
+                                 std::set<std::string> const &added, Deadline deadline) {
   auto &bridge = connected(wanted, deadline);
   // A bridge without a marker was made just before.
-  bool const is_new = std::ranges::none_of(bridge.flows, is_marker);
+  bool const is_new = !bridge.change;
   memory_.follow_devices(wanted.key, wanted.ports);
-  auto difference = openvswitch::difference(bridge.flows, bridge.groups, wanted.compiled.flows,
-                                            wanted.compiled.groups);
+  auto difference = difference_between(*bridge.flows, *wanted.flows);
   add_relearned(bridge.connection, wanted, difference, deadline);
   if (is_new) {
-    std::ranges::move(memory_.recall(wanted.key, wanted.compiled.flows),
+    std::ranges::move(memory_.recall(wanted.key, wanted.flows->flows),
                       std::back_inserter(difference.added_flows));
   } else {
     std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
@@ -352,15 +363,20 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::set<std::strin
   if (bridge.sessions != wanted.sessions || ends_counting(difference)) {
     count(bridge, deadline);
   }
-  if (!difference.empty()) {
-    bridge.connection.change(changes_of(difference), deadline);
-    bridge.flows = wanted.compiled.flows;
-    bridge.groups = wanted.compiled.groups;
+  auto changes = changes_of(difference);
+  if (bridge.change != change) {
+    changes.emplace_back(openflow::FlowChange{.command = FlowCommand::add,
+                                              .flow = openvswitch::generation_marker(change)});
+  }
+  if (!changes.empty()) {
+    bridge.connection.change(changes, deadline);
+    bridge.flows = wanted.flows;
+    bridge.change = change;
     follow_events(bridge);
   }
   bridge.numbers = wanted.numbers;
   bridge.sessions = wanted.sessions;
-  return count_without_markers(difference);
+  return size_of(difference);
 }
 
 bool Bridges::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) {
@@ -401,7 +417,11 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
 }
 
 std::size_t Bridges::apply(Wanted const &wanted) {
-  auto const deadline = soon();
+  std::size_t devices = 0;
+  for (auto const &bridge : wanted.bridges) {
+    devices += bridge.row.devices.size();
+  }
+  auto const deadline = soon(devices);
   auto const goes = [&](auto const &bridge) {
     auto const is_it = [&](auto const &one) { return one.key == bridge.first; };
     return std::ranges::none_of(wanted.bridges, is_it) && std::ranges::none_of(wanted.unfit, is_it);
@@ -416,7 +436,7 @@ std::size_t Bridges::apply(Wanted const &wanted) {
   std::erase_if(bridges_, goes);
   std::size_t changed = 0;
   for (auto const &bridge : wanted.bridges) {
-    changed += apply_flows(bridge, added, deadline);
+    changed += apply_flows(bridge, wanted.change, added, deadline);
   }
   return changed;
 }

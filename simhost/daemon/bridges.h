@@ -81,8 +81,8 @@ class Bridges {
   openvswitch::PresentRows const &present();
   // Returns the devices that were put at bridges.
   std::set<std::string> apply_rows(Wanted const &wanted, openvswitch::Deadline deadline);
-  std::size_t apply_flows(WantedBridge const &wanted, std::set<std::string> const &added,
-                          openvswitch::Deadline deadline);
+  std::size_t apply_flows(WantedBridge const &wanted, std::uint64_t change,
+                          std::set<std::string> const &added, openvswitch::Deadline deadline);
   Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
   void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
   void read_events(Bridge &bridge);

@@ -235,7 +235,7 @@ void Daemon::sync() {
   auto const is_there = [this](std::string const &device) {
     return devices_.find(device).has_value();
   };
-  auto const all = wanted_of(transaction, host_, options_.datapath, is_there);
+  auto const all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_);
   bool const counts_anew = counting_.follow(transaction);
   transaction.commit();
   if (counts_anew) {

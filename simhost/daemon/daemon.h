@@ -12,6 +12,7 @@
 
 #include "daemon/announcer.h"
 #include "daemon/bridges.h"
+#include "daemon/compiler.h"
 #include "daemon/counting/counting.h"
 #include "daemon/network_devices.h"
 #include "daemon/server.h"
@@ -78,6 +79,7 @@ class Daemon {
   Memory memory_;
   Announcer announcer_;
   Counting counting_;
+  Compiler compiler_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
   std::optional<std::int64_t> commits_;          // to the state, at the last look

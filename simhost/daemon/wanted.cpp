@@ -123,7 +123,7 @@ std::uint64_t fingerprint(std::string_view text) {
 }
 
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
-                 std::string const &datapath, IsThere const &is_there) {
+                 std::string const &datapath, IsThere const &is_there, Compiler &compiler) {
   Wanted wanted;
   wanted.change = storage::frames_change(transaction).value_or(0);
   wanted.most_announced =
@@ -137,23 +137,22 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                         .ports = {},
                         .numbers = {},
                         .sessions = {},
-                        .compiled = {}};
+                        .flows = {}};
     add_devices(transaction, bridge);
     if (!row.associated || bridge.row.devices.empty()) {
       continue;
     }
     try {
       auto const team = team_with_devices(transaction, key);
-      auto const network = openvswitch::read_network(transaction, key, team, {});
-      bridge.compiled = openvswitch::compile(network);
+      auto const &[network, flows] =
+          compiler.compile(key, openvswitch::read_network(transaction, key, team, {}));
+      bridge.flows = flows;
       add_carried(transaction, network, team.policy, bridge);
       bridge.sessions = sessions_of(network);
       std::erase_if(bridge.row.devices,
                     [&](auto const &device) { return !is_there(device.first); });
-      bridge.row.limits = {
-          {openvswitch::table::kLearnedAddresses, bridge.compiled.rows.most_learned}};
-      bridge.compiled.flows.push_back(openvswitch::generation_marker(wanted.change));
-      wanted.most_tags = std::max(wanted.most_tags, bridge.compiled.rows.most_tags);
+      bridge.row.limits = {{openvswitch::table::kLearnedAddresses, flows->rows.most_learned}};
+      wanted.most_tags = std::max(wanted.most_tags, flows->rows.most_tags);
       shorten(wanted.lasts, teaming::until_next_settles(team));
       wanted.bridges.push_back(std::move(bridge));
     } catch (Refused const &refused) {
@@ -161,6 +160,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
           {.key = key, .alias = row.alias, .bridge = bridge.row.name, .why = refused.what()});
     }
   }
+  compiler.forget_others();
   return wanted;
 }
 

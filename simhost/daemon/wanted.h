@@ -11,9 +11,9 @@
 #include <vector>
 
 #include "clock/clock.h"
+#include "daemon/compiler.h"
 #include "daemon/counting/bridge_totals.h"
 #include "planes/openvswitch/compile/announcement.h"
-#include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/rows/rows.h"
 #include "storage/ports.h"
 
@@ -37,7 +37,7 @@ struct WantedBridge {
   std::map<std::string, std::uint32_t> ports;  ///< the numbers of those that devices are at
   PortNumbers numbers;                         ///< likewise, of uplink ports too
   openvswitch::CountedSessions sessions;
-  openvswitch::Compiled compiled;  ///< with the marker of the change
+  Flows flows;  ///< but for the marker of the change
   std::vector<Carried> carried = {};
 };
 
@@ -66,7 +66,7 @@ using IsThere = std::function<bool(std::string const &device)>;
 
 /// `host` tells the bridges of this host from those of others in one namespace.
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
-                 std::string const &datapath, IsThere const &is_there);
+                 std::string const &datapath, IsThere const &is_there, Compiler &compiler);
 
 /// The bridge of a switch.
 std::string bridge_name(std::string_view host, std::string const &identifier);

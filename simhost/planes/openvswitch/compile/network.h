@@ -24,6 +24,8 @@ struct Uplink {
   openflow::Port port = 0;
   std::uint32_t number = 0;  ///< of its port of the switch
   bool blocked = false;
+
+  bool operator==(Uplink const &) const = default;
 };
 
 /// Uplinks that are one link to the network: one, or those of a link-aggregation group.
@@ -43,6 +45,8 @@ struct Team {
   Balance balance = Balance::first;
   std::vector<Slot> in_use;
   std::vector<Slot> standby;  ///< step in, in this order, when none in use has a link
+
+  bool operator==(Team const &) const = default;
 };
 
 /// The kinds of private VLAN, by the numbers that registers hold.
@@ -53,6 +57,8 @@ struct PrivateVlan {
   std::uint16_t primary = 0;
   std::uint16_t secondary = 0;
   PrivateKind kind = PrivateKind::none;
+
+  bool operator==(PrivateVlan const &) const = default;
 };
 
 /// What a port does with tags.
@@ -63,6 +69,8 @@ struct PortVlan {
   bool must_be_private = false;  ///< passes nothing while the VLAN is not one of the switch's map
   std::optional<std::uint8_t> priority = std::nullopt;  ///< instead of that of the client's tags
   bool nested = false;                                  ///< frames may have a second tag
+
+  bool operator==(PortVlan const &) const = default;
 };
 
 /// What becomes of frames from an address that there is no room for.
@@ -71,6 +79,8 @@ enum class WhenFull { allow, drop };
 struct Learning {
   std::uint32_t limit = 0;
   WhenFull when_full = WhenFull::allow;
+
+  bool operator==(Learning const &) const = default;
 };
 
 /// A port with a client.
@@ -93,6 +103,8 @@ struct Port {
   std::uint32_t share = 0;    ///< which of the team's slots it uses: the remainder by their count
   bool mirrors_only = false;  ///< gets nothing but what is mirrored to it
   bool sends_nothing = false;
+
+  bool operator==(Port const &) const = default;
 };
 
 /// An address that stays where it is put.
@@ -100,6 +112,8 @@ struct FixedAddress {
   EthernetAddress address = {};
   std::uint16_t vlan = 0;
   std::optional<std::uint32_t> port = std::nullopt;  ///< its number; none: beyond the uplinks
+
+  bool operator==(FixedAddress const &) const = default;
 };
 
 /// What a mirror session copies from.
@@ -107,6 +121,8 @@ struct MirrorSources {
   std::vector<openflow::Port> ports;
   std::vector<openflow::Port> uplinks;
   std::vector<std::uint16_t> vlans;
+
+  bool operator==(MirrorSources const &) const = default;
 };
 
 struct Mirror {
@@ -120,6 +136,8 @@ struct Mirror {
   std::uint16_t remote_vlan = 0;  ///< the tag that copies have on uplinks
   std::uint16_t most_bytes = 0;   ///< of a frame; 0 for all
   bool keeps_vlan = false;        ///< copies have the tag of the frame's VLAN
+
+  bool operator==(Mirror const &) const = default;
 };
 
 /// How addresses are learned.
@@ -128,6 +146,8 @@ struct Addresses {
   std::uint32_t limit = 65536;
   std::uint32_t uplink_limit = 16384;  ///< of those beyond the uplinks
   bool fixed_ones_move = false;        ///< when they are seen elsewhere
+
+  bool operator==(Addresses const &) const = default;
 };
 
 struct Network {
@@ -140,6 +160,8 @@ struct Network {
   Addresses addresses;
   std::vector<FixedAddress> fixed_addresses;
   std::vector<Mirror> mirrors;
+
+  bool operator==(Network const &) const = default;
 };
 
 }  // namespace simhost::openvswitch

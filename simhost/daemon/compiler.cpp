@@ -1,0 +1,26 @@
+#include "daemon/compiler.h"
+
+#include <utility>
+
+namespace simhost::daemon {
+
+CompiledSwitch const &Compiler::compile(storage::SwitchKey key, openvswitch::Network network) {
+  auto const found = kept_.find(key);
+  if (found != kept_.end() && found->second.made.network == network) {
+    found->second.is_asked_for = true;
+    return found->second.made;
+  }
+  auto flows = std::make_shared<openvswitch::Compiled const>(openvswitch::compile(network));
+  auto &kept = kept_[key];
+  kept = {.made = {.network = std::move(network), .flows = std::move(flows)}};
+  return kept.made;
+}
+
+void Compiler::forget_others() {
+  std::erase_if(kept_, [](auto const &kept) { return !kept.second.is_asked_for; });
+  for (auto &[key, kept] : kept_) {
+    kept.is_asked_for = false;
+  }
+}
+
+}  // namespace simhost::daemon

@@ -1,0 +1,38 @@
+// What was made of each switch last: most changes are of one switch or of none, and what happens
+// around a host of none at all.
+#pragma once
+
+#include <map>
+#include <memory>
+
+#include "planes/openvswitch/compile/compile.h"
+#include "storage/switches.h"
+
+namespace simhost::daemon {
+
+/// Nobody changes it, so that those who have the same need not look into it.
+using Flows = std::shared_ptr<openvswitch::Compiled const>;
+
+struct CompiledSwitch {
+  openvswitch::Network network;
+  Flows flows;
+};
+
+class Compiler {
+ public:
+  /// What compile() makes of it: the same as the last time, if that is still so. Refuses as
+  /// compile() does. Valid until the next call.
+  CompiledSwitch const &compile(storage::SwitchKey key, openvswitch::Network network);
+  /// Forgets those that were not asked for since the last time.
+  void forget_others();
+
+ private:
+  struct Kept {
+    CompiledSwitch made;
+    bool is_asked_for = true;
+  };
+
+  std::map<storage::SwitchKey, Kept> kept_;
+};
+
+}  // namespace simhost::daemon
