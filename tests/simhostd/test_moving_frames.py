@@ -8,7 +8,7 @@ from pathlib import Path
 
 from simhost import frame
 
-from frame_lab import ONE_SWITCH, Lab
+from frame_lab import ONE_SWITCH, Lab, comes_true
 
 
 def test_a_vlan_cuts_and_joins(lab: Lab) -> None:
@@ -142,6 +142,31 @@ def test_learned_addresses_are_asked_of_the_data_path(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     assert one.reaches(other, attempts=5)
     assert f"{one.mac} learned" in lab.ctl("show")
+
+
+LEARNED = '''
+from libvswitch import checked
+print(len(checked.VSQEX_GetPortMACTable("lab", "a", 2)), end=" ")
+print(len(checked.VSQEX_GetPortMACTable("lab", "a", 3)), end=" ")
+print(checked.VSQEX_GetPortMACLearningStats("lab", "a").numMACsLearned, end=" ")
+print(len(checked.VSQEX_GetTeamMACTable("lab", 2)))
+'''
+
+
+def test_addresses_that_were_learned_without_frames_are_told_of_no_device(idle: Lab) -> None:
+    idle.set_port("lab", "a", mac_learning={"learning": True, "flooding": True})
+    for mac in "02:00:00:00:50:01", "02:00:00:00:50:02":
+        idle.ctl("learn", "lab", mac, "--port", "a")
+    idle.ctl("learn", "lab", "02:00:00:00:50:03")
+    assert idle.python(LEARNED) == "2 2 2 1\n"
+    idle.start()
+    one = idle.client("lab", "a")
+    # Nobody knows what is beyond the uplinks, which have no device.
+    assert idle.python(LEARNED) == "0 0 0 1\n"
+    idle.network("nic0", "nic1")
+    assert idle.python(LEARNED) == "0 0 0 0\n"
+    one.send(frame("ff:ff:ff:ff:ff:ff", one.mac))
+    assert comes_true(lambda: idle.python(LEARNED) == "1 1 1 0\n")
 
 
 def test_a_mirror_shows_frames_of_others(lab: Lab) -> None:

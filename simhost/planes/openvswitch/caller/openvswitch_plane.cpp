@@ -159,6 +159,10 @@ std::vector<VSMACEntry> OpenVswitchPlane::addresses(storage::Transaction &transa
   bool const asks_for_learned = type == VS_MAC_ADDR_TYPE_LEARNED || type == VS_MAC_ADDR_TYPE_ALL;
   if (asks_for_learned && has_frames(transaction, place)) {
     auto const reply = asked(file_, question_about("addresses", place));
+    // What was learned before a device came is none of what its bridge knows.
+    std::erase_if(entries, [](VSMACEntry const &entry) {
+      return entry.macAddrType == VS_MAC_ADDR_TYPE_LEARNED;
+    });
     for (auto const &entry : learned_in(reply.at("addresses"))) {
       entries.push_back(entry);
     }
