@@ -1,5 +1,6 @@
 """Frames go on, or come back, whatever ends; configuration and counters stay as they are."""
 
+import json
 import os
 import re
 import signal
@@ -200,17 +201,19 @@ def test_a_caller_that_is_killed_leaves_old_or_new(lab: Lab) -> None:
     assert comes_true(lab.is_in_force)
 
 
+# No flows can be made of such a session; it is accepted where no frames go.
+FAR_SESSION = {
+    "sid": "far",
+    "type": "encapsulated",
+    "to": [{"ip": "192.0.2.1"}],
+    "encapsulation": {"type": "gre", "key": 9},
+}
+
+
 def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     assert one.reaches(other, attempts=5)
-    # No flows can be made of such a session; it is accepted where no frames go.
-    session = {
-        "sid": "far",
-        "type": "encapsulated",
-        "to": [{"ip": "192.0.2.1"}],
-        "encapsulation": {"type": "gre", "key": 9},
-    }
-    spare = {"alias": "spare", "ports": [{"id": "s", "mirror_sessions": [session]}]}
+    spare = {"alias": "spare", "ports": [{"id": "s", "mirror_sessions": [FAR_SESSION]}]}
     second = {"alias": "second", "ports": [{"id": "x"}, {"id": "y"}]}
     lab.apply({"switches": [spare, second]})
     third, fourth = lab.client("second", "x"), lab.client("second", "y")
@@ -220,10 +223,28 @@ def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
     assert lab.log().count(why) == 1
     assert one.reaches(other)
     assert third.reaches(fourth, attempts=5)
-    move_mirror_sessions(lab, "a", "s")
-    assert comes_true(lambda: not lab.plane()["said"])
+    # The others can be changed, but not into such a one.
+    lab.set_port("second", "x", vlan=8)
+    assert lab.is_in_force() and not third.reaches(fourth)
+    refused_far_session(lab, "second", "x")
+    # So can it be itself.
     lab.set_port("lab", "a", vlan=7)
+    assert one.reaches(other)
+    lab.set_port("lab", "a", mirror_sessions=[])
+    assert not lab.plane()["said"] and lab.is_in_force()
     assert not one.reaches(other)
+    refused_far_session(lab, "lab", "a")
+
+
+def refused_far_session(lab: Lab, switch: str, port: str) -> None:
+    """With nothing changed."""
+    before = lab.plane()["change"]
+    ports = [{"id": port, "mirror_sessions": [FAR_SESSION]}]
+    document = json.dumps({"switches": [{"alias": switch, "ports": ports}]})
+    done = lab.try_ctl("apply", "-", given=document)
+    assert done.returncode == 1
+    assert "the mirror session 'far'" in done.stdout
+    assert lab.plane()["change"] == before
 
 
 def move_mirror_sessions(lab: Lab, one: str, other: str) -> None:

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <array>
 #include <cstring>
+#include <map>
 #include <utility>
 
 #include "base/outcomes.h"
@@ -94,16 +95,40 @@ Json question_about(std::string_view what, Place const &place) {
           {"port", place.port ? static_cast<std::uint32_t>(*place.port) : 0}};
 }
 
-// Refuses what no flows can be made of; that they are made is the daemon's matter.
-void check_switches(storage::Transaction &transaction) {
+// The switches of which no flows can be made, and why.
+std::map<storage::SwitchKey, Refused> unfit_switches(storage::Transaction &transaction) {
   auto const links = [](storage::Transaction &from, std::string_view uplink) {
     return storage::find_link(from, uplink).value_or(Link{});
   };
+  std::map<storage::SwitchKey, Refused> unfit;
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     if (row.associated && may_be_refused(transaction, key) &&
         !storage::port_devices(transaction, key).empty()) {
-      auto const team = teaming::team_of(transaction, key, links);
-      check(read_network(transaction, key, team, {}));
+      try {
+        auto const team = teaming::team_of(transaction, key, links);
+        check(read_network(transaction, key, team, {}));
+      } catch (Refused const &why) {
+        unfit.emplace(key, why);
+      }
+    }
+  }
+  return unfit;
+}
+
+// Refuses what makes a switch unfit. One that was so before is no reason: everything else would be
+// refused because of it. That flows are made is the daemon's matter.
+void check_switches(storage::Transaction &transaction, std::filesystem::path const &file) {
+  auto const unfit = unfit_switches(transaction);
+  if (unfit.empty()) {
+    return;
+  }
+  // Another connection does not see yet what the transaction changed.
+  storage::Store committed(file, [](storage::ChangingTransaction &) {});
+  storage::ReadingTransaction before(committed);
+  auto const unfit_before = unfit_switches(before);
+  for (auto const &[key, why] : unfit) {
+    if (!unfit_before.contains(key)) {
+      throw Refused(why);
     }
   }
 }
@@ -268,7 +293,7 @@ void OpenVswitchPlane::prepare(storage::ChangingTransaction &transaction) {
   if (!storage::frames_change(transaction)) {
     return;
   }
-  check_switches(transaction);
+  check_switches(transaction, file_);
   storage::advance_frames_change(transaction);
   prepared_ = storage::frames_change(transaction);
 }
