@@ -44,8 +44,8 @@ class Peer {
   Peer(std::filesystem::path const &state, std::string said)
       : socket_(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
     simhost::events::UnixAddress const address(simhost::openvswitch::socket_of(state));
-    bind(socket_, address.get(), address.size());
-    listen(socket_, 1);
+    EXPECT_EQ(bind(socket_, address.get(), address.size()), 0);
+    EXPECT_EQ(listen(socket_, 1), 0);
     thread_ = std::thread([this, said = std::move(said)] {
       int const client = accept(socket_, nullptr, nullptr);
       char byte = 0;
