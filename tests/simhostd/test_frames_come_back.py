@@ -29,7 +29,7 @@ def test_without_a_daemon_changes_are_pending(idle: Lab) -> None:
     assert f"change {before + 1} is pending: no simhostd" in idle.ctl("plane")
     idle.start()
     assert idle.plane()["in_force"] == before + 1
-    assert not one.reaches(other)
+    assert one.ceases_to_reach(other)
     idle.set_port("lab", "b", vlan=7)
     # Open vSwitch started anew: where a client is, it knows when the client has sent something.
     assert other.reaches(one, attempts=5)
@@ -45,7 +45,7 @@ def test_either_process_of_open_vswitch_may_be_killed(lab: Lab, program: str) ->
     assert one.comes_to_reach(other)
     assert f"{program} was ended by signal 9" in lab.log()
     lab.set_port("lab", "b", vlan=8)
-    assert not one.reaches(other)
+    assert one.ceases_to_reach(other)
 
 
 def test_clients_that_say_nothing_are_reached_after_a_kill(lab: Lab) -> None:
@@ -167,7 +167,7 @@ def test_a_device_may_vanish_and_return(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     assert one.reaches(other, attempts=5)
     lab.host.run("ip", "link", "delete", "c1")
-    assert not one.reaches(other)
+    assert one.ceases_to_reach(other)
     lab.wire("c1", one.namespace, "eth0")
     one.set_up()
     assert one.comes_to_reach(other)
@@ -225,14 +225,14 @@ def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
     assert third.reaches(fourth, attempts=5)
     # The others can be changed, but not into such a one.
     lab.set_port("second", "x", vlan=8)
-    assert lab.is_in_force() and not third.reaches(fourth)
+    assert lab.is_in_force() and third.ceases_to_reach(fourth)
     refused_far_session(lab, "second", "x")
     # So can it be itself.
     lab.set_port("lab", "a", vlan=7)
     assert one.reaches(other)
     lab.set_port("lab", "a", mirror_sessions=[])
     assert not lab.plane()["said"] and lab.is_in_force()
-    assert not one.reaches(other)
+    assert one.ceases_to_reach(other)
     refused_far_session(lab, "lab", "a")
 
 

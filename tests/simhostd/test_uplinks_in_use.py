@@ -45,7 +45,7 @@ def test_an_uplink_that_comes_up_is_used_after_its_delay(
     assert network.came_over(near.mac) == "nic1"
     network.pull("nic1")
     assert comes_true(lambda: "nic1       link down" in lab.ctl("show"))
-    assert not near.reaches(far)
+    assert near.ceases_to_reach(far)
     lab.ctl("clock", "step", "3600")
     assert near.comes_to_reach(far)
     assert network.came_over(near.mac) == "nic0"
@@ -109,7 +109,7 @@ def test_an_uplink_that_does_not_meet_the_criteria_is_not_used(
     lab: Lab, network: Network, far: Client, near: Client, unmet: Any, met: Any
 ) -> None:
     set_teaming(lab, **unmet)
-    assert not near.reaches(far)
+    assert near.ceases_to_reach(far)
     set_teaming(lab, **met)
     assert near.reaches(far, attempts=5)
 

@@ -102,6 +102,18 @@ class Client:
                 return True
         return False
 
+    def ceases_to_reach(self, other: "Client", timeout: float = 30.0) -> bool:
+        """At some time no ping is replied to any more.
+
+        Open vSwitch has put a change through when it says so, but on a busy machine the last
+        frames still go as it remembers them.
+        """
+        deadline = time.monotonic() + timeout
+        while self.reaches(other):
+            if time.monotonic() > deadline:
+                return False
+        return not self.reaches(other)
+
     def close(self) -> None:
         """Leaves its device; the machine goes with its namespace."""
         self._socket.close()
