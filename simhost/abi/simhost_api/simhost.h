@@ -114,11 +114,12 @@ int simhost_disconnect(char const *switchName, char const *port);
 size_t simhost_plane(char *text, size_t size);
 /**
  * Tells what becomes of a frame that comes in at a port or an uplink of a switch, as an array in
- * JSON: of each step `does` is "passes", "delivered", "copied" or "dropped", `text` says it, `setting`
- * is null or the `port`, null for the switch's own, and `name` of the setting that decided it, and what
- * is delivered or copied has `to` and the `vlans` of its tags. Nothing is sent. QEX_NOT_SUPPORTED
- * while no frames move, QEX_IS_DISCONNECTED where there is no device, QEX_BAD_PARAM for fewer bytes
- * than a header has or more than a packet. Other parameters and result as of simhost_describe.
+ * JSON: of each step `does` is "passes", "delivered", "copied" or "dropped", `text` says it,
+ * `setting` is null or the `port`, null for the switch's own, and `name` of the setting that
+ * decided it, and what is delivered or copied has `to` and the `vlans` of its tags. Nothing is
+ * sent. QEX_NOT_SUPPORTED while no frames move, QEX_IS_DISCONNECTED where there is no device,
+ * QEX_BAD_PARAM for fewer bytes than a header has or more than a packet. Other parameters and
+ * result as of simhost_describe.
  */
 size_t simhost_trace(char const *switchName, char const *station, unsigned char const *frame,
                      size_t length, char *text, size_t size);

@@ -181,7 +181,7 @@ enum class Counted : std::uint8_t {
   out_unicast = 21,  ///< sent out at one
   out_multicast = 22,
   out_broadcast = 23,
-  dropped = 24,  ///< not let in, for whichever reason
+  dropped = 24,   ///< not let in, for whichever reason
   out_lost = 25,  ///< by the device itself, like the next ones
   in_damaged = 26,
   out_damaged = 27,
