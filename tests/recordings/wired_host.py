@@ -31,7 +31,6 @@ _PATIENCE = 10.0
 """Seconds until the other end of a wire is seen."""
 _SOON = 0.1
 """Likewise, until a frame that has arrived is read."""
-_NO_IPV6 = "/proc/sys/net/ipv6/conf/default/disable_ipv6"
 
 _DEFAULT_HOST = EXAMPLES.parent / "simhost" / "scenario" / "default_host.json"
 
@@ -50,9 +49,6 @@ class Wiring:
         """How many ports were, all in all."""
         self._far = Namespace(lab.host)
         self._pulled: Set[str] = set()
-        for namespace in (lab.host, self._far):
-            # Else the system sends frames of its own.
-            namespace.run("sh", "-c", f"echo 1 >{_NO_IPV6}")
         for device in [*UPLINKS, *PORTS]:
             lab.wire(device, self._far, _far_end(device))
 
