@@ -10,9 +10,10 @@ from typing import Any, Dict
 
 import pytest
 
-from frame_lab import TOOLS, Lab
+from frame_lab import TOOLS, Lab, comes_true
 from lasting_open_vswitch import LastingOpenVSwitch
 from simhost import Client
+from simhost._namespaces import PATIENCE
 
 BROADCAST, MULTICAST = "ff:ff:ff:ff:ff:ff", "01:00:5e:01:02:03"
 LENGTH = 60
@@ -35,7 +36,7 @@ def counters(lab: Lab, port: str) -> Dict[str, int]:
 
 def come_to(read: Any, wanted: Any) -> None:
     """Open vSwitch adds up what it counted every half a second."""
-    deadline = time.monotonic() + 5
+    deadline = time.monotonic() + PATIENCE
     while (found := read()) != wanted and time.monotonic() < deadline:
         time.sleep(0.05)
     assert found == wanted
@@ -108,6 +109,7 @@ def test_counters_go_on_when_flows_and_processes_begin_anew(lab: Lab) -> None:
     come_to_count(lab, 7)
     come_to(lambda: lab.processes().keys(), {"ovs-vswitchd", "ovsdb-server"})
     lab.set_port("lab", "a", vlan=7)
+    assert comes_true(lab.is_in_force)
     send(one, 5, BROADCAST)
     come_to_count(lab, 12)
 
@@ -223,7 +225,6 @@ def test_only_what_frames_leave_behind_is_asked_of_the_daemon(
         with pytest.raises(BlockingIOError):
             line.accept()
         # It hangs up on whoever asks; they are told what was known last.
-        line.settimeout(10)
         asking = subprocess.Popen([TOOLS / "simhostctl", "show"], env=idle.environment)
         while asking.poll() is None:
             try:

@@ -8,7 +8,7 @@ from pathlib import Path
 
 import pytest
 
-from frame_lab import ONE_SWITCH, TOOLS, Lab
+from frame_lab import ONE_SWITCH, TOOLS, Lab, comes_true
 from lasting_open_vswitch import LastingOpenVSwitch
 
 READY = "READY=1\nSTATUS=moves the frames of "
@@ -71,7 +71,7 @@ def test_the_open_vswitch_of_the_machine(idle: Lab) -> None:
         daemon.terminate()
         daemon.communicate(timeout=30)
         # Frames go on without it.
-        assert one.reaches(other)
+        assert one.reaches(other, attempts=5)
 
 
 def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
@@ -84,8 +84,7 @@ def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
             with log:
                 waiting = second.simhostd(open_vswitch.where, stderr=log)
             who = f"simhostd of {idle.state}, process {idle.daemon.pid} writes to this Open vSwitch"
-            while who not in second.log():
-                assert waiting.poll() is None
+            assert comes_true(lambda: who in second.log()), second.log()
             assert second.log().count(who) == 1
             # It takes over when the first one ends.
             idle.stop()
