@@ -41,8 +41,8 @@ inline constexpr auto disabled = property<qex_Bool>(VSPROP_SWITCH_FORWARDING_DIS
                                      .json("disabled")
                                      .frames_obey()
                                      .says(
-                                         "whether the switch forwards nothing; kept without "
-                                         "effect");
+                                         "whether the switch forwards nothing; without "
+                                         "effect where no frames move");
 
 inline constexpr auto host_status =
     property<qex_uint32>(QEX_NEBPROP_HOST_STATUS)

@@ -113,8 +113,8 @@ inline constexpr auto nested_tag = property<qex_Bool>(VSPROP_PORT_VLAN_NESTEDTAG
                                        .json_of_uplink_port("nested_tag")
                                        .frames_obey()
                                        .says(
-                                           "whether frames of the port may have two tags; kept "
-                                           "without effect");
+                                           "whether frames of the port may have two tags; "
+                                           "without effect where no frames move");
 
 inline constexpr auto info = property<Bytes>(QEX_NEBPROP_PORT_VLAN)
                                  .of_port()

@@ -133,6 +133,12 @@ def test_nothing_else_is_beyond_them() -> None:
     assert beyond == {"mirror_sessions", "uplink_mirror_sessions"}
 
 
+def test_nothing_that_frames_obey_is_said_to_be_without_effect() -> None:
+    obeyed = [known for known in PROPERTIES if known["frames"] == "obey"]
+    assert obeyed
+    assert [known["key"] for known in obeyed if "kept without effect" in known["words"]] == []
+
+
 def test_the_table_for_people_says_it() -> None:
     text = Path(os.environ["BUILD_DIR"], "simhost", "properties.md").read_text(encoding="utf-8")
     for known in PROPERTIES:
