@@ -16,7 +16,7 @@ class Counting {
  public:
   explicit Counting(storage::Store &store) : store_(store) {}
 
-  // None of these three may be called in a transaction on the store.
+  // None of these four may be called in a transaction on the store.
 
   /// See Tally::count.
   void count(storage::SwitchKey key, openvswitch::Totals const &totals,

@@ -8,8 +8,6 @@
 namespace simhost::stored {
 
 Link link_of(storage::Transaction &transaction, std::string_view uplink);
-/// Changes a link. Its up_since is kept by the clock, whatever `link` says.
-
 /// See Plane::lacp_is_up.
 bool lacp_is_up(storage::Transaction &transaction, std::string_view uplink);
 
