@@ -41,8 +41,7 @@ bool is_marker(Flow const &flow) {
 }
 
 // In the order in which nothing refers to what is not there.
-openflow::Changes changes_of(openvswitch::Difference const &difference) {
-  openflow::Changes changes;
+void add_changes(openvswitch::Difference const &difference, openflow::Changes &changes) {
   auto const change_group = [&](GroupCommand command, Group const &group) {
     changes.emplace_back(openflow::GroupChange{.command = command, .group = group});
   };
@@ -74,7 +73,6 @@ openflow::Changes changes_of(openvswitch::Difference const &difference) {
   for (auto const number : difference.removed_groups) {
     change_group(GroupCommand::remove, {.id = number, .buckets = {}});
   }
-  return changes;
 }
 
 // Whether flows go, or begin anew, that count for others.
@@ -134,6 +132,16 @@ void add_relearned(openflow::Connection &connection, WantedBridge const &wanted,
   }
 }
 
+// All that the bridge learned, before anything that teaches it otherwise.
+void add_forgetting(openflow::Changes &changes) {
+  for (auto number = openvswitch::table::kFirstAddresses; openvswitch::table::is_learned(number);
+       ++number) {
+    Flow all;
+    all.table = number;
+    changes.emplace_back(openflow::FlowChange{.command = FlowCommand::remove, .flow = all});
+  }
+}
+
 // Another client may have come with a device, with an address of its own.
 std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wanted,
                                                        std::set<std::string> const &added) {
@@ -160,7 +168,8 @@ struct Bridges::Bridge {
   events::Loop::Watch watch;
   Flows flows;                          // that it has
   std::optional<std::uint64_t> change;  // that is in force
-  bool is_altered = false;  // by somebody else, so that the two before are none of it any more
+  bool is_altered = false;     // by somebody else, so that the two before are none of it any more
+  bool has_forgotten = false;  // what it had learned, for a restart of the host
   // Of the flows as they are.
   PortNumbers numbers;
   openvswitch::CountedSessions sessions;
@@ -352,8 +361,17 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   // A bridge without a marker was made just before.
   bool const is_new = !bridge.change;
   memory_.follow_devices(wanted.key, wanted.ports);
+  bool const forgets = wanted.forgets && !bridge.has_forgotten;
+  bridge.has_forgotten = wanted.forgets;
+  openflow::Changes changes;
+  if (forgets) {
+    memory_.forget(wanted.key);
+    add_forgetting(changes);
+  }
   auto difference = difference_between(*bridge.flows, *wanted.flows);
-  add_relearned(bridge.connection, wanted, difference, deadline);
+  if (!forgets) {
+    add_relearned(bridge.connection, wanted, difference, deadline);
+  }
   if (is_new) {
     std::ranges::move(memory_.recall(wanted.key, wanted.flows->flows),
                       std::back_inserter(difference.added_flows));
@@ -363,7 +381,7 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   if (bridge.sessions != wanted.sessions || ends_counting(difference)) {
     count(bridge, deadline);
   }
-  auto changes = changes_of(difference);
+  add_changes(difference, changes);
   if (bridge.change != change) {
     changes.emplace_back(openflow::FlowChange{.command = FlowCommand::add,
                                               .flow = openvswitch::generation_marker(change)});

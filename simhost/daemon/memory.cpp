@@ -51,6 +51,10 @@ void Memory::follow_devices(storage::SwitchKey key,
   }
 }
 
+void Memory::forget(storage::SwitchKey key) {
+  bridges_[key].flows.clear();
+}
+
 std::vector<Flow> Memory::learned_at(storage::SwitchKey key, std::uint32_t port) const {
   std::vector<Flow> learned;
   if (auto const found = bridges_.find(key); found != bridges_.end()) {

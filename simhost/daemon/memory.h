@@ -24,6 +24,8 @@ class Memory {
   /// The devices of a bridge, with the numbers of their ports. What was learned at a port that has
   /// another device than before is forgotten.
   void follow_devices(storage::SwitchKey key, std::map<std::string, std::uint32_t> const &devices);
+  /// Nothing that a bridge knows is to be known once more.
+  void forget(storage::SwitchKey key);
   /// What was learned at a port of a bridge.
   [[nodiscard]] std::vector<openflow::Flow> learned_at(storage::SwitchKey key,
                                                        std::uint32_t port) const;

@@ -17,6 +17,7 @@
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
 #include "storage/running/links.h"
+#include "storage/running/readings.h"
 #include "storage/store.h"
 
 namespace simhost::daemon {
@@ -153,6 +154,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                     [&](auto const &device) { return !is_there(device.first); });
       bridge.row.limits = {{openvswitch::table::kLearnedAddresses, flows->rows.most_learned}};
       wanted.most_tags = std::max(wanted.most_tags, flows->rows.most_tags);
+      bridge.forgets = !storage::has_readings(transaction, key);
       shorten(wanted.lasts, teaming::until_next_settles(team));
       wanted.bridges.push_back(std::move(bridge));
     } catch (Refused const &refused) {

@@ -39,6 +39,8 @@ struct WantedBridge {
   openvswitch::CountedSessions sessions;
   Flows flows;  ///< but for the marker of the change
   std::vector<Carried> carried = {};
+  /// The host was restarted, and has counted nothing since: what is learned is not to be known.
+  bool forgets = false;
 };
 
 /// A switch that cannot be run as it is, and why. Its bridge goes on as it was.

@@ -110,6 +110,7 @@ class WiredHost(SimulatedHost):
             self.learn(switch, said["mac"], port, vlan=said.get("vlan", 0))
 
     def restart(self) -> None:
+        self._wiring.lab.have_counted()
         super().restart()
         self.connect()
 

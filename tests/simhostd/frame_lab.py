@@ -152,6 +152,12 @@ class Lab:
         lines = self.host.run(*dump).splitlines()[1:]
         return [", ".join(p for p in line.split(", ") if not _is_time(p)) for line in lines]
 
+    def have_counted(self) -> None:
+        """All frames so far are counted: until then each of them may teach Open vSwitch once more
+        what it was made to forget."""
+        control = f"{self.run_folder()}/ovs-vswitchd.ctl"
+        self.host.run("ovs-appctl", "-t", control, "revalidator/wait")
+
     # What is around it.
 
     def wire(self, near: str, far: Namespace, name: str) -> None:

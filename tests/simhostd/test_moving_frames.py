@@ -5,10 +5,14 @@ import re
 import subprocess
 import sys
 from pathlib import Path
+from typing import List
+
+import pytest
 
 from simhost import frame
 
 from frame_lab import ONE_SWITCH, Lab, comes_true
+from lasting_open_vswitch import LastingOpenVSwitch
 
 
 def test_a_vlan_cuts_and_joins(lab: Lab) -> None:
@@ -110,9 +114,41 @@ def test_a_restart_of_the_host_leaves_what_is_persistent(lab: Lab) -> None:
         assert one.reaches(other, attempts=5)
     lab.ctl("restart")
     one, other = stays
-    assert one.reaches(other, attempts=5)
+    assert not one.reaches(other)
+    # Who they are is known again when they have spoken.
+    assert other.reaches(one, attempts=5)
     one, other = goes
     assert one.ceases_to_reach(other)
+
+
+@pytest.mark.parametrize("is_there", [True, False])
+def test_a_restart_of_the_host_forgets_what_was_learned(idle: Lab, is_there: bool) -> None:
+    idle.set_port("lab", "a", mac_learning={"learning": True, "flooding": True})
+    with LastingOpenVSwitch(idle) as open_vswitch:
+        idle.start(open_vswitch.where)
+        one, other = idle.client("lab", "a"), idle.client("lab", "b")
+        assert one.reaches(other, attempts=5)
+        assert learned(idle) == [31, 32]
+        for client in one, other:
+            # It is not to ask who was there.
+            client.run("ip", "neighbour", "flush", "dev", "eth0")
+        idle.have_counted()
+        if not is_there:
+            idle.stop()
+        idle.ctl("restart")
+        if not is_there:
+            idle.start(open_vswitch.where)
+        assert learned(idle) == []
+        assert one.reaches(other, attempts=5)
+        # Once: whatever changes then is no reason to do so again.
+        idle.set_port("lab", "c", vlan=9)
+        assert learned(idle) == [31, 32]
+
+
+def learned(lab: Lab) -> List[int]:
+    """The tables in which there are addresses that clients sent from."""
+    flows = lab.flows()
+    return [table for table in (31, 32) if any(f", table={table}, " in one for one in flows)]
 
 
 def shown(lab: Lab) -> str:
