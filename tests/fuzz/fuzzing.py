@@ -19,7 +19,9 @@ BUILD = Path(os.environ.get("FUZZERS_DIR", ROOT / "build-fuzzers"))
 
 OF_THE_HOST = ["mirror", "properties", "runtime_options", "scenario", "state_image"]
 """Those that link the whole simulated host."""
-NAMES = sorted([*OF_THE_HOST, "decoded", "openflow", "ovsdb", "script", "tables", "texts"])
+NAMES = sorted(
+    [*OF_THE_HOST, "decoded", "multicast", "openflow", "ovsdb", "script", "tables", "texts"]
+)
 """Each is a harness of this folder."""
 
 # A run that takes so long hangs; all take far below a second, sanitizers included.
@@ -93,6 +95,37 @@ TRACE = """\
 "out": {"data": {"at": 7, "bytes": "28230000"}, "length": 4}}
 """
 
+# Messages of multicast of each kind, IPv4's and IPv6's, without the checksums.
+IGMP = [
+    "1164000000000000",
+    "110a0000ef010101027d00010a000009",
+    "16000000ef010101",
+    "17000000ef010101",
+    "220000000000000206000002ef0101010a0000090a00000a01010001ef0202020a00000900000000",
+    "30140000007d0002",
+    "32000000",
+]
+MLD = [
+    "820000002710000000000000000000000000000000000000",
+    "8200000083e80000ff150000000000000000000000000101027d000120010db8000000000000000000000009",
+    "8300000000000000ff150000000000000000000000000101",
+    "8400000000000000ff150000000000000000000000000101",
+    "8f0000000000000105000001ff15000000000000000000000000010120010db8000000000000000000000009",
+    "97140000007d0002",
+    "99000000",
+]
+ROUTER_ALERT = bytes([5, 2, 0, 0, 1, 0])
+
+
+def messages() -> List[bytes]:
+    """Those as the harness takes them: numbers come from the end."""
+    of_ipv4, of_ipv6 = ([bytes.fromhex(digits) for digits in family] for family in (IGMP, MLD))
+    return [
+        *(one + bytes([0, 0, 1, 0, 0, 10, len(one), 1, 1]) for one in of_ipv4),
+        *(one + ROUTER_ALERT + bytes([0, 0, 1, len(one), 1, 0]) for one in of_ipv6),
+    ]
+
+
 TEXTS: Dict[str, Callable[[], List[str]]] = {
     "decoded": lambda: VALUES,
     "scenario": documents,
@@ -107,14 +140,18 @@ def vocabulary(name: str) -> List[str]:
 
 
 def write_seeds(name: str, folder: Path) -> None:
-    """Texts for the harnesses that read them, what a real Open vSwitch sends for those that read
-    that, and for the others, whose inputs are rows of choices, choices at random."""
+    """Texts and messages for the harnesses that read them, what a real Open vSwitch sends for those
+    that read that, and for the others, whose inputs are rows of choices, choices at random."""
     if name in ("openflow", "ovsdb"):
         subprocess.run([BUILD / "fuzzers" / "openvswitch_seeds", name, folder], check=True)
         return
     if name in TEXTS:
         for number, document in enumerate(TEXTS[name]()):
             (folder / f"seed-{number}").write_text(document, encoding="utf-8")
+        return
+    if name == "multicast":
+        for number, message in enumerate(messages()):
+            (folder / f"seed-{number}").write_bytes(message)
         return
     chance = random.Random(name)
     for number in range(24):

@@ -13,6 +13,7 @@ SEED = 20
 INPUTS = {
     "decoded": 20_000,
     "mirror": 20_000,
+    "multicast": 30_000,
     "openflow": 30_000,
     "ovsdb": 8_000,
     "properties": 1_500,

@@ -27,6 +27,7 @@ HEADERS = {
     "planes/openvswitch/ovsdb": "planes/openvswitch/ovsdb/client.h",
     "planes/openvswitch/rows": "planes/openvswitch/rows/rows.h",
     "planes/openvswitch/reconcile": "planes/openvswitch/reconcile/difference.h",
+    "planes/openvswitch/multicast": "planes/openvswitch/multicast/membership.h",
     "planes/openvswitch/compile": "planes/openvswitch/compile/compile.h",
     "planes/openvswitch/reading": "planes/openvswitch/reading/read_network.h",
     "planes/openvswitch/counting": "planes/openvswitch/counting/tally.h",
@@ -47,6 +48,7 @@ CALLER = [
     "events",
     "planes/openvswitch/transport",
     "planes/openvswitch/openflow",
+    "planes/openvswitch/multicast",
     "planes/openvswitch/compile",
     "planes/openvswitch/reading",
     "planes/openvswitch/line",
@@ -70,12 +72,19 @@ BELOW: Dict[str, List[str]] = {
         "planes/openvswitch/transport",
         "planes/openvswitch/openflow",
     ],
+    # Who is a member of what, whatever frames and clocks there are.
+    "planes/openvswitch/multicast": [
+        "events",
+        "planes/openvswitch/transport",
+        "planes/openvswitch/openflow",
+    ],
     # A pure function, which cannot look at the state.
     "planes/openvswitch/compile": [
         "base",
         "events",
         "planes/openvswitch/transport",
         "planes/openvswitch/openflow",
+        "planes/openvswitch/multicast",
     ],
     "planes/openvswitch/reading": [
         "base",
@@ -85,6 +94,7 @@ BELOW: Dict[str, List[str]] = {
         "events",
         "planes/openvswitch/transport",
         "planes/openvswitch/openflow",
+        "planes/openvswitch/multicast",
         "planes/openvswitch/compile",
     ],
     "planes/openvswitch/counting": [
@@ -95,6 +105,7 @@ BELOW: Dict[str, List[str]] = {
         "events",
         "planes/openvswitch/transport",
         "planes/openvswitch/openflow",
+        "planes/openvswitch/multicast",
         "planes/openvswitch/compile",
     ],
     "planes/openvswitch/rows": [
