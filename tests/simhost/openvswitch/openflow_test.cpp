@@ -312,6 +312,31 @@ TEST(OpenFlow, ReceivesFramesWithWhatTheFlowKnewOfThem) {
   EXPECT_EQ(packet.frame, frame_through_the_tables(1).frame);
 }
 
+TEST(OpenFlow, LimitsWhatFlowsSendUp) {
+  Bridge const bridge(1);
+  constexpr std::uint32_t kRate = 10;
+  constexpr std::uint32_t kFrames = 200;
+  {
+    // Whatever was said of it before.
+    Connection connection(bridge.socket(), soon());
+    connection.limit_packet_ins(1, soon());
+  }
+  Connection connection(bridge.socket(), soon());
+  connection.set_async({true, false, false}, soon());
+  connection.limit_packet_ins(kRate, soon());
+  connection.change(to_add({}, {flow_of_table(0, {ToController{}})}), soon());
+  for (std::uint32_t count = 0; count < kFrames; ++count) {
+    connection.send(frame_through_the_tables(1));
+  }
+  connection.barrier(soon());
+  std::uint32_t received = 0;
+  while (connection.next_event()) {
+    ++received;
+  }
+  EXPECT_GE(received, kRate);
+  EXPECT_LT(received, kFrames / 2);
+}
+
 TEST(OpenFlow, IsToldOfAFlowThatGoes) {
   Bridge const bridge;
   Connection connection(bridge.socket(), soon());

@@ -167,21 +167,25 @@ void Connection::send(PacketOut const &packet) {
 }
 
 void Connection::barrier(Deadline deadline) {
+  order([](Writer &, Xid) {}, deadline);
+}
+
+void Connection::order(std::function<void(Writer &, Xid)> const &put, Deadline deadline) {
+  // It has no reply but the error, which comes before that of the barrier.
   Writer out;
   auto const xid = next_xid();
+  put(out, xid);
   put_barrier_request(out, xid);
   send(out);
   wait_for_reply(xid, deadline);
 }
 
+void Connection::limit_packet_ins(std::uint32_t rate, Deadline deadline) {
+  order([&](Writer &out, Xid xid) { put_controller_meter(out, xid, rate); }, deadline);
+}
+
 void Connection::set_async(AsyncMessages const &wanted, Deadline deadline) {
-  // It has no reply but the error, which comes before that of the barrier.
-  Writer out;
-  auto const xid = next_xid();
-  put_set_async(out, xid, wanted);
-  put_barrier_request(out, xid);
-  send(out);
-  wait_for_reply(xid, deadline);
+  order([&](Writer &out, Xid xid) { put_set_async(out, xid, wanted); }, deadline);
 }
 
 std::optional<ErrorReply> Connection::wait_for_errors(Xid first, Xid last, Deadline deadline) {

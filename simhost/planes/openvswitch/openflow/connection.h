@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <deque>
 #include <filesystem>
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -50,6 +51,8 @@ class Connection {
   void change(Changes const &changes, Deadline deadline);
   /// Returns when the switch is done with all that it was sent.
   void barrier(Deadline deadline);
+  /// From now on flows send up no more than so many frames a second, however many they are sent.
+  void limit_packet_ins(std::uint32_t rate, Deadline deadline);
   /// From now on it sends these by itself.
   void set_async(AsyncMessages const &wanted, Deadline deadline);
 
@@ -71,6 +74,8 @@ class Connection {
 
   std::uint32_t next_xid() { return ++xid_; }
   void send(Writer const &out);
+  /// Sends what is replied to only if it is refused, and waits until it is done.
+  void order(std::function<void(Writer &, std::uint32_t)> const &put, Deadline deadline);
   void greet(Deadline deadline);
   /// The next whole message that is received already.
   std::optional<Message> take_message();

@@ -26,6 +26,7 @@ enum class MessageType : std::uint8_t {
   barrier_request = 20,
   barrier_reply = 21,
   set_async = 28,
+  meter_mod = 29,
   request_forward = 32,
   bundle_control = 33,
   bundle_add = 34,

@@ -164,6 +164,28 @@ void put_bundle_add(Writer &out, Xid xid, std::uint32_t bundle, Change const &ch
   });
 }
 
+void put_controller_meter(Writer &out, Xid xid, std::uint32_t rate) {
+  enum class Command : std::uint16_t { add = 0, remove = 2 };
+  constexpr std::uint32_t kControllerMeter = 0xfffffffe;
+  constexpr std::uint16_t kPacketsWithBurst = 0x2 | 0x4;
+  constexpr std::uint16_t kDropBand = 1;
+  constexpr std::uint16_t kBandBytes = 16;
+  auto const put_head = [&](Command command) {
+    out.u16(static_cast<std::uint16_t>(command));
+    out.u16(kPacketsWithBurst);
+    out.u32(kControllerMeter);
+  };
+  put_message(out, MessageType::meter_mod, xid, [&] { put_head(Command::remove); });
+  put_message(out, MessageType::meter_mod, xid, [&] {
+    put_head(Command::add);
+    out.u16(kDropBand);
+    out.u16(kBandBytes);
+    out.u32(rate);
+    out.u32(rate);
+    out.zeros(4);
+  });
+}
+
 void put_set_async(Writer &out, Xid xid, AsyncMessages const &wanted) {
   // Each kind twice, the second for a controller that is no slave.
   constexpr std::uint16_t kPacketIn = 0;
