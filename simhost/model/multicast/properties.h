@@ -20,6 +20,7 @@ inline constexpr auto filter_mode = property<qex_uint32>(VSPROP_MULTICAST_FILTER
                                         .among(kModes)
                                         .defaults_to(VS_MCAST_FILTER_MODE_LEGACY)
                                         .json("multicast")
+                                        .frames_obey()
                                         .says("how the switch filters multicast");
 
 inline constexpr std::array<Descriptor const *, 1> kProperties{&filter_mode};

@@ -1,7 +1,10 @@
 // Compiles switches for tests: a line of standard input says a host, as a scenario document, and
 // what of it has a device; a line of standard output is what Open vSwitch would be told of its
 // switch "s".
+#include <arpa/inet.h>
+
 #include <array>
+#include <cstdint>
 #include <cstdio>
 #include <exception>
 #include <iostream>
@@ -39,6 +42,58 @@ simhost::storage::MacBytes to_mac(std::string const &text) {
     mac[at] = static_cast<std::byte>(bytes[at]);
   }
   return mac;
+}
+
+simhost::multicast::Address address_from(std::string const &text) {
+  using simhost::multicast::Family;
+  bool const is_ipv4 = text.find(':') == std::string::npos;
+  simhost::multicast::Address address{.family = is_ipv4 ? Family::ipv4 : Family::ipv6};
+  if (inet_pton(is_ipv4 ? AF_INET : AF_INET6, text.c_str(), address.bytes.data()) != 1) {
+    throw std::invalid_argument(text);
+  }
+  return address;
+}
+
+simhost::multicast::Place place_of(ChangingTransaction &transaction,
+                                   simhost::storage::SwitchKey key, Json const &said) {
+  auto const port = simhost::get_port(transaction, key, said.at("port").get<std::string>());
+  return {.port = static_cast<std::uint32_t>(port.number),
+          .vlan = said.value("vlan", std::uint16_t{0})};
+}
+
+// {"address", "vlan", "members": [{"port", "from": [...]} or {"port", "not_from": [...]}]}
+simhost::multicast::Group group_of(ChangingTransaction &transaction,
+                                   simhost::storage::SwitchKey key, Json const &said) {
+  simhost::multicast::Group group{.vlan = said.value("vlan", std::uint16_t{0}),
+                                  .address = address_from(said.at("address")),
+                                  .members = {}};
+  for (auto const &one : said.at("members")) {
+    simhost::multicast::Member member{.port = place_of(transaction, key, one).port,
+                                      .sources = {.are_excluded = !one.contains("from")}};
+    for (auto const &source :
+         one.value(one.contains("from") ? "from" : "not_from", Json::array())) {
+      member.sources.listed.push_back(address_from(source));
+    }
+    group.members.push_back(member);
+  }
+  return group;
+}
+
+simhost::multicast::Groups groups_of(ChangingTransaction &transaction,
+                                     simhost::storage::SwitchKey key, Json const &said) {
+  using simhost::multicast::Family;
+  simhost::multicast::Groups all;
+  for (auto const &group : said.value("groups", Json::array())) {
+    all.groups.push_back(group_of(transaction, key, group));
+  }
+  for (auto const &router : said.value("routers", Json::array())) {
+    all.routers.push_back({.place = place_of(transaction, key, router),
+                           .family = router.value("ipv6", false) ? Family::ipv6 : Family::ipv4});
+  }
+  for (auto const &place : said.value("undecided", Json::array())) {
+    all.undecided.push_back(place_of(transaction, key, place));
+  }
+  return all;
 }
 
 simhost::openvswitch::Observed connect(ChangingTransaction &transaction,
@@ -113,7 +168,8 @@ Json compiled(Json const &said) {
   ChangingTransaction transaction(store);
   simhost::scenario::apply(transaction, said.at("host").dump());
   auto const key = simhost::get_switch(transaction, "s").key;
-  auto const observed = connect(transaction, key, said);
+  auto observed = connect(transaction, key, said);
+  observed.groups = groups_of(transaction, key, said.value("multicast", Json::object()));
   auto const made = made_of(transaction, key, observed);
 
   Json answer{{"devices", numbers_of_devices(transaction, key)},

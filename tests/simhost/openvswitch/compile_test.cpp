@@ -316,5 +316,67 @@ TEST(TheWays, SpreadPortsOverTheUplinksOfAGroup) {
   EXPECT_THAT(ways.of(network.ports[1])->slots, ElementsAre(Slot{11, 12}));
 }
 
+std::string actions_of(Compiled const &compiled, std::string const &match) {
+  for (auto const &flow : compiled.flows) {
+    auto const text = openflow::to_text(flow);
+    if (text.find(match) != std::string::npos) {
+      return text.substr(text.find("actions="));
+    }
+  }
+  return "none";
+}
+
+multicast::Group group_of(std::uint8_t number, std::uint32_t ports) {
+  multicast::Group group{.vlan = 7,
+                         .address = multicast::address_of(openflow::Ipv4Address{239, 1, 1, number}),
+                         .members = {}};
+  for (std::uint32_t port = 1; port <= ports; ++port) {
+    group.members.push_back({.port = port, .sources = {.are_excluded = true}});
+  }
+  return group;
+}
+
+TEST(Groups, LeaveOthersAsTheyAre) {
+  auto network = with_ports(3);
+  network.multicast.hears_igmp = true;
+  network.multicast.groups.groups = {group_of(2, 2)};
+  auto const before = compile(network);
+  network.multicast.groups.groups = {group_of(1, 3), group_of(2, 2), group_of(3, 1)};
+  auto const after = compile(network);
+  EXPECT_EQ(after.flows.size(), before.flows.size() + 2);
+  EXPECT_TRUE(std::ranges::includes(after.flows, before.flows));
+}
+
+TEST(Groups, MayHaveMoreMembersThanAFlowHasRoomFor) {
+  auto network = with_ports(2500);
+  network.multicast.hears_igmp = true;
+  network.multicast.groups.groups = {group_of(1, 2500)};
+  auto const compiled = compile(network);
+  EXPECT_EQ(actions_of(compiled,
+                       "reg9=0,vlan_tci=0x0000/0x1fff,dl_dst=01:00:00:00:00:00/"
+                       "01:00:00:00:00:00,nw_dst=239.1.1.1 "),
+            "actions=set_field:0x1->reg9,resubmit(,26),set_field:0x2->reg9,resubmit(,26),"
+            "set_field:0x3->reg9,resubmit(,26),set_field:0x5->reg8,set_field:0->reg9,"
+            "resubmit(,14)");
+  auto const last = actions_of(compiled,
+                               "reg9=0x3,vlan_tci=0x0000/0x1fff,dl_dst=01:00:00:00:00:00/"
+                               "01:00:00:00:00:00,nw_dst=239.1.1.1 ");
+  EXPECT_THAT(last, HasSubstr("actions=set_field:0x7d1->reg14"));
+  EXPECT_THAT(last, HasSubstr("set_field:0x9c4->reg14,resubmit(,23)"));
+}
+
+TEST(Groups, HaveNoMembersThatAreGoneOrElsewhere) {
+  auto network = with_ports(2);
+  network.ports[1].vlan.vlan = 8;
+  network.multicast.hears_igmp = true;
+  auto const without = compile(network);
+  auto group = group_of(1, 3);
+  group.members.erase(group.members.begin());
+  network.multicast.groups = {.groups = {group},
+                              .routers = {{.place = {.port = 2, .vlan = 7}, .family = {}}},
+                              .undecided = {{.port = 9, .vlan = 7}}};
+  EXPECT_EQ(compile(network).flows, without.flows);
+}
+
 }  // namespace
 }  // namespace simhost::openvswitch

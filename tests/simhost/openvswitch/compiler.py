@@ -25,8 +25,10 @@ class Compiler:
         switch: Mapping[str, Any],
         clients: Sequence[Mapping[str, Any]],
         host: Optional[Mapping[str, Any]] = None,
+        multicast: Optional[Mapping[str, Any]] = None,
     ) -> Dict[str, Any]:
-        """What it says of a switch whose ports of those names have devices, and all uplinks."""
+        """What it says of a switch whose ports of those names have devices, and all uplinks, and
+        whose groups have those members."""
         uplinks: List[str] = list(switch.get("uplinks", []))
         document = {
             "uplinks": [{"name": uplink} for uplink in uplinks],
@@ -34,6 +36,8 @@ class Compiler:
             **(host or {}),
         }
         question = {"host": document, "uplinks": uplinks, "clients": list(clients)}
+        if multicast is not None:
+            question["multicast"] = multicast
         assert self._process.stdin and self._process.stdout
         self._process.stdin.write(json.dumps(question) + "\n")
         self._process.stdin.flush()
@@ -41,9 +45,12 @@ class Compiler:
         return answer
 
     def compile(
-        self, switch: Mapping[str, Any], clients: Sequence[Mapping[str, Any]]
+        self,
+        switch: Mapping[str, Any],
+        clients: Sequence[Mapping[str, Any]],
+        multicast: Optional[Mapping[str, Any]] = None,
     ) -> Dict[str, Any]:
         """Likewise of one that it compiles."""
-        answer = self.answer(switch, clients)
+        answer = self.answer(switch, clients, multicast=multicast)
         assert "flows" in answer, answer
         return answer

@@ -43,7 +43,7 @@ def golden(request: pytest.FixtureRequest) -> Iterator[Path]:
 
 def test_it_is_compiled_to_that(golden: Path, compiler: Compiler) -> None:
     document, sections = read(golden)
-    made = compiler.compile(document["switch"], document["clients"])
+    made = compiler.compile(**document)
     lines = [*made["flows"], *made["groups"]]
     assert any(sections.values())
     for words, wanted in sections.items():
@@ -54,7 +54,7 @@ def test_open_vswitch_has_what_it_was_told(
     golden: Path, compiler: Compiler, open_vswitch: OpenVSwitch
 ) -> None:
     document, _ = read(golden)
-    made = compiler.compile(document["switch"], document["clients"])
+    made = compiler.compile(**document)
     open_vswitch.have_bridge("goldens")
     open_vswitch.load("goldens", made["flows"], made["groups"])
     assert open_vswitch.flows("goldens") == sorted(made["flows"])

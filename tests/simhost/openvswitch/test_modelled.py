@@ -32,6 +32,7 @@ OBEYED: Dict[Tuple[str, str], List[Any]] = {
     ("switch", "teaming"): [TEAM, {"balance": "mac"}, {"balance": "ip"}, {"balance": "explicit"}],
     ("switch", "private_vlans"): [MAP],
     ("switch", "mac_learning"): [{"aging_time": 60}, {"limit": 0}],
+    ("switch", "multicast"): ["snooping", "igmp", "mld"],
     ("switch", "uplink_mirror_sessions"): [[{**SESSION, "received_by": [{"uplink": "u1"}]}]],
     ("port", "teaming"): [TEAM],
     ("port", "uplink"): ["u2"],
@@ -40,13 +41,16 @@ OBEYED: Dict[Tuple[str, str], List[Any]] = {
     ("port", "nested_tag"): [True],
     ("port", "forbids"): [["forged_transmits"]],
     ("port", "mac_learning"): [{"learning": True}, {"flooding": True}],
-    ("port", "ethernet_filter"): [{"frames": ["promiscuous"]}, {"frames": ["sink"]}],
+    ("port", "ethernet_filter"): [
+        {"frames": ["promiscuous"]},
+        {"frames": ["sink"]},
+        {"frames": ["multicast"], "addresses": ["01:00:5e:01:01:01"]},
+    ],
     ("port", "mirror_sessions"): [[{**SESSION, "sent_by": [{"port": "p1"}]}]],
     ("port", "blocked"): [True],
 }
 # Values of those that documents name and no frame looks at.
 KEPT: Dict[Tuple[str, str], List[Any]] = {
-    ("switch", "multicast"): ["snooping", "igmp", "mld"],
     ("port", "alias"): ["somebody"],
     ("port", "connection"): [77],
 }

@@ -99,7 +99,7 @@ Compiled compile(Network const &network) {
   for (auto *stage :
        {compile_admission, compile_sources, compile_tags, compile_private_vlans, compile_own_frames,
         compile_mirrors, compile_learning, compile_lookup, compile_receiving, compile_dispatch,
-        compile_lists, compile_delivery, compile_teams, compile_counting}) {
+        compile_groups, compile_lists, compile_delivery, compile_teams, compile_counting}) {
     stage(plan, program);
   }
   std::sort(program.flows.begin(), program.flows.end());

@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "planes/openvswitch/multicast/groups.h"
 #include "planes/openvswitch/openflow/port.h"
 #include "planes/openvswitch/openflow/value.h"
 
@@ -91,11 +92,14 @@ struct Port {
   std::optional<EthernetAddress> address = std::nullopt;
   PortVlan vlan = {};
   bool blocked = false;
-  bool address_changed = false;      ///< although the client may not: nothing passes
-  bool may_forge = true;             ///< may send from other addresses than its own
-  bool promiscuous = false;          ///< gets all frames of its VLANs
-  bool floods = false;               ///< gets frames for unknown addresses
-  bool is_sink = false;              ///< gets those that no other port takes
+  bool address_changed = false;   ///< although the client may not: nothing passes
+  bool may_forge = true;          ///< may send from other addresses than its own
+  bool promiscuous = false;       ///< gets all frames of its VLANs
+  bool floods = false;            ///< gets frames for unknown addresses
+  bool is_sink = false;           ///< gets those that no other port takes
+  bool takes_all_groups = false;  ///< gets the frames of all groups
+  /// The addresses of groups whose frames it asks for; none while it does not say.
+  std::optional<std::vector<EthernetAddress>> asked_groups = std::nullopt;
   bool transmits_by_uplink = false;  ///< whatever it sends goes out over an uplink, and only there
   std::optional<Learning> learning = std::nullopt;
   /// Of the switch's teams; none: it reaches no uplink.
@@ -150,6 +154,19 @@ struct Addresses {
   bool operator==(Addresses const &) const = default;
 };
 
+/// Which frames of groups go where. While no family is heard of, ports get those that they ask for,
+/// and all if they do not say; else those of their members, sources looked at, and of their
+/// routers.
+struct Multicast {
+  bool hears_igmp = false;
+  bool hears_mld = false;
+  multicast::Groups groups = {};  ///< by the numbers of ports
+
+  [[nodiscard]] bool hears(multicast::Family family) const {
+    return family == multicast::Family::ipv4 ? hears_igmp : hears_mld;
+  }
+};
+
 struct Network {
   bool disabled = false;
   std::uint16_t mtu = 1500;  ///< bytes of a packet
@@ -162,6 +179,7 @@ struct Network {
   std::vector<Mirror> mirrors;
 
   bool operator==(Network const &) const = default;
+  Multicast multicast;
 };
 
 }  // namespace simhost::openvswitch

@@ -49,6 +49,8 @@ inline constexpr std::uint8_t kElection = 12;
 inline constexpr std::uint8_t kDispatch = 13;
 /// Lists of ports by kList, kDomain and kWay, in pieces by kPiece.
 inline constexpr std::uint8_t kLists = 14;
+/// Frames of groups that not everybody gets: to those who want them.
+inline constexpr std::uint8_t kGroups = 26;
 /// Out to the port in kReceiver, if its VLANs allow it.
 inline constexpr std::uint8_t kDelivery = 15;
 /// Which uplink carries it: the group of the port's team.
@@ -152,6 +154,14 @@ enum class List : std::uint8_t {
   all = 1,          ///< every port
   unknown = 2,      ///< those that get frames for unknown addresses
   promiscuous = 3,  ///< those that get every frame
+  unasked = 4,      ///< those that do not say which groups they ask for
+  // In a VLAN, for each family; only those are members of no group.
+  ipv4_takers = 5,     ///< those that get all groups
+  ipv4_strangers = 6,  ///< those that get groups without members
+  ipv4_routers = 7,
+  ipv6_takers = 8,
+  ipv6_strangers = 9,
+  ipv6_routers = 10,
 };
 
 /// What a flow counts: the kind is the cookie's first byte, the number of a port or of a mirror

@@ -45,6 +45,13 @@ std::uint16_t Plan::hard_timeout() const {
   return aging > kLongestTimeout ? 0 : static_cast<std::uint16_t>(aging);
 }
 
+bool Plan::filters_by_address() const {
+  auto const &multicast = network.multicast;
+  return !multicast.hears_igmp && !multicast.hears_mld &&
+         std::ranges::any_of(network.ports,
+                             [](Port const &port) { return port.asked_groups.has_value(); });
+}
+
 void Plan::note_private_vlans() {
   for (std::size_t vlan = 0; vlan < kinds_.size(); ++vlan) {
     kinds_[vlan].domain = static_cast<std::uint16_t>(vlan);

@@ -53,6 +53,8 @@ class Plan {
   [[nodiscard]] std::vector<std::uint16_t> const &private_vlans() const { return private_vlans_; }
   [[nodiscard]] std::vector<OwnAddress> const &own_addresses() const { return own_addresses_; }
   [[nodiscard]] std::vector<FixedPlace> const &fixed_places() const { return fixed_places_; }
+  /// Whether ports get only frames of the groups that they ask for.
+  [[nodiscard]] bool filters_by_address() const;
   /// Whether something of a port has to be looked at when a frame of its VLAN comes, in table
   /// kDelivery.
   [[nodiscard]] bool is_looked_at(Port const &port) const;

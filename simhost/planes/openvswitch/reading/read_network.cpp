@@ -11,6 +11,7 @@
 #include "model/mac/learning.h"
 #include "model/mac/properties.h"
 #include "model/mirror/running.h"
+#include "model/multicast/properties.h"
 #include "model/ports/properties.h"
 #include "model/properties/properties.h"
 #include "model/security/properties.h"
@@ -138,8 +139,23 @@ void read_learning(VSPMACLearning const &set, Port &port) {
   }
 }
 
+// Places of a hash are addresses that are asked for one by one.
+std::vector<EthernetAddress> asked_groups(VSExtraEthFilter const &filter) {
+  std::vector<EthernetAddress> asked;
+  for (std::size_t at = 0; at < filter.numMulticastAddrs; ++at) {
+    asked.push_back(address_of(filter.multicastAddrs[at]));
+  }
+  return asked;
+}
+
 void read_filter(Settings const &settings, storage::PortNumber number, Port &port) {
-  auto const flags = settings.filters.of(number).flags;
+  auto const &filter = settings.filters.of(number);
+  auto const flags = filter.flags;
+  port.takes_all_groups = (flags & QEX_ETH_FILTER_ALLMULTI) != 0;
+  if (!port.takes_all_groups &&
+      (flags & (QEX_ETH_FILTER_MULTICAST | QEX_ETH_FILTER_USE_LADRF)) != 0) {
+    port.asked_groups = asked_groups(filter);
+  }
   port.is_sink = (flags & QEX_ETH_FILTER_SINK) != 0;
   port.promiscuous = (flags & QEX_ETH_FILTER_PROMISC) != 0 &&
                      !forbids(settings, number, VSPORT_SECURITY_DISALLOW_PROMISC);
@@ -171,6 +187,11 @@ class Reader {
                                         .secondary = entry.secondaryVID,
                                         .kind = static_cast<PrivateKind>(entry.pvlanType)});
     }
+    auto const mode = effective(transaction_, multicast::filter_mode, owner);
+    network_.multicast = {
+        .hears_igmp = mode == VS_MCAST_FILTER_MODE_SNOOPING || mode == VS_MCAST_FILTER_MODE_IGMP,
+        .hears_mld = mode == VS_MCAST_FILTER_MODE_SNOOPING || mode == VS_MCAST_FILTER_MODE_MLD,
+        .groups = observed_.groups};
     auto const learning = mac::learning_of(transaction_, key_);
     network_.addresses = {.aging = learning.agingTime,
                           .limit = learning.macLimit,

@@ -16,6 +16,8 @@ struct Observed {
   std::map<storage::PortNumber, EthernetAddress> addresses = {};
   /// Which of its team's uplinks a port is given, where that is not by its number.
   std::map<storage::PortNumber, std::uint32_t> shares = {};
+  /// Who wants frames of which groups.
+  multicast::Groups groups = {};
 };
 
 /// The uplinks and ports that have a device, by the numbers of their devices. `team` has the links

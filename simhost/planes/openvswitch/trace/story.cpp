@@ -149,6 +149,9 @@ class Story {
       case table::kDispatch:
         tell_destination();
         break;
+      case table::kGroups:
+        tell_group();
+        break;
       case table::kElection:
         is_for_another_uplink_ = is_for_another_uplink_ || visit.missed;
         break;
@@ -223,6 +226,12 @@ class Story {
     } else {
       say(Kind::passes,
           "is for an address at " + in_words(names_.station(reg_of(field::kDestination))));
+    }
+  }
+
+  void tell_group() {
+    if (!std::exchange(told_group_, true)) {
+      say(Kind::passes, "is of a group, for ports that want it", {{}, "multicast"});
     }
   }
 
@@ -342,6 +351,7 @@ class Story {
   std::optional<std::size_t> passed_over_;  // the depth of what is
   bool dropped_ = false;
   bool refused_ = false;  // to somebody
+  bool told_group_ = false;
   bool is_for_another_uplink_ = false;
   bool left_ = false;  // at some port
   bool left_before_ = false;

@@ -2,15 +2,12 @@
 #include <algorithm>
 #include <utility>
 
+#include "planes/openvswitch/compile/stages/groups.h"
+#include "planes/openvswitch/compile/stages/port_lists.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
 namespace {
-
-Actions to_list(List list) {
-  return {openflow::set(field::kList, static_cast<openflow::Value>(list)),
-          openflow::set(field::kPiece, 0), go_to(table::kLists)};
-}
 
 class Dispatch {
  public:
@@ -30,6 +27,7 @@ class Dispatch {
     for (auto const &port : plan_.network.ports) {
       compile_port(port);
     }
+    compile_groups();
     to_ports_and_uplinks(200, to_many(Match()), to_list(List::all));
     to_ports_and_uplinks(150, Match().with(field::kDestination, kBeyond), promiscuous_);
     to_ports_and_uplinks(150, Match().with(field::kDestination, 0), to_list(List::unknown));
@@ -50,6 +48,34 @@ class Dispatch {
     } else if (auto const *way = plan_.ways.of(port)) {
       add(100, Match(to_it).with(field::kOrigin, kFromUplink).with(field::kWay, way->number),
           deliver());
+    }
+  }
+  void compile_groups() {
+    auto const to_groups = to_piece(table::kGroups, 0);
+    if (plan_.filters_by_address()) {
+      to_ports_and_uplinks(210, to_many(Match()), to_groups);
+    }
+    for (auto const family : {multicast::Family::ipv4, multicast::Family::ipv6}) {
+      if (plan_.network.multicast.hears(family)) {
+        to_ports_and_uplinks(210, group_frames(family), to_groups);
+        for (auto const &message : group_messages(family)) {
+          hear(message, to_groups);
+        }
+      }
+    }
+  }
+  // Of members that are this switch's.
+  void hear(Match const &message, Actions const &to_groups) {
+    Actions const heard{openflow::ToController{}};
+    auto actions = heard;
+    append(append(actions, to_groups), to_uplinks_);
+    add(250, Match(message).with(field::kOrigin, kFromClient), actions);
+    for (auto const &port : plan_.network.ports) {
+      if (port.transmits_by_uplink && sends_frames(port)) {
+        auto out = heard;
+        add(350, Match(message).with(openflow::Field::in_port, port.port),
+            append(out, to_uplinks_));
+      }
     }
   }
   // The uplinks have their own frames already.

@@ -9,13 +9,12 @@
 #include <utility>
 #include <vector>
 
+#include "planes/openvswitch/compile/stages/port_lists.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
 namespace {
 
-// An action takes 16 bytes, a port two of them at most, and a flow has 65,535 bytes.
-constexpr std::size_t kMostPorts = 1000;
 // In kPiece: the ports that may be in many VLANs, which are on the lists of all; then their pieces.
 constexpr std::uint32_t kTrunks = 0x10000;
 
@@ -27,11 +26,12 @@ bool is_on(List list, Port const &port) {
       return port.floods || port.is_sink || port.promiscuous;
     case List::promiscuous:
       return port.promiscuous;
+    case List::unasked:
+      return !port.asked_groups || port.promiscuous;
+    default:
+      return false;
   }
-  return false;
 }
-
-using Ports = std::vector<Port const *>;
 
 struct Members {
   std::map<std::uint16_t, Ports> by_domain;
@@ -53,8 +53,8 @@ class Lists {
       compile_domain(domain, ports, !members.trunks.empty());
     }
     if (!members.trunks.empty()) {
-      add(50, piece(0), to_piece(kTrunks));
-      compile_pieces(kTrunks, of_list_, {}, members.trunks);
+      add(50, piece(0), to_piece(table::kLists, kTrunks));
+      compile_pieces(kTrunks, of_list_, {}, members.trunks, 100);
     }
   }
 
@@ -74,9 +74,9 @@ class Lists {
   }
 
   void compile_domain(std::uint16_t domain, Ports const &ports, bool with_trunks) {
-    auto const after = with_trunks ? to_piece(kTrunks) : Actions{};
+    auto const after = with_trunks ? to_piece(table::kLists, kTrunks) : Actions{};
     auto const in_domain = Match(of_list_).with(field::kDomain, domain);
-    compile_pieces(0, in_domain, after, ports);
+    compile_pieces(0, in_domain, after, ports, 100);
     if (domain == 0) {
       return;
     }
@@ -90,42 +90,11 @@ class Lists {
     }
   }
 
-  // The first flow of a list has all ports if they fit, else the pieces.
-  void compile_pieces(std::uint32_t first, Match const &list, Actions const &after,
-                      Ports const &ports, std::uint16_t priority = 100) {
-    auto const head = Match(list).with(field::kPiece, first);
-    Actions actions;
-    if (ports.size() <= kMostPorts) {
-      actions = to_ports(ports.begin(), ports.end());
-    } else {
-      auto number = first;
-      for (auto at = ports.begin(); at != ports.end();) {
-        auto const end = at + std::min<std::ptrdiff_t>(kMostPorts, ports.end() - at);
-        append(actions, to_piece(++number));
-        add(priority, Match(list).with(field::kPiece, number), to_ports(at, end));
-        at = end;
-      }
-    }
-    add(priority, head, append(actions, after));
-  }
-
-  Actions to_ports(Ports::const_iterator from, Ports::const_iterator to) {
-    Actions actions;
-    for (; from != to; ++from) {
-      auto const &port = **from;
-      if (plan_.is_looked_at(port)) {
-        actions.emplace_back(openflow::set(field::kReceiver, port.port));
-        actions.push_back(go_to(table::kDelivery));
-      } else if (plan_.counts_sent(port)) {
-        append(actions, send_to(port.port));
-      } else {
-        actions.emplace_back(openflow::Output{.port = port.port});
-      }
-    }
-    return actions;
-  }
-  static Actions to_piece(std::uint32_t number) {
-    return {openflow::set(field::kPiece, number), go_to(table::kLists)};
+  void compile_pieces(std::uint32_t first, Match const &match, Actions const &after,
+                      Ports const &ports, std::uint16_t priority) {
+    add_ports(plan_, program_,
+              {.table = table::kLists, .priority = priority, .match = match, .first_piece = first},
+              ports, after);
   }
   [[nodiscard]] Match piece(std::uint32_t number) const {
     return Match(of_list_).with(field::kPiece, number);
@@ -143,8 +112,12 @@ class Lists {
 }  // namespace
 
 void compile_lists(Plan const &plan, Program &program) {
+  std::vector wanted{List::all, List::unknown, List::promiscuous};
+  if (plan.filters_by_address()) {
+    wanted.push_back(List::unasked);
+  }
   Lists lists(plan, program);
-  for (auto const list : {List::all, List::unknown, List::promiscuous}) {
+  for (auto const list : wanted) {
     lists.compile(list, nullptr);
     for (auto const &way : plan.ways.all()) {
       lists.compile(list, &way);

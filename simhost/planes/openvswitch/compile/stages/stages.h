@@ -16,6 +16,7 @@ void compile_learning(Plan const &plan, Program &program);
 void compile_lookup(Plan const &plan, Program &program);
 void compile_receiving(Plan const &plan, Program &program);
 void compile_dispatch(Plan const &plan, Program &program);
+void compile_groups(Plan const &plan, Program &program);
 void compile_lists(Plan const &plan, Program &program);
 void compile_delivery(Plan const &plan, Program &program);
 void compile_teams(Plan const &plan, Program &program);
