@@ -31,6 +31,8 @@ constexpr auto kPatienceForEach = 10ms;
 constexpr auto *kLock = "simhostd";
 // What Open vSwitch says of its flows is older than that anyway.
 constexpr auto kBetweenCounts = 100ms;
+// A second and bridge: more than members say, and less than keeps this process from all else.
+constexpr std::uint32_t kMostPacketIns = 1000;
 
 Deadline soon(std::size_t devices = 0) {
   return Deadline::clock::now() + kPatience + devices * kPatienceForEach;
@@ -263,6 +265,7 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
   auto &bridge = bridges_[wanted.key];
   if (bridge == nullptr) {
     auto made = std::make_unique<Bridge>(wanted, folder_ / (wanted.row.name + ".mgmt"), deadline);
+    made->connection.limit_packet_ins(kMostPacketIns, deadline);
     read_flows(*made, deadline);
     made->numbers = wanted.numbers;
     made->sessions = wanted.sessions;
@@ -277,7 +280,7 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
 
 // Once it is told of changes, so that none is missed.
 void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
-  bridge.connection.set_async({.group_changes = true}, deadline);
+  bridge.connection.set_async({.packet_in = true, .group_changes = true}, deadline);
   for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
     bool const is_learned = openvswitch::table::is_learned(number);
     // These are recent for a second, and many.
@@ -309,6 +312,9 @@ void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
 void Bridges::follow_events(Bridge &bridge) {
   bool is_altered = false;
   while (auto const event = bridge.connection.next_event()) {
+    if (auto const *const packet = std::get_if<openflow::PacketIn>(&*event)) {
+      told_.heard(bridge.key, *packet);
+    }
     auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
     if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
       if (auto const port = memory_.follow(bridge.key, *update)) {

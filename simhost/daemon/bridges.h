@@ -47,6 +47,8 @@ class Bridges {
     std::function<void()> changed;
     /// Somebody else changed flows or groups of the bridge of that name.
     std::function<void(std::string const &)> altered;
+    /// A flow of a bridge sent up a frame.
+    std::function<void(storage::SwitchKey, openflow::PacketIn const &)> heard;
     /// A connection ended.
     std::function<void()> disturbed;
   };

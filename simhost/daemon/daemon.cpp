@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <set>
 #include <utility>
 #include <vector>
 
@@ -70,6 +71,8 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       server_(loop, openvswitch::socket_of(options_.state),
               [this](Json const &question, Reply const &reply) { handle(question, reply); }),
       announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }),
+      members_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
+                      .changed = [this] { follow_members(); }}),
       counting_(store_) {
   storage::ChangingTransaction transaction(store_);
   storage::take_frames(transaction);
@@ -123,6 +126,7 @@ void Daemon::connect() {
                                    bridge));
                   mend_soon();
                 },
+            .heard = [this](auto key, auto const &packet) { members_.receive(key, packet); },
             .disturbed = [this] { connect_later(); }});
     sync();
   });
@@ -172,7 +176,25 @@ void Daemon::fail(std::string const &why) {
   connect_later();
 }
 
+// A query that is lost comes again.
+void Daemon::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) try {
+  if (bridges_) {
+    bridges_->send(key, frames);
+  }
+} catch (std::runtime_error const &error) {
+  troubles_.add(error.what());
+  connect_later();
+}
+
+// Which is told to nobody: it is no change of what is configured.
+void Daemon::follow_members() {
+  bool const is_only_reason = !next_sync_;
+  sync_soon();
+  follows_members_ = is_only_reason;
+}
+
 void Daemon::sync_soon() {
+  follows_members_ = false;
   if (!next_sync_) {
     next_sync_ = loop_.after(0ms, [this] {
       if (bridges_) {
@@ -235,7 +257,10 @@ void Daemon::sync() {
   auto const is_there = [this](std::string const &device) {
     return devices_.find(device).has_value();
   };
-  auto const all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_);
+  auto const complete = [&](storage::SwitchKey key, openvswitch::Network &network) {
+    members_.follow(transaction, key, network);
+  };
+  auto const all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
   bool const counts_anew = counting_.follow(transaction);
   transaction.commit();
   if (counts_anew) {
@@ -243,7 +268,7 @@ void Daemon::sync() {
   }
   take_out_new_devices(all);
   auto const changed = bridges_->apply(all);
-  if (changed > 0) {
+  if (changed > 0 && !follows_members_) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
   announcer_.follow(all, memory_);
@@ -286,6 +311,14 @@ void Daemon::settle(Wanted const &wanted) {
       }
     }
   }
+  std::set<storage::SwitchKey> keys;
+  for (auto const &bridge : wanted.bridges) {
+    keys.insert(bridge.key);
+  }
+  for (auto const &unfit : wanted.unfit) {
+    keys.insert(unfit.key);
+  }
+  members_.keep(keys);
   in_force_ = wanted.change;
   sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {
@@ -373,6 +406,28 @@ Json Daemon::counting_sessions(Json const &question) {
   return {{"sessions", counting_.unsaved_sessions(key)}};
 }
 
+Json Daemon::groups(Json const &question) const {
+  auto const to_json = [](multicast::Address const &address) {
+    return address.family == multicast::Family::ipv4 ? Json(multicast::ipv4_of(address))
+                                                     : Json(address.bytes);
+  };
+  Json groups = Json::array();
+  for (auto const &one :
+       members_.joined(switch_in(question), question.at("port").get<std::uint32_t>())) {
+    auto const &sources = one.joined.sources;
+    Json listed = Json::array();
+    for (auto const &source : sources.listed) {
+      listed.push_back(to_json(source));
+    }
+    groups.push_back({{"address", to_json(one.address)},
+                      {"version", one.joined.version},
+                      {"excludes", sources.are_excluded},
+                      {"sources", listed},
+                      {"age", one.age.count()}});
+  }
+  return {{"groups", groups}};
+}
+
 void Daemon::handle(Json const &question, Reply const &reply) {
   try {
     auto const what = question.at("ask").get<std::string>();
@@ -389,6 +444,8 @@ void Daemon::handle(Json const &question, Reply const &reply) {
     } else if (what == "bridge") {
       reply({{"name", bridge_name(host_, question.at("switch").get<std::string>())},
              {"folder", options_.database.parent_path().string()}});
+    } else if (what == "groups") {
+      reply(groups(question));
     } else if (what == "status") {
       reply({{"change", in_force_},
              {"said", troubles_.text()},

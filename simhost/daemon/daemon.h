@@ -14,6 +14,7 @@
 #include "daemon/bridges.h"
 #include "daemon/compiler.h"
 #include "daemon/counting/counting.h"
+#include "daemon/groups/group_members.h"
 #include "daemon/network_devices.h"
 #include "daemon/server.h"
 #include "daemon/state_watch.h"
@@ -48,6 +49,8 @@ class Daemon {
   void mend_soon();
   void look_at_commits();
   void announce(storage::SwitchKey key, std::vector<openvswitch::Announced> const &clients);
+  void send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
+  void follow_members();
   void sync_soon();
   void sync_after(std::optional<ClockTime> const &wait);
   void sync();
@@ -65,6 +68,7 @@ class Daemon {
   [[nodiscard]] Json counting_sessions(Json const &question);
   void count_from_now_on();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
+  [[nodiscard]] Json groups(Json const &question) const;
 
   events::Loop &loop_;
   Options options_;
@@ -78,6 +82,8 @@ class Daemon {
   Server server_;
   Memory memory_;
   Announcer announcer_;
+  GroupMembers members_;
+  bool follows_members_ = false;  // and nothing else
   Counting counting_;
   Compiler compiler_;
   std::optional<Bridges> bridges_;

@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <utility>
 
 #include "base/outcomes.h"
 #include "model/options/runtime_options.h"
@@ -124,7 +125,8 @@ std::uint64_t fingerprint(std::string_view text) {
 }
 
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
-                 std::string const &datapath, IsThere const &is_there, Compiler &compiler) {
+                 std::string const &datapath, IsThere const &is_there, Compiler &compiler,
+                 Complete const &complete) {
   Wanted wanted;
   wanted.change = storage::frames_change(transaction).value_or(0);
   wanted.most_announced =
@@ -145,8 +147,9 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
     }
     try {
       auto const team = team_with_devices(transaction, key);
-      auto const &[network, flows] =
-          compiler.compile(key, openvswitch::read_network(transaction, key, team, {}));
+      auto read = openvswitch::read_network(transaction, key, team, {});
+      complete(key, read);
+      auto const &[network, flows] = compiler.compile(key, std::move(read));
       bridge.flows = flows;
       add_carried(transaction, network, team.policy, bridge);
       bridge.sessions = sessions_of(network);

@@ -66,9 +66,13 @@ struct Wanted {
 /// Whether a device can be put at a bridge.
 using IsThere = std::function<bool(std::string const &device)>;
 
+/// Puts into a network what frames told of it.
+using Complete = std::function<void(storage::SwitchKey key, openvswitch::Network &network)>;
+
 /// `host` tells the bridges of this host from those of others in one namespace.
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
-                 std::string const &datapath, IsThere const &is_there, Compiler &compiler);
+                 std::string const &datapath, IsThere const &is_there, Compiler &compiler,
+                 Complete const &complete);
 
 /// The bridge of a switch.
 std::string bridge_name(std::string_view host, std::string const &identifier);

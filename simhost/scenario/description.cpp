@@ -94,13 +94,25 @@ Json groups_to_json(Transaction &transaction, storage::PortNumber port) {
   for (auto const length : {6, 4, 16}) {
     for (auto const &address :
          running_plane().groups(transaction, port, static_cast<std::size_t>(length))) {
-      auto const group = *running_plane().group(transaction, port, address);
-      auto described = object_to_json(kGroupMembers, group);
-      described[std::string(kObserved)] = {{"updated", seconds(group.updated)}};
-      list.push_back(std::move(described));
+      // The port may have left it since.
+      if (auto const group = running_plane().group(transaction, port, address)) {
+        auto described = object_to_json(kGroupMembers, *group);
+        described[std::string(kObserved)] = {{"updated", seconds(group->updated)}};
+        list.push_back(std::move(described));
+      }
     }
   }
   return list;
+}
+
+// Likewise while nobody can tell what its clients joined.
+void describe_groups(Json &described, Transaction &transaction, storage::PortNumber port) {
+  try {
+    described[keys::groups] = groups_to_json(transaction, port);
+  } catch (Refused const &refused) {
+    described[keys::groups] = Json::array();
+    described[std::string(kObserved)]["not_joined"] = refusal_text(refused);
+  }
 }
 
 Json counters_to_json(Transaction &transaction, CounterOwner const &owner) {
@@ -128,7 +140,7 @@ Json port_to_json(Transaction &transaction, storage::Port const &port) {
     described[keys::device] = device_to_json(*device);
   }
   describe_addresses(described, transaction, place);
-  described[keys::groups] = groups_to_json(transaction, port.number);
+  describe_groups(described, transaction, port.number);
   described[keys::counters] =
       counters_to_json(transaction, {.switch_key = port.switch_key, .port = port.number});
   describe_raw(described, transaction, owner, SettingOwner::of_port);

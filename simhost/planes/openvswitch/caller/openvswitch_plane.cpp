@@ -10,13 +10,19 @@
 #include <utility>
 
 #include "base/outcomes.h"
+#include "model/lookup.h"
+#include "model/mac/properties.h"
+#include "model/multicast/properties.h"
+#include "model/properties/properties.h"
 #include "model/teaming/team.h"
 #include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/line/line.h"
+#include "planes/openvswitch/multicast/address.h"
 #include "planes/openvswitch/reading/read_network.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
 #include "storage/store.h"
+#include "vswitch/mcast_filters.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -87,6 +93,51 @@ std::vector<VSMACEntry> learned_in(Json const &said) {
 bool comes_before(VSMACEntry const &one, VSMACEntry const &other) {
   auto const order = std::memcmp(one.macAddress, other.macAddress, sizeof one.macAddress);
   return order != 0 ? order < 0 : one.vid < other.vid;
+}
+
+template <typename Bytes>
+AddressBytes bytes_of(Bytes const &address) {
+  auto const *const first = reinterpret_cast<std::byte const *>(std::data(address));
+  return {first, first + std::size(address)};
+}
+
+AddressBytes address_in(Json const &said) {
+  return bytes_of(said.get<std::vector<std::uint8_t>>());
+}
+
+// The address of Ethernet to which frames for a group of IPv4 or IPv6 go.
+AddressBytes ethernet_of(AddressBytes const &group) {
+  auto const ethernet = [&] {
+    if (group.size() == sizeof(qex_IPv4Address)) {
+      openflow::Ipv4Address address;
+      std::memcpy(address.data(), group.data(), address.size());
+      return multicast::ethernet_of(multicast::address_of(address));
+    }
+    openflow::Ipv6Address address{};
+    std::memcpy(address.data(), group.data(), std::min(address.size(), group.size()));
+    return multicast::ethernet_of(multicast::address_of(address));
+  }();
+  return bytes_of(ethernet);
+}
+
+// Who reports in a version without sources wants all of them, and does not say so.
+McastGroup group_in(Json const &said, ClockTime now) {
+  McastGroup group{.address = address_in(said.at("address")),
+                   .version = said.at("version").get<std::uint32_t>(),
+                   .source_mode = said.at("excludes").get<bool>()
+                                      ? VS_MCAST_SRC_IP_FILTER_MODE_EXCLUDE
+                                      : VS_MCAST_SRC_IP_FILTER_MODE_INCLUDE,
+                   .vni = 0,
+                   .updated = now - std::chrono::milliseconds(said.at("age").get<std::int64_t>()),
+                   .sources = {}};
+  for (auto const &source : said.at("sources")) {
+    group.sources.push_back(address_in(source));
+  }
+  auto const with_sources = group.address.size() == sizeof(qex_IPv4Address) ? 3U : 2U;
+  if (group.version < with_sources && group.sources.empty()) {
+    group.source_mode = VS_MCAST_SRC_IP_FILTER_MODE_NONE;
+  }
+  return group;
 }
 
 Json question_about(std::string_view what, Place const &place) {
@@ -207,15 +258,66 @@ VSPMACLearningStats OpenVswitchPlane::learning_stats(storage::Transaction &trans
   return stats;
 }
 
+// What a client joined, and the addresses of Ethernet to which frames for it go.
+std::map<AddressBytes, McastGroup> OpenVswitchPlane::joined(storage::Transaction &transaction,
+                                                            storage::Port const &port) {
+  std::map<AddressBytes, McastGroup> joined;
+  auto const add_ethernet = [&](AddressBytes const &address, ClockTime updated) {
+    joined.try_emplace(address, McastGroup{.address = address,
+                                           .version = 0,
+                                           .source_mode = VS_MCAST_SRC_IP_FILTER_MODE_NONE,
+                                           .vni = 0,
+                                           .updated = updated,
+                                           .sources = {}});
+  };
+  auto const filter = effective(transaction, mac::ethernet_filter,
+                                storage::PropertyOwner::port(port.switch_key, port.number));
+  if ((filter.flags & (QEX_ETH_FILTER_MULTICAST | QEX_ETH_FILTER_USE_LADRF)) != 0) {
+    for (std::size_t at = 0; at < filter.numMulticastAddrs; ++at) {
+      add_ethernet(bytes_of(filter.multicastAddrs[at]), {});
+    }
+  }
+  auto const mode = effective(transaction, multicast::filter_mode,
+                              storage::PropertyOwner::global(port.switch_key));
+  if (mode == VS_MCAST_FILTER_MODE_LEGACY) {
+    return joined;
+  }
+  auto const reply =
+      asked(file_, question_about("groups", {.switch_key = port.switch_key, .port = port.number}));
+  auto const now = clock_now(transaction);
+  for (auto const &one : reply.at("groups")) {
+    auto const group = group_in(one, now);
+    add_ethernet(ethernet_of(group.address), group.updated);
+    joined[group.address] = group;
+  }
+  return joined;
+}
+
 std::vector<AddressBytes> OpenVswitchPlane::groups(storage::Transaction &transaction,
                                                    storage::PortNumber port, std::size_t length) {
-  return stored_.groups(transaction, port, length);
+  auto const known = get_port(transaction, port);
+  if (!has_frames(transaction, {.switch_key = known.switch_key, .port = port})) {
+    return stored_.groups(transaction, port, length);
+  }
+  std::vector<AddressBytes> addresses;
+  for (auto const &[address, group] : joined(transaction, known)) {
+    if (address.size() == length) {
+      addresses.push_back(address);
+    }
+  }
+  return addresses;
 }
 
 std::optional<McastGroup> OpenVswitchPlane::group(storage::Transaction &transaction,
                                                   storage::PortNumber port,
                                                   AddressBytes const &address) {
-  return stored_.group(transaction, port, address);
+  auto const known = get_port(transaction, port);
+  if (!has_frames(transaction, {.switch_key = known.switch_key, .port = port})) {
+    return stored_.group(transaction, port, address);
+  }
+  auto const all = joined(transaction, known);
+  auto const found = all.find(address);
+  return found == all.end() ? std::nullopt : std::optional(found->second);
 }
 
 // Without a daemon they are what they were when it counted last.

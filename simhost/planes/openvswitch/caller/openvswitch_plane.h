@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -64,6 +65,8 @@ class OpenVswitchPlane : public Plane {
   [[nodiscard]] bool has_frames(storage::Transaction &transaction, Place const &place) const;
   [[nodiscard]] bool counts_frames(storage::Transaction &transaction,
                                    CounterOwner const &owner) const;
+  std::map<AddressBytes, McastGroup> joined(storage::Transaction &transaction,
+                                            storage::Port const &port);
 
   Plane &stored_;
   std::filesystem::path file_;

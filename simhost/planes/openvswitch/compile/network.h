@@ -165,6 +165,8 @@ struct Multicast {
   [[nodiscard]] bool hears(multicast::Family family) const {
     return family == multicast::Family::ipv4 ? hears_igmp : hears_mld;
   }
+
+  bool operator==(Multicast const &) const = default;
 };
 
 struct Network {
@@ -177,9 +179,9 @@ struct Network {
   Addresses addresses;
   std::vector<FixedAddress> fixed_addresses;
   std::vector<Mirror> mirrors;
+  Multicast multicast;
 
   bool operator==(Network const &) const = default;
-  Multicast multicast;
 };
 
 }  // namespace simhost::openvswitch
