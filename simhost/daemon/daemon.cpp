@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "abi/fresh_host.h"
-#include "daemon/links.h"
+#include "daemon/devices/links.h"
 #include "daemon/only_one.h"
 #include "daemon/wanted.h"
 #include "model/plane.h"

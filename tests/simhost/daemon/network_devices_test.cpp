@@ -1,5 +1,5 @@
 // What is known of network devices, in a namespace of the test's own.
-#include "daemon/network_devices.h"
+#include "daemon/devices/network_devices.h"
 
 #include <gtest/gtest.h>
 #include <sched.h>

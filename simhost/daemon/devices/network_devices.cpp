@@ -1,6 +1,6 @@
 // What the kernel tells by netlink, and what can only be asked by ioctl: both are of the namespace,
 // as files in /sys need not be.
-#include "daemon/network_devices.h"
+#include "daemon/devices/network_devices.h"
 
 #include <linux/ethtool.h>
 #include <linux/netlink.h>

@@ -5,7 +5,7 @@
 #include <functional>
 #include <string>
 
-#include "daemon/network_devices.h"
+#include "daemon/devices/network_devices.h"
 #include "storage/store.h"
 
 namespace simhost::daemon {

@@ -1,5 +1,5 @@
 // Teams follow what is kept of the links, and who is moved by that is announced when frames go so.
-#include "daemon/links.h"
+#include "daemon/devices/links.h"
 
 #include <fmt/format.h>
 
