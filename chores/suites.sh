@@ -62,14 +62,11 @@ junit() {
   tally "$title" $counts
 }
 
-# cxx_tests [NUMBERS]: all C++ tests but what $cxx_left_out matches, or those with these numbers of
-# ctest, a comma before each.
+# cxx_tests [NUMBERS]: all C++ tests, or those with these numbers of ctest, a comma before each, but
+# what $cxx_left_out matches.
 cxx_tests() {
-  if [ $# -gt 0 ]; then
-    set -- -I "0,0,0$1"
-  elif [ -n "${cxx_left_out-}" ]; then
-    set -- -E "$cxx_left_out"
-  fi
+  [ $# -eq 0 ] || set -- -I "0,0,0$1"
+  [ -z "${cxx_left_out-}" ] || set -- "$@" -E "$cxx_left_out"
   junit "C++ tests" ctest.xml ctest --test-dir "$folder" --output-on-failure --no-tests=error \
     -j "$jobs" "$@" --output-junit "$root/$folder/ctest.xml"
 }
