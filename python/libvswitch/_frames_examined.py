@@ -13,7 +13,7 @@ NOTE, OK, WARNING = "note", "ok", "warning"
 _ABOUT = "frames"
 _OLDEST = (3, 1)
 _INSTALL = "install Debian's package openvswitch-switch where frames are to move"
-_PATIENCE = 2.0
+_PATIENCE = 10.0
 # Root's own, and where users may have one.
 _USERS: Tuple[List[str], ...] = ([], ["--user", "--map-root-user"])
 
