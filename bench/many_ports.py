@@ -13,7 +13,7 @@ from simhost._namespaces import Namespace
 
 SWITCH = "rack"
 _FIRST_INDEX, _FIRST_FAR_INDEX = 10_000, 30_000
-_PATIENCE = 60.0
+_PATIENCE = 300.0
 
 
 def _batch(namespace: Namespace, *lines: str) -> None:

@@ -116,24 +116,6 @@ openvswitch::Difference difference_between(openvswitch::Compiled const &present,
              : openvswitch::difference(present.flows, present.groups, wanted.flows, wanted.groups);
 }
 
-// A client need not speak before it is reached in another VLAN: who it is was learned already.
-void add_relearned(openflow::Connection &connection, WantedBridge const &wanted,
-                   openvswitch::Difference &difference, Deadline deadline) {
-  for (auto const &learned : difference.forgotten) {
-    auto const learn = openvswitch::how_learned(wanted.flows->flows, learned);
-    if (!learn) {
-      continue;
-    }
-    for (auto const &entry : connection.flows(
-             {.table = learned.table, .cookie = learned.cookie, .cookie_mask = ~std::uint64_t{0}},
-             deadline)) {
-      if (auto flow = openvswitch::relearned(*learn, entry.flow)) {
-        difference.added_flows.push_back(std::move(*flow));
-      }
-    }
-  }
-}
-
 // All that the bridge learned, before anything that teaches it otherwise.
 void add_forgetting(openflow::Changes &changes) {
   for (auto number = openvswitch::table::kFirstAddresses; openvswitch::table::is_learned(number);
@@ -361,6 +343,42 @@ void Bridges::count(storage::SwitchKey key) {
   }
 }
 
+// A client need not speak before it is reached in another VLAN: who it is was learned already.
+void Bridges::add_relearned(Bridge &bridge, WantedBridge const &wanted,
+                            openvswitch::Difference &difference, Deadline deadline) {
+  if (difference.forgotten.empty()) {
+    return;
+  }
+  bridge.connection.receive();
+  follow_events(bridge);
+  openvswitch::Teachers const teachers(wanted.flows->flows);
+  for (auto const &learned : difference.forgotten) {
+    auto const learn = teachers.how_learned(learned);
+    if (!learn) {
+      continue;
+    }
+    for (auto const &before : learned_flows(bridge, learned, deadline)) {
+      if (auto flow = openvswitch::relearned(*learn, before)) {
+        difference.added_flows.push_back(std::move(*flow));
+      }
+    }
+  }
+}
+
+std::vector<Flow> Bridges::learned_flows(Bridge &bridge, openvswitch::LearnedFlows const &learned,
+                                         Deadline deadline) {
+  if (learned.table != openvswitch::table::kRecentSources) {
+    return memory_.learned(bridge.key, learned);
+  }
+  std::vector<Flow> flows;
+  for (auto &entry : bridge.connection.flows(
+           {.table = learned.table, .cookie = learned.cookie, .cookie_mask = ~std::uint64_t{0}},
+           deadline)) {
+    flows.push_back(std::move(entry.flow));
+  }
+  return flows;
+}
+
 std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t change,
                                  std::set<std::string> const &added, Deadline deadline) {
   auto &bridge = connected(wanted, deadline);
@@ -376,7 +394,7 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   }
   auto difference = difference_between(*bridge.flows, *wanted.flows);
   if (!forgets) {
-    add_relearned(bridge.connection, wanted, difference, deadline);
+    add_relearned(bridge, wanted, difference, deadline);
   }
   if (is_new) {
     std::ranges::move(memory_.recall(wanted.key, wanted.flows->flows),

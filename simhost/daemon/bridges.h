@@ -17,6 +17,7 @@
 #include "events/loop.h"
 #include "planes/openvswitch/openflow/connection.h"
 #include "planes/openvswitch/ovsdb/client.h"
+#include "planes/openvswitch/reconcile/difference.h"
 #include "planes/openvswitch/rows/rows.h"
 
 namespace simhost::daemon {
@@ -87,6 +88,11 @@ class Bridges {
                           std::set<std::string> const &added, openvswitch::Deadline deadline);
   Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
   void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
+  void add_relearned(Bridge &bridge, WantedBridge const &wanted,
+                     openvswitch::Difference &difference, openvswitch::Deadline deadline);
+  std::vector<openflow::Flow> learned_flows(Bridge &bridge,
+                                            openvswitch::LearnedFlows const &learned,
+                                            openvswitch::Deadline deadline);
   void read_events(Bridge &bridge);
   void follow_events(Bridge &bridge);
   void count(Bridge &bridge, openvswitch::Deadline deadline);

@@ -41,6 +41,9 @@ std::optional<std::uint32_t> Memory::follow(storage::SwitchKey key,
 void Memory::follow_devices(storage::SwitchKey key,
                             std::map<std::string, std::uint32_t> const &devices) {
   auto &bridge = bridges_[key];
+  if (bridge.devices == devices) {
+    return;
+  }
   for (auto const &[device, port] : std::exchange(bridge.devices, devices)) {
     auto const now = devices.find(device);
     if (now == devices.end() || now->second != port) {
@@ -55,16 +58,27 @@ void Memory::forget(storage::SwitchKey key) {
   bridges_[key].flows.clear();
 }
 
-std::vector<Flow> Memory::learned_at(storage::SwitchKey key, std::uint32_t port) const {
-  std::vector<Flow> learned;
+template <typename Condition>
+std::vector<Flow> Memory::flows_that(storage::SwitchKey key, Condition const &condition) const {
+  std::vector<Flow> flows;
   if (auto const found = bridges_.find(key); found != bridges_.end()) {
     for (auto const &[place, flow] : found->second.flows) {
-      if (port_in(flow.cookie) == port) {
-        learned.push_back(flow);
+      if (condition(flow)) {
+        flows.push_back(flow);
       }
     }
   }
-  return learned;
+  return flows;
+}
+
+std::vector<Flow> Memory::learned_at(storage::SwitchKey key, std::uint32_t port) const {
+  return flows_that(key, [&](Flow const &flow) { return port_in(flow.cookie) == port; });
+}
+
+std::vector<Flow> Memory::learned(storage::SwitchKey key, LearnedFlows const &known) const {
+  return flows_that(key, [&](Flow const &flow) {
+    return flow.table == known.table && flow.cookie == known.cookie;
+  });
 }
 
 std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted) const {
@@ -73,17 +87,11 @@ std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> w
   if (found == bridges_.end()) {
     return recalled;
   }
-  std::map<LearnedFlows, std::optional<openflow::Learn>> ways;
+  openvswitch::Teachers const teachers(wanted);
   for (auto const &[place, flow] : found->second.flows) {
-    LearnedFlows const learned{.table = flow.table, .cookie = flow.cookie};
-    auto const way = ways.try_emplace(learned, std::nullopt);
-    if (way.second) {
-      way.first->second = openvswitch::how_learned(wanted, learned);
-    }
-    if (way.first->second) {
-      if (auto again = openvswitch::relearned(*way.first->second, flow)) {
-        recalled.push_back(*std::move(again));
-      }
+    auto const learn = teachers.how_learned({.table = flow.table, .cookie = flow.cookie});
+    if (auto again = learn ? openvswitch::relearned(*learn, flow) : std::nullopt) {
+      recalled.push_back(*std::move(again));
     }
   }
   return recalled;

@@ -12,6 +12,7 @@
 
 #include "planes/openvswitch/openflow/flow.h"
 #include "planes/openvswitch/openflow/replies.h"
+#include "planes/openvswitch/reconcile/difference.h"
 #include "storage/switches.h"
 
 namespace simhost::daemon {
@@ -29,6 +30,9 @@ class Memory {
   /// What was learned at a port of a bridge.
   [[nodiscard]] std::vector<openflow::Flow> learned_at(storage::SwitchKey key,
                                                        std::uint32_t port) const;
+  /// Likewise what a cookie knows, but for table::kRecentSources, which is not followed.
+  [[nodiscard]] std::vector<openflow::Flow> learned(storage::SwitchKey key,
+                                                    openvswitch::LearnedFlows const &known) const;
   /// What a bridge that is to have these flows knows once more.
   [[nodiscard]] std::vector<openflow::Flow> recall(storage::SwitchKey key,
                                                    std::span<openflow::Flow const> wanted) const;
@@ -40,6 +44,11 @@ class Memory {
     std::map<std::string, std::uint32_t> devices;
     std::map<Place, openflow::Flow> flows;
   };
+
+  // Those of which something is true.
+  template <typename Condition>
+  [[nodiscard]] std::vector<openflow::Flow> flows_that(storage::SwitchKey key,
+                                                       Condition const &condition) const;
 
   std::map<storage::SwitchKey, OfBridge> bridges_;
 };

@@ -26,6 +26,20 @@ def test_a_vlan_cuts_and_joins(lab: Lab) -> None:
     assert one.ceases_to_reach(other)
 
 
+def test_a_client_that_says_nothing_is_known_in_another_vlan(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    # Of neither port the address is configured.
+    assert one.reaches(other, attempts=5)
+    for client in one, other:
+        client.run("ip", "neighbour", "flush", "dev", "eth0")
+    for vlan in 7, 8:
+        lab.set_port("lab", "b", vlan=vlan)
+        lab.set_port("lab", "a", vlan=vlan)
+        sent = frame(other.mac, one.mac, payload=bytes([vlan]) * 46)
+        one.send(sent)
+        other.expect(sent)
+
+
 def test_it_takes_no_privileges_where_namespaces_of_users_are_allowed(tmp_path: Path) -> None:
     with Lab(tmp_path, ONE_SWITCH, own_user=True) as lab:
         lab.start()

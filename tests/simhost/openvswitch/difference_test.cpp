@@ -114,8 +114,8 @@ TEST(ADifference, ForgetsWhatIsLearnedOtherwiseNow) {
 
 TEST(WhatWasLearned, IsLearnedAnewAsItWouldBeNow) {
   using simhost::openflow::Field;
-  using simhost::openvswitch::how_learned;
   using simhost::openvswitch::relearned;
+  using simhost::openvswitch::Teachers;
   Learn learn{.table = 6, .priority = 5, .cookie = 7, .hard_timeout = 300, .specs = {}};
   learn.specs.emplace_back(
       simhost::openflow::LearnedMatch{.field = simhost::openflow::whole(Field::eth_dst),
@@ -139,16 +139,20 @@ TEST(WhatWasLearned, IsLearnedAnewAsItWouldBeNow) {
   auto teaches = flow(3, 1, 2);
   teaches.actions = {learn};
   Flows const one{teaches};
-  EXPECT_EQ(how_learned(one, {.table = 6, .cookie = 7}), learn);
-  EXPECT_FALSE(how_learned(one, {.table = 6, .cookie = 8}));
+  EXPECT_EQ(Teachers(one).how_learned({.table = 6, .cookie = 7}), learn);
+  EXPECT_FALSE(Teachers(one).how_learned({.table = 6, .cookie = 8}));
   auto other = learn;
   auto teaches_too = teaches;
+  auto const how_two_teach = [&] {
+    Flows const two{teaches, teaches_too};
+    return Teachers(two).how_learned({.table = 6, .cookie = 7});
+  };
   other.limit = 4096;
   teaches_too.actions = {other};
-  EXPECT_EQ(how_learned(Flows{teaches, teaches_too}, {.table = 6, .cookie = 7}), learn);
+  EXPECT_EQ(how_two_teach(), learn);
   other.hard_timeout = 20;
   teaches_too.actions = {other};
-  EXPECT_FALSE(how_learned(Flows{teaches, teaches_too}, {.table = 6, .cookie = 7}));
+  EXPECT_FALSE(how_two_teach());
 }
 
 // A switch that does what it is told.

@@ -11,19 +11,6 @@ using openflow::Flow;
 using openflow::Learn;
 using openflow::Value;
 
-void add_ways(openflow::Actions const &actions, LearnedFlows const &learned,
-              std::vector<Learn> &ways) {
-  for (auto const &action : actions) {
-    if (auto const *const learn = std::get_if<Learn>(&action)) {
-      if (learn->table == learned.table && learn->cookie == learned.cookie) {
-        ways.push_back(*learn);
-      }
-    } else if (auto const *const clone = std::get_if<openflow::Clone>(&action)) {
-      add_ways(clone->actions, learned, ways);
-    }
-  }
-}
-
 // Whether two make the same flow of a frame, each as long as it may.
 bool make_the_same(Learn one, Learn const &other) {
   one.limit = other.limit;
@@ -59,14 +46,31 @@ bool add(openflow::LearnedOutput const & /*spec*/, Flow const & /*before*/, Flow
 
 }  // namespace
 
-std::optional<Learn> how_learned(std::span<Flow const> flows, LearnedFlows const &learned) {
-  std::vector<Learn> ways;
+Teachers::Teachers(std::span<Flow const> flows) {
   for (auto const &flow : flows) {
-    add_ways(flow.actions, learned, ways);
+    add(flow.actions);
   }
-  bool const is_one_way =
-      std::ranges::all_of(ways, [&](Learn const &way) { return make_the_same(way, ways.front()); });
-  return is_one_way && !ways.empty() ? std::optional(ways.front()) : std::nullopt;
+}
+
+void Teachers::add(openflow::Actions const &actions) {
+  for (auto const &action : actions) {
+    if (auto const *const learn = std::get_if<Learn>(&action)) {
+      ways_[{.table = learn->table, .cookie = learn->cookie}].push_back(learn);
+    } else if (auto const *const clone = std::get_if<openflow::Clone>(&action)) {
+      add(clone->actions);
+    }
+  }
+}
+
+std::optional<Learn> Teachers::how_learned(LearnedFlows const &learned) const {
+  auto const found = ways_.find(learned);
+  if (found == ways_.end()) {
+    return std::nullopt;
+  }
+  auto const &ways = found->second;
+  bool const is_one_way = std::ranges::all_of(
+      ways, [&](Learn const *way) { return make_the_same(*way, *ways.front()); });
+  return is_one_way ? std::optional(*ways.front()) : std::nullopt;
 }
 
 std::optional<Flow> relearned(Learn const &learn, Flow const &before) {

@@ -2,6 +2,7 @@
 // learned does not make a switch forget whom it knows.
 #pragma once
 
+#include <map>
 #include <optional>
 #include <span>
 #include <vector>
@@ -11,10 +12,20 @@
 
 namespace simhost::openvswitch {
 
-/// The one way in which some of the flows teach those, whatever their limits; nothing if there are
-/// several.
-std::optional<openflow::Learn> how_learned(std::span<openflow::Flow const> flows,
-                                           LearnedFlows const &learned);
+/// How flows teach others. They outlive it.
+class Teachers {
+ public:
+  explicit Teachers(std::span<openflow::Flow const> flows);
+
+  /// The one way in which some of them teach those, whatever their limits; nothing if there are
+  /// several.
+  [[nodiscard]] std::optional<openflow::Learn> how_learned(LearnedFlows const &learned) const;
+
+ private:
+  void add(openflow::Actions const &actions);
+
+  std::map<LearnedFlows, std::vector<openflow::Learn const *>> ways_;
+};
 
 /// The flow that `learn` would have made of the frame of which `before` was made; nothing if that
 /// does not tell enough of it.
