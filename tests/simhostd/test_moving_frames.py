@@ -126,6 +126,7 @@ def test_a_restart_of_the_host_leaves_what_is_persistent(lab: Lab) -> None:
     goes = lab.client("made", "x"), lab.client("made", "y")
     for one, other in (stays, goes):
         assert one.reaches(other, attempts=5)
+    lab.have_counted()
     lab.ctl("restart")
     one, other = stays
     assert not one.reaches(other)
