@@ -88,4 +88,21 @@ std::string printable(std::string_view text) {
   return shown;
 }
 
+std::string whole_text(std::function<std::size_t(char *text, std::size_t size)> const &copy_out) {
+  // Room for most: to ask for the size alone takes as long as to have the text.
+  std::string text(std::size_t{1} << 20, '\0');
+  while (true) {
+    auto const size = copy_out(text.data(), text.size());
+    if (size == 0) {
+      throw Failure(simhost_error());
+    }
+    if (size < text.size()) {
+      text.resize(size);
+      return text;
+    }
+    // Until it is asked again, another process may have made more of the host.
+    text.resize(size * 2);
+  }
+}
+
 }  // namespace simhost::cli

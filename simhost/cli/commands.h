@@ -3,6 +3,7 @@
 
 #include <CLI/CLI.hpp>
 #include <cmath>
+#include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <limits>
@@ -57,6 +58,9 @@ std::string text_of(nlohmann::ordered_json const &document);
 /// A text for a terminal: control characters as \xNN.
 std::string printable(std::string_view text);
 
+/// The whole of a text that a function of the host copies out, with parameters and result as of
+/// simhost_describe.
+std::string whole_text(std::function<std::size_t(char *text, std::size_t size)> const &copy_out);
 /// The whole host as a document.
 std::string description();
 

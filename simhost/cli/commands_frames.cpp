@@ -50,17 +50,6 @@ void add_disconnect(CLI::App &app) {
       [given] { check(simhost_disconnect(given->switch_name.c_str(), given->port.c_str())); });
 }
 
-std::string plane_json() {
-  constexpr std::size_t kEnough = 65536;
-  std::string text(kEnough, '\0');
-  auto const size = simhost_plane(text.data(), text.size());
-  if (size == 0 || size >= text.size()) {
-    throw Failure(simhost_error());
-  }
-  text.resize(size);
-  return text;
-}
-
 std::string plane_words(nlohmann::ordered_json const &plane) {
   auto const &change = plane.at("change");
   auto const &in_force = plane.at("in_force");
@@ -83,7 +72,7 @@ void add_plane(CLI::App &app) {
   plane->add_flag("--json", *json, "as JSON");
   plane->footer("A call waits two seconds for its change to be in force:\n  simhostctl plane");
   plane->callback([json] {
-    auto const text = plane_json();
+    auto const text = whole_text(simhost_plane);
     std::cout << (*json ? text : printable(plane_words(nlohmann::ordered_json::parse(text))))
               << "\n";
   });
@@ -97,15 +86,10 @@ struct TraceWords {
 
 nlohmann::ordered_json trace_of(std::string const &switch_name, std::string const &station,
                                 std::vector<std::uint8_t> const &frame) {
-  constexpr std::size_t kEnough = 1 << 20;
-  std::string text(kEnough, '\0');
-  auto const size = simhost_trace(switch_name.c_str(), station.c_str(), frame.data(), frame.size(),
-                                  text.data(), text.size());
-  if (size == 0 || size >= text.size()) {
-    throw Failure(simhost_error());
-  }
-  text.resize(size);
-  return nlohmann::ordered_json::parse(text);
+  return nlohmann::ordered_json::parse(whole_text([&](char *text, std::size_t size) {
+    return simhost_trace(switch_name.c_str(), station.c_str(), frame.data(), frame.size(), text,
+                         size);
+  }));
 }
 
 // The one of a list that has this value under a key; null if none has.

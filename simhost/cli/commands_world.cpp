@@ -183,20 +183,7 @@ void add_counter(CLI::App &app) {
 }  // namespace
 
 std::string description() {
-  // Room for most hosts: to ask for the size alone takes as long as to have the text.
-  std::string text(std::size_t{1} << 20, '\0');
-  while (true) {
-    auto const size = simhost_describe(text.data(), text.size());
-    if (size == 0) {
-      throw Failure(simhost_error());
-    }
-    if (size < text.size()) {
-      text.resize(size);
-      return text;
-    }
-    // Until it is asked again, another process may have made more of the host.
-    text.resize(size * 2);
-  }
+  return whole_text(simhost_describe);
 }
 
 void add_world_commands(CLI::App &app) {
