@@ -140,6 +140,36 @@ std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wante
   return forgotten;
 }
 
+// An address, in its VLAN.
+using KnownAddress = std::pair<openflow::EthernetAddress, std::uint16_t>;
+
+std::optional<KnownAddress> find_address(openflow::Match const &match, openflow::Field field) {
+  auto const &fields = match.fields();
+  auto const address = fields.find(field);
+  auto const vlan = fields.find(openvswitch::field::kDomain);
+  if (address == fields.end() || vlan == fields.end()) {
+    return std::nullopt;
+  }
+  return KnownAddress(openflow::to_address<6>(address->second.value),
+                      static_cast<std::uint16_t>(vlan->second.value));
+}
+
+// For how long no frame came from the sources that a bridge has learned.
+std::map<KnownAddress, std::chrono::nanoseconds> unseen_sources(openflow::Connection &connection) {
+  std::map<KnownAddress, std::chrono::nanoseconds> unseen;
+  for (auto const &entry :
+       connection.flows({.table = openvswitch::table::kCountedSources}, soon())) {
+    if (auto const known = find_address(entry.flow.match, openflow::Field::eth_src)) {
+      unseen.emplace(*known, entry.unused);
+    }
+  }
+  return unseen;
+}
+
+std::uint32_t seconds(std::chrono::nanoseconds time) {
+  return static_cast<std::uint32_t>(std::chrono::duration_cast<std::chrono::seconds>(time).count());
+}
+
 }  // namespace
 
 struct Bridges::Bridge {
@@ -440,20 +470,17 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
   if (found == bridges_.end()) {
     return all;
   }
-  auto const entries =
-      found->second->connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon());
-  for (auto const &entry : entries) {
-    auto const &fields = entry.flow.match.fields();
-    auto const address = fields.find(openflow::Field::eth_dst);
-    auto const vlan = fields.find(openvswitch::field::kDomain);
-    if (address == fields.end() || vlan == fields.end()) {
-      continue;
+  auto &connection = found->second->connection;
+  auto const unseen = unseen_sources(connection);
+  for (auto const &entry :
+       connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon())) {
+    if (auto const known = find_address(entry.flow.match, openflow::Field::eth_dst)) {
+      auto const source = unseen.find(*known);
+      all.push_back({.address = known->first,
+                     .vlan = known->second,
+                     .port = static_cast<std::uint32_t>(entry.flow.cookie),
+                     .age = seconds(source != unseen.end() ? source->second : entry.age)});
     }
-    all.push_back({.address = openflow::to_address<6>(address->second.value),
-                   .vlan = static_cast<std::uint16_t>(vlan->second.value),
-                   .port = static_cast<std::uint32_t>(entry.flow.cookie),
-                   .age = static_cast<std::uint32_t>(
-                       std::chrono::duration_cast<std::chrono::seconds>(entry.age).count())});
   }
   return all;
 }

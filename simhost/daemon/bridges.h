@@ -27,7 +27,7 @@ struct Learned {
   openflow::EthernetAddress address;
   std::uint16_t vlan;
   std::uint32_t port;  ///< its number in the state; 0 beyond the uplinks
-  std::uint32_t age;   ///< seconds
+  std::uint32_t age;   ///< seconds since it was seen last, as a source
 };
 
 /// Whatever goes wrong with an Open vSwitch is thrown, and what is known of it is of no more use:

@@ -201,6 +201,32 @@ def test_an_address_that_moves_counts_where_it_comes_to(lab: Lab) -> None:
     assert "numMACsMoved" not in counters(lab, "a")
 
 
+def ages(lab: Lab) -> Dict[str, int]:
+    """Of the addresses that are learned at port a and beyond the uplinks."""
+    (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
+    (port,) = (one for one in switch["ports"] if one["id"] == "a")
+    learned = [*port["addresses"], *switch["addresses"]]
+    return {one["mac"]: one["age"] for one in learned}
+
+
+@pytest.mark.parametrize("learns", [{}, {"mac_learning": {"learning": True, "flooding": True}}])
+def test_an_address_is_as_old_as_its_last_frame(lab: Lab, learns: Dict[str, Any]) -> None:
+    lab.set_port("lab", "a", **learns)
+    at_port, beyond = lab.client("lab", "a"), lab.network("nic0", "nic1").client()
+    seen, unseen = "02:00:00:00:77:01", "02:00:00:00:77:02"
+    client = at_port if learns else beyond
+    send(client, 1, BROADCAST, source=seen)
+    send(client, 1, BROADCAST, source=unseen)
+    assert comes_true(lambda: ages(lab).get(seen, 0) > 0 and ages(lab).get(unseen, 0) > 0)
+
+    def is_young_again() -> bool:
+        send(client, 1, BROADCAST, source=seen)
+        return ages(lab)[seen] == 0
+
+    assert comes_true(is_young_again)
+    assert ages(lab)[unseen] > 0
+
+
 ASKS = """
 from libvswitch import checked
 checked.VSQEX_GetUplinks("lab"), checked.VSQEX_GetUplinkLinkState("lab", "nic0")

@@ -77,7 +77,8 @@ inline constexpr std::uint8_t kFirstAddresses = 31;
 inline constexpr std::uint8_t kLearnedAddresses = 32;
 /// Sources that ports sent from in the last second or two; filled by the switch itself.
 inline constexpr std::uint8_t kRecentSources = 33;
-/// Sources that are learned, as many as the switch may have; filled by the switch itself.
+/// Sources that are learned, as many as the switch may have; filled by the switch itself. Asked by
+/// kLimits for nothing but the time since a source was seen last.
 inline constexpr std::uint8_t kCountedSources = 34;
 
 /// Whether the switch fills the table by itself.

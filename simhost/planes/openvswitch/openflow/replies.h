@@ -33,6 +33,9 @@ struct ReadFlow {
 struct FlowEntry : ReadFlow {
   Traffic traffic;
   std::chrono::nanoseconds age{};
+  /// Since a frame asked for it, or since it is there; frames of the last half a second may be
+  /// missing.
+  std::chrono::nanoseconds unused{};
 };
 
 /// Of all flows together.

@@ -57,7 +57,8 @@ void learn_own_again(Plan const &plan, Program &program) {
 }
 
 // A table that is full, unlike a limit of a port, does not tell: so those of the switch are counted
-// once more, where all have one cookie.
+// once more, where all have one cookie. Here they are looked up as sources, not as destinations:
+// how long nobody asked for one says when it was seen last.
 openflow::Action count_for_switch(Plan const &plan) {
   return openflow::Learn{
       .table = table::kCountedSources,
@@ -92,10 +93,12 @@ void learn_at(Plan const &plan, Program &program, Port const &port) {
   judge(program, table::kSwitchLimit, port);
 }
 
-bool ports_learn(Plan const &plan) {
-  auto const &ports = plan.network.ports;
-  return std::any_of(ports.begin(), ports.end(),
-                     [](Port const &port) { return port.learning.has_value(); });
+bool learns(Network const &network) {
+  auto const &addresses = network.addresses;
+  return addresses.aging != 0 && addresses.limit != 0 &&
+         ((addresses.uplink_limit != 0 && !network.uplinks.empty()) ||
+          std::ranges::any_of(network.ports,
+                              [](Port const &port) { return port.learning.has_value(); }));
 }
 
 void learn_beyond(Plan const &plan, Program &program) {
@@ -106,7 +109,7 @@ void learn_beyond(Plan const &plan, Program &program) {
   if (addresses.uplink_limit != 0 && addresses.limit != 0) {
     add(program, 100, Match().with(field::kOrigin, kFromUplink),
         {openflow::load(field::kVerdict, 1), learn(plan, 0, kBeyond, addresses.uplink_limit),
-         go_to(ports_learn(plan) ? table::kLimits : table::kLookup)},
+         go_to(table::kLimits)},
         0);
   }
 }
@@ -135,8 +138,9 @@ void compile_learning(Plan const &plan, Program &program) {
     }
   }
   program.add(table::kLearning, {.actions = {go_to(table::kLookup)}});
-  if (ports_learn(plan) && addresses.aging != 0 && addresses.limit != 0) {
-    program.add(table::kLimits, {.actions = {count_for_switch(plan), go_to(table::kSwitchLimit)}});
+  if (learns(plan.network)) {
+    program.add(table::kLimits, {.actions = {count_for_switch(plan), go_to(table::kCountedSources),
+                                             go_to(table::kSwitchLimit)}});
     program.add(table::kSwitchLimit, {.actions = {go_to(table::kLookup)}});
   }
 }

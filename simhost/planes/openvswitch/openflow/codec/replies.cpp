@@ -52,13 +52,20 @@ nanoseconds take_duration(Reader &in) {
 
 struct Statistics {
   nanoseconds age{};
+  nanoseconds unused{};
   std::uint32_t flows = 0;
   Traffic traffic;
 };
 
 Statistics take_statistics(Reader &in) {
   constexpr std::uint16_t kClass = 0x8002;
-  enum Kind : std::uint8_t { duration = 0, flow_count = 3, packet_count = 4, byte_count = 5 };
+  enum Kind : std::uint8_t {
+    duration = 0,
+    idle_time = 1,
+    flow_count = 3,
+    packet_count = 4,
+    byte_count = 5
+  };
   Statistics statistics;
   auto list = take_item(in, 2, 4, 8);
   list.skip(4);
@@ -72,6 +79,9 @@ Statistics take_statistics(Reader &in) {
     switch (kind) {
       case duration:
         statistics.age = take_duration(content);
+        break;
+      case idle_time:
+        statistics.unused = take_duration(content);
         break;
       case flow_count:
         statistics.flows = content.u32();
@@ -188,6 +198,7 @@ FlowEntry take_flow(Reader &in) {
   auto const statistics = take_statistics(item);
   entry.traffic = statistics.traffic;
   entry.age = statistics.age;
+  entry.unused = statistics.unused;
   take_instructions(item, entry);
   return entry;
 }
