@@ -149,9 +149,9 @@ void GroupMembers::note_places(Switch &known, Network const &network) const {
       known.many.emplace(port.number, *port.vlan.carried);
       continue;
     }
-    for (std::uint16_t vlan = 1; vlan < port.vlan.carried->size(); ++vlan) {
+    for (std::size_t vlan = 1; vlan < port.vlan.carried->size(); ++vlan) {
       if (port.vlan.carried->test(vlan)) {
-        add(port, vlan);
+        add(port, static_cast<std::uint16_t>(vlan));
       }
     }
   }
