@@ -292,6 +292,7 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
 
 // Once it is told of changes, so that none is missed.
 void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
+  std::vector<Flow> learned;
   bridge.connection.set_async({.packet_in = true, .group_changes = true}, deadline);
   for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
     bool const is_learned = openvswitch::table::is_learned(number);
@@ -302,7 +303,7 @@ void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
           bridge.connection.monitor_flows(number + 1U, {.table = number}, deadline, own);
       for (auto const &update : there) {
         if (is_learned) {
-          memory_.follow(bridge.key, update);
+          learned.push_back(update.flow);
         }
       }
     }
@@ -319,6 +320,9 @@ void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
     there.groups.push_back(entry.group);
   }
   bridge.flows = std::make_shared<openvswitch::Compiled const>(std::move(there));
+  if (bridge.change) {
+    memory_.replace(bridge.key, learned);
+  }
 }
 
 void Bridges::follow_events(Bridge &bridge) {
@@ -474,11 +478,12 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
   auto const unseen = unseen_sources(connection);
   for (auto const &entry :
        connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon())) {
-    if (auto const known = find_address(entry.flow.match, openflow::Field::eth_dst)) {
+    auto const known = find_address(entry.flow.match, openflow::Field::eth_dst);
+    if (known && learned_in(entry.flow)) {
       auto const source = unseen.find(*known);
       all.push_back({.address = known->first,
                      .vlan = known->second,
-                     .port = static_cast<std::uint32_t>(entry.flow.cookie),
+                     .port = openvswitch::number_of(entry.flow.cookie),
                      .age = seconds(source != unseen.end() ? source->second : entry.age)});
     }
   }

@@ -31,6 +31,9 @@ constexpr events::Clock::duration kLongestPause = 500ms;
 // What was counted since the last time is lost when Open vSwitch is killed.
 constexpr auto kBetweenCounts = 2s;
 
+// Many addresses may come at once.
+constexpr auto kBetweenSaves = 100ms;
+
 std::filesystem::path beside(std::filesystem::path file, char const *suffix) {
   file += suffix;
   return file;
@@ -70,6 +73,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       devices_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state),
               [this](Json const &question, Reply const &reply) { handle(question, reply); }),
+      memory_(store_, [this] { remember_soon(); }),
       announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }),
       members_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
                       .changed = [this] { follow_members(); }}),
@@ -92,6 +96,27 @@ void Daemon::count() {
     counting_.save();
   } catch (std::runtime_error const &error) {
     troubles_.add(error.what());
+  }
+  remember();
+}
+
+// From a timer, too, so that nothing is thrown.
+void Daemon::remember() {
+  try {
+    if (!memory_.save()) {
+      remember_soon();
+    }
+  } catch (std::runtime_error const &error) {
+    troubles_.add(error.what());
+  }
+}
+
+void Daemon::remember_soon() {
+  if (!next_remembering_) {
+    next_remembering_ = loop_.after(kBetweenSaves, [this] {
+      next_remembering_.end();  // so that another one can follow
+      remember();
+    });
   }
 }
 

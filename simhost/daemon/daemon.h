@@ -67,6 +67,8 @@ class Daemon {
   [[nodiscard]] Json counters(Json const &question);
   [[nodiscard]] Json counting_sessions(Json const &question);
   void count_from_now_on();
+  void remember();
+  void remember_soon();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
   [[nodiscard]] Json groups(Json const &question) const;
 
@@ -99,6 +101,7 @@ class Daemon {
   events::Clock::time_point mended_;    // when the last one was due
   events::Clock::duration pause_ = {};  // before the next attempt to connect
   events::Loop::Timer next_count_;
+  events::Loop::Timer next_remembering_;
 };
 
 }  // namespace simhost::daemon

@@ -1,6 +1,10 @@
 // A flow is made anew by the one that taught it, as that is now.
 #include "daemon/memory.h"
 
+#include <algorithm>
+#include <array>
+#include <chrono>
+#include <set>
 #include <utility>
 
 #include "planes/openvswitch/compile/pipeline.h"
@@ -9,53 +13,191 @@
 namespace simhost::daemon {
 namespace {
 
+using openflow::Field;
 using openflow::Flow;
+using openvswitch::Counted;
 using openvswitch::LearnedFlows;
+using storage::Remembered;
+using storage::RememberedAs;
 
-// The number of the port that a cookie names.
-std::uint32_t port_in(std::uint64_t cookie) {
-  return static_cast<std::uint32_t>(cookie);
+constexpr std::uint16_t kPriority = 100;
+constexpr auto kVlan = openflow::ones(openvswitch::kVlanBits);
+
+// What is learned in which table, and how.
+struct Kind {
+  std::uint8_t table;
+  RememberedAs as;
+  Counted counted;
+  Field address;
+};
+
+constexpr std::array kKinds{Kind{openvswitch::table::kFirstAddresses, RememberedAs::first,
+                                 Counted::first_address, Field::eth_dst},
+                            Kind{openvswitch::table::kLearnedAddresses, RememberedAs::learned,
+                                 Counted::learned, Field::eth_dst},
+                            Kind{openvswitch::table::kCountedSources, RememberedAs::counted,
+                                 Counted::counted_source, Field::eth_src}};
+
+Flow flow_of(Remembered const &address) {
+  auto const &kind = *std::ranges::find(kKinds, address.as, &Kind::as);
+  openflow::EthernetAddress mac{};
+  std::ranges::transform(address.mac, mac.begin(),
+                         [](std::byte one) { return static_cast<std::uint8_t>(one); });
+  Flow flow;
+  flow.table = kind.table;
+  flow.priority = kPriority;
+  flow.cookie = openvswitch::cookie(
+      kind.counted, static_cast<std::uint32_t>(address.port.value_or(storage::PortNumber{})));
+  flow.match.with(kind.address, openflow::to_value(mac));
+  if (address.vlan) {
+    flow.match.with(openvswitch::field::kDomain, *address.vlan, kVlan);
+  }
+  return flow;
 }
 
 }  // namespace
 
+std::optional<Remembered> learned_in(Flow const &flow) {
+  auto const kind = std::ranges::find(kKinds, flow.table, &Kind::table);
+  if (kind == kKinds.end()) {
+    return std::nullopt;
+  }
+  auto const &fields = flow.match.fields();
+  auto const mac = fields.find(kind->address);
+  if (mac == fields.end()) {
+    return std::nullopt;
+  }
+  Remembered learned{.as = kind->as, .vlan = std::nullopt, .mac = {}, .port = std::nullopt};
+  std::ranges::transform(openflow::to_address<6>(mac->second.value), learned.mac.begin(),
+                         [](std::uint8_t one) { return std::byte{one}; });
+  if (auto const vlan = fields.find(openvswitch::field::kDomain); vlan != fields.end()) {
+    learned.vlan = static_cast<std::uint16_t>(vlan->second.value);
+  }
+  if (auto const port = openvswitch::number_of(flow.cookie); port != 0) {
+    learned.port = storage::PortNumber{port};
+  }
+  // Whatever else a flow has, it was not learned.
+  auto const as_learned = flow_of(learned);
+  bool const is_learned = place(flow) == place(as_learned) && flow.cookie == as_learned.cookie;
+  return is_learned ? std::optional(learned) : std::nullopt;
+}
+
+Memory::OfBridge &Memory::of_bridge(storage::SwitchKey key) {
+  auto found = bridges_.find(key);
+  if (found == bridges_.end()) {
+    OfBridge known;
+    storage::ReadingTransaction transaction(store_);
+    for (auto const &address : storage::remembered_of(transaction, key)) {
+      auto flow = flow_of(address);
+      known.flows.emplace(openflow::place(flow), std::move(flow));
+    }
+    found = bridges_.emplace(key, std::move(known)).first;
+  }
+  return found->second;
+}
+
+void Memory::note(storage::SwitchKey key, Flow const &flow, bool is_known) {
+  if (auto const address = learned_in(flow)) {
+    unsaved_.push_back({.key = key, .address = *address, .is_known = is_known});
+    changed_();
+  }
+}
+
+template <typename IsGone>
+void Memory::remove(storage::SwitchKey key, IsGone const &is_gone) {
+  std::erase_if(of_bridge(key).flows, [&](auto const &flow) {
+    bool const goes = is_gone(flow.second);
+    if (goes) {
+      note(key, flow.second, false);
+    }
+    return goes;
+  });
+}
+
 std::optional<std::uint32_t> Memory::follow(storage::SwitchKey key,
                                             openflow::FlowUpdate const &update) {
   using Event = openflow::FlowUpdate::Event;
-  auto &flows = bridges_[key].flows;
-  auto const place = openflow::place(update.flow);
-  if (update.event == Event::removed) {
-    flows.erase(place);
-  }
-  if (update.event == Event::removed || update.event >= Event::own) {
+  if (update.event >= Event::own || !learned_in(update.flow)) {
     return std::nullopt;
   }
+  auto &flows = of_bridge(key).flows;
+  auto const place = openflow::place(update.flow);
   auto const known = flows.find(place);
-  auto const port = port_in(update.flow.cookie);
-  bool const moved = update.flow.table == openvswitch::table::kLearnedAddresses &&
-                     known != flows.end() && port_in(known->second.cookie) != port;
+  if (update.event == Event::removed) {
+    if (known != flows.end()) {
+      note(key, known->second, false);
+      flows.erase(known);
+    }
+    return std::nullopt;
+  }
+  auto const port = openvswitch::number_of(update.flow.cookie);
+  bool const is_elsewhere =
+      known != flows.end() && openvswitch::number_of(known->second.cookie) != port;
+  if (known == flows.end() || is_elsewhere) {
+    note(key, update.flow, true);
+  }
   flows.insert_or_assign(place, update.flow);
-  return moved ? std::optional(port) : std::nullopt;
+  return is_elsewhere && update.flow.table == openvswitch::table::kLearnedAddresses
+             ? std::optional(port)
+             : std::nullopt;
+}
+
+void Memory::replace(storage::SwitchKey key, std::span<Flow const> flows) {
+  std::set<Place> there;
+  for (auto const &flow : flows) {
+    there.insert(openflow::place(flow));
+  }
+  remove(key, [&](Flow const &flow) { return !there.contains(openflow::place(flow)); });
+  for (auto const &flow : flows) {
+    openflow::FlowUpdate update;
+    update.flow = flow;
+    follow(key, update);
+  }
 }
 
 void Memory::follow_devices(storage::SwitchKey key,
                             std::map<std::string, std::uint32_t> const &devices) {
-  auto &bridge = bridges_[key];
-  if (bridge.devices == devices) {
+  auto &known = of_bridge(key).devices;
+  if (known == devices) {
     return;
   }
-  for (auto const &[device, port] : std::exchange(bridge.devices, devices)) {
+  for (auto const &[device, port] : std::exchange(known, devices)) {
     auto const now = devices.find(device);
     if (now == devices.end() || now->second != port) {
-      std::erase_if(bridge.flows, [gone = port](auto const &flow) {
-        return port_in(flow.second.cookie) == gone;
+      remove(key, [gone = port](Flow const &flow) {
+        return openvswitch::number_of(flow.cookie) == gone;
       });
     }
   }
 }
 
 void Memory::forget(storage::SwitchKey key) {
-  bridges_[key].flows.clear();
+  remove(key, [](Flow const &) { return true; });
+}
+
+bool Memory::save() {
+  if (unsaved_.empty()) {
+    return true;
+  }
+  try {
+    storage::Patience none(std::chrono::nanoseconds::zero());
+    storage::ChangingTransaction transaction(store_, none);
+    for (auto const &[key, address, is_known] : unsaved_) {
+      if (is_known) {
+        storage::remember(transaction, key, address);
+      } else {
+        storage::remove_remembered(transaction, key, address);
+      }
+    }
+    transaction.commit();
+  } catch (storage::StateFailure const &failure) {
+    if (failure.kind() != storage::FailureKind::busy) {
+      throw;
+    }
+    return false;
+  }
+  unsaved_.clear();
+  return true;
 }
 
 template <typename Condition>
@@ -72,7 +214,8 @@ std::vector<Flow> Memory::flows_that(storage::SwitchKey key, Condition const &co
 }
 
 std::vector<Flow> Memory::learned_at(storage::SwitchKey key, std::uint32_t port) const {
-  return flows_that(key, [&](Flow const &flow) { return port_in(flow.cookie) == port; });
+  return flows_that(key,
+                    [&](Flow const &flow) { return openvswitch::number_of(flow.cookie) == port; });
 }
 
 std::vector<Flow> Memory::learned(storage::SwitchKey key, LearnedFlows const &known) const {
@@ -81,14 +224,10 @@ std::vector<Flow> Memory::learned(storage::SwitchKey key, LearnedFlows const &kn
   });
 }
 
-std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted) const {
+std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted) {
   std::vector<Flow> recalled;
-  auto const found = bridges_.find(key);
-  if (found == bridges_.end()) {
-    return recalled;
-  }
   openvswitch::Teachers const teachers(wanted);
-  for (auto const &[place, flow] : found->second.flows) {
+  for (auto const &[place, flow] : of_bridge(key).flows) {
     auto const learn = teachers.how_learned({.table = flow.table, .cookie = flow.cookie});
     if (auto again = learn ? openvswitch::relearned(*learn, flow) : std::nullopt) {
       recalled.push_back(*std::move(again));

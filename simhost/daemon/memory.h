@@ -1,8 +1,9 @@
-// What bridges have learned, kept past their end: Open vSwitch forgets it when it is started anew,
-// and a client that says nothing would not be reached until it does.
+// What bridges have learned, kept past their end and the daemon's: Open vSwitch forgets it when it
+// is started anew, and a client that says nothing would not be reached until it does.
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <optional>
 #include <span>
@@ -13,15 +14,27 @@
 #include "planes/openvswitch/openflow/flow.h"
 #include "planes/openvswitch/openflow/replies.h"
 #include "planes/openvswitch/reconcile/difference.h"
-#include "storage/switches.h"
+#include "storage/running/remembered.h"
+#include "storage/store.h"
 
 namespace simhost::daemon {
 
+/// What a flow of a table that a bridge fills by itself says that it learned; nothing for a flow
+/// that no bridge taught itself.
+std::optional<storage::Remembered> learned_in(openflow::Flow const &flow);
+
 class Memory {
  public:
+  /// `changed` is told when there is something to save. Nothing of this may be called in a
+  /// transaction on the store.
+  Memory(storage::Store &store, std::function<void()> changed)
+      : store_(store), changed_(std::move(changed)) {}
+
   /// A bridge was told, or learned, a flow of a table that it fills by itself; or lost one. Returns
   /// the port at which an address is learned that was learned elsewhere; 0 beyond the uplinks.
   std::optional<std::uint32_t> follow(storage::SwitchKey key, openflow::FlowUpdate const &update);
+  /// A bridge has these flows in its tables, and what it was known to have besides it has lost.
+  void replace(storage::SwitchKey key, std::span<openflow::Flow const> flows);
   /// The devices of a bridge, with the numbers of their ports. What was learned at a port that has
   /// another device than before is forgotten.
   void follow_devices(storage::SwitchKey key, std::map<std::string, std::uint32_t> const &devices);
@@ -35,22 +48,39 @@ class Memory {
                                                     openvswitch::LearnedFlows const &known) const;
   /// What a bridge that is to have these flows knows once more.
   [[nodiscard]] std::vector<openflow::Flow> recall(storage::SwitchKey key,
-                                                   std::span<openflow::Flow const> wanted) const;
+                                                   std::span<openflow::Flow const> wanted);
+
+  /// Puts into the state what is not there yet. Returns whether all of it is: nothing is put while
+  /// somebody else writes.
+  bool save();
 
  private:
   using Place = std::tuple<std::uint8_t, std::uint16_t, openflow::Match>;
 
   struct OfBridge {
-    std::map<std::string, std::uint32_t> devices;
-    std::map<Place, openflow::Flow> flows;
+    std::map<std::string, std::uint32_t> devices = {};
+    std::map<Place, openflow::Flow> flows = {};
   };
 
+  struct Unsaved {
+    storage::SwitchKey key;
+    storage::Remembered address;
+    bool is_known;
+  };
+
+  OfBridge &of_bridge(storage::SwitchKey key);
+  void note(storage::SwitchKey key, openflow::Flow const &flow, bool is_known);
+  template <typename IsGone>
+  void remove(storage::SwitchKey key, IsGone const &is_gone);
   // Those of which something is true.
   template <typename Condition>
   [[nodiscard]] std::vector<openflow::Flow> flows_that(storage::SwitchKey key,
                                                        Condition const &condition) const;
 
+  storage::Store &store_;
+  std::function<void()> changed_;
   std::map<storage::SwitchKey, OfBridge> bridges_;
+  std::vector<Unsaved> unsaved_;  // in the order in which it came to be known
 };
 
 }  // namespace simhost::daemon

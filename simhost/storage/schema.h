@@ -9,7 +9,7 @@ namespace simhost::storage {
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables, by a step of state_format.cpp that brings a file of the
 /// version before forward.
-inline constexpr std::int64_t kSchemaVersion = 6;
+inline constexpr std::int64_t kSchemaVersion = 7;
 /// The version that the first of those steps begins with; what is older is refused.
 inline constexpr std::int64_t kOldestSchema = 3;
 
@@ -23,5 +23,7 @@ extern char const *const kGenerationSchema;
 extern char const *const kFramesSchema;
 /// Likewise those of what its frames counted.
 extern char const *const kReadingSchema;
+/// Likewise those of what its data path learned.
+extern char const *const kRememberedSchema;
 
 }  // namespace simhost::storage

@@ -36,4 +36,18 @@ char const *const kReadingSchema = R"sql(
   ) STRICT, WITHOUT ROWID;
 )sql";
 
+char const *const kRememberedSchema = R"sql(
+  -- The addresses that the data path has learned, in a VLAN or in all (-1). What it learned at a port
+  -- goes with the port's device.
+  CREATE TABLE remembered (
+    switch      INTEGER NOT NULL REFERENCES switch ON DELETE CASCADE,
+    kind        INTEGER NOT NULL,
+    vlan        INTEGER NOT NULL,
+    mac         BLOB NOT NULL CHECK (length(mac) = 6),
+    port        INTEGER REFERENCES device (port) ON DELETE CASCADE,
+    PRIMARY KEY (switch, kind, vlan, mac)
+  ) STRICT, WITHOUT ROWID;
+  CREATE INDEX remembered_by_port ON remembered (port);
+)sql";
+
 }  // namespace simhost::storage

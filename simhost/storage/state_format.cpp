@@ -17,7 +17,7 @@ namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
-    kGenerationSchema, kFramesSchema, kReadingSchema};
+    kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -112,6 +112,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kGenerationSchema);
   database.exec(kFramesSchema);
   database.exec(kReadingSchema);
+  database.exec(kRememberedSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

@@ -6,7 +6,7 @@ import re
 import signal
 import sqlite3
 import subprocess
-from typing import Dict
+from typing import Dict, List
 
 import pytest
 
@@ -72,6 +72,31 @@ def expect_sooner_or_later(one: Client, other: Client, sent: bytes) -> None:
             return False
 
     assert comes_true(comes)
+
+
+def test_clients_that_say_nothing_are_reached_after_the_daemon_is_killed(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    to_other = frame(other.mac, one.mac, payload=b"are you there?")
+    other.run("ip", "neighbour", "flush", "dev", "eth0")
+    assert comes_true(lambda: len(remembered(lab)) == 2)
+    lab.stop(signal.SIGKILL)
+    lab.start()
+    expect_sooner_or_later(one, other, to_other)
+    # What was put where the bridge learns by itself was not learned.
+    (socket,) = lab.run_folder().glob("vs*.mgmt")
+    put = "table=31,priority=100,dl_dst=02:00:00:00:00:99,actions=drop"
+    lab.host.run("ovs-ofctl", "-OOpenFlow15", "add-flow", f"unix:{socket}", put)
+    lab.ctl("disconnect", "lab", "b")
+    assert comes_true(lambda: remembered(lab) == [one.mac])
+
+
+def remembered(lab: Lab) -> List[str]:
+    """The addresses of the state that the data path learned."""
+    state = sqlite3.connect(lab.state)
+    rows = state.execute("SELECT mac FROM remembered").fetchall()
+    state.close()
+    return sorted(mac.hex(":") for (mac,) in rows)
 
 
 def test_a_killed_daemon_leaves_nothing_running_and_another_takes_over(lab: Lab) -> None:

@@ -21,6 +21,7 @@
 #include "planes/openvswitch/reading/read_network.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
+#include "storage/running/remembered.h"
 #include "storage/store.h"
 #include "vswitch/mcast_filters.h"
 
@@ -371,6 +372,7 @@ void OpenVswitchPlane::remove_address(storage::ChangingTransaction &transaction,
 
 void OpenVswitchPlane::restart(storage::ChangingTransaction &transaction) {
   stored_.restart(transaction);
+  storage::remove_remembered(transaction);
 }
 
 void OpenVswitchPlane::check_device(storage::Transaction &transaction, std::string_view device) {
