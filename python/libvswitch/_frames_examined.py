@@ -6,8 +6,9 @@ import re
 import shutil
 import socket
 import subprocess
+import typing
 from pathlib import Path
-from typing import Any, Dict, Iterator, List, NamedTuple, Optional, Tuple
+from typing import Any, Dict, List, Optional, Tuple
 
 NOTE, OK, WARNING = "note", "ok", "warning"
 _ABOUT = "frames"
@@ -18,14 +19,14 @@ _PATIENCE = 10.0
 _USERS: Tuple[List[str], ...] = ([], ["--user", "--map-root-user"])
 
 
-class Found(NamedTuple):
+class Found(typing.NamedTuple):
     level: str
     about: str
     text: str
     advice: str = ""
 
 
-def examine(state: Optional[str]) -> Iterator[Found]:
+def examine(state: Optional[str]) -> typing.Iterator[Found]:
     """What holds on this machine, and of the host that is kept in `state`."""
     yield _open_vswitch()
     yield _namespaces()
@@ -96,7 +97,7 @@ def _status(state: Path) -> Optional[Dict[str, Any]]:
         return None
 
 
-def _daemon(status: Dict[str, Any]) -> Iterator[Found]:
+def _daemon(status: Dict[str, Any]) -> typing.Iterator[Found]:
     text = f"simhostd, process {status.get('process')}, moves them"
     if status.get("datapath") == "system":
         yield Found(
