@@ -25,9 +25,9 @@ void put_bundle_control(Writer &out, Xid xid, std::uint32_t bundle, BundleContro
 /// Throws like put_change.
 void put_bundle_add(Writer &out, Xid xid, std::uint32_t bundle, Change const &change);
 
-/// Which messages the switch sends by itself.
 /// Removes the meter of what goes up to controllers, then adds it: so many frames a second.
 void put_controller_meter(Writer &out, Xid xid, std::uint32_t rate);
+/// Which messages the switch sends by itself.
 void put_set_async(Writer &out, Xid xid, AsyncMessages const &wanted);
 
 /// `type` is flows or aggregate.
