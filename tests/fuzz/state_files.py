@@ -94,6 +94,15 @@ def _columns(database: sqlite3.Connection) -> List[Tuple[str, str]]:
     ]
 
 
+def _key_of(database: sqlite3.Connection, table: str) -> str:
+    """The columns that tell its rows apart."""
+    (sql,) = database.execute("SELECT sql FROM sqlite_schema WHERE name = ?", (table,)).fetchone()
+    if "WITHOUT ROWID" not in sql:
+        return "rowid"
+    columns = database.execute(f"PRAGMA table_info({table})")
+    return ", ".join(name for _, name, _, _, _, place in columns if place)
+
+
 def _damaged_bytes(value: bytes, chance: random.Random) -> bytes:
     """Another length, or other bytes in some places."""
     damaged = bytearray(value)
@@ -123,11 +132,11 @@ def change_value(file: Path, chance: random.Random) -> str:
     value = chance.choice(Odd)
     if rows and isinstance(rows[row][0], bytes) and chance.random() < 0.7:
         value = _damaged_bytes(rows[row][0], chance)
-    key = "place" if table == "learned" else "rowid"
+    key = _key_of(database, table)
     what = f"{table}.{column} of row {row} = {value!r:.60}"
     try:
         database.execute(
-            f"UPDATE {table} SET {column} = ? WHERE {key} ="
+            f"UPDATE {table} SET {column} = ? WHERE ({key}) ="
             f" (SELECT {key} FROM {table} LIMIT 1 OFFSET {row})",
             (value,),
         )
@@ -143,10 +152,10 @@ def remove_row(file: Path, chance: random.Random) -> str:
     """Takes a row away, and leaves what refers to it."""
     database = sqlite3.connect(file, isolation_level=None)
     table, _ = chance.choice(_columns(database))
-    key = "place" if table == "learned" else "rowid"
+    key = _key_of(database, table)
     row = chance.randrange(4)
     database.execute(
-        f"DELETE FROM {table} WHERE {key} = (SELECT {key} FROM {table} LIMIT 1 OFFSET {row})"
+        f"DELETE FROM {table} WHERE ({key}) = (SELECT {key} FROM {table} LIMIT 1 OFFSET {row})"
     )
     database.close()
     return f"row {row} of {table} is removed"
