@@ -113,10 +113,7 @@ void Daemon::remember() {
 
 void Daemon::remember_soon() {
   if (!next_remembering_) {
-    next_remembering_ = loop_.after(kBetweenSaves, [this] {
-      next_remembering_.end();  // so that another one can follow
-      remember();
-    });
+    next_remembering_ = loop_.after(kBetweenSaves, [this] { remember(); });
   }
 }
 

@@ -67,8 +67,9 @@ void Loop::turn(Clock::duration longest) {
 void Loop::do_due() {
   auto const now = Clock::now();
   while (!times_.empty() && times_.begin()->first <= now) {
-    auto const waiting = std::move(times_.extract(times_.begin()).mapped());
-    waiting->work();
+    // No longer to come: its work may put another one in its place.
+    auto const work = std::move(times_.extract(times_.begin()).mapped()->work);
+    work();
   }
 }
 

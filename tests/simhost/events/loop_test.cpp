@@ -126,6 +126,24 @@ TEST(ALoop, DoesWhatIsDueInItsOrderAndOnce) {
   EXPECT_FALSE(static_cast<bool>(first));
 }
 
+TEST(ALoop, HasNothingToComeWithinTheWorkThatWasTheLast) {
+  Loop loop;
+  int seen = 0;
+  Loop::Timer next;
+  Loop::Work const work = [&] {
+    ++seen;
+    EXPECT_FALSE(static_cast<bool>(next));
+    if (seen == 1) {
+      next = loop.after(0ms, work);
+    } else {
+      loop.stop();
+    }
+  };
+  next = loop.after(0ms, work);
+  loop.run();
+  EXPECT_EQ(seen, 2);
+}
+
 TEST(Signals, AreTakenByTheLoop) {
   Loop loop;
   int seen = 0;
