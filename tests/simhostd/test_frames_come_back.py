@@ -261,6 +261,11 @@ def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
     refused_far_session(lab, "lab", "a")
 
 
+def test_a_switch_with_devices_at_uplinks_alone_is_not_made_unfit(lab: Lab) -> None:
+    lab.network("nic0")
+    refused_far_session(lab, "lab", "a")
+
+
 def refused_far_session(lab: Lab, switch: str, port: str) -> None:
     """With nothing changed."""
     before = lab.plane()["change"]

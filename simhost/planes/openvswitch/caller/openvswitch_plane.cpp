@@ -147,6 +147,17 @@ Json question_about(std::string_view what, Place const &place) {
           {"port", place.port ? static_cast<std::uint32_t>(*place.port) : 0}};
 }
 
+bool has_uplink_device(storage::Transaction &transaction, storage::SwitchKey key) {
+  auto const uplinks = storage::uplinks_of(transaction, key);
+  return std::ranges::any_of(uplinks, [&](auto const &uplink) {
+    return storage::device_of(transaction, uplink.name).has_value();
+  });
+}
+
+bool has_device(storage::Transaction &transaction, storage::SwitchKey key) {
+  return !storage::port_devices(transaction, key).empty() || has_uplink_device(transaction, key);
+}
+
 // The switches of which no flows can be made, and why.
 std::map<storage::SwitchKey, Refused> unfit_switches(storage::Transaction &transaction) {
   auto const links = [](storage::Transaction &from, std::string_view uplink) {
@@ -154,8 +165,7 @@ std::map<storage::SwitchKey, Refused> unfit_switches(storage::Transaction &trans
   };
   std::map<storage::SwitchKey, Refused> unfit;
   for (auto const &[key, row] : storage::all_switches(transaction)) {
-    if (row.associated && may_be_refused(transaction, key) &&
-        !storage::port_devices(transaction, key).empty()) {
+    if (row.associated && may_be_refused(transaction, key) && has_device(transaction, key)) {
       try {
         auto const team = teaming::team_of(transaction, key, links);
         check(read_network(transaction, key, team, {}));
@@ -199,22 +209,17 @@ bool OpenVswitchPlane::has_frames(storage::Transaction &transaction, Place const
     return uplink ? storage::device_of(transaction, *uplink).has_value()
                   : storage::device_of(transaction, *place.port).has_value();
   }
-  auto const uplinks = storage::uplinks_of(transaction, place.switch_key);
-  return std::ranges::any_of(uplinks, [&](auto const &uplink) {
-    return storage::device_of(transaction, uplink.name).has_value();
-  });
+  return has_uplink_device(transaction, place.switch_key);
 }
 
 // What a switch itself counts, no frames do.
 bool OpenVswitchPlane::counts_frames(storage::Transaction &transaction,
                                      CounterOwner const &owner) const {
-  Place const place{.switch_key = owner.switch_key, .port = owner.port};
   if (owner.session.empty()) {
-    return owner.port && has_frames(transaction, place);
+    return owner.port &&
+           has_frames(transaction, {.switch_key = owner.switch_key, .port = owner.port});
   }
-  return has_frames(transaction, place) ||
-         (storage::frames_change(transaction) &&
-          !storage::port_devices(transaction, owner.switch_key).empty());
+  return storage::frames_change(transaction) && has_device(transaction, owner.switch_key);
 }
 
 bool OpenVswitchPlane::link_is_up(storage::Transaction &transaction, std::string_view uplink) {

@@ -18,6 +18,7 @@
 #include "model/switches/properties.h"
 #include "model/teaming/properties.h"
 #include "model/vlans/properties.h"
+#include "planes/openvswitch/compile/ways.h"
 #include "planes/openvswitch/reading/read_mirrors.h"
 #include "storage/ports.h"
 #include "storage/running/addresses.h"
@@ -326,7 +327,8 @@ Network read_network(storage::Transaction &transaction, storage::SwitchKey key,
 }
 
 bool may_be_refused(storage::Transaction &transaction, storage::SwitchKey key) {
-  return has_mirror_sessions(transaction, key);
+  return has_mirror_sessions(transaction, key) ||
+         storage::uplinks_of(transaction, key).size() > kMostInSlot;
 }
 
 }  // namespace simhost::openvswitch

@@ -26,7 +26,8 @@ Network read_network(storage::Transaction &transaction, storage::SwitchKey key,
                      teaming::Team const &team, Observed const &observed);
 
 /// Whether a switch has anything that read_network() or check() may refuse, which is told at once:
-/// of all that a state can hold, mirror sessions alone may be more than flows can do.
+/// of all that a state can hold, mirror sessions may be more than flows can do, and so may many
+/// uplinks that are one link.
 bool may_be_refused(storage::Transaction &transaction, storage::SwitchKey key);
 
 }  // namespace simhost::openvswitch
