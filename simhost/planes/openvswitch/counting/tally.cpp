@@ -43,7 +43,7 @@ constexpr std::array kOfPorts{
 
 // A device has counted before it came to its bridge, a flow has not.
 bool is_of_device(Counted kind) {
-  return kind >= Counted::out_lost;
+  return kind == Counted::out_lost || kind == Counted::in_damaged || kind == Counted::out_damaged;
 }
 
 // Both numbers begin anew together.

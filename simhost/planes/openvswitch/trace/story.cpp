@@ -120,7 +120,7 @@ class Story {
   // ovs-vswitchd shows first what becomes of larger frames, and then what of others.
   bool is_passed_over(TraceLine const &line) {
     if (line.kind == LineKind::visit) {
-      bool const is_large = counted(line) == Counted::too_large && !is_too_large_;
+      bool const is_large = kind_of(line.cookie) == Counted::too_large && !is_too_large_;
       if (is_large) {
         passed_over_ = line.depth;
       } else if (passed_over_ && line.depth < *passed_over_) {
@@ -137,8 +137,6 @@ class Story {
       follow(line);
     }
   }
-
-  static Counted counted(TraceLine const &line) { return static_cast<Counted>(line.cookie >> 56U); }
 
   void tell_visit(TraceLine const &visit) {
     if (visit.table == table::kOwnFrames) {
@@ -168,7 +166,7 @@ class Story {
     auto const port = entry_.station.name;
     auto const of_port = [&](char const *name) { return SettingOf{port, name}; };
     auto const of_switch = [](char const *name) { return SettingOf{{}, name}; };
-    switch (counted(visit)) {
+    switch (kind_of(visit.cookie)) {
       case Counted::disabled:
         return drop("the switch is disabled", of_switch("disabled"));
       case Counted::reserved:
@@ -298,7 +296,7 @@ class Story {
     left_before_ = left_;
     auto const to = names_.station(static_cast<openflow::Port>(port));
     auto const tags = tags_in_words(vlans_);
-    if (counted(line) == Counted::mirrored) {
+    if (kind_of(line.cookie) == Counted::mirrored) {
       auto const session = names_.session(static_cast<std::uint32_t>(line.cookie));
       say(Kind::copied,
           fmt::format("is copied by the mirror session {} to {}, {}", session.name, in_words(to),
