@@ -127,6 +127,7 @@ void Daemon::count_from_now_on() {
 void Daemon::connect() {
   next_connect_.end();
   bridges_.reset();
+  follows_members_ = false;
   attempt([this] {
     bridges_.emplace(
         loop_, options_.database, memory_,
@@ -199,18 +200,17 @@ void Daemon::fail(std::string const &why) {
 }
 
 // A query that is lost comes again.
-void Daemon::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) try {
-  if (bridges_) {
-    bridges_->send(key, frames);
-  }
+bool Daemon::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) try {
+  return bridges_ && bridges_->send(key, frames);
 } catch (std::runtime_error const &error) {
   troubles_.add(error.what());
   connect_later();
+  return false;
 }
 
 // Which is told to nobody: it is no change of what is configured.
 void Daemon::follow_members() {
-  bool const is_only_reason = !next_sync_;
+  bool const is_only_reason = !next_sync_ || follows_members_;
   sync_soon();
   follows_members_ = is_only_reason;
 }
@@ -273,6 +273,7 @@ void Daemon::take_out_new_devices(Wanted const &wanted) {
 }
 
 void Daemon::sync() {
+  bool const is_told = !std::exchange(follows_members_, false);
   follow_devices();
   storage::ReadingTransaction transaction(store_);
   commits_ = storage::commits_of_others(transaction);
@@ -290,7 +291,7 @@ void Daemon::sync() {
   }
   take_out_new_devices(all);
   auto const changed = bridges_->apply(all);
-  if (changed > 0 && !follows_members_) {
+  if (changed > 0 && is_told) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
   announcer_.follow(all, memory_);
@@ -299,21 +300,22 @@ void Daemon::sync() {
 }
 
 // From a timer, too, so that nothing is thrown.
-void Daemon::announce(storage::SwitchKey key,
-                      std::vector<openvswitch::Announced> const &clients) try {
+void Daemon::announce(storage::SwitchKey key, std::vector<openvswitch::Announced> const &clients) {
   std::vector<openflow::PacketOut> frames;
   frames.reserve(clients.size());
   for (auto const &client : clients) {
     frames.push_back(openvswitch::announcement(client));
   }
-  if (bridges_ && bridges_->send(key, frames)) {
+  if (!send(key, frames)) {
+    return;
+  }
+  try {
     storage::ChangingTransaction transaction(store_);
     count_announced(transaction, key, clients.size());
     transaction.commit();
+  } catch (std::runtime_error const &error) {
+    troubles_.add(error.what());
   }
-} catch (std::runtime_error const &error) {
-  troubles_.add(error.what());
-  connect_later();
 }
 
 void Daemon::settle(Wanted const &wanted) {

@@ -49,7 +49,7 @@ class Daemon {
   void mend_soon();
   void look_at_commits();
   void announce(storage::SwitchKey key, std::vector<openvswitch::Announced> const &clients);
-  void send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
+  bool send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
   void follow_members();
   void sync_soon();
   void sync_after(std::optional<ClockTime> const &wait);

@@ -28,17 +28,15 @@ events::Descriptor watched(std::filesystem::path const &file) {
   return inotify;
 }
 
-// Whoever writes holds a lock until what was written can be read, or never will be.
+// Whoever writes holds a lock until what was written can be read, or never will be. What else is
+// wrong with the state is told to those who read it.
 bool somebody_writes(storage::Store &store) {
   try {
     storage::Patience none(0ns);
     storage::ChangingTransaction const taken(store, none);
     return false;
   } catch (storage::StateFailure const &failure) {
-    if (failure.kind() != storage::FailureKind::busy) {
-      throw;
-    }
-    return true;
+    return failure.kind() == storage::FailureKind::busy;
   }
 }
 
