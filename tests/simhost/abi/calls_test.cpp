@@ -11,6 +11,7 @@
 #include "abi/boundary.h"
 #include "abi/callers_code.h"
 #include "faults/faults.h"
+#include "named_switch.h"
 #include "storage/switches.h"
 
 namespace {
@@ -24,12 +25,7 @@ constexpr auto kCall = "VSDVS_GetMTU";
 constexpr auto kAlias = "planted";
 
 void add_planted(simhost::storage::ChangingTransaction &transaction) {
-  simhost::storage::add_switch(transaction, {.alias = kAlias,
-                                             .identifier = kAlias,
-                                             .portset = kAlias,
-                                             .max_ports = 1,
-                                             .version = 1,
-                                             .persistent = true});
+  simhost::storage::add_switch(transaction, named(kAlias));
 }
 
 bool has_planted() {

@@ -5,6 +5,7 @@
 
 #include <string>
 
+#include "named_switch.h"
 #include "storage/query.h"
 #include "storage/running/frames.h"
 #include "storage/store.h"
@@ -18,12 +19,7 @@ using testing::Optional;
 struct Devices : testing::Test {
   Devices() {
     add_uplink(transaction, "nic0");
-    key = *add_switch(transaction, {.alias = "s",
-                                    .identifier = "s",
-                                    .portset = "s",
-                                    .max_ports = 8,
-                                    .version = 200,
-                                    .persistent = true});
+    key = *add_switch(transaction, named("s"));
     p1 = *add_port(transaction, key, "p1", PortKind::client);
     p2 = *add_port(transaction, key, "p2", PortKind::client);
   }

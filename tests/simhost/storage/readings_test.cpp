@@ -5,6 +5,7 @@
 
 #include <limits>
 
+#include "named_switch.h"
 #include "storage/running/counters.h"
 #include "storage/store.h"
 
@@ -20,12 +21,7 @@ constexpr auto kGreatest = std::numeric_limits<std::uint64_t>::max();
 struct Readings : testing::Test {
   Store store{std::nullopt, [](ChangingTransaction &) {}};
   ChangingTransaction transaction{store};
-  SwitchKey key = *add_switch(transaction, {.alias = "s",
-                                            .identifier = "s",
-                                            .portset = "s",
-                                            .max_ports = 8,
-                                            .version = 200,
-                                            .persistent = true});
+  SwitchKey key = *add_switch(transaction, named("s"));
 };
 
 TEST_F(Readings, AreReplacedOneByOne) {

@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 
+#include "named_switch.h"
 #include "storage/query.h"
 #include "storage/store.h"
 
@@ -19,12 +20,7 @@ constexpr MacBytes kOther{std::byte{2}, {}, {}, {}, {}, std::byte{2}};
 
 struct RememberedAddresses : testing::Test {
   RememberedAddresses() {
-    key = *add_switch(transaction, {.alias = "s",
-                                    .identifier = "s",
-                                    .portset = "s",
-                                    .max_ports = 8,
-                                    .version = 200,
-                                    .persistent = true});
+    key = *add_switch(transaction, named("s"));
     p1 = *add_port(transaction, key, "p1", PortKind::client);
     p2 = *add_port(transaction, key, "p2", PortKind::client);
     put_device(transaction, p1, "tap1", std::nullopt);

@@ -5,6 +5,7 @@
 #include <fstream>
 #include <string>
 
+#include "named_switch.h"
 #include "storage/state_file.h"
 #include "storage/store.h"
 #include "storage/switches.h"
@@ -37,12 +38,7 @@ inline void write_file(std::filesystem::path const &file, std::string const &tex
 
 inline void add(simhost::storage::Store &store, std::string const &name) {
   simhost::storage::ChangingTransaction transaction(store);
-  simhost::storage::add_switch(transaction, {.alias = name,
-                                             .identifier = name,
-                                             .portset = name,
-                                             .max_ports = 1,
-                                             .version = 1,
-                                             .persistent = true});
+  simhost::storage::add_switch(transaction, named(name));
   transaction.commit();
 }
 

@@ -13,6 +13,7 @@
 #include <string>
 #include <type_traits>
 
+#include "named_switch.h"
 #include "storage/ports.h"
 #include "storage/query.h"
 #include "storage/running/generations.h"
@@ -25,20 +26,10 @@ namespace {
 using simhost::storage::ChangingTransaction;
 using simhost::storage::ReadingTransaction;
 using simhost::storage::Store;
-using simhost::storage::Switch;
 using simhost::storage::SwitchName;
 using simhost::storage::UnusableState;
 
 void populate_nothing(ChangingTransaction &) {}
-
-Switch named(std::string const &name) {
-  return {.alias = name,
-          .identifier = name,
-          .portset = name,
-          .max_ports = 1,
-          .version = 1,
-          .persistent = true};
-}
 
 void add(Store &store, std::string const &name) {
   ChangingTransaction transaction(store);
