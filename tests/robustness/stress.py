@@ -132,11 +132,14 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
     yield Part("frames of any content", "frames", sent, SHARES["frames"])
     sequences = partial(by_chance, "sequences/sequences.py", seed)
     yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
-    replays = [("sequences", "recorded_sequences"), ("clones", "recorded_clones")]
-    replays += [("on frames", "replayed_on_frames")] * frames
-    for what, name in replays:
+    replays = [
+        ("sequences", "sequences", "recorded_sequences"),
+        ("clones", "hosts", "recorded_clones"),
+    ]
+    replays += [("on frames", "hosts", "replayed_on_frames")] * frames
+    for what, unit, name in replays:
         replay = partial(by_chance, f"recordings/{name}.py", seed)
-        yield Part(f"replays, {what}", "hosts", replay, SHARES["replays"] / len(replays))
+        yield Part(f"replays, {what}", unit, replay, SHARES["replays"] / len(replays))
     clones = partial(by_chance, "vswitch/drawn_documents.py", seed)
     yield Part("clones of hosts", "documents", clones, SHARES["clones"])
     yield Part("killed processes", "rounds", killed, SHARES["kills"])
