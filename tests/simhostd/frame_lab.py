@@ -40,6 +40,23 @@ def comes_true(condition: Callable[[], bool]) -> bool:
     return False
 
 
+def comes_sooner_or_later(
+    one: Client, other: Client, sent: bytes, received: Optional[bytes] = None
+) -> bool:
+    """Whether a frame that is sent again and again comes at some time: as it was sent, unless it is
+    said how."""
+
+    def comes() -> bool:
+        one.send(sent)
+        try:
+            other.expect(received or sent, timeout=0.1)
+        except AssertionError:
+            return False
+        return True
+
+    return comes_true(comes)
+
+
 class Lab:
     """The host with its state, and everything around it; gone when it is left."""
 
