@@ -33,6 +33,7 @@ HEADERS = {
     "planes/openvswitch/counting": "planes/openvswitch/counting/tally.h",
     "planes/openvswitch/processes": "planes/openvswitch/processes/private_openvswitch.h",
     "planes/openvswitch/line": "planes/openvswitch/line/line.h",
+    "planes/openvswitch/trace": "planes/openvswitch/trace/story.h",
     "planes/openvswitch/caller": "planes/openvswitch/caller/openvswitch_plane.h",
     "scenario": "scenario/scenario.h",
     "abi": "abi/host.h",
@@ -52,7 +53,12 @@ COMPILER_OF_STATE = [
     "planes/openvswitch/compile",
 ]
 # What the plane of those who use a state that a daemon serves may use.
-CALLER = [*COMPILER_OF_STATE, "planes/openvswitch/reading", "planes/openvswitch/line"]
+CALLER = [
+    *COMPILER_OF_STATE,
+    "planes/openvswitch/reading",
+    "planes/openvswitch/line",
+    "planes/openvswitch/trace",
+]
 # What each may use.
 BELOW: Dict[str, List[str]] = {
     "base": [],
@@ -95,6 +101,14 @@ BELOW: Dict[str, List[str]] = {
     ],
     "planes/openvswitch/processes": ["events"],
     "planes/openvswitch/line": ["events"],
+    "planes/openvswitch/trace": [
+        "base",
+        "events",
+        "planes/openvswitch/transport",
+        "planes/openvswitch/openflow",
+        "planes/openvswitch/multicast",
+        "planes/openvswitch/compile",
+    ],
     "planes/openvswitch/caller": CALLER,
     "scenario": ["base", "storage", "clock", "faults", "model"],
     "abi": [*CALLER, "faults", "planes/stored", "planes/openvswitch/caller", "scenario"],
@@ -206,6 +220,15 @@ def test_nothing_is_included_by_its_place() -> None:
         if lines
     }
     assert found == {}
+
+
+def test_each_source_is_of_a_layer() -> None:
+    assert HEADERS.keys() == BELOW.keys()
+    host = ROOT / "simhost"
+    layers = [host / layer for layer in HEADERS]
+    # What the build makes lists with is of none.
+    sources = [one for one in tracked("simhost") if one.suffix == ".cpp" and one.parent != host]
+    assert [path for path in sources if not any(one in path.parents for one in layers)] == []
 
 
 def test_folders_are_small_enough_to_look_through() -> None:
