@@ -12,6 +12,7 @@
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/ovsdb/configuration.h"
 #include "planes/openvswitch/reconcile/difference.h"
+#include "planes/openvswitch/reconcile/present.h"
 #include "planes/openvswitch/reconcile/relearning.h"
 
 namespace simhost::daemon {
@@ -38,8 +39,8 @@ Deadline soon(std::size_t devices = 0) {
   return Deadline::clock::now() + kPatience + devices * kPatienceForEach;
 }
 
-bool is_marker(Flow const &flow) {
-  return flow.table == openvswitch::table::kGeneration;
+bool is_marker(openflow::FlowEntry const &entry) {
+  return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
 }
 
 // In the order in which nothing refers to what is not there.
@@ -180,14 +181,22 @@ struct Bridges::Bridge {
   std::string name;
   openflow::Connection connection;
   events::Loop::Watch watch;
-  Flows flows;                          // that it has
+  Flows flows;    // that it has
+  Taught taught;  // by these
+  // Flows that nobody here made, before what it has is put right.
+  std::vector<openvswitch::LearnedFlows> unplaced;
   std::optional<std::uint64_t> change;  // that is in force
-  bool is_altered = false;     // by somebody else, so that the two before are none of it any more
-  bool has_forgotten = false;  // what it had learned, for a restart of the host
+  bool is_altered = false;              // so that those before are none of it any more
+  bool has_forgotten = false;           // what it had learned, for a restart of the host
   // Of the flows as they are.
   PortNumbers numbers;
   openvswitch::CountedSessions sessions;
   Deadline counted{};
+
+  void have(Flows now) {
+    taught.have(now);
+    flows = std::move(now);
+  }
 };
 
 Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, Memory &memory, Told told)
@@ -293,7 +302,7 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
 // Once it is told of changes, so that none is missed.
 void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
   std::vector<Flow> learned;
-  bridge.connection.set_async({.packet_in = true, .group_changes = true}, deadline);
+  bridge.connection.set_async({.packet_in = true, .group_and_meter_changes = true}, deadline);
   for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
     bool const is_learned = openvswitch::table::is_learned(number);
     // These are recent for a second, and many.
@@ -308,18 +317,15 @@ void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
       }
     }
   }
-  openvswitch::Compiled there;
-  for (auto const &entry : bridge.connection.flows({}, deadline)) {
-    if (is_marker(entry.flow)) {
-      bridge.change = entry.flow.cookie;
-    } else {
-      there.flows.push_back(entry.flow);
-    }
+  auto flows = bridge.connection.flows({}, deadline);
+  if (auto const marker = std::ranges::find_if(flows, is_marker); marker != flows.end()) {
+    bridge.change = marker->flow.cookie;
+    flows.erase(marker);
   }
-  for (auto const &entry : bridge.connection.groups(deadline)) {
-    there.groups.push_back(entry.group);
-  }
-  bridge.flows = std::make_shared<openvswitch::Compiled const>(std::move(there));
+  auto present = openvswitch::present_of(flows, bridge.connection.groups(deadline));
+  bridge.unplaced = std::move(present.unplaced);
+  bridge.have(std::make_shared<openvswitch::Compiled const>(openvswitch::Compiled{
+      .rows = {}, .flows = std::move(present.flows), .groups = std::move(present.groups)}));
   if (bridge.change) {
     memory_.replace(bridge.key, learned);
   }
@@ -333,17 +339,44 @@ void Bridges::follow_events(Bridge &bridge) {
     }
     auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
     if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
-      if (auto const port = memory_.follow(bridge.key, *update)) {
-        told_.moved(bridge.key, *port);
-      }
+      follow_learned(bridge, *update);
     } else if (update != nullptr) {
       is_altered = is_altered || update->event != openflow::FlowUpdate::Event::own;
-    } else if (std::holds_alternative<openflow::GroupsChanged>(*event)) {
+    } else if (std::holds_alternative<openflow::GroupsOrMetersChanged>(*event)) {
       is_altered = true;
     }
   }
-  if (is_altered && !std::exchange(bridge.is_altered, true)) {
+  if (is_altered) {
+    note_origin(bridge, Origin::foreign);
+  }
+}
+
+void Bridges::follow_learned(Bridge &bridge, openflow::FlowUpdate const &update) {
+  if (auto const port = memory_.follow(bridge.key, update)) {
+    told_.moved(bridge.key, *port);
+  }
+  if (update.event < openflow::FlowUpdate::Event::own &&
+      update.event != openflow::FlowUpdate::Event::removed) {
+    note_origin(bridge, bridge.taught.origin_of(update));
+  }
+}
+
+void Bridges::note_origin(Bridge &bridge, Origin origin) {
+  if (origin == Origin::taught || std::exchange(bridge.is_altered, true)) {
+    return;
+  }
+  if (origin == Origin::foreign) {
     told_.altered(bridge.name);
+  } else {
+    told_.strayed();
+  }
+}
+
+// Where so much comes and goes that nobody follows it.
+void Bridges::look_for_strays(Bridge &bridge) {
+  for (auto const &entry :
+       bridge.connection.flows({.table = openvswitch::table::kRecentSources}, soon())) {
+    note_origin(bridge, bridge.taught.origin_of(entry));
   }
 }
 
@@ -367,6 +400,7 @@ void Bridges::count(Bridge &bridge, Deadline deadline) {
 void Bridges::count() {
   for (auto const &[key, bridge] : bridges_) {
     count(*bridge, soon());
+    look_for_strays(*bridge);
   }
 }
 
@@ -430,6 +464,7 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   if (!forgets) {
     add_relearned(bridge, wanted, difference, deadline);
   }
+  std::ranges::copy(std::exchange(bridge.unplaced, {}), std::back_inserter(difference.forgotten));
   if (is_new) {
     std::ranges::move(memory_.recall(wanted.key, wanted.flows->flows),
                       std::back_inserter(difference.added_flows));
@@ -446,7 +481,7 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   }
   if (!changes.empty()) {
     bridge.connection.change(changes, deadline);
-    bridge.flows = wanted.flows;
+    bridge.have(wanted.flows);
     bridge.change = change;
     follow_events(bridge);
   }

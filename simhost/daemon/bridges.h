@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "daemon/memory.h"
+#include "daemon/taught.h"
 #include "daemon/wanted.h"
 #include "events/loop.h"
 #include "planes/openvswitch/openflow/connection.h"
@@ -48,6 +49,8 @@ class Bridges {
     std::function<void()> changed;
     /// Somebody else changed flows or groups of the bridge of that name.
     std::function<void(std::string const &)> altered;
+    /// A bridge has learned what its flows do not teach, or not any more.
+    std::function<void()> strayed;
     /// A flow of a bridge sent up a frame.
     std::function<void(storage::SwitchKey, openflow::PacketIn const &)> heard;
     /// A connection ended.
@@ -95,6 +98,9 @@ class Bridges {
                                             openvswitch::Deadline deadline);
   void read_events(Bridge &bridge);
   void follow_events(Bridge &bridge);
+  void follow_learned(Bridge &bridge, openflow::FlowUpdate const &update);
+  void look_for_strays(Bridge &bridge);
+  void note_origin(Bridge &bridge, Origin origin);
   void count(Bridge &bridge, openvswitch::Deadline deadline);
 
   events::Loop &loop_;

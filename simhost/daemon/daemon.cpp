@@ -149,6 +149,7 @@ void Daemon::connect() {
                                    bridge));
                   mend_soon();
                 },
+            .strayed = [this] { mend_soon(); },
             .heard = [this](auto key, auto const &packet) { members_.receive(key, packet); },
             .disturbed = [this] { connect_later(); }});
     sync();

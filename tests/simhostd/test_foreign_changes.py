@@ -1,6 +1,7 @@
 """What somebody else changes in the same Open vSwitch: put right where it is the host's, left alone
 where it is not."""
 
+from functools import partial
 from pathlib import Path
 from typing import Iterator, List
 
@@ -8,6 +9,15 @@ import pytest
 
 from frame_lab import Lab, comes_true
 from lasting_open_vswitch import LastingOpenVSwitch
+
+
+# The tables that a switch fills by itself, with the kind that their cookies begin with.
+SELF_FILLED = {31: 0x0D, 32: 0x0C, 33: 0x0E, 34: 0x0F}
+
+
+def _is_in(flow: str, table: int) -> bool:
+    # Not where one says what it teaches.
+    return f", table={table}, " in flow
 
 
 class Meddler:
@@ -29,9 +39,11 @@ class Meddler:
     def flows(self) -> List[str]:
         """Those that the host made, without what they counted."""
         lines = self.ofctl("dump-flows", "--no-stats").splitlines()
-        return sorted(
-            line for line in lines if not any(f"table={n}," in line for n in range(31, 35))
-        )
+        return sorted(line for line in lines if not any(_is_in(line, n) for n in SELF_FILLED))
+
+    def learned(self, table: int) -> List[str]:
+        lines = self.ofctl("dump-flows", "--no-stats").splitlines()
+        return sorted(line for line in lines if _is_in(line, table))
 
     def groups(self) -> List[str]:
         return sorted(self.ofctl("dump-groups").splitlines()[1:])
@@ -71,6 +83,33 @@ def test_flows_and_groups_are_put_right(
     meddler.ofctl(command, *words)
     assert comes_true(lambda: (meddler.flows(), meddler.groups()) == before)
     assert f"somebody else changed flows or groups of the bridge {meddler.bridge}" in busy.log()
+
+
+def has_learned_all(meddler: Meddler, table: int) -> bool:
+    """Whether all that is in the table looks at an address, as what is learned does."""
+    return all(",dl_" in flow for flow in meddler.learned(table))
+
+
+def test_what_nobody_learned_goes(busy: Lab, meddler: Meddler) -> None:
+    """In whichever table, and however like what is learned."""
+    somebodys = "cookie=0x99,priority=65000,actions=drop"
+    of_another_port = "cookie={}abcdef,priority=100,actions=drop"
+    # There are no words for this field here.
+    of_the_first_port = "cookie={}000003,priority=100,ct_state=-trk,actions=drop"
+    planted = {31: somebodys, 32: of_another_port, 34: of_the_first_port, 33: somebodys}
+    for table, said in planted.items():
+        flow = said.format(f"{SELF_FILLED[table]:#x}00000000")
+        meddler.ofctl("add-flow", f"table={table},{flow}")
+        assert comes_true(partial(has_learned_all, meddler, table))
+    said = f"somebody else changed flows or groups of the bridge {meddler.bridge}"
+    assert busy.log().count(said) == 3
+
+
+def test_a_meter_goes(meddler: Meddler) -> None:
+    before = meddler.ofctl("dump-meters")
+    meddler.ofctl("add-meter", "meter=7,kbps,band=type=drop,rate=1")
+    meddler.ofctl("mod-meter", "meter=controller,pktps,burst,band=type=drop,rate=1,burst_size=1")
+    assert comes_true(lambda: meddler.ofctl("dump-meters") == before)
 
 
 def test_a_group_is_put_right(meddler: Meddler) -> None:

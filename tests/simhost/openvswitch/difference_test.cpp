@@ -8,10 +8,12 @@
 #include <vector>
 
 #include "planes/openvswitch/openflow/text.h"
+#include "planes/openvswitch/reconcile/present.h"
 #include "planes/openvswitch/reconcile/relearning.h"
 
 namespace {
 
+using simhost::openflow::Field;
 using simhost::openflow::Flow;
 using simhost::openflow::Group;
 using simhost::openflow::Learn;
@@ -20,6 +22,7 @@ using simhost::openvswitch::Difference;
 using simhost::openvswitch::difference;
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::UnorderedElementsAreArray;
 using Flows = std::vector<Flow>;
 using Groups = std::vector<Group>;
 
@@ -77,32 +80,57 @@ TEST(ADifference, TellsGroupsApartByTheirNumbers) {
   EXPECT_THAT(all.removed_groups, ElementsAre(1));
 }
 
+// Teaches where a frame's source is.
+Flow teacher(std::uint32_t place, std::uint16_t hard_timeout) {
+  auto teaches = flow(3, 1, 2);
+  Learn learn{.table = 6, .cookie = 7, .hard_timeout = hard_timeout, .specs = {}};
+  learn.specs.emplace_back(
+      simhost::openflow::LearnedMatch{.field = simhost::openflow::whole(Field::eth_dst),
+                                      .content = simhost::openflow::whole(Field::eth_src)});
+  learn.specs.emplace_back(simhost::openflow::LearnedLoad{
+      .destination = simhost::openflow::whole(Field::reg6), .content = place});
+  teaches.actions = {learn};
+  return teaches;
+}
+
+Flow learned_flow(std::uint64_t source, std::uint32_t place) {
+  Flow learned{.table = 6, .cookie = 7, .hard_timeout = 300};
+  learned.match.with(Field::eth_dst, source);
+  learned.actions = {simhost::openflow::set(Field::reg6, place)};
+  return learned;
+}
+
 TEST(ADifference, LeavesWhatWasLearnedByWantedFlowsAlone) {
-  Flow teaches = flow(3, 1, 2);
-  teaches.actions = {simhost::openflow::Clone{{Learn{.table = 6, .cookie = 0x10001, .specs = {}}}}};
-  auto const learned = flow(6, 9, 1, 0x10001);
-  auto const of_another = flow(6, 8, 1, 0x10002);
-  auto const elsewhere = flow(5, 8, 1, 0x10001);
-  auto const all = difference(Flows{teaches, learned, of_another, elsewhere}, Groups{},
-                              Flows{teaches}, Groups{});
-  EXPECT_THAT(all.removed_flows, ElementsAre(elsewhere, of_another));
+  auto teaches = teacher(1, 300);
+  teaches.actions = {simhost::openflow::Clone{teaches.actions}};
+  auto const learned = learned_flow(9, 1);
+  // How long it may stay was said otherwise when it was learned.
+  auto for_ever = learned_flow(8, 1);
+  for_ever.hard_timeout = 0;
+  auto of_another = learned_flow(7, 1);
+  of_another.cookie = 8;
+  auto elsewhere = learned_flow(7, 1);
+  elsewhere.table = 5;
+  auto before_all = learned_flow(7, 1);
+  before_all.priority = 6;
+  auto of_more = learned_flow(7, 1);
+  of_more.match.with(Field::in_port, 1);
+  auto of_all = learned_flow(7, 1);
+  of_all.match = {};
+  auto const that_says_otherwise = learned_flow(6, 2);
+  Flows const foreign{of_another, elsewhere, before_all, of_more, of_all, that_says_otherwise};
+  Flows present{teaches, learned, for_ever};
+  present.insert(present.end(), foreign.begin(), foreign.end());
+  auto const all = difference(present, Groups{}, Flows{teaches}, Groups{});
+  EXPECT_THAT(all.removed_flows, UnorderedElementsAreArray(foreign));
+  EXPECT_THAT(all.forgotten, IsEmpty());
   // When nobody teaches it any more, it goes.
   EXPECT_THAT(difference(Flows{teaches, learned}, Groups{}, Flows{}, Groups{}).removed_flows,
               ElementsAre(teaches, learned));
 }
 
-Flow teacher(std::uint32_t out, std::uint16_t hard_timeout) {
-  auto teaches = flow(3, 1, 2);
-  Learn learn{.table = 6, .cookie = 7, .hard_timeout = hard_timeout, .specs = {}};
-  learn.specs.emplace_back(simhost::openflow::LearnedLoad{
-      .destination = simhost::openflow::whole(simhost::openflow::Field::reg6), .content = out});
-  teaches.actions = {learn};
-  return teaches;
-}
-
 TEST(ADifference, ForgetsWhatIsLearnedOtherwiseNow) {
-  auto const learned = flow(6, 9, 1, 7);
-  Flows const present{teacher(1, 300), learned};
+  Flows const present{teacher(1, 300), learned_flow(9, 1)};
   auto const forgotten = [&](Flow const &wanted) {
     return difference(present, Groups{}, Flows{wanted}, Groups{}).forgotten;
   };
@@ -110,10 +138,43 @@ TEST(ADifference, ForgetsWhatIsLearnedOtherwiseNow) {
               ElementsAre(simhost::openvswitch::LearnedFlows{.table = 6, .cookie = 7}));
   // How long it stays makes it nothing else.
   EXPECT_THAT(forgotten(teacher(1, 60)), IsEmpty());
+  // All of it goes at once.
+  EXPECT_THAT(difference(present, Groups{}, Flows{teacher(2, 300)}, Groups{}).removed_flows,
+              IsEmpty());
+}
+
+TEST(WhatIsThere, DiffersFromAllThatIsWantedIfItSaysMore) {
+  using simhost::openflow::FlowEntry;
+  using simhost::openvswitch::present_of;
+  auto const read = [](Flow const &flow, std::string foreign = "", bool has_match = true) {
+    FlowEntry entry;
+    entry.flow = flow;
+    entry.foreign = std::move(foreign);
+    entry.has_match = has_match;
+    return entry;
+  };
+  auto drops = flow(1, 1, 1);
+  drops.actions = {};
+  auto const two = flow(2, 1, 1, 5);
+  auto const other = flow(2, 2, 1, 5);
+  Flows const wanted{drops, two, other};
+  std::vector<FlowEntry> const entries{read(drops, "instruction 3"), read(two),
+                                       read(other, "a field", false)};
+  simhost::openflow::GroupEntry entry;
+  entry.group = group(1, 1);
+  entry.foreign = "a property";
+  auto const present = present_of(entries, std::vector{entry});
+  auto const all = difference(present.flows, present.groups, wanted, Groups{group(1, 1)});
+  EXPECT_THAT(all.changed_flows, ElementsAre(drops));
+  EXPECT_THAT(all.changed_groups, ElementsAre(group(1, 1)));
+  // Whatever is at places that nobody can say goes, and what has its cookie comes back.
+  EXPECT_THAT(present.unplaced,
+              ElementsAre(simhost::openvswitch::LearnedFlows{.table = 2, .cookie = 5}));
+  EXPECT_THAT(all.added_flows, ElementsAre(two, other));
+  EXPECT_THAT(all.removed_flows, IsEmpty());
 }
 
 TEST(WhatWasLearned, IsLearnedAnewAsItWouldBeNow) {
-  using simhost::openflow::Field;
   using simhost::openvswitch::relearned;
   using simhost::openvswitch::Teachers;
   Learn learn{.table = 6, .priority = 5, .cookie = 7, .hard_timeout = 300, .specs = {}};

@@ -337,6 +337,20 @@ TEST(OpenFlow, LimitsWhatFlowsSendUp) {
   EXPECT_LT(received, kFrames / 2);
 }
 
+TEST(OpenFlow, HasNoMeterButThatOfWhatFlowsSendUp) {
+  Bridge const bridge;
+  auto &lab = Lab::shared();
+  auto const target = "unix:" + bridge.socket().native();
+  Connection connection(bridge.socket(), soon());
+  connection.set_async({.group_and_meter_changes = true}, soon());
+  lab.ovs_ofctl({"-OOpenFlow15", "add-meter", target, "meter=7,kbps,band=type=drop,rate=9"});
+  EXPECT_TRUE(std::holds_alternative<GroupsOrMetersChanged>(next_event(connection)));
+  connection.limit_packet_ins(10, soon());
+  auto const meters = lab.ovs_ofctl({"-OOpenFlow15", "dump-meters", target});
+  EXPECT_THAT(meters, testing::HasSubstr("meter=controller pktps burst"));
+  EXPECT_THAT(meters, testing::Not(testing::HasSubstr("meter=7")));
+}
+
 TEST(OpenFlow, IsToldOfAFlowThatGoes) {
   Bridge const bridge;
   Connection connection(bridge.socket(), soon());
@@ -429,15 +443,15 @@ TEST(OpenFlow, MonitorsFlowsThatItChangesItself) {
 TEST(OpenFlow, IsToldOfGroupsThatOthersChange) {
   Bridge const bridge;
   Connection connection(bridge.socket(), soon());
-  connection.set_async({.group_changes = true}, soon());
+  connection.set_async({.group_and_meter_changes = true}, soon());
   Group const group{.id = 1, .type = GroupType::all, .buckets = {}};
   connection.change(to_add({group}, {}), soon());
   EXPECT_FALSE(connection.next_event());
   Connection other(bridge.socket(), soon());
   other.change({GroupChange{.command = GroupCommand::modify, .group = group}}, soon());
-  EXPECT_TRUE(std::holds_alternative<GroupsChanged>(next_event(connection)));
+  EXPECT_TRUE(std::holds_alternative<GroupsOrMetersChanged>(next_event(connection)));
   other.change({GroupChange{.command = GroupCommand::remove, .group = group}}, soon());
-  EXPECT_TRUE(std::holds_alternative<GroupsChanged>(next_event(connection)));
+  EXPECT_TRUE(std::holds_alternative<GroupsOrMetersChanged>(next_event(connection)));
 }
 
 TEST(OpenFlow, IsToldOfAFrameThatIsRefused) {

@@ -111,7 +111,7 @@ bool Connection::is_handled(Message const &message, Xid first_xid, Xid last_xid)
       events_.emplace_back(take_flow_removed(in));
       return true;
     case MessageType::request_forward:
-      events_.emplace_back(GroupsChanged{});
+      events_.emplace_back(GroupsOrMetersChanged{});
       return true;
     case MessageType::port_status:
       events_.emplace_back(take_port_status(in));
@@ -181,7 +181,7 @@ void Connection::order(std::function<void(Writer &, Xid)> const &put, Deadline d
 }
 
 void Connection::limit_packet_ins(std::uint32_t rate, Deadline deadline) {
-  order([&](Writer &out, Xid xid) { put_controller_meter(out, xid, rate); }, deadline);
+  order([&](Writer &out, Xid xid) { put_only_meter(out, xid, rate); }, deadline);
 }
 
 void Connection::set_async(AsyncMessages const &wanted, Deadline deadline) {

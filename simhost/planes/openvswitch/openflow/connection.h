@@ -51,7 +51,8 @@ class Connection {
   void change(Changes const &changes, Deadline deadline);
   /// Returns when the switch is done with all that it was sent.
   void barrier(Deadline deadline);
-  /// From now on flows send up no more than so many frames a second, however many they are sent.
+  /// From now on flows send up no more than so many frames a second, however many they are sent,
+  /// and there is no other meter.
   void limit_packet_ins(std::uint32_t rate, Deadline deadline);
   /// From now on it sends these by itself.
   void set_async(AsyncMessages const &wanted, Deadline deadline);

@@ -122,11 +122,11 @@ struct FlowUpdate : ReadFlow {
   FlowRemoved::Reason reason{};  // of a removal
 };
 
-/// Somebody else changed groups; how, is to be asked.
-struct GroupsChanged {};
+/// Somebody else changed groups or meters; how, is to be asked.
+struct GroupsOrMetersChanged {};
 
 /// What a switch sends by itself. An ErrorReply is of a message that nobody waits for a reply to.
 using Event =
-    std::variant<PacketIn, FlowRemoved, PortStatus, FlowUpdate, GroupsChanged, ErrorReply>;
+    std::variant<PacketIn, FlowRemoved, PortStatus, FlowUpdate, GroupsOrMetersChanged, ErrorReply>;
 
 }  // namespace simhost::openflow

@@ -34,7 +34,7 @@ struct AsyncMessages {
   bool packet_in = false;
   bool port_status = false;
   bool flow_removed = false;
-  bool group_changes = false;  ///< by others
+  bool group_and_meter_changes = false;  ///< by others
 };
 
 }  // namespace simhost::openflow

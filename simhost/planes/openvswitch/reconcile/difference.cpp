@@ -8,6 +8,8 @@
 #include <utility>
 #include <variant>
 
+#include "planes/openvswitch/reconcile/relearning.h"
+
 namespace simhost::openvswitch {
 namespace {
 
@@ -113,12 +115,16 @@ Difference difference(std::span<Flow const> present_flows, std::span<Group const
           all.changed_groups.push_back(wanted);
         }
       });
-  auto const learned = learned_by(wanted_flows);
-  all.forgotten = learned_otherwise(learned_by(present_flows), learned);
+  all.forgotten = learned_otherwise(learned_by(present_flows), learned_by(wanted_flows));
+  Teachers const teachers(wanted_flows);
+  auto const stays_or_is_forgotten = [&](Flow const &flow) {
+    LearnedFlows const known{.table = flow.table, .cookie = flow.cookie};
+    return teachers.teach(flow) || std::ranges::binary_search(all.forgotten, known);
+  };
   side_by_side(
       present_flows, wanted_flows, [](Flow const &flow) { return place(flow); },
       [&](Flow const &flow) {
-        if (!learned.contains({.table = flow.table, .cookie = flow.cookie})) {
+        if (!stays_or_is_forgotten(flow)) {
           all.removed_flows.push_back(flow);
         }
       },

@@ -37,9 +37,8 @@ struct Difference {
   [[nodiscard]] bool empty() const;
 };
 
-/// What the switch learned by a wanted flow that teaches as it did stays: what is in the table of
-/// one of their Learn actions, with its cookie. No two flows of either list have one place, and no
-/// two groups one number.
+/// What the switch learned by a wanted flow that teaches as it did stays: see Teachers. No two
+/// flows of either list have one place, and no two groups one number.
 Difference difference(std::span<openflow::Flow const> present_flows,
                       std::span<openflow::Group const> present_groups,
                       std::span<openflow::Flow const> wanted_flows,

@@ -73,6 +73,14 @@ std::optional<Learn> Teachers::how_learned(LearnedFlows const &learned) const {
   return is_one_way ? std::optional(*ways.front()) : std::nullopt;
 }
 
+bool Teachers::teach(Flow const &flow) const {
+  auto const found = ways_.find({.table = flow.table, .cookie = flow.cookie});
+  return found != ways_.end() && std::ranges::any_of(found->second, [&](Learn const *way) {
+           auto const taught = relearned(*way, flow);
+           return taught && place(*taught) == place(flow) && taught->actions == flow.actions;
+         });
+}
+
 std::optional<Flow> relearned(Learn const &learn, Flow const &before) {
   Flow flow;
   flow.table = learn.table;

@@ -20,6 +20,9 @@ class Teachers {
   /// The one way in which some of them teach those, whatever their limits; nothing if there are
   /// several.
   [[nodiscard]] std::optional<openflow::Learn> how_learned(LearnedFlows const &learned) const;
+  /// Whether some frame makes one of them teach that flow. How long it stays is left out: it may
+  /// have been learned when that was said otherwise.
+  [[nodiscard]] bool teach(openflow::Flow const &flow) const;
 
  private:
   void add(openflow::Actions const &actions);

@@ -164,20 +164,21 @@ void put_bundle_add(Writer &out, Xid xid, std::uint32_t bundle, Change const &ch
   });
 }
 
-void put_controller_meter(Writer &out, Xid xid, std::uint32_t rate) {
+void put_only_meter(Writer &out, Xid xid, std::uint32_t rate) {
   enum class Command : std::uint16_t { add = 0, remove = 2 };
   constexpr std::uint32_t kControllerMeter = 0xfffffffe;
+  constexpr std::uint32_t kAllMeters = 0xffffffff;
   constexpr std::uint16_t kPacketsWithBurst = 0x2 | 0x4;
   constexpr std::uint16_t kDropBand = 1;
   constexpr std::uint16_t kBandBytes = 16;
-  auto const put_head = [&](Command command) {
+  auto const put_head = [&](Command command, std::uint32_t meter) {
     out.u16(static_cast<std::uint16_t>(command));
     out.u16(kPacketsWithBurst);
-    out.u32(kControllerMeter);
+    out.u32(meter);
   };
-  put_message(out, MessageType::meter_mod, xid, [&] { put_head(Command::remove); });
+  put_message(out, MessageType::meter_mod, xid, [&] { put_head(Command::remove, kAllMeters); });
   put_message(out, MessageType::meter_mod, xid, [&] {
-    put_head(Command::add);
+    put_head(Command::add, kControllerMeter);
     out.u16(kDropBand);
     out.u16(kBandBytes);
     out.u32(rate);
@@ -202,7 +203,7 @@ void put_set_async(Writer &out, Xid xid, AsyncMessages const &wanted) {
     put(kPacketIn + 1, wanted.packet_in ? kAllReasons : 0);
     put(kPortStatus + 1, wanted.port_status ? 0x7 : 0);
     put(kFlowRemoved + 1, wanted.flow_removed ? kAllReasons : 0);
-    put(kRequestForward + 1, wanted.group_changes ? 0x1 : 0);
+    put(kRequestForward + 1, wanted.group_and_meter_changes ? 0x3 : 0);
   });
 }
 

@@ -25,8 +25,8 @@ void put_bundle_control(Writer &out, Xid xid, std::uint32_t bundle, BundleContro
 /// Throws like put_change.
 void put_bundle_add(Writer &out, Xid xid, std::uint32_t bundle, Change const &change);
 
-/// Removes the meter of what goes up to controllers, then adds it: so many frames a second.
-void put_controller_meter(Writer &out, Xid xid, std::uint32_t rate);
+/// Removes all meters, then adds that of what goes up to controllers: so many frames a second.
+void put_only_meter(Writer &out, Xid xid, std::uint32_t rate);
 /// Which messages the switch sends by itself.
 void put_set_async(Writer &out, Xid xid, AsyncMessages const &wanted);
 
