@@ -1,4 +1,4 @@
-"""The layers of the simulated host: each compiles with those below it and with none above."""
+"""The layers of the simulated host: each finds those below it and none above."""
 
 import json
 import os
@@ -131,20 +131,24 @@ def command_of(layer: str) -> List[str]:
     return words[: words.index("-o")]
 
 
-def compiled(
+def preprocessed(
     layer: str, tmp_path: Path, *headers: str, text: str = ""
 ) -> "subprocess.CompletedProcess[str]":
+    """What becomes of a source of a layer that includes headers: whether they are found there.
+
+    That they compile there the build shows.
+    """
     probe = tmp_path / "probe.cpp"
     lines = [f'#include "{header}"\n' for header in headers]
     probe.write_text("".join(lines) + text, encoding="utf-8")
-    command = [*command_of(layer), "-fsyntax-only", str(probe)]
+    command = [*command_of(layer), "-E", "-o", os.devnull, str(probe)]
     return subprocess.run(command, cwd=BUILD, stderr=subprocess.PIPE, text=True, check=False)
 
 
 @pytest.mark.parametrize("layer", BELOW)
 def test_the_layers_below_are_found(layer: str, tmp_path: Path) -> None:
     headers = [HEADERS[layer], *(HEADERS[below] for below in BELOW[layer])]
-    done = compiled(layer, tmp_path, *headers)
+    done = preprocessed(layer, tmp_path, *headers)
     assert done.returncode == 0, done.stderr
 
 
@@ -153,7 +157,7 @@ def found(layer: str, tmp_path: Path) -> List[str]:
     lines = [
         f'#if __has_include("{one}")\n#error found: {one}.\n#endif' for one in HEADERS.values()
     ]
-    done = compiled(layer, tmp_path, text="\n".join(lines))
+    done = preprocessed(layer, tmp_path, text="\n".join(lines))
     headers = re.findall(r"#error found: (\S+)\.$", done.stderr, re.MULTILINE)
     return [one for one, header in HEADERS.items() if header in headers]
 
@@ -164,14 +168,14 @@ def test_no_other_layer_is_found(layer: str, tmp_path: Path) -> None:
 
 
 def test_the_command_finds_what_any_program_does(tmp_path: Path) -> None:
-    assert compiled("cli", tmp_path, API).returncode == 0
+    assert preprocessed("cli", tmp_path, API).returncode == 0
 
 
 def test_queries_are_the_storage_s_own(tmp_path: Path) -> None:
-    assert compiled("storage", tmp_path, PRIVATE).returncode == 0
+    assert preprocessed("storage", tmp_path, PRIVATE).returncode == 0
     for layer, below in BELOW.items():
         if "storage" in below:
-            done = compiled(layer, tmp_path, PRIVATE)
+            done = preprocessed(layer, tmp_path, PRIVATE)
             assert f"{PRIVATE}: No such file or directory" in done.stderr, layer
 
 
