@@ -1,8 +1,9 @@
 """What Ninja knows of a build folder: the files that each object and each target is made of."""
 
+import functools
 import subprocess
 from pathlib import Path
-from typing import Dict, Iterable, List, Set
+from typing import Dict, Iterable, List, Optional, Set
 
 
 def _ask(folder: Path, *question: str) -> List[str]:
@@ -16,12 +17,18 @@ def made_of(folder: Path, root: Path) -> Dict[str, Set[Path]]:
 
     The objects have the names that Ninja gives them; what a folder has not built is not there.
     """
+
+    @functools.lru_cache(maxsize=None)  # most objects are made of the same headers
+    def below_root(name: str) -> Optional[Path]:
+        path = (folder / name).resolve()
+        return path if root in path.parents else None
+
     found: Dict[str, Set[Path]] = {}
     files: Set[Path] = set()
     for line in _ask(folder, "deps"):
         if line.startswith("    "):
-            path = (folder / line.strip()).resolve()
-            if root in path.parents:
+            path = below_root(line.strip())
+            if path is not None:
                 files.add(path)
         elif line:
             made, _, state = line.partition(": ")
