@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include "planes/openvswitch/transport/unix_stream.h"
+#include "planes/openvswitch/transport/stream.h"
 
 namespace simhost::daemon {
 namespace {
@@ -32,9 +32,9 @@ Descriptor listening(events::UnixAddress const &address, std::filesystem::path c
 
 struct Server::Client {
   Client(std::filesystem::path const &path, Descriptor accepted)
-      : stream(path, std::move(accepted)) {}
+      : stream(path.native(), std::move(accepted)) {}
 
-  openvswitch::UnixStream stream;
+  openvswitch::Stream stream;
   events::Loop::Watch watch;
   events::Loop::Timer too_late;
   openvswitch::Lines lines;

@@ -10,7 +10,7 @@
 #include "lab.h"
 #include "planes/openvswitch/openflow/codec/messages.h"
 #include "planes/openvswitch/openflow/codec/requests.h"
-#include "planes/openvswitch/transport/unix_stream.h"
+#include "planes/openvswitch/transport/stream.h"
 #include "samples.h"
 
 namespace {
@@ -30,7 +30,7 @@ void write_seed(std::filesystem::path const &folder, Bytes const &bytes) {
 
 /// What comes until the last request has its reply, which is `end` in it.
 template <typename IsEnd>
-Bytes received(openvswitch::UnixStream &stream, IsEnd const &is_end) {
+Bytes received(openvswitch::Stream &stream, IsEnd const &is_end) {
   Bytes all;
   while (!is_end(all)) {
     stream.wait_to_receive(soon());
@@ -74,7 +74,7 @@ void put_questions(openflow::Writer &out) {
 void write_openflow(std::filesystem::path const &folder) {
   constexpr openflow::Xid kLast = 99;
   Bridge const bridge(2);
-  openvswitch::UnixStream stream(bridge.socket(), soon());
+  openvswitch::Stream stream(bridge.socket(), soon());
   openflow::Writer out;
   openflow::put_hello(out, 1);
   put_samples(out);
@@ -97,7 +97,7 @@ void write_openflow(std::filesystem::path const &folder) {
 void write_ovsdb(std::filesystem::path const &folder) {
   Bridge const bridge(1);
   auto const port = bridge.name() + "p1";
-  openvswitch::UnixStream stream(Lab::shared().database_socket(), soon());
+  openvswitch::Stream stream(Lab::shared().database_socket(), soon());
   auto const ask = [&](std::string const &text, std::string const &end) {
     stream.send({reinterpret_cast<std::uint8_t const *>(text.data()), text.size()});
     write_seed(folder, received(stream, [&](Bytes const &bytes) {

@@ -22,7 +22,7 @@ HEADERS = {
     "model": "model/plane.h",
     "planes/stored": "planes/stored/stored_plane.h",
     "events": "events/loop.h",
-    "planes/openvswitch/transport": "planes/openvswitch/transport/unix_stream.h",
+    "planes/openvswitch/transport": "planes/openvswitch/transport/stream.h",
     "planes/openvswitch/openflow": "planes/openvswitch/openflow/connection.h",
     "planes/openvswitch/ovsdb": "planes/openvswitch/ovsdb/client.h",
     "planes/openvswitch/rows": "planes/openvswitch/rows/rows.h",
@@ -38,6 +38,7 @@ HEADERS = {
     "scenario": "scenario/scenario.h",
     "abi": "abi/host.h",
     "daemon": "daemon/daemon.h",
+    "fabric/cluster": "fabric/cluster/cluster.h",
     "cli": "cli/commands.h",
 }
 # The state, and the compiler of its switches.
@@ -112,7 +113,12 @@ BELOW: Dict[str, List[str]] = {
     "planes/openvswitch/caller": CALLER,
     "scenario": ["base", "storage", "clock", "faults", "model"],
     "abi": [*CALLER, "faults", "planes/stored", "planes/openvswitch/caller", "scenario"],
-    "daemon": [one for one in HEADERS if one not in ("daemon", "cli")],
+    "daemon": [one for one in HEADERS if one not in ("daemon", "cli") and "fabric" not in one],
+    "fabric/cluster": [
+        "events",
+        "planes/openvswitch/transport",
+        "planes/openvswitch/ovsdb",
+    ],
     # Of the layers below, only what any program may use.
     "cli": [],
 }

@@ -12,7 +12,7 @@
 #include <string_view>
 #include <vector>
 
-#include "planes/openvswitch/transport/unix_stream.h"
+#include "planes/openvswitch/transport/stream.h"
 #include "temporary_folder.h"
 
 namespace {
@@ -23,7 +23,7 @@ using simhost::events::Clock;
 using simhost::events::Loop;
 using simhost::openvswitch::Deadline;
 using simhost::openvswitch::Json;
-using simhost::openvswitch::UnixStream;
+using simhost::openvswitch::Stream;
 using namespace std::chrono_literals;
 
 constexpr auto kPatience = 20s;
@@ -47,8 +47,8 @@ struct AServer : testing::Test {
         patience);
   }
 
-  [[nodiscard]] UnixStream client(std::string_view question) const {
-    UnixStream stream(simhost::openvswitch::socket_of(state), Deadline::clock::now() + kPatience);
+  [[nodiscard]] Stream client(std::string_view question) const {
+    Stream stream(simhost::openvswitch::socket_of(state), Deadline::clock::now() + kPatience);
     stream.send({reinterpret_cast<std::uint8_t const *>(question.data()), question.size()});
     return stream;
   }
@@ -78,7 +78,7 @@ struct AServer : testing::Test {
   Reply kept;
 };
 
-bool is_dropped(UnixStream const &client) {
+bool is_dropped(Stream const &client) {
   pollfd polled{.fd = client.fd(), .events = 0, .revents = 0};
   return poll(&polled, 1, 0) == 1 && (polled.revents & POLLHUP) != 0;
 }
@@ -112,7 +112,7 @@ TEST_F(AServer, LetsQuestionsWaitUntilTheirClientHasTakenItsReply) {
 
 TEST_F(AServer, GoesOnWhenAClientIsGoneBeforeItsReply) {
   listen();
-  std::optional<UnixStream> gone(client("{\"ask\": \"later\"}\n"));
+  std::optional<Stream> gone(client("{\"ask\": \"later\"}\n"));
   ASSERT_TRUE(comes([&] { return static_cast<bool>(kept); }));
   gone.reset();
   kept({{"text", large_text()}});

@@ -199,7 +199,7 @@ TEST(OpenFlow, ChangesNothingThroughAClientThatDiesBeforeTheCommit) {
   constexpr std::uint32_t kBundle = 1;
   constexpr Xid kXid = 1;
   {
-    openvswitch::UnixStream stream(bridge.socket(), soon());
+    openvswitch::Stream stream(bridge.socket(), soon());
     Writer out;
     put_hello(out, kXid);
     put_bundle_control(out, kXid, kBundle, BundleControl::open);

@@ -12,7 +12,7 @@
 #include "planes/openvswitch/openflow/change.h"
 #include "planes/openvswitch/openflow/replies.h"
 #include "planes/openvswitch/openflow/requests.h"
-#include "planes/openvswitch/transport/unix_stream.h"
+#include "planes/openvswitch/transport/stream.h"
 
 namespace simhost::openflow {
 
@@ -93,7 +93,7 @@ class Connection {
   template <typename Item, typename Put, typename Take>
   std::vector<Item> ask(Put const &put, Take const &take, Deadline deadline);
 
-  openvswitch::UnixStream stream_;
+  openvswitch::Stream stream_;
   std::vector<std::uint8_t> received_;
   std::size_t taken_ = 0;  // of that
   std::deque<Event> events_;

@@ -165,6 +165,10 @@ void Client::monitor(Selected const &selected, Deadline deadline) {
       call("monitor_cond", Json::array({database_, kMonitor, std::move(tables)}), deadline));
 }
 
+std::string Client::version(Deadline deadline) {
+  return member_text(call("get_schema", Json::array({database_}), deadline), "version");
+}
+
 bool Client::lock(std::string const &name, Deadline deadline) {
   auto const result = call("lock", Json::array({name}), deadline);
   auto const found = result.is_object() ? result.find("locked") : result.end();

@@ -1,4 +1,4 @@
-// A client of ovsdb-server: JSON-RPC over its unix socket.
+// A client of ovsdb-server: JSON-RPC over a stream.
 #pragma once
 
 #include <cstdint>
@@ -10,7 +10,7 @@
 
 #include "planes/openvswitch/ovsdb/json.h"
 #include "planes/openvswitch/ovsdb/replica.h"
-#include "planes/openvswitch/transport/unix_stream.h"
+#include "planes/openvswitch/transport/stream.h"
 
 namespace simhost::ovsdb {
 
@@ -54,6 +54,9 @@ class Client {
  public:
   /// Of a database such as "Open_vSwitch". Throws Disconnected.
   Client(std::filesystem::path const &socket, std::string database, Deadline deadline);
+  /// Likewise, over a stream to the server.
+  Client(openvswitch::Stream stream, std::string database)
+      : stream_(std::move(stream)), database_(std::move(database)) {}
 
   /// For poll(2): readable when there is something to receive.
   [[nodiscard]] int fd() const { return stream_.fd(); }
@@ -75,6 +78,8 @@ class Client {
   /// Fills the replica, and keeps it up to date from now on. Once in a client's life.
   void monitor(Selected const &selected, Deadline deadline);
   [[nodiscard]] Replica const &replica() const { return replica_; }
+  /// Of the database's schema, such as "1.0.0".
+  std::string version(Deadline deadline);
   /// Returns when the database has sent something by itself.
   void wait_for_news(Deadline deadline);
 
@@ -91,7 +96,7 @@ class Client {
   /// Replies to an echo, keeps an event; returns whether it was such a message.
   bool is_handled(Json const &message);
 
-  openvswitch::UnixStream stream_;
+  openvswitch::Stream stream_;
   std::string database_;
   Splitter splitter_;
   std::deque<Event> events_;

@@ -9,7 +9,7 @@
 #include <span>
 #include <stdexcept>
 
-#include "planes/openvswitch/transport/unix_stream.h"
+#include "planes/openvswitch/transport/stream.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -19,7 +19,7 @@ using Json = nlohmann::json;
 // More is no reply of a program in its right mind.
 constexpr std::size_t kLongestReply = std::size_t{16} << 20;
 
-Json reply_from(UnixStream &stream, Deadline deadline) {
+Json reply_from(Stream &stream, Deadline deadline) {
   std::vector<std::uint8_t> bytes;
   while (bytes.size() < kLongestReply) {
     stream.wait_to_receive(deadline);
@@ -55,7 +55,7 @@ std::filesystem::path find_control_socket(std::filesystem::path const &folder) {
 
 std::string ask_control(std::filesystem::path const &socket, std::string const &command,
                         std::vector<std::string> const &words, Deadline deadline) {
-  UnixStream stream(socket, deadline);
+  Stream stream(socket, deadline);
   auto const question = Json{{"id", 0}, {"method", command}, {"params", words}}.dump();
   stream.send(std::span(reinterpret_cast<std::uint8_t const *>(question.data()), question.size()));
   auto const reply = reply_from(stream, deadline);

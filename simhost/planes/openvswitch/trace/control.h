@@ -14,7 +14,7 @@ namespace simhost::openvswitch {
 std::filesystem::path find_control_socket(std::filesystem::path const &folder);
 
 /// What it says to a command. Throws std::runtime_error with its reason if it refuses it, and what
-/// UnixStream does.
+/// Stream does.
 std::string ask_control(std::filesystem::path const &socket, std::string const &command,
                         std::vector<std::string> const &words, Deadline deadline);
 

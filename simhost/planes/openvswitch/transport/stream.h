@@ -1,4 +1,4 @@
-// A stream to another process over a unix socket, which never makes its owner wait unless asked to.
+// A stream to another process over a socket, which never makes its owner wait unless asked to.
 #pragma once
 
 #include <cstddef>
@@ -15,7 +15,7 @@
 
 namespace simhost::openvswitch {
 
-/// The other side cannot be reached, or is gone. what() names the socket and says why.
+/// The other side cannot be reached, or is gone. what() names it and says why.
 class Disconnected : public std::runtime_error {
  public:
   using runtime_error::runtime_error;
@@ -27,13 +27,13 @@ class TimedOut : public std::runtime_error {
   using runtime_error::runtime_error;
 };
 
-class UnixStream {
+class Stream {
  public:
-  /// Throws Disconnected, and TimedOut where nobody accepts.
-  UnixStream(std::filesystem::path path, Deadline deadline);
-  /// Over a socket that somebody has connected to at `path`.
-  UnixStream(std::filesystem::path path, events::Descriptor accepted)
-      : path_(std::move(path)), socket_(std::move(accepted)) {}
+  /// To the unix socket at `path`. Throws Disconnected, and TimedOut where nobody accepts.
+  Stream(std::filesystem::path const &path, Deadline deadline);
+  /// Over a socket that is connected already, and does not block; `name` is the other side's.
+  Stream(std::string name, events::Descriptor connected)
+      : name_(std::move(name)), socket_(std::move(connected)) {}
 
   /// For poll(2): readable when there is something to receive.
   [[nodiscard]] int fd() const { return socket_.number(); }
@@ -53,7 +53,7 @@ class UnixStream {
   void flush();
   [[noreturn]] void fail(int error) const;
 
-  std::filesystem::path path_;
+  std::string name_;
   events::Descriptor socket_;
   std::vector<std::uint8_t> unsent_;
   std::size_t sent_ = 0;  // of those

@@ -1,4 +1,4 @@
-#include "planes/openvswitch/transport/unix_stream.h"
+#include "planes/openvswitch/transport/stream.h"
 
 #include <poll.h>
 #include <sys/socket.h>
@@ -35,31 +35,31 @@ events::UnixAddress address_of(std::filesystem::path const &path) {
 
 }  // namespace
 
-UnixStream::UnixStream(std::filesystem::path path, Deadline deadline)
-    : path_(std::move(path)), socket_(make_socket()) {
-  auto const address = address_of(path_);
+Stream::Stream(std::filesystem::path const &path, Deadline deadline)
+    : name_(path.native()), socket_(make_socket()) {
+  auto const address = address_of(path);
   while (::connect(fd(), address.get(), address.size()) != 0) {
     // A full backlog tells nobody when there is room again.
     if (errno != EAGAIN && errno != EINTR) {
       fail(errno);
     }
     if (Deadline::clock::now() >= deadline) {
-      throw TimedOut(path_.native() + ": nobody accepts the connection in time");
+      throw TimedOut(name_ + ": nobody accepts the connection in time");
     }
     std::this_thread::sleep_for(std::chrono::milliseconds(1));
   }
 }
 
-void UnixStream::fail(int error) const {
-  throw Disconnected(path_.native() + ": " + error_words(error));
+void Stream::fail(int error) const {
+  throw Disconnected(name_ + ": " + error_words(error));
 }
 
-void UnixStream::send(std::span<std::uint8_t const> bytes) {
+void Stream::send(std::span<std::uint8_t const> bytes) {
   unsent_.insert(unsent_.end(), bytes.begin(), bytes.end());
   flush();
 }
 
-void UnixStream::flush() {
+void Stream::flush() {
   while (has_unsent()) {
     auto const count =
         ::send(fd(), unsent_.data() + sent_, unsent_.size() - sent_, MSG_NOSIGNAL | MSG_DONTWAIT);
@@ -75,7 +75,7 @@ void UnixStream::flush() {
   sent_ = 0;
 }
 
-bool UnixStream::receive(std::vector<std::uint8_t> &to) {
+bool Stream::receive(std::vector<std::uint8_t> &to) {
   std::array<std::uint8_t, kChunk> chunk{};
   auto const count = ::recv(fd(), chunk.data(), chunk.size(), MSG_DONTWAIT);
   if (count < 0 && (errno == EAGAIN || errno == EINTR)) {
@@ -85,13 +85,13 @@ bool UnixStream::receive(std::vector<std::uint8_t> &to) {
     fail(errno);
   }
   if (count == 0) {
-    throw Disconnected(path_.native() + ": the other side closed the connection");
+    throw Disconnected(name_ + ": the other side closed the connection");
   }
   to.insert(to.end(), chunk.begin(), chunk.begin() + count);
   return true;
 }
 
-void UnixStream::wait_to_receive(Deadline deadline) {
+void Stream::wait_to_receive(Deadline deadline) {
   while (true) {
     flush();
     pollfd polled{fd(), static_cast<short>(POLLIN | (has_unsent() ? POLLOUT : 0)), 0};
@@ -103,7 +103,7 @@ void UnixStream::wait_to_receive(Deadline deadline) {
       return;
     }
     if (ready == 0 && Deadline::clock::now() >= deadline) {
-      throw TimedOut(path_.native() + ": no reply in time");
+      throw TimedOut(name_ + ": no reply in time");
     }
   }
 }
