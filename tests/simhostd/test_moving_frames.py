@@ -70,6 +70,26 @@ def test_an_uplink_fails_and_frames_go_on(lab: Lab) -> None:
     assert "sends over nic0" in lab.ctl("show")
 
 
+def test_what_the_network_floods_to_all_uplinks_comes_once(lab: Lab) -> None:
+    addresses = [f"02:00:00:00:55:{number:02x}" for number in range(8)]
+    said = [{"mac": address, "type": "static"} for address in addresses]
+    lab.set_port("lab", "a", addresses=said)
+    near, far = lab.client("lab", "a"), lab.network("nic0", "nic1").client()
+    assert near.comes_to_reach(far)
+    uplinks = ["nic0", "nic1"]
+    explicit = {"balance": "explicit", "active": ["nic0"], "standby": ["nic1"]}
+    for teaming in explicit, {"balance": "mac", "active": uplinks}, {"balance": "port"}:
+        lab.apply({"switches": [{"alias": "lab", "teaming": teaming}]})
+        lab.have_counted()
+        sent = [frame(address, far.mac, payload=b"once" * 12) for address in addresses]
+        # No switch out there has ever heard of these.
+        for one in sent:
+            far.send(one)
+        for one in sent:
+            near.expect(one)
+        near.expect_none(lambda came: came in sent)
+
+
 def test_an_uplink_that_the_host_switches_off_is_off(lab: Lab) -> None:
     far, near = lab.network("nic0", "nic1").client(), lab.client("lab", "a")
     assert near.comes_to_reach(far)

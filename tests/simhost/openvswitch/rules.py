@@ -4,7 +4,7 @@ nothing, all of whose links are up."""
 
 from collections import Counter
 from dataclasses import dataclass
-from itertools import chain
+from itertools import chain, combinations
 from typing import (
     Any,
     Counter as Counts,
@@ -23,6 +23,9 @@ from frames import TAG, TAG_TYPES, Copy, Frame, Tag, Tags
 
 # The tag of the VLAN that a frame is in, and those that are left.
 Entered = Tuple[Tag, Tags]
+
+# Uplinks, the first one first.
+Order = Tuple[str, ...]
 
 GREATEST_VLAN = 4094
 LARGEST_TAGS = 2
@@ -217,25 +220,41 @@ class Rules:
 
     # Teams
 
+    def _balance(self, port: str) -> str:
+        teaming = self.ports[port].get("teaming", self.switch.get("teaming", {}))
+        return str(teaming.get("balance", "port"))
+
     def uplinks_of(self, port: str) -> List[str]:
         """Where a port's frames may go: one of them, the first if the balance has it so."""
         teaming = self.ports[port].get("teaming", self.switch.get("teaming", {}))
         named = teaming.get("active", []) + teaming.get("standby", [])
         usable = named or self.uplinks
         used = usable[: len(teaming.get("active", [])) or (1 if named else len(usable))]
-        balance = teaming.get("balance", "port")
+        balance = self._balance(port)
         if balance in ("mac", "ip") or not used:
             return used
         first = 0 if balance in ("explicit", "none") else self.numbers[port] % len(used)
         return [used[first]]
 
-    def receives_at(self, port: str, uplink: str, may_be_a_copy: bool) -> bool:
-        """Whether what comes in at an uplink is for a port."""
-        teaming = self.ports[port].get("teaming", self.switch.get("teaming", {}))
+    def receives_at(self, port: str, uplink: str, choosing: Optional[Set[Order]]) -> bool:
+        """Whether what comes in at an uplink is for a port; what is for a client, for those whose
+        sources choose that uplink for it."""
         uplinks = self.uplinks_of(port)
-        if teaming.get("balance") == "ip" or not may_be_a_copy:
+        if self._balance(port) == "ip":
             return uplink in uplinks
+        if self._balance(port) == "mac" and choosing is not None and len(uplinks) > 1:
+            return uplink in uplinks and (*uplinks,) in choosing
         return uplinks[:1] == [uplink]
+
+    def _choosing(self, place: Optional[str]) -> Iterator[Optional[Set[Order]]]:
+        """By which orders of uplinks a frame for a client may have come in: nobody here knows what
+        is made of its address."""
+        if place not in self.connected:
+            yield None
+            return
+        orders = {(*self.uplinks_of(port),) for port in self.ports if self._balance(port) == "mac"}
+        for count in range(len(orders) + 1):
+            yield from (set(some) for some in combinations(sorted(orders), count))
 
     # What ports want
 
@@ -349,14 +368,15 @@ class Rules:
         to_many = is_multicast(frame.destination)
         known = chain(self._fixed(), self._own())
         place = None if to_many else self._place(frame.destination, inside.vlan, known)
-        by_wire_only = not from_uplink and self.ports[at].get("transmit_uplink", False)
-        for port in [] if by_wire_only else self.ports:
-            if self._is_for(port, at, frame, place):
-                tags = self.leaves(port, inside)
-                if tags is not None:
-                    out[(port, tags, None)] += 1
-                    out += self._mirrored("received_by", {"port": port}, inside, at)
-        uplinks = [] if from_uplink else self.uplinks_of(at)
+        if from_uplink:
+            return [
+                out + self._to_ports(at, frame, inside, place, choosing)
+                for choosing in self._choosing(place)
+            ]
+        by_wire_only = self.ports[at].get("transmit_uplink", False)
+        if not by_wire_only:
+            out += self._to_ports(at, frame, inside, place, None)
+        uplinks = self.uplinks_of(at)
         if not uplinks or (place not in (None, BEYOND) and not by_wire_only):
             return [out]
         return [
@@ -366,7 +386,31 @@ class Rules:
             for uplink in uplinks
         ]
 
-    def _is_for(self, port: str, at: str, frame: Frame, place: Optional[str]) -> bool:
+    def _to_ports(
+        self,
+        at: str,
+        frame: Frame,
+        inside: Inside,
+        place: Optional[str],
+        choosing: Optional[Set[Order]],
+    ) -> Counts[Copy]:
+        out: Counts[Copy] = Counter()
+        for port in self.ports:
+            if self._is_for(port, at, frame, place, choosing):
+                tags = self.leaves(port, inside)
+                if tags is not None:
+                    out[(port, tags, None)] += 1
+                    out += self._mirrored("received_by", {"port": port}, inside, at)
+        return out
+
+    def _is_for(
+        self,
+        port: str,
+        at: str,
+        frame: Frame,
+        place: Optional[str],
+        choosing: Optional[Set[Order]],
+    ) -> bool:
         """Whether a port wants a frame, and is one for which it may come in there."""
         to_many = is_multicast(frame.destination)
         wanted = to_many or port == place or self._takes_all(port)
@@ -375,8 +419,7 @@ class Rules:
             return False
         if at not in self.uplinks:
             return True
-        may_be_a_copy = to_many or place not in self.connected
-        return self.receives_at(port, at, may_be_a_copy) and not self._sent_by_wire(port, frame)
+        return self.receives_at(port, at, choosing) and not self._sent_by_wire(port, frame)
 
 
 def _is_malformed(frame: Frame) -> bool:

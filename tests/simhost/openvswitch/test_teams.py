@@ -1,6 +1,6 @@
 """Which uplinks carry what, and what comes in over which, while links go down and up."""
 
-from typing import Any, Dict, Iterator, Set
+from typing import Any, Dict, Iterator, List, Set
 
 import pytest
 
@@ -90,11 +90,29 @@ def test_sources_keep_to_one_while_it_has_a_link(links: Links) -> None:
         source = f"02:00:00:00:01:{number:02x}"
         (used[source],) = links.sent_over("p1", source)
     assert set(used.values()) == {"nic0", "nic1"}
-    assert links.accepted(P1) == {"nic0", "nic1"}
     assert links.accepted(BROADCAST) == {"nic0"}
     links.down("nic0")
     assert {name for source in used for name in links.sent_over("p1", source)} == {"nic1"}
     assert links.accepted(BROADCAST) == {"nic1"}
+
+
+def test_a_client_is_reached_where_it_sends_from(links: Links) -> None:
+    """The network may flood what is for it to all uplinks."""
+    clients = [f"02:00:00:00:01:{number:02x}" for number in range(16)]
+    at_port = [{"mac": client, "vlan": 7, "type": "static"} for client in clients]
+    switch = {
+        "uplinks": list(UPLINKS),
+        "teaming": {"balance": "mac", "active": list(UPLINKS)},
+        "ports": [{"id": "p1", "vlan": 7, "addresses": at_port}],
+    }
+    links.load(switch, [{"port": "p1", "mac": P1}])
+    states: List[List[str]] = [[], ["nic1"], ["nic1", "nic2"]]
+    for down in states:
+        for uplink in down:
+            links.down(uplink)
+        places = [links.accepted(client) for client in clients]
+        assert places == [links.sent_over("p1", client) for client in clients]
+        assert set.union(*places) == set(UPLINKS) - set(down)
 
 
 def test_what_has_no_addresses_keeps_to_one(links: Links) -> None:

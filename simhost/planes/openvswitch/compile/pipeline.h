@@ -217,5 +217,7 @@ inline constexpr std::array kCountingTables{table::kLimits,  table::kLookup,  ta
 /// Groups of a way: the low bits are its number.
 inline constexpr openflow::GroupId kSendingGroups = 0x10000000;
 inline constexpr openflow::GroupId kReceivingGroups = 0x20000000;
+/// For frames to one known receiver, where each has an uplink of its own.
+inline constexpr openflow::GroupId kReceivingByAddress = 0x30000000;
 
 }  // namespace simhost::openvswitch

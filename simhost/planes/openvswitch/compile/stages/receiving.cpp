@@ -2,6 +2,7 @@
 // The network floods a frame to all uplinks of a switch; each way takes the copy of one of them.
 #include <algorithm>
 #include <cstdint>
+#include <optional>
 #include <utility>
 
 #include "planes/openvswitch/compile/stages/stages.h"
@@ -15,23 +16,34 @@ bool uses(Way const &way, openflow::Port uplink) {
   });
 }
 
-// Whether a group has to say at which uplink frames are to come in.
-bool elects(Way const &way, bool may_be_a_copy) {
-  if (way.is_single() || way.balance == Balance::addresses) {
-    return false;
-  }
-  return way.balance == Balance::first || may_be_a_copy;
+bool elects(Way const &way) {
+  return !way.is_single() && way.balance != Balance::addresses;
 }
 
-Actions receive(Plan const &plan, Uplink const &uplink, bool may_be_a_copy) {
+// The network has a client where it sends from: over the uplink that its address chooses, if its
+// way looks at addresses.
+bool elects_by_address(Way const &way) {
+  return elects(way) && way.balance == Balance::source;
+}
+
+// The group that says at which uplink frames are to come in.
+std::optional<openflow::GroupId> electing_group(Way const &way, bool has_one_receiver) {
+  if (!elects(way)) {
+    return std::nullopt;
+  }
+  bool const is_by_address = has_one_receiver && elects_by_address(way);
+  return (is_by_address ? kReceivingByAddress : kReceivingGroups) | way.number;
+}
+
+Actions receive(Plan const &plan, Uplink const &uplink, bool has_one_receiver) {
   Actions actions;
   for (auto const &way : plan.ways.all()) {
     if (!uses(way, uplink.port)) {
       continue;
     }
     actions.emplace_back(openflow::set(field::kWay, way.number));
-    if (elects(way, may_be_a_copy)) {
-      actions.emplace_back(openflow::ToGroup{.group = kReceivingGroups | way.number});
+    if (auto const group = electing_group(way, has_one_receiver)) {
+      actions.emplace_back(openflow::ToGroup{.group = *group});
     } else {
       actions.push_back(go_to(table::kDispatch));
     }
@@ -42,27 +54,24 @@ Actions receive(Plan const &plan, Uplink const &uplink, bool may_be_a_copy) {
 void receive_at(Plan const &plan, Program &program, Uplink const &uplink) {
   auto const at = from(uplink.port);
   auto const of_port = cookie(Counted::port, uplink.number);
-  auto const known = receive(plan, uplink, false);
-  auto const copied = receive(plan, uplink, true);
+  auto const to_one = receive(plan, uplink, true);
+  auto const to_others = receive(plan, uplink, false);
   auto add = [&](std::uint16_t priority, Match match, Actions const &actions) {
     program.add(
         table::kReceiving,
         {.priority = priority, .match = std::move(match), .actions = actions, .cookie = of_port});
   };
-  if (known != copied) {
-    add(200, to_many(at), copied);
-    // The network may not know it either.
+  if (to_one != to_others) {
+    add(200, to_many(at), to_others);
     for (auto const nobody_here : {openflow::Port{0}, kBeyond, kNowhere}) {
-      add(200, Match(at).with(field::kDestination, nobody_here), copied);
+      add(200, Match(at).with(field::kDestination, nobody_here), to_others);
     }
   }
-  add(100, at, known);
+  add(100, at, to_one);
 }
 
-void elect(Program &program, Way const &way) {
-  openflow::Group group{.id = kReceivingGroups | way.number,
-                        .type = openflow::GroupType::fast_failover,
-                        .buckets = {}};
+// Buckets in the order of those that send, so that an address has the same one in both.
+void elect(Program &program, Way const &way, openflow::Group group) {
   std::uint32_t id = 0;
   for (auto const &slot : way.slots) {
     for (auto const uplink : slot) {
@@ -104,8 +113,19 @@ void compile_receiving(Plan const &plan, Program &program) {
     }
   }
   for (auto const &way : plan.ways.all()) {
-    if (elects(way, true)) {
-      elect(program, way);
+    if (elects(way)) {
+      elect(program, way,
+            {.id = kReceivingGroups | way.number,
+             .type = openflow::GroupType::fast_failover,
+             .buckets = {}});
+    }
+    if (elects_by_address(way)) {
+      elect(program, way,
+            {.id = kReceivingByAddress | way.number,
+             .type = openflow::GroupType::select,
+             .selection = {.method = "hash",
+                           .fields = {{openflow::Field::eth_dst, openflow::ones(48)}}},
+             .buckets = {}});
     }
   }
   compile_election(plan, program);
