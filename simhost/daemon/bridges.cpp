@@ -155,13 +155,11 @@ std::optional<KnownAddress> find_address(openflow::Match const &match, openflow:
                       static_cast<std::uint16_t>(vlan->second.value));
 }
 
-// For how long no frame came from the sources that a bridge has learned.
-std::map<KnownAddress, std::chrono::nanoseconds> unseen_sources(openflow::Connection &connection) {
-  std::map<KnownAddress, std::chrono::nanoseconds> unseen;
-  for (auto const &entry :
-       connection.flows({.table = openvswitch::table::kCountedSources}, soon())) {
-    if (auto const known = find_address(entry.flow.match, openflow::Field::eth_src)) {
-      unseen.emplace(*known, entry.unused);
+std::map<KnownAddress, Unseen> by_address(std::vector<Source> const &sources) {
+  std::map<KnownAddress, Unseen> unseen;
+  for (auto const &source : sources) {
+    if (auto const known = find_address(source.flow.match, openflow::Field::eth_src)) {
+      unseen.emplace(*known, source.unseen);
     }
   }
   return unseen;
@@ -191,6 +189,7 @@ struct Bridges::Bridge {
   // Of the flows as they are.
   PortNumbers numbers;
   openvswitch::CountedSessions sessions;
+  std::chrono::seconds aging{};
   Deadline counted{};
 
   void have(Flows now) {
@@ -433,6 +432,15 @@ void Bridges::add_relearned(Bridge &bridge, WantedBridge const &wanted,
   }
 }
 
+// Learning an address once more leaves its flow the timeout that it has.
+void Bridges::add_renewed(Bridge &bridge, WantedBridge const &wanted,
+                          openvswitch::Difference &difference, Deadline deadline) {
+  bridge.aging = wanted.aging;
+  age(bridge, deadline);
+  auto renewed = memory_.with_other_timeouts(wanted.key, wanted.flows->flows);
+  std::ranges::move(renewed, std::back_inserter(difference.added_flows));
+}
+
 std::vector<Flow> Bridges::learned_flows(Bridge &bridge, openvswitch::LearnedFlows const &learned,
                                          Deadline deadline) {
   if (learned.table != openvswitch::table::kRecentSources) {
@@ -466,9 +474,12 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   }
   std::ranges::copy(std::exchange(bridge.unplaced, {}), std::back_inserter(difference.forgotten));
   if (is_new) {
-    std::ranges::move(memory_.recall(wanted.key, wanted.flows->flows),
+    std::ranges::move(memory_.recall(wanted.key, wanted.flows->flows, wanted.aging, seen_now()),
                       std::back_inserter(difference.added_flows));
   } else {
+    if (bridge.aging != wanted.aging && !forgets) {
+      add_renewed(bridge, wanted, difference, deadline);
+    }
     std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
   }
   if (bridge.sessions != wanted.sessions || ends_counting(difference)) {
@@ -487,6 +498,7 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   }
   bridge.numbers = wanted.numbers;
   bridge.sessions = wanted.sessions;
+  bridge.aging = wanted.aging;
   return size_of(difference);
 }
 
@@ -509,10 +521,9 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
   if (found == bridges_.end()) {
     return all;
   }
-  auto &connection = found->second->connection;
-  auto const unseen = unseen_sources(connection);
+  auto const unseen = by_address(age(*found->second, soon()));
   for (auto const &entry :
-       connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon())) {
+       found->second->connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon())) {
     auto const known = find_address(entry.flow.match, openflow::Field::eth_dst);
     if (known && learned_in(entry.flow)) {
       auto const source = unseen.find(*known);
@@ -523,6 +534,37 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
     }
   }
   return all;
+}
+
+Unseen Bridges::age() {
+  auto next = kBetweenLooks;
+  for (auto const &[key, bridge] : bridges_) {
+    next = std::min(next, next_look(age(*bridge, soon()), bridge->aging));
+  }
+  return next;
+}
+
+std::vector<Source> Bridges::age(Bridge &bridge, Deadline deadline) {
+  auto const entries =
+      bridge.connection.flows({.table = openvswitch::table::kCountedSources}, deadline);
+  follow_events(bridge);
+  auto sources = memory_.saw(bridge.key, entries, seen_now());
+  openflow::Changes changes;
+  std::erase_if(sources, [&](Source const &source) {
+    bool const goes = is_aged(source.unseen, bridge.aging);
+    if (goes) {
+      for (auto const &flow : {where_learned(source.flow), source.flow}) {
+        changes.emplace_back(
+            openflow::FlowChange{.command = FlowCommand::remove_strict, .flow = flow});
+      }
+    }
+    return goes;
+  });
+  if (!changes.empty()) {
+    bridge.connection.change(changes, deadline);
+    follow_events(bridge);
+  }
+  return sources;
 }
 
 std::size_t Bridges::apply(Wanted const &wanted) {

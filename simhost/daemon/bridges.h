@@ -12,6 +12,7 @@
 #include <string>
 #include <vector>
 
+#include "daemon/ageing.h"
 #include "daemon/memory.h"
 #include "daemon/taught.h"
 #include "daemon/wanted.h"
@@ -78,6 +79,9 @@ class Bridges {
   void count(storage::SwitchKey key);
   /// What the bridge of a switch has learned.
   std::vector<Learned> learned(storage::SwitchKey key);
+  /// Looks when addresses were seen last, and takes out those for which that is too long ago.
+  /// Returns when to do so again.
+  Unseen age();
 
  private:
   struct Bridge;
@@ -93,9 +97,12 @@ class Bridges {
   void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
   void add_relearned(Bridge &bridge, WantedBridge const &wanted,
                      openvswitch::Difference &difference, openvswitch::Deadline deadline);
+  void add_renewed(Bridge &bridge, WantedBridge const &wanted, openvswitch::Difference &difference,
+                   openvswitch::Deadline deadline);
   std::vector<openflow::Flow> learned_flows(Bridge &bridge,
                                             openvswitch::LearnedFlows const &learned,
                                             openvswitch::Deadline deadline);
+  std::vector<Source> age(Bridge &bridge, openvswitch::Deadline deadline);
   void read_events(Bridge &bridge);
   void follow_events(Bridge &bridge);
   void follow_learned(Bridge &bridge, openflow::FlowUpdate const &update);

@@ -84,6 +84,11 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
   count_from_now_on();
 }
 
+void Daemon::save() {
+  age();
+  count();
+}
+
 void Daemon::count() {
   try {
     if (bridges_) {
@@ -98,6 +103,27 @@ void Daemon::count() {
     troubles_.add(error.what());
   }
   remember();
+}
+
+void Daemon::age() {
+  try {
+    if (bridges_) {
+      next_aging_ = loop_.after(bridges_->age(), [this] { age(); });
+    }
+  } catch (std::runtime_error const &error) {
+    fail(error.what());
+  }
+}
+
+// What ages faster than before is not to wait for what was due.
+void Daemon::age_by(Wanted const &wanted) {
+  auto shortest = std::chrono::seconds::max();
+  for (auto const &bridge : wanted.bridges) {
+    shortest = std::min(shortest, bridge.aging);
+  }
+  if (shortest < std::exchange(shortest_aging_, shortest)) {
+    next_aging_ = loop_.after(0ms, [this] { age(); });
+  }
 }
 
 // From a timer, too, so that nothing is thrown.
@@ -344,6 +370,7 @@ void Daemon::settle(Wanted const &wanted) {
     keys.insert(unfit.key);
   }
   members_.keep(keys);
+  age_by(wanted);
   in_force_ = wanted.change;
   sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {

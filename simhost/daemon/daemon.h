@@ -39,10 +39,11 @@ class Daemon {
   void connect();
   /// Done when what is wanted is in force for the first time.
   void when_ready(std::function<void()> ready) { ready_ = std::move(ready); }
-  /// Puts into the state what was counted, as it does from time to time.
-  void count();
+  /// Puts into the state what was counted and seen, as it does from time to time.
+  void save();
 
  private:
+  void count();
   void attempt(std::function<void()> const &work);
   void fail(std::string const &why);
   void connect_later();
@@ -67,6 +68,8 @@ class Daemon {
   [[nodiscard]] Json counters(Json const &question);
   [[nodiscard]] Json counting_sessions(Json const &question);
   void count_from_now_on();
+  void age();
+  void age_by(Wanted const &wanted);
   void remember();
   void remember_soon();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
@@ -101,6 +104,8 @@ class Daemon {
   events::Clock::time_point mended_;    // when the last one was due
   events::Clock::duration pause_ = {};  // before the next attempt to connect
   events::Loop::Timer next_count_;
+  events::Loop::Timer next_aging_;
+  std::chrono::seconds shortest_aging_ = std::chrono::seconds::max();
   events::Loop::Timer next_remembering_;
 };
 

@@ -22,6 +22,8 @@ using storage::RememberedAs;
 
 constexpr std::uint16_t kPriority = 100;
 constexpr auto kVlan = openflow::ones(openvswitch::kVlanBits);
+// A source that was seen no later than that after the last time need not be put into the state.
+constexpr storage::SeenAt kSeenAnew = std::chrono::seconds(1);
 
 // What is learned in which table, and how.
 struct Kind {
@@ -55,7 +57,23 @@ Flow flow_of(Remembered const &address) {
   return flow;
 }
 
+std::optional<Flow> relearned(openvswitch::Teachers const &teachers, Flow const &flow) {
+  auto const learn = teachers.how_learned({.table = flow.table, .cookie = flow.cookie});
+  return learn ? openvswitch::relearned(*learn, flow) : std::nullopt;
+}
+
 }  // namespace
+
+Flow where_learned(Flow const &source) {
+  auto const &fields = source.match.fields();
+  Flow flow;
+  flow.table = openvswitch::table::kLearnedAddresses;
+  flow.priority = kPriority;
+  for (auto const &[field, matched] : fields) {
+    flow.match.with(field == Field::eth_src ? Field::eth_dst : field, matched.value, matched.mask);
+  }
+  return flow;
+}
 
 std::optional<Remembered> learned_in(Flow const &flow) {
   auto const kind = std::ranges::find(kKinds, flow.table, &Kind::table);
@@ -89,15 +107,17 @@ Memory::OfBridge &Memory::of_bridge(storage::SwitchKey key) {
     storage::ReadingTransaction transaction(store_);
     for (auto const &address : storage::remembered_of(transaction, key)) {
       auto flow = flow_of(address);
-      known.flows.emplace(openflow::place(flow), std::move(flow));
+      Place const place = openflow::place(flow);
+      known.flows.emplace(place, Known{.flow = std::move(flow), .seen = {.seen = address.seen}});
     }
     found = bridges_.emplace(key, std::move(known)).first;
   }
   return found->second;
 }
 
-void Memory::note(storage::SwitchKey key, Flow const &flow, bool is_known) {
-  if (auto const address = learned_in(flow)) {
+void Memory::note(storage::SwitchKey key, Known const &known, bool is_known) {
+  if (auto address = learned_in(known.flow)) {
+    address->seen = known.seen.seen;
     unsaved_.push_back({.key = key, .address = *address, .is_known = is_known});
     changed_();
   }
@@ -106,7 +126,7 @@ void Memory::note(storage::SwitchKey key, Flow const &flow, bool is_known) {
 template <typename IsGone>
 void Memory::remove(storage::SwitchKey key, IsGone const &is_gone) {
   std::erase_if(of_bridge(key).flows, [&](auto const &flow) {
-    bool const goes = is_gone(flow.second);
+    bool const goes = is_gone(flow.second.flow);
     if (goes) {
       note(key, flow.second, false);
     }
@@ -132,11 +152,21 @@ std::optional<std::uint32_t> Memory::follow(storage::SwitchKey key,
   }
   auto const port = openvswitch::number_of(update.flow.cookie);
   bool const is_elsewhere =
-      known != flows.end() && openvswitch::number_of(known->second.cookie) != port;
-  if (known == flows.end() || is_elsewhere) {
-    note(key, update.flow, true);
+      known != flows.end() && openvswitch::number_of(known->second.flow.cookie) != port;
+  if (known != flows.end()) {
+    known->second.flow = update.flow;
+    if (is_elsewhere) {
+      note(key, known->second, true);
+    }
+  } else {
+    bool const is_source = update.flow.table == openvswitch::table::kCountedSources;
+    Known learned{.flow = update.flow};
+    if (is_source) {
+      learned.seen.seen = seen_now();
+    }
+    note(key, learned, true);
+    flows.emplace(place, std::move(learned));
   }
-  flows.insert_or_assign(place, update.flow);
   return is_elsewhere && update.flow.table == openvswitch::table::kLearnedAddresses
              ? std::optional(port)
              : std::nullopt;
@@ -175,6 +205,28 @@ void Memory::forget(storage::SwitchKey key) {
   remove(key, [](Flow const &) { return true; });
 }
 
+std::vector<Source> Memory::saw(storage::SwitchKey key,
+                                std::span<openflow::FlowEntry const> sources, storage::SeenAt now) {
+  auto &flows = of_bridge(key).flows;
+  std::vector<Source> unseen_for;
+  for (auto const &entry : sources) {
+    auto const known = flows.find(openflow::place(entry.flow));
+    if (known == flows.end()) {
+      continue;
+    }
+    auto &sighting = known->second.seen;
+    auto const since = unseen(entry, sighting, now);
+    auto const seen = now - std::chrono::duration_cast<storage::SeenAt>(since);
+    bool const is_news = !sighting.seen || seen - *sighting.seen >= kSeenAnew;
+    sighting = {.seen = is_news ? seen : sighting.seen, .flow_age = entry.age, .unseen = since};
+    if (is_news) {
+      note(key, known->second, true);
+    }
+    unseen_for.push_back({.flow = entry.flow, .unseen = since});
+  }
+  return unseen_for;
+}
+
 bool Memory::save() {
   if (unsaved_.empty()) {
     return true;
@@ -204,9 +256,9 @@ template <typename Condition>
 std::vector<Flow> Memory::flows_that(storage::SwitchKey key, Condition const &condition) const {
   std::vector<Flow> flows;
   if (auto const found = bridges_.find(key); found != bridges_.end()) {
-    for (auto const &[place, flow] : found->second.flows) {
-      if (condition(flow)) {
-        flows.push_back(flow);
+    for (auto const &[place, known] : found->second.flows) {
+      if (condition(known.flow)) {
+        flows.push_back(known.flow);
       }
     }
   }
@@ -224,16 +276,37 @@ std::vector<Flow> Memory::learned(storage::SwitchKey key, LearnedFlows const &kn
   });
 }
 
-std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted) {
+std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted,
+                                 std::chrono::seconds aging, storage::SeenAt now) {
+  std::set<Place> aged;
+  for (auto const &[place, known] : of_bridge(key).flows) {
+    if (known.seen.seen && is_aged(now - *known.seen.seen, aging)) {
+      aged.insert(place);
+      aged.insert(openflow::place(where_learned(known.flow)));
+    }
+  }
+  remove(key, [&](Flow const &flow) { return aged.contains(openflow::place(flow)); });
   std::vector<Flow> recalled;
   openvswitch::Teachers const teachers(wanted);
-  for (auto const &[place, flow] : of_bridge(key).flows) {
-    auto const learn = teachers.how_learned({.table = flow.table, .cookie = flow.cookie});
-    if (auto again = learn ? openvswitch::relearned(*learn, flow) : std::nullopt) {
+  for (auto const &[place, known] : of_bridge(key).flows) {
+    if (auto again = relearned(teachers, known.flow)) {
       recalled.push_back(*std::move(again));
     }
   }
   return recalled;
+}
+
+std::vector<Flow> Memory::with_other_timeouts(storage::SwitchKey key,
+                                              std::span<Flow const> wanted) const {
+  std::vector<Flow> others;
+  openvswitch::Teachers const teachers(wanted);
+  for (auto const &flow : flows_that(key, [](Flow const &) { return true; })) {
+    auto again = relearned(teachers, flow);
+    if (again && again->hard_timeout != flow.hard_timeout) {
+      others.push_back(*std::move(again));
+    }
+  }
+  return others;
 }
 
 }  // namespace simhost::daemon

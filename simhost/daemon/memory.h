@@ -11,6 +11,7 @@
 #include <tuple>
 #include <vector>
 
+#include "daemon/ageing.h"
 #include "planes/openvswitch/openflow/flow.h"
 #include "planes/openvswitch/openflow/replies.h"
 #include "planes/openvswitch/reconcile/difference.h"
@@ -22,6 +23,9 @@ namespace simhost::daemon {
 /// What a flow of a table that a bridge fills by itself says that it learned; nothing for a flow
 /// that no bridge taught itself.
 std::optional<storage::Remembered> learned_in(openflow::Flow const &flow);
+
+/// The flow that knows a source as a destination, as far as its place goes.
+openflow::Flow where_learned(openflow::Flow const &source);
 
 class Memory {
  public:
@@ -38,6 +42,10 @@ class Memory {
   /// The devices of a bridge, with the numbers of their ports. What was learned at a port that has
   /// another device than before is forgotten.
   void follow_devices(storage::SwitchKey key, std::map<std::string, std::uint32_t> const &devices);
+  /// What a bridge says of the flows of table::kCountedSources: returns for how long nothing came
+  /// from those that are followed.
+  std::vector<Source> saw(storage::SwitchKey key, std::span<openflow::FlowEntry const> sources,
+                          storage::SeenAt now);
   /// Nothing that a bridge knows is to be known once more.
   void forget(storage::SwitchKey key);
   /// What was learned at a port of a bridge.
@@ -46,9 +54,14 @@ class Memory {
   /// Likewise what a cookie knows, but for table::kRecentSources, which is not followed.
   [[nodiscard]] std::vector<openflow::Flow> learned(storage::SwitchKey key,
                                                     openvswitch::LearnedFlows const &known) const;
-  /// What a bridge that is to have these flows knows once more.
+  /// What a bridge that is to have these flows knows once more. What was not seen for too long is
+  /// forgotten.
   [[nodiscard]] std::vector<openflow::Flow> recall(storage::SwitchKey key,
-                                                   std::span<openflow::Flow const> wanted);
+                                                   std::span<openflow::Flow const> wanted,
+                                                   std::chrono::seconds aging, storage::SeenAt now);
+  /// What a bridge knows for another time than these flows would teach it.
+  [[nodiscard]] std::vector<openflow::Flow> with_other_timeouts(
+      storage::SwitchKey key, std::span<openflow::Flow const> wanted) const;
 
   /// Puts into the state what is not there yet. Returns whether all of it is: nothing is put while
   /// somebody else writes.
@@ -57,9 +70,14 @@ class Memory {
  private:
   using Place = std::tuple<std::uint8_t, std::uint16_t, openflow::Match>;
 
+  struct Known {
+    openflow::Flow flow;
+    Sighting seen = {};  // of a source
+  };
+
   struct OfBridge {
     std::map<std::string, std::uint32_t> devices = {};
-    std::map<Place, openflow::Flow> flows = {};
+    std::map<Place, Known> flows = {};
   };
 
   struct Unsaved {
@@ -69,7 +87,7 @@ class Memory {
   };
 
   OfBridge &of_bridge(storage::SwitchKey key);
-  void note(storage::SwitchKey key, openflow::Flow const &flow, bool is_known);
+  void note(storage::SwitchKey key, Known const &known, bool is_known);
   template <typename IsGone>
   void remove(storage::SwitchKey key, IsGone const &is_gone);
   // Those of which something is true.

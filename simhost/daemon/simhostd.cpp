@@ -94,7 +94,7 @@ void serve(Words const &words) {
   }
   loop.run();
   notify("STOPPING=1");
-  daemon.count();
+  daemon.save();
   say("ends");
 }
 

@@ -140,6 +140,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                         .ports = {},
                         .numbers = {},
                         .sessions = {},
+                        .aging = {},
                         .flows = {}};
     add_devices(transaction, bridge);
     if (!row.associated || bridge.row.devices.empty()) {
@@ -153,6 +154,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       bridge.flows = flows;
       add_carried(transaction, network, team.policy, bridge);
       bridge.sessions = sessions_of(network);
+      bridge.aging = std::chrono::seconds(network.addresses.aging);
       std::erase_if(bridge.row.devices,
                     [&](auto const &device) { return !is_there(device.first); });
       bridge.row.limits = {{openvswitch::table::kLearnedAddresses, flows->rows.most_learned}};

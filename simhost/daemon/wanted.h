@@ -37,7 +37,8 @@ struct WantedBridge {
   std::map<std::string, std::uint32_t> ports;  ///< the numbers of those that devices are at
   PortNumbers numbers;                         ///< likewise, of uplink ports too
   openvswitch::CountedSessions sessions;
-  Flows flows;  ///< but for the marker of the change
+  std::chrono::seconds aging;  ///< of what is learned
+  Flows flows;                 ///< but for the marker of the change
   std::vector<Carried> carried = {};
   /// The host was restarted, and has counted nothing since: what is learned is not to be known.
   bool forgets = false;

@@ -50,4 +50,7 @@ char const *const kRememberedSchema = R"sql(
   CREATE INDEX remembered_by_port ON remembered (port);
 )sql";
 
+// In milliseconds since the beginning of 1970.
+char const *const kSeenSchema = "ALTER TABLE remembered ADD COLUMN seen INTEGER";
+
 }  // namespace simhost::storage

@@ -17,7 +17,7 @@ namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
-    kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema};
+    kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema, kSeenSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -113,6 +113,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kFramesSchema);
   database.exec(kReadingSchema);
   database.exec(kRememberedSchema);
+  database.exec(kSeenSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

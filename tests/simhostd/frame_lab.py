@@ -57,6 +57,14 @@ def comes_sooner_or_later(
     return comes_true(comes)
 
 
+def learned_ages(lab: "Lab", port: str) -> Dict[str, int]:
+    """Of the addresses that the one switch learned at a port of it and beyond the uplinks."""
+    (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
+    (at,) = (one for one in switch["ports"] if one["id"] == port)
+    learned = [*at.get("addresses", []), *switch.get("addresses", [])]
+    return {one["mac"]: one["age"] for one in learned}
+
+
 class Lab:
     """The host with its state, and everything around it; gone when it is left."""
 

@@ -9,10 +9,11 @@ from frame_lab import Lab
 
 
 class LastingOpenVSwitch:
-    """Its two processes."""
+    """Its two processes. One whose clock may stand ages what it learned when it is told to."""
 
-    def __init__(self, lab: Lab) -> None:
+    def __init__(self, lab: Lab, clock_may_stand: bool = False) -> None:
         self._lab = lab
+        self._options = ["--enable-dummy"] if clock_may_stand else []
         self._processes: List["subprocess.Popen[str]"] = []
 
     @property
@@ -29,8 +30,21 @@ class LastingOpenVSwitch:
         self._start("ovsdb-server", database, f"--remote=punix:{socket}")
         while not os.path.exists(socket):
             assert self._processes[0].poll() is None
-        self._start("ovs-vswitchd", self.where, "--disable-system")
+        self._start("ovs-vswitchd", self.where, "--disable-system", *self._options)
         return self
+
+    def stop_clock(self) -> None:
+        """Which goes on no more but by warp()."""
+        self._ask("time/stop")
+
+    def warp(self, seconds: int) -> None:
+        """Lets so much time pass, and all that is due then happen."""
+        self._ask("time/warp", str(seconds * 1000), str(max(1000, seconds * 50)))
+        self._ask("revalidator/wait")
+
+    def _ask(self, *words: str) -> None:
+        control = f"{self._lab.run_folder()}/ovs-vswitchd.ctl"
+        self._lab.host.run("ovs-appctl", "-t", control, *words)
 
     def _start(self, program: str, *words: str) -> None:
         folder = str(self._lab.run_folder())

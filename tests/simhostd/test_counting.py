@@ -10,7 +10,7 @@ from typing import Any, Dict
 
 import pytest
 
-from frame_lab import TOOLS, Lab, comes_true
+from frame_lab import TOOLS, Lab, comes_true, learned_ages
 from lasting_open_vswitch import LastingOpenVSwitch
 from simhost import Client
 from simhost._namespaces import PATIENCE
@@ -202,11 +202,7 @@ def test_an_address_that_moves_counts_where_it_comes_to(lab: Lab) -> None:
 
 
 def ages(lab: Lab) -> Dict[str, int]:
-    """Of the addresses that are learned at port a and beyond the uplinks."""
-    (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
-    (port,) = (one for one in switch["ports"] if one["id"] == "a")
-    learned = [*port["addresses"], *switch["addresses"]]
-    return {one["mac"]: one["age"] for one in learned}
+    return learned_ages(lab, "a")
 
 
 @pytest.mark.parametrize("learns", [{}, {"mac_learning": {"learning": True, "flooding": True}}])

@@ -11,6 +11,7 @@ namespace {
 
 constexpr std::int64_t kAllVlans = -1;
 constexpr std::int64_t kLastVlan = 4095;
+constexpr SeenAt kNeverSeen{-1};
 
 std::int64_t vlan_of(Remembered const &address) {
   return address.vlan ? std::int64_t{*address.vlan} : kAllVlans;
@@ -20,7 +21,8 @@ Remembered remembered_at(Query const &row) {
   Remembered address{.as = row.choice(0, RememberedAs::counted),
                      .vlan = std::nullopt,
                      .mac = {},
-                     .port = std::nullopt};
+                     .port = std::nullopt,
+                     .seen = std::nullopt};
   if (auto const vlan = row.integer(1, kAllVlans, kLastVlan); vlan != kAllVlans) {
     address.vlan = static_cast<std::uint16_t>(vlan);
   }
@@ -29,26 +31,30 @@ Remembered remembered_at(Query const &row) {
     address.port = PortNumber(
         static_cast<std::uint32_t>(row.integer(3, 1, std::numeric_limits<std::uint32_t>::max())));
   }
+  if (!row.is_null(4)) {
+    address.seen = row.time(4);
+  }
   return address;
 }
 
 }  // namespace
 
 std::vector<Remembered> remembered_of(Transaction &transaction, SwitchKey key) {
-  Query select(transaction, "SELECT kind, vlan, mac, port FROM remembered WHERE switch = ?");
+  Query select(transaction, "SELECT kind, vlan, mac, port, seen FROM remembered WHERE switch = ?");
   return select.with(key).all(remembered_at);
 }
 
 void remember(ChangingTransaction &transaction, SwitchKey key, Remembered const &address) {
   auto const port = address.port.value_or(PortNumber{});
   Change(transaction,
-         "INSERT OR REPLACE INTO remembered (kind, vlan, mac, port, switch)"
-         " SELECT ?, ?, ?, nullif(?, 0), key FROM switch"
+         "INSERT OR REPLACE INTO remembered (kind, vlan, mac, port, seen, switch)"
+         " SELECT ?, ?, ?, nullif(?, 0), nullif(?, -1), key FROM switch"
          " WHERE key = ? AND ? IN (SELECT 0 UNION ALL SELECT port FROM device)")
       .with(address.as)
       .with(vlan_of(address))
       .with(std::span<std::byte const>(address.mac))
       .with(port)
+      .with(std::int64_t{address.seen.value_or(kNeverSeen).count()})
       .with(key)
       .with(port)
       .run();

@@ -2,6 +2,7 @@
 // started anew, and a client that says nothing would not be reached until it does.
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <vector>
@@ -18,12 +19,16 @@ enum class RememberedAs : std::uint8_t {
   counted,  ///< one of those that the switch may have
 };
 
-/// No two of a switch have all but the port in common.
+/// Since the beginning of 1970: what a data path learned ages by no clock but that of the machine.
+using SeenAt = std::chrono::milliseconds;
+
+/// No two of a switch have all but the last two in common.
 struct Remembered {
   RememberedAs as;
   std::optional<std::uint16_t> vlan;  ///< none: in all
   MacBytes mac;
-  std::optional<PortNumber> port;  ///< none: beyond the uplinks, or at no place
+  std::optional<PortNumber> port;             ///< none: beyond the uplinks, or at no place
+  std::optional<SeenAt> seen = std::nullopt;  ///< last, as a source; of RememberedAs::counted
 };
 
 std::vector<Remembered> remembered_of(Transaction &transaction, SwitchKey key);

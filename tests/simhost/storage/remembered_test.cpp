@@ -18,6 +18,8 @@ using testing::SizeIs;
 constexpr MacBytes kOne{std::byte{2}, {}, {}, {}, {}, std::byte{1}};
 constexpr MacBytes kOther{std::byte{2}, {}, {}, {}, {}, std::byte{2}};
 
+constexpr std::optional<SeenAt> kNever;
+
 struct RememberedAddresses : testing::Test {
   RememberedAddresses() {
     key = *add_switch(transaction, named("s"));
@@ -40,18 +42,30 @@ struct RememberedAddresses : testing::Test {
 
 TEST_F(RememberedAddresses, AreAtOnePlace) {
   learned(kOne, p1);
-  EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::learned, 7, kOne, p1)));
+  EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::learned, 7, kOne, p1, kNever)));
   learned(kOne, std::nullopt);
-  EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::learned, 7, kOne, std::nullopt)));
+  EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::learned, 7, kOne, std::nullopt, kNever)));
   // Likewise in all VLANs.
   Remembered first{.as = RememberedAs::first, .vlan = std::nullopt, .mac = kOne, .port = p1};
   remember(transaction, key, first);
   remember(transaction, key, first);
   EXPECT_THAT(all(), SizeIs(2));
   remove_remembered(transaction, key, first);
-  EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::learned, 7, kOne, std::nullopt)));
+  EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::learned, 7, kOne, std::nullopt, kNever)));
   remove_remembered(transaction);
   EXPECT_THAT(all(), IsEmpty());
+}
+
+TEST_F(RememberedAddresses, TellWhenTheyWereSeen) {
+  for (auto const seen : {SeenAt(0), SeenAt(1234567890123)}) {
+    Remembered const source{.as = RememberedAs::counted,
+                            .vlan = std::uint16_t{7},
+                            .mac = kOne,
+                            .port = std::nullopt,
+                            .seen = seen};
+    remember(transaction, key, source);
+    EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::counted, 7, kOne, std::nullopt, seen)));
+  }
 }
 
 TEST_F(RememberedAddresses, GoWithTheDeviceOfTheirPort) {
@@ -60,7 +74,8 @@ TEST_F(RememberedAddresses, GoWithTheDeviceOfTheirPort) {
   put_device(transaction, p1, "tap1", kOther);
   EXPECT_THAT(all(), SizeIs(2));
   put_device(transaction, p1, "tap2", std::nullopt);
-  EXPECT_THAT(all(), ElementsAre(FieldsAre(RememberedAs::learned, 7, kOther, std::nullopt)));
+  EXPECT_THAT(all(),
+              ElementsAre(FieldsAre(RememberedAs::learned, 7, kOther, std::nullopt, kNever)));
 }
 
 TEST_F(RememberedAddresses, AreNoneOfWhatIsGone) {
@@ -77,6 +92,8 @@ TEST_F(RememberedAddresses, AreCheckedWhenTheyAreRead) {
   Change(transaction, "UPDATE remembered SET kind = 9").run();
   EXPECT_THROW(all(), UnusableState);
   Change(transaction, "UPDATE remembered SET kind = 1, vlan = 4096").run();
+  EXPECT_THROW(all(), UnusableState);
+  Change(transaction, "UPDATE remembered SET vlan = 7, seen = 1 << 62").run();
   EXPECT_THROW(all(), UnusableState);
 }
 
