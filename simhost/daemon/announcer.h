@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "daemon/memory.h"
+#include "daemon/learned/memory.h"
 #include "daemon/wanted.h"
 #include "events/loop.h"
 

@@ -12,9 +12,9 @@
 #include <string>
 #include <vector>
 
-#include "daemon/ageing.h"
-#include "daemon/memory.h"
-#include "daemon/taught.h"
+#include "daemon/learned/ageing.h"
+#include "daemon/learned/memory.h"
+#include "daemon/learned/taught.h"
 #include "daemon/wanted.h"
 #include "events/loop.h"
 #include "planes/openvswitch/openflow/connection.h"

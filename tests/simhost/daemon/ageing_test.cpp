@@ -1,5 +1,5 @@
 // How old addresses are, by what Open vSwitch says and by what was known before.
-#include "daemon/ageing.h"
+#include "daemon/learned/ageing.h"
 
 #include <gtest/gtest.h>
 

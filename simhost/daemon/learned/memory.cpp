@@ -1,5 +1,5 @@
 // A flow is made anew by the one that taught it, as that is now.
-#include "daemon/memory.h"
+#include "daemon/learned/memory.h"
 
 #include <algorithm>
 #include <array>

@@ -1,5 +1,5 @@
 // By the cookies and the form of what is taught.
-#include "daemon/taught.h"
+#include "daemon/learned/taught.h"
 
 #include <utility>
 

@@ -1,5 +1,5 @@
 // A flow that counted something says it by itself, for as long as Open vSwitch can count.
-#include "daemon/ageing.h"
+#include "daemon/learned/ageing.h"
 
 #include <algorithm>
 

@@ -11,7 +11,7 @@
 #include <tuple>
 #include <vector>
 
-#include "daemon/ageing.h"
+#include "daemon/learned/ageing.h"
 #include "planes/openvswitch/openflow/flow.h"
 #include "planes/openvswitch/openflow/replies.h"
 #include "planes/openvswitch/reconcile/difference.h"
