@@ -9,6 +9,7 @@
 #include <utility>
 #include <variant>
 
+#include "daemon/changes.h"
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/ovsdb/configuration.h"
 #include "planes/openvswitch/reconcile/difference.h"
@@ -21,8 +22,6 @@ namespace {
 using namespace std::chrono_literals;
 using openflow::Flow;
 using openflow::FlowCommand;
-using openflow::Group;
-using openflow::GroupCommand;
 using openvswitch::Deadline;
 
 constexpr auto kPatience = 5s;
@@ -41,57 +40,6 @@ Deadline soon(std::size_t devices = 0) {
 
 bool is_marker(openflow::FlowEntry const &entry) {
   return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
-}
-
-// In the order in which nothing refers to what is not there.
-void add_changes(openvswitch::Difference const &difference, openflow::Changes &changes) {
-  auto const change_group = [&](GroupCommand command, Group const &group) {
-    changes.emplace_back(openflow::GroupChange{.command = command, .group = group});
-  };
-  auto const change_flow = [&](FlowCommand command, Flow const &flow) {
-    changes.emplace_back(openflow::FlowChange{.command = command, .flow = flow});
-  };
-  for (auto const &[table, cookie] : difference.forgotten) {
-    Flow learned;
-    learned.table = table;
-    learned.cookie = cookie;
-    changes.emplace_back(openflow::FlowChange{
-        .command = FlowCommand::remove, .flow = learned, .cookie_mask = ~std::uint64_t{0}});
-  }
-  for (auto const &group : difference.added_groups) {
-    change_group(GroupCommand::add, group);
-  }
-  for (auto const &group : difference.changed_groups) {
-    change_group(GroupCommand::modify, group);
-  }
-  for (auto const &flow : difference.removed_flows) {
-    change_flow(FlowCommand::remove_strict, flow);
-  }
-  for (auto const &flow : difference.added_flows) {
-    change_flow(FlowCommand::add, flow);
-  }
-  for (auto const &flow : difference.changed_flows) {
-    change_flow(FlowCommand::modify_strict, flow);
-  }
-  for (auto const number : difference.removed_groups) {
-    change_group(GroupCommand::remove, {.id = number, .buckets = {}});
-  }
-}
-
-// Whether flows go, or begin anew, that count for others.
-bool ends_counting(openvswitch::Difference const &difference) {
-  auto const counts = [](Flow const &flow) {
-    return std::ranges::find(openvswitch::kCountingTables, flow.table) !=
-           openvswitch::kCountingTables.end();
-  };
-  return std::ranges::any_of(difference.removed_flows, counts) ||
-         std::ranges::any_of(difference.added_flows, counts);
-}
-
-std::size_t size_of(openvswitch::Difference const &difference) {
-  return difference.added_groups.size() + difference.changed_groups.size() +
-         difference.removed_groups.size() + difference.added_flows.size() +
-         difference.changed_flows.size() + difference.removed_flows.size();
 }
 
 std::set<std::string> added_devices(openvswitch::PresentRows const &present,
@@ -117,16 +65,6 @@ openvswitch::Difference difference_between(openvswitch::Compiled const &present,
              : openvswitch::difference(present.flows, present.groups, wanted.flows, wanted.groups);
 }
 
-// All that the bridge learned, before anything that teaches it otherwise.
-void add_forgetting(openflow::Changes &changes) {
-  for (auto number = openvswitch::table::kFirstAddresses; openvswitch::table::is_learned(number);
-       ++number) {
-    Flow all;
-    all.table = number;
-    changes.emplace_back(openflow::FlowChange{.command = FlowCommand::remove, .flow = all});
-  }
-}
-
 // Another client may have come with a device, with an address of its own.
 std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wanted,
                                                        std::set<std::string> const &added) {
@@ -139,34 +77,6 @@ std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wante
     }
   }
   return forgotten;
-}
-
-// An address, in its VLAN.
-using KnownAddress = std::pair<openflow::EthernetAddress, std::uint16_t>;
-
-std::optional<KnownAddress> find_address(openflow::Match const &match, openflow::Field field) {
-  auto const &fields = match.fields();
-  auto const address = fields.find(field);
-  auto const vlan = fields.find(openvswitch::field::kDomain);
-  if (address == fields.end() || vlan == fields.end()) {
-    return std::nullopt;
-  }
-  return KnownAddress(openflow::to_address<6>(address->second.value),
-                      static_cast<std::uint16_t>(vlan->second.value));
-}
-
-std::map<KnownAddress, Unseen> by_address(std::vector<Source> const &sources) {
-  std::map<KnownAddress, Unseen> unseen;
-  for (auto const &source : sources) {
-    if (auto const known = find_address(source.flow.match, openflow::Field::eth_src)) {
-      unseen.emplace(*known, source.unseen);
-    }
-  }
-  return unseen;
-}
-
-std::uint32_t seconds(std::chrono::nanoseconds time) {
-  return static_cast<std::uint32_t>(std::chrono::duration_cast<std::chrono::seconds>(time).count());
 }
 
 }  // namespace
@@ -516,24 +426,14 @@ bool Bridges::send(storage::SwitchKey key, std::vector<openflow::PacketOut> cons
 }
 
 std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
-  std::vector<Learned> all;
   auto const found = bridges_.find(key);
   if (found == bridges_.end()) {
-    return all;
+    return {};
   }
-  auto const unseen = by_address(age(*found->second, soon()));
-  for (auto const &entry :
-       found->second->connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon())) {
-    auto const known = find_address(entry.flow.match, openflow::Field::eth_dst);
-    if (known && learned_in(entry.flow)) {
-      auto const source = unseen.find(*known);
-      all.push_back({.address = known->first,
-                     .vlan = known->second,
-                     .port = openvswitch::number_of(entry.flow.cookie),
-                     .age = seconds(source != unseen.end() ? source->second : entry.age)});
-    }
-  }
-  return all;
+  auto const sources = age(*found->second, soon());
+  return learned_of(
+      found->second->connection.flows({.table = openvswitch::table::kLearnedAddresses}, soon()),
+      sources);
 }
 
 Unseen Bridges::age() {

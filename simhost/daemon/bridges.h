@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "daemon/learned/ageing.h"
+#include "daemon/learned/mac_table.h"
 #include "daemon/learned/memory.h"
 #include "daemon/learned/taught.h"
 #include "daemon/wanted.h"
@@ -23,14 +24,6 @@
 #include "planes/openvswitch/rows/rows.h"
 
 namespace simhost::daemon {
-
-/// An address that a bridge has learned.
-struct Learned {
-  openflow::EthernetAddress address;
-  std::uint16_t vlan;
-  std::uint32_t port;  ///< its number in the state; 0 beyond the uplinks
-  std::uint32_t age;   ///< seconds since it was seen last, as a source
-};
 
 /// Whatever goes wrong with an Open vSwitch is thrown, and what is known of it is of no more use:
 /// its owner makes another one.

@@ -1,0 +1,20 @@
+// A difference as changes that a bridge is told in one bundle.
+#pragma once
+
+#include <cstddef>
+
+#include "planes/openvswitch/openflow/change.h"
+#include "planes/openvswitch/reconcile/difference.h"
+
+namespace simhost::daemon {
+
+/// In the order in which nothing refers to what is not there.
+void add_changes(openvswitch::Difference const &difference, openflow::Changes &changes);
+/// All that the bridge learned goes: before anything that teaches it otherwise.
+void add_forgetting(openflow::Changes &changes);
+/// Whether flows go, or begin anew, that count for others.
+bool ends_counting(openvswitch::Difference const &difference);
+/// How many flows and groups it changes, those not counted that are forgotten.
+std::size_t size_of(openvswitch::Difference const &difference);
+
+}  // namespace simhost::daemon
