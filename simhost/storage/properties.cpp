@@ -67,9 +67,9 @@ std::vector<NamedProperty> properties_of(Transaction &transaction, PropertyOwner
 
 std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey key,
                                           std::string_view name) {
-  Query select(
-      transaction,
-      "SELECT port, value FROM property WHERE switch = ? AND name = ? AND port IS NOT NULL");
+  Query select(transaction,
+               "SELECT port, value FROM property WHERE switch = ? AND name = ? AND port IS NOT NULL"
+               " ORDER BY port");
   return select.with(key).with(name).all([](Query const &row) {
     return PortProperty{.port = PortNumber(row.number<std::uint32_t>(0)), .value = row.bytes(1)};
   });

@@ -64,7 +64,7 @@ struct PortProperty {
   std::vector<std::byte> value;
 };
 
-/// The property of that name of every port of a switch that has it.
+/// The property of that name of every port of a switch that has it, in the order of the ports.
 std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey key,
                                           std::string_view name);
 /// Removes every property of that type from the host.

@@ -50,9 +50,9 @@ bool MirrorSession::is_promiscuous() const {
 
 std::vector<MirrorSession> mirrors_of(storage::Transaction &transaction, storage::SwitchKey key) {
   std::vector<MirrorSession> sessions;
-  for (auto const &port : storage::ports_of(transaction, key)) {
-    auto const owner = storage::PropertyOwner::port(key, port.number);
-    for (auto &session : effective(transaction, mirror::sessions, owner).sessions) {
+  for (auto const &[number, table] : list_stored_at_ports(transaction, mirror::sessions, key)) {
+    auto const port = storage::get_port_row(transaction, number);
+    for (auto &session : mirror::Table::from(table).sessions) {
       sessions.push_back(
           {.port = port, .record = session.record, .destinations = std::move(session.to)});
     }

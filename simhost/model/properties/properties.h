@@ -46,7 +46,7 @@ SIMHOST_API std::optional<storage::Property> find_stored(storage::Transaction &t
                                                          std::string_view key);
 SIMHOST_API std::vector<storage::NamedProperty> list_stored(storage::Transaction &transaction,
                                                             storage::PropertyOwner const &owner);
-/// Of every port of a switch that has the setting.
+/// Of every port of a switch that has the setting, in the order of the ports.
 SIMHOST_API std::vector<storage::PortProperty> list_stored_at_ports(
     storage::Transaction &transaction, Descriptor const &descriptor, storage::SwitchKey key);
 
