@@ -77,9 +77,10 @@ void switch_devices(storage::Transaction &transaction, NetworkDevices const &dev
       switch_to(device->name, link.admin, devices, say);
     }
   }
-  for (auto const &[key, row] : storage::all_switches(transaction)) {
-    for (auto const &[port, device] : storage::port_devices(transaction, key)) {
-      switch_to(device.name, true, devices, say);
+  for (auto const &name : devices.switched_off()) {
+    auto const holder = storage::find_device(transaction, name);
+    if (holder && holder->port) {
+      switch_to(name, true, devices, say);
     }
   }
 }

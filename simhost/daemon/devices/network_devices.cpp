@@ -195,6 +195,16 @@ std::optional<NetworkDevice> NetworkDevices::find(std::string_view name) const {
   return found == devices_.end() ? std::nullopt : std::optional(found->second);
 }
 
+std::vector<std::string> NetworkDevices::switched_off() const {
+  std::vector<std::string> names;
+  for (auto const &[name, device] : devices_) {
+    if (!device.is_up) {
+      names.push_back(name);
+    }
+  }
+  return names;
+}
+
 std::string NetworkDevices::master_of(std::string_view name) const {
   auto const device = devices_.find(name);
   auto const master = device == devices_.end() ? names_.end() : names_.find(device->second.master);

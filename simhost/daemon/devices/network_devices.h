@@ -8,6 +8,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "events/loop.h"
 
@@ -42,6 +43,8 @@ class NetworkDevices {
   /// whether that was anything.
   bool refresh();
   [[nodiscard]] std::optional<NetworkDevice> find(std::string_view name) const;
+  /// The names of those that are switched off.
+  [[nodiscard]] std::vector<std::string> switched_off() const;
   /// The name of the bridge or bond of the kernel that a device is at; empty if it is at none.
   [[nodiscard]] std::string master_of(std::string_view name) const;
 
