@@ -102,11 +102,9 @@ Compiled compile(Network const &network) {
         compile_groups, compile_lists, compile_delivery, compile_teams, compile_counting}) {
     stage(plan, program);
   }
-  std::sort(program.flows.begin(), program.flows.end());
-  std::sort(program.groups.begin(), program.groups.end());
   return {.rows = {.most_learned = network.addresses.limit},
-          .flows = std::move(program.flows),
-          .groups = std::move(program.groups)};
+          .flows = program.take_flows(),
+          .groups = program.take_groups()};
 }
 
 openflow::Flow generation_marker(std::uint64_t generation) {

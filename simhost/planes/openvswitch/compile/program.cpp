@@ -1,5 +1,8 @@
-// Tags, which ports and uplinks get alike.
+// Flows in their order, and the tags that ports and uplinks get alike.
 #include "planes/openvswitch/compile/program.h"
+
+#include <algorithm>
+#include <iterator>
 
 namespace simhost::openvswitch {
 namespace {
@@ -14,6 +17,30 @@ openflow::Action priority_from_register() {
 constexpr openflow::Value kAllReceivers = openflow::ones(48);
 
 }  // namespace
+
+void Program::add(std::uint8_t table, Rule rule) {
+  flows_[{table, rule.priority}].push_back({.table = table,
+                                            .priority = rule.priority,
+                                            .match = std::move(rule.match),
+                                            .cookie = rule.cookie,
+                                            .actions = std::move(rule.actions)});
+}
+
+std::vector<openflow::Flow> Program::take_flows() {
+  std::vector<openflow::Flow> all;
+  for (auto &[place, flows] : flows_) {
+    if (!std::ranges::is_sorted(flows)) {
+      std::ranges::sort(flows);
+    }
+    std::ranges::move(flows, std::back_inserter(all));
+  }
+  return all;
+}
+
+std::vector<openflow::Group> Program::take_groups() {
+  std::ranges::sort(groups_);
+  return std::move(groups_);
+}
 
 void add_by_receivers(Program &program, std::uint8_t table, Rule const &rule,
                       ByReceivers const &counted, std::uint32_t number) {

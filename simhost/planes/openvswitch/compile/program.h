@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <initializer_list>
+#include <map>
 #include <utility>
 #include <vector>
 
@@ -25,17 +26,20 @@ struct Rule {
   std::uint64_t cookie = 0;
 };
 
-struct Program {
-  std::vector<openflow::Flow> flows;
-  std::vector<openflow::Group> groups;
+class Program {
+ public:
+  void add(std::uint8_t table, Rule rule);
+  void add(openflow::Group group) { groups_.push_back(std::move(group)); }
 
-  void add(std::uint8_t table, Rule rule) {
-    flows.push_back({.table = table,
-                     .priority = rule.priority,
-                     .match = std::move(rule.match),
-                     .cookie = rule.cookie,
-                     .actions = std::move(rule.actions)});
-  }
+  /// In their order.
+  std::vector<openflow::Flow> take_flows();
+  std::vector<openflow::Group> take_groups();
+
+ private:
+  // By table and priority: what is added for one port after the other is mostly in its order there,
+  // and sorting all of it takes as long as all stages.
+  std::map<std::pair<std::uint8_t, std::uint16_t>, std::vector<openflow::Flow>> flows_;
+  std::vector<openflow::Group> groups_;
 };
 
 inline openflow::Action go_to(std::uint8_t table) {

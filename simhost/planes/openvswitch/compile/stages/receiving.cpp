@@ -81,7 +81,7 @@ void elect(Program &program, Way const &way, openflow::Group group) {
            .actions = {openflow::set(field::kElected, name_of(slot)), go_to(table::kElection)}});
     }
   }
-  program.groups.push_back(std::move(group));
+  program.add(std::move(group));
 }
 
 void compile_election(Plan const &plan, Program &program) {

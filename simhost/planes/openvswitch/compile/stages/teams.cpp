@@ -84,7 +84,7 @@ void compile_teams(Plan const &plan, Program &program) {
   }
   for (auto const &way : plan.ways.all()) {
     if (!way.is_single()) {
-      program.groups.push_back(group_of(way));
+      program.add(group_of(way));
     }
   }
   for (auto const &uplink : plan.network.uplinks) {
