@@ -328,7 +328,8 @@ void Bridges::add_relearned(Bridge &bridge, WantedBridge const &wanted,
   }
   bridge.connection.receive();
   follow_events(bridge);
-  openvswitch::Teachers const teachers(wanted.flows->flows);
+  openvswitch::Teachers const teachers(wanted.flows->flows,
+                                       {difference.forgotten.begin(), difference.forgotten.end()});
   for (auto const &learned : difference.forgotten) {
     auto const learn = teachers.how_learned(learned);
     if (!learn) {

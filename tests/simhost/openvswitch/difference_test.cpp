@@ -4,7 +4,10 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <iterator>
+#include <map>
 #include <random>
+#include <set>
 #include <vector>
 
 #include "planes/openvswitch/openflow/text.h"
@@ -20,6 +23,7 @@ using simhost::openflow::Learn;
 using simhost::openflow::Output;
 using simhost::openvswitch::Difference;
 using simhost::openvswitch::difference;
+using simhost::openvswitch::LearnedFlows;
 using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::UnorderedElementsAreArray;
@@ -42,12 +46,10 @@ Group group(std::uint32_t id, std::uint32_t out) {
           .buckets = {{.watch_port = out, .actions = {Output{.port = out}}}}};
 }
 
-TEST(ADifference, OfTheSameIsEmptyInWhateverOrder) {
-  Flows const present{flow(0, 1, 2), flow(0, 2, 1), flow(3, 1, 1)};
-  Flows const wanted{present[2], present[0], present[1]};
-  EXPECT_TRUE(difference(present, Groups{group(1, 1), group(2, 2)}, wanted,
-                         Groups{group(2, 2), group(1, 1)})
-                  .empty());
+TEST(ADifference, OfTheSameIsEmpty) {
+  Flows const flows{flow(0, 1, 2), flow(0, 2, 1), flow(3, 1, 1)};
+  Groups const groups{group(1, 1), group(2, 2)};
+  EXPECT_TRUE(difference(flows, groups, flows, groups).empty());
 }
 
 TEST(ADifference, LeavesFlowsAloneThatNobodyChanges) {
@@ -121,6 +123,7 @@ TEST(ADifference, LeavesWhatWasLearnedByWantedFlowsAlone) {
   Flows const foreign{of_another, elsewhere, before_all, of_more, of_all, that_says_otherwise};
   Flows present{teaches, learned, for_ever};
   present.insert(present.end(), foreign.begin(), foreign.end());
+  std::ranges::sort(present);
   auto const all = difference(present, Groups{}, Flows{teaches}, Groups{});
   EXPECT_THAT(all.removed_flows, UnorderedElementsAreArray(foreign));
   EXPECT_THAT(all.forgotten, IsEmpty());
@@ -134,8 +137,7 @@ TEST(ADifference, ForgetsWhatIsLearnedOtherwiseNow) {
   auto const forgotten = [&](Flow const &wanted) {
     return difference(present, Groups{}, Flows{wanted}, Groups{}).forgotten;
   };
-  EXPECT_THAT(forgotten(teacher(2, 300)),
-              ElementsAre(simhost::openvswitch::LearnedFlows{.table = 6, .cookie = 7}));
+  EXPECT_THAT(forgotten(teacher(2, 300)), ElementsAre(LearnedFlows{.table = 6, .cookie = 7}));
   // How long it stays makes it nothing else.
   EXPECT_THAT(forgotten(teacher(1, 60)), IsEmpty());
   // All of it goes at once.
@@ -168,10 +170,21 @@ TEST(WhatIsThere, DiffersFromAllThatIsWantedIfItSaysMore) {
   EXPECT_THAT(all.changed_flows, ElementsAre(drops));
   EXPECT_THAT(all.changed_groups, ElementsAre(group(1, 1)));
   // Whatever is at places that nobody can say goes, and what has its cookie comes back.
-  EXPECT_THAT(present.unplaced,
-              ElementsAre(simhost::openvswitch::LearnedFlows{.table = 2, .cookie = 5}));
+  EXPECT_THAT(present.unplaced, ElementsAre(LearnedFlows{.table = 2, .cookie = 5}));
   EXPECT_THAT(all.added_flows, ElementsAre(two, other));
   EXPECT_THAT(all.removed_flows, IsEmpty());
+}
+
+TEST(WhatIsThere, IsPutInItsOrder) {
+  std::vector<simhost::openflow::FlowEntry> flows;
+  std::vector<simhost::openflow::GroupEntry> groups;
+  for (auto const number : {2, 3, 1}) {
+    flows.emplace_back().flow = flow(0, static_cast<std::uint16_t>(number), 4);
+    groups.emplace_back().group = group(static_cast<std::uint32_t>(number), 4);
+  }
+  auto const present = simhost::openvswitch::present_of(flows, groups);
+  EXPECT_THAT(present.flows, ElementsAre(flow(0, 1, 4), flow(0, 2, 4), flow(0, 3, 4)));
+  EXPECT_THAT(present.groups, ElementsAre(group(1, 4), group(2, 4), group(3, 4)));
 }
 
 TEST(WhatWasLearned, IsLearnedAnewAsItWouldBeNow) {
@@ -200,7 +213,9 @@ TEST(WhatWasLearned, IsLearnedAnewAsItWouldBeNow) {
   auto teaches = flow(3, 1, 2);
   teaches.actions = {learn};
   Flows const one{teaches};
-  EXPECT_EQ(Teachers(one).how_learned({.table = 6, .cookie = 7}), learn);
+  LearnedFlows const asked{.table = 6, .cookie = 7};
+  EXPECT_EQ(Teachers(one).how_learned(asked), learn);
+  EXPECT_EQ(Teachers(one, {asked}).how_learned(asked), learn);
   EXPECT_FALSE(Teachers(one).how_learned({.table = 6, .cookie = 8}));
   auto other = learn;
   auto teaches_too = teaches;
@@ -236,27 +251,97 @@ Flows applied(Flows flows, Difference const &told) {
   return flows;
 }
 
+// One of a few ways to teach the flows of a few cookies in table 3.
+Learn drawn_learn(std::mt19937 &chance) {
+  Learn learn{.table = 3,
+              .priority = 10,
+              .cookie = chance() % 3,
+              .hard_timeout = static_cast<std::uint16_t>(chance() % 2),
+              .specs = {}};
+  learn.specs.emplace_back(
+      simhost::openflow::LearnedMatch{.field = simhost::openflow::whole(Field::in_port),
+                                      .content = simhost::openflow::whole(Field::in_port)});
+  learn.specs.emplace_back(simhost::openflow::LearnedLoad{
+      .destination = simhost::openflow::whole(Field::reg6), .content = 1 + chance() % 2});
+  return learn;
+}
+
 Flows drawn(std::mt19937 &chance) {
   Flows flows;
   for (std::uint8_t table = 0; table < 3; ++table) {
     for (std::uint16_t port = 1; port < 5; ++port) {
-      if (chance() % 3 != 0) {
-        flows.push_back(flow(table, port, chance() % 2, chance() % 2));
+      if (chance() % 3 == 0) {
+        continue;
+      }
+      flows.push_back(flow(table, port, chance() % 2, chance() % 2));
+      if (chance() % 3 == 0) {
+        flows.back().actions.emplace_back(drawn_learn(chance));
       }
     }
   }
-  std::ranges::shuffle(flows, chance);
   return flows;
+}
+
+// What one of them may have learned, and what not.
+Flows drawn_learned(std::mt19937 &chance) {
+  Flows flows;
+  for (std::uint16_t port = 1; port < 5; ++port) {
+    flows.push_back(flow(3, port, 1, chance() % 3));
+    flows.back().actions = {simhost::openflow::set(Field::reg6, chance() % 3)};
+  }
+  return flows;
+}
+
+using Taught = std::map<LearnedFlows, std::set<decltype(Learn::specs)>>;
+
+Taught taught_by_all(Flows const &flows) {
+  Taught taught;
+  for (auto const &flow : flows) {
+    for_each_learn(flow.actions, [&](Learn const &learn) {
+      taught[simhost::openvswitch::taught_by(learn)].insert(learn.specs);
+    });
+  }
+  return taught;
 }
 
 TEST(ADifference, LeadsFromAnyFlowsToAnyOthers) {
   std::mt19937 chance(1);  // NOLINT(cert-msc32-c,cert-msc51-cpp): the same in each run
   for (int round = 0; round < 500; ++round) {
     auto const present = drawn(chance);
-    auto wanted = drawn(chance);
+    auto const wanted = drawn(chance);
     auto const reached = applied(present, difference(present, Groups{}, wanted, Groups{}));
-    std::ranges::sort(wanted);
     ASSERT_EQ(reached, wanted) << "in round " << round;
+  }
+}
+
+TEST(ADifference, KeepsWhatIsTaughtAsBeforeAndForgetsWhatIsTaughtOtherwise) {
+  std::mt19937 chance(2);  // NOLINT(cert-msc32-c,cert-msc51-cpp): the same in each run
+  for (int round = 0; round < 500; ++round) {
+    auto present = drawn(chance);
+    std::ranges::copy(drawn_learned(chance), std::back_inserter(present));
+    auto const wanted = drawn(chance);
+    auto const all = difference(present, Groups{}, wanted, Groups{});
+    auto const after = taught_by_all(wanted);
+    std::vector<LearnedFlows> forgotten;
+    for (auto const &[flows, ways] : taught_by_all(present)) {
+      auto const found = after.find(flows);
+      if (found != after.end() && !std::ranges::includes(found->second, ways)) {
+        forgotten.push_back(flows);
+      }
+    }
+    ASSERT_EQ(all.forgotten, forgotten) << "in round " << round;
+    simhost::openvswitch::Teachers const teachers(wanted);
+    Flows removed;
+    for (auto const &flow : present) {
+      bool const is_wanted = std::ranges::any_of(
+          wanted, [&](Flow const &other) { return place(other) == place(flow); });
+      bool const is_forgotten =
+          std::ranges::count(forgotten, simhost::openvswitch::known_by(flow)) > 0;
+      if (!is_wanted && !is_forgotten && !teachers.teach(flow)) {
+        removed.push_back(flow);
+      }
+    }
+    ASSERT_EQ(all.removed_flows, removed) << "in round " << round;
   }
 }
 

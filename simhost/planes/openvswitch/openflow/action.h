@@ -147,4 +147,16 @@ class Action : public std::variant<Output, OutputFrom, OutputTruncated, ToContro
   using variant::variant;
 };
 
+/// Does `what` with each Learn of a list, with those in its Clones too.
+template <typename What>
+void for_each_learn(Actions const &actions, What const &what) {
+  for (auto const &action : actions) {
+    if (auto const *const learn = std::get_if<Learn>(&action)) {
+      what(*learn);
+    } else if (auto const *const clone = std::get_if<Clone>(&action)) {
+      for_each_learn(clone->actions, what);
+    }
+  }
+}
+
 }  // namespace simhost::openflow

@@ -1,4 +1,4 @@
-// Both sides in the order of their places, side by side.
+// Side by side, in the order of the places.
 #include "planes/openvswitch/reconcile/difference.h"
 
 #include <algorithm>
@@ -6,7 +6,6 @@
 #include <map>
 #include <set>
 #include <utility>
-#include <variant>
 
 #include "planes/openvswitch/reconcile/relearning.h"
 
@@ -15,8 +14,9 @@ namespace {
 
 using openflow::Flow;
 using openflow::Group;
+using openflow::Learn;
 
-using Specs = decltype(openflow::Learn::specs);
+using Specs = decltype(Learn::specs);
 
 struct InOrder {
   bool operator()(Specs const *one, Specs const *other) const { return *one < *other; }
@@ -26,20 +26,17 @@ struct InOrder {
 // there may be, makes it nothing else.
 using Learned = std::map<LearnedFlows, std::set<Specs const *, InOrder>>;
 
-void add_learned(openflow::Actions const &actions, Learned &learned) {
-  for (auto const &action : actions) {
-    if (auto const *const learn = std::get_if<openflow::Learn>(&action)) {
-      learned[{.table = learn->table, .cookie = learn->cookie}].insert(&learn->specs);
-    } else if (auto const *const clone = std::get_if<openflow::Clone>(&action)) {
-      add_learned(clone->actions, learned);
-    }
-  }
-}
-
-Learned learned_by(std::span<Flow const> flows) {
+// What is learned by `wanted`, as far as it was learned by what goes: nearly all flows stay.
+Learned learned_instead(std::span<Flow const> wanted, Learned const &gone) {
   Learned learned;
-  for (auto const &flow : flows) {
-    add_learned(flow.actions, learned);
+  if (!gone.empty()) {
+    for (auto const &flow : wanted) {
+      for_each_learn(flow.actions, [&](Learn const &learn) {
+        if (auto const taught = taught_by(learn); gone.contains(taught)) {
+          learned[taught].insert(&learn.specs);
+        }
+      });
+    }
   }
   return learned;
 }
@@ -56,43 +53,44 @@ std::vector<LearnedFlows> learned_otherwise(Learned const &before, Learned const
   return changed;
 }
 
-template <typename Value, typename Place>
-std::vector<Value const *> in_order(std::span<Value const> values, Place const &place) {
-  std::vector<Value const *> pointers;
-  pointers.reserve(values.size());
-  for (auto const &value : values) {
-    pointers.push_back(&value);
+// Without those that somebody wanted teaches, and those that are forgotten anyway.
+std::vector<Flow> removed(std::vector<Flow const *> const &unwanted, std::span<Flow const> wanted,
+                          std::vector<LearnedFlows> const &forgotten) {
+  std::set<LearnedFlows> known;
+  for (auto const *flow : unwanted) {
+    known.insert(known_by(*flow));
   }
-  auto const less = [&](auto const *one, auto const *other) { return place(*one) < place(*other); };
-  // What was compiled is so already.
-  if (!std::ranges::is_sorted(pointers, less)) {
-    std::ranges::sort(pointers, less);
+  std::vector<Flow> removed;
+  if (!known.empty()) {
+    Teachers const teachers(wanted, known);
+    for (auto const *flow : unwanted) {
+      if (!teachers.teach(*flow) && !std::ranges::binary_search(forgotten, known_by(*flow))) {
+        removed.push_back(*flow);
+      }
+    }
   }
-  return pointers;
+  return removed;
 }
 
 // Does `removed` with what is only present, `added` with what is only wanted, and `both` with
 // pairs.
 template <typename Value, typename Place, typename Removed, typename Added, typename Both>
-void side_by_side(std::span<Value const> present_values, std::span<Value const> wanted_values,
-                  Place const &place, Removed const &removed, Added const &added,
-                  Both const &both) {
-  auto const present = in_order(present_values, place);
-  auto const wanted = in_order(wanted_values, place);
+void side_by_side(std::span<Value const> present, std::span<Value const> wanted, Place const &place,
+                  Removed const &removed, Added const &added, Both const &both) {
   auto have = present.begin();
   auto want = wanted.begin();
   while (have != present.end() && want != wanted.end()) {
-    auto const order = place(**have) <=> place(**want);
+    auto const order = place(*have) <=> place(*want);
     if (std::is_lt(order)) {
-      removed(**have++);
+      removed(*have++);
     } else if (std::is_gt(order)) {
-      added(**want++);
+      added(*want++);
     } else {
-      both(**have++, **want++);
+      both(*have++, *want++);
     }
   }
-  std::for_each(have, present.end(), [&](auto const *one) { removed(*one); });
-  std::for_each(want, wanted.end(), [&](auto const *one) { added(*one); });
+  std::for_each(have, present.end(), removed);
+  std::for_each(want, wanted.end(), added);
 }
 
 }  // namespace
@@ -115,27 +113,28 @@ Difference difference(std::span<Flow const> present_flows, std::span<Group const
           all.changed_groups.push_back(wanted);
         }
       });
-  all.forgotten = learned_otherwise(learned_by(present_flows), learned_by(wanted_flows));
-  Teachers const teachers(wanted_flows);
-  auto const stays_or_is_forgotten = [&](Flow const &flow) {
-    LearnedFlows const known{.table = flow.table, .cookie = flow.cookie};
-    return teachers.teach(flow) || std::ranges::binary_search(all.forgotten, known);
+  std::vector<Flow const *> unwanted;
+  Learned gone;
+  auto const note_learned = [&](Flow const &flow) {
+    for_each_learn(flow.actions,
+                   [&](Learn const &learn) { gone[taught_by(learn)].insert(&learn.specs); });
   };
   side_by_side(
       present_flows, wanted_flows, [](Flow const &flow) { return place(flow); },
       [&](Flow const &flow) {
-        if (!stays_or_is_forgotten(flow)) {
-          all.removed_flows.push_back(flow);
-        }
+        note_learned(flow);
+        unwanted.push_back(&flow);
       },
       [&](Flow const &flow) { all.added_flows.push_back(flow); },
       [&](Flow const &present, Flow const &wanted) {
-        if (settings(present) != settings(wanted)) {
-          all.added_flows.push_back(wanted);
-        } else if (present.actions != wanted.actions) {
-          all.changed_flows.push_back(wanted);
+        bool const is_same_kind = settings(present) == settings(wanted);
+        if (!is_same_kind || present.actions != wanted.actions) {
+          note_learned(present);
+          (is_same_kind ? all.changed_flows : all.added_flows).push_back(wanted);
         }
       });
+  all.forgotten = learned_otherwise(gone, learned_instead(wanted_flows, gone));
+  all.removed_flows = removed(unwanted, wanted_flows, all.forgotten);
   return all;
 }
 

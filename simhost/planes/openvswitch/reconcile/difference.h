@@ -20,6 +20,15 @@ struct LearnedFlows {
   friend auto operator<=>(LearnedFlows const &, LearnedFlows const &) = default;
 };
 
+/// What a flow with that action learns.
+inline LearnedFlows taught_by(openflow::Learn const &learn) {
+  return {.table = learn.table, .cookie = learn.cookie};
+}
+/// What knows a flow, if it was learned.
+inline LearnedFlows known_by(openflow::Flow const &flow) {
+  return {.table = flow.table, .cookie = flow.cookie};
+}
+
 /// To be done in the order of the members, all of it or nothing.
 struct Difference {
   /// What was learned by flows that teach otherwise now: it would stand in the way of what is to be
@@ -37,8 +46,8 @@ struct Difference {
   [[nodiscard]] bool empty() const;
 };
 
-/// What the switch learned by a wanted flow that teaches as it did stays: see Teachers. No two
-/// flows of either list have one place, and no two groups one number.
+/// What the switch learned by a wanted flow that teaches as it did stays: see Teachers. All lists
+/// are in their order, no two flows of one have one place, and no two groups one number.
 Difference difference(std::span<openflow::Flow const> present_flows,
                       std::span<openflow::Group const> present_groups,
                       std::span<openflow::Flow const> wanted_flows,

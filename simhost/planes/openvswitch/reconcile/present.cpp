@@ -12,10 +12,6 @@ using openflow::FlowEntry;
 using openflow::Group;
 using openflow::GroupEntry;
 
-LearnedFlows cookie_of(Flow const &flow) {
-  return {.table = flow.table, .cookie = flow.cookie};
-}
-
 // No flow that is wanted has a note.
 Flow flow_of(FlowEntry const &entry) {
   auto flow = entry.flow;
@@ -41,15 +37,17 @@ Present present_of(std::span<FlowEntry const> flows, std::span<GroupEntry const>
   std::set<LearnedFlows> unplaced;
   for (auto const &entry : flows) {
     if (!entry.has_match) {
-      unplaced.insert(cookie_of(entry.flow));
+      unplaced.insert(known_by(entry.flow));
     }
   }
   for (auto const &entry : flows) {
-    if (!unplaced.contains(cookie_of(entry.flow))) {
+    if (!unplaced.contains(known_by(entry.flow))) {
       present.flows.push_back(flow_of(entry));
     }
   }
   std::ranges::transform(groups, std::back_inserter(present.groups), group_of);
+  std::ranges::sort(present.flows);
+  std::ranges::sort(present.groups);
   present.unplaced.assign(unplaced.begin(), unplaced.end());
   return present;
 }

@@ -48,17 +48,18 @@ bool add(openflow::LearnedOutput const & /*spec*/, Flow const & /*before*/, Flow
 
 Teachers::Teachers(std::span<Flow const> flows) {
   for (auto const &flow : flows) {
-    add(flow.actions);
+    for_each_learn(flow.actions,
+                   [&](Learn const &learn) { ways_[taught_by(learn)].push_back(&learn); });
   }
 }
 
-void Teachers::add(openflow::Actions const &actions) {
-  for (auto const &action : actions) {
-    if (auto const *const learn = std::get_if<Learn>(&action)) {
-      ways_[{.table = learn->table, .cookie = learn->cookie}].push_back(learn);
-    } else if (auto const *const clone = std::get_if<openflow::Clone>(&action)) {
-      add(clone->actions);
-    }
+Teachers::Teachers(std::span<Flow const> flows, std::set<LearnedFlows> const &learned) {
+  for (auto const &flow : flows) {
+    for_each_learn(flow.actions, [&](Learn const &learn) {
+      if (auto const taught = taught_by(learn); learned.contains(taught)) {
+        ways_[taught].push_back(&learn);
+      }
+    });
   }
 }
 

@@ -4,6 +4,7 @@
 
 #include <map>
 #include <optional>
+#include <set>
 #include <span>
 #include <vector>
 
@@ -16,6 +17,8 @@ namespace simhost::openvswitch {
 class Teachers {
  public:
   explicit Teachers(std::span<openflow::Flow const> flows);
+  /// Likewise, as far as they teach those: nothing is known of others.
+  Teachers(std::span<openflow::Flow const> flows, std::set<LearnedFlows> const &learned);
 
   /// The one way in which some of them teach those, whatever their limits; nothing if there are
   /// several.
@@ -25,8 +28,6 @@ class Teachers {
   [[nodiscard]] bool teach(openflow::Flow const &flow) const;
 
  private:
-  void add(openflow::Actions const &actions);
-
   std::map<LearnedFlows, std::vector<openflow::Learn const *>> ways_;
 };
 
