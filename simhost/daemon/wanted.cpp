@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <span>
 #include <utility>
 
 #include "base/outcomes.h"
@@ -24,8 +25,9 @@
 namespace simhost::daemon {
 namespace {
 
-void add_devices(storage::Transaction &transaction, WantedBridge &bridge) {
-  for (auto const &[port, device] : storage::port_devices(transaction, bridge.key)) {
+void add_devices(storage::Transaction &transaction, std::span<storage::PortDevice const> connected,
+                 WantedBridge &bridge) {
+  for (auto const &[port, device] : connected) {
     bridge.row.devices.emplace(device.name, device.number);
     bridge.ports.emplace(device.name, static_cast<std::uint32_t>(port));
     bridge.numbers.emplace(device.number, static_cast<std::uint32_t>(port));
@@ -142,13 +144,14 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                         .sessions = {},
                         .aging = {},
                         .flows = {}};
-    add_devices(transaction, bridge);
+    auto const connected = storage::port_devices(transaction, key);
+    add_devices(transaction, connected, bridge);
     if (!row.associated || bridge.row.devices.empty()) {
       continue;
     }
     try {
       auto const team = team_with_devices(transaction, key);
-      auto read = openvswitch::read_network(transaction, key, team, {});
+      auto read = openvswitch::read_network(transaction, key, team, connected, {});
       complete(key, read);
       auto const &[network, flows] = compiler.compile(key, std::move(read));
       bridge.flows = flows;

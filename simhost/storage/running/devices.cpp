@@ -62,6 +62,13 @@ std::vector<PortDevice> port_devices(Transaction &transaction, SwitchKey key) {
   });
 }
 
+bool has_port_device(Transaction &transaction, SwitchKey key) {
+  Query select(transaction,
+               "SELECT 1 FROM port JOIN device ON device.port = port.number"
+               " WHERE port.switch = ? LIMIT 1");
+  return select.with(key).next();
+}
+
 std::optional<DeviceHolder> find_device(Transaction &transaction, std::string_view name) {
   Query select(transaction, "SELECT uplink, port FROM device WHERE name = ?");
   return select.with(name).first([](Query const &row) {

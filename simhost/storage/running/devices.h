@@ -41,6 +41,8 @@ std::optional<Device> device_of(Transaction &transaction, std::string_view uplin
 std::optional<Device> device_of(Transaction &transaction, PortNumber port);
 /// The devices of a switch's ports that are no uplink ports, in the order of the ports.
 std::vector<PortDevice> port_devices(Transaction &transaction, SwitchKey key);
+/// Whether there are any.
+bool has_port_device(Transaction &transaction, SwitchKey key);
 /// Whose device `name` is.
 std::optional<DeviceHolder> find_device(Transaction &transaction, std::string_view name);
 /// The name of a device that an uplink or a port has, if any has one.

@@ -152,8 +152,9 @@ simhost::openvswitch::Compiled made_of(ChangingTransaction &transaction,
                                        simhost::openvswitch::Observed const &observed) {
   try {
     auto const team = simhost::teaming::team_of(transaction, key, simhost::stored::link_of);
+    auto const connected = simhost::storage::port_devices(transaction, key);
     return simhost::openvswitch::compile(
-        simhost::openvswitch::read_network(transaction, key, team, observed));
+        simhost::openvswitch::read_network(transaction, key, team, connected, observed));
   } catch (simhost::Refused const &refused) {
     if (!simhost::openvswitch::may_be_refused(transaction, key)) {
       throw std::logic_error("no caller expects this to be refused: " +

@@ -41,9 +41,11 @@ struct Devices : testing::Test {
 constexpr MacBytes kClient{std::byte{2}, {}, {}, {}, {}, std::byte{1}};
 
 TEST_F(Devices, AreFoundByTheirHoldersAndTheOtherWayRound) {
+  EXPECT_FALSE(has_port_device(transaction, key));
   ASSERT_TRUE(put(p2, "tap2"));
   ASSERT_TRUE(put_device(transaction, p1, "tap1", kClient));
   ASSERT_TRUE(put_device(transaction, "nic0", "eth1"));
+  EXPECT_TRUE(has_port_device(transaction, key));
   auto const devices = port_devices(transaction, key);
   ASSERT_EQ(devices.size(), 2U);
   EXPECT_EQ(devices[0].port, p1);

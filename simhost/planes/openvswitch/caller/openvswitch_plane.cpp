@@ -155,7 +155,7 @@ bool has_uplink_device(storage::Transaction &transaction, storage::SwitchKey key
 }
 
 bool has_device(storage::Transaction &transaction, storage::SwitchKey key) {
-  return !storage::port_devices(transaction, key).empty() || has_uplink_device(transaction, key);
+  return storage::has_port_device(transaction, key) || has_uplink_device(transaction, key);
 }
 
 // The switches of which no flows can be made, and why.
@@ -168,7 +168,8 @@ std::map<storage::SwitchKey, Refused> unfit_switches(storage::Transaction &trans
     if (row.associated && may_be_refused(transaction, key) && has_device(transaction, key)) {
       try {
         auto const team = teaming::team_of(transaction, key, links);
-        check(read_network(transaction, key, team, {}));
+        auto const connected = storage::port_devices(transaction, key);
+        check(read_network(transaction, key, team, connected, {}));
       } catch (Refused const &why) {
         unfit.emplace(key, why);
       }

@@ -165,8 +165,12 @@ void read_filter(Settings const &settings, storage::PortNumber number, Port &por
 class Reader {
  public:
   Reader(storage::Transaction &transaction, storage::SwitchKey key, teaming::Team const &team,
-         Observed const &observed)
-      : transaction_(transaction), key_(key), team_(team), observed_(observed) {}
+         std::span<storage::PortDevice const> connected, Observed const &observed)
+      : transaction_(transaction),
+        key_(key),
+        team_(team),
+        connected_(connected),
+        observed_(observed) {}
 
   Network read() {
     read_switch();
@@ -215,7 +219,8 @@ class Reader {
   void read_ports() {
     Settings const settings(transaction_, key_);
     add_team(team_.policy);
-    for (auto const &connected : storage::port_devices(transaction_, key_)) {
+    network_.ports.reserve(connected_.size());
+    for (auto const &connected : connected_) {
       read_port(settings, connected);
     }
   }
@@ -234,7 +239,7 @@ class Reader {
     read_address(settings, connected, observed_, port);
     read_learning(settings.management.of(number).portMACLearning, port);
     read_filter(settings, number, port);
-    network_.ports.push_back(port);
+    network_.ports.push_back(std::move(port));
   }
 
   std::size_t team_of(Settings const &settings, storage::PortNumber number) {
@@ -315,6 +320,7 @@ class Reader {
   storage::Transaction &transaction_;
   storage::SwitchKey key_;
   teaming::Team const &team_;
+  std::span<storage::PortDevice const> connected_;
   Observed const &observed_;
   Network network_;
 };
@@ -322,8 +328,9 @@ class Reader {
 }  // namespace
 
 Network read_network(storage::Transaction &transaction, storage::SwitchKey key,
-                     teaming::Team const &team, Observed const &observed) {
-  return Reader(transaction, key, team, observed).read();
+                     teaming::Team const &team, std::span<storage::PortDevice const> connected,
+                     Observed const &observed) {
+  return Reader(transaction, key, team, connected, observed).read();
 }
 
 bool may_be_refused(storage::Transaction &transaction, storage::SwitchKey key) {

@@ -3,10 +3,12 @@
 
 #include <cstdint>
 #include <map>
+#include <span>
 
 #include "model/teaming/team.h"
 #include "planes/openvswitch/compile/network.h"
 #include "storage/ports.h"
+#include "storage/running/devices.h"
 
 namespace simhost::openvswitch {
 
@@ -21,9 +23,11 @@ struct Observed {
 };
 
 /// The uplinks and ports that have a device, by the numbers of their devices. `team` has the links
-/// as they are. Refuses mirror sessions of kinds that are not mirrored here (QEX_NOT_SUPPORTED).
+/// as they are, `connected` the devices of the ports. Refuses mirror sessions of kinds that are not
+/// mirrored here (QEX_NOT_SUPPORTED).
 Network read_network(storage::Transaction &transaction, storage::SwitchKey key,
-                     teaming::Team const &team, Observed const &observed);
+                     teaming::Team const &team, std::span<storage::PortDevice const> connected,
+                     Observed const &observed);
 
 /// Whether a switch has anything that read_network() or check() may refuse, which is told at once:
 /// of all that a state can hold, mirror sessions may be more than flows can do, and so may many
