@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "abi/fresh_host.h"
+#include "daemon/cached_flows.h"
 #include "daemon/devices/links.h"
 #include "daemon/only_one.h"
 #include "daemon/wanted.h"
@@ -299,6 +300,16 @@ void Daemon::take_out_new_devices(Wanted const &wanted) {
   }
 }
 
+// Without which it is in force for most frames only.
+void Daemon::forget_cached_flows() {
+  try {
+    simhost::daemon::forget_cached_flows(options_.database.parent_path());
+  } catch (std::runtime_error const &error) {
+    troubles_.add(
+        fmt::format("frames may go on for a while as they went before a change: {}", error.what()));
+  }
+}
+
 void Daemon::sync() {
   bool const is_told = !std::exchange(follows_members_, false);
   follow_devices();
@@ -319,6 +330,7 @@ void Daemon::sync() {
   take_out_new_devices(all);
   auto const changed = bridges_->apply(all);
   if (changed > 0 && is_told) {
+    forget_cached_flows();
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
   announcer_.follow(all, memory_);

@@ -55,6 +55,7 @@ class Daemon {
   void sync_soon();
   void sync_after(std::optional<ClockTime> const &wait);
   void sync();
+  void forget_cached_flows();
   void follow_devices();
   void take_out_new_devices(Wanted const &wanted);
   void settle(Wanted const &wanted);

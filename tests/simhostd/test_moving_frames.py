@@ -26,6 +26,39 @@ def test_a_vlan_cuts_and_joins(lab: Lab) -> None:
     assert one.ceases_to_reach(other)
 
 
+def test_no_frame_goes_as_before_once_a_call_has_returned(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+
+    def sent(times: int) -> bytes:
+        made = frame(other.mac, one.mac, payload=bytes([times]) * 46)
+        one.send(made)
+        return made
+
+    other.expect(sent(1))
+    # By itself Open vSwitch changes nothing any more of what it has remembered since.
+    lab.control("revalidator/pause")
+    lab.set_port("lab", "a", vlan=7)
+    cut = sent(2)
+    lab.control("revalidator/resume")
+    lab.set_port("lab", "b", vlan=7)
+    other.expect(sent(3))
+    other.expect_none(lambda came: came == cut)
+
+
+def test_it_is_said_if_nobody_can_make_open_vswitch_forget(lab: Lab) -> None:
+    lab.client("lab", "a")
+    control = lab.run_folder() / "ovs-vswitchd.ctl"
+    hidden = control.rename(lab.run_folder() / "hidden.ctl")
+    lab.set_port("lab", "a", vlan=7)
+    plane = lab.plane()
+    assert plane["in_force"] == plane["change"]
+    assert "frames may go on for a while as they went before a change" in plane["said"]
+    hidden.rename(control)
+    lab.set_port("lab", "a", vlan=8)
+    assert lab.plane()["said"] == ""
+
+
 def test_a_client_that_says_nothing_is_known_in_another_vlan(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     # Of neither port the address is configured.

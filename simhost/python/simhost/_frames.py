@@ -105,8 +105,8 @@ class Client:
     def ceases_to_reach(self, other: "Client", timeout: float = 30.0) -> bool:
         """At some time no ping is replied to any more.
 
-        Open vSwitch has put a change through when it says so, but on a busy machine the last
-        frames still go as it remembers them.
+        What the host changes is in force when its call returns; what happens around it, such as a
+        cable that is pulled, has to be noticed first.
         """
         deadline = time.monotonic() + timeout
         while self.reaches(other):
