@@ -78,7 +78,10 @@ ENTITIES: Dict[str, List[Dict[str, Any]]] = {
 @st.composite
 def sessions(draw: Any, name: str, uplinks: List[str]) -> Any:
     """A mirror session of a port's table."""
-    places = [{"port": "p3"}, {"port": "p4"}, *({"uplink": uplink} for uplink in uplinks)]
+    takes = bool(uplinks) and draw(st.booleans())
+    places = [{"port": "p3"}, {"port": "p4"}]
+    if not takes:
+        places += [{"uplink": uplink} for uplink in uplinks]
     said: Dict[str, Any] = {
         "sid": name,
         "to": draw(st.lists(st.sampled_from(places), max_size=2, unique_by=str)),
@@ -89,6 +92,9 @@ def sessions(draw: Any, name: str, uplinks: List[str]) -> Any:
         "no_input": draw(RARELY),
         "encapsulation": {"vlan": draw(st.sampled_from([0, 7, 50]))},
     }
+    if takes:
+        vlans = draw(st.sets(st.sampled_from([7, 50]), max_size=2))
+        return {**said, "type": "remote_destination", "received_by": [{"vlan": v} for v in vlans]}
     for direction, named in ENTITIES.items():
         there = [one for one in named if "uplink" not in one or one["uplink"] in uplinks]
         said[direction] = draw(st.lists(st.sampled_from(there), max_size=2, unique_by=str))
@@ -170,7 +176,7 @@ def all_clients(draw: Any) -> Any:
 
 CLIENTS = all_clients()
 ADDRESSES = [*MACS.values(), *FIXED, OTHER, STRANGER]
-VIDS = [*VLANS, *IN_MAP, 7, 7, 4095]
+VIDS = [*VLANS, *IN_MAP, 7, 7, 50, 4095]
 PLACES = [*PORTS, *UPLINKS]
 
 

@@ -132,9 +132,7 @@ class Rules:
 
     def enters(self, at: str, frame: Frame) -> Optional[Inside]:
         """A frame as one of the switch's; nothing if it is none."""
-        if self.switch.get("disabled") or _is_malformed(frame):
-            return None
-        if frame.destination.startswith("01:80:c2:00:00:0"):
+        if self._is_refused(frame):
             return None
         if at in self.uplinks:
             entered: Optional[Entered] = ((frame.tags or ((0, 0),))[0], frame.tags[1:])
@@ -149,6 +147,12 @@ class Rules:
         if (rest and vlan == 0) or too_large:
             return None
         return Inside(vlan, priority, rest, frame.size + tags)
+
+    def _is_refused(self, frame: Frame) -> bool:
+        """Wherever it comes from."""
+        if self.switch.get("disabled") or _is_malformed(frame):
+            return True
+        return frame.destination.startswith("01:80:c2:00:00:0")
 
     def _enters_port(self, at: str, frame: Frame) -> Optional[Entered]:
         forged = at in self.macs and frame.source != self.macs[at]
@@ -335,22 +339,60 @@ class Rules:
         """The copies of a frame that came in at `at`, for what mirrors that source."""
         out: Counts[Copy] = Counter()
         for session in self._sessions():
-            if source not in session.get(direction, []):
-                continue
-            most = session.get("snap_length", 0)
-            for to in session["to"]:
-                place = to.get("port", to.get("uplink"))
-                tags = inside.rest
-                if "uplink" in to:
-                    tags = ((session.get("encapsulation", {}).get("vlan", 0), 0), *tags)
-                elif session.get("keeps_vlan") and inside.vlan:
-                    tags = ((inside.vlan, inside.priority), *tags)
-                # The switch sends nothing to where it came from.
-                reached = "uplink" in to or (
-                    place in self.connected and not self._is_cut_off(place)
-                )
-                if reached and place != at:
-                    out[(place, tags, inside.cut(most, tags))] += 1
+            if not self._is_taker(session) and source in session.get(direction, []):
+                out += self._copied(session, inside, at)
+        return out
+
+    def _copied(self, session: Mapping[str, Any], inside: Inside, at: str) -> Counts[Copy]:
+        out: Counts[Copy] = Counter()
+        most = session.get("snap_length", 0)
+        for to in session["to"]:
+            place = to.get("port", to.get("uplink"))
+            tags = inside.rest
+            remote = self._encapsulation(session) if "uplink" in to else 0
+            # No frame has three tags.
+            if session.get("keeps_vlan") and inside.vlan and not (remote and inside.rest):
+                tags = ((inside.vlan, inside.priority), *tags)
+            if remote:
+                tags = ((remote, 0), *tags)
+            # The switch sends nothing to where it came from.
+            reached = "uplink" in to or (place in self.connected and not self._is_cut_off(place))
+            if reached and place != at:
+                out[(place, tags, inside.cut(most, tags))] += 1
+        return out
+
+    @staticmethod
+    def _encapsulation(session: Mapping[str, Any]) -> int:
+        """The VLAN of its copies on uplinks."""
+        return int(session.get("encapsulation", {}).get("vlan", 0))
+
+    @staticmethod
+    def _is_taker(session: Mapping[str, Any]) -> bool:
+        return bool(session.get("type") == "remote_destination")
+
+    def _taken(self, session: Mapping[str, Any]) -> Set[int]:
+        """The VLANs that hold nothing but copies, for a session that takes or makes them."""
+        vlans = {self._encapsulation(session)}
+        if self._is_taker(session):
+            vlans |= {source["vlan"] for source in session["received_by"]}
+        elif not any(to.get("uplink") in self.uplinks for to in session["to"]):
+            vlans = set()
+        return vlans - {0}
+
+    def _copies_of_others(self, at: str, frame: Frame) -> Optional[Counts[Copy]]:
+        """What comes out of a copy that comes in at an uplink; nothing if it is none."""
+        vlan, priority = frame.tags[0] if frame.tags else (0, 0)
+        if self._is_refused(frame) or not any(
+            vlan in self._taken(session) for session in self._sessions()
+        ):
+            return None
+        out: Counts[Copy] = Counter()
+        inside = Inside(vlan, priority, frame.tags[1:], frame.size + TAG * len(frame.tags[1:]))
+        for session in self._sessions():
+            if self._is_taker(session) and vlan in self._taken(session):
+                ports = [to["port"] for to in session["to"] if to["port"] in self.connected]
+                if ports and self.receives_at(ports[0], at, None):
+                    out += self._copied(session, inside, at)
         return out
 
     # All of it
@@ -358,8 +400,11 @@ class Rules:
     def comes_out(self, at: str, frame: Frame) -> List[Counts[Copy]]:
         """What comes out of a frame: one of these, for the uplink that carries it may be one of
         several."""
-        inside = self.enters(at, frame)
         from_uplink = at in self.uplinks
+        copies = self._copies_of_others(at, frame) if from_uplink else None
+        if copies is not None:
+            return [copies]
+        inside = self.enters(at, frame)
         if inside is None or (from_uplink and self._is_back(frame, inside.vlan)):
             return [Counter()]
         direction, source = ("received_by", "uplink") if from_uplink else ("sent_by", "port")

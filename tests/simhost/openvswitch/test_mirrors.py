@@ -114,6 +114,73 @@ def test_a_copy_is_cut_by_itself(bench: Bench) -> None:
     assert out == {("p2", *cut): 1, ("p3", *cut): 1, ("nic0", ((7, 0),), None): 1}
 
 
+def test_a_copy_keeps_its_own_tag_inside_that_of_the_session(bench: Bench) -> None:
+    to = {"to": [{"uplink": "nic1"}]}
+    source: Dict[str, Any] = {"sent_by": [{"port": "p1"}], **to, "keeps_vlan": True}
+    load(bench, session(**source, encapsulation={"vlan": 50}))
+    copy = ("nic1", ((50, 0), (7, 0)), None)
+    assert bench.look("p1", Frame(P2, P1)) == {("p2", (), None): 1, copy: 1}
+    load(bench, session(**source))
+    assert bench.look("p1", Frame(P2, P1))[("nic1", ((7, 0),), None)] == 1
+    load(bench, session(**{**source, "keeps_vlan": False}))
+    assert bench.look("p1", Frame(P2, P1))[("nic1", (), None)] == 1
+
+
+TAKES: Dict[str, Any] = {"type": "remote_destination", "to": [{"port": "p2"}, {"port": "p3"}]}
+TAKEN = {("p2", (), None): 1, ("p3", (), None): 1}
+
+
+@pytest.mark.parametrize("vlan", [{"received_by": [{"vlan": 50}]}, {"encapsulation": {"vlan": 50}}])
+def test_what_others_mirrored_goes_to_the_ports_of_a_session_alone(
+    bench: Bench, vlan: Mapping[str, Any]
+) -> None:
+    """Once, although the network floods it to both uplinks; whoever else is meant."""
+    load(bench, session(**{**TAKES, **vlan}), {**session(received_from=["uplinks"]), "sid": "t"})
+    for destination in (BROADCAST, P1, STRANGER):
+        copy = Frame(destination, STRANGER, ((50, 3),))
+        assert bench.look("nic0", copy) == TAKEN
+        assert bench.look("nic1", copy) == {}
+    # A tag that it kept, and one byte more than a packet may have.
+    tagged = Frame(BROADCAST, STRANGER, ((50, 0), (7, 0)), 1515)
+    assert bench.look("nic0", tagged) == {(port, ((7, 0),), None): 1 for port in ("p2", "p3")}
+    assert bench.look("nic0", Frame(P1, STRANGER, ((7, 0),)))[("p1", (), None)] == 1
+    assert bench.look("p1", Frame(P2, P1, ())) == {("p2", (), None): 1}
+
+
+def test_what_others_mirrored_is_cut_and_keeps_its_tag(bench: Bench) -> None:
+    said = {**TAKES, "received_by": [{"vlan": 50}], "snap_length": 20, "keeps_vlan": True}
+    load(bench, session(**said))
+    cut = ((50, 3),), 24
+    out = bench.look("nic0", Frame(BROADCAST, STRANGER, ((50, 3),)))
+    assert out == {("p2", *cut): 1, ("p3", *cut): 1}
+    load(bench, {**session(**said), "to": [{"port": "p2"}]})
+    assert bench.look("nic0", Frame(BROADCAST, STRANGER, ((50, 3),))) == {("p2", *cut): 1}
+    load(bench, {**session(**said), "disabled": True})
+    assert bench.look("nic0", Frame(BROADCAST, STRANGER, ((50, 3),))) == {}
+
+
+def test_a_switch_takes_none_of_its_own_copies_back(bench: Bench) -> None:
+    """Nor mirrors it once more: two switches would go on for ever."""
+    source = {"received_from": ["uplinks"], "encapsulation": {"vlan": 50}}
+    load(bench, session(**source, to=[{"uplink": "nic1"}]))
+    for uplink in ("nic0", "nic1"):
+        assert bench.look(uplink, Frame(BROADCAST, STRANGER, ((50, 0),))) == {}
+    assert bench.look("nic0", Frame(P1, STRANGER, ((7, 0),))) == {
+        ("p1", (), None): 1,
+        ("nic1", ((50, 0),), None): 1,
+    }
+
+
+def test_a_source_and_a_destination_make_a_whole(bench: Bench) -> None:
+    load(
+        bench,
+        session(sent_by=[{"port": "p1"}], to=[{"uplink": "nic1"}], encapsulation={"vlan": 50}),
+    )
+    ((_, tags, _),) = [copy for copy in bench.look("p1", Frame(P2, P1)) if copy[0] == "nic1"]
+    load(bench, session(**TAKES, received_by=[{"vlan": 50}]))
+    assert bench.look("nic0", Frame(P2, P1, tags)) == TAKEN
+
+
 def test_one_that_nothing_passes_gets_no_copies(bench: Bench) -> None:
     ports = [
         {"id": "p1", "mirror_sessions": [session(sent_by=[{"port": "p1"}])]},
@@ -147,6 +214,11 @@ def test_a_session_that_stands_for_a_promiscuous_port(bench: Bench) -> None:
 OF_A_KIND = "mirrors clients of a kind, which are not told apart here"
 SOME_TRAFFIC = "mirrors some traffic of uplinks, which is not told apart here"
 WRAPS = "wraps what it mirrors, which is not done here"
+TAKES_MORE = "takes copies from uplinks, and mirrors from what is no VLAN of them"
+
+
+def takes(**said: Any) -> Dict[str, Any]:
+    return {"type": "remote_destination", **said}
 
 
 @pytest.mark.parametrize(
@@ -162,13 +234,18 @@ WRAPS = "wraps what it mirrors, which is not done here"
         ({"mirrors_uplinks": True}, SOME_TRAFFIC),
         ({"uplink_filter": "normal"}, SOME_TRAFFIC),
         ({"stack": True}, "mirrors on the side of the stack, which is not here"),
+        ({"type": "remote_source"}, "mirrors to other hosts, and has no VLAN for that"),
+        (takes(to=[{"uplink": "nic0"}]), "takes copies from uplinks, and mirrors to one"),
+        (takes(sent_by=[{"vlan": 7}]), TAKES_MORE),
+        (takes(received_by=[{"port": "p1"}]), TAKES_MORE),
+        (takes(received_from=["uplinks"]), TAKES_MORE),
     ],
 )
 def test_what_is_not_mirrored_here_is_refused(
     compiler: Compiler, said: Mapping[str, Any], why: str
 ) -> None:
     ports = [{"id": "p1", "mirror_sessions": [session(**said)]}]
-    answer = compiler.answer({"ports": ports}, [])
+    answer = compiler.answer({"uplinks": ["nic0"], "ports": ports}, [])
     assert answer == {"refused": f"the mirror session 's' {why}", "status": "QEX_NOT_SUPPORTED"}
 
 

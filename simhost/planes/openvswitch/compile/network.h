@@ -137,9 +137,11 @@ struct Mirror {
   MirrorSources sent;  ///< by clients of ports; to the wires of uplinks; by ports in VLANs
   std::vector<openflow::Port> to_ports;
   std::vector<openflow::Port> to_uplinks;
-  std::uint16_t remote_vlan = 0;  ///< the tag that copies have on uplinks
-  std::uint16_t most_bytes = 0;   ///< of a frame; 0 for all
-  bool keeps_vlan = false;        ///< copies have the tag of the frame's VLAN
+  std::uint16_t remote_vlan = 0;  ///< the tag that copies have on uplinks; 0: none but their own
+  /// Whose frames from uplinks are copies that others made, for this session.
+  std::vector<std::uint16_t> taken_vlans = {};
+  std::uint16_t most_bytes = 0;  ///< of a frame; 0 for all
+  bool keeps_vlan = false;       ///< copies have the tag of the frame's VLAN
 
   bool operator==(Mirror const &) const = default;
 };

@@ -29,6 +29,9 @@ inline constexpr std::uint8_t kNestedTags = 4;
 inline constexpr std::uint8_t kPrivateVlans = 5;
 /// Frames of this switch that come back over an uplink; asks kRecentSources.
 inline constexpr std::uint8_t kOwnFrames = 6;
+/// Copies that come in over an uplink: counts them, and asks at which uplink they are taken; reads
+/// kVlan, writes kWay.
+inline constexpr std::uint8_t kRemoteMirrors = 27;
 /// Asks the sessions; a frame that has come this far is one of the switch's.
 inline constexpr std::uint8_t kMirroring = 7;
 /// Sources that an uplink should not have for a while; fills kRecentSources.
@@ -196,6 +199,7 @@ enum class Counted : std::uint8_t {
   out_lost = 25,  ///< by the device itself, like the next ones
   in_damaged = 26,
   out_damaged = 27,
+  unwanted_copy = 28,  ///< dropped: a copy of a mirror session, which none here takes
 };
 
 constexpr std::uint64_t cookie(Counted counted, std::uint32_t number = 0) {
@@ -211,8 +215,9 @@ constexpr std::uint32_t number_of(std::uint64_t cookie) {
 }
 
 /// The tables whose flows count what callers are told of: by ports and sessions, in their cookies.
-inline constexpr std::array kCountingTables{table::kLimits,  table::kLookup,  table::kSwitchLimit,
-                                            table::kMirrors, table::kSending, table::kDropped};
+inline constexpr std::array kCountingTables{
+    table::kLimits,        table::kLookup,  table::kSwitchLimit, table::kMirrors,
+    table::kRemoteMirrors, table::kSending, table::kDropped};
 
 /// Groups of a way: the low bits are its number.
 inline constexpr openflow::GroupId kSendingGroups = 0x10000000;

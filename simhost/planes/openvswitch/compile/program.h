@@ -99,6 +99,9 @@ struct ByReceivers {
   Counted several;
   Counted all;
 };
+/// Of frames that are let in.
+inline constexpr ByReceivers kLetIn{
+    .one = Counted::in_unicast, .several = Counted::in_multicast, .all = Counted::in_broadcast};
 void add_by_receivers(Program &program, std::uint8_t table, Rule const &rule,
                       ByReceivers const &counted, std::uint32_t number);
 

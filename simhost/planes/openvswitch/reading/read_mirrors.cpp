@@ -24,6 +24,8 @@ namespace {
 constexpr unsigned kSessionBits = 11;
 static_assert(mirror::kMostSessions < 1U << kSessionBits);
 
+constexpr auto *kTakesMore = "takes copies from uplinks, and mirrors from what is no VLAN of them";
+
 // A device that a session names, by its port or as an uplink.
 struct Place {
   openflow::Port port;
@@ -54,15 +56,43 @@ class Sessions {
     Mirror mirror;
     mirror.id = id;
     mirror.sid = name_;
-    mirror.received = sources(session.received_by, record.wildIn);
-    mirror.sent = sources(session.sent_by, record.wildOut);
-    mirror.remote_vlan = record.encapVlan;
     mirror.most_bytes = snap_length(record.snapLen);
     mirror.keeps_vlan = (record.flags & VS_DVMIRROR_FLAG_DST_ORIG_VLAN) != 0;
     for (auto const &entity : session.to) {
       add_destination(mirror, record.flags, entity);
     }
+    if (record.type == VS_DVMIRROR_SESSIONTYPE_RMIRROR_DST) {
+      take_copies(mirror, session);
+    } else {
+      mirror.received = sources(session.received_by, record.wildIn);
+      mirror.sent = sources(session.sent_by, record.wildOut);
+      mirror.remote_vlan = record.encapVlan;
+    }
     network_.mirrors.push_back(std::move(mirror));
+  }
+
+  // The VLAN that the copies are wrapped in may be said as that of their encapsulation or as where
+  // they come from.
+  void take_copies(Mirror &mirror, mirror::Session const &session) const {
+    auto const &record = session.record;
+    if (!mirror.to_uplinks.empty()) {
+      refuse_session("takes copies from uplinks, and mirrors to one");
+    }
+    if (!session.sent_by.empty() || (record.wildIn | record.wildOut) != 0) {
+      refuse_session(kTakesMore);
+    }
+    auto const take = [&](std::uint16_t vlan) {
+      if (vlan != 0 && std::ranges::find(mirror.taken_vlans, vlan) == mirror.taken_vlans.end()) {
+        mirror.taken_vlans.push_back(vlan);
+      }
+    };
+    take(record.encapVlan);
+    for (auto const &entity : session.received_by) {
+      if (entity.type != MIRROR_ENTTYPE_VLAN) {
+        refuse_session(kTakesMore);
+      }
+      take(entity.vlan);
+    }
   }
 
   void check(DVMirrorSession const &record) const {
@@ -76,6 +106,9 @@ class Sessions {
     auto const by_flag = (record.flags & VS_DVMIRROR_FLAG_SRC_UPLINK_MIRROR) != 0;
     if (by_flag || record.uplinkFilter != MIRROR_UPLINK_FILTER_NONE) {
       refuse_session("mirrors some traffic of uplinks, which is not told apart here");
+    }
+    if (record.type == VS_DVMIRROR_SESSIONTYPE_RMIRROR_SRC && record.encapVlan == 0) {
+      refuse_session("mirrors to other hosts, and has no VLAN for that");
     }
     if (record.stack != 0) {
       refuse_session("mirrors on the side of the stack, which is not here");

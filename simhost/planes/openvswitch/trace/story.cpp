@@ -144,8 +144,13 @@ class Story {
     }
     tell_dropped(visit);
     switch (visit.table) {
+      case table::kRemoteMirrors:
+        tell_copy();
+        break;
       case table::kDispatch:
-        tell_destination();
+        if (!is_copy_) {
+          tell_destination();
+        }
         break;
       case table::kGroups:
         tell_group();
@@ -185,6 +190,8 @@ class Story {
         return drop("it has a second tag", of_port("nested_tag"));
       case Counted::own_frame:
         return drop("the switch sent it itself, and it came back");
+      case Counted::unwanted_copy:
+        return drop("it is a copy of a mirror session, and no session here takes those");
       case Counted::limit_dropped:
         return drop("there is no room for its source", limit(visit));
       case Counted::limit_allowed:
@@ -210,6 +217,13 @@ class Story {
       say(Kind::passes,
           fmt::format("which is {} in the private VLAN {}", kKinds.at(kind), reg(field::kDomain)),
           {{}, "private_vlans"});
+    }
+  }
+
+  void tell_copy() {
+    is_copy_ = true;
+    if (!dropped_) {
+      say(Kind::passes, fmt::format("is a copy of a mirror session in VLAN {}", reg(field::kVlan)));
     }
   }
 
@@ -302,6 +316,7 @@ class Story {
           fmt::format("is copied by the mirror session {} to {}, {}", session.name, in_words(to),
                       tags),
           session.setting);
+      left_ = left_ || is_copy_;
     } else {
       say(Kind::delivered, fmt::format("goes out at {}, {}", in_words(to), tags),
           to.is_uplink ? SettingOf{} : SettingOf{to.name, "vlan"});
@@ -350,6 +365,7 @@ class Story {
   bool dropped_ = false;
   bool refused_ = false;  // to somebody
   bool told_group_ = false;
+  bool is_copy_ = false;  // that another switch made
   bool is_for_another_uplink_ = false;
   bool left_ = false;  // at some port
   bool left_before_ = false;

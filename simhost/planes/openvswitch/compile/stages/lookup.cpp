@@ -23,10 +23,9 @@ Actions look_up(Plan const &plan, std::uint8_t next) {
 
 template <typename Device>
 void let_in(Program &program, Device const &device, Actions const &actions) {
-  add_by_receivers(
-      program, table::kLookup, {.priority = 100, .match = from(device.port), .actions = actions},
-      {.one = Counted::in_unicast, .several = Counted::in_multicast, .all = Counted::in_broadcast},
-      device.number);
+  add_by_receivers(program, table::kLookup,
+                   {.priority = 100, .match = from(device.port), .actions = actions}, kLetIn,
+                   device.number);
 }
 
 void put(Program &program, std::uint16_t priority, Match match, openflow::Port place,

@@ -85,16 +85,24 @@ Actions with_own_tag(Mirror const & /*mirror*/, Actions const &output) {
   return with_tag(field::kVlan, output);
 }
 Actions with_remote_tag(Mirror const &mirror, Actions const &output) {
+  if (mirror.remote_vlan == 0) {
+    return output;
+  }
   Actions actions{openflow::PushVlan{},
                   openflow::set(Field::vlan_vid, openflow::kVlanPresent | mirror.remote_vlan)};
   append(actions, output).emplace_back(openflow::PopVlan{});
   return actions;
 }
+Actions with_both_tags(Mirror const &mirror, Actions const &output) {
+  return with_own_tag(mirror, with_remote_tag(mirror, output));
+}
+
+// How a copy is tagged.
+using Tagged = Actions(Mirror const &, Actions const &);
 
 // A frame is cut as it is when the tags that it had elsewhere are really gone, and before it has
 // those of the copy: at the beginning of a clone.
-Actions copies_to(Mirror const &mirror, Actions const &outputs,
-                  Actions (*tagged)(Mirror const &, Actions const &)) {
+Actions copies_to(Mirror const &mirror, Actions const &outputs, Tagged *tagged) {
   if (mirror.most_bytes == 0) {
     return outputs.empty() ? Actions{} : tagged(mirror, outputs);
   }
@@ -108,19 +116,23 @@ Actions copies_to(Mirror const &mirror, Actions const &outputs,
 void copy_out(Program &program, Mirror const &mirror, std::set<openflow::Port> const &closed) {
   auto const to_ports = outputs(mirror, mirror.to_ports, closed);
   auto const to_uplinks = outputs(mirror, mirror.to_uplinks, closed);
-  auto add = [&](std::uint16_t priority, Match const &match, auto *tagged) {
-    auto actions = copies_to(mirror, to_ports, tagged);
-    append(actions, copies_to(mirror, to_uplinks, with_remote_tag));
+  auto add = [&](std::uint16_t priority, Match const &match, Tagged *at_ports, Tagged *on_wires) {
+    auto actions = copies_to(mirror, to_ports, at_ports);
+    append(actions, copies_to(mirror, to_uplinks, on_wires));
     program.add(table::kMirrors, {.priority = priority,
                                   .match = Match(match).with(field::kSession, mirror.id),
                                   .actions = std::move(actions),
                                   .cookie = cookie(Counted::mirrored, mirror.id)});
   };
   if (mirror.keeps_vlan) {
-    add(100, Match(), with_own_tag);
-    add(200, Match().with(field::kVlan, 0), without_tag);
+    add(100, Match(), with_own_tag, with_both_tags);
+    if (mirror.remote_vlan != 0 && !to_uplinks.empty()) {
+      // A third tag would take the place of the last one.
+      add(150, Match().tagged(), with_own_tag, with_remote_tag);
+    }
+    add(200, Match().with(field::kVlan, 0), without_tag, with_remote_tag);
   } else {
-    add(100, Match(), without_tag);
+    add(100, Match(), without_tag, with_remote_tag);
   }
 }
 

@@ -10,6 +10,11 @@
 
 namespace simhost::openvswitch {
 
+inline void append_copies(Actions &actions, Mirror const &mirror) {
+  actions.emplace_back(openflow::set(field::kSession, mirror.id));
+  actions.push_back(go_to(table::kMirrors));
+}
+
 /// What copies a frame to each session that names a source: `direction` is Mirror::received or
 /// Mirror::sent, `kind` where in it the source is.
 template <typename Source>
@@ -19,8 +24,7 @@ Actions copies(Plan const &plan, MirrorSources Mirror::*direction,
   for (auto const &mirror : plan.network.mirrors) {
     auto const &sources = mirror.*direction.*kind;
     if (std::find(sources.begin(), sources.end(), source) != sources.end()) {
-      actions.emplace_back(openflow::set(field::kSession, mirror.id));
-      actions.push_back(go_to(table::kMirrors));
+      append_copies(actions, mirror);
     }
   }
   return actions;

@@ -5,6 +5,7 @@
 #include <optional>
 #include <utility>
 
+#include "planes/openvswitch/compile/stages/receiving.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -38,15 +39,7 @@ std::optional<openflow::GroupId> electing_group(Way const &way, bool has_one_rec
 Actions receive(Plan const &plan, Uplink const &uplink, bool has_one_receiver) {
   Actions actions;
   for (auto const &way : plan.ways.all()) {
-    if (!uses(way, uplink.port)) {
-      continue;
-    }
-    actions.emplace_back(openflow::set(field::kWay, way.number));
-    if (auto const group = electing_group(way, has_one_receiver)) {
-      actions.emplace_back(openflow::ToGroup{.group = *group});
-    } else {
-      actions.push_back(go_to(table::kDispatch));
-    }
+    append(actions, receive_by(way, uplink, has_one_receiver));
   }
   return actions;
 }
@@ -105,6 +98,19 @@ void compile_election(Plan const &plan, Program &program) {
 }
 
 }  // namespace
+
+Actions receive_by(Way const &way, Uplink const &uplink, bool has_one_receiver) {
+  if (!uses(way, uplink.port)) {
+    return {};
+  }
+  Actions actions{openflow::set(field::kWay, way.number)};
+  if (auto const group = electing_group(way, has_one_receiver)) {
+    actions.emplace_back(openflow::ToGroup{.group = *group});
+  } else {
+    actions.push_back(go_to(table::kDispatch));
+  }
+  return actions;
+}
 
 void compile_receiving(Plan const &plan, Program &program) {
   for (auto const &uplink : plan.network.uplinks) {

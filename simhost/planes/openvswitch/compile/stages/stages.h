@@ -21,6 +21,7 @@ void compile_lists(Plan const &plan, Program &program);
 void compile_delivery(Plan const &plan, Program &program);
 void compile_teams(Plan const &plan, Program &program);
 void compile_mirrors(Plan const &plan, Program &program);
+void compile_remote_mirrors(Plan const &plan, Program &program);
 void compile_counting(Plan const &plan, Program &program);
 
 }  // namespace simhost::openvswitch
