@@ -31,7 +31,7 @@ inline constexpr std::uint8_t kPrivateVlans = 5;
 inline constexpr std::uint8_t kOwnFrames = 6;
 /// Copies that come in over an uplink: counts them, and asks at which uplink they are taken; reads
 /// kVlan, writes kWay.
-inline constexpr std::uint8_t kRemoteMirrors = 27;
+inline constexpr std::uint8_t kRemoteMirrors = 29;
 /// Asks the sessions; a frame that has come this far is one of the switch's.
 inline constexpr std::uint8_t kMirroring = 7;
 /// Sources that an uplink should not have for a while; fills kRecentSources.
