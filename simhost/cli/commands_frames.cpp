@@ -56,10 +56,11 @@ std::string plane_words(nlohmann::ordered_json const &plane) {
   if (change.is_null()) {
     return "no frames move: no simhostd ever took this host";
   }
-  if (change == in_force) {
-    return "Open vSwitch: change " + change.dump() + " is in force";
-  }
   auto const &said = plane.at("said").get_ref<std::string const &>();
+  if (change == in_force) {
+    return "Open vSwitch: change " + change.dump() + " is in force" +
+           (said.empty() ? "" : ", but " + said);
+  }
   return "Open vSwitch: change " + change.dump() + " is pending" +
          (in_force.is_null() ? "" : ", " + in_force.dump() + " is in force") +
          (said.empty() ? "" : ": " + said);

@@ -12,6 +12,7 @@
 #include "abi/fresh_host.h"
 #include "daemon/cached_flows.h"
 #include "daemon/devices/links.h"
+#include "daemon/devices/packet_sizes.h"
 #include "daemon/only_one.h"
 #include "daemon/wanted.h"
 #include "model/plane.h"
@@ -266,7 +267,9 @@ void Daemon::follow_devices() {
   devices_.refresh();
   {
     storage::ReadingTransaction transaction(store_);
-    switch_devices(transaction, devices_, [this](std::string const &why) { troubles_.add(why); });
+    auto const say = [this](std::string const &why) { troubles_.add(why); };
+    switch_devices(transaction, devices_, say);
+    raise_packet_sizes(packet_sizes(transaction), devices_, say);
     devices_.refresh();
     differ = links_differ(transaction, devices_);
   }
@@ -436,6 +439,24 @@ Json Daemon::is_there(std::string const &device) {
   return {{"there", devices_.find(device).has_value()}, {"at", at}};
 }
 
+// Before it is committed that switches have packets of these sizes, and devices likewise.
+Json Daemon::carry(Json const &question) {
+  PacketSizes sizes;
+  {
+    storage::ReadingTransaction transaction(store_);
+    for (auto const &one : question.at("switches")) {
+      add_packet_sizes(transaction, storage::SwitchKey{one.at(0).get<std::int64_t>()},
+                       one.at(1).get<std::uint32_t>(), sizes);
+    }
+  }
+  for (auto const &one : question.at("devices")) {
+    sizes[one.at(0).get<std::string>()] = one.at(1).get<std::uint32_t>();
+  }
+  devices_.refresh();
+  auto const why = raise_all_packet_sizes(sizes, devices_);
+  return {{"why", why.value_or("")}};
+}
+
 // What goes wrong with it is no reason to say nothing of what is known.
 void Daemon::count_of(storage::SwitchKey key) {
   try {
@@ -499,6 +520,8 @@ void Daemon::handle(Json const &question, Reply const &reply) {
       handle_in_force(question.at("change").get<std::uint64_t>(), reply);
     } else if (what == "device") {
       reply(is_there(question.at("name").get<std::string>()));
+    } else if (what == "carry") {
+      reply(carry(question));
     } else if (what == "addresses") {
       reply(addresses(question));
     } else if (what == "counters") {

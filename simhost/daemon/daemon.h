@@ -63,6 +63,7 @@ class Daemon {
 
   void handle(Json const &question, Reply const &reply);
   void handle_in_force(std::uint64_t change, Reply const &reply);
+  [[nodiscard]] Json carry(Json const &question);
   [[nodiscard]] Json is_there(std::string const &device);
   [[nodiscard]] Json addresses(Json const &question);
   void count_of(storage::SwitchKey key);

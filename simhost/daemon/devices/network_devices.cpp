@@ -227,6 +227,14 @@ WireSpeed wire_speed(std::string_view device) {
   return speed;
 }
 
+void set_network_device_mtu(std::string_view name, std::uint32_t bytes) {
+  auto request = request_for(name);
+  request.ifr_mtu = static_cast<int>(bytes);
+  if (ioctl(any_socket().number(), SIOCSIFMTU, &request) != 0) {
+    events::fail_with_errno(std::string(name));
+  }
+}
+
 void switch_network_device(std::string_view name, bool up) {
   auto const socket = any_socket();
   auto request = request_for(name);

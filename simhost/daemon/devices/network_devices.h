@@ -69,5 +69,7 @@ class NetworkDevices {
 WireSpeed wire_speed(std::string_view device);
 /// Switches it on or off. Throws std::system_error.
 void switch_network_device(std::string_view name, bool up);
+/// Has it carry packets of so many bytes. Throws std::system_error.
+void set_network_device_mtu(std::string_view name, std::uint32_t bytes);
 
 }  // namespace simhost::daemon

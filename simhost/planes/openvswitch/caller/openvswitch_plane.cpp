@@ -396,6 +396,7 @@ void OpenVswitchPlane::check_device(storage::Transaction &transaction, std::stri
   } catch (NoDaemon const &) {
     // It is looked for when a daemon is there.
   }
+  packet_sizes_.add(device);
 }
 
 void OpenVswitchPlane::prepare(storage::ChangingTransaction &transaction) {
@@ -404,8 +405,23 @@ void OpenVswitchPlane::prepare(storage::ChangingTransaction &transaction) {
     return;
   }
   check_switches(transaction, file_);
+  check_packet_sizes(transaction);
   storage::advance_frames_change(transaction);
   prepared_ = storage::frames_change(transaction);
+}
+
+// Last, as devices are made to carry them.
+void OpenVswitchPlane::check_packet_sizes(storage::Transaction &transaction) {
+  auto const question = packet_sizes_.question(transaction);
+  if (!question) {
+    return;
+  }
+  if (auto const reply = asked_if_there(file_, *question)) {
+    if (auto const why = reply->value("why", std::string()); !why.empty()) {
+      throw Refused(QEX_NOT_SUPPORTED, why);
+    }
+    packet_sizes_.agreed();
+  }
 }
 
 void OpenVswitchPlane::committed() noexcept {

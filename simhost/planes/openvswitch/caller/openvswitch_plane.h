@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "model/plane.h"
+#include "planes/openvswitch/caller/packet_sizes.h"
 #include "planes/openvswitch/trace/story.h"
 #include "storage/switches.h"
 
@@ -68,9 +69,12 @@ class OpenVswitchPlane : public Plane {
   std::map<AddressBytes, McastGroup> joined(storage::Transaction &transaction,
                                             storage::Port const &port);
 
+  void check_packet_sizes(storage::Transaction &transaction);
+
   Plane &stored_;
   std::filesystem::path file_;
   std::optional<std::uint64_t> prepared_;  // the change that is about to be committed
+  PacketSizes packet_sizes_;
 };
 
 }  // namespace simhost::openvswitch

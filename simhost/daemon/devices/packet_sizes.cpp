@@ -1,0 +1,86 @@
+// Whether a device can do it is known when it has done it: what limits it may be another device.
+#include "daemon/devices/packet_sizes.h"
+
+#include <fmt/format.h>
+
+#include <span>
+#include <system_error>
+#include <utility>
+#include <vector>
+
+#include "model/properties/properties.h"
+#include "model/switches/properties.h"
+#include "storage/running/devices.h"
+
+namespace simhost::daemon {
+namespace {
+
+std::string refusal(std::string const &device, std::uint32_t size, std::system_error const &error) {
+  return fmt::format("the device {} cannot carry packets of {} bytes: {}", device, size,
+                     error.code().message());
+}
+
+// Those that carry less.
+std::vector<std::pair<std::string, NetworkDevice>> too_small(PacketSizes const &sizes,
+                                                             NetworkDevices const &devices) {
+  std::vector<std::pair<std::string, NetworkDevice>> found;
+  for (auto const &[name, size] : sizes) {
+    if (auto const device = devices.find(name); device && device->mtu < size) {
+      found.emplace_back(name, *device);
+    }
+  }
+  return found;
+}
+
+}  // namespace
+
+void add_packet_sizes(storage::Transaction &transaction, storage::SwitchKey key, std::uint32_t size,
+                      PacketSizes &sizes) {
+  for (auto const &[port, device] : storage::port_devices(transaction, key)) {
+    sizes[device.name] = size;
+  }
+  for (auto const &uplink : storage::uplinks_of(transaction, key)) {
+    if (auto const device = storage::device_of(transaction, uplink.name)) {
+      sizes[device->name] = size;
+    }
+  }
+}
+
+PacketSizes packet_sizes(storage::Transaction &transaction) {
+  PacketSizes sizes;
+  for (auto const &[key, row] : storage::all_switches(transaction)) {
+    auto const size = effective(transaction, switches::mtu, storage::PropertyOwner::global(key));
+    add_packet_sizes(transaction, key, size, sizes);
+  }
+  return sizes;
+}
+
+void raise_packet_sizes(PacketSizes const &sizes, NetworkDevices const &devices,
+                        std::function<void(std::string const &)> const &say) {
+  for (auto const &[name, device] : too_small(sizes, devices)) {
+    try {
+      set_network_device_mtu(name, sizes.at(name));
+    } catch (std::system_error const &error) {
+      say(refusal(name, sizes.at(name), error));
+    }
+  }
+}
+
+std::optional<std::string> raise_all_packet_sizes(PacketSizes const &sizes,
+                                                  NetworkDevices const &devices) {
+  auto const raised = too_small(sizes, devices);
+  for (std::size_t at = 0; at < raised.size(); ++at) {
+    auto const &name = raised[at].first;
+    try {
+      set_network_device_mtu(name, sizes.at(name));
+    } catch (std::system_error const &error) {
+      for (auto const &[before, device] : std::span(raised).first(at)) {
+        set_network_device_mtu(before, device.mtu);
+      }
+      return refusal(name, sizes.at(name), error);
+    }
+  }
+  return std::nullopt;
+}
+
+}  // namespace simhost::daemon
