@@ -136,9 +136,11 @@ TEST(TheRows, ChangeInPlace) {
   EXPECT_THAT(told(present, {limited}), ElementsAre("insert Flow_Table", "update Bridge"));
 }
 
-TEST(TheRows, OfOthersSayWhichDevicesAreThere) {
+TEST(TheRows, SayWhichDevicesAreOthersOrOpenVswitchsOwn) {
+  using Device = std::pair<std::string const, std::string>;
   EXPECT_THAT(present_rows(replica(), kHost).elsewhere,
-              ElementsAre(std::pair<std::string const, std::string>("eth7", "br0")));
+              ElementsAre(Device("eth7", "br0"), Device("ovs-netdev", "ovs-netdev"),
+                          Device("ovs-system", "ovs-system"), Device("vs1", "vs1")));
 }
 
 TEST(TheRows, ThatSomebodyElseChangedAreMadeAsTheyWere) {

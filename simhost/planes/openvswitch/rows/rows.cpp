@@ -288,11 +288,15 @@ PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host) {
     Tables const tables{.ports = replica.rows("Port"),
                         .interfaces = replica.rows("Interface"),
                         .flow_tables = replica.rows("Flow_Table")};
+    for (auto const *const device : {"ovs-netdev", "ovs-system"}) {
+      present.elsewhere[device] = device;
+    }
     for (auto const &[id, row] : replica.rows("Bridge")) {
+      auto const name = row.at("name").get<std::string>();
       if (text_under(row.at("external_ids"), kHost) == host) {
         present.bridges.push_back(bridge_of(id, row, tables));
+        present.elsewhere[name] = name;
       } else {
-        auto const name = row.at("name").get<std::string>();
         for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
           present.elsewhere[tables.ports.at(id_in(port)).at("name").get<std::string>()] = name;
         }

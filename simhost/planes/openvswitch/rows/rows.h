@@ -41,7 +41,8 @@ struct PresentRows {
   std::vector<PresentBridge> bridges;
   std::string owner;                                  ///< who writes them; empty if nobody does
   std::uint32_t most_tags = 0;                        ///< of the frames that the switch tells apart
-  std::map<std::string, std::string> elsewhere = {};  ///< devices of others' bridges, with these
+  /// Devices of others' bridges, with these; and what each bridge and data path has by itself.
+  std::map<std::string, std::string> elsewhere = {};
 };
 
 /// The columns that present_rows() reads.
