@@ -1,0 +1,153 @@
+"""What no flows can be made of: taken to the last step before it, refused at that one, with the
+status that says why, and with nothing changed."""
+
+import json
+from typing import Any, Dict, NamedTuple, Sequence, Tuple
+
+from frame_lab import Lab
+
+Session = Dict[str, Any]
+
+
+class Bound(NamedTuple):
+    """Settings of a mirror session: the last ones that are done, and those past them."""
+
+    done: Session
+    refused: Sequence[Session]
+    status: str
+    why: str
+
+
+CLIENTS = "mirrors clients of a kind, which are not told apart here"
+SOME_OF_UPLINKS = "mirrors some traffic of uplinks, which is not told apart here"
+TAKEN = {"type": "remote_destination", "received_by": [{"vlan": 5}]}
+BOUNDS = [
+    Bound(
+        {"snap_length": 14},
+        [{"snap_length": 13}, {"snap_length": 1}],
+        "QEX_BAD_PARAM",
+        "fewer than 14 bytes of a frame cannot be mirrored",
+    ),
+    Bound(
+        {"received_from": ["uplinks"], "sent_from": ["uplinks"]},
+        [
+            {direction: ["uplinks", kind]}
+            for direction in ("received_from", "sent_from")
+            for kind in ("vmm", "cos", "tcpip", "test")
+        ],
+        "QEX_NOT_SUPPORTED",
+        CLIENTS,
+    ),
+    Bound(
+        {"uplink_filter": "none", "mirrors_uplinks": False},
+        [
+            {"mirrors_uplinks": True},
+            *({"uplink_filter": kind} for kind in ("normal", "stt", "vxlan", "geneve")),
+            {"uplink_filter": "encapsulated"},
+        ],
+        "QEX_NOT_SUPPORTED",
+        SOME_OF_UPLINKS,
+    ),
+    Bound(
+        {"stack": False},
+        [{"stack": True}],
+        "QEX_NOT_SUPPORTED",
+        "mirrors on the side of the stack, which is not here",
+    ),
+    Bound(
+        {"received_by": [{"vlan": 5}, {"uplink": "nic0"}, {"port": "b"}]},
+        [{"received_by": [{"ip": "192.0.2.1"}]}, {"sent_by": [{"ip": "192.0.2.1"}]}],
+        "QEX_NOT_SUPPORTED",
+        "mirrors from an address",
+    ),
+    Bound(
+        {"to": [{"port": "c"}, {"uplink": "nic0"}]},
+        [{"to": [{"vlan": 5}]}, {"to": [{"port": "c"}, {"ip": "192.0.2.1"}]}],
+        "QEX_NOT_SUPPORTED",
+        "mirrors to what is no port and no uplink",
+    ),
+    Bound(
+        {"type": "remote_source", "encapsulation": {"vlan": 1}},
+        [{"type": "remote_source"}],
+        "QEX_NOT_SUPPORTED",
+        "mirrors to other hosts, and has no VLAN for that",
+    ),
+    Bound(
+        TAKEN,
+        [{**TAKEN, "to": [{"uplink": "nic0"}]}],
+        "QEX_NOT_SUPPORTED",
+        "takes copies from uplinks, and mirrors to one",
+    ),
+    Bound(
+        TAKEN,
+        [
+            {**TAKEN, "received_by": [{"port": "b"}]},
+            {**TAKEN, "sent_by": [{"vlan": 5}]},
+            {**TAKEN, "sent_from": ["uplinks"]},
+        ],
+        "QEX_NOT_SUPPORTED",
+        "takes copies from",
+    ),
+]
+
+
+def test_a_device_that_cannot_be_had_changes_nothing(lab: Lab) -> None:
+    lab.client("lab", "a")
+    lab.network("nic0")
+    # A device has up to 15 letters.
+    longest = "d" * 15
+    lab.host.run("ip", "link", "add", longest, "type", "veth", "peer", "name", "other")
+    bridge = next(lab.run_folder().glob("vs*.mgmt")).stem
+    refused = {
+        longest + "d": "is no name of a network device (QEX_INVALID_NAME)",
+        "../c1": "is no name of a network device (QEX_INVALID_NAME)",
+        ".": "is no name of a network device (QEX_INVALID_NAME)",
+        "nowhere": "simhostd sees no device nowhere (QEX_NOT_FOUND)",
+        "c1": "the device c1 is at the port 'a' of the switch 'lab' (QEX_BUSY)",
+        "u0": "the device u0 is at the uplink 'nic0' (QEX_BUSY)",
+        # Of Open vSwitch itself.
+        bridge: f"the device {bridge} is at the bridge {bridge} (QEX_BUSY)",
+        "ovs-netdev": "the device ovs-netdev is at the bridge ovs-netdev (QEX_BUSY)",
+    }
+    before = state_of(lab)
+    for device, why in refused.items():
+        for words in (["connect", "lab", "b", device], ["uplink", "nic1", "--device", device]):
+            done = lab.try_ctl(*words)
+            assert done.returncode == 1, words
+            assert why in done.stdout, words
+    assert state_of(lab) == before
+    lab.ctl("connect", "lab", "b", longest)
+    assert lab.is_in_force()
+
+
+def document(session: Session) -> str:
+    """With something else that could be done."""
+    said = {"sid": "s", "to": [{"port": "c"}], **session}
+    ports = [{"id": "b", "vlan": 7}, {"id": "a", "mirror_sessions": [said]}]
+    return json.dumps({"switches": [{"alias": "lab", "ports": ports}]})
+
+
+def state_of(lab: Lab) -> Tuple[Any, Any]:
+    """What the ports have, and what is in force."""
+    (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
+    settings: Any = [{**port, "addresses": [], "counters": {}} for port in switch["ports"]]
+    return settings, lab.plane()
+
+
+def test_a_mirror_session_past_a_bound_changes_nothing(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    lab.network("nic0", "nic1")
+    assert one.reaches(other, attempts=5)
+    for bound in BOUNDS:
+        before = state_of(lab)
+        for session in bound.refused:
+            done = lab.try_ctl("apply", "-", given=document(session))
+            assert done.returncode == 1, session
+            assert bound.why in done.stdout, session
+            assert f"({bound.status})" in done.stdout, session
+        assert state_of(lab) == before
+        lab.ctl("apply", "-", given=document(bound.done))
+        assert lab.is_in_force()
+        lab.set_port("lab", "a", mirror_sessions=[])
+        lab.set_port("lab", "b", vlan=0)
+    assert one.reaches(other, attempts=5)
