@@ -336,7 +336,7 @@ TEST(ADifference, KeepsWhatIsTaughtAsBeforeAndForgetsWhatIsTaughtOtherwise) {
       bool const is_wanted = std::ranges::any_of(
           wanted, [&](Flow const &other) { return place(other) == place(flow); });
       bool const is_forgotten =
-          std::ranges::count(forgotten, simhost::openvswitch::known_by(flow)) > 0;
+          std::ranges::count(forgotten, simhost::openvswitch::cookie_of(flow)) > 0;
       if (!is_wanted && !is_forgotten && !teachers.teach(flow)) {
         removed.push_back(flow);
       }

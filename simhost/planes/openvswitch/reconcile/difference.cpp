@@ -58,13 +58,13 @@ std::vector<Flow> removed(std::vector<Flow const *> const &unwanted, std::span<F
                           std::vector<LearnedFlows> const &forgotten) {
   std::set<LearnedFlows> known;
   for (auto const *flow : unwanted) {
-    known.insert(known_by(*flow));
+    known.insert(cookie_of(*flow));
   }
   std::vector<Flow> removed;
   if (!known.empty()) {
     Teachers const teachers(wanted, known);
     for (auto const *flow : unwanted) {
-      if (!teachers.teach(*flow) && !std::ranges::binary_search(forgotten, known_by(*flow))) {
+      if (!teachers.teach(*flow) && !std::ranges::binary_search(forgotten, cookie_of(*flow))) {
         removed.push_back(*flow);
       }
     }

@@ -25,7 +25,7 @@ inline LearnedFlows taught_by(openflow::Learn const &learn) {
   return {.table = learn.table, .cookie = learn.cookie};
 }
 /// What knows a flow, if it was learned.
-inline LearnedFlows known_by(openflow::Flow const &flow) {
+inline LearnedFlows cookie_of(openflow::Flow const &flow) {
   return {.table = flow.table, .cookie = flow.cookie};
 }
 

@@ -37,11 +37,11 @@ Present present_of(std::span<FlowEntry const> flows, std::span<GroupEntry const>
   std::set<LearnedFlows> unplaced;
   for (auto const &entry : flows) {
     if (!entry.has_match) {
-      unplaced.insert(known_by(entry.flow));
+      unplaced.insert(cookie_of(entry.flow));
     }
   }
   for (auto const &entry : flows) {
-    if (!unplaced.contains(known_by(entry.flow))) {
+    if (!unplaced.contains(cookie_of(entry.flow))) {
       present.flows.push_back(flow_of(entry));
     }
   }

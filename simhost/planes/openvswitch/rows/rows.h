@@ -39,8 +39,8 @@ struct PresentBridge {
 struct PresentRows {
   bool is_new = true;  ///< without the one row of Open_vSwitch that each has
   std::vector<PresentBridge> bridges;
-  std::string owner;                                  ///< who writes them; empty if nobody does
-  std::uint32_t most_tags = 0;                        ///< of the frames that the switch tells apart
+  std::string owner;            ///< who writes them; empty if nobody does
+  std::uint32_t most_tags = 0;  ///< of the frames that the switch tells apart
   /// Devices of others' bridges, with these; and what each bridge and data path has by itself.
   std::map<std::string, std::string> elsewhere = {};
 };
