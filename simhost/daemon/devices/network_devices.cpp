@@ -67,8 +67,12 @@ NetworkDevices::NetworkDevices(events::Loop &loop, std::function<void()> changed
     : socket_(told_of_links()),
       changed_(std::move(changed)),
       watch_(loop.watch(socket_.number(), [this] {
-        if (refresh()) {
-          changed_();
+        try {
+          if (refresh()) {
+            changed_();
+          }
+        } catch (std::runtime_error const &) {
+          changed_();  // who looks asks again, and hears what is wrong
         }
       })) {
   ask_for_all();
@@ -87,6 +91,10 @@ void NetworkDevices::ask_for_all() {
 
 bool NetworkDevices::refresh() {
   bool has_changed = false;
+  if (!is_asked_ && std::exchange(is_to_be_asked_again_, false)) {
+    ask_for_all();
+    has_changed = true;
+  }
   alignas(nlmsghdr) std::array<char, 65536> part;
   while (true) {
     auto const size = recv(socket_.number(), part.data(), part.size(), 0);
@@ -129,6 +137,8 @@ bool NetworkDevices::take(std::span<char const> messages) {
         ask_for_all();
       }
     } else if (header->nlmsg_type == NLMSG_ERROR) {
+      is_asked_ = false;
+      is_to_be_asked_again_ = true;
       throw std::runtime_error("the kernel does not tell its network devices");
     } else {
       has_changed |= take_device(*header);

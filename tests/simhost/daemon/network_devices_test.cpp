@@ -2,13 +2,17 @@
 #include "daemon/devices/network_devices.h"
 
 #include <gtest/gtest.h>
+#include <linux/rtnetlink.h>
 #include <sched.h>
+#include <sys/socket.h>
 #include <unistd.h>
 
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
 #include <fstream>
+#include <stdexcept>
 #include <string>
 
 namespace {
@@ -50,6 +54,40 @@ TEST_F(TheNetworkDevices, AreKnownAsSoonAsTheyAreMade) {
   ip("link add after type veth peer name another");
   EXPECT_TRUE(devices.refresh());
   EXPECT_TRUE(devices.find("after"));
+}
+
+// A question on the socket that the devices are told on, to which the kernel replies with an error.
+void have_an_error_told() {
+  for (auto const &entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+    int const number = std::stoi(entry.path().filename());
+    int domain = 0;
+    socklen_t size = sizeof domain;
+    if (getsockopt(number, SOL_SOCKET, SO_DOMAIN, &domain, &size) == 0 && domain == AF_NETLINK) {
+      nlmsghdr const question{.nlmsg_len = sizeof question,
+                              .nlmsg_type = RTM_SETLINK,
+                              .nlmsg_flags = NLM_F_REQUEST | NLM_F_ACK,
+                              .nlmsg_seq = 0,
+                              .nlmsg_pid = 0};
+      ASSERT_EQ(send(number, &question, sizeof question, 0), ssize_t{sizeof question});
+    }
+  }
+}
+
+TEST_F(TheNetworkDevices, AreAskedForAgainAfterAnError) {
+  ip("link add one type veth peer name other");
+  NetworkDevices devices(loop, [&] { ++changes; });
+  have_an_error_told();
+  EXPECT_THROW(devices.refresh(), std::runtime_error);
+  ip("link delete one");
+  EXPECT_TRUE(devices.refresh());
+  EXPECT_FALSE(devices.find("one"));
+  // Nothing leaves a loop: who is told looks.
+  have_an_error_told();
+  loop.turn(5s);
+  EXPECT_EQ(changes, 1);
+  ip("link add two type veth peer name other");
+  EXPECT_TRUE(devices.refresh());
+  EXPECT_TRUE(devices.find("two"));
 }
 
 TEST_F(TheNetworkDevices, AreFollowed) {
