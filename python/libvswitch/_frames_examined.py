@@ -1,5 +1,7 @@
 """Whether real frames can move on this machine, and what moves those of a state."""
 
+import errno
+import fcntl
 import json
 import os
 import re
@@ -15,6 +17,9 @@ _ABOUT = "frames"
 _OLDEST = (3, 1)
 _INSTALL = "install Debian's package openvswitch-switch where frames are to move"
 _PATIENCE = 10.0
+_TUN = "/dev/net/tun"
+# _IOR('T', 207, unsigned), as Linux has it on x86 and ARM.
+_TUNGETFEATURES = 0x800454CF
 # Root's own, and where users may have one.
 _USERS: Tuple[List[str], ...] = ([], ["--user", "--map-root-user"])
 
@@ -30,9 +35,26 @@ def examine(state: Optional[str]) -> typing.Iterator[Found]:
     """What holds on this machine, and of the host that is kept in `state`."""
     yield _open_vswitch()
     yield _namespaces()
+    if not _has_tun():
+        yield Found(
+            WARNING,
+            _ABOUT,
+            f"{_TUN} is no device of this machine, so that ovs-vswitchd can make no bridge",
+            "load the module tun, or give it to the container",
+        )
     status = _status(Path(state)) if state else None
     if status is not None:
         yield from _daemon(status)
+
+
+def _has_tun() -> bool:
+    try:
+        with open(_TUN, "r+b", buffering=0) as tun:
+            fcntl.ioctl(tun, _TUNGETFEATURES, b"\0" * 4)
+    except OSError as error:
+        # Whoever may not open it may not run Open vSwitch either.
+        return error.errno in (errno.EACCES, errno.EPERM)
+    return True
 
 
 def _open_vswitch() -> Found:

@@ -10,6 +10,7 @@
 #include <variant>
 
 #include "daemon/changes.h"
+#include "daemon/made_bridge.h"
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/ovsdb/configuration.h"
 #include "planes/openvswitch/reconcile/difference.h"
@@ -194,7 +195,9 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadlin
 Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadline) {
   auto &bridge = bridges_[wanted.key];
   if (bridge == nullptr) {
-    auto made = std::make_unique<Bridge>(wanted, folder_ / (wanted.row.name + ".mgmt"), deadline);
+    auto const socket = folder_ / (wanted.row.name + ".mgmt");
+    require_made(wanted, socket);
+    auto made = std::make_unique<Bridge>(wanted, socket, deadline);
     made->connection.limit_packet_ins(kMostPacketIns, deadline);
     read_flows(*made, deadline);
     made->numbers = wanted.numbers;

@@ -9,7 +9,7 @@ from typing import Dict, List, Mapping
 
 import pytest
 
-from frame_lab import Lab
+from frame_lab import TOOLS, Lab
 
 Finding = Dict[str, str]
 
@@ -76,6 +76,38 @@ def test_no_open_vswitch(tmp_path: Path) -> None:
         one for one in json.loads(done.stdout)["findings"] if "no Open vSwitch" in one["text"]
     )
     assert found["level"] == "note" and "openvswitch-switch" in found["advice"]
+
+
+def test_what_bridges_are_made_with(idle: Lab) -> None:
+    """Where it is not there they cannot be made, and nothing is in force."""
+    hide = [
+        "unshare",
+        "--mount",
+        "sh",
+        "-c",
+        'mount --bind /dev/null /dev/net/tun && exec "$@"',
+        "-",
+    ]
+    doctor = [sys.executable, "-m", "libvswitch.doctor", "--json"]
+    said = json.loads(idle.host.try_run(*hide, *doctor).stdout)["findings"]
+    assert [one["level"] for one in said if "/dev/net/tun" in one["text"]] == ["warning"]
+    words = [str(TOOLS / "simhostd"), "--state", str(idle.state)]
+    log = open(idle.folder / "simhostd.log", "w", encoding="utf-8")
+    with log:
+        daemon = idle.host.start(
+            *(*hide, *words, "--openvswitch", f"private:{idle.run_folder()}"),
+            stdout=subprocess.PIPE,
+            stderr=log,
+        )
+    assert daemon.stdout is not None and daemon.stdout.readline() == "ready\n"
+    idle.client("lab", "a")
+    why = "of the switch 'lab', for which it needs /dev/net/tun: Inappropriate ioctl for device"
+    assert why in idle.ctl("plane") and " is pending" in idle.ctl("plane")
+    assert idle.log().count(why) == 1
+    (*_, complaint) = findings({"SIMHOST_STATE": str(idle.state)})
+    assert why in complaint["text"]
+    daemon.terminate()
+    daemon.communicate(timeout=30)
 
 
 def test_the_daemon_of_a_state(lab: Lab) -> None:
