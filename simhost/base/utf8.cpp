@@ -1,6 +1,10 @@
 // Well-formed is what the standard's table of byte sequences has.
 #include "base/utf8.h"
 
+#include <fmt/format.h>
+
+#include <algorithm>
+
 #include "base/outcomes.h"
 
 namespace simhost {
@@ -31,6 +35,20 @@ std::size_t character_length(std::string_view text) {
     }
   }
   return length;
+}
+
+std::string in_utf8(std::string_view text) {
+  std::string whole;
+  while (!text.empty()) {
+    auto const length = character_length(text);
+    if (length == 0) {
+      whole += fmt::format("\\x{:02x}", static_cast<unsigned char>(text.front()));
+    } else {
+      whole += text.substr(0, length);
+    }
+    text.remove_prefix(std::max<std::size_t>(length, 1));
+  }
+  return whole;
 }
 
 void require_utf8(std::string_view text) {

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "abi/fresh_host.h"
+#include "base/utf8.h"
 #include "daemon/cached_flows.h"
 #include "daemon/devices/links.h"
 #include "daemon/devices/packet_sizes.h"
@@ -41,6 +42,12 @@ std::filesystem::path beside(std::filesystem::path file, char const *suffix) {
   return file;
 }
 
+// No text of JSON has all that a path may have.
+std::vector<std::uint8_t> bytes_of(std::filesystem::path const &path) {
+  auto const &text = path.native();
+  return {text.begin(), text.end()};
+}
+
 storage::SwitchKey switch_in(Json const &question) {
   return storage::SwitchKey{question.at("switch").get<std::int64_t>()};
 }
@@ -70,7 +77,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       troubles_(say_),
       lock_(lock(beside(options_.state, "-simhostd.lock"))),
       store_(opened(options_.state)),
-      host_(options_.state.string()),
+      host_(in_utf8(options_.state.string())),
       state_watch_(loop, store_, options_.state, [this] { look_at_commits(); }),
       devices_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state),
@@ -530,7 +537,7 @@ void Daemon::handle(Json const &question, Reply const &reply) {
       reply(counting_sessions(question));
     } else if (what == "bridge") {
       reply({{"name", bridge_name(host_, question.at("switch").get<std::string>())},
-             {"folder", options_.database.parent_path().string()}});
+             {"folder", bytes_of(options_.database.parent_path())}});
     } else if (what == "groups") {
       reply(groups(question));
     } else if (what == "status") {

@@ -112,3 +112,15 @@ def test_a_folder_that_cannot_be_used_is_told(idle: Lab) -> None:
     assert done.returncode == 1
     why = "the folder /proc/no of the Open vSwitch cannot be used: No such file or directory"
     assert done.stdout == f"simhostd: {why}\n"
+
+
+def test_paths_are_of_any_bytes(tmp_path: Path) -> None:
+    folder = tmp_path / os.fsdecode(b"no \xff text")
+    folder.mkdir()
+    with Lab(folder, ONE_SWITCH) as lab:
+        lab.start()
+        one, other = lab.client("lab", "a"), lab.client("lab", "b")
+        assert one.reaches(other, attempts=5)
+        frame = [f"dst={other.mac}", f"src={one.mac}"]
+        assert "goes out at port b" in lab.ctl("trace", "lab/a", *frame)
+        assert lab.is_in_force()
