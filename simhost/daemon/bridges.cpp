@@ -9,8 +9,8 @@
 #include <utility>
 #include <variant>
 
-#include "daemon/changes.h"
-#include "daemon/made_bridge.h"
+#include "daemon/bridge/changes.h"
+#include "daemon/bridge/made_bridge.h"
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/ovsdb/configuration.h"
 #include "planes/openvswitch/reconcile/difference.h"

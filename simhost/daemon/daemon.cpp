@@ -11,7 +11,7 @@
 
 #include "abi/fresh_host.h"
 #include "base/utf8.h"
-#include "daemon/cached_flows.h"
+#include "daemon/bridge/cached_flows.h"
 #include "daemon/devices/links.h"
 #include "daemon/devices/packet_sizes.h"
 #include "daemon/only_one.h"

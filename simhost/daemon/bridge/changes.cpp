@@ -1,5 +1,5 @@
 // Groups are there before the flows that send to them, and go after those.
-#include "daemon/changes.h"
+#include "daemon/bridge/changes.h"
 
 #include <algorithm>
 

@@ -1,5 +1,5 @@
 // Open vSwitch tells nobody but its log why it makes none. What it mostly is, is told here.
-#include "daemon/made_bridge.h"
+#include "daemon/bridge/made_bridge.h"
 
 #include <fcntl.h>
 #include <fmt/format.h>

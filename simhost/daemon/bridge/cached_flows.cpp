@@ -1,5 +1,5 @@
 // Asked of its control socket: OpenFlow has no word for it.
-#include "daemon/cached_flows.h"
+#include "daemon/bridge/cached_flows.h"
 
 #include <chrono>
 
