@@ -5,41 +5,13 @@ import os
 import signal
 import socket
 import subprocess
-import time
 from typing import Any, Dict
 
 import pytest
 
+from counted_frames import BROADCAST, IN_VLAN_5, LENGTH, MULTICAST, come_to, counters, send
 from frame_lab import TOOLS, Lab, comes_true, learned_ages
 from lasting_open_vswitch import LastingOpenVSwitch
-from simhost import Client
-from simhost._namespaces import PATIENCE
-
-BROADCAST, MULTICAST = "ff:ff:ff:ff:ff:ff", "01:00:5e:01:02:03"
-LENGTH = 60
-# A type of Ethernet that is nobody's.
-PLAIN, IN_VLAN_5 = "88b5", "8100000588b5"
-
-
-def send(client: Client, times: int, to: str, source: str = "", head: str = PLAIN) -> None:
-    addresses = to + (source or client.mac)
-    frame = bytes.fromhex(addresses.replace(":", "") + head).ljust(LENGTH, b".")
-    for _ in range(times):
-        client.send(frame)
-
-
-def counters(lab: Lab, port: str) -> Dict[str, int]:
-    (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
-    (found,) = (one for one in switch["ports"] if one["id"] == port)
-    return dict(found["counters"])
-
-
-def come_to(read: Any, wanted: Any) -> None:
-    """Open vSwitch adds up what it counted every half a second."""
-    deadline = time.monotonic() + PATIENCE
-    while (found := read()) != wanted and time.monotonic() < deadline:
-        time.sleep(0.05)
-    assert found == wanted
 
 
 def test_frames_count_where_they_come_in_and_go_out(lab: Lab) -> None:
@@ -112,6 +84,20 @@ def test_counters_go_on_when_flows_and_processes_begin_anew(lab: Lab) -> None:
     assert comes_true(lab.is_in_force)
     send(one, 5, BROADCAST)
     come_to_count(lab, 12)
+
+
+def test_counters_go_on_when_the_database_begins_anew(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    send(one, 3, BROADCAST)
+    come_to_count(lab, 3)
+    killed = lab.processes()["ovsdb-server"]
+    os.kill(killed, signal.SIGKILL)
+    come_to(lambda: lab.processes().keys(), {"ovs-vswitchd", "ovsdb-server"})
+    assert comes_true(lambda: lab.processes().get("ovsdb-server") not in (None, killed))
+    lab.set_port("lab", "a", vlan=7)
+    assert comes_true(lab.is_in_force)
+    send(one, 4, BROADCAST)
+    come_to_count(lab, 7)
 
 
 def test_counters_go_on_when_the_daemon_does(lab: Lab) -> None:
