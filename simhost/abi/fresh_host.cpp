@@ -22,7 +22,7 @@ void apply_file(storage::ChangingTransaction &transaction, std::string const &na
     if (!file) {
       throw scenario::DocumentError("it cannot be read");
     }
-    scenario::apply(transaction, document);
+    scenario::apply_to_own(transaction, document);
   } catch (scenario::DocumentError const &error) {
     throw scenario::DocumentError("the scenario " + name + " cannot be used: " + error.what());
   }
@@ -35,7 +35,7 @@ void populate_fresh_host(storage::ChangingTransaction &transaction) {
   if (named != nullptr && *named != '\0') {
     apply_file(transaction, named);
   } else {
-    scenario::apply(transaction, kDefaultHost);
+    scenario::apply_to_own(transaction, kDefaultHost);
   }
 }
 

@@ -11,6 +11,7 @@
 
 #include "abi/fresh_host.h"
 #include "model/plane.h"
+#include "model/sharing.h"
 #include "planes/stored/stored_plane.h"
 
 namespace simhost {
@@ -84,6 +85,7 @@ storage::Store &Host::state() {
     state_.emplace(file, populate_fresh_host);
     if (file) {
       run_on(plane_.emplace(stored::plane(), file->location()));
+      share_through(&sharing_.emplace(file->location()));
     }
   }
   return *state_;

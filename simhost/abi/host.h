@@ -7,6 +7,7 @@
 #include "abi/data_lists.h"
 #include "abi/handles.h"
 #include "abi/ledger.h"
+#include "fabric/caller/fabric_sharing.h"
 #include "planes/openvswitch/caller/openvswitch_plane.h"
 #include "storage/store.h"
 
@@ -39,6 +40,7 @@ class Host {
   std::optional<storage::StateFile> state_file_;
   std::optional<storage::Store> state_;
   std::optional<openvswitch::OpenVswitchPlane> plane_;
+  std::optional<fabric::FabricSharing> sharing_;
 };
 
 /// Lives as long as the process.

@@ -69,6 +69,8 @@ void add_world_commands(CLI::App &app);
 /// connect, disconnect, plane, trace: the devices through which real frames go, what moves them,
 /// and what becomes of one.
 void add_frame_commands(CLI::App &app);
+/// share, join, fabric: what several hosts have together.
+void add_fabric_commands(CLI::App &app);
 /// clock, restart, reset.
 void add_time_commands(CLI::App &app);
 /// fault, calls: the functions that programs call.

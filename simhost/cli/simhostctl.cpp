@@ -31,6 +31,7 @@ void add_commands(CLI::App &app) {
   app.footer("'simhostctl COMMAND --help' explains a command.");
   simhost::cli::add_world_commands(app);
   simhost::cli::add_frame_commands(app);
+  simhost::cli::add_fabric_commands(app);
   simhost::cli::add_time_commands(app);
   simhost::cli::add_call_commands(app);
 }

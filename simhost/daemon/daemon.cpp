@@ -399,6 +399,9 @@ void Daemon::settle(Wanted const &wanted) {
     troubles_.add(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
   }
   reply_to_waiting();
+  if (settled_) {
+    settled_(in_force_, troubles_.text());
+  }
   if (auto const ready = std::exchange(ready_, nullptr)) {
     ready();
   }

@@ -39,6 +39,9 @@ class Daemon {
   void connect();
   /// Done when what is wanted is in force for the first time.
   void when_ready(std::function<void()> ready) { ready_ = std::move(ready); }
+  using Settled = std::function<void(std::uint64_t change, std::string const &troubles)>;
+  /// Done whenever a change of the state is in force.
+  void when_settled(Settled settled) { settled_ = std::move(settled); }
   /// Puts into the state what was counted and seen, as it does from time to time.
   void save();
 
@@ -99,6 +102,7 @@ class Daemon {
   std::map<std::string, unsigned> at_bridges_;   // the index of each device
   std::multimap<std::uint64_t, Reply> waiting_;  // for a change to be in force
   std::function<void()> ready_;
+  Settled settled_;
   events::Loop::Timer next_sync_;
   events::Loop::Timer next_settling_;
   events::Loop::Timer next_connect_;

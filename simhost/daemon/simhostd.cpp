@@ -2,7 +2,10 @@
 #include <fmt/chrono.h>
 #include <fmt/format.h>
 
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <chrono>
 #include <csignal>
 #include <cstdio>
@@ -12,11 +15,13 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "daemon/daemon.h"
 #include "daemon/notify.h"
 #include "events/loop.h"
 #include "events/signals.h"
+#include "fabric/agent/agent.h"
 #include "planes/openvswitch/processes/private_openvswitch.h"
 
 namespace simhost::daemon {
@@ -33,6 +38,8 @@ struct Words {
   std::string state;
   std::string openvswitch;
   std::string datapath = "netdev";
+  std::string fabric;
+  std::string host;
 };
 
 // The journal has times of its own.
@@ -65,6 +72,29 @@ std::filesystem::path socket_of(Words const &words) {
                                               : std::string(kSystemSocket);
 }
 
+constexpr std::string_view kTcp = "tcp:";
+
+// Empty if it is no list of servers.
+std::vector<openvswitch::TcpAddress> servers_in(std::string_view text) {
+  std::vector<openvswitch::TcpAddress> servers;
+  while (!text.empty()) {
+    auto const one = text.substr(0, text.find(','));
+    text.remove_prefix(std::min(one.size() + 1, text.size()));
+    auto const server =
+        one.starts_with(kTcp) ? openvswitch::tcp_address(one.substr(kTcp.size())) : std::nullopt;
+    if (!server) {
+      return {};
+    }
+    servers.push_back(*server);
+  }
+  return servers;
+}
+
+std::string wrong_fabric(std::string const &text) {
+  return servers_in(text).empty() ? "must be servers such as tcp:192.0.2.1:6641,tcp:192.0.2.2:6641"
+                                  : std::string();
+}
+
 void serve(Words const &words) {
   auto const own_folder = folder_of_own(words);
   if (own_folder) {
@@ -83,6 +113,16 @@ void serve(Words const &words) {
                  .datapath = words.datapath},
                 say);
   daemon.when_ready([&] { tell_ready(words); });
+  std::optional<fabric::Agent> agent;
+  if (!words.fabric.empty()) {
+    agent.emplace(fabric::Options{.state = std::filesystem::absolute(words.state),
+                                  .servers = servers_in(words.fabric),
+                                  .host = words.host},
+                  say, [] { kill(getpid(), SIGTERM); });
+    daemon.when_settled([&](std::uint64_t change, std::string const &troubles) {
+      agent->tell({.change = change, .troubles = troubles});
+    });
+  }
   // Ends before the daemon does.
   std::optional<PrivateOpenVswitch> own;
   if (own_folder) {
@@ -120,8 +160,17 @@ int run(int count, char **given) {
   app.add_option("--datapath", words.datapath,
                  "netdev moves frames in ovs-vswitchd, system in the kernel")
       ->check(CLI::IsMember({"netdev", "system"}));
+  auto *const fabric =
+      app.add_option("--fabric", words.fabric,
+                     "tcp:ADDRESS:PORT,... are the servers of the database in which this host "
+                     "shares switches with others")
+          ->check(wrong_fabric);
+  app.add_option("--host", words.host, "what the host is called there")->needs(fabric);
   app.set_version_flag("--version", std::string("simhostd ") + SIMHOST_VERSION);
   CLI11_PARSE(app, count, given);
+  if (!words.fabric.empty() && words.host.empty()) {
+    throw std::runtime_error("--fabric takes a name for this host: --host NAME");
+  }
   serve(words);
   return 0;
 }

@@ -4,12 +4,14 @@
 #include <cassert>
 
 #include "base/outcomes.h"
+#include "model/sharing.h"
 #include "storage/store.h"
 
 namespace simhost {
 namespace {
 
 constinit Plane *chosen = nullptr;
+constinit Sharing *sharing = nullptr;
 
 }  // namespace
 
@@ -20,6 +22,10 @@ Plane &running_plane() {
 
 void run_on(Plane &plane) {
   chosen = &plane;
+}
+
+void share_through(Sharing *through) {
+  sharing = through;
 }
 
 Wires &get_wires() {
@@ -37,6 +43,10 @@ void commit(storage::ReadingTransaction &transaction) {
 void commit(storage::ChangingTransaction &transaction) {
   auto &plane = running_plane();
   plane.prepare(transaction);
+  // Last, because what others were told cannot be taken back.
+  if (sharing != nullptr) {
+    sharing->prepare(transaction);
+  }
   transaction.commit();
   plane.committed();
 }

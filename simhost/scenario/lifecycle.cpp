@@ -7,6 +7,7 @@
 #include "model/state/restart.h"
 #include "storage/ports.h"
 #include "storage/running/host_settings.h"
+#include "storage/shared.h"
 #include "storage/store.h"
 #include "storage/switches.h"
 
@@ -20,7 +21,9 @@ void restart_host(storage::ChangingTransaction &transaction) {
 
 void empty_host(storage::ChangingTransaction &transaction) {
   for (auto const &known : storage::all_switches(transaction)) {
-    storage::remove_switch(transaction, known.key);
+    if (!storage::is_shared(transaction, known.row.identifier)) {
+      storage::remove_switch(transaction, known.key);
+    }
   }
   storage::remove_uplinks(transaction);
   storage::restart_numbering(transaction);

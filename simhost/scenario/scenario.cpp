@@ -16,6 +16,7 @@
 #include "scenario/members.h"
 #include "scenario/reading.h"
 #include "scenario/scenario_switches.h"
+#include "storage/shared.h"
 #include "storage/store.h"
 
 namespace simhost::scenario {
@@ -114,9 +115,16 @@ void apply_fault(ChangingTransaction &transaction, Node const &node) {
                           .message = said.message});
 }
 
-}  // namespace
+// Whether a host shares the switch of that alias.
+bool is_shared(ChangingTransaction &transaction, Node const &node) {
+  auto const alias = node.at(kAlias).text();
+  auto const found = storage::find_switch(transaction, storage::SwitchName::alias, alias);
+  return found && storage::is_shared(transaction, found->row.identifier);
+}
 
-void apply(ChangingTransaction &transaction, std::string_view document) {
+template <typename IsWanted>
+void apply_if(ChangingTransaction &transaction, std::string_view document,
+              IsWanted const &is_wanted) {
   auto const json = parsed(document);
   Node const node(json);
   node.only(kDocumentParts);
@@ -129,8 +137,22 @@ void apply(ChangingTransaction &transaction, std::string_view document) {
   });
   if_there(node, keys::mac_learning,
            [&](Node const &learning) { apply_global_learning(transaction, learning); });
-  for_each_in(node, keys::switches, [&](Node const &item) { apply_switch(transaction, item); });
+  for_each_in(node, keys::switches, [&](Node const &item) {
+    if (is_wanted(item)) {
+      apply_switch(transaction, item);
+    }
+  });
   for_each_in(node, keys::faults, [&](Node const &item) { apply_fault(transaction, item); });
+}
+
+}  // namespace
+
+void apply(ChangingTransaction &transaction, std::string_view document) {
+  apply_if(transaction, document, [](Node const &) { return true; });
+}
+
+void apply_to_own(ChangingTransaction &transaction, std::string_view document) {
+  apply_if(transaction, document, [&](Node const &item) { return !is_shared(transaction, item); });
 }
 
 }  // namespace simhost::scenario

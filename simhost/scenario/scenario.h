@@ -17,6 +17,8 @@ namespace simhost::scenario {
 /// is touched. Throws DocumentError for a document that is malformed or that the host refuses; the
 /// transaction must not be committed then.
 void apply(storage::ChangingTransaction &transaction, std::string_view document);
+/// Likewise, but passes over the switches that the host shares with others.
+void apply_to_own(storage::ChangingTransaction &transaction, std::string_view document);
 
 /// The whole host as a document. Beside what apply() reads, switches and ports have a key
 /// "observed" with what follows from the rest, which apply() passes over.

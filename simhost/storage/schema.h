@@ -9,7 +9,7 @@ namespace simhost::storage {
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables, by a step of state_format.cpp that brings a file of the
 /// version before forward.
-inline constexpr std::int64_t kSchemaVersion = 8;
+inline constexpr std::int64_t kSchemaVersion = 9;
 /// The version that the first of those steps begins with; what is older is refused.
 inline constexpr std::int64_t kOldestSchema = 3;
 
@@ -27,5 +27,7 @@ extern char const *const kReadingSchema;
 extern char const *const kRememberedSchema;
 /// Adds to those when it was seen last.
 extern char const *const kSeenSchema;
+/// Likewise those of a host that shares switches with others.
+extern char const *const kSharedSchema;
 
 }  // namespace simhost::storage

@@ -17,7 +17,8 @@ namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
-    kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema, kSeenSchema};
+    kGenerationSchema, kFramesSchema, kReadingSchema,
+    kRememberedSchema, kSeenSchema,   kSharedSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -114,6 +115,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kReadingSchema);
   database.exec(kRememberedSchema);
   database.exec(kSeenSchema);
+  database.exec(kSharedSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

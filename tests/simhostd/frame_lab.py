@@ -9,7 +9,7 @@ import sys
 import time
 from pathlib import Path
 from types import TracebackType
-from typing import Any, Callable, Dict, Iterator, List, Mapping, Optional, Type
+from typing import Any, Callable, Dict, Iterator, List, Mapping, Optional, Sequence, Type
 
 from simhost import Client, Frames, Network, SharedHost
 from simhost._daemon import Daemon, start_simhostd
@@ -31,7 +31,7 @@ ONE_SWITCH: Dict[str, Any] = {
 }
 
 
-def comes_true(condition: Callable[[], bool]) -> bool:
+def comes_true(condition: Callable[[], Any]) -> bool:
     """Whether it is true at some time."""
     deadline = time.monotonic() + PATIENCE
     while time.monotonic() < deadline:
@@ -68,13 +68,22 @@ def learned_ages(lab: "Lab", port: str) -> Dict[str, int]:
 class Lab:
     """The host with its state, and everything around it; gone when it is left."""
 
-    def __init__(self, folder: Path, document: Mapping[str, Any], own_user: bool = False) -> None:
+    # Further options of simhostd.
+    options: Sequence[str] = ()
+
+    def __init__(
+        self,
+        folder: Path,
+        document: Mapping[str, Any],
+        own_user: bool = False,
+        outer: Optional[Namespace] = None,
+    ) -> None:
         self.folder = folder
         self.state = folder / "host.db"
         shared = SharedHost(self.state, document, folder)
         self.environment = shared.environment
         own_user = own_user or own_user_needed()
-        self.host = Namespace(own_user=own_user)
+        self.host = Namespace(outer, own_user=own_user and outer is None)
         self._cabling = Cabling(self.host)
         self.frames = Frames(shared, self._cabling, own_user)
         self.daemon: Optional[Daemon] = None
@@ -147,7 +156,8 @@ class Lab:
     def start(self, where: str = "") -> None:
         """Returns when it says that it is ready."""
         where = where or f"private:{self.folder}/ovs"
-        self.daemon = Daemon(self.host, self.state, where, self.folder / "simhostd.log")
+        log = self.folder / "simhostd.log"
+        self.daemon = Daemon(self.host, self.state, where, log, self.options)
 
     def stop(self, number: int = signal.SIGTERM) -> None:
         if self.daemon is not None:

@@ -18,6 +18,7 @@
 #include "base/outcomes.h"
 #include "base/utf8.h"
 #include "clock/clock.h"
+#include "fabric/caller/fabric_sharing.h"
 #include "faults/faults.h"
 #include "model/counters/counters.h"
 #include "model/devices/devices.h"
@@ -27,6 +28,7 @@
 #include "scenario/lifecycle.h"
 #include "scenario/scenario.h"
 #include "scenario/texts.h"
+#include "storage/shared.h"
 #include "storage/store.h"
 
 namespace simhost {
@@ -122,6 +124,15 @@ VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
   source.vid = vlan;
   source.vni = vni;
   return source;
+}
+
+// The state of a host that belongs to a fabric; empty if it belongs to none.
+std::filesystem::path fabric_state() {
+  auto &host = this_host();
+  std::scoped_lock const held(host.lock());
+  storage::ReadingTransaction transaction(host.state());
+  auto const &file = host.state_file();
+  return file && storage::find_membership(transaction) ? file->location() : std::filesystem::path();
 }
 
 std::string in_force_text(openvswitch::InForce const &found) {
@@ -300,6 +311,34 @@ SIMHOST_API size_t simhost_plane(char *text, size_t size) {
     length = copy_out(in_force_text(found), text, size);
   });
   return length;
+}
+
+SIMHOST_API int simhost_share(char const *switchName) {
+  return changing([&](storage::ChangingTransaction &transaction) {
+    fabric::share(transaction, get_switch(transaction, given(switchName)).row.identifier);
+  });
+}
+
+SIMHOST_API int simhost_join(char const *switchName) {
+  last_error.clear();
+  try {
+    fabric::join(fabric_state(), given(switchName));
+    return QEX_OK;
+  } catch (...) {
+    return failure();
+  }
+}
+
+SIMHOST_API size_t simhost_fabric(char *text, size_t size) {
+  last_error.clear();
+  try {
+    auto const state = fabric_state();
+    return copy_out(state.empty() ? std::string(R"({"host": null})") : fabric::status(state).dump(),
+                    text, size);
+  } catch (...) {
+    failure();
+    return copy_out(std::string(), text, size);
+  }
 }
 
 SIMHOST_API size_t simhost_trace(char const *switchName, char const *station,

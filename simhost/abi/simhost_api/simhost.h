@@ -113,6 +113,26 @@ int simhost_disconnect(char const *switchName, char const *port);
  */
 size_t simhost_plane(char *text, size_t size);
 /**
+ * Shares a switch of this host, with its ports, with the other hosts of its fabric.
+ * QEX_NOT_SUPPORTED for a host that belongs to none, QEX_EXISTS for a switch that is shared,
+ * QEX_BUSY where the fabric cannot be reached or refuses it, QEX_TIMEOUT where nobody knows what
+ * became of it.
+ */
+int simhost_share(char const *switchName);
+/**
+ * Makes this host one of those that have a switch of its fabric. Returns when the switch is here;
+ * it leaves when it is destroyed here. QEX_NOT_SUPPORTED and QEX_TIMEOUT as above, QEX_BUSY where
+ * the fabric cannot be reached, has no such switch, or this host cannot bear it.
+ */
+int simhost_join(char const *switchName);
+/**
+ * Tells of the fabric that this host belongs to, as an object in JSON: `host` is its name there,
+ * null if it belongs to none; `server` the one that is talked to, null without one; `revision` the
+ * number of the last change of the fabric that is here; `trouble` what stands in the way.
+ * Parameters and result as of simhost_describe.
+ */
+size_t simhost_fabric(char *text, size_t size);
+/**
  * Tells what becomes of a frame that comes in at a port or an uplink of a switch, as an array in
  * JSON: of each step `does` is "passes", "delivered", "copied" or "dropped", `text` says it,
  * `setting` is null or the `port`, null for the switch's own, and `name` of the setting that

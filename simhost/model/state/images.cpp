@@ -11,6 +11,7 @@
 #include "model/properties/properties.h"
 #include "model/switches/properties.h"
 #include "model/switches/switches.h"
+#include "storage/shared.h"
 #include "storage/store.h"
 #include "storage/switches.h"
 
@@ -99,6 +100,28 @@ void write_switch(Writer &writer, storage::Transaction &transaction,
   }
 }
 
+void skip_properties(Reader &reader) {
+  for (auto left = reader.number(); left != 0; --left) {
+    reader.text();
+    reader.number();
+    reader.bytes();
+  }
+}
+
+// What comes after the head of a switch.
+void skip_content(Reader &reader) {
+  skip_properties(reader);
+  skip_properties(reader);
+  for (auto left = reader.number(); left != 0; --left) {
+    reader.text();
+    reader.number();
+    reader.text();
+    reader.text();
+    skip_properties(reader);
+  }
+}
+
+// One that is shared is as the hosts that share it decided.
 void read_switch(Reader &reader, storage::ChangingTransaction &transaction) {
   auto const alias = reader.text();
   auto const identifier = reader.text();
@@ -107,6 +130,10 @@ void read_switch(Reader &reader, storage::ChangingTransaction &transaction) {
   auto const version = reader.number();
   bool const persistent = reader.number() != 0;
   bool const associated = reader.number() != 0;
+  if (storage::is_shared(transaction, identifier)) {
+    skip_content(reader);
+    return;
+  }
   auto const key = create_switch(transaction, {.alias = alias,
                                                .identifier = identifier,
                                                .portset = portset,
@@ -154,13 +181,15 @@ void load_state(storage::ChangingTransaction &transaction, BytesView image, Exte
 
 void clear_state(storage::ChangingTransaction &transaction) {
   for (auto const &found : storage::all_switches(transaction)) {
-    storage::remove_switch(transaction, found.key);
+    if (!storage::is_shared(transaction, found.row.identifier)) {
+      storage::remove_switch(transaction, found.key);
+    }
   }
 }
 
 void sanitize_state(storage::ChangingTransaction &transaction) {
   for (auto const &[key, row] : storage::all_switches(transaction)) {
-    if (!row.associated && !row.persistent) {
+    if (!row.associated && !row.persistent && !storage::is_shared(transaction, row.identifier)) {
       storage::remove_switch(transaction, key);
       continue;
     }

@@ -2,6 +2,7 @@
 #include "model/state/restart.h"
 
 #include "storage/properties.h"
+#include "storage/shared.h"
 #include "storage/store.h"
 #include "storage/switches.h"
 
@@ -9,7 +10,7 @@ namespace simhost {
 
 void restart_configuration(storage::ChangingTransaction &transaction) {
   for (auto const &[key, row] : storage::all_switches(transaction)) {
-    if (!row.persistent) {
+    if (!row.persistent && !storage::is_shared(transaction, row.identifier)) {
       storage::remove_switch(transaction, key);
     }
   }

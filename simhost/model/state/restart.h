@@ -9,8 +9,8 @@ class ChangingTransaction;
 
 namespace simhost {
 
-/// Drops what does not outlast a restart: switches that are not persistent, and runtime and
-/// volatile properties. Ports keep their numbers.
+/// Drops what does not outlast a restart: switches that are neither persistent nor shared, and
+/// runtime and volatile properties. Ports keep their numbers.
 SIMHOST_API void restart_configuration(storage::ChangingTransaction &transaction);
 
 }  // namespace simhost

@@ -3,19 +3,22 @@
 import signal
 import subprocess
 from pathlib import Path
-from typing import Any, Optional
+from typing import Any, Optional, Sequence
 
 from simhost import _loaded
 from simhost._namespaces import PATIENCE, Namespace, NoFrames
 
 
 class Daemon:
-    """Moves the frames of the host in a state file; `where` is what it says of Open vSwitch."""
+    """Moves the frames of the host in a state file; `where` is what it says of Open vSwitch, and
+    `more` are further options of it."""
 
-    def __init__(self, namespace: Namespace, state: Path, where: str, log: Path) -> None:
+    def __init__(
+        self, namespace: Namespace, state: Path, where: str, log: Path, more: Sequence[str] = ()
+    ) -> None:
         with open(log, "a", encoding="utf-8") as errors:
             self._process: Optional["subprocess.Popen[str]"] = start_simhostd(
-                namespace, state, where, stdout=subprocess.PIPE, stderr=errors
+                namespace, state, where, more, stdout=subprocess.PIPE, stderr=errors
             )
         if _first_line(self._process) != "ready\n":
             self.stop(signal.SIGKILL)
@@ -26,6 +29,10 @@ class Daemon:
         assert self._process is not None
         return self._process.pid
 
+    def send(self, number: int) -> None:
+        assert self._process is not None
+        self._process.send_signal(number)
+
     def stop(self, number: int = signal.SIGTERM) -> None:
         if self._process is not None:
             self._process.send_signal(number)
@@ -34,10 +41,11 @@ class Daemon:
 
 
 def start_simhostd(
-    namespace: Namespace, state: Path, where: str, **options: Any
+    namespace: Namespace, state: Path, where: str, more: Sequence[str] = (), **options: Any
 ) -> "subprocess.Popen[str]":
     program = str(_loaded.program("simhostd", package="libvswitch-simhostd"))
-    return namespace.start(program, "--state", str(state), "--openvswitch", where, **options)
+    words = ["--state", str(state), "--openvswitch", where, *more]
+    return namespace.start(program, *words, **options)
 
 
 def _first_line(process: "subprocess.Popen[str]") -> str:

@@ -362,7 +362,7 @@ def test_says_that_an_answer_cannot_be_written(host: Host, words: str) -> None:
 
 COMMANDS = (
     *("show", "apply", "link", "uplink", "learn", "counter", "clock", "restart", "reset", "fault"),
-    *("connect", "disconnect", "plane", "trace", "calls"),
+    *("connect", "disconnect", "plane", "trace", "share", "join", "fabric", "calls"),
     *("clock show", "clock stop", "clock run", "clock step", "clock set"),
     *("fault add", "fault list", "fault clear"),
 )

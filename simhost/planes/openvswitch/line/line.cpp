@@ -28,11 +28,11 @@ Descriptor connected(std::filesystem::path const &path) {
     auto socket_ =
         events::owned(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0), "socket");
     if (connect(socket_.number(), address.get(), address.size()) != 0) {
-      fail("no simhostd", errno);
+      events::fail_with_errno("connect");
     }
     return socket_;
   } catch (std::system_error const &error) {
-    fail("no simhostd", error.code().value());
+    throw NobodyListens(fmt::format("no simhostd: {}", error.code().message()));
   }
 }
 
@@ -111,16 +111,21 @@ std::optional<std::string> Lines::next() {
   return line;
 }
 
-Json ask(std::filesystem::path const &state, Json const &question,
-         std::chrono::milliseconds patience) {
+Json ask_at(std::filesystem::path const &path, Json const &question,
+            std::chrono::milliseconds patience) {
   auto const deadline = Clock::now() + patience;
-  auto const socket = connected(socket_of(state));
+  auto const socket = connected(path);
   send_all(socket, question.dump() + "\n", deadline);
   auto reply = Json::parse(next_line(socket, deadline), nullptr, false);
   if (!reply.is_object()) {
     throw NoDaemon("simhostd says what nobody understands");
   }
   return reply;
+}
+
+Json ask(std::filesystem::path const &state, Json const &question,
+         std::chrono::milliseconds patience) {
+  return ask_at(socket_of(state), question, patience);
 }
 
 }  // namespace simhost::openvswitch

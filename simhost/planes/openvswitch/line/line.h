@@ -20,6 +20,11 @@ class NoDaemon : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
+/// Nobody listens, so that nothing was asked.
+class NobodyListens : public NoDaemon {
+  using NoDaemon::NoDaemon;
+};
+
 /// The socket of the daemon of a state.
 std::filesystem::path socket_of(std::filesystem::path const &state);
 
@@ -38,7 +43,10 @@ class Lines {
   std::size_t searched_ = 0;
 };
 
-/// Asks the daemon, and waits for the reply no longer than that. Throws NoDaemon.
+/// Asks whoever listens at a socket, and waits for the reply no longer than that. Throws NoDaemon.
+Json ask_at(std::filesystem::path const &socket, Json const &question,
+            std::chrono::milliseconds patience);
+/// Likewise the daemon of a state.
 Json ask(std::filesystem::path const &state, Json const &question,
          std::chrono::milliseconds patience);
 

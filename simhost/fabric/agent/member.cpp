@@ -1,0 +1,400 @@
+// Nothing here waits for the lock of the state: whoever has it may be waiting for this.
+#include "fabric/agent/member.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <chrono>
+#include <random>
+#include <utility>
+
+#include "base/outcomes.h"
+#include "fabric/caller/fabric_sharing.h"
+#include "model/plane.h"
+#include "storage/running/frames.h"
+
+namespace simhost::fabric {
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr events::Clock::duration kReconnect = 100ms;
+constexpr events::Clock::duration kFirstWait = 2ms;
+constexpr events::Clock::duration kLongestWait = 50ms;
+constexpr events::Clock::duration kBetweenReports = 100ms;
+// How long a request of this host's own is waited for.
+constexpr auto kPatience = 4s;
+// After so long nobody waits for an outcome.
+constexpr auto kLongestDecision = 10s;
+// A server is looked for that long before callers are refused.
+constexpr auto kElection = 3s;
+// Nobody asks for the outcome of older ones.
+constexpr std::int64_t kKeptSeconds = 3600;
+
+std::string random_name() {
+  std::random_device random;
+  return fmt::format("{:08x}{:08x}", random(), random());
+}
+
+Deadline from_now(std::chrono::milliseconds time) {
+  return Deadline::clock::now() + time;
+}
+
+std::int64_t long_ago() {
+  auto const now = std::chrono::system_clock::now().time_since_epoch();
+  return std::chrono::duration_cast<std::chrono::seconds>(now).count() - kKeptSeconds;
+}
+
+Membership membership_in(storage::Store &store, std::string const &host) {
+  storage::ReadingTransaction transaction(store);
+  auto const found = storage::find_membership(transaction);
+  if (found && found->host != host) {
+    throw std::runtime_error(
+        fmt::format("the state belongs to a fabric as '{}', not as '{}'", found->host, host));
+  }
+  return found.value_or(Membership{.host = host, .state = random_name()});
+}
+
+std::string words_of(SharedName const &name, Records const &records) {
+  auto const record = records.find({name.switch_identifier, ""});
+  auto const alias = record != records.end() ? record->second.at("alias").get<std::string>()
+                                             : name.switch_identifier;
+  return name.port.empty() ? alias : alias + "/" + name.port;
+}
+
+Json map_of(std::map<std::string, std::string> const &texts) {
+  return ovsdb::map({texts.begin(), texts.end()});
+}
+
+}  // namespace
+
+Member::Member(events::Loop &loop, Options options, Say say)
+    : loop_(loop),
+      options_(std::move(options)),
+      say_(std::move(say)),
+      store_(options_.state, [](storage::ChangingTransaction &) {}),
+      membership_(membership_in(store_, options_.host)),
+      speaker_{.host = options_.host, .session = random_name()},
+      cluster_(options_.servers,
+               {.name = kDatabase, .version = kSchemaVersion, .selected = selected_columns()}),
+      server_(loop, agent_socket_of(options_.state),
+              [this](Json const &question, Reply const &reply) { handle(question, reply); }),
+      lost_(events::Clock::now()) {
+  next_connect_ = loop_.after({}, [this] { connect(); });
+}
+
+// The connection.
+
+void Member::connect() {
+  try {
+    cluster_.connect();
+    lost_.reset();
+    watch();
+    claim();
+    settle_undecided();
+    say_(fmt::format("the fabric is at {}", cluster_.server()));
+    trouble_.clear();
+    sync_soon();
+  } catch (std::runtime_error const &error) {
+    lose(error.what());
+  }
+}
+
+// Said once, however often it is tried.
+void Member::lose(std::string const &why) {
+  watches_.clear();
+  cluster_.disconnect();
+  speaks_ = false;
+  if (!lost_) {
+    lost_ = events::Clock::now();
+  }
+  if (std::exchange(trouble_, why) != why) {
+    say_("the fabric cannot be used: " + why);
+  }
+  next_connect_ = loop_.after(kReconnect, [this] { connect(); });
+}
+
+void Member::watch() {
+  watches_.clear();
+  for (auto const descriptor : cluster_.descriptors()) {
+    watches_.push_back(loop_.watch(descriptor, [this] { receive(); }));
+  }
+}
+
+void Member::receive() {
+  try {
+    if (cluster_.receive()) {
+      claim();
+      sync_soon();
+    }
+  } catch (std::runtime_error const &error) {
+    lose(error.what());
+  }
+}
+
+// The name.
+
+void Member::claim() {
+  auto const row = find_host(cluster_.replica(), options_.host);
+  if (gave_way_) {
+    throw std::runtime_error("another simhostd is this host by now");
+  }
+  if (!row) {
+    insert_host();
+  } else if (row->state != membership_.state) {
+    throw std::runtime_error(fmt::format(
+        "the name '{}' is taken by another host; the operators of the fabric can remove its row",
+        options_.host));
+  } else if (row->session != speaker_.session) {
+    gave_way_ = speaks_;
+    if (!gave_way_) {
+      take_over(*row);
+    }
+  }
+  speaks_ = !gave_way_;
+}
+
+void Member::insert_host() {
+  try {
+    cluster_.transact(
+        Json::array({{{"op", "insert"}, {"table", "Fabric"}, {"row", Json::object()}}}),
+        from_now(kPatience));
+  } catch (ovsdb::TransactionRefused const &) {
+    // It has its one row already.
+  }
+  cluster_.transact(Json::array({{{"op", "insert"},
+                                  {"table", "Host"},
+                                  {"row",
+                                   {{"name", options_.host},
+                                    {"state", membership_.state},
+                                    {"session", speaker_.session}}}}}),
+                    from_now(kPatience));
+}
+
+void Member::take_over(HostRow const &row) {
+  auto operations = only_for({.host = options_.host, .session = row.session});
+  operations.push_back({{"op", "update"},
+                        {"table", "Host"},
+                        {"where", Json::array({Json::array({"name", "==", options_.host})})},
+                        {"row", {{"session", speaker_.session}}}});
+  cluster_.transact(together({operations, old_changes_deletion(options_.host, long_ago())}),
+                    from_now(kPatience));
+}
+
+void Member::settle_undecided() {
+  while (!undecided_.empty()) {
+    auto const &proposal = undecided_.back();
+    bool const made = was_made(cluster_, proposal, from_now(kPatience));
+    say_(fmt::format("the change {} of which nobody knew was {}made", proposal.id,
+                     made ? "" : "not "));
+    undecided_.pop_back();
+  }
+}
+
+// From the fabric to the state.
+
+void Member::sync_soon(events::Clock::duration wait) {
+  if (!next_sync_ || wait < next_wait_) {
+    next_wait_ = wait;
+    next_sync_ = loop_.after(wait, [this] { sync(); });
+  }
+}
+
+void Member::sync() {
+  if (!speaks_) {
+    return;
+  }
+  auto const waited = next_wait_;
+  try {
+    auto const records = records_of(cluster_.replica(), options_.host);
+    auto const revision = revision_of(cluster_.replica());
+    if (!follow_records(records)) {
+      sync_soon(std::clamp<events::Clock::duration>(2 * waited, kFirstWait, kLongestWait));
+      return;
+    }
+    revision_ = revision;
+    tell_joined(records);
+    report_soon();
+  } catch (Json::exception const &error) {
+    lose(fmt::format("its rows are none of this version: {}", error.what()));
+  } catch (std::runtime_error const &error) {
+    lose(error.what());
+  }
+}
+
+// Returns whether it could: not while somebody else has the state.
+bool Member::follow_records(Records const &records) {
+  auto const before = std::exchange(unborne_, {});
+  while (true) {
+    try {
+      storage::Patience none(0ns);
+      storage::ChangingTransaction transaction(store_, none);
+      bool const is_new = !storage::find_membership(transaction);
+      if (is_new) {
+        storage::put_membership(transaction, membership_);
+      }
+      if (follow(transaction, membership_, records, unborne_) || is_new) {
+        storage::advance_frames_change(transaction);
+        change_ = storage::frames_change(transaction).value_or(0);
+        transaction.commit();
+      }
+      return true;
+    } catch (Unborne const &why) {
+      unborne_[why.name()] = why.what();
+      if (!before.contains(why.name())) {
+        say_(fmt::format("this host cannot bear what the fabric has of {}: {}",
+                         words_of(why.name(), records), why.what()));
+      }
+    } catch (storage::StateFailure const &failure) {
+      if (failure.kind() == storage::FailureKind::busy) {
+        return false;
+      }
+      throw;
+    }
+  }
+}
+
+void Member::tell_joined(Records const &records) {
+  for (auto const &[name, record] : records) {
+    auto const [first, end] = joining_.equal_range(record.value("alias", std::string()));
+    if (!name.port.empty() || first == end) {
+      continue;
+    }
+    auto const unborne = unborne_.find(name);
+    for (auto one = first; one != end; ++one) {
+      one->second(unborne == unborne_.end() ? Json{{"joined", name.switch_identifier}}
+                                            : Json{{"refused", unborne->second}});
+    }
+    joining_.erase(first, end);
+  }
+}
+
+// What the fabric is told of this host.
+
+void Member::tell(InForce const &in_force) {
+  in_force_ = in_force;
+  report_soon();
+}
+
+void Member::report_soon() {
+  if (!next_report_) {
+    next_report_ = loop_.after(kBetweenReports, [this] { report(); });
+  }
+}
+
+std::map<std::string, std::string> Member::links() {
+  std::map<std::string, std::string> all;
+  storage::ReadingTransaction transaction(store_);
+  for (auto const &uplink : storage::all_uplinks(transaction)) {
+    all[uplink.name] = running_plane().link_is_up(transaction, uplink.name) ? "up" : "down";
+  }
+  return all;
+}
+
+void Member::report() {
+  if (!speaks_) {
+    return;
+  }
+  try {
+    auto const records = records_of(cluster_.replica(), options_.host);
+    std::map<std::string, std::string> errors;
+    for (auto const &[name, why] : unborne_) {
+      errors[words_of(name, records)] = why;
+    }
+    if (!in_force_.troubles.empty()) {
+      errors["frames"] = in_force_.troubles;
+    }
+    Json row{{"links", map_of(links())}, {"errors", map_of(errors)}};
+    if (in_force_.change >= change_) {
+      row["in_force"] = revision_;
+    }
+    if (row != reported_) {
+      auto operations = only_for(speaker_);
+      operations.push_back({{"op", "update"},
+                            {"table", "Host"},
+                            {"where", Json::array({Json::array({"name", "==", options_.host})})},
+                            {"row", row}});
+      cluster_.transact(operations, from_now(kPatience));
+      reported_ = std::move(row);
+      // The reply may have come with news.
+      sync_soon();
+    }
+  } catch (std::runtime_error const &error) {
+    lose(error.what());
+  }
+}
+
+// What callers ask.
+
+void Member::handle(Json const &question, Reply const &reply) {
+  try {
+    auto const what = question.at("ask").get<std::string>();
+    if (what == "commit") {
+      commit(question, reply);
+    } else if (what == "join") {
+      join(question.at("alias").get<std::string>(), reply);
+    } else if (what == "status") {
+      reply(status());
+    } else {
+      reply({{"refused", "nobody here knows '" + what + "'"}});
+    }
+  } catch (Json::exception const &) {
+    reply({{"refused", "that is no question"}});
+  } catch (std::runtime_error const &error) {
+    reply({{"refused", error.what()}});
+  }
+}
+
+void Member::commit(Json const &question, Reply const &reply) {
+  if (!speaks_ && (!lost_ || events::Clock::now() - *lost_ > kElection)) {
+    reply({{"refused", "the fabric cannot be used: " + trouble_}});
+    return;
+  }
+  Proposal proposal{
+      .id = question.at("change").get<std::string>(), .host = options_.host, .operations = nullptr};
+  proposal.operations =
+      together({only_for(speaker_), operations_of(question.at("rows").get<std::vector<Change>>()),
+                next_revision(), change_insertion(proposal.id, options_.host, false)});
+  auto const decision = decide(cluster_, proposal, from_now(kLongestDecision));
+  if (decision.verdict == Verdict::unknown) {
+    undecided_.push_back(proposal);
+    reply({{"unknown", fmt::format("nobody knows whether the change {} is made: {}", proposal.id,
+                                   decision.why)}});
+  } else if (decision.verdict == Verdict::refused) {
+    reply({{"refused", decision.why}});
+  } else {
+    reply({{"made", proposal.id}});
+  }
+  // Its connection may be another one now.
+  if (cluster_.is_connected()) {
+    watch();
+    sync_soon();
+  } else {
+    lose(decision.why);
+  }
+}
+
+void Member::join(std::string const &alias, Reply const &reply) {
+  if (!speaks_) {
+    reply({{"refused", "the fabric cannot be used: " + trouble_}});
+    return;
+  }
+  auto const results = cluster_.transact(
+      together({only_for(speaker_), fabric::join(alias, options_.host), next_revision()}),
+      from_now(kPatience));
+  if (results.at(1).at("count") == 0) {
+    reply({{"refused", fmt::format("the fabric has no switch '{}'", alias)}});
+    return;
+  }
+  joining_.emplace(alias, reply);
+  sync_soon();
+}
+
+Json Member::status() const {
+  return {{"host", options_.host},
+          {"server", cluster_.is_connected() ? Json(cluster_.server()) : Json()},
+          {"revision", revision_},
+          {"trouble", trouble_}};
+}
+
+}  // namespace simhost::fabric

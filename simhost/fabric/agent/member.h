@@ -1,0 +1,97 @@
+// A host as a member of its fabric: what is shared is followed into its state, and what is changed
+// of it here is decided there.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <map>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "daemon/server.h"
+#include "daemon/troubles.h"
+#include "events/loop.h"
+#include "fabric/agent/decision.h"
+#include "fabric/agent/operations.h"
+#include "fabric/cluster/cluster.h"
+#include "fabric/shared/records.h"
+#include "storage/store.h"
+
+namespace simhost::fabric {
+
+using daemon::Reply;
+using daemon::Say;
+
+struct Options {
+  std::filesystem::path state;
+  std::vector<openvswitch::TcpAddress> servers;
+  std::string host;  ///< its name in the fabric
+};
+
+/// What moves the frames says of itself.
+struct InForce {
+  std::uint64_t change = 0;  ///< of the state
+  std::string troubles;
+};
+
+class Member {
+ public:
+  /// Of a state that has a daemon. Throws std::runtime_error for one that belongs to the fabric by
+  /// another name.
+  Member(events::Loop &loop, Options options, Say say);
+
+  void tell(InForce const &in_force);
+
+ private:
+  void connect();
+  void lose(std::string const &why);
+  void watch();
+  void receive();
+  void claim();
+  void insert_host();
+  void take_over(HostRow const &row);
+  void settle_undecided();
+
+  void sync_soon(events::Clock::duration wait = {});
+  void sync();
+  bool follow_records(Records const &records);
+  void tell_joined(Records const &records);
+
+  void report_soon();
+  void report();
+  [[nodiscard]] std::map<std::string, std::string> links();
+
+  void handle(Json const &question, Reply const &reply);
+  void commit(Json const &question, Reply const &reply);
+  void join(std::string const &alias, Reply const &reply);
+  [[nodiscard]] Json status() const;
+
+  events::Loop &loop_;
+  Options options_;
+  Say say_;
+  storage::Store store_;
+  Membership membership_;
+  Speaker speaker_;
+  Cluster cluster_;
+  daemon::Server server_;
+  bool speaks_ = false;    // for the host, to the fabric
+  bool gave_way_ = false;  // to another process
+  std::string trouble_;
+  std::optional<events::Clock::time_point> lost_;
+  std::vector<Proposal> undecided_;
+  std::map<SharedName, std::string> unborne_;
+  std::multimap<std::string, Reply> joining_;  // by the alias of the switch
+  std::int64_t revision_ = 0;                  // that is in the state
+  std::uint64_t change_ = 0;                   // of the state, with which it came
+  InForce in_force_;
+  Json reported_;
+  std::vector<events::Loop::Watch> watches_;
+  events::Loop::Timer next_connect_;
+  events::Loop::Timer next_sync_;
+  events::Clock::duration next_wait_{};
+  events::Loop::Timer next_report_;
+};
+
+}  // namespace simhost::fabric

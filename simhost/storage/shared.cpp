@@ -1,0 +1,73 @@
+// What is shared, in SQL.
+#include "storage/shared.h"
+
+#include "storage/query.h"
+
+namespace simhost::storage {
+namespace {
+
+Shared shared_at(Query const &row) {
+  return {.name = {.switch_identifier = row.name(0), .port = row.text(1)},
+          .fabric = row.text(2),
+          .image = row.is_null(3) ? std::nullopt : std::optional(row.bytes(3)),
+          .fits = row.flag(4)};
+}
+
+}  // namespace
+
+std::optional<Membership> find_membership(Transaction &transaction) {
+  return Query(transaction, "SELECT host, state FROM membership").first([](Query const &row) {
+    return Membership{.host = row.name(0), .state = row.name(1)};
+  });
+}
+
+void put_membership(ChangingTransaction &transaction, Membership const &membership) {
+  Change(transaction, "DELETE FROM membership").run();
+  Change(transaction, "INSERT INTO membership (host, state) VALUES (?, ?)")
+      .with(std::string_view(membership.host))
+      .with(std::string_view(membership.state))
+      .run();
+}
+
+std::vector<Shared> all_shared(Transaction &transaction) {
+  return Query(transaction,
+               "SELECT switch, port, fabric, image, fits FROM shared"
+               " ORDER BY switch, port")
+      .all(shared_at);
+}
+
+void put_shared(ChangingTransaction &transaction, Shared const &shared) {
+  Change(transaction,
+         "INSERT OR REPLACE INTO shared (switch, port, fabric, fits) VALUES (?, ?, ?, ?)")
+      .with(std::string_view(shared.name.switch_identifier))
+      .with(std::string_view(shared.name.port))
+      .with(std::string_view(shared.fabric))
+      .with(std::int64_t{shared.fits})
+      .run();
+  if (shared.image) {
+    Change(transaction, "UPDATE shared SET image = ? WHERE switch = ? AND port = ?")
+        .with(std::span<std::byte const>(*shared.image))
+        .with(std::string_view(shared.name.switch_identifier))
+        .with(std::string_view(shared.name.port))
+        .run();
+  }
+}
+
+void remove_shared(ChangingTransaction &transaction, SharedName const &name) {
+  Change(transaction, "DELETE FROM shared WHERE switch = ? AND port = ?")
+      .with(std::string_view(name.switch_identifier))
+      .with(std::string_view(name.port))
+      .run();
+}
+
+void remove_shared_switch(ChangingTransaction &transaction, std::string_view identifier) {
+  Change(transaction, "DELETE FROM shared WHERE switch = ?").with(identifier).run();
+}
+
+bool is_shared(Transaction &transaction, std::string_view switch_identifier) {
+  return Query(transaction, "SELECT 1 FROM shared WHERE switch = ? AND port = ''")
+      .with(switch_identifier)
+      .next();
+}
+
+}  // namespace simhost::storage

@@ -1,0 +1,58 @@
+// What is shared, as rows of a state.
+#include "storage/shared.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "storage/store.h"
+
+namespace simhost::storage {
+namespace {
+
+using testing::ElementsAre;
+
+std::vector<std::string> names(Transaction &transaction) {
+  std::vector<std::string> all;
+  for (auto const &shared : all_shared(transaction)) {
+    all.push_back(shared.name.switch_identifier + "/" + shared.name.port);
+  }
+  return all;
+}
+
+TEST(WhatIsShared, IsARowForEachSwitchAndPort) {
+  Store store(std::nullopt, [](ChangingTransaction &) {});
+  ChangingTransaction transaction(store);
+  Shared const port{.name = {"s", "p"}, .fabric = "{}", .image = std::vector{std::byte{7}}};
+  put_shared(transaction, port);
+  put_shared(transaction, {.name = {"s", ""}, .fabric = "", .image = {}, .fits = false});
+  put_shared(transaction, {.name = {"r", ""}, .fabric = "{}", .image = {}});
+  EXPECT_THAT(names(transaction), ElementsAre("r/", "s/", "s/p"));
+  auto const all = all_shared(transaction);
+  EXPECT_EQ(all[2].image, port.image);
+  EXPECT_EQ(all[2].fabric, "{}");
+  EXPECT_TRUE(all[2].fits);
+  EXPECT_FALSE(all[1].fits);
+  EXPECT_EQ(all[1].image, std::nullopt);
+  EXPECT_TRUE(is_shared(transaction, "s"));
+  EXPECT_FALSE(is_shared(transaction, "p"));
+
+  put_shared(transaction, {.name = port.name, .fabric = "{}", .image = {}});
+  EXPECT_EQ(all_shared(transaction)[2].image, std::nullopt);
+  remove_shared(transaction, {"s", ""});
+  EXPECT_FALSE(is_shared(transaction, "s"));
+  remove_shared_switch(transaction, "s");
+  EXPECT_THAT(names(transaction), ElementsAre("r/"));
+}
+
+TEST(WhatIsShared, IsOfOneMembership) {
+  Store store(std::nullopt, [](ChangingTransaction &) {});
+  ChangingTransaction transaction(store);
+  EXPECT_FALSE(find_membership(transaction));
+  put_membership(transaction, {.host = "one", .state = "x"});
+  put_membership(transaction, {.host = "two", .state = "y"});
+  EXPECT_EQ(find_membership(transaction)->host, "two");
+  EXPECT_EQ(find_membership(transaction)->state, "y");
+}
+
+}  // namespace
+}  // namespace simhost::storage

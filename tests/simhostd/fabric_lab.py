@@ -1,0 +1,224 @@
+"""Hosts that share switches: each in a network namespace, beside one with the servers of their
+database, and a wire from each host to it."""
+
+import json
+import shutil
+import signal
+import subprocess
+from contextlib import ExitStack
+from pathlib import Path
+from types import TracebackType
+from typing import Any, Dict, List, Mapping, Optional, Type
+
+from simhost._namespaces import PATIENCE, Namespace, own_user_needed
+
+from frame_lab import Lab, comes_true
+
+SCHEMA = Path(__file__).resolve().parents[2] / "simhost/fabric/fabric.ovsschema"
+_NETWORK = "192.0.2"
+_HUB = f"{_NETWORK}.1"
+_EMPTY: Dict[str, Any] = {}
+
+
+class Databases:
+    """A cluster of servers of one database."""
+
+    def __init__(self, namespace: Namespace, folder: Path, servers: int, schema: Path) -> None:
+        self._namespace = namespace
+        self._folder = folder
+        self._running: Dict[int, "subprocess.Popen[str]"] = {}
+        self._servers = range(servers)
+        for server in self._servers:
+            if server == 0:
+                words = ["--election-timer=300", "create-cluster", self._file(0), str(schema)]
+                namespace.run("ovsdb-tool", *words, self._peer(0))
+            else:
+                words = ["join-cluster", self._file(server), "fabric", self._peer(server)]
+                namespace.run("ovsdb-tool", *words, self._peer(0))
+            self.start(server)
+
+    @property
+    def addresses(self) -> str:
+        return ",".join(f"tcp:{_HUB}:{6640 + server}" for server in self._servers)
+
+    def start(self, server: int) -> None:
+        control = self._folder / f"{server}.ctl"
+        self._running[server] = self._namespace.start(
+            *("ovsdb-server", self._file(server), f"--remote=ptcp:{6640 + server}:{_HUB}"),
+            *(f"--remote=punix:{self._socket(server)}", f"--unixctl={control}"),
+            *("-vconsole:off", "-vsyslog:off", f"--log-file={self._folder}/{server}.log"),
+            stderr=subprocess.DEVNULL,
+        )
+        assert comes_true(lambda: Path(self._socket(server)).exists())
+        words = ["wait", f"unix:{self._socket(server)}", "fabric", "connected"]
+        if len(self._running) > len(self._servers) // 2:
+            self._namespace.run("ovsdb-client", f"--timeout={PATIENCE:.0f}", *words)
+
+    def kill(self, server: int) -> None:
+        process = self._running.pop(server)
+        process.kill()
+        process.communicate(timeout=PATIENCE)
+        Path(self._socket(server)).unlink()
+
+    def leader(self) -> int:
+        """The one that says so."""
+        found: List[int] = []
+
+        def find() -> bool:
+            found[:] = [one for one in self._running if self._leads(one)]
+            return len(found) == 1
+
+        assert comes_true(find)
+        return found[0]
+
+    def _leads(self, server: int) -> bool:
+        select = {"op": "select", "table": "Database", "where": [["name", "==", "fabric"]]}
+        rows = self._transact("_Server", server, select)[0]["rows"]
+        return bool(rows[0]["leader"])
+
+    def transact(self, *operations: Mapping[str, Any]) -> Any:
+        """Through any of the servers."""
+        return self._transact("fabric", min(self._running), *operations)
+
+    def _transact(self, database: str, server: int, *operations: Mapping[str, Any]) -> Any:
+        words = ["transact", f"unix:{self._socket(server)}", json.dumps([database, *operations])]
+        results = json.loads(
+            self._namespace.run("ovsdb-client", f"--timeout={PATIENCE:.0f}", *words)
+        )
+        assert not any("error" in result for result in results if result), results
+        return results
+
+    def rows(self, table: str, **equal: str) -> List[Dict[str, Any]]:
+        where = [[column, "==", value] for column, value in equal.items()]
+        found: List[Dict[str, Any]] = self.transact(
+            {"op": "select", "table": table, "where": where}
+        )[0]["rows"]
+        return found
+
+    def settings(self, table: str, **equal: str) -> Dict[str, Any]:
+        """Of the one row that there is."""
+        (row,) = self.rows(table, **equal)
+        return {name: json.loads(text) for name, text in row["settings"][1]}
+
+    def set(self, table: str, member: str, value: Any, **equal: str) -> None:
+        """As an operator would."""
+        where = [[column, "==", name] for column, name in equal.items()]
+        old = {"op": "mutate", "table": table, "where": where}
+        keys, entries = ["set", [member]], ["map", [[member, json.dumps(value)]]]
+        self.transact(
+            {**old, "mutations": [["settings", "delete", keys]]},
+            {**old, "mutations": [["settings", "insert", entries]]},
+        )
+
+    def close(self) -> None:
+        for server in list(self._running):
+            self.kill(server)
+
+    def _file(self, server: int) -> str:
+        return str(self._folder / f"{server}.db")
+
+    def _socket(self, server: int) -> str:
+        return str(self._folder / f"{server}.sock")
+
+    def _peer(self, server: int) -> str:
+        return f"tcp:{_HUB}:{6740 + server}"
+
+
+class Host(Lab):
+    """One of the hosts."""
+
+    def __init__(self, fabric: "FabricLab", name: str, document: Mapping[str, Any]) -> None:
+        folder = fabric.folder / name
+        folder.mkdir()
+        super().__init__(folder, document, outer=fabric.hub)
+        self.name = name
+        self.options = ["--fabric", fabric.databases.addresses, "--host", name]
+
+    def __enter__(self) -> "Host":
+        return self
+
+    def setting(self, switch: str, member: str) -> Any:
+        """What the document of the host says."""
+        for one in json.loads(self.ctl("show", "--json"))["switches"]:
+            if one["alias"] == switch:
+                return one.get(member)
+        return None
+
+    def ports(self, switch: str) -> Dict[str, Any]:
+        return {port["id"]: port for port in self.setting(switch, "ports") or []}
+
+    def call(self, *words: Any) -> int:
+        """The status of a call of the flat module, in a process of its own."""
+        name, *arguments = words
+        said = self.python(f"import _libvswitch as vs; print(vs.{name}(*{tuple(arguments)!r}))")
+        return int(said)
+
+    def refusal(self, document: Mapping[str, Any]) -> str:
+        """What stands in the way of a document."""
+        done = self.try_ctl("apply", "-", given=json.dumps(document))
+        assert done.returncode == 1, done.stdout
+        return done.stdout
+
+
+class FabricLab:
+    """The databases and hosts; gone when it is left."""
+
+    def __init__(self, folder: Path, servers: int = 1, schema: Path = SCHEMA) -> None:
+        self.folder = folder
+        self._left = ExitStack()
+        self.hub = Namespace(own_user=own_user_needed())
+        self._left.callback(self.hub.close)
+        run = self.hub.run
+        run("ip", "link", "add", "bridge", "type", "bridge", "forward_delay", "0")
+        run("ip", "link", "set", "bridge", "up")
+        run("ip", "address", "add", f"{_HUB}/24", "dev", "bridge")
+        (folder / "db").mkdir()
+        self.databases = Databases(self.hub, folder / "db", servers, schema)
+        self._left.callback(self.databases.close)
+        self.hosts: List[Host] = []
+
+    def __enter__(self) -> "FabricLab":
+        return self
+
+    def __exit__(
+        self,
+        kind: Optional[Type[BaseException]],
+        error: Optional[BaseException],
+        trace: Optional[TracebackType],
+    ) -> None:
+        self._left.close()
+
+    def host(self, name: str, document: Optional[Mapping[str, Any]] = None) -> Host:
+        """A host of that name, whose daemon is yet to be started."""
+        host = self._left.enter_context(Host(self, name, document or _EMPTY))
+        self.hosts.append(host)
+        number = len(self.hosts)
+        run = self.hub.run
+        run(
+            *("ip", "link", "add", f"h{number}", "index", str(3000 + number), "type", "veth"),
+            *("peer", "name", "fabric", "index", "2000", "netns", str(host.host.pid)),
+        )
+        run("ip", "link", "set", f"h{number}", "up", "master", "bridge")
+        host.host.run("ip", "link", "set", "fabric", "up")
+        host.host.run("ip", "address", "add", f"{_NETWORK}.{10 + number}/24", "dev", "fabric")
+        return host
+
+    def cut(self, host: Host, up: bool = False) -> None:
+        """The wire between a host and the databases."""
+        state = "up" if up else "down"
+        self.hub.run("ip", "link", "set", f"h{self.hosts.index(host) + 1}", state)
+
+
+def restored(host: Host, name: str) -> None:
+    """Puts a copy of the state that was kept under a name in its place."""
+    shutil.copy(host.folder / name, host.state)
+
+
+def kept(host: Host, name: str) -> None:
+    """Keeps a copy of the state, while nobody uses it."""
+    assert host.daemon is None
+    shutil.copy(host.state, host.folder / name)
+
+
+def killed(host: Host) -> None:
+    host.stop(signal.SIGKILL)
