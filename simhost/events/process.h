@@ -27,10 +27,12 @@ class Process {
   Process &operator=(Process const &) = delete;
 
   [[nodiscard]] int id() const { return id_; }
-  /// Asks it to end, and ends it if it has not done so in that time.
+  /// Asks it to end, and ends it if it has not done so in that time. It runs no more after that;
+  /// what it had open may still be closed once as much time has gone again.
   void end(Clock::duration patience);
 
  private:
+  [[nodiscard]] bool is_gone_within(Clock::duration patience) const;
   std::string reap();
 
   int id_;
