@@ -2,6 +2,7 @@
 #include "daemon/counting/bridge_totals.h"
 
 #include <limits>
+#include <vector>
 
 #include "planes/openvswitch/compile/pipeline.h"
 
@@ -10,15 +11,12 @@ namespace {
 
 using openvswitch::Counted;
 
-void add_flows(openflow::Connection &connection, std::uint8_t table, openvswitch::Deadline deadline,
-               openvswitch::Totals &totals) {
-  for (auto const &entry : connection.flows({.table = table}, deadline)) {
-    auto const kind = openvswitch::kind_of(entry.flow.cookie);
-    if (kind != Counted::nothing && kind != Counted::port) {
-      auto &total = totals[entry.flow.cookie];
-      total.packets += entry.traffic.packets;
-      total.bytes += entry.traffic.bytes;
-    }
+void add_flow(openflow::FlowEntry const &entry, openvswitch::Totals &totals) {
+  auto const kind = openvswitch::kind_of(entry.flow.cookie);
+  if (kind != Counted::nothing && kind != Counted::port) {
+    auto &total = totals[entry.flow.cookie];
+    total.packets += entry.traffic.packets;
+    total.bytes += entry.traffic.bytes;
   }
 }
 
@@ -41,8 +39,12 @@ void add_device(openflow::PortStatistics const &statistics, std::uint32_t number
 openvswitch::Totals totals_of(openflow::Connection &connection, PortNumbers const &numbers,
                               openvswitch::Deadline deadline) {
   openvswitch::Totals totals;
+  std::vector<openflow::FlowFilter> counting;
   for (auto const table : openvswitch::kCountingTables) {
-    add_flows(connection, table, deadline, totals);
+    counting.push_back({.table = table});
+  }
+  for (auto const &entry : connection.flows_of(counting, deadline)) {
+    add_flow(entry, totals);
   }
   for (auto const &statistics : connection.port_statistics(openflow::kAnyPort, deadline)) {
     auto const known = numbers.find(statistics.port);

@@ -386,12 +386,34 @@ TEST(OpenFlow, IsToldOfPorts) {
   EXPECT_EQ(std::get<PortStatus>(event).port.name, name);
 }
 
+std::vector<FlowMonitor> of_table_5(OwnChanges own = OwnChanges::untold) {
+  return {{.number = 1, .filter = {5}, .own = own}};
+}
+
+TEST(OpenFlow, IsAskedForSeveralThingsAtOnce) {
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  connection.change(to_add({}, {Flow{5}, Flow{6}, Flow{7}}), soon());
+  std::vector<std::uint8_t> tables;
+  for (auto const &entry : connection.flows_of(std::vector<FlowFilter>{{7}, {8}, {5}}, soon())) {
+    tables.push_back(entry.flow.table);
+  }
+  EXPECT_THAT(tables, testing::ElementsAre(7, 5));
+  std::vector<FlowMonitor> const monitors{{.number = 1, .filter = {6}},
+                                          {.number = 2, .filter = {5}}};
+  tables.clear();
+  for (auto const &update : connection.monitor_flows(monitors, soon())) {
+    tables.push_back(update.flow.table);
+  }
+  EXPECT_THAT(tables, testing::ElementsAre(6, 5));
+}
+
 TEST(OpenFlow, MonitorsFlows) {
   Bridge const bridge;
   Connection connection(bridge.socket(), soon());
   auto const before = flow_of_table(5, {Output{1}});
   connection.change(to_add({}, {before, Flow{6}}), soon());
-  auto const initial = connection.monitor_flows(1, {5}, soon());
+  auto const initial = connection.monitor_flows(of_table_5(), soon());
   ASSERT_EQ(initial.size(), 1);
   EXPECT_EQ(initial[0].event, FlowUpdate::Event::initial);
   EXPECT_EQ(initial[0].flow, before);
@@ -428,7 +450,7 @@ TEST(OpenFlow, MonitorsFlows) {
 TEST(OpenFlow, MonitorsFlowsThatItChangesItself) {
   Bridge const bridge;
   Connection connection(bridge.socket(), soon());
-  EXPECT_TRUE(connection.monitor_flows(1, {5}, soon(), OwnChanges::told).empty());
+  EXPECT_TRUE(connection.monitor_flows(of_table_5(OwnChanges::told), soon()).empty());
   auto const flow = flow_of_table(5, {Output{1}});
   connection.change(to_add({}, {flow}), soon());
   auto event = next_event(connection);

@@ -237,13 +237,9 @@ void Connection::change(Changes const &changes, Deadline deadline) {
   throw ChangeRefused(index, to_text(changes[index]), *error);
 }
 
-template <typename Item, typename Put, typename Take>
-std::vector<Item> Connection::ask(Put const &put, Take const &take, Deadline deadline) {
-  Writer out;
-  auto const xid = next_xid();
-  put(out, xid);
-  send(out);
-  std::vector<Item> items;
+template <typename Item, typename Take>
+void Connection::take_items(Xid xid, Take const &take, std::vector<Item> &items,
+                            Deadline deadline) {
   while (true) {
     auto const message = wait_for_reply(xid, deadline);
     auto in = payload_of(message);
@@ -255,14 +251,45 @@ std::vector<Item> Connection::ask(Put const &put, Take const &take, Deadline dea
       items.push_back(take(in));
     }
     if (!header.has_more) {
-      return items;
+      return;
     }
   }
 }
 
+template <typename Item, typename Asked, typename Put, typename Take>
+std::vector<Item> Connection::ask_each(std::span<Asked const> all, Put const &put, Take const &take,
+                                       Deadline deadline) {
+  Writer out;
+  auto xid = xid_;
+  for (auto const &asked : all) {
+    put(out, next_xid(), asked);
+  }
+  send(out);
+  std::vector<Item> items;
+  while (xid != xid_) {
+    take_items(++xid, take, items, deadline);
+  }
+  return items;
+}
+
+template <typename Item, typename Put, typename Take>
+std::vector<Item> Connection::ask(Put const &put, Take const &take, Deadline deadline) {
+  return ask_each<Item>(
+      std::span<Put const>(&put, 1), [](Writer &out, Xid xid, Put const &one) { one(out, xid); },
+      take, deadline);
+}
+
 std::vector<FlowEntry> Connection::flows(FlowFilter const &filter, Deadline deadline) {
-  return ask<FlowEntry>(
-      [&](Writer &out, Xid xid) { put_flows_request(out, xid, MultipartType::flows, filter); },
+  return flows_of(std::span(&filter, 1), deadline);
+}
+
+std::vector<FlowEntry> Connection::flows_of(std::span<FlowFilter const> filters,
+                                            Deadline deadline) {
+  return ask_each<FlowEntry>(
+      filters,
+      [](Writer &out, Xid xid, FlowFilter const &filter) {
+        put_flows_request(out, xid, MultipartType::flows, filter);
+      },
       take_flow, deadline);
 }
 
@@ -306,10 +333,13 @@ std::vector<GroupStatistics> Connection::group_statistics(Deadline deadline) {
       take_group_statistics, deadline);
 }
 
-std::vector<FlowUpdate> Connection::monitor_flows(std::uint32_t monitor, FlowFilter const &filter,
-                                                  Deadline deadline, OwnChanges own) {
-  return ask<FlowUpdate>(
-      [&](Writer &out, Xid xid) { put_flow_monitor_request(out, xid, monitor, filter, own); },
+std::vector<FlowUpdate> Connection::monitor_flows(std::span<FlowMonitor const> monitors,
+                                                  Deadline deadline) {
+  return ask_each<FlowUpdate>(
+      monitors,
+      [](Writer &out, Xid xid, FlowMonitor const &monitor) {
+        put_flow_monitor_request(out, xid, monitor.number, monitor.filter, monitor.own);
+      },
       take_flow_update, deadline);
 }
 

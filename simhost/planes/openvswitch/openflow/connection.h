@@ -6,6 +6,7 @@
 #include <filesystem>
 #include <functional>
 #include <optional>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -57,16 +58,19 @@ class Connection {
   /// From now on it sends these by itself.
   void set_async(AsyncMessages const &wanted, Deadline deadline);
 
+  // What is asked of several things is sent at once: Open vSwitch looks at all of its devices
+  // before it listens to a connection again.
+
   std::vector<FlowEntry> flows(FlowFilter const &filter, Deadline deadline);
+  /// Of one filter after the other.
+  std::vector<FlowEntry> flows_of(std::span<FlowFilter const> filters, Deadline deadline);
   Aggregate aggregate(FlowFilter const &filter, Deadline deadline);
   std::vector<PortStatistics> port_statistics(Port port, Deadline deadline);
   std::vector<PortDescription> ports(Deadline deadline);
   std::vector<GroupEntry> groups(Deadline deadline);
   std::vector<GroupStatistics> group_statistics(Deadline deadline);
   /// From now on each change of such flows, its own too, is an event. Returns what there is.
-  /// `monitor` is a number of one's own.
-  std::vector<FlowUpdate> monitor_flows(std::uint32_t monitor, FlowFilter const &filter,
-                                        Deadline deadline, OwnChanges own = OwnChanges::untold);
+  std::vector<FlowUpdate> monitor_flows(std::span<FlowMonitor const> monitors, Deadline deadline);
   /// Ends one that there is. For others Open vSwitch has no reply that tells what it is about.
   void cancel_monitor(std::uint32_t monitor, Deadline deadline);
 
@@ -92,6 +96,12 @@ class Connection {
   /// All items of a multipart reply.
   template <typename Item, typename Put, typename Take>
   std::vector<Item> ask(Put const &put, Take const &take, Deadline deadline);
+  /// Likewise, of several requests, those of one after those of the other.
+  template <typename Item, typename Asked, typename Put, typename Take>
+  std::vector<Item> ask_each(std::span<Asked const> all, Put const &put, Take const &take,
+                             Deadline deadline);
+  template <typename Item, typename Take>
+  void take_items(std::uint32_t xid, Take const &take, std::vector<Item> &items, Deadline deadline);
 
   openvswitch::Stream stream_;
   std::vector<std::uint8_t> received_;

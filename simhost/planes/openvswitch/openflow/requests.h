@@ -29,6 +29,13 @@ struct PacketOut {
 /// Whether a monitor says what a change of its own connection changed.
 enum class OwnChanges { untold, told };
 
+/// Flows of which each change is told.
+struct FlowMonitor {
+  std::uint32_t number;  // of one's own
+  FlowFilter filter;
+  OwnChanges own = OwnChanges::untold;
+};
+
 /// Messages that a switch sends by itself.
 struct AsyncMessages {
   bool packet_in = false;
