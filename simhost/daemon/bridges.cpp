@@ -9,6 +9,7 @@
 #include <utility>
 #include <variant>
 
+#include "daemon/bridge/bridge_rows.h"
 #include "daemon/bridge/changes.h"
 #include "daemon/bridge/made_bridge.h"
 #include "planes/openvswitch/compile/pipeline.h"
@@ -41,22 +42,6 @@ Deadline soon(std::size_t devices = 0) {
 
 bool is_marker(openflow::FlowEntry const &entry) {
   return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
-}
-
-std::set<std::string> added_devices(openvswitch::PresentRows const &present,
-                                    std::vector<openvswitch::BridgeRow> const &wanted) {
-  std::set<std::string> added;
-  for (auto const &bridge : wanted) {
-    for (auto const &[device, number] : bridge.devices) {
-      added.insert(device);
-    }
-  }
-  for (auto const &bridge : present.bridges) {
-    for (auto const &[device, id] : bridge.ports) {
-      added.erase(device);
-    }
-  }
-  return added;
 }
 
 openvswitch::Difference difference_between(openvswitch::Compiled const &present,
@@ -162,19 +147,9 @@ void Bridges::read_database_events() {
   }
 }
 
-std::set<std::string> Bridges::apply_rows(Wanted const &wanted, Deadline deadline) {
-  std::vector<openvswitch::BridgeRow> rows;
-  for (auto const &bridge : wanted.bridges) {
-    rows.push_back(bridge.row);
-    std::erase_if(rows.back().devices,
-                  [&](auto const &device) { return present().elsewhere.contains(device.first); });
-  }
-  for (auto const &bridge : present().bridges) {
-    if (std::ranges::any_of(wanted.unfit,
-                            [&](Unfit const &one) { return one.bridge == bridge.row.name; })) {
-      rows.push_back(bridge.row);
-    }
-  }
+std::set<std::string> Bridges::apply_rows(Wanted const &wanted,
+                                          std::vector<openvswitch::BridgeRow> const &rows,
+                                          Deadline deadline) {
   // As many as those need that stay as they are, too.
   auto const most_tags =
       wanted.unfit.empty() ? wanted.most_tags : std::max(wanted.most_tags, present().most_tags);
@@ -213,20 +188,20 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
 
 // Once it is told of changes, so that none is missed.
 void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
-  std::vector<Flow> learned;
   bridge.connection.set_async({.packet_in = true, .group_and_meter_changes = true}, deadline);
+  std::vector<openflow::FlowMonitor> monitors;
   for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
-    bool const is_learned = openvswitch::table::is_learned(number);
     // These are recent for a second, and many.
     if (number != openvswitch::table::kRecentSources) {
-      auto const own = is_learned ? openflow::OwnChanges::told : openflow::OwnChanges::untold;
-      auto const there =
-          bridge.connection.monitor_flows(number + 1U, {.table = number}, deadline, own);
-      for (auto const &update : there) {
-        if (is_learned) {
-          learned.push_back(update.flow);
-        }
-      }
+      auto const own = openvswitch::table::is_learned(number) ? openflow::OwnChanges::told
+                                                              : openflow::OwnChanges::untold;
+      monitors.push_back({.number = number + 1U, .filter = {.table = number}, .own = own});
+    }
+  }
+  std::vector<Flow> learned;
+  for (auto const &update : bridge.connection.monitor_flows(monitors, deadline)) {
+    if (openvswitch::table::is_learned(update.flow.table)) {
+      learned.push_back(update.flow);
     }
   }
   auto flows = bridge.connection.flows({}, deadline);
@@ -486,12 +461,17 @@ std::size_t Bridges::apply(Wanted const &wanted) {
       count(*bridge.second, deadline);
     }
   }
-  auto const added = apply_rows(wanted, deadline);
+  auto const rows = wanted_rows(wanted, present());
+  auto const first_rows = rows_before_flows(rows, present());
+  auto const added = apply_rows(wanted, first_rows, deadline);
   std::erase_if(bridges_, [](auto const &bridge) { return bridge.second->is_altered; });
   std::erase_if(bridges_, goes);
   std::size_t changed = 0;
   for (auto const &bridge : wanted.bridges) {
     changed += apply_flows(bridge, wanted.change, added, deadline);
+  }
+  if (rows != first_rows) {
+    apply_rows(wanted, rows, deadline);
   }
   return changed;
 }

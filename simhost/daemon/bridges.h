@@ -83,7 +83,9 @@ class Bridges {
   void read_database_events();
   openvswitch::PresentRows const &present();
   // Returns the devices that were put at bridges.
-  std::set<std::string> apply_rows(Wanted const &wanted, openvswitch::Deadline deadline);
+  std::set<std::string> apply_rows(Wanted const &wanted,
+                                   std::vector<openvswitch::BridgeRow> const &rows,
+                                   openvswitch::Deadline deadline);
   std::size_t apply_flows(WantedBridge const &wanted, std::uint64_t change,
                           std::set<std::string> const &added, openvswitch::Deadline deadline);
   Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);

@@ -1,0 +1,54 @@
+#include "daemon/bridge/bridge_rows.h"
+
+#include <algorithm>
+
+namespace simhost::daemon {
+
+using openvswitch::BridgeRow;
+using openvswitch::PresentRows;
+
+std::vector<BridgeRow> wanted_rows(Wanted const &wanted, PresentRows const &present) {
+  std::vector<BridgeRow> rows;
+  for (auto const &bridge : wanted.bridges) {
+    rows.push_back(bridge.row);
+    std::erase_if(rows.back().devices,
+                  [&](auto const &device) { return present.elsewhere.contains(device.first); });
+  }
+  for (auto const &bridge : present.bridges) {
+    if (std::ranges::any_of(wanted.unfit,
+                            [&](Unfit const &one) { return one.bridge == bridge.row.name; })) {
+      rows.push_back(bridge.row);
+    }
+  }
+  return rows;
+}
+
+std::vector<BridgeRow> rows_before_flows(std::vector<BridgeRow> wanted,
+                                         PresentRows const &present) {
+  for (auto &row : wanted) {
+    bool const is_there = std::ranges::any_of(
+        present.bridges, [&](auto const &bridge) { return bridge.row.name == row.name; });
+    if (!is_there) {
+      row.devices.clear();
+    }
+  }
+  return wanted;
+}
+
+std::set<std::string> added_devices(PresentRows const &present,
+                                    std::vector<BridgeRow> const &wanted) {
+  std::set<std::string> added;
+  for (auto const &bridge : wanted) {
+    for (auto const &[device, number] : bridge.devices) {
+      added.insert(device);
+    }
+  }
+  for (auto const &bridge : present.bridges) {
+    for (auto const &[device, id] : bridge.ports) {
+      added.erase(device);
+    }
+  }
+  return added;
+}
+
+}  // namespace simhost::daemon

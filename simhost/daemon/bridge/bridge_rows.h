@@ -1,0 +1,24 @@
+// The rows of bridges that are wanted, next to those that are there.
+#pragma once
+
+#include <set>
+#include <string>
+#include <vector>
+
+#include "daemon/wanted.h"
+#include "planes/openvswitch/rows/rows.h"
+
+namespace simhost::daemon {
+
+/// Without devices that others have. Bridges of switches that cannot be run stay as they are.
+std::vector<openvswitch::BridgeRow> wanted_rows(Wanted const &wanted,
+                                                openvswitch::PresentRows const &present);
+/// Likewise, but bridges that are not there yet get no devices: ovs-vswitchd looks for frames at
+/// all devices after each fifty messages, so that flows are in a bridge sooner before it has any.
+std::vector<openvswitch::BridgeRow> rows_before_flows(std::vector<openvswitch::BridgeRow> wanted,
+                                                      openvswitch::PresentRows const &present);
+/// The devices that come to a bridge.
+std::set<std::string> added_devices(openvswitch::PresentRows const &present,
+                                    std::vector<openvswitch::BridgeRow> const &wanted);
+
+}  // namespace simhost::daemon
