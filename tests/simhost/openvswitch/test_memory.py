@@ -153,6 +153,19 @@ def test_an_address_that_is_not_known_is_the_first_one(bench: Bench) -> None:
     assert reached(bench, "p2", A, C) == {"p1"}
 
 
+def test_it_is_that_in_all_vlans_of_a_client_that_tags(bench: Bench) -> None:
+    trunk = {"vlan": {"trunk": ["7-8"]}}
+    load(bench, at_two_uplinks({**trunk, "forbids": ["forged_transmits"]}, trunk))
+
+    def passes(vlan: int, source: str) -> bool:
+        return bool(bench.send("p1", Frame(BROADCAST, source, ((vlan, 0),))))
+
+    assert passes(7, A)
+    assert not passes(8, B)
+    assert passes(8, A)
+    assert set(bench.send("p2", Frame(A, C, ((8, 0),)))) == {("p1", ((8, 0),), None)}
+
+
 @pytest.mark.parametrize("port", [learner(), {}])
 def test_own_frames_do_not_come_back(clock: Clock, port: Any) -> None:
     """Nor does a client that is heard elsewhere stay unheard there."""
