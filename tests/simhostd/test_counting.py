@@ -62,6 +62,25 @@ def test_what_is_not_let_in_is_dropped(lab: Lab) -> None:
     come_to(lambda: counters(lab, "a"), {**counted, "pktsInDropped": 11})
 
 
+def test_what_a_port_has_no_room_for_is_counted_once(lab: Lab) -> None:
+    """As dropped or as let in, by however many frames of its kind."""
+    learns = {"learning": True, "flooding": True, "limit": 1, "limit_policy": "drop"}
+    lab.set_port("lab", "a", mac_learning=learns)
+    one = lab.client("lab", "a")
+    send(one, 10, BROADCAST)
+    for number in range(3):
+        send(one, 20, BROADCAST, source=f"02:00:00:00:77:{number:02x}")
+
+    def counted() -> int:
+        found = counters(lab, "a")
+        return found["pktsInBroadcast"] + found.get("noLearningDroppedPkts", 0)
+
+    come_to(counted, 70)
+    found = counters(lab, "a")
+    assert found["noLearningDroppedPkts"] == found["pktsInDropped"] >= 3
+    assert found["pktsInBroadcast"] >= 10
+
+
 def come_to_count(lab: Lab, frames: int) -> None:
     """What port a was let send, to all."""
     counted = {"pktsInBroadcast": frames, "bytesInBroadcast": frames * LENGTH}
