@@ -1,28 +1,17 @@
-// Reading rows and writing operations.
-#include "planes/openvswitch/rows/rows.h"
-
+// Writing operations: no more than what differs.
 #include <fmt/format.h>
 
 #include <algorithm>
-#include <exception>
 #include <set>
-#include <stdexcept>
 #include <utility>
+
+#include "planes/openvswitch/rows/columns.h"
+#include "planes/openvswitch/rows/rows.h"
 
 namespace simhost::openvswitch {
 namespace {
 
-// In external_ids of a bridge: whose it is.
-constexpr auto *kHost = "simhost";
-// In external_ids of Open_vSwitch: who writes all of those.
-constexpr auto *kOwner = "simhostd";
-constexpr auto *kMostTags = "vlan-limit";
-
 Json const kEverywhere = Json::array();
-
-Json map_of(std::map<std::string, std::string> const &entries) {
-  return ovsdb::map({entries.begin(), entries.end()});
-}
 
 Json is(Json const &id) {
   return Json::array({{"_uuid", "==", id}});
@@ -43,85 +32,12 @@ Json mutate(std::string const &table, Json where, Json mutations) {
           {"mutations", std::move(mutations)}};
 }
 
-std::string text_under(Json const &column, std::string const &wanted) {
-  for (auto const &[key, value] : ovsdb::entries_of(column)) {
-    if (key == wanted) {
-      return value.get<std::string>();
-    }
-  }
-  return {};
-}
-
-std::string id_in(Json const &column) {
-  return column.at(1).get<std::string>();
-}
-
-[[noreturn]] void refuse(std::exception const &error) {
-  throw std::runtime_error(
-      fmt::format("Open vSwitch's database has rows that do not fit together: {}", error.what()));
-}
-
-// What each row of this host's says, whoever else writes there; as a replica has it.
-ovsdb::Row const kBridge{{"fail_mode", ovsdb::set({"secure"})},
-                         {"protocols", ovsdb::set({"OpenFlow15"})},
-                         {"controller", ovsdb::set({})},
-                         {"mirrors", ovsdb::set({})},
-                         {"other_config", map_of({{"disable-in-band", "true"}})}};
-ovsdb::Row const kPort{
-    {"tag", ovsdb::set({})}, {"trunks", ovsdb::set({})}, {"vlan_mode", ovsdb::set({})}};
-ovsdb::Row const kInterface{{"type", ""}, {"ingress_policing_rate", 0}};
-
-bool says(ovsdb::Row const &row, ovsdb::Row const &what) {
-  return std::ranges::all_of(
-      what, [&](auto const &column) { return row.at(column.first) == column.second; });
-}
-
 Json json_of(ovsdb::Row const &row) {
   Json all = Json::object();
   for (auto const &[column, value] : row) {
     all[column] = value;
   }
   return all;
-}
-
-struct Tables {
-  ovsdb::Rows const &ports;
-  ovsdb::Rows const &interfaces;
-  ovsdb::Rows const &flow_tables;
-};
-
-void add_device(PresentBridge &bridge, std::string const &port_id, Tables const &tables) {
-  auto const &port = tables.ports.at(port_id);
-  auto const name = port.at("name").get<std::string>();
-  if (name == bridge.row.name) {
-    return;  // the bridge's own
-  }
-  bridge.ports.emplace(name, port_id);
-  auto const interfaces = ovsdb::atoms_of(port.at("interfaces"));
-  auto const &interface = tables.interfaces.at(id_in(interfaces.at(0)));
-  auto const requested = ovsdb::atoms_of(interface.at("ofport_request"));
-  bool const is_ours = interfaces.size() == 1 && !requested.empty() && says(port, kPort) &&
-                       says(interface, kInterface);
-  // No device is wanted with that number, so that one that is not as it should be is put anew.
-  bridge.row.devices[name] = is_ours ? requested.front().get<std::uint16_t>() : 0;
-}
-
-PresentBridge bridge_of(std::string const &id, ovsdb::Row const &row, Tables const &tables) {
-  PresentBridge bridge{.id = id,
-                       .row = {.name = row.at("name").get<std::string>(),
-                               .datapath = row.at("datapath_type").get<std::string>()},
-                       .ports = {},
-                       .is_altered = !says(row, kBridge)};
-  for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
-    add_device(bridge, id_in(port), tables);
-  }
-  for (auto const &[number, table] : ovsdb::entries_of(row.at("flow_tables"))) {
-    for (auto const &limit :
-         ovsdb::atoms_of(tables.flow_tables.at(id_in(table)).at("flow_limit"))) {
-      bridge.row.limits[number.get<std::uint8_t>()] = limit.get<std::uint32_t>();
-    }
-  }
-  return bridge;
 }
 
 // Names of rows within one transaction.
@@ -260,55 +176,6 @@ bool is_same_bridge(PresentBridge const &present, BridgeRow const &wanted) {
 }
 
 }  // namespace
-
-void select_rows(ovsdb::Selected &selected) {
-  ovsdb::Selected const read{
-      {"Open_vSwitch", {"external_ids", "other_config"}},
-      {"Bridge",
-       {"name", "datapath_type", "ports", "external_ids", "flow_tables", "fail_mode", "protocols",
-        "controller", "mirrors", "other_config"}},
-      {"Port", {"name", "interfaces", "tag", "trunks", "vlan_mode"}},
-      {"Interface", {"name", "ofport_request", "type", "ingress_policing_rate"}},
-      {"Flow_Table", {"flow_limit"}}};
-  for (auto const &[table, columns] : read) {
-    auto &known = selected[table];
-    known.insert(known.end(), columns.begin(), columns.end());
-  }
-}
-
-PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host) {
-  try {
-    PresentRows present;
-    for (auto const &[id, row] : replica.rows("Open_vSwitch")) {
-      present.is_new = false;
-      present.owner = text_under(row.at("external_ids"), kOwner);
-      auto const tags = text_under(row.at("other_config"), kMostTags);
-      present.most_tags = tags.empty() ? 0 : static_cast<std::uint32_t>(std::stoul(tags));
-    }
-    Tables const tables{.ports = replica.rows("Port"),
-                        .interfaces = replica.rows("Interface"),
-                        .flow_tables = replica.rows("Flow_Table")};
-    for (auto const *const device : {"ovs-netdev", "ovs-system"}) {
-      present.elsewhere[device] = device;
-    }
-    for (auto const &[id, row] : replica.rows("Bridge")) {
-      auto const name = row.at("name").get<std::string>();
-      if (text_under(row.at("external_ids"), kHost) == host) {
-        present.bridges.push_back(bridge_of(id, row, tables));
-        present.elsewhere[name] = name;
-      } else {
-        for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
-          present.elsewhere[tables.ports.at(id_in(port)).at("name").get<std::string>()] = name;
-        }
-      }
-    }
-    return present;
-  } catch (std::logic_error const &error) {
-    refuse(error);
-  } catch (Json::exception const &error) {
-    refuse(error);
-  }
-}
 
 Json operations(PresentRows const &present, std::span<BridgeRow const> wanted,
                 std::string_view host, std::string_view owner, std::uint32_t most_tags) {
