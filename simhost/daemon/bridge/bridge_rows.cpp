@@ -44,7 +44,7 @@ std::set<std::string> added_devices(PresentRows const &present,
     }
   }
   for (auto const &bridge : present.bridges) {
-    for (auto const &[device, id] : bridge.ports) {
+    for (auto const &[device, number] : bridge.row.devices) {
       added.erase(device);
     }
   }

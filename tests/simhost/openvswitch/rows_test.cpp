@@ -3,7 +3,9 @@
 
 #include <gmock/gmock.h>
 
+#include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace {
@@ -48,12 +50,15 @@ Schema schema() {
             {"interfaces", set},
             {"tag", optional},
             {"trunks", set},
-            {"vlan_mode", optional}}},
+            {"vlan_mode", optional},
+            {"lacp", optional},
+            {"other_config", map}}},
           {"Interface",
            {{"name", single},
             {"ofport_request", optional},
             {"type", single},
-            {"ingress_policing_rate", number}}},
+            {"ingress_policing_rate", number},
+            {"other_config", map}}},
           {"Flow_Table", {{"flow_limit", optional}}}};
 }
 
@@ -155,6 +160,101 @@ TEST(TheRows, ThatSomebodyElseChangedAreMadeAsTheyWere) {
     EXPECT_THAT(told(present_rows(altered, kHost), {vs1()}),
                 ElementsAre("insert Interface", "insert Port", "mutate Bridge"));
   }
+}
+
+// The same bridge with a group of two devices.
+Replica with_lag() {
+  auto made = replica();
+  made.apply(Json::parse(R"json({
+    "Bridge": {"b1": {"modify": {"ports": ["uuid", "p3"]}}},
+    "Port": {
+      "p3": {"insert": {"name": "vs1-lag1", "interfaces": ["set", [["uuid", "i3"], ["uuid", "i4"]]],
+                        "lacp": "active",
+                        "other_config": ["map", [["lacp-system-id", "02:00:00:00:00:01"],
+                                                 ["lacp-time", "fast"]]]}}},
+    "Interface": {
+      "i3": {"insert": {"name": "u0", "ofport_request": 7,
+                        "other_config": ["map", [["lacp-aggregation-key", "1"]]]}},
+      "i4": {"insert": {"name": "u1", "ofport_request": 8,
+                        "other_config": ["map", [["lacp-aggregation-key", "1"]]]}}}
+  })json"));
+  return made;
+}
+
+BridgeRow vs1_with_lag() {
+  auto bridge = vs1();
+  bridge.devices.merge(std::map<std::string, std::uint16_t>{{"u0", 7}, {"u1", 8}});
+  bridge.lags["vs1-lag1"] = {
+      .devices = {"u0", "u1"}, .system = "02:00:00:00:00:01", .is_fast = true};
+  return bridge;
+}
+
+TEST(TheRows, OfGroupsAreRead) {
+  auto const present = present_rows(with_lag(), kHost);
+  EXPECT_EQ(present.bridges.at(0).row, vs1_with_lag());
+  EXPECT_THAT(told(present, {vs1_with_lag()}), SizeIs(0));
+  EXPECT_THAT(present_rows(with_lag(), "/other.db").elsewhere,
+              testing::IsSupersetOf({std::pair<std::string const, std::string>("u0", "vs1"),
+                                     std::pair<std::string const, std::string>("u1", "vs1")}));
+}
+
+TEST(TheRows, OfAGroupAreOnePortWithItsDevices) {
+  auto const all =
+      operations(present_rows(replica(), kHost), Rows{vs1_with_lag()}, kHost, kOwner, 2);
+  ASSERT_THAT(all, SizeIs(4));
+  EXPECT_EQ(all[0]["row"], Json::parse(R"json({
+    "name": "u0", "ofport_request": 7, "type": "", "ingress_policing_rate": 0,
+    "other_config": ["map", [["lacp-aggregation-key", "1"]]]})json"));
+  EXPECT_EQ(all[1]["row"]["name"], "u1");
+  EXPECT_EQ(all[2]["row"]["name"], "vs1-lag1");
+  EXPECT_EQ(all[2]["row"]["lacp"], simhost::ovsdb::set({"active"}));
+  EXPECT_THAT(all[2]["row"]["other_config"].dump(), HasSubstr(R"(["lacp-time","fast"])"));
+  EXPECT_THAT(all[2]["row"]["interfaces"][1], SizeIs(2));
+}
+
+TEST(TheRows, OfADeviceGoWithItIntoAGroupAndOutOfIt) {
+  auto alone = vs1_with_lag();
+  alone.lags.clear();
+  EXPECT_THAT(told(present_rows(with_lag(), kHost), {alone}),
+              ElementsAre("insert Interface", "insert Port", "insert Interface", "insert Port",
+                          "mutate Bridge"));
+  auto joined = vs1_with_lag();
+  joined.lags["vs1-lag1"].devices.insert("c1");
+  auto const all = operations(present_rows(with_lag(), kHost), Rows{joined}, kHost, kOwner, 2);
+  ASSERT_THAT(all, SizeIs(3));
+  EXPECT_EQ(all[1]["table"], "Port") << "that of the group stays, and so do its partners";
+  EXPECT_THAT(all[2]["mutations"].dump(),
+              HasSubstr(R"(["ports","delete",["set",[["uuid","p1"]]])"));
+}
+
+TEST(TheRows, OfAGroupChangeInPlace) {
+  auto const present = present_rows(with_lag(), kHost);
+  auto slow = vs1_with_lag();
+  slow.lags["vs1-lag1"].is_fast = false;
+  EXPECT_THAT(told(present, {slow}), ElementsAre("update Port"));
+  auto fewer = vs1_with_lag();
+  fewer.devices.erase("u0");
+  auto const all = operations(present, Rows{fewer}, kHost, kOwner, 2);
+  ASSERT_THAT(all, SizeIs(1));
+  EXPECT_EQ(all[0]["mutations"].dump(), R"([["interfaces","delete",["set",[["uuid","i3"]]]]])");
+  auto none = vs1();
+  none.lags = vs1_with_lag().lags;
+  EXPECT_THAT(told(present, {none}), ElementsAre("mutate Bridge"));
+}
+
+TEST(TheRows, OfAGroupThatSomebodyElseChangedAreMadeAsTheyWere) {
+  auto altered = with_lag();
+  altered.apply(Json::parse(R"json({"Port": {"p3": {"modify": {"lacp": "passive"}}}})json"));
+  EXPECT_THAT(told(present_rows(altered, kHost), {vs1_with_lag()}), ElementsAre("update Port"));
+  altered = with_lag();
+  altered.apply(Json::parse(R"json({"Interface": {"i4": {"modify": {
+      "other_config": ["map", [["lacp-aggregation-key", "9"]]]}}}})json"));
+  EXPECT_THAT(told(present_rows(altered, kHost), {vs1_with_lag()}),
+              ElementsAre("insert Interface", "mutate Port"));
+  altered.apply(Json::parse(R"json({"Interface": {"i3": {"modify": {
+      "other_config": ["map", [["lacp-aggregation-key", "9"]]]}}}})json"));
+  EXPECT_THAT(told(present_rows(altered, kHost), {vs1_with_lag()}),
+              ElementsAre("insert Interface", "insert Interface", "mutate Port"));
 }
 
 TEST(TheRows, OfBridgesThatNobodyWantsGoWithAllThatIsTheirs) {

@@ -3,9 +3,11 @@
 
 #include <map>
 #include <string>
+#include <string_view>
 
 #include "planes/openvswitch/ovsdb/json.h"
 #include "planes/openvswitch/ovsdb/replica.h"
+#include "planes/openvswitch/rows/rows.h"
 
 namespace simhost::openvswitch {
 
@@ -24,8 +26,31 @@ inline ovsdb::Row const kBridge{{"fail_mode", ovsdb::set({"secure"})},
                                 {"controller", ovsdb::set({})},
                                 {"mirrors", ovsdb::set({})},
                                 {"other_config", map_of({{"disable-in-band", "true"}})}};
-inline ovsdb::Row const kPort{
-    {"tag", ovsdb::set({})}, {"trunks", ovsdb::set({})}, {"vlan_mode", ovsdb::set({})}};
+inline ovsdb::Row const kPort{{"tag", ovsdb::set({})},
+                              {"trunks", ovsdb::set({})},
+                              {"vlan_mode", ovsdb::set({})},
+                              {"lacp", ovsdb::set({})}};
 inline ovsdb::Row const kInterface{{"type", ""}, {"ingress_policing_rate", 0}};
+
+// Those of a link-aggregation group in place of a port's.
+inline ovsdb::Row lag_columns(LagRow const &lag) {
+  auto columns = kPort;
+  columns["lacp"] = ovsdb::set({"active"});
+  columns["other_config"] =
+      map_of({{"lacp-system-id", lag.system}, {"lacp-time", lag.is_fast ? "fast" : "slow"}});
+  return columns;
+}
+
+// And of its devices.
+inline ovsdb::Row member_columns(LagRow const &lag) {
+  auto columns = kInterface;
+  columns["other_config"] = map_of({{"lacp-aggregation-key", std::to_string(lag.key)}});
+  return columns;
+}
+
+// Whether a port of a bridge is a group: no device has such a name.
+inline bool is_name_of_lag(std::string_view name, std::string_view bridge) {
+  return name.size() > bridge.size() && name.starts_with(bridge) && name[bridge.size()] == '-';
+}
 
 }  // namespace simhost::openvswitch

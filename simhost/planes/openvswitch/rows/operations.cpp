@@ -49,6 +49,42 @@ class Names {
   int next_ = 0;
 };
 
+// The devices of a port, and the numbers that they have.
+using Interfaces = std::map<std::string, std::uint16_t>;
+
+struct PortRow {
+  Interfaces interfaces;
+  LagRow const *lag = nullptr;  // null for a device by itself
+};
+
+// Groups without a device are not there.
+std::map<std::string, PortRow> ports_of(BridgeRow const &bridge) {
+  std::map<std::string, PortRow> ports;
+  auto alone = bridge.devices;
+  for (auto const &[name, lag] : bridge.lags) {
+    for (auto const &device : lag.devices) {
+      if (auto node = alone.extract(device)) {
+        auto &port = ports[name];
+        port.lag = &lag;
+        port.interfaces.insert(std::move(node));
+      }
+    }
+  }
+  for (auto const &[device, number] : alone) {
+    ports.emplace(device, PortRow{.interfaces = {{device, number}}});
+  }
+  return ports;
+}
+
+// Whether a port can stay: what is different between two groups is changed in place, so that the
+// partners of the others are kept.
+bool can_stay(PortRow const &present, PortRow const &wanted) {
+  if (present.lag == nullptr || wanted.lag == nullptr) {
+    return present.lag == wanted.lag && present.interfaces == wanted.interfaces;
+  }
+  return true;
+}
+
 class Writer {
  public:
   explicit Writer(std::string_view host) : host_(host) {}
@@ -56,9 +92,10 @@ class Writer {
   void begin() { told_.push_back(insert("Open_vSwitch", names_.next(), Json::object())); }
 
   void add(BridgeRow const &wanted) {
-    auto const own = added_port(wanted.name, 0);
-    auto ports = added_ports(wanted.devices, {});
-    ports.push_back(ovsdb::named_uuid(own));
+    std::vector<Json> ports{added_port(wanted.name, {.interfaces = {{wanted.name, 0}}})};
+    for (auto const &[name, port] : ports_of(wanted)) {
+      ports.push_back(added_port(name, port));
+    }
     auto const name = names_.next();
     auto row = json_of(kBridge);
     row.update({{"name", wanted.name},
@@ -83,23 +120,7 @@ class Writer {
     if (present.is_altered) {
       told_.push_back(update("Bridge", is(ovsdb::uuid(present.id)), json_of(kBridge)));
     }
-    Json mutations = Json::array();
-    std::vector<Json> gone;
-    for (auto const &[device, number] : present.row.devices) {
-      auto const kept = wanted.devices.find(device);
-      if (kept == wanted.devices.end() || kept->second != number) {
-        gone.push_back(ovsdb::uuid(present.ports.at(device)));
-      }
-    }
-    if (!gone.empty()) {
-      mutations.push_back({"ports", "delete", ovsdb::set(gone)});
-    }
-    if (auto const added = added_ports(wanted.devices, present.row.devices); !added.empty()) {
-      mutations.push_back({"ports", "insert", ovsdb::set(added)});
-    }
-    if (!mutations.empty()) {
-      told_.push_back(mutate("Bridge", is(ovsdb::uuid(present.id)), std::move(mutations)));
-    }
+    change_ports(present, wanted);
     if (wanted.limits != present.row.limits) {
       auto tables = flow_tables(wanted);
       told_.push_back(
@@ -125,33 +146,93 @@ class Writer {
   Json told() && { return std::move(told_); }
 
  private:
-  // The row of a port, with that of its interface; 0 is the bridge's own.
-  std::string added_port(std::string const &device, std::uint16_t number) {
-    auto const interface = names_.next();
-    Json row{{"name", device}};
+  void change_ports(PresentBridge const &present, BridgeRow const &wanted) {
+    auto there = ports_of(present.row);
+    std::vector<Json> added;
+    for (auto const &[name, port] : ports_of(wanted)) {
+      auto const found = there.find(name);
+      if (found != there.end() && can_stay(found->second, port)) {
+        if (port.lag != nullptr) {
+          change_lag(present, name, found->second, port);
+        }
+        there.erase(found);
+      } else {
+        added.push_back(added_port(name, port));
+      }
+    }
+    std::vector<Json> gone;
+    for (auto const &[name, port] : there) {
+      gone.push_back(ovsdb::uuid(present.ports.at(name)));
+    }
+    replace_in("Bridge", present.id, "ports", gone, added);
+  }
+
+  void change_lag(PresentBridge const &present, std::string const &name, PortRow const &there,
+                  PortRow const &wanted) {
+    auto const &id = present.ports.at(name);
+    if (present.altered_lags.contains(name) || there.lag->system != wanted.lag->system ||
+        there.lag->is_fast != wanted.lag->is_fast) {
+      told_.push_back(update("Port", is(ovsdb::uuid(id)), json_of(lag_columns(*wanted.lag))));
+    }
+    bool const has_key = there.lag->key == wanted.lag->key;
+    std::vector<Json> gone;
+    std::vector<Json> added;
+    auto const is_in = [&](auto const &interface, Interfaces const &others) {
+      auto const found = others.find(interface.first);
+      return has_key && found != others.end() && found->second == interface.second;
+    };
+    for (auto const &interface : there.interfaces) {
+      if (!is_in(interface, wanted.interfaces)) {
+        gone.push_back(ovsdb::uuid(present.interfaces.at(interface.first)));
+      }
+    }
+    for (auto const &[device, number] : wanted.interfaces) {
+      if (!is_in(std::pair(device, number), there.interfaces)) {
+        added.push_back(added_interface(device, number, wanted.lag));
+      }
+    }
+    replace_in("Port", id, "interfaces", gone, added);
+  }
+
+  void replace_in(std::string const &table, std::string const &id, std::string const &column,
+                  std::vector<Json> const &gone, std::vector<Json> const &added) {
+    Json mutations = Json::array();
+    if (!gone.empty()) {
+      mutations.push_back({column, "delete", ovsdb::set(gone)});
+    }
+    if (!added.empty()) {
+      mutations.push_back({column, "insert", ovsdb::set(added)});
+    }
+    if (!mutations.empty()) {
+      told_.push_back(mutate(table, is(ovsdb::uuid(id)), std::move(mutations)));
+    }
+  }
+
+  // 0 is the number of the bridge's own.
+  Json added_interface(std::string const &device, std::uint16_t number, LagRow const *lag) {
+    auto row = lag != nullptr ? json_of(member_columns(*lag)) : Json::object();
+    row["name"] = device;
     if (number == 0) {
       row["type"] = "internal";
     } else {
       row["ofport_request"] = number;
     }
-    told_.push_back(insert("Interface", interface, std::move(row)));
-    auto port = names_.next();
-    told_.push_back(
-        insert("Port", port, {{"name", device}, {"interfaces", ovsdb::named_uuid(interface)}}));
-    return port;
+    auto const name = names_.next();
+    told_.push_back(insert("Interface", name, std::move(row)));
+    return ovsdb::named_uuid(name);
   }
 
-  // Those that are not there with their number.
-  std::vector<Json> added_ports(std::map<std::string, std::uint16_t> const &wanted,
-                                std::map<std::string, std::uint16_t> const &present) {
-    std::vector<Json> added;
-    for (auto const &[device, number] : wanted) {
-      auto const found = present.find(device);
-      if (found == present.end() || found->second != number) {
-        added.push_back(ovsdb::named_uuid(added_port(device, number)));
-      }
+  // The row of a port, with those of its interfaces.
+  Json added_port(std::string const &name, PortRow const &port) {
+    std::vector<Json> interfaces;
+    for (auto const &[device, number] : port.interfaces) {
+      interfaces.push_back(added_interface(device, number, port.lag));
     }
-    return added;
+    auto row = port.lag != nullptr ? json_of(lag_columns(*port.lag)) : Json::object();
+    row.update({{"name", name}, {"interfaces", ovsdb::set(interfaces)}});
+    auto const id = names_.next();
+    told_.push_back(insert("Port", id, std::move(row)));
+    return ovsdb::named_uuid(id);
   }
 
   Json flow_tables(BridgeRow const &wanted) {

@@ -40,20 +40,68 @@ struct Tables {
   ovsdb::Rows const &flow_tables;
 };
 
-void add_device(PresentBridge &bridge, std::string const &port_id, Tables const &tables) {
+// No device is wanted with the number 0, so that one that is not as it should be is put anew.
+std::uint16_t number_of(ovsdb::Row const &interface, bool is_ours) {
+  auto const requested = ovsdb::atoms_of(interface.at("ofport_request"));
+  return is_ours && !requested.empty() ? requested.front().get<std::uint16_t>() : 0;
+}
+
+LagRow lag_of(ovsdb::Row const &port) {
+  auto const &config = port.at("other_config");
+  return {.devices = {},
+          .system = text_under(config, "lacp-system-id"),
+          .is_fast = text_under(config, "lacp-time") == "fast"};
+}
+
+std::uint16_t key_of(ovsdb::Row const &interface) {
+  auto const key = text_under(interface.at("other_config"), "lacp-aggregation-key");
+  return key.empty() ? 0 : static_cast<std::uint16_t>(std::stoul(key));
+}
+
+void add_lag(PresentBridge &bridge, std::string const &name, ovsdb::Row const &port,
+             Tables const &tables) {
+  auto &lag = bridge.row.lags[name];
+  lag = lag_of(port);
+  if (!says(port, lag_columns(lag))) {
+    bridge.altered_lags.insert(name);
+  }
+  for (auto const &atom : ovsdb::atoms_of(port.at("interfaces"))) {
+    auto const &interface = tables.interfaces.at(id_in(atom));
+    auto const device = interface.at("name").get<std::string>();
+    if (lag.devices.empty()) {
+      lag.key = key_of(interface);
+    }
+    lag.devices.insert(device);
+    bridge.interfaces.emplace(device, id_in(atom));
+    bridge.row.devices[device] = number_of(interface, says(interface, member_columns(lag)));
+  }
+}
+
+void add_port(PresentBridge &bridge, std::string const &port_id, Tables const &tables) {
   auto const &port = tables.ports.at(port_id);
   auto const name = port.at("name").get<std::string>();
   if (name == bridge.row.name) {
     return;  // the bridge's own
   }
   bridge.ports.emplace(name, port_id);
+  if (is_name_of_lag(name, bridge.row.name)) {
+    add_lag(bridge, name, port, tables);
+    return;
+  }
   auto const interfaces = ovsdb::atoms_of(port.at("interfaces"));
   auto const &interface = tables.interfaces.at(id_in(interfaces.at(0)));
-  auto const requested = ovsdb::atoms_of(interface.at("ofport_request"));
-  bool const is_ours = interfaces.size() == 1 && !requested.empty() && says(port, kPort) &&
-                       says(interface, kInterface);
-  // No device is wanted with that number, so that one that is not as it should be is put anew.
-  bridge.row.devices[name] = is_ours ? requested.front().get<std::uint16_t>() : 0;
+  bool const is_ours = interfaces.size() == 1 && says(port, kPort) && says(interface, kInterface);
+  bridge.row.devices[name] = number_of(interface, is_ours);
+}
+
+std::vector<std::string> devices_at(ovsdb::Row const &bridge, Tables const &tables) {
+  std::vector<std::string> devices;
+  for (auto const &port : ovsdb::atoms_of(bridge.at("ports"))) {
+    for (auto const &interface : ovsdb::atoms_of(tables.ports.at(id_in(port)).at("interfaces"))) {
+      devices.push_back(tables.interfaces.at(id_in(interface)).at("name").get<std::string>());
+    }
+  }
+  return devices;
 }
 
 PresentBridge bridge_of(std::string const &id, ovsdb::Row const &row, Tables const &tables) {
@@ -63,7 +111,7 @@ PresentBridge bridge_of(std::string const &id, ovsdb::Row const &row, Tables con
                        .ports = {},
                        .is_altered = !says(row, kBridge)};
   for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
-    add_device(bridge, id_in(port), tables);
+    add_port(bridge, id_in(port), tables);
   }
   for (auto const &[number, table] : ovsdb::entries_of(row.at("flow_tables"))) {
     for (auto const &limit :
@@ -82,8 +130,8 @@ void select_rows(ovsdb::Selected &selected) {
       {"Bridge",
        {"name", "datapath_type", "ports", "external_ids", "flow_tables", "fail_mode", "protocols",
         "controller", "mirrors", "other_config"}},
-      {"Port", {"name", "interfaces", "tag", "trunks", "vlan_mode"}},
-      {"Interface", {"name", "ofport_request", "type", "ingress_policing_rate"}},
+      {"Port", {"name", "interfaces", "tag", "trunks", "vlan_mode", "lacp", "other_config"}},
+      {"Interface", {"name", "ofport_request", "type", "ingress_policing_rate", "other_config"}},
       {"Flow_Table", {"flow_limit"}}};
   for (auto const &[table, columns] : read) {
     auto &known = selected[table];
@@ -112,8 +160,8 @@ PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host) {
         present.bridges.push_back(bridge_of(id, row, tables));
         present.elsewhere[name] = name;
       } else {
-        for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
-          present.elsewhere[tables.ports.at(id_in(port)).at("name").get<std::string>()] = name;
+        for (auto const &device : devices_at(row, tables)) {
+          present.elsewhere[device] = name;
         }
       }
     }

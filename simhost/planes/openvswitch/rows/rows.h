@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <map>
+#include <set>
 #include <span>
 #include <string>
 #include <string_view>
@@ -16,11 +17,23 @@ namespace simhost::openvswitch {
 
 using ovsdb::Json;
 
+/// Devices that are one link together, by LACP.
+struct LagRow {
+  std::set<std::string> devices;  ///< of the bridge
+  std::string system;             ///< an address: by it, and
+  std::uint16_t key = 1;          ///< by this, not 0, partners know the group
+  bool is_fast = false;           ///< it is told of its partner each second, not each 30 seconds
+
+  bool operator==(LagRow const &) const = default;
+};
+
 struct BridgeRow {
   std::string name;      ///< unique among all bridges
   std::string datapath;  ///< "netdev" or "system"
   /// Devices by their names, and the OpenFlow port that each has.
   std::map<std::string, std::uint16_t> devices = {};
+  /// By the names of their rows, which begin with that of the bridge, and "-".
+  std::map<std::string, LagRow> lags = {};
   /// How many flows each of these tables may have; the switch learns no more.
   std::map<std::uint8_t, std::uint32_t> limits = {};
 
@@ -31,8 +44,10 @@ struct BridgeRow {
 struct PresentBridge {
   std::string id;
   BridgeRow row;
-  std::map<std::string, std::string> ports;  ///< identifiers of the rows, by device
-  bool is_altered = false;                   ///< not as this host makes its bridges
+  std::map<std::string, std::string> ports;  ///< identifiers of the rows, by device or group
+  std::map<std::string, std::string> interfaces = {};  ///< likewise of devices in groups
+  std::set<std::string> altered_lags = {};             ///< by somebody else
+  bool is_altered = false;                             ///< not as this host makes its bridges
 };
 
 /// What of a whole database is this host's, and what all hosts have in common.
