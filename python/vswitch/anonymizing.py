@@ -367,7 +367,8 @@ class _Walk:
 
     def _lag(self, given: Any, path: str) -> Dict[str, Words]:
         names: Dict[str, Reader] = {"name": self._name("lag")}
-        return self._object(given, path, names, uplinks=self._each(self._name("uplink")))
+        uplinks = self._each(self._name("uplink"))
+        return self._object(given, path, names, uplinks=uplinks, rate=_kept)
 
     def _uplink_port(self, given: Any, path: str, place: Place) -> Dict[str, Words]:
         return self._any_port(

@@ -291,7 +291,9 @@ def _uplink(given: object, path: str) -> UplinkWish:
 
 
 def _lag(given: object, path: str) -> LagWish:
-    held = _Object(given, path, ("name", "uplinks"))
+    held = _Object(given, path, ("name", "uplinks", "rate"))
+    # Which no call can read or change.
+    held.get("rate", _words.choice, ("slow", "fast"))
     uplinks = held.need("uplinks", _words.items)
     names = [_name(one, f"{held.where('uplinks')}[{at}]") for at, one in enumerate(uplinks)]
     return LagWish(path, False, held.need("name", _name), tuple(names))

@@ -173,7 +173,8 @@ Json uplink_ports_to_json(Transaction &transaction, storage::SwitchKey key) {
 }
 
 Json lag_to_json(Lag const &lag) {
-  LagMembers members{.name = lag.name, .uplinks = {}};
+  LagMembers members{
+      .name = lag.name, .uplinks = {}, .is_fast = static_cast<std::uint8_t>(lag.is_fast)};
   for (auto const &member : lag.members) {
     members.uplinks.push_back(member.uplink);
   }

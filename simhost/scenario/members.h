@@ -141,7 +141,9 @@ inline constexpr std::array kUplinkPortMembers{
 struct LagMembers {
   std::string name;
   std::vector<std::string> uplinks;
+  std::uint8_t is_fast = 0;
 };
+inline constexpr std::array<Word, 2> kRates{{{"slow", 0}, {"fast", 1}}};
 inline constexpr auto kLagUplink = form::whole_text<std::string>(kUnbounded);
 inline constexpr std::array kLagMembers{
     form::required_member("name", text_member<&LagMembers::name>(VS_LACP_LAG_NAME_LENGTH - 1),
@@ -150,6 +152,8 @@ inline constexpr std::array kLagMembers{
         "uplinks",
         form::list<form::VectorField<&LagMembers::uplinks>>(kLagUplink, VS_MAX_UPLINKS_IN_LAG),
         "uplinks of the switch"),
+    form::sparse("rate", form::choice<&LagMembers::is_fast>(kRates),
+                 "`fast`: the partner is to tell of itself each second, not each 30"),
 };
 
 struct AddressOfEntry {

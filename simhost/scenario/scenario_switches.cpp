@@ -195,7 +195,7 @@ void attach_uplinks(ChangingTransaction &transaction, storage::SwitchKey key, No
 
 void apply_lag(ChangingTransaction &transaction, storage::SwitchKey key, Node const &node) {
   auto const lag = read_object(kLagMembers, node, LagMembers());
-  put_lag(transaction, key, lag.name, lag.uplinks);
+  put_lag(transaction, key, lag.name, lag.uplinks, lag.is_fast != 0);
 }
 
 void apply_session_counters(ChangingTransaction &transaction, storage::SwitchKey key,

@@ -53,4 +53,7 @@ char const *const kRememberedSchema = R"sql(
 // In milliseconds since the beginning of 1970.
 char const *const kSeenSchema = "ALTER TABLE remembered ADD COLUMN seen INTEGER";
 
+// Whether the partner is asked to tell of itself each second, not each 30 seconds.
+char const *const kLacpSchema = "ALTER TABLE lag ADD COLUMN is_fast INTEGER NOT NULL DEFAULT 0";
+
 }  // namespace simhost::storage

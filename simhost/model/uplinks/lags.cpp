@@ -19,7 +19,10 @@ bool Lag::up() const {
 std::vector<Lag> lags_of(storage::Transaction &transaction, storage::SwitchKey key) {
   std::vector<Lag> lags;
   for (auto const &row : storage::all_lags(transaction, key)) {
-    Lag lag{.id = static_cast<std::uint32_t>(row.id), .name = row.name, .members = {}};
+    Lag lag{.id = static_cast<std::uint32_t>(row.id),
+            .name = row.name,
+            .is_fast = row.is_fast,
+            .members = {}};
     for (auto const &uplink : row.uplinks) {
       lag.members.push_back(
           {.uplink = uplink, .up = running_plane().lacp_is_up(transaction, uplink)});
@@ -30,7 +33,7 @@ std::vector<Lag> lags_of(storage::Transaction &transaction, storage::SwitchKey k
 }
 
 void put_lag(storage::ChangingTransaction &transaction, storage::SwitchKey key,
-             std::string_view name, std::vector<std::string> const &uplinks) {
+             std::string_view name, std::vector<std::string> const &uplinks, bool is_fast) {
   if (name.empty()) {
     throw Refused(QEX_BAD_PARAM);
   }
@@ -47,6 +50,7 @@ void put_lag(storage::ChangingTransaction &transaction, storage::SwitchKey key,
     }
     lag = storage::insert_lag(transaction, key, name);
   }
+  storage::set_lag_rate(transaction, *lag, is_fast);
   storage::empty_lag(transaction, *lag);
   for (auto const &uplink : uplinks) {
     get_uplink(transaction, key, uplink);

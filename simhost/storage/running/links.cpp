@@ -49,9 +49,9 @@ void put_link(ChangingTransaction &transaction, std::string_view uplink, Link co
 }
 
 std::vector<LagRow> all_lags(Transaction &transaction, SwitchKey key) {
-  Query select(transaction, "SELECT id, name FROM lag WHERE switch = ? ORDER BY id");
+  Query select(transaction, "SELECT id, name, is_fast FROM lag WHERE switch = ? ORDER BY id");
   auto lags = select.with(key).all([](Query const &row) {
-    return LagRow{.id = lag_id_at(row), .name = row.text(1), .uplinks = {}};
+    return LagRow{.id = lag_id_at(row), .name = row.text(1), .is_fast = row.flag(2)};
   });
   for (auto &lag : lags) {
     lag.uplinks = uplinks_in(transaction, lag.id);
@@ -68,6 +68,10 @@ LagId insert_lag(ChangingTransaction &transaction, SwitchKey key, std::string_vi
   Change insert(transaction, "INSERT INTO lag (switch, name) VALUES (?, ?)");
   insert.with(key).with(name).run();
   return LagId(static_cast<std::uint32_t>(transaction.last_key()));
+}
+
+void set_lag_rate(ChangingTransaction &transaction, LagId lag, bool is_fast) {
+  Change(transaction, "UPDATE lag SET is_fast = ? WHERE id = ?").with(is_fast).with(lag).run();
 }
 
 std::uint32_t count_lags(Transaction &transaction, SwitchKey key) {

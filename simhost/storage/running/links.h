@@ -38,7 +38,8 @@ enum class LagId : std::uint32_t {};
 struct LagRow {
   LagId id;
   std::string name;
-  std::vector<std::string> uplinks;
+  bool is_fast = false;  ///< its partner is to tell of itself each second, not each 30 seconds
+  std::vector<std::string> uplinks = {};
 };
 
 /// The groups of a switch, in the order in which they were made.
@@ -46,6 +47,7 @@ std::vector<LagRow> all_lags(Transaction &transaction, SwitchKey key);
 std::optional<LagId> find_lag(Transaction &transaction, SwitchKey key, std::string_view name);
 /// Makes a group without uplinks. Its name is unique on the switch.
 LagId insert_lag(ChangingTransaction &transaction, SwitchKey key, std::string_view name);
+void set_lag_rate(ChangingTransaction &transaction, LagId lag, bool is_fast);
 /// How many groups the switch has.
 std::uint32_t count_lags(Transaction &transaction, SwitchKey key);
 /// Whether an uplink is in a group.

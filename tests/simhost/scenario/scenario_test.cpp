@@ -210,7 +210,7 @@ constexpr char const *kEverything = R"({
   "switches": [
     {"alias": "s", "id": "the-id", "portset": "the-ports", "max_ports": 10, "persistent": false,
      "version": 100, "mtu": 9000, "uplinks": ["nic0", "nic1"],
-     "lags": [{"name": "lag1", "uplinks": ["nic1"]}],
+     "lags": [{"name": "lag1", "uplinks": ["nic1"], "rate": "fast"}],
      "teaming": {"balance": "explicit", "criteria": ["lacp", "link"], "flags": ["rolling"],
                  "speed": 100, "full_duplex": true, "active": ["lag1"], "standby": ["uplink1"]},
      "mac_learning": {"aging_time": 30, "limit": 20, "learn_static": true},
