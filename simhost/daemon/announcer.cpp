@@ -54,11 +54,11 @@ void Announcer::follow(WantedBridge const &bridge, Memory const &memory) {
     auto const before = known.places.find(carried.number);
     bool const is_elsewhere = before == known.places.end() ||
                               before->second.device != carried.device ||
-                              before->second.uplinks != carried.uplinks;
-    if (has_begun_ && is_elsewhere && carried.is_announced && !carried.uplinks.empty()) {
+                              before->second.links != carried.links;
+    if (has_begun_ && is_elsewhere && carried.is_announced && !carried.links.empty()) {
       announce(bridge.key, known, carried, memory);
     }
-    places[carried.number] = {.device = carried.device, .uplinks = carried.uplinks};
+    places[carried.number] = {.device = carried.device, .links = carried.links};
   }
   known.places = std::move(places);
 }

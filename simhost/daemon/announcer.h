@@ -30,7 +30,7 @@ class Announcer {
   // Where a client was.
   struct Place {
     std::string device;
-    std::vector<openflow::Port> uplinks;
+    std::vector<std::uint32_t> links;
   };
   struct Due {
     openvswitch::Announced announced;

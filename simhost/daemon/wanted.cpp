@@ -40,6 +40,32 @@ void add_devices(storage::Transaction &transaction, std::span<storage::PortDevic
   }
 }
 
+// An address that no device has, the same as long as the bridge is.
+std::string system_of(std::string_view bridge) {
+  auto const hash = fingerprint(bridge);
+  return fmt::format("02:{:02x}:{:02x}:{:02x}:{:02x}:{:02x}", hash >> 32U & 0xffU,
+                     hash >> 24U & 0xffU, hash >> 16U & 0xffU, hash >> 8U & 0xffU, hash & 0xffU);
+}
+
+void add_lags(storage::Transaction &transaction, WantedBridge &bridge) {
+  constexpr std::uint32_t kKeys = 0xffff;  // 1 to that
+  for (auto const &lag : storage::all_lags(transaction, bridge.key)) {
+    auto const id = static_cast<std::uint32_t>(lag.id);
+    openvswitch::LagRow row{.devices = {},
+                            .system = system_of(bridge.row.name),
+                            .key = static_cast<std::uint16_t>((id - 1) % kKeys + 1),
+                            .is_fast = lag.is_fast};
+    for (auto const &uplink : lag.uplinks) {
+      if (auto const device = storage::device_of(transaction, uplink)) {
+        row.devices.insert(device->name);
+      }
+    }
+    if (!row.devices.empty()) {
+      bridge.row.lags.emplace(fmt::format("{}-lag{}", bridge.row.name, id), std::move(row));
+    }
+  }
+}
+
 teaming::Team team_with_devices(storage::Transaction &transaction, storage::SwitchKey key) {
   return teaming::team_of(
       transaction, key, [](storage::Transaction &from, std::string_view uplink) {
@@ -54,19 +80,12 @@ bool notifies(VSTeamPolicy const &policy) {
   return (policy.flags & TEAM_FRP_FLAG_NOTIFY_SWITCH) != 0;
 }
 
-// The uplinks that may carry a frame of a port: where a team looks into frames, any in use.
-std::vector<openflow::Port> uplinks_of(openvswitch::Way const *way) {
-  if (way == nullptr) {
-    return {};
+// The links that may carry a frame of a port: where a team looks into frames, any in use.
+std::vector<std::uint32_t> links_of(openvswitch::Way const *way) {
+  if (way == nullptr || way->spreads_frames()) {
+    return way == nullptr ? std::vector<std::uint32_t>() : way->links;
   }
-  if (!way->spreads_frames()) {
-    return {way->slots.front().front()};
-  }
-  std::vector<openflow::Port> all;
-  for (auto const &slot : way->slots) {
-    all.insert(all.end(), slot.begin(), slot.end());
-  }
-  return all;
+  return {way->links.front()};
 }
 
 void add_carried(storage::Transaction &transaction, openvswitch::Network const &network,
@@ -85,7 +104,7 @@ void add_carried(storage::Transaction &transaction, openvswitch::Network const &
     bridge.carried.push_back(
         {.number = port.number,
          .device = devices[port.number],
-         .uplinks = uplinks_of(openvswitch::sends_frames(port) ? ways.of(port) : nullptr),
+         .links = links_of(openvswitch::sends_frames(port) ? ways.of(port) : nullptr),
          .is_announced = set == own.end() ? notifies(shared) : set->second,
          .client = {.port = port.port,
                     .number = port.number,
@@ -146,6 +165,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                         .flows = {}};
     auto const connected = storage::port_devices(transaction, key);
     add_devices(transaction, connected, bridge);
+    add_lags(transaction, bridge);
     if (!row.associated || bridge.row.devices.empty()) {
       continue;
     }

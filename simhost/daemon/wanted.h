@@ -21,11 +21,11 @@ namespace simhost::daemon {
 
 /// How what a client sends leaves a bridge, as far as others have to be told of it.
 struct Carried {
-  std::uint32_t number;                 ///< of its port of the switch
-  std::string device;                   ///< of the port
-  std::vector<openflow::Port> uplinks;  ///< none: it reaches nobody beyond
-  bool is_announced;                    ///< when that changes
-  openvswitch::Announced client;        ///< with its address if that is known, else zero
+  std::uint32_t number;              ///< of its port of the switch
+  std::string device;                ///< of the port
+  std::vector<std::uint32_t> links;  ///< see Way::links; none: it reaches nobody beyond
+  bool is_announced;                 ///< when that changes
+  openvswitch::Announced client;     ///< with its address if that is known, else zero
 
   [[nodiscard]] bool has_address() const { return client.address != openflow::EthernetAddress{}; }
 };

@@ -308,12 +308,60 @@ TEST(TheWays, OfManyUplinksAllHaveNumbersOfTheirOwn) {
   EXPECT_EQ(numbers.size(), 3001);
 }
 
-TEST(TheWays, SpreadPortsOverTheUplinksOfAGroup) {
+// The two uplinks are a group whose partner has one of them, or both.
+Network with_lag(bool both) {
   auto network = with_uplinks();
+  for (auto &uplink : network.uplinks) {
+    uplink.lag = 1;
+    uplink.has_partner = both || uplink.port == 11;
+  }
+  return network;
+}
+
+TEST(TheWays, OverUplinksOfAGroupAreOneLinkWhileTheyHaveAPartner) {
+  auto const whole = with_lag(true);
+  Ways const ways(whole);
+  auto const &way = *ways.of(whole.ports[0]);
+  EXPECT_THAT(way.links, testing::Each(way.links.front()));
+  for (std::size_t slot = 0; slot < way.slots.size(); ++slot) {
+    EXPECT_TRUE(way.is_at(whole.uplinks[0], slot));
+    EXPECT_TRUE(way.is_at(whole.uplinks[1], slot));
+  }
+}
+
+// The first port begins at the uplink 12, the second at 11.
+TEST(TheWays, LeaveOutUplinksThatOpenVswitchTakesForDead) {
+  auto const half = with_lag(false);
+  Ways const ways(half);
+  EXPECT_THAT(ways.of(half.ports[0])->slots, ElementsAre(Slot{12})) << "is to use it all the same";
+  EXPECT_THAT(ways.of(half.ports[1])->slots, ElementsAre(Slot{11}));
+  EXPECT_FALSE(ways.of(half.ports[1])->is_at(half.uplinks[1], 0));
+}
+
+TEST(TheWays, OfAGroupAreOneForAllPorts) {
+  auto network = with_lag(true);
   network.teams[0] = {.balance = Balance::first, .in_use = {{11, 12}}, .standby = {}};
   Ways const ways(network);
-  EXPECT_THAT(ways.of(network.ports[0])->slots, ElementsAre(Slot{12, 11}));
-  EXPECT_THAT(ways.of(network.ports[1])->slots, ElementsAre(Slot{11, 12}));
+  EXPECT_EQ(ways.of(network.ports[0]), ways.of(network.ports[1]));
+}
+
+// Its hash may say another uplink for the same flow otherwise.
+TEST(TheGroups, ThatSpreadFlowsAreOnePerSetOfUplinks) {
+  auto network = with_lag(true);
+  network.uplinks.push_back({.port = 13, .number = 13, .lag = 1, .has_partner = true});
+  network.teams = {{.balance = Balance::first, .in_use = {{11, 12}}, .standby = {}},
+                   {.balance = Balance::first, .in_use = {{12, 11}}, .standby = {{13}}},
+                   {.balance = Balance::first, .in_use = {{11, 13}}, .standby = {}}};
+  network.ports[1].team = 1;
+  network.ports.push_back(access_port(3, 7));
+  network.ports.back().team = 2;
+  std::vector<std::string> spreading;
+  for (auto const &group : compile(network).groups) {
+    if (group.type == openflow::GroupType::select) {
+      spreading.push_back(std::to_string(group.id & 0xffffffU));
+    }
+  }
+  EXPECT_THAT(spreading, ElementsAre("11", std::to_string(0x10000 | 11)));
 }
 
 std::string actions_of(Compiled const &compiled, std::string const &match) {

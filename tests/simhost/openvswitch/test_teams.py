@@ -33,8 +33,8 @@ class Links(Bench):
             client["share"] = share  # type: ignore[assignment]
         self.load(switch, clients)
 
-    def sent_over(self, port: str, source: str) -> Set[str]:
-        return {name for name, _, _ in self.look(port, Frame(STRANGER, source))}
+    def sent_over(self, port: str, source: str, destination: str = STRANGER) -> Set[str]:
+        return {name for name, _, _ in self.look(port, Frame(destination, source))}
 
     def accepted(self, destination: str) -> Set[str]:
         """The uplinks at which a frame comes in."""
@@ -128,14 +128,33 @@ def test_a_group_is_one_link(links: Links) -> None:
         "teaming": {"balance": "explicit", "active": ["lag"], "standby": ["nic2"]},
         "ports": [{"id": "p1", "vlan": 7}],
     }
-    links.load(switch, [{"port": "p1", "mac": P1, "share": 1}])
-    assert links.sent_over("p1", P1) == {"nic1"}
-    assert links.accepted(BROADCAST) == {"nic0", "nic1"}
+    links.load(switch, [{"port": "p1", "mac": P1}])
+    destinations = [f"02:00:00:00:02:{number:02x}" for number in range(16)]
+    used = {to: links.sent_over("p1", P1, to) for to in destinations}
+    assert set.union(*used.values()) == {"nic0", "nic1"}
+    assert all(len(uplinks) == 1 for uplinks in used.values())
+    assert used == {to: links.sent_over("p1", P1, to) for to in destinations}
+    assert links.accepted(P1) == links.accepted(BROADCAST) == {"nic0", "nic1"}
     links.down("nic1")
     assert links.sent_over("p1", P1) == {"nic0"}
     assert links.accepted(BROADCAST) == {"nic0", "nic1"}
     links.down("nic0")
     assert links.sent_over("p1", P1) == links.accepted(BROADCAST) == {"nic2"}
+
+
+def test_what_a_partner_sends_over_either_uplink_comes_in(links: Links) -> None:
+    """Also where a policy names uplinks of a group by themselves."""
+    switch = {
+        "uplinks": list(UPLINKS),
+        "lags": [{"name": "lag", "uplinks": ["nic0", "nic1"]}],
+        "teaming": {"balance": "explicit", "active": ["nic1"], "standby": ["nic2"]},
+        "ports": [{"id": "p1", "vlan": 7}],
+    }
+    links.load(switch, [{"port": "p1", "mac": P1}])
+    assert links.sent_over("p1", P1) == {"nic1"}
+    assert links.accepted(P1) == links.accepted(BROADCAST) == {"nic0", "nic1"}
+    links.down("nic1")
+    assert links.sent_over("p1", P1) == {"nic2"}
 
 
 def test_a_port_of_another_network_hears_that_one_only(links: Links) -> None:

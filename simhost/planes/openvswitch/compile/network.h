@@ -25,6 +25,12 @@ struct Uplink {
   openflow::Port port = 0;
   std::uint32_t number = 0;  ///< of its port of the switch
   bool blocked = false;
+  std::uint32_t lag = 0;  ///< the link-aggregation group that it is in; 0 for none
+  /// Of that group, so that the network takes it for one link with the others in it.
+  bool has_partner = false;
+
+  /// Open vSwitch takes one that waits for its partner for dead.
+  [[nodiscard]] bool is_watched() const { return lag == 0 || has_partner; }
 
   bool operator==(Uplink const &) const = default;
 };

@@ -219,6 +219,9 @@ inline constexpr std::array kCountingTables{
     table::kLimits,        table::kLookup,  table::kSwitchLimit, table::kMirrors,
     table::kRemoteMirrors, table::kSending, table::kDropped};
 
+/// Groups of a slot, which come before the groups that lead to them: the low bits are the number of
+/// its first uplink and, above, of the slot among those with that one.
+inline constexpr openflow::GroupId kSpreadingGroups = 0x08000000;
 /// Groups of a way: the low bits are its number.
 inline constexpr openflow::GroupId kSendingGroups = 0x10000000;
 inline constexpr openflow::GroupId kReceivingGroups = 0x20000000;

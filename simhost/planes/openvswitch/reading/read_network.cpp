@@ -208,12 +208,29 @@ class Reader {
     for (auto const &[name, number] : storage::uplinks_of(transaction_, key_)) {
       if (auto const port = port_of(name)) {
         auto const owner = storage::PropertyOwner::port(key_, number);
-        network_.uplinks.push_back(
-            {.port = *port,
-             .number = static_cast<std::uint32_t>(number),
-             .blocked = effective(transaction_, ports::blocked, owner) != 0});
+        network_.uplinks.push_back({.port = *port,
+                                    .number = static_cast<std::uint32_t>(number),
+                                    .blocked = effective(transaction_, ports::blocked, owner) != 0,
+                                    .lag = lag_of(name),
+                                    .has_partner = has_partner(name)});
       }
     }
+  }
+
+  // Numbered within the switch.
+  [[nodiscard]] std::uint32_t lag_of(std::string const &uplink) const {
+    for (std::size_t at = 0; at < team_.lags.size(); ++at) {
+      if (std::ranges::find(team_.lags[at].uplinks, uplink) != team_.lags[at].uplinks.end()) {
+        return static_cast<std::uint32_t>(at + 1);
+      }
+    }
+    return 0;
+  }
+
+  [[nodiscard]] bool has_partner(std::string const &uplink) const {
+    return std::ranges::any_of(team_.uplinks, [&](teaming::TeamUplink const &one) {
+      return one.name == uplink && one.aggregated && teaming::would_aggregate(one.link);
+    });
   }
 
   void read_ports() {

@@ -1,8 +1,9 @@
 // What comes from outside: for the ports of those ways whose frames are to come in at that uplink.
 // The network floods a frame to all uplinks of a switch; each way takes the copy of one of them.
-#include <algorithm>
+#include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <set>
 #include <utility>
 
 #include "planes/openvswitch/compile/stages/receiving.h"
@@ -11,10 +12,15 @@
 namespace simhost::openvswitch {
 namespace {
 
-bool uses(Way const &way, openflow::Port uplink) {
-  return std::any_of(way.slots.begin(), way.slots.end(), [&](Slot const &slot) {
-    return std::find(slot.begin(), slot.end(), uplink) != slot.end();
-  });
+// The links of a way that an uplink is, or is a part of.
+std::set<std::uint32_t> links_at(Way const &way, Uplink const &uplink) {
+  std::set<std::uint32_t> links;
+  for (std::size_t slot = 0; slot < way.slots.size(); ++slot) {
+    if (way.is_at(uplink, slot)) {
+      links.insert(way.links[slot]);
+    }
+  }
+  return links;
 }
 
 bool elects(Way const &way) {
@@ -66,12 +72,12 @@ void receive_at(Plan const &plan, Program &program, Uplink const &uplink) {
 // Buckets in the order of those that send, so that an address has the same one in both.
 void elect(Program &program, Way const &way, openflow::Group group) {
   std::uint32_t id = 0;
-  for (auto const &slot : way.slots) {
-    for (auto const uplink : slot) {
+  for (std::size_t slot = 0; slot < way.slots.size(); ++slot) {
+    for (auto const uplink : way.slots[slot]) {
       group.buckets.push_back(
           {.id = id++,
            .watch_port = uplink,
-           .actions = {openflow::set(field::kElected, name_of(slot)), go_to(table::kElection)}});
+           .actions = {openflow::set(field::kElected, way.links[slot]), go_to(table::kElection)}});
     }
   }
   program.add(std::move(group));
@@ -79,18 +85,13 @@ void elect(Program &program, Way const &way, openflow::Group group) {
 
 void compile_election(Plan const &plan, Program &program) {
   for (auto const &uplink : plan.network.uplinks) {
-    std::vector<openflow::Port> names;
+    std::set<std::uint32_t> links;
     for (auto const &way : plan.ways.all()) {
-      for (auto const &slot : way.slots) {
-        bool const has_it = std::find(slot.begin(), slot.end(), uplink.port) != slot.end();
-        if (has_it && std::find(names.begin(), names.end(), name_of(slot)) == names.end()) {
-          names.push_back(name_of(slot));
-        }
-      }
+      links.merge(links_at(way, uplink));
     }
-    for (auto const name : names) {
+    for (auto const link : links) {
       program.add(table::kElection, {.priority = 100,
-                                     .match = from(uplink.port).with(field::kElected, name),
+                                     .match = from(uplink.port).with(field::kElected, link),
                                      .actions = {go_to(table::kDispatch)},
                                      .cookie = cookie(Counted::port, uplink.number)});
     }
@@ -100,7 +101,7 @@ void compile_election(Plan const &plan, Program &program) {
 }  // namespace
 
 Actions receive_by(Way const &way, Uplink const &uplink, bool has_one_receiver) {
-  if (!uses(way, uplink.port)) {
+  if (links_at(way, uplink).empty()) {
     return {};
   }
   Actions actions{openflow::set(field::kWay, way.number)};
