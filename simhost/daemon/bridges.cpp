@@ -11,6 +11,7 @@
 
 #include "daemon/bridge/bridge_rows.h"
 #include "daemon/bridge/changes.h"
+#include "daemon/bridge/live_ports.h"
 #include "daemon/bridge/made_bridge.h"
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/ovsdb/configuration.h"
@@ -86,6 +87,8 @@ struct Bridges::Bridge {
   PortNumbers numbers;
   openvswitch::CountedSessions sessions;
   std::chrono::seconds aging{};
+  LivePorts live;
+  std::set<std::string> aggregated;  // devices that are in groups
   Deadline counted{};
 
   void have(Flows now) {
@@ -175,6 +178,12 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
     auto made = std::make_unique<Bridge>(wanted, socket, deadline);
     made->connection.limit_packet_ins(kMostPacketIns, deadline);
     read_flows(*made, deadline);
+    for (auto const &port : made->connection.ports(deadline)) {
+      made->live.follow(port);
+    }
+    if (!wanted.row.lags.empty()) {
+      told_.lived();
+    }
     made->numbers = wanted.numbers;
     made->sessions = wanted.sessions;
     // What counted while nobody was here, before any of it is changed.
@@ -188,7 +197,8 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
 
 // Once it is told of changes, so that none is missed.
 void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
-  bridge.connection.set_async({.packet_in = true, .group_and_meter_changes = true}, deadline);
+  bridge.connection.set_async(
+      {.packet_in = true, .port_status = true, .group_and_meter_changes = true}, deadline);
   std::vector<openflow::FlowMonitor> monitors;
   for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
     // These are recent for a second, and many.
@@ -220,9 +230,14 @@ void Bridges::read_flows(Bridge &bridge, Deadline deadline) {
 
 void Bridges::follow_events(Bridge &bridge) {
   bool is_altered = false;
+  bool has_lived = false;
   while (auto const event = bridge.connection.next_event()) {
     if (auto const *const packet = std::get_if<openflow::PacketIn>(&*event)) {
       told_.heard(bridge.key, *packet);
+    }
+    if (auto const *const status = std::get_if<openflow::PortStatus>(&*event)) {
+      bool const is_another = bridge.live.follow(*status);
+      has_lived = has_lived || (is_another && bridge.aggregated.contains(status->port.name));
     }
     auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
     if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
@@ -232,6 +247,9 @@ void Bridges::follow_events(Bridge &bridge) {
     } else if (std::holds_alternative<openflow::GroupsOrMetersChanged>(*event)) {
       is_altered = true;
     }
+  }
+  if (has_lived) {
+    told_.lived();
   }
   if (is_altered) {
     note_origin(bridge, Origin::foreign);
@@ -388,7 +406,13 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   bridge.numbers = wanted.numbers;
   bridge.sessions = wanted.sessions;
   bridge.aging = wanted.aging;
+  bridge.aggregated = aggregated_devices(wanted.row);
   return size_of(difference);
+}
+
+std::optional<bool> Bridges::is_live(storage::SwitchKey key, openflow::Port port) const {
+  auto const found = bridges_.find(key);
+  return found == bridges_.end() ? std::nullopt : std::optional(found->second->live.contains(port));
 }
 
 bool Bridges::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) {

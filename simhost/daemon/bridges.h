@@ -45,6 +45,8 @@ class Bridges {
     std::function<void(std::string const &)> altered;
     /// A bridge has learned what its flows do not teach, or not any more.
     std::function<void()> strayed;
+    /// Devices in groups are live, or are not any more; see is_live().
+    std::function<void()> lived;
     /// A flow of a bridge sent up a frame.
     std::function<void(storage::SwitchKey, openflow::PacketIn const &)> heard;
     /// A connection ended.
@@ -61,6 +63,9 @@ class Bridges {
 
   /// The bridge of somebody else that has a device.
   std::optional<std::string> elsewhere(std::string const &device);
+  /// Whether frames may go out at a port of the bridge of a switch: it has a link and, in a group,
+  /// a partner. Nothing while there is no bridge of it.
+  [[nodiscard]] std::optional<bool> is_live(storage::SwitchKey key, openflow::Port port) const;
   /// Makes everything as it is wanted, and returns when it is in force. Returns how many flows and
   /// groups it changed, markers not counted.
   std::size_t apply(Wanted const &wanted);

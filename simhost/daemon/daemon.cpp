@@ -185,6 +185,7 @@ void Daemon::connect() {
                   mend_soon();
                 },
             .strayed = [this] { mend_soon(); },
+            .lived = [this] { sync_soon(); },
             .heard = [this](auto key, auto const &packet) { members_.receive(key, packet); },
             .disturbed = [this] { connect_later(); }});
     sync();
@@ -271,6 +272,9 @@ void Daemon::sync_after(std::optional<ClockTime> const &wait) {
 
 void Daemon::follow_devices() {
   bool differ = false;
+  auto const is_live = [this](storage::SwitchKey key, openflow::Port port) {
+    return bridges_ ? bridges_->is_live(key, port) : std::nullopt;
+  };
   devices_.refresh();
   {
     storage::ReadingTransaction transaction(store_);
@@ -278,11 +282,11 @@ void Daemon::follow_devices() {
     switch_devices(transaction, devices_, say);
     raise_packet_sizes(packet_sizes(transaction), devices_, say);
     devices_.refresh();
-    differ = links_differ(transaction, devices_);
+    differ = links_differ(transaction, devices_, is_live);
   }
   if (differ) {
     storage::ChangingTransaction transaction(store_);
-    put_links(transaction, devices_);
+    put_links(transaction, devices_, is_live);
     storage::advance_frames_change(transaction);
     transaction.commit();
   }

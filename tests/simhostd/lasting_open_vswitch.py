@@ -1,28 +1,32 @@
-"""An Open vSwitch that no daemon starts, in a lab's run folder: it is there before a daemon comes,
-and stays when that goes."""
+"""An Open vSwitch that no daemon starts: it is there before a daemon comes, and stays when that
+goes."""
 
 import os
 import subprocess
+from pathlib import Path
 from typing import List
 
-from frame_lab import Lab
+from simhost._namespaces import Namespace
 
 
 class LastingOpenVSwitch:
-    """Its two processes. One whose clock may stand ages what it learned when it is told to."""
+    """Its two processes, which a namespace has, with their files in a folder that they make.
 
-    def __init__(self, lab: Lab, clock_may_stand: bool = False) -> None:
-        self._lab = lab
+    One whose clock may stand ages what it learned when it is told to."""
+
+    def __init__(self, namespace: Namespace, folder: Path, clock_may_stand: bool = False) -> None:
+        self._namespace = namespace
+        self._folder = folder
         self._options = ["--enable-dummy"] if clock_may_stand else []
         self._processes: List["subprocess.Popen[str]"] = []
 
     @property
     def where(self) -> str:
         """What a daemon is told of it."""
-        return f"unix:{self._lab.run_folder()}/db.sock"
+        return f"unix:{self._folder}/db.sock"
 
     def __enter__(self) -> "LastingOpenVSwitch":
-        folder = self._lab.run_folder()
+        folder = self._folder
         folder.mkdir()
         database, schema = f"{folder}/conf.db", "/usr/share/openvswitch/vswitch.ovsschema"
         subprocess.run(["ovsdb-tool", "create", database, schema], check=True)
@@ -43,15 +47,15 @@ class LastingOpenVSwitch:
         self._ask("revalidator/wait")
 
     def _ask(self, *words: str) -> None:
-        control = f"{self._lab.run_folder()}/ovs-vswitchd.ctl"
-        self._lab.host.run("ovs-appctl", "-t", control, *words)
+        control = f"{self._folder}/ovs-vswitchd.ctl"
+        self._namespace.run("ovs-appctl", "-t", control, *words)
 
     def _start(self, program: str, *words: str) -> None:
-        folder = str(self._lab.run_folder())
+        folder = str(self._folder)
         options = [f"--unixctl={folder}/{program}.ctl", f"--log-file={folder}/{program}.log"]
         environment = {**os.environ, "OVS_RUNDIR": folder}
         self._processes.append(
-            self._lab.host.start(
+            self._namespace.start(
                 program, "-vconsole:off", "-vsyslog:off", *words, *options, env=environment
             )
         )

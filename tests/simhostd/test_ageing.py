@@ -24,7 +24,7 @@ LearnersAndSpectator = Tuple[Client, Client, Client]
 
 @pytest.fixture
 def clock(idle: Lab) -> Iterator[LastingOpenVSwitch]:
-    with LastingOpenVSwitch(idle, clock_may_stand=True) as open_vswitch:
+    with LastingOpenVSwitch(idle.host, idle.run_folder(), clock_may_stand=True) as open_vswitch:
         idle.start(open_vswitch.where)
         yield open_vswitch
 

@@ -139,7 +139,7 @@ def test_counters_of_a_restarted_host_begin_anew(lab: Lab) -> None:
 
 
 def test_what_an_open_vswitch_that_stays_counts_without_a_daemon_is_counted(idle: Lab) -> None:
-    with LastingOpenVSwitch(idle) as lasting:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as lasting:
         idle.start(lasting.where)
         one = idle.client("lab", "a")
         send(one, 3, BROADCAST)

@@ -158,7 +158,7 @@ def test_rows_are_put_right(meddler: Meddler, change: List[str]) -> None:
 
 @pytest.fixture
 def lasting(idle: Lab) -> Iterator[LastingOpenVSwitch]:
-    with LastingOpenVSwitch(idle) as open_vswitch:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         yield open_vswitch
 
 

@@ -112,7 +112,7 @@ def test_a_killed_daemon_leaves_nothing_running_and_another_takes_over(lab: Lab)
 
 
 def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> None:
-    with LastingOpenVSwitch(idle) as open_vswitch:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
         assert one.reaches(other, attempts=5)
@@ -143,7 +143,7 @@ def kept(before: Dict[str, int], after: Dict[str, int]) -> None:
 
 
 def test_a_second_daemon_says_who_is_there(idle: Lab) -> None:
-    with LastingOpenVSwitch(idle) as open_vswitch:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
         assert idle.daemon is not None
         second = idle.simhostd(open_vswitch.where, stderr=subprocess.PIPE)

@@ -192,7 +192,7 @@ def test_a_restart_of_the_host_leaves_what_is_persistent(lab: Lab) -> None:
 @pytest.mark.parametrize("is_there", [True, False])
 def test_a_restart_of_the_host_forgets_what_was_learned(idle: Lab, is_there: bool) -> None:
     idle.set_port("lab", "a", mac_learning={"learning": True, "flooding": True})
-    with LastingOpenVSwitch(idle) as open_vswitch:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
         assert one.reaches(other, attempts=5)

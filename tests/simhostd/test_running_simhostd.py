@@ -54,7 +54,7 @@ def test_it_ends_in_order(idle: Lab, number: int) -> None:
 
 
 def test_the_open_vswitch_of_the_machine(idle: Lab) -> None:
-    with LastingOpenVSwitch(idle):
+    with LastingOpenVSwitch(idle.host, idle.run_folder()):
         # The daemon sees this one where the machine's own is.
         mount = (
             "mount -t tmpfs none /run && mkdir -p /run/openvswitch &&"
@@ -75,7 +75,7 @@ def test_the_open_vswitch_of_the_machine(idle: Lab) -> None:
 
 
 def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
-    with LastingOpenVSwitch(idle) as open_vswitch:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
         assert idle.daemon is not None
         (tmp_path / "second").mkdir()

@@ -299,7 +299,7 @@ def documents() -> st.SearchStrategy[Document]:
 # Clones
 
 # What no call tells; of mirror sessions they tell what those have counted that run.
-_UNTOLD = {"persistent", "external_id", "mirror_counters", "observed"}
+_UNTOLD = {"persistent", "external_id", "rate", "mirror_counters", "observed"}
 
 
 def told(value: Any) -> Any:

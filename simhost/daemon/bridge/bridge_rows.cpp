@@ -51,4 +51,12 @@ std::set<std::string> added_devices(PresentRows const &present,
   return added;
 }
 
+std::set<std::string> aggregated_devices(BridgeRow const &row) {
+  std::set<std::string> devices;
+  for (auto const &[name, lag] : row.lags) {
+    devices.insert(lag.devices.begin(), lag.devices.end());
+  }
+  return devices;
+}
+
 }  // namespace simhost::daemon

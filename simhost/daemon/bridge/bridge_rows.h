@@ -21,4 +21,7 @@ std::vector<openvswitch::BridgeRow> rows_before_flows(std::vector<openvswitch::B
 std::set<std::string> added_devices(openvswitch::PresentRows const &present,
                                     std::vector<openvswitch::BridgeRow> const &wanted);
 
+/// Devices of a bridge that are in groups.
+std::set<std::string> aggregated_devices(openvswitch::BridgeRow const &row);
+
 }  // namespace simhost::daemon

@@ -30,7 +30,15 @@ Link link_by_device(Link link, std::string const &device, NetworkDevices const &
 
 bool is_same(Link const &one, Link const &other) {
   return one.carrier == other.carrier && one.driver == other.driver && one.speed == other.speed &&
-         one.full_duplex == other.full_duplex;
+         one.full_duplex == other.full_duplex && one.partner == other.partner;
+}
+
+// Nothing for an uplink in no group, or while nobody knows.
+std::optional<bool> find_partner(storage::Transaction &transaction, storage::Uplink const &uplink,
+                                 openflow::Port device, IsLive const &is_live) {
+  auto const port = uplink.port ? storage::find_port(transaction, *uplink.port) : std::nullopt;
+  return port && storage::is_in_lag(transaction, uplink.name) ? is_live(port->switch_key, device)
+                                                              : std::nullopt;
 }
 
 struct Changed {
@@ -38,13 +46,15 @@ struct Changed {
   Link link;
 };
 
-std::vector<Changed> changed_links(storage::Transaction &transaction,
-                                   NetworkDevices const &devices) {
+std::vector<Changed> changed_links(storage::Transaction &transaction, NetworkDevices const &devices,
+                                   IsLive const &is_live) {
   std::vector<Changed> changed;
   for (auto const &uplink : storage::all_uplinks(transaction)) {
     if (auto const device = storage::device_of(transaction, uplink.name)) {
       auto const known = storage::find_link(transaction, uplink.name).value_or(Link{});
-      auto const link = link_by_device(known, device->name, devices);
+      auto link = link_by_device(known, device->name, devices);
+      link.partner =
+          find_partner(transaction, uplink, device->number, is_live).value_or(known.partner);
       if (!is_same(link, known)) {
         changed.push_back({.uplink = uplink.name, .link = link});
       }
@@ -85,12 +95,14 @@ void switch_devices(storage::Transaction &transaction, NetworkDevices const &dev
   }
 }
 
-bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices) {
-  return !changed_links(transaction, devices).empty();
+bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices,
+                  IsLive const &is_live) {
+  return !changed_links(transaction, devices, is_live).empty();
 }
 
-void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices) {
-  for (auto const &[uplink, link] : changed_links(transaction, devices)) {
+void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices,
+               IsLive const &is_live) {
+  for (auto const &[uplink, link] : changed_links(transaction, devices, is_live)) {
     teaming::set_link(transaction, uplink, link);
   }
 }

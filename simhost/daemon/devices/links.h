@@ -3,10 +3,13 @@
 #pragma once
 
 #include <functional>
+#include <optional>
 #include <string>
 
 #include "daemon/devices/network_devices.h"
+#include "planes/openvswitch/openflow/port.h"
 #include "storage/store.h"
+#include "storage/switches.h"
 
 namespace simhost::daemon {
 
@@ -14,9 +17,15 @@ namespace simhost::daemon {
 /// switched is told.
 void switch_devices(storage::Transaction &transaction, NetworkDevices const &devices,
                     std::function<void(std::string const &)> const &say);
+/// Whether frames may go out at a port of the bridge of a switch: in a group, whether it has a
+/// partner. Nothing while nobody knows.
+using IsLive = std::function<std::optional<bool>(storage::SwitchKey key, openflow::Port port)>;
+
 /// Whether a link in the state is not as its device is.
-bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices);
+bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices,
+                  IsLive const &is_live);
 /// Puts them right, and lets the teams follow.
-void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices);
+void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices,
+               IsLive const &is_live);
 
 }  // namespace simhost::daemon
