@@ -60,21 +60,34 @@ class Databases:
         process.communicate(timeout=PATIENCE)
         Path(self._socket(server)).unlink()
 
+    def running(self) -> List[int]:
+        return sorted(self._running)
+
+    def pause(self) -> None:
+        """They go on listening."""
+        for process in self._running.values():
+            process.send_signal(signal.SIGSTOP)
+
+    def resume(self) -> None:
+        for process in self._running.values():
+            process.send_signal(signal.SIGCONT)
+
     def leader(self) -> int:
         """The one that says so."""
         found: List[int] = []
 
         def find() -> bool:
-            found[:] = [one for one in self._running if self._leads(one)]
+            found[:] = [one for one in self._running if self.tells("leader", one)]
             return len(found) == 1
 
         assert comes_true(find)
         return found[0]
 
-    def _leads(self, server: int) -> bool:
+    def tells(self, column: str, server: int) -> bool:
+        """What a server says of itself."""
         select = {"op": "select", "table": "Database", "where": [["name", "==", "fabric"]]}
         rows = self._transact("_Server", server, select)[0]["rows"]
-        return bool(rows[0]["leader"])
+        return bool(rows[0][column])
 
     def transact(self, *operations: Mapping[str, Any]) -> Any:
         """Through any of the servers."""
@@ -207,6 +220,13 @@ class FabricLab:
         """The wire between a host and the databases."""
         state = "up" if up else "down"
         self.hub.run("ip", "link", "set", f"h{self.hosts.index(host) + 1}", state)
+
+
+def started(host: Host) -> Host:
+    """With a daemon that is a member of the fabric."""
+    host.start()
+    assert comes_true(lambda: "in the fabric at" in host.ctl("fabric")), host.log()
+    return host
 
 
 def restored(host: Host, name: str) -> None:

@@ -11,7 +11,7 @@ from typing import Any, Dict, Iterator, Tuple
 import pytest
 from _libvswitch import QEX_BUSY, QEX_OK
 
-from fabric_lab import SCHEMA, FabricLab, Host, kept, killed, restored
+from fabric_lab import SCHEMA, FabricLab, Host, kept, killed, restored, started
 from frame_lab import comes_true
 
 LAB: Dict[str, Any] = {
@@ -37,16 +37,6 @@ LAB: Dict[str, Any] = {
     ],
 }
 OTHER: Dict[str, Any] = {"uplinks": [{"name": "nic0"}], "switches": [{"alias": "mine"}]}
-
-
-def belongs(host: Host) -> bool:
-    return "in the fabric at" in host.ctl("fabric")
-
-
-def started(host: Host) -> Host:
-    host.start()
-    assert comes_true(lambda: belongs(host)), host.log()
-    return host
 
 
 @pytest.fixture

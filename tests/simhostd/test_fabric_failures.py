@@ -1,0 +1,84 @@
+"""Databases of a fabric that fail: no change that was made is lost, and none that was
+refused appears."""
+
+import subprocess
+import sys
+from pathlib import Path
+from typing import Any, Iterator, Tuple
+
+import pytest
+from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
+
+from fabric_lab import FabricLab, Host, started
+from frame_lab import comes_true
+
+LAB = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
+
+
+@pytest.fixture
+def lab(tmp_path: Path) -> Iterator[FabricLab]:
+    with FabricLab(tmp_path, servers=3) as lab:
+        yield lab
+
+
+@pytest.fixture
+def two(lab: FabricLab) -> Tuple[Host, Host]:
+    one, other = started(lab.host("one", LAB)), started(lab.host("two"))
+    one.ctl("share", "lab")
+    other.ctl("join", "lab")
+    return one, other
+
+
+def are_reported(lab: FabricLab) -> bool:
+    """Whether all hosts have told that the last change is in force."""
+    (fabric,) = lab.databases.rows("Fabric")
+    return all(row["in_force"] == fabric["revision"] for row in lab.databases.rows("Host"))
+
+
+def calling(host: Host, mtu: int) -> "subprocess.Popen[str]":
+    """A call in a process of its own, which prints its status."""
+    program = f"import _libvswitch as vs; print(vs.VSDVS_SetMTU('lab', {mtu}))"
+    words = [sys.executable, "-c", program]
+    return subprocess.Popen(words, env=host.environment, stdout=subprocess.PIPE, text=True)
+
+
+def mtu(host: Host) -> Any:
+    return host.setting("lab", "mtu")
+
+
+def test_a_majority_decides(lab: FabricLab, two: Tuple[Host, Host]) -> None:
+    one, other = two
+    lab.databases.kill(lab.databases.leader())
+    assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
+    assert comes_true(lambda: mtu(other) == 1600)
+    (last, alone) = lab.databases.running()
+    lab.databases.kill(last)
+    # It takes the other one a moment to see it.
+    assert comes_true(lambda: not lab.databases.tells("connected", alone))
+    assert other.call("VSDVS_SetMTU", "lab", 1700) == QEX_BUSY
+    assert other.call("VSDVS_CreateVSwitch", "own", "", "", 0, 1, 0, 1700, 0) == QEX_OK
+    assert mtu(other) == 1600
+    lab.databases.start(last)
+    assert comes_true(lambda: other.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK)
+    assert comes_true(lambda: mtu(one) == 1800)
+    assert lab.databases.settings("Switch")["mtu"] == 1800
+
+
+def test_nobody_knows_and_then_it_is_decided(lab: FabricLab, two: Tuple[Host, Host]) -> None:
+    one, other = two
+    # Servers that hear of it, and say nothing.
+    assert comes_true(lambda: are_reported(lab))
+    lab.databases.pause()
+    calls = [calling(one, 1600), calling(other, 1700)]
+    for call in calls:
+        assert call.communicate(timeout=30)[0] == f"{QEX_TIMEOUT}\n"
+    assert mtu(one) == mtu(other) == 1500
+    lab.databases.resume()
+    for host in two:
+        assert comes_true(lambda: "of which nobody knew was" in host.log()), host.log()
+    made = {host.name for host in two if "nobody knew was made" in host.log()}
+    assert len(made) <= 1
+    wanted = {"one": 1600, "two": 1700}[made.pop()] if made else 1500
+    assert comes_true(lambda: mtu(one) == mtu(other) == wanted), (mtu(one), mtu(other), wanted)
+    assert one.call("VSDVS_SetMTU", "lab", 1900) == QEX_OK
+    assert comes_true(lambda: mtu(other) == 1900)
