@@ -2,7 +2,18 @@
 
 import re
 from pathlib import Path
-from typing import Any, Callable, Counter as Counts, Dict, List, Mapping, Optional, Sequence
+from typing import (
+    Any,
+    Callable,
+    Collection,
+    Counter as Counts,
+    Dict,
+    List,
+    Mapping,
+    Optional,
+    Sequence,
+    Set,
+)
 
 from compiler import Compiler
 from frames import Copy, Frame, copies
@@ -25,6 +36,7 @@ class Bench:
         self.set_link = open_vswitch.set_link
         self.devices: Dict[str, int] = {}
         self.more_flows: List[str] = []
+        self._without_link: Set[int] = set()
         self._open_vswitch = open_vswitch
         self._compiler = compiler
         self._bridge = bridge
@@ -37,14 +49,23 @@ class Bench:
         switch: Mapping[str, Any],
         clients: Sequence[Mapping[str, Any]],
         change: Callable[[str], Optional[str]] = str,
+        down: Collection[str] = (),
     ) -> Rules:
-        """Makes the bridge that switch, with each flow changed or left out first; its rules."""
-        made = self._compiler.compile(switch, clients)
+        """Makes the bridge that switch, with each flow changed or left out first and these uplinks
+        without a link; its rules."""
+        made = self._compiler.compile(switch, clients, down=down)
         changed = (change(flow) for flow in made["flows"])
         flows = [flow for flow in changed if flow is not None]
         self._open_vswitch.load(self._bridge, [*flows, *self.more_flows], made["groups"])
         self.devices = made["devices"]
-        return Rules(switch, made["numbers"], clients)
+        self._cut({self.devices[uplink] for uplink in down})
+        return Rules(switch, made["numbers"], clients, down)
+
+    def _cut(self, devices: Set[int]) -> None:
+        """Those and no others have no link."""
+        for number in self._without_link ^ devices:
+            self.set_link(self._bridge, number, is_up=number not in devices)
+        self._without_link = devices
 
     def send(self, at: str, frame: Frame) -> "Counts[Copy]":
         """What comes out where of a frame that comes in there, which the switch remembers."""

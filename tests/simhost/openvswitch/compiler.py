@@ -4,7 +4,7 @@ import json
 import os
 import subprocess
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, Optional, Sequence
+from typing import Any, Collection, Dict, List, Mapping, Optional, Sequence
 
 COMPILER = Path(os.environ["BUILD_DIR"], "tests", "simhost", "compile_switches")
 
@@ -49,8 +49,13 @@ class Compiler:
         switch: Mapping[str, Any],
         clients: Sequence[Mapping[str, Any]],
         multicast: Optional[Mapping[str, Any]] = None,
+        down: Collection[str] = (),
     ) -> Dict[str, Any]:
-        """Likewise of one that it compiles."""
-        answer = self.answer(switch, clients, multicast=multicast)
+        """Likewise of one that it compiles, some of whose uplinks have no link."""
+        uplinks = [
+            {"name": uplink, "link": "down" if uplink in down else "up"}
+            for uplink in switch.get("uplinks", [])
+        ]
+        answer = self.answer(switch, clients, {"uplinks": uplinks}, multicast)
         assert "flows" in answer, answer
         return answer

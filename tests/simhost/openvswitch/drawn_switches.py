@@ -145,6 +145,10 @@ def switches(draw: Any) -> Any:
         "uplinks": uplinks,
         "ports": [draw(ports(name, private, uplinks)) for name in PORTS],
     }
+    # In their order, which is that of a team that names none.
+    said["uplink_ports"] = [
+        {"id": f"at-{uplink}", "uplink": uplink, "blocked": draw(RARELY)} for uplink in uplinks
+    ]
     if private:
         said["private_vlans"] = PRIVATE
     fixed = draw(fixed_addresses())
@@ -156,6 +160,14 @@ def switches(draw: Any) -> Any:
     if uplinks and draw(st.booleans()):
         said["teaming"] = draw(teamings(uplinks))
     return said
+
+
+@st.composite
+def switches_with_links(draw: Any) -> Any:
+    """Likewise, and the uplinks that have no link."""
+    switch = draw(switches())
+    cut = draw(RARELY) or draw(RARELY)
+    return switch, [uplink for uplink in switch["uplinks"] if cut and draw(st.booleans())]
 
 
 @st.composite

@@ -23,7 +23,7 @@ from hypothesis import given, seed  # noqa: E402
 from hypothesis import strategies as st  # noqa: E402
 
 from compiler import Compiler  # noqa: E402
-from drawn_switches import CLIENTS, PLACES, frame_of_bytes, switches  # noqa: E402
+from drawn_switches import CLIENTS, PLACES, frame_of_bytes, switches_with_links  # noqa: E402
 from frames import Frame  # noqa: E402
 from open_vswitch import OpenVSwitch  # noqa: E402
 from rules import Rules  # noqa: E402
@@ -75,12 +75,13 @@ def run(
 
     @seed(number)
     @seeds.options(examples, shrink)
-    @given(switch=switches(), clients=CLIENTS, chance=st.integers(0, 2**32))
-    def each(switch: Any, clients: Any, chance: int) -> None:
-        rules = wires.load(switch, clients, change)
+    @given(drawn=switches_with_links(), clients=CLIENTS, chance=st.integers(0, 2**32))
+    def each(drawn: Any, clients: Any, chance: int) -> None:
+        switch, down = drawn
+        rules = wires.load(switch, clients, change, down)
         frames = random.Random(chance)
         for at, data in (frame_of_bytes(frames) for _ in range(OF_A_SWITCH)):
-            if at in wires.devices:
+            if at in wires.devices and at not in down:
                 wires.forget()
                 found, wanted = wires.transmit(at, data), may_come_out(rules, at, data)
                 assert found in wanted, disagreement(at, data, found, wanted)

@@ -1,12 +1,13 @@
 """The rules of frames by themselves, written from what the settings mean and not from how a switch
 is told of them: where a frame must come out, and with which tags. Of a switch that has learned
-nothing, all of whose links are up."""
+nothing, and that was told of its links."""
 
 from collections import Counter
 from dataclasses import dataclass
 from itertools import chain, combinations
 from typing import (
     Any,
+    Collection,
     Counter as Counts,
     Dict,
     Iterable,
@@ -62,8 +63,13 @@ class Rules:
         switch: Mapping[str, Any],
         numbers: Mapping[str, int],
         clients: Sequence[Mapping[str, Any]],
+        down: Collection[str] = (),
     ) -> None:
         self.switch = switch
+        self.down = down
+        self.blocked = [
+            port["uplink"] for port in switch.get("uplink_ports", []) if port.get("blocked")
+        ]
         self.numbers = numbers
         self.uplinks: List[str] = list(switch.get("uplinks", []))
         self.ports: Dict[str, Mapping[str, Any]] = {
@@ -232,8 +238,8 @@ class Rules:
         """Where a port's frames may go: one of them, the first if the balance has it so."""
         teaming = self.ports[port].get("teaming", self.switch.get("teaming", {}))
         named = teaming.get("active", []) + teaming.get("standby", [])
-        usable = named or self.uplinks
-        used = usable[: len(teaming.get("active", [])) or (1 if named else len(usable))]
+        count = len(teaming.get("active", [])) or (1 if named else len(self.uplinks))
+        used = [uplink for uplink in named or self.uplinks if uplink not in self.down][:count]
         balance = self._balance(port)
         if balance in ("mac", "ip") or not used:
             return used
@@ -356,7 +362,11 @@ class Rules:
             if remote:
                 tags = ((remote, 0), *tags)
             # The switch sends nothing to where it came from.
-            reached = "uplink" in to or (place in self.connected and not self._is_cut_off(place))
+            reached = (
+                place not in self.blocked
+                if "uplink" in to
+                else place in self.connected and not self._is_cut_off(place)
+            )
             if reached and place != at:
                 out[(place, tags, inside.cut(most, tags))] += 1
         return out
@@ -400,6 +410,8 @@ class Rules:
     def comes_out(self, at: str, frame: Frame) -> List[Counts[Copy]]:
         """What comes out of a frame: one of these, for the uplink that carries it may be one of
         several."""
+        if at in self.blocked:
+            return [Counter()]
         from_uplink = at in self.uplinks
         copies = self._copies_of_others(at, frame) if from_uplink else None
         if copies is not None:
@@ -424,12 +436,13 @@ class Rules:
         uplinks = self.uplinks_of(at)
         if not uplinks or (place not in (None, BEYOND) and not by_wire_only):
             return [out]
-        return [
-            out
-            + Counter({(uplink, self.wire(inside), None): 1})
-            + self._mirrored("sent_by", {"uplink": uplink}, inside, at)
-            for uplink in uplinks
-        ]
+        return [out + self._over(uplink, inside, at) for uplink in uplinks]
+
+    def _over(self, uplink: str, inside: Inside, at: str) -> Counts[Copy]:
+        if uplink in self.blocked:
+            return Counter()
+        sent: Counts[Copy] = Counter({(uplink, self.wire(inside), None): 1})
+        return sent + self._mirrored("sent_by", {"uplink": uplink}, inside, at)
 
     def _to_ports(
         self,

@@ -9,7 +9,16 @@ from hypothesis import strategies as st
 
 from bench import Bench
 from compiler import Compiler
-from drawn_switches import BROADCAST, CLIENTS, MACS, PORTS, UPLINKS, frames, switches
+from drawn_switches import (
+    BROADCAST,
+    CLIENTS,
+    MACS,
+    PORTS,
+    STRANGER,
+    UPLINKS,
+    frames,
+    switches_with_links,
+)
 from frames import Frame
 from open_vswitch import OpenVSwitch
 from rules import Rules
@@ -29,21 +38,52 @@ def arrives(bench: Bench, rules: Rules, at: str, frame: Frame) -> None:
 
 @options(40, derandomize=True)
 @given(
-    switch=switches(),
+    drawn=switches_with_links(),
     clients=CLIENTS,
     sent=st.lists(frames(), min_size=1, max_size=30),
 )
 def test_frames_come_out_where_the_rules_say(
-    bench: Bench, switch: Any, clients: Any, sent: List[Tuple[str, Frame]]
+    bench: Bench, drawn: Any, clients: Any, sent: List[Tuple[str, Frame]]
 ) -> None:
-    rules = bench.load(switch, clients)
+    switch, down = drawn
+    rules = bench.load(switch, clients, down=down)
     for at, frame in sent:
-        if at in bench.devices:
+        if at in bench.devices and at not in down:
             arrives(bench, rules, at, frame)
 
 
 def of_vlans(*vlans: Any) -> Dict[str, Any]:
     return {"ports": [{"id": port, "vlan": vlan} for port, vlan in zip(PORTS, vlans)]}
+
+
+def at_two_uplinks(**of_both: Any) -> Dict[str, Any]:
+    uplinks = ["nic0", "nic1"]
+    return {
+        "uplinks": uplinks,
+        "uplink_ports": [{"id": uplink, "uplink": uplink, **of_both} for uplink in uplinks],
+        "teaming": {"balance": "explicit", "active": ["nic0"], "standby": ["nic1"]},
+        "ports": [{"id": "p1"}],
+    }
+
+
+def test_another_link_would_be_noticed(bench: Bench) -> None:
+    clients = [{"port": "p1", "mac": MACS["p1"]}]
+    out, into = Frame(BROADCAST, MACS["p1"]), Frame(BROADCAST, STRANGER)
+    states: List[List[str]] = [[], ["nic0"], ["nic0", "nic1"]]
+    for down in states:
+        rules = bench.load(at_two_uplinks(), clients, down=down)
+        arrives(bench, rules, "p1", out)
+        others = [Rules(at_two_uplinks(), rules.numbers, clients, one) for one in states]
+        for other in others:
+            if other.down != down:
+                with pytest.raises(AssertionError):
+                    arrives(bench, other, "p1", out)
+    rules = bench.load(at_two_uplinks(), clients)
+    blocked = Rules(at_two_uplinks(blocked=True), rules.numbers, clients)
+    for at, frame in ("p1", out), ("nic0", into):
+        arrives(bench, rules, at, frame)
+        with pytest.raises(AssertionError):
+            arrives(bench, blocked, at, frame)
 
 
 def test_a_copy_too_many_would_be_noticed(bench: Bench) -> None:

@@ -3,7 +3,18 @@
 import time
 from collections import Counter
 from pathlib import Path
-from typing import Any, Callable, Counter as Counts, Dict, List, Mapping, Optional, Sequence, Tuple
+from typing import (
+    Any,
+    Callable,
+    Collection,
+    Counter as Counts,
+    Dict,
+    List,
+    Mapping,
+    Optional,
+    Sequence,
+    Tuple,
+)
 
 from bench import Bench
 from compiler import Compiler
@@ -37,8 +48,9 @@ class Wires(Bench):
         switch: Mapping[str, Any],
         clients: Sequence[Mapping[str, Any]],
         change: Callable[[str], Optional[str]] = str,
+        down: Collection[str] = (),
     ) -> Rules:
-        rules = super().load(switch, clients, change)
+        rules = super().load(switch, clients, change, down)
         # What the data path keeps of the flows before goes with them, but not at that moment.
         self.ask("revalidator/purge")
         return rules
