@@ -486,15 +486,16 @@ std::size_t Bridges::apply(Wanted const &wanted) {
     }
   }
   auto const rows = wanted_rows(wanted, present());
-  auto const first_rows = rows_before_flows(rows, present());
-  auto const added = apply_rows(wanted, first_rows, deadline);
+  bool const any_new = has_new(rows, present());
+  auto const bare = any_new ? rows_before_flows(rows, present()) : decltype(rows){};
+  auto const added = apply_rows(wanted, any_new ? bare : rows, deadline);
   std::erase_if(bridges_, [](auto const &bridge) { return bridge.second->is_altered; });
   std::erase_if(bridges_, goes);
   std::size_t changed = 0;
   for (auto const &bridge : wanted.bridges) {
     changed += apply_flows(bridge, wanted.change, added, deadline);
   }
-  if (rows != first_rows) {
+  if (any_new) {
     apply_rows(wanted, rows, deadline);
   }
   return changed;

@@ -7,6 +7,15 @@ namespace simhost::daemon {
 using openvswitch::BridgeRow;
 using openvswitch::PresentRows;
 
+namespace {
+
+bool is_new(BridgeRow const &row, PresentRows const &present) {
+  return std::ranges::none_of(present.bridges,
+                              [&](auto const &bridge) { return bridge.row.name == row.name; });
+}
+
+}  // namespace
+
 std::vector<BridgeRow> wanted_rows(Wanted const &wanted, PresentRows const &present) {
   std::vector<BridgeRow> rows;
   for (auto const &bridge : wanted.bridges) {
@@ -23,12 +32,14 @@ std::vector<BridgeRow> wanted_rows(Wanted const &wanted, PresentRows const &pres
   return rows;
 }
 
+bool has_new(std::vector<BridgeRow> const &wanted, PresentRows const &present) {
+  return std::ranges::any_of(wanted, [&](BridgeRow const &row) { return is_new(row, present); });
+}
+
 std::vector<BridgeRow> rows_before_flows(std::vector<BridgeRow> wanted,
                                          PresentRows const &present) {
   for (auto &row : wanted) {
-    bool const is_there = std::ranges::any_of(
-        present.bridges, [&](auto const &bridge) { return bridge.row.name == row.name; });
-    if (!is_there) {
+    if (is_new(row, present)) {
       row.devices.clear();
     }
   }

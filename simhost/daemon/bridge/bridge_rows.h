@@ -13,8 +13,11 @@ namespace simhost::daemon {
 /// Without devices that others have. Bridges of switches that cannot be run stay as they are.
 std::vector<openvswitch::BridgeRow> wanted_rows(Wanted const &wanted,
                                                 openvswitch::PresentRows const &present);
-/// Likewise, but bridges that are not there yet get no devices: ovs-vswitchd looks for frames at
-/// all devices after each fifty messages, so that flows are in a bridge sooner before it has any.
+/// Whether one of them is of a bridge that is not there yet.
+bool has_new(std::vector<openvswitch::BridgeRow> const &wanted,
+             openvswitch::PresentRows const &present);
+/// Such bridges without devices: ovs-vswitchd looks for frames at all devices after each fifty
+/// messages, so that flows are in a bridge sooner before it has any.
 std::vector<openvswitch::BridgeRow> rows_before_flows(std::vector<openvswitch::BridgeRow> wanted,
                                                       openvswitch::PresentRows const &present);
 /// The devices that come to a bridge.

@@ -35,6 +35,8 @@ WantedBridge wanted(BridgeRow const &row) {
 TEST(RowsOfBridges, HaveNoDevicesBeforeABridgeHasItsFlows) {
   auto const present = with(row("there", {{"a", 1}}));
   std::vector const all{row("there", {{"a", 1}, {"b", 2}}), row("new", {{"c", 3}})};
+  EXPECT_TRUE(has_new(all, present));
+  EXPECT_FALSE(has_new({all[0]}, present));
   EXPECT_THAT(rows_before_flows(all, present), ElementsAre(all[0], row("new", {})));
 }
 
