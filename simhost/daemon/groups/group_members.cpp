@@ -130,6 +130,10 @@ void GroupMembers::note_places(Switch &known, Network const &network) const {
   known.devices.clear();
   known.many.clear();
   known.places.clear();
+  if (!network.multicast.hears_igmp && !network.multicast.hears_mld) {
+    known.heard.clear();
+    return;
+  }
   std::set<std::uint16_t> used;
   auto const add = [&](openvswitch::Port const &port, std::uint16_t vlan) {
     known.places.insert({.port = port.number, .vlan = domains.of(vlan)});
