@@ -280,7 +280,7 @@ void Daemon::follow_devices() {
     storage::ReadingTransaction transaction(store_);
     auto const say = [this](std::string const &why) { troubles_.add(why); };
     switch_devices(transaction, devices_, say);
-    raise_packet_sizes(packet_sizes(transaction), devices_, say);
+    raise_packet_sizes(sizes_to_raise(transaction, devices_), devices_, say);
     devices_.refresh();
     differ = links_differ(transaction, devices_, is_live);
   }

@@ -205,6 +205,16 @@ std::optional<NetworkDevice> NetworkDevices::find(std::string_view name) const {
   return found == devices_.end() ? std::nullopt : std::optional(found->second);
 }
 
+std::map<std::string, std::uint32_t> NetworkDevices::smaller_than(std::uint32_t bytes) const {
+  std::map<std::string, std::uint32_t> found;
+  for (auto const &[name, device] : devices_) {
+    if (device.mtu < bytes) {
+      found.emplace(name, device.mtu);
+    }
+  }
+  return found;
+}
+
 std::vector<std::string> NetworkDevices::switched_off() const {
   std::vector<std::string> names;
   for (auto const &[name, device] : devices_) {

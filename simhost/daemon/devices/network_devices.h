@@ -43,6 +43,8 @@ class NetworkDevices {
   /// whether that was anything.
   bool refresh();
   [[nodiscard]] std::optional<NetworkDevice> find(std::string_view name) const;
+  /// Those that carry no packets of so many bytes, and how large ones they do.
+  [[nodiscard]] std::map<std::string, std::uint32_t> smaller_than(std::uint32_t bytes) const;
   /// The names of those that are switched off.
   [[nodiscard]] std::vector<std::string> switched_off() const;
   /// The name of the bridge or bond of the kernel that a device is at; empty if it is at none.

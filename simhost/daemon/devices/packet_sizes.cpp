@@ -3,7 +3,11 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
+#include <map>
+#include <optional>
 #include <span>
+#include <string_view>
 #include <system_error>
 #include <utility>
 #include <vector>
@@ -32,6 +36,20 @@ std::vector<std::pair<std::string, NetworkDevice>> too_small(PacketSizes const &
   return found;
 }
 
+std::optional<storage::SwitchKey> find_switch_at(storage::Transaction &transaction,
+                                                 std::string_view device) {
+  auto const holder = storage::find_device(transaction, device);
+  if (!holder) {
+    return std::nullopt;
+  }
+  auto port = holder->port;
+  if (holder->uplink) {
+    auto const uplink = storage::find_uplink(transaction, *holder->uplink);
+    port = uplink ? uplink->port : std::nullopt;
+  }
+  return port ? std::optional(storage::get_port_row(transaction, *port).switch_key) : std::nullopt;
+}
+
 }  // namespace
 
 void add_packet_sizes(storage::Transaction &transaction, storage::SwitchKey key, std::uint32_t size,
@@ -46,11 +64,20 @@ void add_packet_sizes(storage::Transaction &transaction, storage::SwitchKey key,
   }
 }
 
-PacketSizes packet_sizes(storage::Transaction &transaction) {
-  PacketSizes sizes;
+PacketSizes sizes_to_raise(storage::Transaction &transaction, NetworkDevices const &devices) {
+  std::map<storage::SwitchKey, std::uint32_t> of_switches;
+  std::uint32_t greatest = 0;
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     auto const size = effective(transaction, switches::mtu, storage::PropertyOwner::global(key));
-    add_packet_sizes(transaction, key, size, sizes);
+    of_switches[key] = size;
+    greatest = std::max<std::uint32_t>(greatest, size);
+  }
+  PacketSizes sizes;
+  for (auto const &[name, present] : devices.smaller_than(greatest)) {
+    auto const key = find_switch_at(transaction, name);
+    if (key && of_switches.at(*key) > present) {
+      sizes[name] = of_switches.at(*key);
+    }
   }
   return sizes;
 }

@@ -17,9 +17,9 @@ namespace simhost::daemon {
 /// The size of the largest packet that a device is to carry, by its name.
 using PacketSizes = std::map<std::string, std::uint32_t>;
 
-/// Those of the devices of all switches.
-PacketSizes packet_sizes(storage::Transaction &transaction);
-/// Likewise of one switch, whose packets are as large as that.
+/// Those of the devices of all switches, as far as they carry less.
+PacketSizes sizes_to_raise(storage::Transaction &transaction, NetworkDevices const &devices);
+/// Those of all devices of one switch, whose packets are as large as that.
 void add_packet_sizes(storage::Transaction &transaction, storage::SwitchKey key, std::uint32_t size,
                       PacketSizes &sizes);
 

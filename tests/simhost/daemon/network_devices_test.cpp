@@ -1,6 +1,7 @@
 // What is known of network devices, in a namespace of the test's own.
 #include "daemon/devices/network_devices.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <linux/rtnetlink.h>
 #include <sched.h>
@@ -18,6 +19,10 @@
 namespace {
 
 using simhost::daemon::NetworkDevices;
+using testing::Contains;
+using testing::Key;
+using testing::Not;
+using testing::Pair;
 using namespace std::chrono_literals;
 
 // Of users as well, unless the test may make one of networks without.
@@ -94,12 +99,16 @@ TEST_F(TheNetworkDevices, AreFollowed) {
   ip("link add one type veth peer name other");
   NetworkDevices devices(loop, [] {});
   auto const index = devices.find("one")->index;
+  EXPECT_THAT(devices.switched_off(), Contains("one"));
   ip("link set one up mtu 9000");
   ip("link set other up");
   devices.refresh();
   EXPECT_TRUE(devices.find("one")->is_up);
   EXPECT_TRUE(devices.find("one")->has_link);
   EXPECT_EQ(devices.find("one")->mtu, 9000U);
+  EXPECT_THAT(devices.switched_off(), Not(Contains("one")));
+  EXPECT_THAT(devices.smaller_than(9000), Not(Contains(Key("one"))));
+  EXPECT_THAT(devices.smaller_than(9001), Contains(Pair("one", 9000U)));
 
   ip("link set other down");
   devices.refresh();
