@@ -152,9 +152,21 @@ void Daemon::remember_soon() {
   }
 }
 
+// Less often than it is counted: what clients send comes and goes.
+void Daemon::balance() {
+  constexpr unsigned kBetweenLooks = 3;
+  if (++counts_ == kBetweenLooks) {
+    counts_ = 0;
+    if (load_balance_.choose()) {
+      sync_soon();
+    }
+  }
+}
+
 void Daemon::count_from_now_on() {
   next_count_ = loop_.after(kBetweenCounts, [this] {
     count();
+    balance();
     count_from_now_on();
   });
 }
@@ -169,8 +181,11 @@ void Daemon::connect() {
         Bridges::Told{
             .owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
             .host = host_,
-            .counted = [this](auto key, auto const &totals,
-                              auto const &sessions) { counting_.count(key, totals, sessions); },
+            .counted =
+                [this](auto key, auto const &totals, auto const &sessions) {
+                  counting_.count(key, totals, sessions);
+                  load_balance_.count(key, totals);
+                },
             .moved =
                 [this](auto key, auto port) {
                   if (port != 0) {
@@ -334,6 +349,7 @@ void Daemon::sync() {
   };
   auto const complete = [&](storage::SwitchKey key, openvswitch::Network &network) {
     members_.follow(transaction, key, network);
+    load_balance_.follow(key, network);
   };
   auto const all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
   bool const counts_anew = counting_.follow(transaction);
@@ -396,6 +412,7 @@ void Daemon::settle(Wanted const &wanted) {
     keys.insert(unfit.key);
   }
   members_.keep(keys);
+  load_balance_.keep(keys);
   age_by(wanted);
   in_force_ = wanted.change;
   sync_after(wanted.lasts);
@@ -425,6 +442,12 @@ void Daemon::handle_in_force(std::uint64_t change, Reply const &reply) {
   }
   waiting_.emplace(change, reply);
   sync_soon();
+}
+
+// 0 for a port of no team that goes by load: all others are known by their numbers.
+Json Daemon::carrier(Json const &question) const {
+  return {{"device",
+           load_balance_.carrier(switch_in(question), question.at("port").get<std::uint32_t>())}};
 }
 
 Json Daemon::addresses(Json const &question) {
@@ -536,6 +559,8 @@ void Daemon::handle(Json const &question, Reply const &reply) {
       reply(is_there(question.at("name").get<std::string>()));
     } else if (what == "carry") {
       reply(carry(question));
+    } else if (what == "carrier") {
+      reply(carrier(question));
     } else if (what == "addresses") {
       reply(addresses(question));
     } else if (what == "counters") {

@@ -16,6 +16,7 @@
 #include "daemon/counting/counting.h"
 #include "daemon/devices/network_devices.h"
 #include "daemon/groups/group_members.h"
+#include "daemon/load/load_balance.h"
 #include "daemon/server.h"
 #include "daemon/state_watch.h"
 #include "daemon/troubles.h"
@@ -68,6 +69,7 @@ class Daemon {
   void handle_in_force(std::uint64_t change, Reply const &reply);
   [[nodiscard]] Json carry(Json const &question);
   [[nodiscard]] Json is_there(std::string const &device);
+  [[nodiscard]] Json carrier(Json const &question) const;
   [[nodiscard]] Json addresses(Json const &question);
   void count_of(storage::SwitchKey key);
   [[nodiscard]] Json counters(Json const &question);
@@ -77,6 +79,7 @@ class Daemon {
   void age_by(Wanted const &wanted);
   void remember();
   void remember_soon();
+  void balance();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
   [[nodiscard]] Json groups(Json const &question) const;
 
@@ -95,6 +98,8 @@ class Daemon {
   GroupMembers members_;
   bool follows_members_ = false;  // and nothing else
   Counting counting_;
+  LoadBalance load_balance_;
+  unsigned counts_ = 0;  // since the load was looked at
   Compiler compiler_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;

@@ -69,7 +69,8 @@ inline constexpr auto kName = form::of_uplinks(form::array_text<char[QEX_NEB_NAM
 inline constexpr std::array kMembers{
     form::member("balance", form::choice<&VSTeamPolicy::loadBalance>(kBalances),
                  "`none`, `explicit`: the first uplink; the others spread the ports by their "
-                 "numbers"),
+                 "numbers, of which `load` moves ports to uplinks that carry less where frames "
+                 "move"),
     form::member("criteria", form::bits<&VSTeamPolicy::linkCriteria>(kCriteria),
                  "what takes an uplink out of use"),
     form::member("flags", form::bits<&VSTeamPolicy::flags>(kFlags),

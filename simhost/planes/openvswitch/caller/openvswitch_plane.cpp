@@ -14,6 +14,7 @@
 #include "model/mac/properties.h"
 #include "model/multicast/properties.h"
 #include "model/properties/properties.h"
+#include "model/teaming/properties.h"
 #include "model/teaming/team.h"
 #include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/line/line.h"
@@ -147,6 +148,13 @@ Json question_about(std::string_view what, Place const &place) {
           {"port", place.port ? static_cast<std::uint32_t>(*place.port) : 0}};
 }
 
+// By what is sent, which the state does not know.
+bool goes_by_load(storage::Transaction &transaction, storage::Port const &port) {
+  auto const owner = storage::PropertyOwner::port(port.switch_key, port.number);
+  return effective(transaction, teaming::policy, owner).loadBalance == TEAM_FRP_TYPE_LB_LBT &&
+         !find_value(transaction, teaming::bound_uplink, owner);
+}
+
 bool has_uplink_device(storage::Transaction &transaction, storage::SwitchKey key) {
   auto const uplinks = storage::uplinks_of(transaction, key);
   return std::ranges::any_of(uplinks, [&](auto const &uplink) {
@@ -233,7 +241,19 @@ bool OpenVswitchPlane::lacp_is_up(storage::Transaction &transaction, std::string
 
 std::string OpenVswitchPlane::team_uplink(storage::Transaction &transaction,
                                           storage::Port const &port) {
-  return stored_.team_uplink(transaction, port);
+  auto known = stored_.team_uplink(transaction, port);
+  Place const place{.switch_key = port.switch_key, .port = port.number};
+  if (!goes_by_load(transaction, port) || !has_frames(transaction, place)) {
+    return known;
+  }
+  auto const reply = asked_if_there(file_, question_about("carrier", place));
+  for (auto const &uplink : storage::uplinks_of(transaction, port.switch_key)) {
+    auto const device = storage::device_of(transaction, uplink.name);
+    if (reply && device && device->number == reply->at("device").get<std::uint32_t>()) {
+      return uplink.name;
+    }
+  }
+  return known;
 }
 
 std::vector<VSMACEntry> OpenVswitchPlane::addresses(storage::Transaction &transaction,

@@ -52,6 +52,7 @@ struct Team {
   Balance balance = Balance::first;
   std::vector<Slot> in_use;
   std::vector<Slot> standby;  ///< step in, in this order, when none in use has a link
+  bool goes_by_load = false;  ///< whoever knows it gives the ports their shares
 
   bool operator==(Team const &) const = default;
 };

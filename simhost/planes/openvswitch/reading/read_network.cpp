@@ -275,7 +275,10 @@ class Reader {
 
   std::size_t add_team(VSTeamPolicy const &policy) {
     auto const usable = teaming::usable_slots(team_, policy);
-    Team team{.balance = balance_of(policy), .in_use = {}, .standby = {}};
+    Team team{.balance = balance_of(policy),
+              .in_use = {},
+              .standby = {},
+              .goes_by_load = policy.loadBalance == TEAM_FRP_TYPE_LB_LBT};
     for (std::size_t at = 0; at < usable.slots.size(); ++at) {
       append_slot(at < usable.in_use ? team.in_use : team.standby, usable.slots[at]);
     }

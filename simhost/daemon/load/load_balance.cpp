@@ -1,0 +1,99 @@
+// A port without a choice of its own goes by its number, as in teams that go by that.
+#include "daemon/load/load_balance.h"
+
+#include <algorithm>
+
+#include "daemon/load/next_move.h"
+#include "planes/openvswitch/compile/pipeline.h"
+
+namespace simhost::daemon {
+namespace {
+
+using openvswitch::Counted;
+
+bool counts_what_came_in(std::uint64_t cookie) {
+  auto const kind = openvswitch::kind_of(cookie);
+  return kind == Counted::in_unicast || kind == Counted::in_multicast ||
+         kind == Counted::in_broadcast;
+}
+
+std::uint64_t under(std::map<std::uint32_t, std::uint64_t> const &bytes, std::uint32_t port) {
+  auto const found = bytes.find(port);
+  return found == bytes.end() ? 0 : found->second;
+}
+
+}  // namespace
+
+void LoadBalance::count(storage::SwitchKey key, openvswitch::Totals const &totals) {
+  auto const found = switches_.find(key);
+  if (found == switches_.end() || found->second.teams.empty()) {
+    return;
+  }
+  auto &sent = found->second.sent;
+  sent.clear();
+  for (auto const &[cookie, total] : totals) {
+    if (counts_what_came_in(cookie)) {
+      sent[openvswitch::number_of(cookie)] += total.bytes;
+    }
+  }
+}
+
+void LoadBalance::follow(storage::SwitchKey key, openvswitch::Network &network) {
+  auto &known = switches_[key];
+  known.teams.assign(network.teams.size(), {});
+  for (auto &port : network.ports) {
+    if (port.team && network.teams[*port.team].goes_by_load) {
+      auto &team = known.teams[*port.team];
+      team.slots = network.teams[*port.team].in_use;
+      team.ports.push_back(port.number);
+      port.share = known.shares.try_emplace(port.number, port.share).first->second;
+    }
+  }
+  std::erase_if(known.teams, [](Team const &team) { return team.slots.size() < 2; });
+}
+
+bool LoadBalance::choose(OfSwitch &of_switch, Team const &team) {
+  std::vector<LoadedPort> ports;
+  for (auto const number : team.ports) {
+    auto const now = under(of_switch.sent, number);
+    auto const before = under(of_switch.sent_before, number);
+    // What counts less than before began anew.
+    ports.push_back({.number = number,
+                     .slot = of_switch.shares.at(number) % team.slots.size(),
+                     .bytes = now < before ? now : now - before});
+  }
+  auto const move = next_move(ports, team.slots.size());
+  if (move) {
+    of_switch.shares[move->number] = static_cast<std::uint32_t>(move->slot);
+  }
+  return move.has_value();
+}
+
+bool LoadBalance::choose() {
+  bool has_chosen = false;
+  for (auto &[key, of_switch] : switches_) {
+    for (auto const &team : of_switch.teams) {
+      has_chosen |= choose(of_switch, team);
+    }
+    of_switch.sent_before = of_switch.sent;
+  }
+  return has_chosen;
+}
+
+openflow::Port LoadBalance::carrier(storage::SwitchKey key, std::uint32_t port) const {
+  auto const found = switches_.find(key);
+  if (found != switches_.end()) {
+    for (auto const &[slots, ports] : found->second.teams) {
+      if (std::ranges::find(ports, port) != ports.end()) {
+        return slots[found->second.shares.at(port) % slots.size()].front();
+      }
+    }
+  }
+  return 0;
+}
+
+void LoadBalance::keep(std::set<storage::SwitchKey> const &keys) {
+  std::erase_if(switches_, [&](auto const &one) { return !keys.contains(one.first); });
+}
+
+}  // namespace simhost::daemon
