@@ -50,10 +50,11 @@ class Bench:
         clients: Sequence[Mapping[str, Any]],
         change: Callable[[str], Optional[str]] = str,
         down: Collection[str] = (),
+        multicast: Optional[Mapping[str, Any]] = None,
     ) -> Rules:
-        """Makes the bridge that switch, with each flow changed or left out first and these uplinks
-        without a link; its rules."""
-        made = self._compiler.compile(switch, clients, down=down)
+        """Makes the bridge that switch, with each flow changed or left out first, these uplinks
+        without a link, and groups with these members; its rules."""
+        made = self._compiler.compile(switch, clients, multicast, down)
         changed = (change(flow) for flow in made["flows"])
         flows = [flow for flow in changed if flow is not None]
         self._open_vswitch.load(self._bridge, [*flows, *self.more_flows], made["groups"])

@@ -49,8 +49,9 @@ class Wires(Bench):
         clients: Sequence[Mapping[str, Any]],
         change: Callable[[str], Optional[str]] = str,
         down: Collection[str] = (),
+        multicast: Optional[Mapping[str, Any]] = None,
     ) -> Rules:
-        rules = super().load(switch, clients, change, down)
+        rules = super().load(switch, clients, change, down, multicast)
         # What the data path keeps of the flows before goes with them, but not at that moment.
         self.ask("revalidator/purge")
         return rules

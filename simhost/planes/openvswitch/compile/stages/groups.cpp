@@ -351,7 +351,14 @@ class ByMembership {
     return wanting;
   }
 
+  // One all of whose members get all groups has members, too.
   void compile_group(multicast::Group const &group) {
+    bool const has_members = std::ranges::any_of(group.members, [&](auto const &member) {
+      return find(member.port, group.vlan) != nullptr;
+    });
+    if (!has_members) {
+      return;
+    }
     auto const all = wanting(group);
     std::set<multicast::Address> sources;
     for (auto const &one : all) {
@@ -370,9 +377,6 @@ class ByMembership {
       return ports;
     };
     for (auto const *way : ways_of(plan_)) {
-      if (reached(plan_, some([](auto const &) { return true; }), way).empty()) {
-        continue;
-      }
       auto const others = [](multicast::Sources const &wanted) { return wanted.are_excluded; };
       add_group(100, match, some(others), way);
       for (auto const &source : sources) {
