@@ -71,8 +71,8 @@ def test_clients_that_say_nothing_are_reached_after_a_kill(lab: Lab) -> None:
     # Those before would have come by then.
     third.expect_none(lambda came: came in (to_other, to_third), timeout=0)
     assert third.reaches(one, attempts=5)
-    one.send(to_third)
-    third.expect(to_third)
+    # What Open vSwitch remembers of such frames goes a little later.
+    assert comes_sooner_or_later(one, third, to_third)
 
 
 def test_clients_that_say_nothing_are_reached_after_the_daemon_is_killed(lab: Lab) -> None:
