@@ -28,9 +28,9 @@ namespace {
 
 using namespace std::chrono_literals;
 
-// Between two attempts to connect.
+// Between two attempts to connect: frames wait for the one that succeeds.
 constexpr events::Clock::duration kFirstPause = 50ms;
-constexpr events::Clock::duration kLongestPause = 500ms;
+constexpr events::Clock::duration kLongestPause = 200ms;
 // What was counted since the last time is lost when Open vSwitch is killed.
 constexpr auto kBetweenCounts = 2s;
 
