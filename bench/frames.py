@@ -289,7 +289,9 @@ def empty_bridges(lab: Lab) -> None:
 
 def resync_rows(effort: Effort) -> Iterator[Row]:
     """A daemon that starts beside an Open vSwitch whose flows are gone."""
-    with many_ports(effort.resynced) as many, LastingOpenVSwitch(many.lab) as open_vswitch:
+    with many_ports(effort.resynced) as many, LastingOpenVSwitch(
+        many.lab.host, many.lab.run_folder()
+    ) as open_vswitch:
         lab = many.lab
         # As many flows as are to be told: each range that a client tags takes two.
         for port in many.document["switches"][0]["ports"]:
