@@ -87,6 +87,7 @@ class Comparison {
     for (auto const &row : rows) {
       known[row.name.port] = &row;
     }
+    auto const images = images_of_ports(transaction_, found.key);
     for (auto const &port : storage::ports_of(transaction_, found.key)) {
       auto const row = known.find(port.identifier);
       if (port.kind == storage::PortKind::uplink) {
@@ -96,7 +97,7 @@ class Comparison {
         add({.name = {found.row.identifier, port.identifier}, .fabric = {}, .image = {}}, nullptr,
             record_of(transaction_, port, membership_, ""));
       } else {
-        compare_port(port, *row->second);
+        compare_port(port, images.at(port.number), *row->second);
         known.erase(row);
       }
     }
@@ -107,8 +108,8 @@ class Comparison {
     }
   }
 
-  void compare_port(storage::Port const &port, Shared const &row) {
-    if (image_of(transaction_, port) == row.image) {
+  void compare_port(storage::Port const &port, Bytes const &image, Shared const &row) {
+    if (image == row.image) {
       return;
     }
     if (!row.fits) {

@@ -8,7 +8,6 @@
 #include <utility>
 #include <vector>
 
-#include "base/blocks.h"
 #include "base/outcomes.h"
 #include "model/plane.h"
 #include "model/ports/ports.h"
@@ -21,7 +20,6 @@
 #include "scenario/reading.h"
 #include "scenario/settings.h"
 #include "scenario/texts.h"
-#include "storage/running/devices.h"
 #include "storage/store.h"
 
 namespace simhost::fabric {
@@ -228,22 +226,6 @@ void apply_members(storage::ChangingTransaction &transaction, PropertyOwner cons
   apply_addresses(transaction, owner, wanted);
 }
 
-void write_lasting(Writer &writer, Transaction &transaction, PropertyOwner const &owner) {
-  for (auto const &stored : list_stored(transaction, owner)) {
-    if (lasts(stored)) {
-      writer.text(stored.name);
-      writer.number(static_cast<std::uint32_t>(stored.property.type));
-      writer.bytes(stored.property.value);
-    }
-  }
-  for (auto const &address : fixed_at(transaction, owner)) {
-    writer.bytes(address.name.mac);
-    writer.number(address.name.vid);
-    writer.number(address.name.vni);
-    writer.number(address.type);
-  }
-}
-
 }  // namespace
 
 Settings settings_of(Transaction &transaction, storage::FoundSwitch const &found) {
@@ -263,23 +245,6 @@ Settings settings_of(Transaction &transaction, storage::Port const &port) {
     said[kExternal] = external;
   }
   return texts_of(said);
-}
-
-Bytes image_of(Transaction &transaction, storage::FoundSwitch const &found) {
-  Writer writer;
-  writer.text(found.row.alias);
-  writer.number(found.row.max_ports);
-  writer.number(found.row.version);
-  write_lasting(writer, transaction, PropertyOwner::global(found.key));
-  return writer.block(BlockKind::state, 0);
-}
-
-Bytes image_of(Transaction &transaction, storage::Port const &port) {
-  Writer writer;
-  writer.text(storage::external_id_of(transaction, port.number));
-  writer.number(storage::device_of(transaction, port.number) ? 1 : 0);
-  write_lasting(writer, transaction, PropertyOwner::port(port.switch_key, port.number));
-  return writer.block(BlockKind::port_state, 0);
 }
 
 void apply_settings(storage::ChangingTransaction &transaction, storage::FoundSwitch const &found,
