@@ -9,10 +9,11 @@
 #   --minutes N   how long; 20 by default. The sweep of wrong values runs once, with a million calls
 #                 of every kind in the same memory, or fewer if there is less time; fuzzers,
 #                 frames of any content at random switches, sequences of calls, replays of such,
-#                 without frames and with them, clones of random hosts, killed processes and random
-#                 pairs of values share what is left
+#                 without frames and with them, clones of random hosts, killed processes, hosts that
+#                 share a switch while everything fails, and random pairs of values share what is left
 #   --seed N      what chance chose in an earlier run, which printed its seed
-#   --no-frames   without replays over real frames, where network namespaces cannot be made
+#   --no-frames   without replays over real frames and hosts that share, where network namespaces
+#                 cannot be made
 #
 # A line for each part says how much it did and what was wrong; the status is 1 if anything was.
 # What a fuzzer learns stays in build-fuzzers/corpus, and the next run goes on from there.

@@ -6,7 +6,7 @@
 First what has an end: every batch of the sweep, then a million calls of every kind and a million
 traps of each call, fewer in less than twenty minutes. What has none shares the time that is left:
 fuzzers, real frames at random switches, sequences, replays of such, clones of random hosts, killed
-processes and random pairs of values.
+processes, hosts that share a switch and random pairs of values.
 """
 
 import argparse
@@ -39,7 +39,8 @@ SHARES = {
     "replays": 0.1,
     "clones": 0.05,
     "kills": 0.1,
-    "pairs": 0.25,
+    "fabric": 0.05,
+    "pairs": 0.2,
 }
 """Of the time that what has an end leaves."""
 
@@ -140,6 +141,9 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
     for what, unit, name in replays:
         replay = partial(by_chance, f"recordings/{name}.py", seed)
         yield Part(f"replays, {what}", unit, replay, SHARES["replays"] / len(replays))
+    if frames:
+        shared = partial(by_chance, "simhostd/fabric_by_chance.py", seed)
+        yield Part("shared switches", "calls", shared, SHARES["fabric"])
     clones = partial(by_chance, "vswitch/drawn_documents.py", seed)
     yield Part("clones of hosts", "documents", clones, SHARES["clones"])
     yield Part("killed processes", "rounds", killed, SHARES["kills"])
@@ -147,7 +151,7 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
         "random pairs",
         "calls",
         lambda seconds: processes.sweep("pairs", folder, seed, seconds),
-        SHARES["pairs"],
+        SHARES["pairs"] + (0 if frames else SHARES["fabric"]),
     )
 
 

@@ -9,6 +9,7 @@ from typing import Any, Iterator, Tuple
 import pytest
 from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
 
+import fabric_by_chance
 from fabric_lab import FabricLab, Host, started
 from frame_lab import comes_true
 
@@ -82,3 +83,19 @@ def test_nobody_knows_and_then_it_is_decided(lab: FabricLab, two: Tuple[Host, Ho
     assert comes_true(lambda: mtu(one) == mtu(other) == wanted), (mtu(one), mtu(other), wanted)
     assert one.call("VSDVS_SetMTU", "lab", 1900) == QEX_OK
     assert comes_true(lambda: mtu(other) == 1900)
+
+
+def test_whatever_fails_all_hosts_end_alike() -> None:
+    calls, wrong = fabric_by_chance.run(7, steps=15, hosts=2)
+    assert wrong == []
+    assert calls >= 15
+
+
+def test_a_lost_port_and_one_that_was_refused_are_found() -> None:
+    calls = fabric_by_chance.Calls()
+    calls.made, calls.refused, calls.unknown = {"a", "b"}, {"c": "QEX_BUSY", "d": ""}, {"e"}
+    assert calls.wrong({"a", "b", "e"}) == []
+    assert calls.wrong({"a", "c"}) == [
+        "the port b was added, and is lost",
+        "the port c is there, and was refused: QEX_BUSY",
+    ]

@@ -22,8 +22,9 @@ constexpr auto kElection = 3s;
 
 // By these words the database says that it will not; all others may be those of a server in need.
 bool is_final(ovsdb::TransactionRefused const &refusal) {
-  constexpr std::array<std::string_view, 4> kFinal{
-      "timed out", "constraint violation", "referential integrity violation", "permission error"};
+  constexpr std::array<std::string_view, 4> kFinal{"refuses to wait", "constraint violation",
+                                                   "referential integrity violation",
+                                                   "permission error"};
   std::string_view const words(refusal.what());
   return std::ranges::any_of(kFinal,
                              [&](auto one) { return words.find(one) != std::string_view::npos; });
@@ -63,8 +64,7 @@ class Deciding {
  private:
   Decision attempt() {
     // An attempt whose server was lost may have been made.
-    if (in_doubt_ &&
-        is_made(cluster_.transact(change_selection(proposal_.id), next_deadline(deadline_)))) {
+    if (in_doubt_ && is_there()) {
       return {Verdict::made, {}};
     }
     bool const was_in_doubt = in_doubt_;
@@ -77,11 +77,15 @@ class Deciding {
         cluster_.disconnect();
         throw Unreachable(refusal.what());
       }
-      if (was_in_doubt && was_made(cluster_, proposal_, next_deadline(deadline_))) {
-        return {Verdict::made, {}};
-      }
-      return {Verdict::refused, refusal.what()};
+      // A server may try a second time by itself, and refuse then what it has made.
+      bool const made =
+          was_in_doubt ? was_made(cluster_, proposal_, next_deadline(deadline_)) : is_there();
+      return made ? Decision{Verdict::made, {}} : Decision{Verdict::refused, refusal.what()};
     }
+  }
+
+  bool is_there() {
+    return is_made(cluster_.transact(change_selection(proposal_.id), next_deadline(deadline_)));
   }
 
   Cluster &cluster_;

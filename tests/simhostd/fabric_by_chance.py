@@ -1,0 +1,170 @@
+#!/usr/bin/env python3
+"""Hosts that share a switch, while their databases, wires, daemons and callers fail by chance.
+
+    fabric_by_chance.py [--seconds N] [--seed N]
+
+In the end all is whole again, and all hosts must have the same: each port that a call added with
+success, none of a call that was refused, and of those of which nobody knew either.
+"""
+
+import json
+import random
+import subprocess
+import sys
+import tempfile
+import time
+from pathlib import Path
+from typing import Callable, Dict, List, Set
+
+sys.path.insert(0, str(Path(__file__).parents[1] / "support"))
+
+import seeds  # noqa: E402  (after the path is set)
+from seeds import Outcome  # noqa: E402
+
+from fabric_lab import FabricLab, Host, killed, started  # noqa: E402
+from frame_lab import TOOLS, comes_true  # noqa: E402
+
+LAB = {"switches": [{"alias": "lab", "max_ports": 5000}]}
+SERVERS = 3
+STEPS = 40
+
+
+class Calls:
+    """Calls that add a port each, in processes of their own."""
+
+    def __init__(self) -> None:
+        self._running: Dict[str, "subprocess.Popen[str]"] = {}
+        self.made: Set[str] = set()
+        self.refused: Dict[str, str] = {}
+        self.unknown: Set[str] = set()
+
+    def begin(self, host: Host, name: str) -> None:
+        call = subprocess.Popen(
+            [TOOLS / "simhostctl", "apply", "-"],
+            env=host.environment,
+            stdin=subprocess.PIPE,
+            stdout=subprocess.DEVNULL,
+            stderr=subprocess.PIPE,
+            text=True,
+        )
+        assert call.stdin is not None
+        call.stdin.write(json.dumps({"switches": [{"alias": "lab", "ports": [{"id": name}]}]}))
+        call.stdin.close()
+        call.stdin = None
+        self._running[name] = call
+
+    def kill_one(self, chance: random.Random) -> None:
+        if self._running:
+            self._running[chance.choice(sorted(self._running))].kill()
+
+    def end(self) -> None:
+        for name, call in self._running.items():
+            said = call.communicate(timeout=60)[1]
+            if call.returncode == 0:
+                self.made.add(name)
+            elif "QEX_BUSY" in said:
+                self.refused[name] = said.strip()
+            else:
+                # Killed, or QEX_TIMEOUT.
+                assert call.returncode < 0 or "QEX_TIMEOUT" in said, said
+                self.unknown.add(name)
+        self._running.clear()
+
+    def wrong(self, ports: Set[str]) -> List[str]:
+        lost = [f"the port {name} was added, and is lost" for name in sorted(self.made - ports)]
+        return lost + [
+            f"the port {name} is there, and was refused: {said}"
+            for name, said in sorted(self.refused.items())
+            if name in ports
+        ]
+
+
+class Disturbed:
+    """What fails, and is whole again later."""
+
+    def __init__(self, lab: FabricLab, chance: random.Random) -> None:
+        self._lab = lab
+        self._chance = chance
+        self._mends: List[Callable[[], None]] = []
+
+    def disturb(self) -> None:
+        if len(self._mends) > 1 or (self._mends and self._chance.random() < 0.5):
+            self.mend_one()
+            return
+        host = self._chance.choice(self._lab.hosts)
+        self._chance.choice([self._kill_database, self._pause, self._cut, self._kill_daemon])(host)
+
+    def mend_one(self) -> None:
+        self._mends.pop(0)()
+
+    def mend(self) -> None:
+        while self._mends:
+            self.mend_one()
+
+    def _kill_database(self, _: Host) -> None:
+        databases = self._lab.databases
+        running = databases.running()
+        if len(running) == SERVERS:
+            server = self._chance.choice(running)
+            databases.kill(server)
+            self._mends.append(lambda: databases.start(server))
+
+    def _pause(self, _: Host) -> None:
+        self._lab.databases.pause()
+        time.sleep(self._chance.random())
+        self._lab.databases.resume()
+
+    def _cut(self, host: Host) -> None:
+        self._lab.cut(host)
+        self._mends.append(lambda: self._lab.cut(host, up=True))
+
+    def _kill_daemon(self, host: Host) -> None:
+        if host.daemon is not None:
+            killed(host)
+            self._mends.append(host.start)
+
+
+def ports_of(host: Host) -> Set[str]:
+    return set(host.ports("lab"))
+
+
+def run(seed: int, steps: int = STEPS, hosts: int = 3) -> Outcome:
+    """How many calls were made, and what is wrong with what came of them."""
+    chance = random.Random(seed)
+    calls = Calls()
+    with tempfile.TemporaryDirectory() as folder, FabricLab(Path(folder), SERVERS) as lab:
+        first = started(lab.host("h0", LAB))
+        first.ctl("share", "lab")
+        for number in range(1, hosts):
+            started(lab.host(f"h{number}")).ctl("join", "lab")
+        disturbed = Disturbed(lab, chance)
+        for step in range(steps):
+            for host in chance.sample(lab.hosts, chance.randint(1, hosts)):
+                calls.begin(host, f"{step}-{host.name}")
+            if chance.random() < 0.4:
+                disturbed.disturb()
+            if chance.random() < 0.1:
+                calls.kill_one(chance)
+            time.sleep(chance.random() * 0.1)
+        disturbed.mend()
+        calls.end()
+        last = f"last-{first.name}"
+        assert comes_true(lambda: add(first, last))
+        assert comes_true(lambda: all(last in ports_of(host) for host in lab.hosts))
+        found = [ports_of(host) for host in lab.hosts]
+        wrong = [problem for ports in found for problem in calls.wrong(ports)]
+        wrong += ["hosts have different ports"] * (found.count(found[0]) != len(found))
+        in_fabric = {str(row["id"]) for row in lab.databases.rows("Port")}
+        wrong += ["the fabric has other ports"] * (in_fabric != found[0])
+        logs = [host.log() for host in lab.hosts] if wrong else []
+    made = len(calls.made) + len(calls.refused) + len(calls.unknown)
+    return made, [f"seed {seed}: {problem}" for problem in wrong] + logs
+
+
+def add(host: Host, name: str) -> bool:
+    document = {"switches": [{"alias": "lab", "ports": [{"id": name}]}]}
+    return host.try_ctl("apply", "-", given=json.dumps(document)).returncode == 0
+
+
+if __name__ == "__main__":
+    sys.exit(seeds.main(run))
