@@ -84,6 +84,8 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
               [this](Json const &question, Reply const &reply) { handle(question, reply); }),
       memory_(store_, [this] { remember_soon(); }),
       announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }),
+      beacons_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
+                      .changed = [this] { sync_soon(); }}),
       members_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
                       .changed = [this] { follow_members(); }}),
       counting_(store_) {
@@ -201,7 +203,12 @@ void Daemon::connect() {
                 },
             .strayed = [this] { mend_soon(); },
             .lived = [this] { sync_soon(); },
-            .heard = [this](auto key, auto const &packet) { members_.receive(key, packet); },
+            .heard =
+                [this](auto key, auto const &packet) {
+                  if (!beacons_.receive(key, packet)) {
+                    members_.receive(key, packet);
+                  }
+                },
             .disturbed = [this] { connect_later(); }});
     sync();
   });
@@ -287,8 +294,9 @@ void Daemon::sync_after(std::optional<ClockTime> const &wait) {
 
 void Daemon::follow_devices() {
   bool differ = false;
-  auto const is_live = [this](storage::SwitchKey key, openflow::Port port) {
-    return bridges_ ? bridges_->is_live(key, port) : std::nullopt;
+  auto const heard_at = [this](storage::SwitchKey key, openflow::Port port) {
+    return Heard{.partner = bridges_ ? bridges_->is_live(key, port) : std::nullopt,
+                 .beacons = beacons_.arrive_at(key, port)};
   };
   devices_.refresh();
   {
@@ -297,11 +305,11 @@ void Daemon::follow_devices() {
     switch_devices(transaction, devices_, say);
     raise_packet_sizes(sizes_to_raise(transaction, devices_), devices_, say);
     devices_.refresh();
-    differ = links_differ(transaction, devices_, is_live);
+    differ = links_differ(transaction, devices_, heard_at);
   }
   if (differ) {
     storage::ChangingTransaction transaction(store_);
-    put_links(transaction, devices_, is_live);
+    put_links(transaction, devices_, heard_at);
     storage::advance_frames_change(transaction);
     transaction.commit();
   }
@@ -350,6 +358,7 @@ void Daemon::sync() {
   auto const complete = [&](storage::SwitchKey key, openvswitch::Network &network) {
     members_.follow(transaction, key, network);
     load_balance_.follow(key, network);
+    beacons_.follow(key, network);
   };
   auto const all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
   bool const counts_anew = counting_.follow(transaction);
@@ -413,6 +422,15 @@ void Daemon::settle(Wanted const &wanted) {
   }
   members_.keep(keys);
   load_balance_.keep(keys);
+  beacons_.keep(keys);
+  for (auto const &bridge : wanted.bridges) {
+    if (beacons_.has_too_few(bridge.key)) {
+      troubles_.add(
+          fmt::format("the switch '{}' asks for beacons, but of fewer than three links nobody can "
+                      "tell which one is cut off",
+                      bridge.alias));
+    }
+  }
   age_by(wanted);
   in_force_ = wanted.change;
   sync_after(wanted.lasts);

@@ -11,6 +11,7 @@
 #include <string>
 
 #include "daemon/announcer.h"
+#include "daemon/beacons/sent_beacons.h"
 #include "daemon/bridges.h"
 #include "daemon/compiler.h"
 #include "daemon/counting/counting.h"
@@ -95,6 +96,7 @@ class Daemon {
   Server server_;
   Memory memory_;
   Announcer announcer_;
+  SentBeacons beacons_;
   GroupMembers members_;
   bool follows_members_ = false;  // and nothing else
   Counting counting_;

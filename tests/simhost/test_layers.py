@@ -28,6 +28,7 @@ HEADERS = {
     "planes/openvswitch/rows": "planes/openvswitch/rows/rows.h",
     "planes/openvswitch/reconcile": "planes/openvswitch/reconcile/difference.h",
     "planes/openvswitch/multicast": "planes/openvswitch/multicast/membership.h",
+    "planes/openvswitch/beacons": "planes/openvswitch/beacons/hearing.h",
     "planes/openvswitch/compile": "planes/openvswitch/compile/compile.h",
     "planes/openvswitch/reading": "planes/openvswitch/reading/read_network.h",
     "planes/openvswitch/counting": "planes/openvswitch/counting/tally.h",
@@ -54,6 +55,7 @@ COMPILER_OF_STATE = [
     "planes/openvswitch/transport",
     "planes/openvswitch/openflow",
     "planes/openvswitch/multicast",
+    "planes/openvswitch/beacons",
     "planes/openvswitch/compile",
 ]
 # What the plane of those who use a state that a daemon serves may use.
@@ -88,6 +90,12 @@ BELOW: Dict[str, List[str]] = {
         "planes/openvswitch/transport",
         "planes/openvswitch/openflow",
     ],
+    # Who hears whom, likewise.
+    "planes/openvswitch/beacons": [
+        "events",
+        "planes/openvswitch/transport",
+        "planes/openvswitch/openflow",
+    ],
     # A pure function, which cannot look at the state.
     "planes/openvswitch/compile": [
         "base",
@@ -95,6 +103,7 @@ BELOW: Dict[str, List[str]] = {
         "planes/openvswitch/transport",
         "planes/openvswitch/openflow",
         "planes/openvswitch/multicast",
+        "planes/openvswitch/beacons",
     ],
     "planes/openvswitch/reading": COMPILER_OF_STATE,
     "planes/openvswitch/counting": COMPILER_OF_STATE,
@@ -111,6 +120,7 @@ BELOW: Dict[str, List[str]] = {
         "planes/openvswitch/transport",
         "planes/openvswitch/openflow",
         "planes/openvswitch/multicast",
+        "planes/openvswitch/beacons",
         "planes/openvswitch/compile",
     ],
     "planes/openvswitch/caller": CALLER,

@@ -30,15 +30,21 @@ Link link_by_device(Link link, std::string const &device, NetworkDevices const &
 
 bool is_same(Link const &one, Link const &other) {
   return one.carrier == other.carrier && one.driver == other.driver && one.speed == other.speed &&
-         one.full_duplex == other.full_duplex && one.partner == other.partner;
+         one.full_duplex == other.full_duplex && one.partner == other.partner &&
+         one.beacons == other.beacons;
 }
 
-// Nothing for an uplink in no group, or while nobody knows.
-std::optional<bool> find_partner(storage::Transaction &transaction, storage::Uplink const &uplink,
-                                 openflow::Port device, IsLive const &is_live) {
+Heard heard_by(storage::Transaction &transaction, storage::Uplink const &uplink,
+               openflow::Port device, HeardAt const &heard_at) {
   auto const port = uplink.port ? storage::find_port(transaction, *uplink.port) : std::nullopt;
-  return port && storage::is_in_lag(transaction, uplink.name) ? is_live(port->switch_key, device)
-                                                              : std::nullopt;
+  if (!port) {
+    return {};
+  }
+  auto heard = heard_at(port->switch_key, device);
+  if (!storage::is_in_lag(transaction, uplink.name)) {
+    heard.partner.reset();
+  }
+  return heard;
 }
 
 struct Changed {
@@ -47,14 +53,15 @@ struct Changed {
 };
 
 std::vector<Changed> changed_links(storage::Transaction &transaction, NetworkDevices const &devices,
-                                   IsLive const &is_live) {
+                                   HeardAt const &heard_at) {
   std::vector<Changed> changed;
   for (auto const &uplink : storage::all_uplinks(transaction)) {
     if (auto const device = storage::device_of(transaction, uplink.name)) {
       auto const known = storage::find_link(transaction, uplink.name).value_or(Link{});
       auto link = link_by_device(known, device->name, devices);
-      link.partner =
-          find_partner(transaction, uplink, device->number, is_live).value_or(known.partner);
+      auto const heard = heard_by(transaction, uplink, device->number, heard_at);
+      link.partner = heard.partner.value_or(known.partner);
+      link.beacons = heard.beacons.value_or(known.beacons);
       if (!is_same(link, known)) {
         changed.push_back({.uplink = uplink.name, .link = link});
       }
@@ -96,13 +103,13 @@ void switch_devices(storage::Transaction &transaction, NetworkDevices const &dev
 }
 
 bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices,
-                  IsLive const &is_live) {
-  return !changed_links(transaction, devices, is_live).empty();
+                  HeardAt const &heard_at) {
+  return !changed_links(transaction, devices, heard_at).empty();
 }
 
 void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices,
-               IsLive const &is_live) {
-  for (auto const &[uplink, link] : changed_links(transaction, devices, is_live)) {
+               HeardAt const &heard_at) {
+  for (auto const &[uplink, link] : changed_links(transaction, devices, heard_at)) {
     teaming::set_link(transaction, uplink, link);
   }
 }

@@ -17,15 +17,18 @@ namespace simhost::daemon {
 /// switched is told.
 void switch_devices(storage::Transaction &transaction, NetworkDevices const &devices,
                     std::function<void(std::string const &)> const &say);
-/// Whether frames may go out at a port of the bridge of a switch: in a group, whether it has a
-/// partner. Nothing while nobody knows.
-using IsLive = std::function<std::optional<bool>(storage::SwitchKey key, openflow::Port port)>;
+/// What is known of an uplink besides its device; nothing while nobody knows.
+struct Heard {
+  std::optional<bool> partner;  ///< if it is in a group
+  std::optional<bool> beacons;  ///< those of other uplinks arrive
+};
+using HeardAt = std::function<Heard(storage::SwitchKey key, openflow::Port port)>;
 
 /// Whether a link in the state is not as its device is.
 bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices,
-                  IsLive const &is_live);
+                  HeardAt const &heard_at);
 /// Puts them right, and lets the teams follow.
 void put_links(storage::ChangingTransaction &transaction, NetworkDevices const &devices,
-               IsLive const &is_live);
+               HeardAt const &heard_at);
 
 }  // namespace simhost::daemon

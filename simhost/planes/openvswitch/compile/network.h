@@ -180,6 +180,9 @@ struct Multicast {
 
 struct Network {
   bool disabled = false;
+  bool asks_for_beacons = false;  ///< some team does
+  /// The group to which this switch's beacons go; nothing while it sends none.
+  std::optional<EthernetAddress> beacons = std::nullopt;
   std::uint16_t mtu = 1500;  ///< bytes of a packet
   std::vector<PrivateVlan> private_vlans;
   std::vector<Uplink> uplinks;

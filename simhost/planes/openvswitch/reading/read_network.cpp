@@ -274,6 +274,8 @@ class Reader {
   }
 
   std::size_t add_team(VSTeamPolicy const &policy) {
+    network_.asks_for_beacons =
+        network_.asks_for_beacons || (policy.linkCriteria & TEAM_FRP_CRIT_BEACON_STATE) != 0;
     auto const usable = teaming::usable_slots(team_, policy);
     Team team{.balance = balance_of(policy),
               .in_use = {},

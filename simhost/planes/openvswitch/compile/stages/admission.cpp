@@ -1,4 +1,5 @@
 // What may come in at all.
+#include "planes/openvswitch/beacons/frame.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -28,6 +29,30 @@ void refuse_malformed(Program &program) {
     refuse(program, 880, Match().with(Field::eth_type, type), reserved);
   }
   refuse(program, 870, Match().vlan(kReservedVlan), reserved);
+}
+
+Match beacons_to(openflow::EthernetAddress const &group, openflow::Value mask) {
+  return Match()
+      .with(Field::eth_type, beacons::kEthernetType)
+      .with(Field::eth_dst, openflow::to_value(group), mask);
+}
+
+// This switch's own go up, where they come in from outside; no other beacon goes any further.
+void hear_beacons(Plan const &plan, Program &program) {
+  refuse(program, 890, beacons_to(beacons::kGroups, beacons::kGroupsMask),
+         cookie(Counted::reserved));
+  if (!plan.network.beacons) {
+    return;
+  }
+  auto const own = beacons_to(*plan.network.beacons, openflow::ones(48));
+  for (auto const &uplink : plan.network.uplinks) {
+    if (!uplink.blocked) {
+      program.add(table::kAdmission, {.priority = 895,
+                                      .match = Match(own).with(Field::in_port, uplink.port),
+                                      .actions = {openflow::ToController{}},
+                                      .cookie = cookie(Counted::port, uplink.number)});
+    }
+  }
 }
 
 void admit(Program &program, Port const &port) {
@@ -63,6 +88,7 @@ void compile_admission(Plan const &plan, Program &program) {
     refuse(program, 1000, Match(), cookie(Counted::disabled));
   }
   refuse_malformed(program);
+  hear_beacons(plan, program);
   for (auto const &port : plan.network.ports) {
     admit(program, port);
   }
