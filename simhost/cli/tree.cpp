@@ -126,25 +126,16 @@ std::string setting_line(std::string const &name, Json const &value) {
 using Names = std::set<std::string_view>;
 
 // What is no setting, and the settings that other lines tell.
-Names const kToldOfSwitches{"alias",
-                            "id",
-                            "portset",
-                            "max_ports",
-                            "persistent",
-                            "version",
-                            "running",
-                            "mtu",
-                            "uplink_ports",
-                            "uplinks",
-                            "lags",
-                            "teaming",
-                            "mac_learning",
-                            "ports",
-                            "addresses",
-                            "counters",
-                            "mirror_counters",
-                            "properties",
-                            "host_properties",
+Names const kToldOfSwitches{"alias",      "id",
+                            "portset",    "max_ports",
+                            "persistent", "version",
+                            "running",    "mtu",
+                            "fabric",     "uplink_ports",
+                            "uplinks",    "lags",
+                            "teaming",    "mac_learning",
+                            "ports",      "addresses",
+                            "counters",   "mirror_counters",
+                            "properties", "host_properties",
                             "observed"};
 Names const kToldOfPorts{"id",           "external_id", "teaming",         "uplink",
                          "addresses",    "groups",      "mirror_sessions", "counters",
@@ -203,6 +194,13 @@ Branch switch_branch(Json const &host_switch) {
   branches.push_back(
       {"uplinks " +
        (host_switch["uplinks"].empty() ? std::string("none") : joined(host_switch["uplinks"]))});
+  if (host_switch.contains("fabric")) {
+    auto const &fabric = host_switch["fabric"];
+    branches.push_back(
+        {fmt::format("{}: {} with the key {} to {}", fabric["uplink"].get<std::string>(),
+                     fabric["encapsulation"].get<std::string>(), fabric["key"].get<std::int64_t>(),
+                     fabric["peers"].empty() ? "nobody" : joined(fabric["peers"]))});
+  }
   for (auto const &lag : host_switch["lags"]) {
     branches.push_back(
         {fmt::format("group {} {}: {}", lag["name"].get<std::string>(),
@@ -255,6 +253,11 @@ std::string tree(std::string_view document) {
   branches.push_back({fmt::format("clock {} at {:.3f} s",
                                   host["clock"]["stopped"].get<bool>() ? "stopped" : "running",
                                   host["clock"]["now"].get<double>())});
+  if (host.contains("underlay")) {
+    auto const &underlay = host["underlay"];
+    branches.push_back({fmt::format("underlay {} at {}", underlay["address"].get<std::string>(),
+                                    underlay["device"].get<std::string>())});
+  }
   Branch uplinks{"uplinks"};
   for (auto const &uplink : host["uplinks"]) {
     uplinks.branches.push_back(uplink_branch(uplink));

@@ -16,10 +16,12 @@
 #include "scenario/keys.h"
 #include "scenario/members.h"
 #include "scenario/scenario.h"
+#include "scenario/scenario_fabric.h"
 #include "scenario/settings.h"
 #include "scenario/texts.h"
 #include "storage/running/devices.h"
 #include "storage/store.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::scenario {
 namespace {
@@ -60,6 +62,16 @@ Json uplink_to_json(Transaction &transaction, storage::Uplink const &uplink) {
     described[std::string(kObserved)] = std::move(observed);
   }
   return described;
+}
+
+// Those of fabrics are made with them.
+Json uplinks_to_json(Transaction &transaction) {
+  auto wires = storage::all_uplinks(transaction);
+  std::erase_if(wires, [&](auto const &uplink) {
+    return storage::fabric_of(transaction, uplink.name).has_value();
+  });
+  return each_to_json(
+      wires, [&](storage::Uplink const &uplink) { return uplink_to_json(transaction, uplink); });
 }
 
 // What the members of an object say.
@@ -205,6 +217,9 @@ Json switch_to_json(Transaction &transaction, storage::FoundSwitch const &known)
   auto const &key = known.key;
   auto const owner = PropertyOwner::global(key);
   auto described = object_to_json(kSwitchMembers, known.row);
+  if (auto const fabric = storage::fabric_of(transaction, key)) {
+    described[keys::fabric] = to_json(*fabric);
+  }
   described[keys::uplink_ports] = uplink_ports_to_json(transaction, key);
   described[keys::uplinks] = each_to_json(storage::uplinks_of(transaction, key),
                                           [](auto const &uplink) { return uplink.name; });
@@ -249,9 +264,10 @@ Json runtime_options_to_json(Transaction &transaction) {
 
 Json host_to_json(Transaction &transaction) {
   Json host{{keys::clock, object_to_json(kClockMembers, clock_members(transaction))}};
-  host[keys::uplinks] = each_to_json(
-      storage::all_uplinks(transaction),
-      [&](storage::Uplink const &uplink) { return uplink_to_json(transaction, uplink); });
+  if (auto const underlay = storage::underlay_of(transaction)) {
+    host[keys::underlay] = to_json(*underlay);
+  }
+  host[keys::uplinks] = uplinks_to_json(transaction);
   host[keys::runtime_options] = runtime_options_to_json(transaction);
   host[keys::mac_learning] =
       object_to_json(kGlobalLearningMembers, global_mac_learning(transaction));

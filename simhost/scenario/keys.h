@@ -13,12 +13,14 @@ inline constexpr std::string_view kObserved = "observed";
 namespace keys {
 
 inline constexpr char const *clock = "clock";
+inline constexpr char const *underlay = "underlay";
 inline constexpr char const *uplinks = "uplinks";
 inline constexpr char const *runtime_options = "runtime_options";
 inline constexpr char const *mac_learning = "mac_learning";
 inline constexpr char const *switches = "switches";
 inline constexpr char const *faults = "faults";
 inline constexpr char const *uplink_ports = "uplink_ports";
+inline constexpr char const *fabric = "fabric";
 inline constexpr char const *lags = "lags";
 inline constexpr char const *ports = "ports";
 inline constexpr char const *addresses = "addresses";
@@ -32,11 +34,11 @@ inline constexpr char const *host_properties = "host_properties";
 }  // namespace keys
 
 /// What a document and its larger objects consist of, beside their own members and settings.
-inline constexpr auto kDocumentParts =
-    std::to_array<std::string_view>({keys::clock, keys::uplinks, keys::runtime_options,
-                                     keys::mac_learning, keys::switches, keys::faults, kObserved});
+inline constexpr auto kDocumentParts = std::to_array<std::string_view>(
+    {keys::clock, keys::underlay, keys::uplinks, keys::runtime_options, keys::mac_learning,
+     keys::switches, keys::faults, kObserved});
 inline constexpr auto kSwitchParts = std::to_array<std::string_view>(
-    {keys::uplink_ports, keys::uplinks, keys::lags, keys::addresses, keys::counters,
+    {keys::fabric, keys::uplink_ports, keys::uplinks, keys::lags, keys::addresses, keys::counters,
      keys::mirror_counters, keys::properties, keys::host_properties, keys::ports, kObserved});
 inline constexpr auto kPortParts = std::to_array<std::string_view>(
     {keys::device, keys::addresses, keys::groups, keys::counters, keys::properties, kObserved});

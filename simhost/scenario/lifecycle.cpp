@@ -10,6 +10,7 @@
 #include "storage/shared.h"
 #include "storage/store.h"
 #include "storage/switches.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::scenario {
 
@@ -26,6 +27,7 @@ void empty_host(storage::ChangingTransaction &transaction) {
     }
   }
   storage::remove_uplinks(transaction);
+  storage::remove_underlay(transaction);
   storage::restart_numbering(transaction);
   storage::remove_host_settings(transaction);
   clear_faults(transaction, "");

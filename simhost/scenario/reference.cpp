@@ -5,6 +5,7 @@
 #include "model/options/runtime_options.h"
 #include "model/properties/longest_key.h"
 #include "model/properties/registry.h"
+#include "scenario/fabric_members.h"
 #include "scenario/forms.h"
 #include "scenario/keys.h"
 #include "scenario/members.h"
@@ -111,11 +112,13 @@ Json objects_to_json() {
   McastGroup const group{};
   FaultMembers const fault;
   return {{keys::clock, object_to_json<ClockMembers>(kClockMembers, nullptr)},
+          {keys::underlay, object_to_json<UnderlayMembers>(kUnderlayMembers, nullptr)},
           {keys::uplinks, object_to_json(kLinkMembers, &link)},
           {keys::mac_learning, object_to_json(kGlobalLearningMembers, &kGlobalLearning)},
           {keys::switches, object_to_json(kSwitchMembers, &made)},
           {keys::ports, object_to_json(kPortMembers, &port)},
           {keys::uplink_ports, object_to_json(kUplinkPortMembers, &uplink_port)},
+          {keys::fabric, object_to_json<FabricSpec>(kFabricMembers, nullptr)},
           {keys::lags, object_to_json<LagMembers>(kLagMembers, nullptr)},
           {keys::addresses, object_to_json(kAddressMembers, &address)},
           {keys::groups, object_to_json(kGroupMembers, &group)},

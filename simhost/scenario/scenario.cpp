@@ -15,6 +15,7 @@
 #include "qexapi/names.h"
 #include "scenario/members.h"
 #include "scenario/reading.h"
+#include "scenario/scenario_fabric.h"
 #include "scenario/scenario_switches.h"
 #include "storage/shared.h"
 #include "storage/store.h"
@@ -129,6 +130,8 @@ void apply_if(ChangingTransaction &transaction, std::string_view document,
   Node const node(json);
   node.only(kDocumentParts);
   if_there(node, keys::clock, [&](Node const &clock) { apply_clock(transaction, clock); });
+  if_there(node, keys::underlay,
+           [&](Node const &underlay) { apply_underlay(transaction, underlay); });
   for_each_in(node, keys::uplinks, [&](Node const &item) { apply_uplink(transaction, item); });
   if_there(node, keys::runtime_options, [&](Node const &options) {
     for_each_member(options, [&](std::string const &name, Node const &value) {

@@ -12,6 +12,7 @@
 
 #include "model/counters/counters.h"
 #include "model/devices/devices.h"
+#include "model/fabric/fabric.h"
 #include "model/lookup.h"
 #include "model/plane.h"
 #include "model/ports/ports.h"
@@ -21,6 +22,7 @@
 #include "scenario/keys.h"
 #include "scenario/members.h"
 #include "scenario/reading.h"
+#include "scenario/scenario_fabric.h"
 #include "scenario/settings.h"
 #include "storage/store.h"
 
@@ -224,9 +226,12 @@ void apply_switch(ChangingTransaction &transaction, Node const &node) {
             keys::host_properties);
   // Before ports of either kind: their VLANs may be in the switch's private VLANs.
   apply_named(transaction, owner, SettingOwner::of_switch, node);
+  // Its uplink may be named among those of ports.
+  if_there(node, keys::fabric, [&](Node const &fabric) { apply_fabric(transaction, key, fabric); });
   for_each_in(node, keys::uplink_ports,
               [&](Node const &item) { apply_uplink_port(transaction, key, item); });
   attach_uplinks(transaction, key, node);
+  if_there(node, keys::fabric, [&](Node const &) { attach_fabric(transaction, key); });
   for_each_in(node, keys::lags, [&](Node const &item) { apply_lag(transaction, key, item); });
   for_each_in(node, keys::ports, [&](Node const &item) { apply_port(transaction, key, item); });
   apply_addresses(transaction, {.switch_key = key, .port = std::nullopt}, node);

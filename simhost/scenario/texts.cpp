@@ -8,6 +8,8 @@
 #include <charconv>
 #include <iterator>
 
+#include "base/ip_text.h"
+
 namespace simhost::scenario {
 namespace {
 
@@ -85,10 +87,7 @@ std::string address_text(std::span<std::byte const> address) {
   if (address.size() == kMacBytes) {
     return mac_text(address.first<kMacBytes>());
   }
-  std::array<char, INET6_ADDRSTRLEN> text{};
-  inet_ntop(address.size() == sizeof(in_addr) ? AF_INET : AF_INET6, address.data(), text.data(),
-            text.size());
-  return text.data();
+  return ip_text(address);
 }
 
 std::optional<std::vector<std::byte>> bytes_from_hex(std::string_view text) {

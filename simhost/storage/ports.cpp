@@ -150,7 +150,9 @@ void add_uplink(ChangingTransaction &transaction, std::string_view name) {
 }
 
 std::vector<std::string> free_uplinks(Transaction &transaction) {
-  Query select(transaction, "SELECT name FROM uplink WHERE port IS NULL ORDER BY position");
+  Query select(transaction,
+               "SELECT name FROM uplink WHERE port IS NULL"
+               " AND name NOT IN (SELECT uplink FROM fabric) ORDER BY position");
   return select.all(name_at);
 }
 

@@ -75,7 +75,7 @@ std::vector<Uplink> all_uplinks(Transaction &transaction);
 void add_uplink(ChangingTransaction &transaction, std::string_view name);
 /// Removes all uplinks from the host.
 void remove_uplinks(ChangingTransaction &transaction);
-/// The free uplinks of the host, in the order in which they were added.
+/// The free uplinks of the host that are wires, in the order in which they were added.
 std::vector<std::string> free_uplinks(Transaction &transaction);
 /// Puts an uplink at an uplink port.
 void attach_uplink(ChangingTransaction &transaction, std::string_view name, PortNumber port);

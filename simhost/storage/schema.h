@@ -9,7 +9,7 @@ namespace simhost::storage {
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables, by a step of state_format.cpp that brings a file of the
 /// version before forward.
-inline constexpr std::int64_t kSchemaVersion = 10;
+inline constexpr std::int64_t kSchemaVersion = 11;
 /// The version that the first of those steps begins with; what is older is refused.
 inline constexpr std::int64_t kOldestSchema = 3;
 
@@ -31,5 +31,7 @@ extern char const *const kSeenSchema;
 extern char const *const kSharedSchema;
 /// Adds to groups what they agree on with their partners.
 extern char const *const kLacpSchema;
+/// Likewise those of what joins it to other hosts.
+extern char const *const kFabricSchema;
 
 }  // namespace simhost::storage

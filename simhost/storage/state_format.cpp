@@ -18,7 +18,7 @@ namespace {
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
     kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema,
-    kSeenSchema,       kSharedSchema, kLacpSchema};
+    kSeenSchema,       kSharedSchema, kLacpSchema,    kFabricSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -117,6 +117,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kSeenSchema);
   database.exec(kSharedSchema);
   database.exec(kLacpSchema);
+  database.exec(kFabricSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

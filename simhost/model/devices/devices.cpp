@@ -40,6 +40,9 @@ std::string text_of(storage::Transaction &transaction, storage::DeviceHolder con
   if (holder.uplink) {
     return fmt::format("the uplink '{}'", *holder.uplink);
   }
+  if (!holder.port) {
+    return "the underlay";
+  }
   auto const port = storage::get_port_row(transaction, *holder.port);
   return fmt::format("the port '{}' of the switch '{}'", port.identifier,
                      storage::get_switch_row(transaction, port.switch_key).row.alias);
@@ -58,9 +61,7 @@ void check(storage::Transaction &transaction, std::string_view name,
            storage::DeviceHolder const &wanting) {
   check_name(name);
   check_free(transaction, name, wanting);
-  if (clock_is_stopped(transaction)) {
-    throw Refused(QEX_NOT_SUPPORTED, "the clock stands, and frames go by real time");
-  }
+  require_real_time(transaction);
   running_plane().check_device(transaction, name);
 }
 
@@ -70,6 +71,12 @@ void require_number(bool found) {
   }
 }
 
+[[noreturn]] void refuse_tunnels(std::string_view uplink) {
+  throw Refused(
+      QEX_NOT_SUPPORTED,
+      fmt::format("the uplink '{}' is tunnels: what comes over it cannot be set", uplink));
+}
+
 [[noreturn]] void refuse_wires(std::string_view owner, std::string_view device) {
   throw Refused(
       QEX_NOT_SUPPORTED,
@@ -77,6 +84,16 @@ void require_number(bool found) {
 }
 
 }  // namespace
+
+void require_real_time(storage::Transaction &transaction) {
+  if (clock_is_stopped(transaction)) {
+    throw Refused(QEX_NOT_SUPPORTED, "the clock stands, and frames go by real time");
+  }
+}
+
+void check_underlay_device(storage::Transaction &transaction, std::string_view device) {
+  check(transaction, device, {.uplink = std::nullopt, .port = std::nullopt});
+}
 
 void connect(storage::ChangingTransaction &transaction, storage::Port const &port,
              std::string_view device, std::optional<storage::MacBytes> const &mac) {
@@ -99,6 +116,10 @@ void disconnect(storage::ChangingTransaction &transaction, storage::Port const &
 
 void connect(storage::ChangingTransaction &transaction, storage::Uplink const &uplink,
              std::string_view device) {
+  if (storage::fabric_of(transaction, uplink.name)) {
+    throw Refused(QEX_NOT_SUPPORTED,
+                  fmt::format("the uplink '{}' is tunnels, and has no device", uplink.name));
+  }
   check(transaction, device, {.uplink = uplink.name, .port = std::nullopt});
   require_number(storage::put_device(transaction, uplink.name, device));
 }
@@ -113,6 +134,9 @@ void disconnect(storage::ChangingTransaction &transaction, storage::Uplink const
 Wires &get_wires(storage::Transaction &transaction, std::string_view uplink) {
   if (auto const device = storage::device_of(transaction, uplink)) {
     refuse_wires(fmt::format("the uplink '{}'", uplink), device->name);
+  }
+  if (storage::fabric_of(transaction, uplink)) {
+    refuse_tunnels(uplink);
   }
   return get_wires();
 }
@@ -143,6 +167,10 @@ void stop_clock_without_devices(storage::ChangingTransaction &transaction) {
   if (auto const device = storage::first_device(transaction)) {
     throw Refused(QEX_NOT_SUPPORTED,
                   fmt::format("the frames of the device {} go by real time", *device));
+  }
+  if (auto const uplink = storage::first_fabric(transaction)) {
+    throw Refused(QEX_NOT_SUPPORTED,
+                  fmt::format("the frames of the tunnels '{}' go by real time", *uplink));
   }
   stop_clock(transaction);
 }

@@ -7,6 +7,7 @@
 #include "base/api.h"
 #include "model/plane.h"
 #include "storage/running/devices.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost {
 
@@ -25,8 +26,14 @@ SIMHOST_API void connect(storage::ChangingTransaction &transaction, storage::Upl
 SIMHOST_API void disconnect(storage::ChangingTransaction &transaction,
                             storage::Uplink const &uplink);
 
+/// The clock must run, for frames go by real time (QEX_NOT_SUPPORTED).
+void require_real_time(storage::Transaction &transaction);
+/// Refuses what connect() would refuse, of a device that is to carry tunnels.
+void check_underlay_device(storage::Transaction &transaction, std::string_view device);
+
 /// What stands in for the wires of an uplink, or of a place, which is the team's if any of the
-/// switch's uplinks has a device. Refuses, naming it, what has a device (QEX_NOT_SUPPORTED).
+/// switch's uplinks has a device. Refuses, naming it, what has a device or is tunnels
+/// (QEX_NOT_SUPPORTED).
 SIMHOST_API Wires &get_wires(storage::Transaction &transaction, std::string_view uplink);
 SIMHOST_API Wires &get_wires(storage::Transaction &transaction, Place const &place);
 /// Likewise of what counts; a mirror session may see the frames of any device of its switch.

@@ -14,6 +14,7 @@
 #include "qexapi/switch_ports.h"
 #include "storage/store.h"
 #include "storage/switches.h"
+#include "storage/tunnels/fabrics.h"
 #include "vswitch/teaming.h"
 #include "vswitch/uplinks.h"
 
@@ -268,6 +269,11 @@ void add_uplink_port(storage::ChangingTransaction &transaction, storage::SwitchK
     throw Refused(here ? QEX_EXISTS : QEX_BUSY,
                   fmt::format("the uplink '{}' is at {}", uplink,
                               here ? "this switch already" : "another switch"));
+  }
+  if (auto const fabric = storage::fabric_of(transaction, uplink);
+      fabric && fabric->switch_key != switch_key) {
+    throw Refused(QEX_BUSY,
+                  fmt::format("the uplink '{}' is the tunnels of another switch", uplink));
   }
   storage::attach_uplink(transaction, uplink, vacant_uplink_port(transaction, switch_key).number);
 }

@@ -8,6 +8,7 @@
 #include "model/lookup.h"
 #include "model/plane.h"
 #include "storage/store.h"
+#include "storage/tunnels/fabrics.h"
 #include "vswitch/lags.h"
 
 namespace simhost {
@@ -56,6 +57,9 @@ void put_lag(storage::ChangingTransaction &transaction, storage::SwitchKey key,
     get_uplink(transaction, key, uplink);
     if (storage::is_in_lag(transaction, uplink)) {
       throw Refused(QEX_BUSY);
+    }
+    if (storage::fabric_of(transaction, uplink)) {
+      throw Refused(QEX_NOT_SUPPORTED, "tunnels are aggregated with nothing");
     }
     storage::add_to_lag(transaction, *lag, uplink);
   }

@@ -32,11 +32,11 @@ Device device_at(Query const &row) {
 std::optional<std::int64_t> next_number(Transaction &transaction) {
   Query select(transaction,
                "SELECT ifnull(max(number), 0) + 1 FROM device"
-               " HAVING ifnull(max(number), 0) < 65279"
+               " HAVING ifnull(max(number), 0) < 65215"
                " UNION ALL SELECT * FROM (SELECT here.number + 1 FROM"
                " (SELECT 0 AS number UNION ALL SELECT number FROM device) AS here"
                " WHERE NOT EXISTS (SELECT 1 FROM device WHERE number = here.number + 1)"
-               " AND here.number < 65279 ORDER BY here.number LIMIT 1) LIMIT 1");
+               " AND here.number < 65215 ORDER BY here.number LIMIT 1) LIMIT 1");
   return select.first([](Query const &row) { return row.integer(0); });
 }
 
@@ -70,12 +70,14 @@ bool has_port_device(Transaction &transaction, SwitchKey key) {
 }
 
 std::optional<DeviceHolder> find_device(Transaction &transaction, std::string_view name) {
-  Query select(transaction, "SELECT uplink, port FROM device WHERE name = ?");
+  Query select(transaction,
+               "SELECT uplink, port FROM device WHERE name = ?1"
+               " UNION ALL SELECT NULL, NULL FROM underlay WHERE device = ?1");
   return select.with(name).first([](Query const &row) {
     DeviceHolder holder;
-    if (row.is_null(1)) {
+    if (!row.is_null(0)) {
       holder.uplink = row.name(0);
-    } else {
+    } else if (!row.is_null(1)) {
       holder.port = number_at(row, 1);
     }
     return holder;

@@ -18,7 +18,7 @@ using MacBytes = std::array<std::byte, 6>;
 /// Of an uplink or of a port that is no uplink port.
 struct Device {
   std::string name;
-  /// By which the data path knows it: unique on the host, 1 to 65,279; kept while the device stays.
+  /// By which the data path knows it: unique on the host, 1 to 65,215; kept while the device stays.
   std::uint16_t number = 0;
   /// The address of the client that a port reaches through it, if it is known.
   std::optional<MacBytes> mac = std::nullopt;
@@ -26,7 +26,7 @@ struct Device {
   bool operator==(Device const &) const = default;
 };
 
-/// What has a device: an uplink or a port.
+/// What has a device: an uplink, a port, or else the underlay.
 struct DeviceHolder {
   std::optional<std::string> uplink;
   std::optional<PortNumber> port;
