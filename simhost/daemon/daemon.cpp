@@ -88,7 +88,9 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
                       .changed = [this] { sync_soon(); }}),
       members_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
                       .changed = [this] { follow_members(); }}),
-      counting_(store_) {
+      counting_(store_),
+      underlay_(loop, options_.database.parent_path(),
+                [this](std::string const &why) { troubles_.add(why); }) {
   storage::ChangingTransaction transaction(store_);
   storage::take_frames(transaction);
   transaction.commit();
@@ -372,8 +374,19 @@ void Daemon::sync() {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
   announcer_.follow(all, memory_);
+  follow_tunnels(all);
   settle(all);
   counting_.save_new();
+}
+
+void Daemon::follow_tunnels(Wanted const &wanted) {
+  devices_.refresh();
+  auto const is_at_bridge = [&](std::string const &device) {
+    return options_.datapath == "system" || bridges_->elsewhere(device).has_value();
+  };
+  for (auto const &why : underlay_.follow(wanted, devices_, is_at_bridge)) {
+    troubles_.add(why);
+  }
 }
 
 // From a timer, too, so that nothing is thrown.

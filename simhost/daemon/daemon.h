@@ -21,6 +21,7 @@
 #include "daemon/server.h"
 #include "daemon/state_watch.h"
 #include "daemon/troubles.h"
+#include "daemon/underlay/underlay.h"
 #include "events/loop.h"
 #include "storage/store.h"
 
@@ -63,6 +64,8 @@ class Daemon {
   void forget_cached_flows();
   void follow_devices();
   void take_out_new_devices(Wanted const &wanted);
+  // The way of the machine to the hosts beyond tunnels, and what is wrong with it.
+  void follow_tunnels(Wanted const &wanted);
   void settle(Wanted const &wanted);
   void reply_to_waiting();
 
@@ -102,6 +105,7 @@ class Daemon {
   Counting counting_;
   LoadBalance load_balance_;
   unsigned counts_ = 0;  // since the load was looked at
+  Underlay underlay_;
   Compiler compiler_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;

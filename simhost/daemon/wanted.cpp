@@ -7,6 +7,7 @@
 #include <span>
 #include <utility>
 
+#include "base/ip_text.h"
 #include "base/outcomes.h"
 #include "model/options/runtime_options.h"
 #include "model/properties/properties.h"
@@ -25,6 +26,11 @@
 namespace simhost::daemon {
 namespace {
 
+// As a bridge's, but for its last four digits, which are its own.
+std::string tunnel_name(std::string const &bridge, std::uint16_t number) {
+  return fmt::format("vt{}{:02x}", bridge.substr(2, 10), number & 0xFFU);
+}
+
 void add_devices(storage::Transaction &transaction, std::span<storage::PortDevice const> connected,
                  WantedBridge &bridge) {
   for (auto const &[port, device] : connected) {
@@ -41,7 +47,7 @@ void add_devices(storage::Transaction &transaction, std::span<storage::PortDevic
 }
 
 // An address that no device has, the same as long as the bridge is.
-std::string system_of(std::string_view bridge) {
+std::string own_address(std::string_view bridge) {
   auto const hash = fingerprint(bridge);
   return fmt::format("02:{:02x}:{:02x}:{:02x}:{:02x}:{:02x}", hash >> 32U & 0xffU,
                      hash >> 24U & 0xffU, hash >> 16U & 0xffU, hash >> 8U & 0xffU, hash & 0xffU);
@@ -52,7 +58,7 @@ void add_lags(storage::Transaction &transaction, WantedBridge &bridge) {
   for (auto const &lag : storage::all_lags(transaction, bridge.key)) {
     auto const id = static_cast<std::uint32_t>(lag.id);
     openvswitch::LagRow row{.devices = {},
-                            .system = system_of(bridge.row.name),
+                            .system = own_address(bridge.row.name),
                             .key = static_cast<std::uint16_t>((id - 1) % kKeys + 1),
                             .is_fast = lag.is_fast};
     for (auto const &uplink : lag.uplinks) {
@@ -66,14 +72,58 @@ void add_lags(storage::Transaction &transaction, WantedBridge &bridge) {
   }
 }
 
+void add_tunnels(storage::Transaction &transaction, WantedBridge &bridge) {
+  bridge.fabric = storage::fabric_of(transaction, bridge.key);
+  auto const uplink =
+      bridge.fabric ? storage::find_uplink(transaction, bridge.fabric->uplink) : std::nullopt;
+  if (!uplink || !uplink->port) {
+    return;
+  }
+  auto const underlay = storage::underlay_of(transaction);
+  bool const is_vxlan = bridge.fabric->encapsulation == storage::Encapsulation::vxlan;
+  for (auto const &tunnel : bridge.fabric->tunnels) {
+    openvswitch::TunnelRow row{.number = tunnel.number,
+                               .type = is_vxlan ? "vxlan" : "geneve",
+                               .options = {{"remote_ip", ip_text(tunnel.peer)},
+                                           {"key", std::to_string(bridge.fabric->key)}}};
+    if (underlay && underlay->address.size() == tunnel.peer.size()) {
+      row.options.emplace("local_ip", ip_text(underlay->address));
+    }
+    bridge.row.tunnels.emplace(tunnel_name(bridge.row.name, tunnel.number), std::move(row));
+    bridge.numbers.emplace(tunnel.number, static_cast<std::uint32_t>(*uplink->port));
+  }
+}
+
+std::optional<WantedUnderlay> wanted_underlay(storage::Transaction &transaction,
+                                              std::string_view host, std::string const &datapath,
+                                              IsThere const &is_there) {
+  auto const underlay = storage::underlay_of(transaction);
+  if (!underlay || !is_there(underlay->device)) {
+    return std::nullopt;
+  }
+  // One with another address is another one, so that none is left over.
+  auto const what = fmt::format(
+      "{}/{}/{}/{}/{}", host, underlay->device, ip_text(underlay->address), underlay->prefix,
+      underlay->gateway.empty() ? std::string() : ip_text(underlay->gateway));
+  constexpr std::uint16_t kItsDevice = 1;
+  auto const name = fmt::format("vu{:012x}", fingerprint(what) >> 16U);
+  // Frames for the device itself the kernel would take for its own.
+  return WantedUnderlay{.row = {.name = name,
+                                .datapath = datapath,
+                                .devices = {{underlay->device, kItsDevice}},
+                                .is_underlay = true,
+                                .address = own_address(name)},
+                        .address = *underlay};
+}
+
 teaming::Team team_with_devices(storage::Transaction &transaction, storage::SwitchKey key) {
-  return teaming::team_of(
-      transaction, key, [](storage::Transaction &from, std::string_view uplink) {
-        auto link = storage::find_link(from, uplink).value_or(storage::Link{});
-        // Whatever stands in for its wires, no frame comes or goes.
-        link.carrier = link.carrier && storage::device_of(from, uplink).has_value();
-        return link;
-      });
+  return teaming::team_of(transaction, key,
+                          [](storage::Transaction &from, std::string_view uplink) {
+                            auto link = storage::find_link(from, uplink).value_or(storage::Link{});
+                            // Whatever stands in for its wires, no frame comes or goes.
+                            link.carrier = link.carrier && storage::carries_frames(from, uplink);
+                            return link;
+                          });
 }
 
 bool notifies(VSTeamPolicy const &policy) {
@@ -154,6 +204,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       static_cast<std::uint32_t>(runtime_number(transaction, VS_RT_OPT_MAX_RARPS_PER_INTERVAL));
   wanted.announced_for =
       std::chrono::seconds(runtime_number(transaction, VS_RT_OPT_RARP_ADVERTISEMENT_DURATION));
+  wanted.underlay = wanted_underlay(transaction, host, datapath, is_there);
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     WantedBridge bridge{.key = key,
                         .alias = row.alias,
@@ -166,6 +217,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
     auto const connected = storage::port_devices(transaction, key);
     add_devices(transaction, connected, bridge);
     add_lags(transaction, bridge);
+    add_tunnels(transaction, bridge);
     if (!row.associated || bridge.row.devices.empty()) {
       continue;
     }
@@ -178,6 +230,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       add_carried(transaction, network, team.policy, bridge);
       bridge.sessions = sessions_of(network);
       bridge.aging = std::chrono::seconds(network.addresses.aging);
+      bridge.mtu = network.mtu;
       std::erase_if(bridge.row.devices,
                     [&](auto const &device) { return !is_there(device.first); });
       bridge.row.limits = {{openvswitch::table::kLearnedAddresses, flows->rows.most_learned}};

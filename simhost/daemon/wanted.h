@@ -16,6 +16,7 @@
 #include "planes/openvswitch/compile/announcement.h"
 #include "planes/openvswitch/rows/rows.h"
 #include "storage/ports.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::daemon {
 
@@ -40,6 +41,8 @@ struct WantedBridge {
   std::chrono::seconds aging;  ///< of what is learned
   Flows flows;                 ///< but for the marker of the change
   std::vector<Carried> carried = {};
+  std::optional<storage::Fabric> fabric = std::nullopt;
+  std::uint16_t mtu = 0;
   /// The host was restarted, and has counted nothing since: what is learned is not to be known.
   bool forgets = false;
 };
@@ -52,9 +55,16 @@ struct Unfit {
   std::string why;
 };
 
+/// The bridge that carries tunnels.
+struct WantedUnderlay {
+  openvswitch::BridgeRow row;
+  storage::Underlay address;  ///< of the machine there
+};
+
 struct Wanted {
   std::uint64_t change = 0;
   std::vector<WantedBridge> bridges;
+  std::optional<WantedUnderlay> underlay = std::nullopt;
   std::vector<Unfit> unfit;
   std::uint32_t most_tags = 0;
   /// How many moves of a switch are announced in a second, and for how long one is tried.

@@ -20,7 +20,12 @@ std::vector<BridgeRow> wanted_rows(Wanted const &wanted, PresentRows const &pres
   std::vector<BridgeRow> rows;
   for (auto const &bridge : wanted.bridges) {
     rows.push_back(bridge.row);
-    std::erase_if(rows.back().devices,
+  }
+  if (wanted.underlay) {
+    rows.push_back(wanted.underlay->row);
+  }
+  for (auto &row : rows) {
+    std::erase_if(row.devices,
                   [&](auto const &device) { return present.elsewhere.contains(device.first); });
   }
   for (auto const &bridge : present.bridges) {

@@ -24,7 +24,8 @@ void add_device(openflow::PortStatistics const &statistics, std::uint32_t number
                 openvswitch::Totals &totals) {
   auto const add = [&](Counted kind, std::uint64_t frames) {
     if (frames != std::numeric_limits<std::uint64_t>::max()) {
-      totals[openvswitch::cookie(kind, number)].packets = frames;
+      // An uplink may be several tunnels.
+      totals[openvswitch::cookie(kind, number)].packets += frames;
     }
   };
   // Among those that it dropped on their way in, a device of Linux has all frames that were for

@@ -56,6 +56,20 @@ struct QuestionForAll {
   std::uint32_t filter = RTEXT_FILTER_SKIP_STATS;
 };
 
+void set_flag(std::string_view name, unsigned flag, bool is_set) {
+  auto const socket = any_socket();
+  auto request = request_for(name);
+  if (ioctl(socket.number(), SIOCGIFFLAGS, &request) != 0) {
+    events::fail_with_errno(std::string(name));
+  }
+  auto const flags = static_cast<unsigned short>(request.ifr_flags);
+  auto const wanted = static_cast<unsigned short>(is_set ? flags | flag : flags & ~flag);
+  request.ifr_flags = static_cast<short>(wanted);
+  if (flags != wanted && ioctl(socket.number(), SIOCSIFFLAGS, &request) != 0) {
+    events::fail_with_errno(std::string(name));
+  }
+}
+
 void wait_to_receive(Descriptor const &socket) {
   pollfd polled{.fd = socket.number(), .events = POLLIN, .revents = 0};
   poll(&polled, 1, -1);
@@ -256,17 +270,11 @@ void set_network_device_mtu(std::string_view name, std::uint32_t bytes) {
 }
 
 void switch_network_device(std::string_view name, bool up) {
-  auto const socket = any_socket();
-  auto request = request_for(name);
-  if (ioctl(socket.number(), SIOCGIFFLAGS, &request) != 0) {
-    events::fail_with_errno(std::string(name));
-  }
-  auto const flags = static_cast<unsigned short>(request.ifr_flags);
-  auto const wanted = static_cast<unsigned short>(up ? flags | IFF_UP : flags & ~IFF_UP);
-  request.ifr_flags = static_cast<short>(wanted);
-  if (flags != wanted && ioctl(socket.number(), SIOCSIFFLAGS, &request) != 0) {
-    events::fail_with_errno(std::string(name));
-  }
+  set_flag(name, IFF_UP, up);
+}
+
+void let_resolve(std::string_view name, bool resolves) {
+  set_flag(name, IFF_NOARP, !resolves);
 }
 
 }  // namespace simhost::daemon

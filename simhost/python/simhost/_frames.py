@@ -149,12 +149,14 @@ class Wire:
 class Cabling:
     """The wires of a host; each has a device of its own there."""
 
+    # A pair whose ends have one index tells late that the link is lost; a namespace may be at the
+    # ends of several hosts' wires.
+    _indexes = itertools.count(1000)
+
     def __init__(self, namespace: Namespace) -> None:
         self.namespace = namespace
         self._clients = itertools.count(1)
         self._uplinks = itertools.count()
-        # A pair whose ends have one index tells late that the link is lost.
-        self._indexes = itertools.count(1000)
 
     def to_client(self, far: Namespace) -> Wire:
         return self.lay(f"c{next(self._clients)}", far, _DEVICE)

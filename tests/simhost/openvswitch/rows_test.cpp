@@ -57,6 +57,7 @@ Schema schema() {
            {{"name", single},
             {"ofport_request", optional},
             {"type", single},
+            {"options", map},
             {"ingress_policing_rate", number},
             {"other_config", map}}},
           {"Flow_Table", {{"flow_limit", optional}}}};
@@ -139,6 +140,51 @@ TEST(TheRows, ChangeInPlace) {
   auto limited = vs1();
   limited.limits[32] = 7;
   EXPECT_THAT(told(present, {limited}), ElementsAre("insert Flow_Table", "update Bridge"));
+}
+
+// As they are once those operations are done, with the identifiers t1, u and u0.
+Replica replica_with_tunnels() {
+  auto made = replica();
+  made.apply(Json::parse(R"json({
+    "Bridge": {
+      "b1": {"modify": {"ports": ["uuid", "t1"]}},
+      "u": {"initial": {"name": "vu1", "datapath_type": "netdev", "ports": ["uuid", "u0"],
+                        "external_ids": ["map", [["simhost", "/h.db"],
+                                                 ["simhost-role", "underlay"]]],
+                        "fail_mode": "standalone",
+                        "other_config": ["map", [["disable-in-band", "true"],
+                                                 ["hwaddr", "02:00:00:00:00:01"]]]}}},
+    "Port": {
+      "t1": {"initial": {"name": "vt1", "interfaces": ["uuid", "it1"]}},
+      "u0": {"initial": {"name": "vu1", "interfaces": ["uuid", "iu0"]}}},
+    "Interface": {
+      "it1": {"initial": {"name": "vt1", "ofport_request": 65216, "type": "vxlan",
+                          "options": ["map", [["key", "5"], ["remote_ip", "192.0.2.2"]]]}},
+      "iu0": {"initial": {"name": "vu1"}}}
+  })json"));
+  return made;
+}
+
+TEST(TheRows, OfTunnelsAndTheirUnderlayAreAddedAndThenLeftAlone) {
+  auto tunnelled = vs1();
+  tunnelled.tunnels["vt1"] = {
+      .number = 65216, .type = "vxlan", .options = {{"remote_ip", "192.0.2.2"}, {"key", "5"}}};
+  BridgeRow const underlay{
+      .name = "vu1", .datapath = "netdev", .is_underlay = true, .address = "02:00:00:00:00:01"};
+  Rows const wanted{tunnelled, underlay};
+  auto const all = operations(present_rows(replica(), kHost), wanted, kHost, kOwner, 2);
+  EXPECT_EQ(all[0]["row"], Json::parse(R"json({
+    "name": "vt1", "type": "vxlan", "ofport_request": 65216,
+    "options": ["map", [["key", "5"], ["remote_ip", "192.0.2.2"]]]})json"));
+  EXPECT_EQ(all[5]["row"]["fail_mode"], Json::parse(R"(["set", ["standalone"]])"));
+  EXPECT_EQ(
+      operations(present_rows(replica_with_tunnels(), kHost), wanted, kHost, kOwner, 2).dump(),
+      "[]");
+  // Another key is another tunnel.
+  auto other = wanted;
+  other[0].tunnels["vt1"].options["key"] = "6";
+  EXPECT_THAT(told(present_rows(replica_with_tunnels(), kHost), other),
+              ElementsAre("insert Interface", "insert Port", "mutate Bridge"));
 }
 
 TEST(TheRows, SayWhichDevicesAreOthersOrOpenVswitchsOwn) {

@@ -24,6 +24,7 @@
 #include "storage/running/frames.h"
 #include "storage/running/remembered.h"
 #include "storage/store.h"
+#include "storage/tunnels/fabrics.h"
 #include "vswitch/mcast_filters.h"
 
 namespace simhost::openvswitch {
@@ -158,7 +159,7 @@ bool goes_by_load(storage::Transaction &transaction, storage::Port const &port) 
 bool has_uplink_device(storage::Transaction &transaction, storage::SwitchKey key) {
   auto const uplinks = storage::uplinks_of(transaction, key);
   return std::ranges::any_of(uplinks, [&](auto const &uplink) {
-    return storage::device_of(transaction, uplink.name).has_value();
+    return storage::carries_frames(transaction, uplink.name);
   });
 }
 
@@ -215,7 +216,7 @@ bool OpenVswitchPlane::has_frames(storage::Transaction &transaction, Place const
   }
   if (place.port) {
     auto const uplink = storage::uplink_at(transaction, *place.port);
-    return uplink ? storage::device_of(transaction, *uplink).has_value()
+    return uplink ? storage::carries_frames(transaction, *uplink)
                   : storage::device_of(transaction, *place.port).has_value();
   }
   return has_uplink_device(transaction, place.switch_key);
@@ -376,7 +377,7 @@ std::vector<std::string> OpenVswitchPlane::counting_sessions(storage::Transactio
 
 void OpenVswitchPlane::set_admin_state(storage::ChangingTransaction &transaction,
                                        std::string_view uplink, bool up) {
-  if (!storage::frames_change(transaction) || !storage::device_of(transaction, uplink)) {
+  if (!storage::frames_change(transaction) || !storage::carries_frames(transaction, uplink)) {
     stored_.set_admin_state(transaction, uplink, up);
     return;
   }

@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "base/bytes.h"
+#include "base/ip_text.h"
 #include "base/outcomes.h"
 #include "model/mirror/properties.h"
 #include "model/ports/properties.h"
@@ -17,6 +18,7 @@
 #include "planes/openvswitch/trace/control.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -36,6 +38,12 @@ class Stations {
     for (auto const &uplink : storage::uplinks_of(transaction, key)) {
       if (auto const device = storage::device_of(transaction, uplink.name)) {
         add(device->number, {.name = uplink.name, .is_uplink = true}, uplink.port);
+      }
+      if (auto const fabric = storage::fabric_of(transaction, uplink.name)) {
+        for (auto const &tunnel : fabric->tunnels) {
+          auto const name = fmt::format("{} to {}", uplink.name, ip_text(tunnel.peer));
+          add(tunnel.number, {.name = name, .is_uplink = true}, uplink.port);
+        }
       }
     }
   }

@@ -38,13 +38,22 @@ void check_ports(Network const &network) {
   }
 }
 
-void check_slot(Slot const &slot, std::set<openflow::Port> const &uplinks) {
+// Frames that come back over a wire would be taken for those of another host.
+void check_mesh(Network const &network) {
+  bool const has_wires = std::any_of(network.uplinks.begin(), network.uplinks.end(),
+                                     [](Uplink const &uplink) { return !is_tunnel(uplink.port); });
+  if (network.is_mesh() && has_wires) {
+    refuse(QEX_NOT_SUPPORTED, "beside tunnels, a switch has no uplink with a device");
+  }
+}
+
+void check_slot(Slot const &slot, Balance balance, std::set<openflow::Port> const &uplinks) {
   bool const all_there = std::all_of(slot.begin(), slot.end(),
                                      [&](openflow::Port port) { return uplinks.contains(port); });
   if (slot.empty() || !all_there) {
     refuse(QEX_BAD_PARAM, "a team uses an uplink that the switch has not");
   }
-  if (slot.size() > kMostInSlot) {
+  if (slot.size() > kMostInSlot && balance != Balance::mesh) {
     refuse(QEX_LIMIT_EXCEEDED, "a team aggregates " + std::to_string(slot.size()) +
                                    " uplinks, more than " + std::to_string(kMostInSlot));
   }
@@ -58,7 +67,7 @@ void check_teams(Network const &network) {
   for (auto const &team : network.teams) {
     for (auto const *slots : {&team.in_use, &team.standby}) {
       for (auto const &slot : *slots) {
-        check_slot(slot, uplinks);
+        check_slot(slot, team.balance, uplinks);
       }
     }
   }
@@ -89,6 +98,7 @@ void check_mirrors(Network const &network) {
 void check(Network const &network) {
   check_ports(network);
   check_teams(network);
+  check_mesh(network);
   check_mirrors(network);
 }
 

@@ -20,7 +20,7 @@ using openflow::EthernetAddress;
 /// A set of VLANs; 0 stands for frames without a tag.
 using Vlans = std::bitset<4096>;
 
-/// An uplink that has a device.
+/// An uplink that has a device, or one tunnel of an uplink that is tunnels.
 struct Uplink {
   openflow::Port port = 0;
   std::uint32_t number = 0;  ///< of its port of the switch
@@ -44,6 +44,9 @@ enum class Balance {
   share,      ///< by the share of the port, see Port::share
   source,     ///< by the source address of the frame
   addresses,  ///< by the IP addresses; the network takes the uplinks for one link
+  /// To the one that leads to its receiver, or to all: each leads to another host of the switch,
+  /// none of which passes on what it gets over one.
+  mesh,
 };
 
 /// The uplinks that ports use, in the order of their policy. Which of them meet the criteria, and
@@ -192,6 +195,11 @@ struct Network {
   std::vector<FixedAddress> fixed_addresses;
   std::vector<Mirror> mirrors;
   Multicast multicast;
+
+  /// Whether its uplinks are tunnels.
+  [[nodiscard]] bool is_mesh() const {
+    return !teams.empty() && teams.front().balance == Balance::mesh;
+  }
 
   bool operator==(Network const &) const = default;
 };

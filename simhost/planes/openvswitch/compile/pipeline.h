@@ -58,6 +58,8 @@ inline constexpr std::uint8_t kGroups = 26;
 inline constexpr std::uint8_t kDelivery = 15;
 /// Which uplink carries it: the group of the port's team.
 inline constexpr std::uint8_t kTeams = 16;
+/// Likewise where uplinks are tunnels: the one that kDestination is, or all of them.
+inline constexpr std::uint8_t kMesh = 27;
 /// Out to the uplink in kWire, with its tag.
 inline constexpr std::uint8_t kWires = 17;
 
@@ -146,6 +148,14 @@ inline constexpr openflow::Port kBeyond = 0xffff;
 inline constexpr openflow::Port kNowhere = 0xff00;
 /// The last that Open vSwitch gives a device.
 inline constexpr openflow::Port kGreatestPort = 0xfeff;
+/// In kDestination: beyond a tunnel, of which there may be no more.
+inline constexpr openflow::Port kFirstTunnel = 0xfec0;
+inline constexpr unsigned kTunnelBits = 6;
+static_assert(kFirstTunnel + (1U << kTunnelBits) - 1 == kGreatestPort);
+
+constexpr bool is_tunnel(openflow::Port port) {
+  return port >= kFirstTunnel && port <= kGreatestPort;
+}
 
 /// In kRecent.
 enum class Recent : std::uint8_t {

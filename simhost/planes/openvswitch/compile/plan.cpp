@@ -68,6 +68,9 @@ void Plan::note_private_vlans() {
 bool Plan::frames_may_return() const {
   auto const &uplinks = network.uplinks;
   auto const &ports = network.ports;
+  if (network.is_mesh()) {
+    return false;
+  }
   return uplinks.size() > 1 ||
          (!uplinks.empty() && std::any_of(ports.begin(), ports.end(), [](Port const &port) {
            return port.transmits_by_uplink;

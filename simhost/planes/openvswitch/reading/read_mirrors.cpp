@@ -16,6 +16,7 @@
 #include "model/properties/properties.h"
 #include "storage/ports.h"
 #include "storage/running/devices.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -179,6 +180,9 @@ class Sessions {
     return device ? std::optional(Place{.port = device->number, .is_uplink = false}) : std::nullopt;
   }
   std::optional<Place> place_of_uplink(std::string_view uplink) {
+    if (storage::fabric_of(transaction_, uplink)) {
+      refuse_session("names an uplink that is tunnels, which is not done here");
+    }
     auto const device = storage::device_of(transaction_, uplink);
     return device ? std::optional(Place{.port = device->number, .is_uplink = true}) : std::nullopt;
   }

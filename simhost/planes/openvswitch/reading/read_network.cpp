@@ -18,14 +18,18 @@
 #include "model/switches/properties.h"
 #include "model/teaming/properties.h"
 #include "model/vlans/properties.h"
+#include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/compile/ways.h"
 #include "planes/openvswitch/reading/read_mirrors.h"
 #include "storage/ports.h"
 #include "storage/running/addresses.h"
 #include "storage/running/devices.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::openvswitch {
 namespace {
+
+static_assert(storage::kFirstTunnel == kFirstTunnel && storage::kMostTunnels == 1U << kTunnelBits);
 
 template <typename Bytes>
 EthernetAddress address_of(Bytes const &bytes) {
@@ -205,10 +209,11 @@ class Reader {
   }
 
   void read_uplinks() {
+    fabric_ = storage::fabric_of(transaction_, key_);
     for (auto const &[name, number] : storage::uplinks_of(transaction_, key_)) {
-      if (auto const port = port_of(name)) {
-        auto const owner = storage::PropertyOwner::port(key_, number);
-        network_.uplinks.push_back({.port = *port,
+      auto const owner = storage::PropertyOwner::port(key_, number);
+      for (auto const port : ports_of(name)) {
+        network_.uplinks.push_back({.port = port,
                                     .number = static_cast<std::uint32_t>(number),
                                     .blocked = effective(transaction_, ports::blocked, owner) != 0,
                                     .lag = lag_of(name),
@@ -261,7 +266,7 @@ class Reader {
 
   std::size_t team_of(Settings const &settings, storage::PortNumber number) {
     if (auto const *bound = settings.bound.find(number)) {
-      network_.teams.emplace_back();
+      network_.teams.emplace_back().balance = fabric_ ? Balance::mesh : Balance::first;
       if (auto const at = teaming::bound_uplink_in(team_, *bound)) {
         append_slot(network_.teams.back().in_use, {.uplinks = {*at}, .since = {}});
       }
@@ -277,10 +282,10 @@ class Reader {
     network_.asks_for_beacons =
         network_.asks_for_beacons || (policy.linkCriteria & TEAM_FRP_CRIT_BEACON_STATE) != 0;
     auto const usable = teaming::usable_slots(team_, policy);
-    Team team{.balance = balance_of(policy),
+    Team team{.balance = fabric_ ? Balance::mesh : balance_of(policy),
               .in_use = {},
               .standby = {},
-              .goes_by_load = policy.loadBalance == TEAM_FRP_TYPE_LB_LBT};
+              .goes_by_load = !fabric_ && policy.loadBalance == TEAM_FRP_TYPE_LB_LBT};
     for (std::size_t at = 0; at < usable.slots.size(); ++at) {
       append_slot(at < usable.in_use ? team.in_use : team.standby, usable.slots[at]);
     }
@@ -305,18 +310,25 @@ class Reader {
   void append_slot(std::vector<Slot> &slots, teaming::Slot const &usable) const {
     Slot slot;
     for (auto const at : usable.uplinks) {
-      if (auto const port = port_of(team_.uplinks[at].name)) {
-        slot.push_back(*port);
-      }
+      auto const ports = ports_of(team_.uplinks[at].name);
+      slot.insert(slot.end(), ports.begin(), ports.end());
     }
     if (!slot.empty()) {
       slots.push_back(std::move(slot));
     }
   }
 
-  [[nodiscard]] std::optional<openflow::Port> port_of(std::string const &uplink) const {
-    auto const device = storage::device_of(transaction_, uplink);
-    return device ? std::optional(openflow::Port{device->number}) : std::nullopt;
+  // Those of its device, or of its tunnels.
+  [[nodiscard]] std::vector<openflow::Port> ports_of(std::string const &uplink) const {
+    std::vector<openflow::Port> ports;
+    if (fabric_ && fabric_->uplink == uplink) {
+      for (auto const &tunnel : fabric_->tunnels) {
+        ports.push_back(tunnel.number);
+      }
+    } else if (auto const device = storage::device_of(transaction_, uplink)) {
+      ports.push_back(device->number);
+    }
+    return ports;
   }
 
   void read_promiscuous() {
@@ -345,6 +357,7 @@ class Reader {
   std::span<storage::PortDevice const> connected_;
   Observed const &observed_;
   Network network_;
+  std::optional<storage::Fabric> fabric_;
 };
 
 }  // namespace
@@ -356,7 +369,7 @@ Network read_network(storage::Transaction &transaction, storage::SwitchKey key,
 }
 
 bool may_be_refused(storage::Transaction &transaction, storage::SwitchKey key) {
-  return has_mirror_sessions(transaction, key) ||
+  return has_mirror_sessions(transaction, key) || storage::fabric_of(transaction, key) ||
          storage::uplinks_of(transaction, key).size() > kMostInSlot;
 }
 

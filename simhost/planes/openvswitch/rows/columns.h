@@ -16,6 +16,11 @@ inline constexpr auto *kHost = "simhost";
 // In external_ids of Open_vSwitch: who writes all of those.
 inline constexpr auto *kOwner = "simhostd";
 inline constexpr auto *kMostTags = "vlan-limit";
+// In external_ids of a bridge: what it is for, unless it is a switch.
+inline constexpr auto *kRole = "simhost-role";
+inline constexpr auto *kUnderlay = "underlay";
+// In other_config of a bridge.
+inline constexpr auto *kAddress = "hwaddr";
 
 inline ovsdb::Json map_of(std::map<std::string, std::string> const &entries) {
   return ovsdb::map({entries.begin(), entries.end()});
@@ -30,7 +35,19 @@ inline ovsdb::Row const kPort{{"tag", ovsdb::set({})},
                               {"trunks", ovsdb::set({})},
                               {"vlan_mode", ovsdb::set({})},
                               {"lacp", ovsdb::set({})}};
-inline ovsdb::Row const kInterface{{"type", ""}, {"ingress_policing_rate", 0}};
+inline ovsdb::Row const kInterface{{"ingress_policing_rate", 0}};
+
+inline ovsdb::Row settings_of(BridgeRow const &bridge) {
+  auto row = kBridge;
+  if (bridge.is_underlay) {
+    row["fail_mode"] = ovsdb::set({"standalone"});
+    row["protocols"] = ovsdb::set({});
+  }
+  if (!bridge.address.empty()) {
+    row["other_config"] = map_of({{"disable-in-band", "true"}, {kAddress, bridge.address}});
+  }
+  return row;
+}
 
 // Those of a link-aggregation group in place of a port's.
 inline ovsdb::Row lag_columns(LagRow const &lag) {
@@ -44,6 +61,7 @@ inline ovsdb::Row lag_columns(LagRow const &lag) {
 // And of its devices.
 inline ovsdb::Row member_columns(LagRow const &lag) {
   auto columns = kInterface;
+  columns["type"] = "";
   columns["other_config"] = map_of({{"lacp-aggregation-key", std::to_string(lag.key)}});
   return columns;
 }

@@ -54,7 +54,8 @@ using Interfaces = std::map<std::string, std::uint16_t>;
 
 struct PortRow {
   Interfaces interfaces;
-  LagRow const *lag = nullptr;  // null for a device by itself
+  LagRow const *lag = nullptr;        // null for a device by itself
+  TunnelRow const *tunnel = nullptr;  // null for a device
 };
 
 // Groups without a device are not there.
@@ -70,6 +71,9 @@ std::map<std::string, PortRow> ports_of(BridgeRow const &bridge) {
       }
     }
   }
+  for (auto const &[name, tunnel] : bridge.tunnels) {
+    ports.emplace(name, PortRow{.interfaces = {{name, tunnel.number}}, .tunnel = &tunnel});
+  }
   for (auto const &[device, number] : alone) {
     ports.emplace(device, PortRow{.interfaces = {{device, number}}});
   }
@@ -79,6 +83,10 @@ std::map<std::string, PortRow> ports_of(BridgeRow const &bridge) {
 // Whether a port can stay: what is different between two groups is changed in place, so that the
 // partners of the others are kept.
 bool can_stay(PortRow const &present, PortRow const &wanted) {
+  if (present.tunnel != nullptr || wanted.tunnel != nullptr) {
+    return present.tunnel != nullptr && wanted.tunnel != nullptr &&
+           *present.tunnel == *wanted.tunnel;
+  }
   if (present.lag == nullptr || wanted.lag == nullptr) {
     return present.lag == wanted.lag && present.interfaces == wanted.interfaces;
   }
@@ -97,10 +105,14 @@ class Writer {
       ports.push_back(added_port(name, port));
     }
     auto const name = names_.next();
-    auto row = json_of(kBridge);
+    std::map<std::string, std::string> whose{{kHost, host_}};
+    if (wanted.is_underlay) {
+      whose.emplace(kRole, kUnderlay);
+    }
+    auto row = json_of(settings_of(wanted));
     row.update({{"name", wanted.name},
                 {"datapath_type", wanted.datapath},
-                {"external_ids", map_of({{kHost, host_}})},
+                {"external_ids", map_of(whose)},
                 {"flow_tables", flow_tables(wanted)},
                 {"ports", ovsdb::set(ports)}});
     told_.push_back(insert("Bridge", name, std::move(row)));
@@ -118,7 +130,7 @@ class Writer {
 
   void change(PresentBridge const &present, BridgeRow const &wanted) {
     if (present.is_altered) {
-      told_.push_back(update("Bridge", is(ovsdb::uuid(present.id)), json_of(kBridge)));
+      told_.push_back(update("Bridge", is(ovsdb::uuid(present.id)), json_of(settings_of(wanted))));
     }
     change_ports(present, wanted);
     if (wanted.limits != present.row.limits) {
@@ -188,7 +200,7 @@ class Writer {
     }
     for (auto const &[device, number] : wanted.interfaces) {
       if (!is_in(std::pair(device, number), there.interfaces)) {
-        added.push_back(added_interface(device, number, wanted.lag));
+        added.push_back(added_interface(device, number, wanted));
       }
     }
     replace_in("Port", id, "interfaces", gone, added);
@@ -209,8 +221,11 @@ class Writer {
   }
 
   // 0 is the number of the bridge's own.
-  Json added_interface(std::string const &device, std::uint16_t number, LagRow const *lag) {
-    auto row = lag != nullptr ? json_of(member_columns(*lag)) : Json::object();
+  Json added_interface(std::string const &device, std::uint16_t number, PortRow const &port) {
+    auto row = port.lag != nullptr ? json_of(member_columns(*port.lag)) : Json::object();
+    if (port.tunnel != nullptr) {
+      row.update({{"type", port.tunnel->type}, {"options", map_of(port.tunnel->options)}});
+    }
     row["name"] = device;
     if (number == 0) {
       row["type"] = "internal";
@@ -226,7 +241,7 @@ class Writer {
   Json added_port(std::string const &name, PortRow const &port) {
     std::vector<Json> interfaces;
     for (auto const &[device, number] : port.interfaces) {
-      interfaces.push_back(added_interface(device, number, port.lag));
+      interfaces.push_back(added_interface(device, number, port));
     }
     auto row = port.lag != nullptr ? json_of(lag_columns(*port.lag)) : Json::object();
     row.update({{"name", name}, {"interfaces", ovsdb::set(interfaces)}});
@@ -253,7 +268,8 @@ class Writer {
 
 // What is fixed once the bridge is there.
 bool is_same_bridge(PresentBridge const &present, BridgeRow const &wanted) {
-  return present.row.name == wanted.name && present.row.datapath == wanted.datapath;
+  return present.row.name == wanted.name && present.row.datapath == wanted.datapath &&
+         present.row.is_underlay == wanted.is_underlay && present.row.address == wanted.address;
 }
 
 }  // namespace

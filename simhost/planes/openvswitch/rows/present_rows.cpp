@@ -20,6 +20,14 @@ std::string text_under(Json const &column, std::string const &wanted) {
   return {};
 }
 
+std::map<std::string, std::string> texts_of(Json const &column) {
+  std::map<std::string, std::string> texts;
+  for (auto const &[key, value] : ovsdb::entries_of(column)) {
+    texts.emplace(key.get<std::string>(), value.get<std::string>());
+  }
+  return texts;
+}
+
 std::string id_in(Json const &column) {
   return column.at(1).get<std::string>();
 }
@@ -91,7 +99,13 @@ void add_port(PresentBridge &bridge, std::string const &port_id, Tables const &t
   auto const interfaces = ovsdb::atoms_of(port.at("interfaces"));
   auto const &interface = tables.interfaces.at(id_in(interfaces.at(0)));
   bool const is_ours = interfaces.size() == 1 && says(port, kPort) && says(interface, kInterface);
-  bridge.row.devices[name] = number_of(interface, is_ours);
+  auto const number = number_of(interface, is_ours);
+  if (auto const type = interface.at("type").get<std::string>(); type.empty()) {
+    bridge.row.devices[name] = number;
+  } else {
+    bridge.row.tunnels[name] = {
+        .number = number, .type = type, .options = texts_of(interface.at("options"))};
+  }
 }
 
 std::vector<std::string> devices_at(ovsdb::Row const &bridge, Tables const &tables) {
@@ -105,11 +119,14 @@ std::vector<std::string> devices_at(ovsdb::Row const &bridge, Tables const &tabl
 }
 
 PresentBridge bridge_of(std::string const &id, ovsdb::Row const &row, Tables const &tables) {
-  PresentBridge bridge{.id = id,
-                       .row = {.name = row.at("name").get<std::string>(),
-                               .datapath = row.at("datapath_type").get<std::string>()},
-                       .ports = {},
-                       .is_altered = !says(row, kBridge)};
+  PresentBridge bridge{
+      .id = id,
+      .row = {.name = row.at("name").get<std::string>(),
+              .datapath = row.at("datapath_type").get<std::string>(),
+              .is_underlay = text_under(row.at("external_ids"), kRole) == kUnderlay,
+              .address = text_under(row.at("other_config"), kAddress)},
+      .ports = {}};
+  bridge.is_altered = !says(row, settings_of(bridge.row));
   for (auto const &port : ovsdb::atoms_of(row.at("ports"))) {
     add_port(bridge, id_in(port), tables);
   }
@@ -131,7 +148,8 @@ void select_rows(ovsdb::Selected &selected) {
        {"name", "datapath_type", "ports", "external_ids", "flow_tables", "fail_mode", "protocols",
         "controller", "mirrors", "other_config"}},
       {"Port", {"name", "interfaces", "tag", "trunks", "vlan_mode", "lacp", "other_config"}},
-      {"Interface", {"name", "ofport_request", "type", "ingress_policing_rate", "other_config"}},
+      {"Interface",
+       {"name", "ofport_request", "type", "options", "ingress_policing_rate", "other_config"}},
       {"Flow_Table", {"flow_limit"}}};
   for (auto const &[table, columns] : read) {
     auto &known = selected[table];

@@ -27,6 +27,15 @@ struct LagRow {
   bool operator==(LagRow const &) const = default;
 };
 
+/// A port that is no device of the machine: Open vSwitch wraps its frames and sends them to a peer.
+struct TunnelRow {
+  std::uint16_t number = 0;  ///< its OpenFlow port
+  std::string type;          ///< "vxlan" or "geneve"
+  std::map<std::string, std::string> options;
+
+  bool operator==(TunnelRow const &) const = default;
+};
+
 struct BridgeRow {
   std::string name;      ///< unique among all bridges
   std::string datapath;  ///< "netdev" or "system"
@@ -34,8 +43,15 @@ struct BridgeRow {
   std::map<std::string, std::uint16_t> devices = {};
   /// By the names of their rows, which begin with that of the bridge, and "-".
   std::map<std::string, LagRow> lags = {};
+  /// Likewise tunnels.
+  std::map<std::string, TunnelRow> tunnels = {};
   /// How many flows each of these tables may have; the switch learns no more.
   std::map<std::uint8_t, std::uint32_t> limits = {};
+  /// It forwards by itself, between the machine and its devices: what it gets for the machine may
+  /// be in a tunnel.
+  bool is_underlay = false;
+  /// Its own address of Ethernet, in text; empty for one that Open vSwitch chooses.
+  std::string address = {};
 
   bool operator==(BridgeRow const &) const = default;
 };

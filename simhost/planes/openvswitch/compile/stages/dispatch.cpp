@@ -31,6 +31,11 @@ class Dispatch {
     to_ports_and_uplinks(200, to_many(Match()), to_list(List::all));
     to_ports_and_uplinks(150, Match().with(field::kDestination, kBeyond), promiscuous_);
     to_ports_and_uplinks(150, Match().with(field::kDestination, 0), to_list(List::unknown));
+    if (plan_.network.is_mesh()) {
+      auto const beyond_tunnels = openflow::ones(16) ^ openflow::ones(kTunnelBits);
+      to_ports_and_uplinks(150, Match().with(field::kDestination, kFirstTunnel, beyond_tunnels),
+                           promiscuous_);
+    }
     // To a port of another way.
     add(50, Match().with(field::kOrigin, kFromUplink), promiscuous_);
     add(10, Match(), deliver());

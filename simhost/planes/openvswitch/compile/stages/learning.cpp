@@ -107,10 +107,19 @@ void learn_beyond(Plan const &plan, Program &program) {
       {go_to(table::kLookup)}, 0);
   auto const &addresses = plan.network.addresses;
   if (addresses.uplink_limit != 0 && addresses.limit != 0) {
-    add(program, 100, Match().with(field::kOrigin, kFromUplink),
-        {openflow::load(field::kVerdict, 1), learn(plan, 0, kBeyond, addresses.uplink_limit),
-         go_to(table::kLimits)},
-        0);
+    auto const learn_from = [&](Match const &match, openflow::Port place) {
+      add(program, 100, match,
+          {openflow::load(field::kVerdict, 1), learn(plan, 0, place, addresses.uplink_limit),
+           go_to(table::kLimits)},
+          0);
+    };
+    if (plan.network.is_mesh()) {
+      for (auto const &tunnel : plan.network.uplinks) {
+        learn_from(from(tunnel.port), tunnel.port);
+      }
+    } else {
+      learn_from(Match().with(field::kOrigin, kFromUplink), kBeyond);
+    }
   }
 }
 

@@ -24,7 +24,7 @@ std::set<std::uint32_t> links_at(Way const &way, Uplink const &uplink) {
 }
 
 bool elects(Way const &way) {
-  return !way.is_single() && way.balance != Balance::addresses;
+  return !way.is_single() && way.balance != Balance::addresses && way.balance != Balance::mesh;
 }
 
 // The network has a client where it sends from: over the uplink that its address chooses, if its

@@ -120,6 +120,18 @@ openflow::Group spreading_frames(Way const &way) {
   return group;
 }
 
+void compile_mesh(Plan const &plan, Program &program) {
+  Actions all;
+  for (auto const &uplink : plan.network.uplinks) {
+    program.add(table::kMesh, {.priority = 100,
+                               .match = Match().with(field::kDestination, uplink.port),
+                               .actions = over(uplink.port),
+                               .cookie = cookie(Counted::port, uplink.number)});
+    append(all, over(uplink.port));
+  }
+  program.add(table::kMesh, {.actions = all});
+}
+
 void compile_wire(Plan const &plan, Program &program, Uplink const &uplink) {
   auto const on_wire = Match().with(field::kWire, uplink.port);
   auto add = [&](std::uint16_t priority, Match const &match, Actions actions) {
@@ -150,7 +162,9 @@ void compile_teams(Plan const &plan, Program &program) {
   Spreading spreading;
   std::map<std::uint32_t, Actions> sending;
   for (auto const &way : plan.ways.all()) {
-    if (way.slots.size() == 1 && (way.is_single() || !way.spreads_frames())) {
+    if (way.balance == Balance::mesh) {
+      sending[way.number] = {go_to(table::kMesh)};
+    } else if (way.slots.size() == 1 && (way.is_single() || !way.spreads_frames())) {
       sending[way.number] = over_slot(way.slots.front(), spreading);
     } else {
       program.add(way.spreads_frames() ? spreading_frames(way) : failing_over(way, spreading));
@@ -168,6 +182,9 @@ void compile_teams(Plan const &plan, Program &program) {
                                   .actions = sending.at(way->number),
                                   .cookie = cookie(Counted::port, port.number)});
     }
+  }
+  if (plan.network.is_mesh()) {
+    compile_mesh(plan, program);
   }
   for (auto const &uplink : plan.network.uplinks) {
     compile_wire(plan, program, uplink);

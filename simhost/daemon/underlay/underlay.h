@@ -1,0 +1,41 @@
+// What carries the tunnels of this host: the address and the routes of the machine there, and
+// whether tunnels can do with them.
+#pragma once
+
+#include <filesystem>
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "daemon/devices/network_devices.h"
+#include "daemon/troubles.h"
+#include "daemon/wanted.h"
+#include "events/loop.h"
+
+namespace simhost::daemon {
+
+class Underlay {
+ public:
+  /// The sockets of Open vSwitch are in `folder`. What goes wrong later is told to `say`.
+  Underlay(events::Loop &loop, std::filesystem::path folder, Say say);
+
+  /// Makes the bridge of the underlay, if it is there, the way of the machine to its peers. Returns
+  /// what keeps frames from going through tunnels, in words. `is_at_bridge` says of another device
+  /// whether Open vSwitch sees what leaves over it.
+  std::vector<std::string> follow(Wanted const &wanted, NetworkDevices const &devices,
+                                  std::function<bool(std::string const &)> const &is_at_bridge);
+
+ private:
+  void forget_ways_soon();
+
+  events::Loop &loop_;
+  std::filesystem::path folder_;
+  Say say_;
+  events::Loop::Timer next_forgetting_;
+};
+
+/// The largest packet of a switch whose frames have two tags, over a route that carries packets of
+/// `route_mtu`.
+std::uint32_t mtu_within(std::uint32_t route_mtu, std::size_t address_bytes);
+
+}  // namespace simhost::daemon
