@@ -11,11 +11,14 @@ using openflow::Field;
 
 // The later table of two that know an address has the last word.
 Actions look_up(Plan const &plan, std::uint8_t next) {
-  Actions actions{go_to(table::kFirstAddresses)};
+  Actions actions;
   if (plan.network.addresses.fixed_ones_move) {
-    append(actions, {go_to(table::kFixedAddresses), go_to(table::kLearnedAddresses)});
+    append(actions, {go_to(table::kFirstAddresses), go_to(table::kFixedAddresses),
+                     go_to(table::kLearnedAddresses)});
   } else {
-    append(actions, {go_to(table::kLearnedAddresses), go_to(table::kFixedAddresses)});
+    // A client may have been seen beyond the uplinks before it came.
+    append(actions, {go_to(table::kLearnedAddresses), go_to(table::kFirstAddresses),
+                     go_to(table::kFixedAddresses)});
   }
   actions.push_back(go_to(next));
   return actions;
