@@ -75,5 +75,6 @@ void add_fabric_commands(CLI::App &app);
 void add_time_commands(CLI::App &app);
 /// fault, calls: the functions that programs call.
 void add_call_commands(CLI::App &app);
+void add_lab_commands(CLI::App &app);
 
 }  // namespace simhost::cli

@@ -24,7 +24,8 @@ void add_commands(CLI::App &app) {
   app.require_subcommand(1);
   app.parse_complete_callback([&app] {
     char const *const state = std::getenv("SIMHOST_STATE");
-    if ((state == nullptr || *state == '\0') && !app.got_subcommand("calls")) {
+    if ((state == nullptr || *state == '\0') && !app.got_subcommand("calls") &&
+        !app.got_subcommand("lab")) {
       throw simhost::cli::Failure("which host? name its state with --state FILE or SIMHOST_STATE");
     }
   });
@@ -34,6 +35,7 @@ void add_commands(CLI::App &app) {
   simhost::cli::add_fabric_commands(app);
   simhost::cli::add_time_commands(app);
   simhost::cli::add_call_commands(app);
+  simhost::cli::add_lab_commands(app);
 }
 
 // Whether a command is still to come after the words that were understood.

@@ -362,7 +362,8 @@ def test_says_that_an_answer_cannot_be_written(host: Host, words: str) -> None:
 
 COMMANDS = (
     *("show", "apply", "link", "uplink", "learn", "counter", "clock", "restart", "reset", "fault"),
-    *("connect", "disconnect", "plane", "trace", "share", "join", "fabric", "calls"),
+    *("connect", "disconnect", "plane", "trace", "share", "join", "fabric", "calls", "lab"),
+    *("lab up", "lab down", "lab list", "lab exec"),
     *("clock show", "clock stop", "clock run", "clock step", "clock set"),
     *("fault add", "fault list", "fault clear"),
 )
