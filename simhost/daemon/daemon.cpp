@@ -90,7 +90,8 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
                       .changed = [this] { follow_members(); }}),
       counting_(store_),
       underlay_(loop, options_.database.parent_path(),
-                [this](std::string const &why) { troubles_.add(why); }) {
+                [this](std::string const &why) { troubles_.add(why); }),
+      collectors_(loop, devices_, [this] { sync_soon(); }) {
   storage::ChangingTransaction transaction(store_);
   storage::take_frames(transaction);
   transaction.commit();
@@ -356,10 +357,12 @@ void Daemon::sync() {
   auto const is_there = [this](std::string const &device) {
     return devices_.find(device).has_value();
   };
+  collectors_.begin();
   auto const complete = [&](storage::SwitchKey key, openvswitch::Network &network) {
     members_.follow(transaction, key, network);
     load_balance_.follow(key, network);
     beacons_.follow(key, network);
+    collectors_.follow(network);
   };
   auto const all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
   bool const counts_anew = counting_.follow(transaction);
@@ -385,6 +388,9 @@ void Daemon::follow_tunnels(Wanted const &wanted) {
     return options_.datapath == "system" || bridges_->elsewhere(device).has_value();
   };
   for (auto const &why : underlay_.follow(wanted, devices_, is_at_bridge)) {
+    troubles_.add(why);
+  }
+  for (auto const &why : collectors_.look(wanted.underlay)) {
     troubles_.add(why);
   }
 }

@@ -21,6 +21,7 @@
 #include "daemon/server.h"
 #include "daemon/state_watch.h"
 #include "daemon/troubles.h"
+#include "daemon/underlay/collectors.h"
 #include "daemon/underlay/underlay.h"
 #include "events/loop.h"
 #include "storage/store.h"
@@ -106,6 +107,7 @@ class Daemon {
   LoadBalance load_balance_;
   unsigned counts_ = 0;  // since the load was looked at
   Underlay underlay_;
+  Collectors collectors_;
   Compiler compiler_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;

@@ -94,6 +94,38 @@ void add_tunnels(storage::Transaction &transaction, WantedBridge &bridge) {
   }
 }
 
+// Where copies are wrapped for collectors, whose addresses are those that each copy names. What
+// comes back goes nowhere; by its key, which no switch shares, Open vSwitch knows the port.
+void add_wrapping_ports(storage::Transaction &transaction, openvswitch::Network const &network,
+                        WantedBridge &bridge) {
+  auto const underlay = storage::underlay_of(transaction);
+  std::map<std::string, std::string> options{
+      {"remote_ip", "flow"},
+      {"in_key", std::to_string(static_cast<std::int64_t>(bridge.key))},
+      {"out_key", "flow"}};
+  if (underlay) {
+    options.emplace("local_ip", ip_text(underlay->address));
+  }
+  auto const add = [&](std::uint16_t number, std::string const &type) {
+    bridge.row.tunnels.insert_or_assign(
+        tunnel_name(bridge.row.name, number),
+        openvswitch::TunnelRow{.number = number, .type = type, .options = options});
+  };
+  for (auto const &mirror : network.mirrors) {
+    if (!mirror.collectors.empty() && mirror.wrapping == openvswitch::Wrapping::gre) {
+      add(openvswitch::kGrePort, "gre");
+    }
+  }
+  for (auto const *option : {"erspan_ver", "erspan_idx", "erspan_dir", "erspan_hwid"}) {
+    options.emplace(option, "flow");
+  }
+  for (auto const &mirror : network.mirrors) {
+    if (!mirror.collectors.empty() && mirror.wrapping != openvswitch::Wrapping::gre) {
+      add(openvswitch::kErspanPort, "erspan");
+    }
+  }
+}
+
 std::optional<WantedUnderlay> wanted_underlay(storage::Transaction &transaction,
                                               std::string_view host, std::string const &datapath,
                                               IsThere const &is_there) {
@@ -172,8 +204,12 @@ void shorten(std::optional<ClockTime> &lasts, std::optional<ClockTime> const &ot
 openvswitch::CountedSessions sessions_of(openvswitch::Network const &network) {
   openvswitch::CountedSessions sessions;
   for (auto const &mirror : network.mirrors) {
+    auto const failed = static_cast<std::size_t>(
+        std::ranges::count(mirror.collectors, false, &openvswitch::Collector::is_reached));
     sessions[mirror.id] = {.sid = mirror.sid,
-                           .copies = mirror.to_ports.size() + mirror.to_uplinks.size()};
+                           .copies = mirror.to_ports.size() + mirror.to_uplinks.size() +
+                                     mirror.collectors.size() - failed,
+                           .failed = failed};
   }
   return sessions;
 }
@@ -229,6 +265,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       bridge.flows = flows;
       add_carried(transaction, network, team.policy, bridge);
       bridge.sessions = sessions_of(network);
+      add_wrapping_ports(transaction, network, bridge);
       bridge.aging = std::chrono::seconds(network.addresses.aging);
       bridge.mtu = network.mtu;
       std::erase_if(bridge.row.devices,

@@ -233,7 +233,7 @@ def test_what_cannot_be_done_is_refused_and_nothing_has_changed(lab: Lab) -> Non
     }
     done = lab.try_ctl("apply", "-", given=json.dumps({"switches": [document]}))
     assert done.returncode == 1
-    why = "the mirror session 's' wraps what it mirrors, which is not done here"
+    why = "the mirror session 's' is an encapsulated one, and mirrors to what is no address"
     assert f"{why} (QEX_NOT_SUPPORTED)" in done.stdout
     assert lab.plane()["change"] == change
     assert shown(lab) == before

@@ -1,87 +1,28 @@
-// Requests of rtnetlink, one reply each.
+// What rtnetlink says of addresses and routes.
 #include "daemon/underlay/network_routes.h"
 
 #include <linux/netlink.h>
 #include <linux/rtnetlink.h>
 #include <net/if.h>
-#include <sys/socket.h>
 
 #include <array>
 #include <cerrno>
 #include <cstring>
-#include <span>
-#include <stdexcept>
 #include <system_error>
 
-#include "events/descriptor.h"
+#include "daemon/underlay/netlink_request.h"
 
 namespace simhost::daemon {
 namespace {
 
 using storage::AddressBytes;
 
-std::uint8_t family_of(AddressBytes const &address) {
-  return address.size() == 4 ? AF_INET : AF_INET6;
-}
-
 std::uint8_t bits_of(AddressBytes const &address) {
   return static_cast<std::uint8_t>(address.size() * 8);
 }
 
-class Request {
- public:
-  template <typename Body>
-  Request(std::uint16_t type, std::uint16_t flags, Body const &body) {
-    header().nlmsg_type = type;
-    header().nlmsg_flags = static_cast<std::uint16_t>(NLM_F_REQUEST | flags);
-    header().nlmsg_len = NLMSG_LENGTH(sizeof body);
-    std::memcpy(NLMSG_DATA(&header()), &body, sizeof body);
-  }
-
-  Request &with(std::uint16_t type, std::span<std::byte const> content) {
-    auto *const attribute =
-        reinterpret_cast<rtattr *>(bytes_.data() + NLMSG_ALIGN(header().nlmsg_len));
-    attribute->rta_type = type;
-    attribute->rta_len = static_cast<std::uint16_t>(RTA_LENGTH(content.size()));
-    std::memcpy(RTA_DATA(attribute), content.data(), content.size());
-    header().nlmsg_len = NLMSG_ALIGN(header().nlmsg_len) + RTA_ALIGN(attribute->rta_len);
-    return *this;
-  }
-  Request &with(std::uint16_t type, unsigned number) {
-    return with(type, std::as_bytes(std::span(&number, 1)));
-  }
-
-  // The kernel's reply takes the place of the request.
-  nlmsghdr &exchanged() {
-    auto const socket =
-        events::owned(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE), "netlink");
-    if (send(socket.number(), bytes_.data(), header().nlmsg_len, 0) < 0) {
-      events::fail_with_errno("netlink");
-    }
-    auto const size = recv(socket.number(), bytes_.data(), bytes_.size(), 0);
-    if (size < 0) {
-      events::fail_with_errno("netlink");
-    }
-    if (!NLMSG_OK(&header(), static_cast<std::size_t>(size))) {
-      throw std::runtime_error("the kernel says of routes what nobody understands");
-    }
-    return header();
-  }
-
- private:
-  nlmsghdr &header() { return *reinterpret_cast<nlmsghdr *>(bytes_.data()); }
-
-  alignas(nlmsghdr) std::array<char, 8192> bytes_{};
-};
-
-// 0, or what the kernel had against it.
-int error_in(nlmsghdr &reply) {
-  return reply.nlmsg_type == NLMSG_ERROR ? -static_cast<nlmsgerr const *>(NLMSG_DATA(&reply))->error
-                                         : 0;
-}
-
 // Whether it was not so before.
-bool request(Request request, char const *what) {
+bool request(NetlinkRequest request, char const *what) {
   auto const error = error_in(request.exchanged());
   if (error != 0 && error != EEXIST) {
     throw std::system_error(error, std::generic_category(), what);
@@ -118,7 +59,7 @@ bool put_address(unsigned device, AddressBytes const &address, std::uint8_t pref
   body.ifa_index = device;
   // Nobody waits until the network was asked whether another one has it.
   body.ifa_flags = address.size() == 4 ? 0 : IFA_F_NODAD;
-  Request told(RTM_NEWADDR, NLM_F_ACK | NLM_F_CREATE | NLM_F_EXCL, body);
+  NetlinkRequest told(RTM_NEWADDR, NLM_F_ACK | NLM_F_CREATE | NLM_F_EXCL, body);
   told.with(IFA_LOCAL, address).with(IFA_ADDRESS, address);
   return request(told, "the address of the underlay");
 }
@@ -130,7 +71,7 @@ bool put_default_route(unsigned device, AddressBytes const &gateway) {
   body.rtm_protocol = RTPROT_STATIC;
   body.rtm_scope = RT_SCOPE_UNIVERSE;
   body.rtm_type = RTN_UNICAST;
-  Request told(RTM_NEWROUTE, NLM_F_ACK | NLM_F_CREATE | NLM_F_EXCL, body);
+  NetlinkRequest told(RTM_NEWROUTE, NLM_F_ACK | NLM_F_CREATE | NLM_F_EXCL, body);
   told.with(RTA_GATEWAY, gateway).with(RTA_OIF, device);
   return request(told, "the gateway of the underlay");
 }
@@ -139,7 +80,7 @@ std::optional<Route> find_route(AddressBytes const &address) {
   rtmsg body{};
   body.rtm_family = family_of(address);
   body.rtm_dst_len = bits_of(address);
-  Request asked(RTM_GETROUTE, 0, body);
+  NetlinkRequest asked(RTM_GETROUTE, 0, body);
   auto &reply = asked.with(RTA_DST, address).exchanged();
   if (error_in(reply) != 0) {
     return std::nullopt;
@@ -154,6 +95,9 @@ std::optional<Route> find_route(AddressBytes const &address) {
        attribute = RTA_NEXT(attribute, size)) {
     if (attribute->rta_type == RTA_OIF) {
       found.device = device_in(*attribute);
+    } else if (attribute->rta_type == RTA_GATEWAY) {
+      auto const *const first = static_cast<std::byte const *>(RTA_DATA(attribute));
+      found.gateway.assign(first, first + RTA_PAYLOAD(attribute));
     } else if (attribute->rta_type == RTA_METRICS) {
       found.mtu = mtu_in(*attribute);
     }

@@ -19,6 +19,7 @@ bool put_default_route(unsigned device, storage::AddressBytes const &gateway);
 struct Route {
   bool is_local = false;                            ///< nowhere: it is this machine's
   std::string device = {};                          ///< else the one over which they leave
+  storage::AddressBytes gateway = {};               ///< that they go to first; empty for none
   std::optional<std::uint32_t> mtu = std::nullopt;  ///< where it is another than the device's
 };
 

@@ -168,13 +168,18 @@ inline constexpr auto kSession = form::record<Session>(kSessionMembers);
 inline constexpr auto kTable =
     form::list<form::VectorField<&Table::sessions>>(kSession, kMostSessions);
 
+/// What of a table no frame can obey.
+inline constexpr std::string_view kBeyondFrames =
+    "`sampling_rate`: Open vSwitch mirrors every frame; `cos` and `granularity`: its ERSPAN says "
+    "neither";
+
 inline constexpr auto sessions =
     property<Table>(VSPROP_PORT_MIRROR_SESSIONS)
         .of_port()
         .typed()
         .json("mirror_sessions", kTable)
         .frames_obey()
-        .frames_cannot("`sampling_rate`: Open vSwitch mirrors every frame")
+        .frames_cannot(kBeyondFrames)
         .says("the mirror sessions of the port, all of them");
 
 inline constexpr auto uplink_sessions =
@@ -182,7 +187,7 @@ inline constexpr auto uplink_sessions =
         .of_switch()
         .json("uplink_mirror_sessions", kTable)
         .frames_obey()
-        .frames_cannot("`sampling_rate`: Open vSwitch mirrors every frame")
+        .frames_cannot(kBeyondFrames)
         .says(
             "the mirror sessions of the switch's uplinks, all of them; without effect where no "
             "frames move");

@@ -32,11 +32,11 @@ Device device_at(Query const &row) {
 std::optional<std::int64_t> next_number(Transaction &transaction) {
   Query select(transaction,
                "SELECT ifnull(max(number), 0) + 1 FROM device"
-               " HAVING ifnull(max(number), 0) < 65215"
+               " HAVING ifnull(max(number), 0) < 65213"
                " UNION ALL SELECT * FROM (SELECT here.number + 1 FROM"
                " (SELECT 0 AS number UNION ALL SELECT number FROM device) AS here"
                " WHERE NOT EXISTS (SELECT 1 FROM device WHERE number = here.number + 1)"
-               " AND here.number < 65215 ORDER BY here.number LIMIT 1) LIMIT 1");
+               " AND here.number < 65213 ORDER BY here.number LIMIT 1) LIMIT 1");
   return select.first([](Query const &row) { return row.integer(0); });
 }
 

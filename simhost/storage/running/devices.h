@@ -18,7 +18,7 @@ using MacBytes = std::array<std::byte, 6>;
 /// Of an uplink or of a port that is no uplink port.
 struct Device {
   std::string name;
-  /// By which the data path knows it: unique on the host, 1 to 65,215; kept while the device stays.
+  /// By which the data path knows it: unique on the host, 1 to 65,213; kept while the device stays.
   std::uint16_t number = 0;
   /// The address of the client that a port reaches through it, if it is known.
   std::optional<MacBytes> mac = std::nullopt;

@@ -50,12 +50,13 @@ class Compiler:
         clients: Sequence[Mapping[str, Any]],
         multicast: Optional[Mapping[str, Any]] = None,
         down: Collection[str] = (),
+        host: Optional[Mapping[str, Any]] = None,
     ) -> Dict[str, Any]:
         """Likewise of one that it compiles, some of whose uplinks have no link."""
         uplinks = [
             {"name": uplink, "link": "down" if uplink in down else "up"}
             for uplink in switch.get("uplinks", [])
         ]
-        answer = self.answer(switch, clients, {"uplinks": uplinks}, multicast)
+        answer = self.answer(switch, clients, {"uplinks": uplinks, **(host or {})}, multicast)
         assert "flows" in answer, answer
         return answer

@@ -67,6 +67,13 @@ TEST(Tally, CountsCopiesOfSessionsOrWhatHadNowhereToGo) {
               ElementsAre(Pair("s0 mirrorPktCnt", 6), Pair("s0 mirroredPkts", 3)));
   EXPECT_THAT(gained(tally, {{of_session, {.packets = 4}}}, {{0x801, {.sid = "s", .copies = 0}}}),
               ElementsAre(Pair("s0 discardedPkts", 1)));
+  CountedSessions const partly{{0x801, {.sid = "s", .copies = 1, .failed = 2}}};
+  EXPECT_THAT(gained(tally, {{of_session, {.packets = 5}}}, partly),
+              ElementsAre(Pair("s0 mirrorPktCnt", 1), Pair("s0 mirrorPktFailCnt", 2),
+                          Pair("s0 mirroredPkts", 1)));
+  CountedSessions const not_at_all{{0x801, {.sid = "s", .copies = 0, .failed = 2}}};
+  EXPECT_THAT(gained(tally, {{of_session, {.packets = 6}}}, not_at_all),
+              ElementsAre(Pair("s0 failedPkts", 1), Pair("s0 mirrorPktFailCnt", 2)));
   EXPECT_THAT(gained(tally, {{of_session, {.packets = 9}}}), IsEmpty());
 }
 

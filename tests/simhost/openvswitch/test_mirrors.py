@@ -14,6 +14,7 @@ from test_goldens import read
 BROADCAST = "ff:ff:ff:ff:ff:ff"
 P1, P2, P3 = (f"02:00:00:00:00:0{number}" for number in (1, 2, 3))
 STRANGER = "02:00:00:00:00:99"
+UNDERLAY = {"device": "eth9", "address": "192.0.2.1/24"}
 PORTS = ("p1", "p2", "p3")
 
 
@@ -213,8 +214,14 @@ def test_a_session_that_stands_for_a_promiscuous_port(bench: Bench) -> None:
 
 OF_A_KIND = "mirrors clients of a kind, which are not told apart here"
 SOME_TRAFFIC = "mirrors some traffic of uplinks, which is not told apart here"
-WRAPS = "wraps what it mirrors, which is not done here"
+OF_IPV6 = "mirrors to an address of IPv6, or over an underlay of IPv6, which is not done here"
+MOST_SESSIONS = "is session 1024 of ERSPAN, which has 1023 at most"
+NO_PORTS = "takes copies from uplinks, and mirrors to others than ports"
 TAKES_MORE = "takes copies from uplinks, and mirrors from what is no VLAN of them"
+
+
+def wraps(**said: Any) -> Dict[str, Any]:
+    return {"type": "encapsulated", "to": [{"ip": "192.0.2.7"}], **said}
 
 
 def takes(**said: Any) -> Dict[str, Any]:
@@ -224,10 +231,13 @@ def takes(**said: Any) -> Dict[str, Any]:
 @pytest.mark.parametrize(
     "said, why",
     [
-        ({"type": "encapsulated"}, WRAPS),
-        ({"encapsulates": True}, WRAPS),
-        ({"to": [{"ip": "192.0.2.1"}]}, "mirrors to what is no port and no uplink"),
-        ({"to": [{"vlan": 7}]}, "mirrors to what is no port and no uplink"),
+        ({"to": [{"ip": "192.0.2.7"}]}, "mirrors to an address, and wraps nothing"),
+        ({"to": [{"vlan": 7}]}, "mirrors to a VLAN"),
+        ({"encapsulates": True}, "wraps what it mirrors to a port, which is not done here"),
+        (wraps(to=[{"port": "p3"}]), "is an encapsulated one, and mirrors to what is no address"),
+        (wraps(to=[{"ip": "2001:db8::7"}]), OF_IPV6),
+        (wraps(to=[{"ip": "192.0.2.1"}]), "mirrors to the address of this host"),
+        (wraps(encapsulation={"type": "erspan2", "id": 1024}), MOST_SESSIONS),
         ({"sent_by": [{"ip": "192.0.2.1"}]}, "mirrors from an address"),
         *(({"received_from": [kind]}, OF_A_KIND) for kind in ("vmm", "cos", "tcpip", "test")),
         ({"sent_from": ["uplinks", "vmm"]}, OF_A_KIND),
@@ -235,7 +245,8 @@ def takes(**said: Any) -> Dict[str, Any]:
         ({"uplink_filter": "normal"}, SOME_TRAFFIC),
         ({"stack": True}, "mirrors on the side of the stack, which is not here"),
         ({"type": "remote_source"}, "mirrors to other hosts, and has no VLAN for that"),
-        (takes(to=[{"uplink": "nic0"}]), "takes copies from uplinks, and mirrors to one"),
+        (takes(to=[{"uplink": "nic0"}]), NO_PORTS),
+        (takes(to=[{"ip": "192.0.2.7"}], encapsulates=True), NO_PORTS),
         (takes(sent_by=[{"vlan": 7}]), TAKES_MORE),
         (takes(received_by=[{"port": "p1"}]), TAKES_MORE),
         (takes(received_from=["uplinks"]), TAKES_MORE),
@@ -244,9 +255,16 @@ def takes(**said: Any) -> Dict[str, Any]:
 def test_what_is_not_mirrored_here_is_refused(
     compiler: Compiler, said: Mapping[str, Any], why: str
 ) -> None:
-    ports = [{"id": "p1", "mirror_sessions": [session(**said)]}]
-    answer = compiler.answer({"uplinks": ["nic0"], "ports": ports}, [])
+    ports = [{"id": "p1", "mirror_sessions": [session(**said)]}, {"id": "p3"}]
+    switch = {"uplinks": ["nic0"], "ports": ports}
+    answer = compiler.answer(switch, [{"port": "p3"}], {"underlay": UNDERLAY})
     assert answer == {"refused": f"the mirror session 's' {why}", "status": "QEX_NOT_SUPPORTED"}
+
+
+def test_without_an_underlay_no_address_is_mirrored_to(compiler: Compiler) -> None:
+    answer = compiler.answer({"ports": [{"id": "p1", "mirror_sessions": [session(**wraps())]}]}, [])
+    why = "the mirror session 's' mirrors to an address, and the host has no underlay"
+    assert answer == {"refused": why, "status": "QEX_NOT_SUPPORTED"}
 
 
 def test_fewer_bytes_than_a_header_are_refused(compiler: Compiler) -> None:

@@ -139,6 +139,17 @@ struct MirrorSources {
   bool operator==(MirrorSources const &) const = default;
 };
 
+/// How copies for collectors are wrapped.
+enum class Wrapping : std::uint8_t { gre, erspan2, erspan3 };
+
+/// A machine that gets copies over the underlay.
+struct Collector {
+  openflow::Ipv4Address address = {};
+  bool is_reached = true;  ///< otherwise it gets none
+
+  bool operator==(Collector const &) const = default;
+};
+
 struct Mirror {
   std::uint32_t id = 0;  ///< not 0, and of no other session of the switch
   std::string sid = {};  ///< for those who count
@@ -150,7 +161,10 @@ struct Mirror {
   std::uint16_t remote_vlan = 0;  ///< the tag that copies have on uplinks; 0: none but their own
   /// Whose frames from uplinks are copies that others made, for this session.
   std::vector<std::uint16_t> taken_vlans = {};
-  std::uint16_t most_bytes = 0;  ///< of a frame; 0 for all
+  std::vector<Collector> collectors = {};
+  Wrapping wrapping = Wrapping::gre;  ///< of copies for collectors
+  std::uint32_t key = 0;              ///< of GRE; of ERSPAN the session
+  std::uint16_t most_bytes = 0;       ///< of a frame; 0 for all
   bool keeps_vlan = false;       ///< copies have the tag of the frame's VLAN
 
   bool operator==(Mirror const &) const = default;

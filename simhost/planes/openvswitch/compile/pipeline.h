@@ -108,6 +108,8 @@ inline constexpr openflow::SubField kTooLarge{kFacts, 0, 1};
 inline constexpr openflow::SubField kVerdict{kFacts, 1, 1};
 /// A Recent: whether the source sent from a port of this switch just before.
 inline constexpr openflow::SubField kRecent{kFacts, 2, 2};
+/// The frame is on its way out of the switch; known to sessions that tell it.
+inline constexpr openflow::SubField kLeaves{kFacts, 4, 1};
 /// The frame's own VLAN, 0 for none.
 inline constexpr auto kVlan = openflow::Field::reg2;
 /// A PrivateKind.
@@ -156,6 +158,10 @@ static_assert(kFirstTunnel + (1U << kTunnelBits) - 1 == kGreatestPort);
 constexpr bool is_tunnel(openflow::Port port) {
   return port >= kFirstTunnel && port <= kGreatestPort;
 }
+
+/// Where copies leave for collectors; no device has these numbers.
+inline constexpr openflow::Port kGrePort = 0xfebe;
+inline constexpr openflow::Port kErspanPort = 0xfebf;
 
 /// In kRecent.
 enum class Recent : std::uint8_t {

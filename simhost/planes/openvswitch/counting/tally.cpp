@@ -94,16 +94,17 @@ void Tally::gain_of_port(std::uint64_t cookie, Traffic const &more) {
   }
 }
 
-// A session without a destination that is there takes its frames nowhere.
+// A session without a destination that is there takes its frames nowhere; one all of whose
+// destinations cannot be reached fails.
 void Tally::gain_of_session(CountedSession const &session, std::uint64_t frames) {
   using Stats = VSDVMirrorSessionStats;
   CountingPart const part{.session = session.sid};
-  if (session.copies == 0) {
-    gain(part, counter_in(&Stats::discardedPkts), frames);
-    return;
-  }
-  gain(part, counter_in(&Stats::mirroredPkts), frames);
+  auto const whole = session.copies > 0   ? counter_in(&Stats::mirroredPkts)
+                     : session.failed > 0 ? counter_in(&Stats::failedPkts)
+                                          : counter_in(&Stats::discardedPkts);
+  gain(part, whole, frames);
   gain(part, counter_in(&Stats::mirrorPktCnt), frames * session.copies);
+  gain(part, counter_in(&Stats::mirrorPktFailCnt), frames * session.failed);
 }
 
 void Tally::gain(CountingPart const &part, Counter const &counter, std::uint64_t more) {

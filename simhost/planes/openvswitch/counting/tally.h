@@ -22,6 +22,7 @@ using Totals = std::map<std::uint64_t, openflow::Traffic>;
 struct CountedSession {
   std::string sid;
   std::uint64_t copies = 0;  ///< of each frame
+  std::uint64_t failed = 0;  ///< likewise those that reach nobody
 
   friend bool operator==(CountedSession const &, CountedSession const &) = default;
 };

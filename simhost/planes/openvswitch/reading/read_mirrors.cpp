@@ -1,8 +1,11 @@
 // From the sessions in the tables of ports and of uplinks to what frames have to know of them.
 #include "planes/openvswitch/reading/read_mirrors.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <cstdint>
+#include <cstring>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -60,7 +63,7 @@ class Sessions {
     mirror.most_bytes = snap_length(record.snapLen);
     mirror.keeps_vlan = (record.flags & VS_DVMIRROR_FLAG_DST_ORIG_VLAN) != 0;
     for (auto const &entity : session.to) {
-      add_destination(mirror, record.flags, entity);
+      add_destination(mirror, record, entity);
     }
     if (record.type == VS_DVMIRROR_SESSIONTYPE_RMIRROR_DST) {
       take_copies(mirror, session);
@@ -76,8 +79,8 @@ class Sessions {
   // they come from.
   void take_copies(Mirror &mirror, mirror::Session const &session) const {
     auto const &record = session.record;
-    if (!mirror.to_uplinks.empty()) {
-      refuse_session("takes copies from uplinks, and mirrors to one");
+    if (!mirror.to_uplinks.empty() || !mirror.collectors.empty()) {
+      refuse_session("takes copies from uplinks, and mirrors to others than ports");
     }
     if (!session.sent_by.empty() || (record.wildIn | record.wildOut) != 0) {
       refuse_session(kTakesMore);
@@ -97,10 +100,6 @@ class Sessions {
   }
 
   void check(DVMirrorSession const &record) const {
-    auto const wraps = (record.flags & VS_DVMIRROR_FLAG_DST_ENCAP) != 0;
-    if (wraps || record.type == VS_DVMIRROR_SESSIONTYPE_ERMIRROR_SRC) {
-      refuse_session("wraps what it mirrors, which is not done here");
-    }
     if (((record.wildIn | record.wildOut) & ~VS_DVMIRROR_WILDCARD_PNIC) != 0) {
       refuse_session("mirrors clients of a kind, which are not told apart here");
     }
@@ -137,13 +136,61 @@ class Sessions {
     return sources;
   }
 
-  void add_destination(Mirror &mirror, std::uint32_t flags, DVMirrorEntity const &entity) {
-    if (entity.type == MIRROR_ENTTYPE_IP || entity.type == MIRROR_ENTTYPE_VLAN) {
-      refuse_session("mirrors to what is no port and no uplink");
+  void add_collector(Mirror &mirror, DVMirrorSession const &record, DVMirrorEntity const &entity) {
+    bool const wraps = (record.flags & VS_DVMIRROR_FLAG_DST_ENCAP) != 0 ||
+                       record.type == VS_DVMIRROR_SESSIONTYPE_ERMIRROR_SRC;
+    auto const underlay = storage::underlay_of(transaction_);
+    if (!wraps) {
+      refuse_session("mirrors to an address, and wraps nothing");
     }
+    if (!underlay) {
+      refuse_session("mirrors to an address, and the host has no underlay");
+    }
+    Collector collector;
+    auto const address = mirror::Address::bytes(entity);
+    if (address.size() != collector.address.size() || underlay->address.size() != address.size()) {
+      refuse_session(
+          "mirrors to an address of IPv6, or over an underlay of IPv6, which is not done here");
+    }
+    if (address == underlay->address) {
+      refuse_session("mirrors to the address of this host");
+    }
+    std::memcpy(collector.address.data(), address.data(), address.size());
+    if (std::ranges::find(mirror.collectors, collector) == mirror.collectors.end()) {
+      mirror.collectors.push_back(collector);
+    }
+    read_wrapping(mirror, record);
+  }
+
+  void read_wrapping(Mirror &mirror, DVMirrorSession const &record) const {
+    constexpr std::uint32_t kGreatestErspan = 1023;
+    mirror.wrapping = static_cast<Wrapping>(record.encapType);
+    mirror.key = mirror.wrapping == Wrapping::gre ? record.greKey : record.erspanID;
+    if (mirror.wrapping != Wrapping::gre && mirror.key > kGreatestErspan) {
+      refuse_session(fmt::format("is session {} of ERSPAN, which has {} at most", mirror.key,
+                                 kGreatestErspan));
+    }
+  }
+
+  void add_destination(Mirror &mirror, DVMirrorSession const &record,
+                       DVMirrorEntity const &entity) {
+    if (entity.type == MIRROR_ENTTYPE_VLAN) {
+      refuse_session("mirrors to a VLAN");
+    }
+    if (entity.type == MIRROR_ENTTYPE_IP) {
+      add_collector(mirror, record, entity);
+      return;
+    }
+    if (record.type == VS_DVMIRROR_SESSIONTYPE_ERMIRROR_SRC) {
+      refuse_session("is an encapsulated one, and mirrors to what is no address");
+    }
+    auto const flags = record.flags;
     auto const place = place_of(entity);
     if (!place) {
       return;
+    }
+    if (!place->is_uplink && (flags & VS_DVMIRROR_FLAG_DST_ENCAP) != 0) {
+      refuse_session("wraps what it mirrors to a port, which is not done here");
     }
     auto &places = place->is_uplink ? mirror.to_uplinks : mirror.to_ports;
     if (std::ranges::find(places, place->port) == places.end()) {

@@ -18,7 +18,7 @@ class Delivery {
  public:
   Delivery(Plan const &plan, Program &program, Port const &port)
       : plan_(plan), program_(program), port_(port) {
-    copies_ = copies(plan, &Mirror::received, &MirrorSources::ports, port.port);
+    copies_ = copies(plan, &Mirror::received, &MirrorSources::ports, port.port, Copied::leaving);
   }
 
   void compile() {

@@ -21,11 +21,12 @@ void add_if_any(Program &program, std::uint8_t where, Match match, Actions actio
 void copy_by_port(Plan const &plan, Program &program) {
   for (auto const &port : plan.network.ports) {
     add_if_any(program, table::kMirrorsOfPorts, from(port.port),
-               copies(plan, &Mirror::sent, &MirrorSources::ports, port.port));
+               copies(plan, &Mirror::sent, &MirrorSources::ports, port.port, Copied::coming));
   }
   for (auto const &uplink : plan.network.uplinks) {
-    add_if_any(program, table::kMirrorsOfPorts, from(uplink.port),
-               copies(plan, &Mirror::received, &MirrorSources::uplinks, uplink.port));
+    add_if_any(
+        program, table::kMirrorsOfPorts, from(uplink.port),
+        copies(plan, &Mirror::received, &MirrorSources::uplinks, uplink.port, Copied::coming));
   }
 }
 
@@ -38,9 +39,9 @@ void copy_by_vlan(Plan const &plan, Program &program) {
   for (auto const vlan : vlans) {
     auto const in_vlan = Match().with(field::kVlan, vlan);
     add_if_any(program, table::kMirrorsOfVlans, Match(in_vlan).with(field::kOrigin, kFromClient),
-               copies(plan, &Mirror::sent, &MirrorSources::vlans, vlan));
+               copies(plan, &Mirror::sent, &MirrorSources::vlans, vlan, Copied::coming));
     add_if_any(program, table::kMirrorsOfVlans, Match(in_vlan).with(field::kOrigin, kFromUplink),
-               copies(plan, &Mirror::received, &MirrorSources::vlans, vlan));
+               copies(plan, &Mirror::received, &MirrorSources::vlans, vlan, Copied::coming));
   }
 }
 
@@ -113,28 +114,84 @@ Actions copies_to(Mirror const &mirror, Actions const &outputs, Tagged *tagged) 
   return actions;
 }
 
-void copy_out(Program &program, Mirror const &mirror, std::set<openflow::Port> const &closed) {
-  auto const to_ports = outputs(mirror, mirror.to_ports, closed);
-  auto const to_uplinks = outputs(mirror, mirror.to_uplinks, closed);
-  auto add = [&](std::uint16_t priority, Match const &match, Tagged *at_ports, Tagged *on_wires) {
-    auto actions = copies_to(mirror, to_ports, at_ports);
-    append(actions, copies_to(mirror, to_uplinks, on_wires));
-    program.add(table::kMirrors, {.priority = priority,
-                                  .match = Match(match).with(field::kSession, mirror.id),
-                                  .actions = std::move(actions),
-                                  .cookie = cookie(Counted::mirrored, mirror.id)});
-  };
-  if (mirror.keeps_vlan) {
-    add(100, Match(), with_own_tag, with_both_tags);
-    if (mirror.remote_vlan != 0 && !to_uplinks.empty()) {
-      // A third tag would take the place of the last one.
-      add(150, Match().tagged(), with_own_tag, with_remote_tag);
-    }
-    add(200, Match().with(field::kVlan, 0), without_tag, with_remote_tag);
-  } else {
-    add(100, Match(), without_tag, with_remote_tag);
+// What a port that wraps frames takes of each of them, beside its bytes.
+Actions wrapping(Mirror const &mirror, Collector const &collector, Copied where) {
+  Actions actions{openflow::set(Field::tun_dst, openflow::to_value(collector.address)),
+                  openflow::set(Field::tun_id, mirror.key)};
+  if (mirror.wrapping == Wrapping::erspan2) {
+    actions.emplace_back(openflow::set(Field::tun_erspan_ver, 1));
+  } else if (mirror.wrapping == Wrapping::erspan3) {
+    actions.emplace_back(openflow::set(Field::tun_erspan_ver, 2));
+    actions.emplace_back(openflow::set(Field::tun_erspan_dir, where == Copied::leaving ? 1 : 0));
   }
+  return actions;
 }
+
+// On a copy of the frame: what wraps it is none of the frame's for those who get it next.
+Actions copies_to_collectors(Mirror const &mirror, Copied where, Tagged *tagged) {
+  auto const port = mirror.wrapping == Wrapping::gre ? kGrePort : kErspanPort;
+  Actions actions;
+  for (auto const &collector : mirror.collectors) {
+    if (collector.is_reached) {
+      auto copy = wrapping(mirror, collector, where);
+      append(copy, tagged(mirror, {output(mirror, port)}));
+      actions.emplace_back(openflow::Clone{std::move(copy)});
+    }
+  }
+  return actions;
+}
+
+class Copies {
+ public:
+  Copies(Program &program, Mirror const &mirror, std::set<openflow::Port> const &closed)
+      : program_(program),
+        mirror_(mirror),
+        to_ports_(outputs(mirror, mirror.to_ports, closed)),
+        to_uplinks_(outputs(mirror, mirror.to_uplinks, closed)) {}
+
+  void compile() {
+    if (!tells_direction(mirror_)) {
+      compile(Match(), Copied::coming);
+      return;
+    }
+    for (auto const where : {Copied::coming, Copied::leaving}) {
+      compile(with_bits(Match(), field::kLeaves, where == Copied::leaving ? 1 : 0), where);
+    }
+  }
+
+ private:
+  void compile(Match const &match, Copied where) {
+    if (!mirror_.keeps_vlan) {
+      add(100, match, where, {without_tag, with_remote_tag});
+      return;
+    }
+    add(100, match, where, {with_own_tag, with_both_tags});
+    if (mirror_.remote_vlan != 0 && !to_uplinks_.empty()) {
+      // A third tag would take the place of the last one.
+      add(150, Match(match).tagged(), where, {with_own_tag, with_remote_tag});
+    }
+    add(200, Match(match).with(field::kVlan, 0), where, {without_tag, with_remote_tag});
+  }
+
+  struct Tags {
+    Tagged *of_others;
+    Tagged *on_wires;
+  };
+  void add(std::uint16_t priority, Match match, Copied where, Tags const &tags) {
+    auto actions = copies_to(mirror_, to_ports_, tags.of_others);
+    append(actions, copies_to(mirror_, to_uplinks_, tags.on_wires));
+    append(actions, copies_to_collectors(mirror_, where, tags.of_others));
+    program_.add(table::kMirrors, {.priority = priority,
+                                   .match = match.with(field::kSession, mirror_.id),
+                                   .actions = std::move(actions),
+                                   .cookie = cookie(Counted::mirrored, mirror_.id)});
+  }
+
+  Program &program_;
+  Mirror const &mirror_;
+  Actions to_ports_;
+  Actions to_uplinks_;
+};
 
 }  // namespace
 
@@ -149,7 +206,7 @@ void compile_mirrors(Plan const &plan, Program &program) {
   copy_by_vlan(plan, program);
   auto const closed = closed_ones(plan.network);
   for (auto const &mirror : plan.network.mirrors) {
-    copy_out(program, mirror, closed);
+    Copies(program, mirror, closed).compile();
   }
 }
 

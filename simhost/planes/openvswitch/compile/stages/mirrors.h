@@ -10,7 +10,17 @@
 
 namespace simhost::openvswitch {
 
-inline void append_copies(Actions &actions, Mirror const &mirror) {
+/// Where a frame is copied: as it comes into the switch, or as it leaves it.
+enum class Copied { coming, leaving };
+
+inline bool tells_direction(Mirror const &mirror) {
+  return mirror.wrapping == Wrapping::erspan3 && !mirror.collectors.empty();
+}
+
+inline void append_copies(Actions &actions, Mirror const &mirror, Copied where) {
+  if (where == Copied::leaving && tells_direction(mirror)) {
+    actions.emplace_back(openflow::load(field::kLeaves, 1));
+  }
   actions.emplace_back(openflow::set(field::kSession, mirror.id));
   actions.push_back(go_to(table::kMirrors));
 }
@@ -19,12 +29,12 @@ inline void append_copies(Actions &actions, Mirror const &mirror) {
 /// Mirror::sent, `kind` where in it the source is.
 template <typename Source>
 Actions copies(Plan const &plan, MirrorSources Mirror::*direction,
-               std::vector<Source> MirrorSources::*kind, Source const &source) {
+               std::vector<Source> MirrorSources::*kind, Source const &source, Copied where) {
   Actions actions;
   for (auto const &mirror : plan.network.mirrors) {
     auto const &sources = mirror.*direction.*kind;
     if (std::find(sources.begin(), sources.end(), source) != sources.end()) {
-      append_copies(actions, mirror);
+      append_copies(actions, mirror, where);
     }
   }
   return actions;

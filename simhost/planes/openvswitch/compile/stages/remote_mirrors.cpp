@@ -46,7 +46,7 @@ std::map<Way const *, Actions> takers(Plan const &plan, std::uint16_t vlan) {
   for (auto const &mirror : plan.network.mirrors) {
     bool const takes = std::ranges::find(mirror.taken_vlans, vlan) != mirror.taken_vlans.end();
     if (auto const *const way = takes ? way_of(plan, mirror) : nullptr) {
-      append_copies(takers[way], mirror);
+      append_copies(takers[way], mirror, Copied::coming);
     }
   }
   return takers;

@@ -1,0 +1,47 @@
+// A request of rtnetlink, and its reply.
+#pragma once
+
+#include <linux/netlink.h>
+#include <linux/rtnetlink.h>
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <span>
+
+#include "storage/tunnels/fabrics.h"
+
+namespace simhost::daemon {
+
+class NetlinkRequest {
+ public:
+  template <typename Body>
+  NetlinkRequest(std::uint16_t type, std::uint16_t flags, Body const &body) {
+    header().nlmsg_type = type;
+    header().nlmsg_flags = static_cast<std::uint16_t>(NLM_F_REQUEST | flags);
+    header().nlmsg_len = NLMSG_LENGTH(sizeof body);
+    std::memcpy(NLMSG_DATA(&header()), &body, sizeof body);
+  }
+
+  NetlinkRequest &with(std::uint16_t type, std::span<std::byte const> content);
+  NetlinkRequest &with(std::uint16_t type, unsigned number) {
+    return with(type, std::as_bytes(std::span(&number, 1)));
+  }
+
+  /// The kernel's reply, which takes the place of the request.
+  nlmsghdr &exchanged();
+
+ private:
+  nlmsghdr &header() { return *reinterpret_cast<nlmsghdr *>(bytes_.data()); }
+
+  alignas(nlmsghdr) std::array<char, 8192> bytes_{};
+};
+
+/// 0, or what the kernel had against it.
+int error_in(nlmsghdr &reply);
+
+/// AF_INET or AF_INET6.
+std::uint8_t family_of(storage::AddressBytes const &address);
+
+}  // namespace simhost::daemon

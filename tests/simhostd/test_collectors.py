@@ -1,0 +1,243 @@
+"""Mirror sessions whose copies go to collectors: wrapped in GRE or ERSPAN, over the underlay."""
+
+import json
+import struct
+from pathlib import Path
+from typing import Any, Dict, Iterator, List, NamedTuple
+
+import pytest
+from frame_lab import ONE_SWITCH, Lab, comes_true
+from simhost import frame
+from simhost._wires import PacketSocket
+
+BROADCAST = "ff:ff:ff:ff:ff:ff"
+STRANGER = "02:00:00:00:88:01"
+HERE, ONE, OTHER, NOBODY = (f"198.51.100.{number}" for number in (1, 7, 8, 9))
+KEY = 0xC0FFEE
+ERSPAN = 1023
+GRE_KEY, GRE_SEQUENCE = 0x2000, 0x1000
+ETHERNET, ERSPAN_2, ERSPAN_3 = 0x6558, 0x88BE, 0x22EB
+
+
+class Packet(NamedTuple):
+    """What a collector got, as it reads it: RFC 2890, and the drafts of ERSPAN."""
+
+    kind: int
+    source: str
+    destination: str
+    key: int
+    leaves: bool
+    copy: bytes
+
+
+def read(data: bytes) -> Packet:
+    """A packet of GRE, with its Ethernet."""
+    source, destination = (".".join(map(str, data[at : at + 4])) for at in (26, 30))
+    flags, kind = struct.unpack_from("!HH", data, 34)
+    if kind == ETHERNET:
+        assert flags == GRE_KEY
+        (key,) = struct.unpack_from("!I", data, 38)
+        return Packet(kind, source, destination, key, False, data[42:])
+    assert flags == GRE_SEQUENCE
+    first, session = struct.unpack_from("!HH", data, 42)
+    # The version; of VLANs, classes of service, trunks and damage nothing is told.
+    assert first == {ERSPAN_2: 0x1000, ERSPAN_3: 0x2000}[kind] and session <= ERSPAN
+    if kind == ERSPAN_2:
+        assert data[46:50] == bytes(4)
+        return Packet(kind, source, destination, session, False, data[50:])
+    (rest,) = struct.unpack_from("!H", data, 52)
+    assert rest & ~8 == 0
+    return Packet(kind, source, destination, session, bool(rest & 8), data[54:])
+
+
+def is_wrapped(data: bytes) -> bool:
+    return data[12:14] == b"\x08\x00" and data[23] == 47
+
+
+class Collectors:
+    """A machine beyond the underlay with two addresses."""
+
+    def __init__(self, lab: Lab) -> None:
+        self.lab = lab
+        self.machine = lab.frames.new_namespace()
+        lab.wire("under", self.machine, "eth0")
+        for address in (ONE, OTHER):
+            self.machine.run("ip", "address", "add", f"{address}/24", "dev", "eth0")
+        self._socket = PacketSocket(self.machine, "eth0")
+
+    def expect(self, copy: bytes, count: int) -> List[Packet]:
+        """So many wrapped copies, and no more than these."""
+        packets: List[Packet] = []
+        for _ in range(count):
+            found = self._socket.find(lambda data: is_wrapped(data), 5)
+            assert found is not None, f"{count - len(packets)} are missing"
+            packets.append(read(found))
+        assert self._socket.find(lambda data: is_wrapped(data), 0.1) is None
+        assert [packet.copy for packet in packets] == [copy] * count
+        return packets
+
+    def close(self) -> None:
+        self._socket.close()
+
+
+def session(**said: Any) -> Dict[str, Any]:
+    return {"sid": "s", "type": "encapsulated", "sent_by": [{"port": "a"}], **said}
+
+
+def encapsulation(kind: str) -> Dict[str, Any]:
+    return {"type": kind, "key": KEY} if kind == "gre" else {"type": kind, "id": ERSPAN}
+
+
+def to(*addresses: str) -> List[Dict[str, str]]:
+    return [{"ip": address} for address in addresses]
+
+
+def mirror(lab: Lab, *sessions: Dict[str, Any], switch: str = "lab") -> None:
+    lab.set_port(switch, "a", vlan=7, mirror_sessions=list(sessions))
+
+
+def counters(lab: Lab) -> Any:
+    switch = next(
+        one for one in json.loads(lab.ctl("show", "--json"))["switches"] if one["alias"] == "lab"
+    )
+    return switch.get("mirror_counters", {}).get("s", {})
+
+
+def all_reply(lab: Lab) -> bool:
+    return comes_true(lambda: lab.is_in_force() and "does not reply" not in lab.plane()["said"])
+
+
+UNDERLAY = {"device": "under", "address": f"{HERE}/24"}
+
+
+@pytest.fixture
+def lab(tmp_path: Path) -> Iterator[Lab]:
+    """Two switches; copies of whole frames fit the underlay."""
+    (switch,) = ONE_SWITCH["switches"]
+    more = {"alias": "more", "ports": [{"id": "a"}]}
+    with Lab(tmp_path, {"switches": [{"mtu": 1400, **switch, "uplinks": []}, more]}) as lab:
+        yield lab
+
+
+@pytest.fixture
+def collectors(lab: Lab) -> Iterator[Collectors]:
+    collectors = Collectors(lab)
+    lab.start()
+    lab.apply({"underlay": UNDERLAY})
+    yield collectors
+    collectors.close()
+
+
+def test_copies_come_wrapped(lab: Lab, collectors: Collectors) -> None:
+    macs = {port: f"02:00:00:00:77:0{port}" for port in "ab"}
+    one, other = (lab.frames.client("lab", port, mac=mac) for port, mac in macs.items())
+    lab.set_port("lab", "b", vlan=7)
+    sent = frame(other.mac, one.mac, payload=bytes(range(200)) * 6)
+    for kind, number in (("gre", ETHERNET), ("erspan2", ERSPAN_2), ("erspan3", ERSPAN_3)):
+        key = KEY if kind == "gre" else ERSPAN
+        mirror(lab, session(to=to(ONE, OTHER), encapsulation=encapsulation(kind)))
+        assert all_reply(lab)
+        one.send(sent)
+        other.expect(sent)
+        assert sorted(collectors.expect(sent, 2)) == [
+            Packet(number, HERE, address, key, False, sent) for address in (ONE, OTHER)
+        ]
+        # What the port gets, a part of it, with its tag.
+        cut = {"snap_length": 64, "keeps_vlan": True, "encapsulation": encapsulation(kind)}
+        mirror(lab, session(to=to(ONE), sent_by=[], received_by=[{"port": "a"}], **cut))
+        back = frame(one.mac, other.mac, payload=bytes(range(200)))
+        tagged = frame(one.mac, other.mac, vlan=7, payload=bytes(range(200)))[:68]
+        other.send(back)
+        one.expect(back)
+        (packet,) = collectors.expect(tagged, 1)
+        assert packet.leaves == (kind == "erspan3")
+    assert comes_true(lambda: bool(counters(lab) == {"mirroredPkts": 6, "mirrorPktCnt": 9}))
+
+
+def test_two_switches_mirror_to_one_collector(lab: Lab, collectors: Collectors) -> None:
+    both = [lab.client("lab", "a"), lab.client("more", "a")]
+    for switch in ("lab", "more"):
+        said = session(to=to(ONE), encapsulation=encapsulation("gre"))
+        mirror(
+            lab,
+            said,
+            {**said, "sid": "t", "encapsulation": encapsulation("erspan2")},
+            switch=switch,
+        )
+    assert all_reply(lab)
+    for client in both:
+        sent = frame(BROADCAST, client.mac, payload=b"both" * 20)
+        client.send(sent)
+        assert {packet.kind for packet in collectors.expect(sent, 2)} == {ETHERNET, ERSPAN_2}
+
+
+def test_a_collector_that_does_not_reply_is_told_and_counted(
+    lab: Lab, collectors: Collectors
+) -> None:
+    client = lab.client("lab", "a")
+    mirror(lab, session(to=to(NOBODY)))
+    told = f"the collector {NOBODY} of mirror sessions does not reply"
+
+    def send() -> bytes:
+        sent = frame(BROADCAST, client.mac, payload=b"three" * 20)
+        for _ in range(3):
+            client.send(sent)
+        return sent
+
+    assert told in lab.plane()["said"]
+    send()
+    failed = {"failedPkts": 3, "mirrorPktFailCnt": 3}
+    assert comes_true(lambda: bool(counters(lab) == failed)), counters(lab)
+    mirror(lab, session(to=to(ONE, NOBODY)))
+    assert comes_true(lambda: ONE not in lab.plane()["said"])
+    collectors.expect(send(), 3)
+    both = {"failedPkts": 3, "mirrorPktFailCnt": 6, "mirroredPkts": 3, "mirrorPktCnt": 3}
+    assert comes_true(lambda: bool(counters(lab) == both)), counters(lab)
+    # It comes, its wire is pulled, and plugged in again.
+    collectors.machine.run("ip", "address", "add", f"{NOBODY}/24", "dev", "eth0")
+    assert all_reply(lab)
+    collectors.machine.run("ip", "link", "set", "eth0", "down")
+    assert comes_true(lambda: told in lab.plane()["said"])
+    collectors.machine.run("ip", "link", "set", "eth0", "up")
+    assert all_reply(lab)
+    collectors.expect(send(), 6)
+
+
+def test_what_comes_back_wrapped_reaches_nobody(lab: Lab, collectors: Collectors) -> None:
+    client = lab.client("lab", "a")
+    mirror(lab, session(to=to(ONE)))
+    assert all_reply(lab)
+    client.send(frame(BROADCAST, client.mac, payload=b"there" * 20))
+    (data,) = [collectors._socket.find(lambda found: is_wrapped(found), 5)]
+    assert data is not None
+    # The same way back, with the key of each switch.
+    addresses = data[6:12] + data[:6]
+    for key in range(4):
+        header = data[12:26] + data[30:34] + data[26:30] + data[34:38] + struct.pack("!I", key)
+        collectors._socket.send(
+            addresses + header + frame(BROADCAST, STRANGER, payload=b"back" * 20)
+        )
+    client.expect_none(lambda came: b"back" in came)
+
+
+@pytest.mark.parametrize(
+    "said, why",
+    [
+        ({"to": to(ONE)}, "mirrors to an address, and the host has no underlay"),
+        ({"to": to(ONE), "type": "port"}, "mirrors to an address, and wraps nothing"),
+    ],
+)
+def test_what_cannot_be_is_refused(lab: Lab, said: Dict[str, Any], why: str) -> None:
+    lab.start()
+    lab.client("lab", "a")
+    ports = [{"id": "a", "mirror_sessions": [session(**said)]}]
+    document = {"switches": [{"alias": "lab", "ports": ports}]}
+    refused = lab.try_ctl("apply", "-", given=json.dumps(document))
+    assert refused.returncode != 0 and f"the mirror session 's' {why}" in refused.stdout
+    (port,) = (
+        one
+        for switch in json.loads(lab.ctl("show", "--json"))["switches"]
+        for one in switch["ports"]
+        if one["id"] == "a" and switch["alias"] == "lab"
+    )
+    assert "mirror_sessions" not in port
