@@ -173,14 +173,13 @@ inline constexpr std::string_view kBeyondFrames =
     "`sampling_rate`: Open vSwitch mirrors every frame; `cos` and `granularity`: its ERSPAN says "
     "neither";
 
-inline constexpr auto sessions =
-    property<Table>(VSPROP_PORT_MIRROR_SESSIONS)
-        .of_port()
-        .typed()
-        .json("mirror_sessions", kTable)
-        .frames_obey()
-        .frames_cannot(kBeyondFrames)
-        .says("the mirror sessions of the port, all of them");
+inline constexpr auto sessions = property<Table>(VSPROP_PORT_MIRROR_SESSIONS)
+                                     .of_port()
+                                     .typed()
+                                     .json("mirror_sessions", kTable)
+                                     .frames_obey()
+                                     .frames_cannot(kBeyondFrames)
+                                     .says("the mirror sessions of the port, all of them");
 
 inline constexpr auto uplink_sessions =
     property<Table>(VSPROP_SWITCH_UPLINK_MIRROR_SESSIONS)

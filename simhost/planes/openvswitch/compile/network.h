@@ -165,7 +165,7 @@ struct Mirror {
   Wrapping wrapping = Wrapping::gre;  ///< of copies for collectors
   std::uint32_t key = 0;              ///< of GRE; of ERSPAN the session
   std::uint16_t most_bytes = 0;       ///< of a frame; 0 for all
-  bool keeps_vlan = false;       ///< copies have the tag of the frame's VLAN
+  bool keeps_vlan = false;            ///< copies have the tag of the frame's VLAN
 
   bool operator==(Mirror const &) const = default;
 };

@@ -145,7 +145,8 @@ void compile_wire(Plan const &plan, Program &program, Uplink const &uplink) {
     return;
   }
   // Of the frame as it is inside.
-  auto const copied = copies(plan, &Mirror::sent, &MirrorSources::uplinks, uplink.port, Copied::leaving);
+  auto const copied =
+      copies(plan, &Mirror::sent, &MirrorSources::uplinks, uplink.port, Copied::leaving);
   auto send = [&](std::uint16_t priority, Match const &match, Actions const &out) {
     auto actions = copied;
     add(priority, match, append(actions, out));
