@@ -171,10 +171,8 @@ bool NetworkDevices::take_device(nlmsghdr const &header) {
   if (header.nlmsg_type == RTM_DELLINK) {
     return remove(index);
   }
-  NetworkDevice device{.index = index,
-                       .is_up = (info.ifi_flags & IFF_UP) != 0,
-                       .has_link = (info.ifi_flags & IFF_RUNNING) != 0,
-                       .mtu = 0};
+  NetworkDevice device{
+      .index = index, .is_up = (info.ifi_flags & IFF_UP) != 0, .has_link = false, .mtu = 0};
   std::string name;
   auto size = IFLA_PAYLOAD(&header);
   for (auto const *attribute = IFLA_RTA(&info); RTA_OK(attribute, size);
@@ -183,6 +181,10 @@ bool NetworkDevices::take_device(nlmsghdr const &header) {
       name = static_cast<char const *>(RTA_DATA(attribute));
     } else if (attribute->rta_type == IFLA_MTU) {
       std::memcpy(&device.mtu, RTA_DATA(attribute), sizeof device.mtu);
+    } else if (attribute->rta_type == IFLA_CARRIER) {
+      // At once, where IFF_RUNNING may follow a second later.
+      device.has_link =
+          device.is_up && *static_cast<std::uint8_t const *>(RTA_DATA(attribute)) != 0;
     } else if (attribute->rta_type == IFLA_MASTER) {
       std::memcpy(&device.master, RTA_DATA(attribute), sizeof device.master);
     }
