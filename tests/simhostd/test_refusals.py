@@ -62,9 +62,15 @@ BOUNDS = [
     ),
     Bound(
         {"to": [{"port": "c"}, {"uplink": "nic0"}]},
-        [{"to": [{"vlan": 5}]}, {"to": [{"port": "c"}, {"ip": "192.0.2.1"}]}],
+        [{"to": [{"vlan": 5}]}, {"to": [{"port": "c"}, {"vlan": 5}]}],
         "QEX_NOT_SUPPORTED",
-        "mirrors to what is no port and no uplink",
+        "mirrors to a VLAN",
+    ),
+    Bound(
+        {"to": [{"port": "c"}]},
+        [{"to": [{"port": "c"}, {"ip": "192.0.2.1"}]}],
+        "QEX_NOT_SUPPORTED",
+        "mirrors to an address, and wraps nothing",
     ),
     Bound(
         {"type": "remote_source", "encapsulation": {"vlan": 1}},
