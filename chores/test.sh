@@ -107,7 +107,7 @@ cmd_test() {
   leave_out_tests
   # First the files that take longest, or one processor would end with them alone.
   # shellcheck disable=SC2086 # a list of words
-  other_tests tests/robustness tests $deselected "$@"
+  other_tests tests/robustness tests/simhostd tests $deselected "$@"
   # shellcheck disable=SC2086 # a list of words
   pytest "Class tests" classes.xml '' tests/classes $deselected "$@"
   pytest "Object tests" objects.xml '' tests/vswitch "$@"
