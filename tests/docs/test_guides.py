@@ -81,6 +81,7 @@ def test_sessions_of_python(guide: Path, tmp_path: Path) -> None:
         "describing_a_host",
         "frames",
         "performance",
+        "rack",
         "record_once",
         "recording",
         "replaying",

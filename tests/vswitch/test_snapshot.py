@@ -75,11 +75,15 @@ def test_there_are_documents_of_each_kind() -> None:
     assert len(DOCUMENTS) > 8 and "lab" in names and "describing_a_host" in names
 
 
-def without_devices(said: Any) -> Any:
-    """Devices go by real time, and the clock of these tests stands."""
+# What brings frames to a host.
+WIRES = ("device", "fabric", "underlay")
+
+
+def without_wires(said: Any) -> Any:
+    """Frames go by real time, and the clock of these tests stands."""
     if isinstance(said, dict):
-        return {key: without_devices(one) for key, one in said.items() if key != "device"}
-    return [without_devices(one) for one in said] if isinstance(said, list) else said
+        return {key: without_wires(one) for key, one in said.items() if key not in WIRES}
+    return [without_wires(one) for one in said] if isinstance(said, list) else said
 
 
 @pytest.mark.parametrize("document", DOCUMENTS)
@@ -87,7 +91,7 @@ def test_the_clone_of_what_pages_describe(
     host: simhost.Host, objects: Host, document: Document
 ) -> None:
     """On top of the default host, whose clone it is, too."""
-    host.apply({**without_devices(document), "faults": []})
+    host.apply({**without_wires(document), "faults": []})
     host.apply({"clock": STOPPED})
     before, described = whole(objects), host.describe()
     clone = clone_of(before)
