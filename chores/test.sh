@@ -20,7 +20,7 @@
 # Without them clang-tidy passes over the tests' own C++ and recordings; of the simulated host over
 # its calls, its documents, its programs, and what talks to Open vSwitch or other hosts; and of the
 # rest of it over its analyzer and its bugprone checks: these take long, and ./dev lint has them. The
-# fuzzers that link the whole simulated host are left to ./dev stress.
+# fuzzers that link a whole host are left to ./dev stress.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
@@ -191,7 +191,7 @@ test_recorded() {
 }
 
 test_fuzzers() {
-  summarize "Left to ./dev stress: the fuzzers that link the whole simulated host"
+  summarize "Left to ./dev stress: the fuzzers that link a whole host"
   if build_fuzzers brief_fuzzers; then
     pytest "Fuzzers" fuzz.xml '' tests/fuzz -k 'not of_the_host' "$@"
   else

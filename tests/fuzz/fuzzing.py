@@ -17,11 +17,9 @@ HERE = Path(__file__).parent
 ROOT = HERE.parent.parent
 BUILD = Path(os.environ.get("FUZZERS_DIR", ROOT / "build-fuzzers"))
 
-OF_THE_HOST = ["mirror", "properties", "runtime_options", "scenario", "state_image"]
-"""Those that link the whole simulated host."""
-NAMES = sorted(
-    [*OF_THE_HOST, "decoded", "multicast", "openflow", "ovsdb", "script", "tables", "texts"]
-)
+OF_THE_HOST = ["mirror", "properties", "runtime_options", "scenario", "script", "state_image"]
+"""Those that link a whole host: the simulated one, or what plays a recording."""
+NAMES = sorted([*OF_THE_HOST, "decoded", "multicast", "openflow", "ovsdb", "tables", "texts"])
 """Each is a harness of this folder."""
 
 # A run that takes so long hangs; all take far below a second, sanitizers included.
