@@ -82,7 +82,7 @@ BOUNDS = [
         TAKEN,
         [{**TAKEN, "to": [{"uplink": "nic0"}]}],
         "QEX_NOT_SUPPORTED",
-        "takes copies from uplinks, and mirrors to one",
+        "takes copies from uplinks, and mirrors to others than ports",
     ),
     Bound(
         TAKEN,
