@@ -6,8 +6,7 @@ import subprocess
 import sys
 from contextlib import ExitStack
 from pathlib import Path
-from types import TracebackType
-from typing import Any, Callable, Dict, List, Optional, Type
+from typing import Any, Callable, Dict, List, Optional
 
 from figures import FIGURES, FORMS, PEERS
 from worker import UNROLLED
@@ -57,12 +56,7 @@ class Worker:
     def __enter__(self) -> "Worker":
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        error: Optional[BaseException],
-        traceback: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *unused: object) -> None:
         assert self._process.stdin is not None and self._process.stdout is not None
         self._process.stdin.close()
         self._process.wait()

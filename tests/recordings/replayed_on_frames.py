@@ -12,8 +12,7 @@ import os
 import sys
 import tempfile
 from pathlib import Path
-from types import TracebackType
-from typing import Any, Callable, Dict, List, Optional, Tuple, Type
+from typing import Any, Callable, Dict, List, Optional, Tuple
 
 import yaml
 
@@ -52,14 +51,9 @@ class OnFrames:
         self._wiring = Wiring(self.lab)
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        error: Optional[BaseException],
-        trace: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *error: object) -> None:
         self._wiring.close()
-        self.lab.__exit__(kind, error, trace)
+        self.lab.__exit__(*error)
 
     @property
     def connected(self) -> int:

@@ -17,8 +17,7 @@ import threading
 import time
 from functools import partial
 from pathlib import Path
-from types import TracebackType
-from typing import Callable, Iterator, List, NamedTuple, Optional, Tuple, Type
+from typing import Callable, Iterator, List, NamedTuple, Tuple
 
 import fuzzing
 import processes
@@ -175,12 +174,7 @@ class Progress:
             self._redraw.start()
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        error: Optional[BaseException],
-        traceback: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *unused: object) -> None:
         self._over.set()
         if self._redraw.is_alive():
             self._redraw.join()

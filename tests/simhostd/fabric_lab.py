@@ -7,8 +7,7 @@ import signal
 import subprocess
 from contextlib import ExitStack
 from pathlib import Path
-from types import TracebackType
-from typing import Any, Dict, List, Mapping, Optional, Type
+from typing import Any, Dict, List, Mapping, Optional
 
 from simhost._namespaces import PATIENCE, Namespace, own_user_needed
 
@@ -193,12 +192,7 @@ class FabricLab:
     def __enter__(self) -> "FabricLab":
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        error: Optional[BaseException],
-        trace: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *unused: object) -> None:
         self._left.close()
 
     def host(self, name: str, document: Optional[Mapping[str, Any]] = None) -> Host:

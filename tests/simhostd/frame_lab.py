@@ -8,8 +8,7 @@ import subprocess
 import sys
 import time
 from pathlib import Path
-from types import TracebackType
-from typing import Any, Callable, Dict, Iterator, List, Mapping, Optional, Sequence, Type
+from typing import Any, Callable, Dict, Iterator, List, Mapping, Optional, Sequence
 
 from simhost import Client, Frames, Network, SharedHost
 from simhost._daemon import Daemon, start_simhostd
@@ -91,12 +90,7 @@ class Lab:
     def __enter__(self) -> "Lab":
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        error: Optional[BaseException],
-        trace: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *unused: object) -> None:
         self.stop()
         self.frames.close()
         self.host.close()

@@ -3,8 +3,7 @@ other ends of their wires as a bond, and a client."""
 
 import json
 from pathlib import Path
-from types import TracebackType
-from typing import Dict, Optional, Type
+from typing import Dict
 
 from frame_lab import Lab
 from lasting_open_vswitch import LastingOpenVSwitch
@@ -39,12 +38,7 @@ class Partner:
         self._vsctl("add-port", "far", "client")
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        error: Optional[BaseException],
-        trace: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *unused: object) -> None:
         self._open_vswitch.__exit__()
 
     def _vsctl(self, *words: str) -> str:
