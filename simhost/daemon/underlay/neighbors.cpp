@@ -6,10 +6,14 @@
 #include <cerrno>
 #include <system_error>
 
-#include "daemon/underlay/netlink_request.h"
+#include "daemon/underlay/address_family.h"
+#include "events/netlink_request.h"
 
 namespace simhost::daemon {
 namespace {
+
+using events::error_in;
+using events::NetlinkRequest;
 
 // With an address of Ethernet that nobody has found wrong.
 constexpr unsigned kKnown =

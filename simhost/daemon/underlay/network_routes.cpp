@@ -10,11 +10,14 @@
 #include <cstring>
 #include <system_error>
 
-#include "daemon/underlay/netlink_request.h"
+#include "daemon/underlay/address_family.h"
+#include "events/netlink_request.h"
 
 namespace simhost::daemon {
 namespace {
 
+using events::error_in;
+using events::NetlinkRequest;
 using storage::AddressBytes;
 
 std::uint8_t bits_of(AddressBytes const &address) {

@@ -1,5 +1,5 @@
 // One socket for each request: there are few.
-#include "daemon/underlay/netlink_request.h"
+#include "events/netlink_request.h"
 
 #include <sys/socket.h>
 
@@ -7,7 +7,7 @@
 
 #include "events/descriptor.h"
 
-namespace simhost::daemon {
+namespace simhost::events {
 
 NetlinkRequest &NetlinkRequest::with(std::uint16_t type, std::span<std::byte const> content) {
   auto *const attribute =
@@ -21,13 +21,13 @@ NetlinkRequest &NetlinkRequest::with(std::uint16_t type, std::span<std::byte con
 
 nlmsghdr &NetlinkRequest::exchanged() {
   auto const socket =
-      events::owned(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE), "netlink");
+      owned(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE), "netlink");
   if (send(socket.number(), bytes_.data(), header().nlmsg_len, 0) < 0) {
-    events::fail_with_errno("netlink");
+    fail_with_errno("netlink");
   }
   auto const size = recv(socket.number(), bytes_.data(), bytes_.size(), 0);
   if (size < 0) {
-    events::fail_with_errno("netlink");
+    fail_with_errno("netlink");
   }
   if (!NLMSG_OK(&header(), static_cast<std::size_t>(size))) {
     throw std::runtime_error("the kernel says by netlink what nobody understands");
@@ -40,8 +40,4 @@ int error_in(nlmsghdr &reply) {
                                          : 0;
 }
 
-std::uint8_t family_of(storage::AddressBytes const &address) {
-  return address.size() == 4 ? AF_INET : AF_INET6;
-}
-
-}  // namespace simhost::daemon
+}  // namespace simhost::events

@@ -10,9 +10,7 @@
 #include <cstring>
 #include <span>
 
-#include "storage/tunnels/fabrics.h"
-
-namespace simhost::daemon {
+namespace simhost::events {
 
 class NetlinkRequest {
  public:
@@ -41,7 +39,4 @@ class NetlinkRequest {
 /// 0, or what the kernel had against it.
 int error_in(nlmsghdr &reply);
 
-/// AF_INET or AF_INET6.
-std::uint8_t family_of(storage::AddressBytes const &address);
-
-}  // namespace simhost::daemon
+}  // namespace simhost::events
