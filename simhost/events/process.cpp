@@ -4,12 +4,18 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/prctl.h>
+#include <sys/resource.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 
+#include <algorithm>
 #include <array>
 #include <csignal>
 #include <cstdlib>
+#include <fstream>
+#include <iterator>
+#include <optional>
+#include <sstream>
 #include <stdexcept>
 #include <utility>
 
@@ -41,25 +47,43 @@ std::vector<std::string> environment_with(std::map<std::string, std::string> con
   return all;
 }
 
+// What a child inherits beside its input; none if negative.
+struct Inherited {
+  int output = -1;
+  int life = -1;
+};
+
+// The kernel closes what has the highest number first, so that the end of this one is seen before
+// all others are closed. Its table of numbers grows to that.
+int life_in_child() {
+  constexpr rlim_t kHighest = 0x7fff;
+  rlimit limit{};
+  getrlimit(RLIMIT_NOFILE, &limit);
+  return static_cast<int>(std::min(limit.rlim_cur - 1, kHighest));
+}
+
 // In the child, between fork and exec: only what may be called there.
 [[noreturn]] void become(char const *program, char **words, char **environment, pid_t parent,
-                         int output) {
+                         Inherited inherited) {
   sigset_t none;
   sigemptyset(&none);
   sigprocmask(SIG_SETMASK, &none, nullptr);
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   // The parent may have ended before that.
   if (getppid() == parent) {
-    if (output >= 0) {
-      dup2(output, STDOUT_FILENO);
-      dup2(output, STDERR_FILENO);
+    if (inherited.output >= 0) {
+      dup2(inherited.output, STDOUT_FILENO);
+      dup2(inherited.output, STDERR_FILENO);
+    }
+    if (inherited.life >= 0) {
+      dup2(inherited.life, life_in_child());
     }
     execvpe(program, words, environment);
   }
   _exit(127);
 }
 
-pid_t started(Command const &command, int output) {
+pid_t started(Command const &command, Inherited inherited) {
   auto words = command.words;
   words.insert(words.begin(), command.program);
   auto environment = environment_with(command.environment);
@@ -72,7 +96,7 @@ pid_t started(Command const &command, int output) {
   }
   if (child == 0) {
     become(command.program.c_str(), const_cast<char **>(word_pointers.data()),
-           const_cast<char **>(environment_pointers.data()), parent, output);
+           const_cast<char **>(environment_pointers.data()), parent, inherited);
   }
   return child;
 }
@@ -85,23 +109,83 @@ std::string how_it_ended(int status) {
   return code == 127 ? "cannot be run" : "ended with status " + std::to_string(code);
 }
 
+// How a child ends that the kernel has begun to take down, as waitpid() will tell once it is gone.
+std::optional<int> status_of_ending(pid_t child) {
+  constexpr std::size_t kFlags = 6;  // counted from what follows the name
+  constexpr std::size_t kStatus = 49;
+  constexpr unsigned long kIsExiting = 4;
+  std::ifstream file("/proc/" + std::to_string(child) + "/stat");
+  std::string const line(std::istreambuf_iterator<char>(file), {});
+  std::istringstream after_name(line.substr(std::min(line.rfind(')'), line.size() - 1) + 1));
+  std::vector<std::string> const fields(std::istream_iterator<std::string>(after_name), {});
+  if (fields.size() <= kStatus || (std::stoul(fields[kFlags]) & kIsExiting) == 0) {
+    return std::nullopt;
+  }
+  return std::stoi(fields[kStatus]);
+}
+
+struct Pipe {
+  Descriptor read;
+  Descriptor write;
+};
+
+Pipe pipe_for_child() {
+  std::array<int, 2> ends{};
+  if (pipe2(ends.data(), O_CLOEXEC) != 0) {
+    fail_with_errno("pipe2");
+  }
+  return {.read = Descriptor(ends[0]), .write = Descriptor(ends[1])};
+}
+
 }  // namespace
 
+Process::Start Process::start(Command const &command) {
+  auto life = pipe_for_child();
+  auto const id = started(command, {.life = life.write.number()});
+  return {.id = id, .life = std::move(life.read)};
+}
+
 Process::Process(Loop &loop, Command const &command, std::function<void(std::string)> ended)
-    : id_(started(command, -1)),
+    : Process(loop, start(command), std::move(ended)) {}
+
+Process::Process(Loop &loop, Start start, std::function<void(std::string)> ended)
+    : id_(start.id),
+      life_(std::move(start.life)),
       descriptor_(owned(static_cast<int>(syscall(SYS_pidfd_open, id_, 0)), "pidfd_open")),
       ended_(std::move(ended)),
-      watch_(loop.watch(descriptor_.number(), [this] {
-        // It may be replaced in there.
-        auto const tell = ended_;
-        auto const how = reap();
-        tell(how);
-      })) {}
+      life_watch_(loop.watch(life_.number(), [this] { read_life(); })),
+      watch_(loop.watch(descriptor_.number(), [this] { tell(reap()); })) {}
 
 Process::~Process() {
   if (runs_) {
-    kill(id_, SIGKILL);
-    reap();
+    constexpr auto kPatience = std::chrono::seconds(1);
+    kill();
+    if (is_gone_within(kPatience)) {
+      reap();
+    }
+  }
+}
+
+// A program may close what it did not open.
+void Process::read_life() {
+  life_watch_.end();
+  if (auto const status = status_of_ending(id_)) {
+    tell(how_it_ended(*status));
+  }
+}
+
+// Once. It may be replaced in there.
+void Process::tell(std::string const &how) {
+  if (auto const ended = std::exchange(ended_, nullptr)) {
+    ended(how);
+  }
+}
+
+void Process::kill() {
+  ended_ = nullptr;
+  life_watch_.end();
+  if (runs_) {
+    ::kill(id_, SIGKILL);
   }
 }
 
@@ -109,11 +193,11 @@ void Process::end(Clock::duration patience) {
   if (!runs_) {
     return;
   }
-  kill(id_, SIGTERM);
+  life_watch_.end();
+  ::kill(id_, SIGTERM);
   if (!is_gone_within(patience)) {
-    kill(id_, SIGKILL);
-    // Of a thousand sockets that take whole frames, the kernel closes some seventy a second, and
-    // needs nobody who waits for it.
+    kill();
+    // The kernel needs nobody who waits for it.
     if (!is_gone_within(patience)) {
       watch_.end();
       runs_ = false;
@@ -138,18 +222,13 @@ std::string Process::reap() {
 }
 
 void run(Command const &command) {
-  std::array<int, 2> ends{};
-  if (pipe2(ends.data(), O_CLOEXEC) != 0) {
-    fail_with_errno("pipe2");
-  }
-  Descriptor const output(ends[0]);
-  Descriptor input(ends[1]);
-  auto const child = started(command, input.number());
-  input.close();
+  auto output = pipe_for_child();
+  auto const child = started(command, {.output = output.write.number()});
+  output.write.close();
   std::string said;
   std::array<char, 4096> part{};
   ssize_t size = 0;
-  while ((size = read(output.number(), part.data(), part.size())) > 0) {
+  while ((size = read(output.read.number(), part.data(), part.size())) > 0) {
     said.append(part.data(), static_cast<std::size_t>(size));
   }
   int status = 0;

@@ -19,7 +19,9 @@ struct Command {
 
 class Process {
  public:
-  /// Starts it; `ended` is called when it has ended by itself, with how.
+  /// Starts it; `ended` is called when it has ended by itself, with how. It does nothing any more
+  /// then, but the kernel may go on closing what it had open: one socket that takes whole frames
+  /// after the other, some seventy a second.
   Process(Loop &loop, Command const &command, std::function<void(std::string)> ended);
   /// Ends it at once if it still runs.
   ~Process();
@@ -30,15 +32,32 @@ class Process {
   /// Asks it to end, and ends it if it has not done so in that time. It runs no more after that;
   /// what it had open may still be closed once as much time has gone again.
   void end(Clock::duration patience);
+  /// Ends it at once, and waits for nothing. Nobody is told.
+  void kill();
+  /// Whether it has ended, and nothing of it is open any more.
+  [[nodiscard]] bool is_gone() const { return !runs_; }
 
  private:
+  void read_life();
+  void tell(std::string const &how);
   [[nodiscard]] bool is_gone_within(Clock::duration patience) const;
   std::string reap();
 
+  // One end of a pipe of which the program has the other one: it is told by that when it is about
+  // to end.
+  struct Start {
+    int id;
+    Descriptor life;
+  };
+  static Start start(Command const &command);
+  Process(Loop &loop, Start start, std::function<void(std::string)> ended);
+
   int id_;
   bool runs_ = true;
+  Descriptor life_;
   Descriptor descriptor_;
   std::function<void(std::string)> ended_;
+  Loop::Watch life_watch_;
   Loop::Watch watch_;
 };
 

@@ -10,17 +10,13 @@
 #include <string>
 #include <vector>
 
-#include "events/process.h"
 #include "events/signals.h"
 
 namespace {
 
-using simhost::events::Command;
 using simhost::events::Descriptor;
 using simhost::events::Loop;
-using simhost::events::Process;
 using testing::ElementsAre;
-using testing::HasSubstr;
 using testing::StrEq;
 using namespace std::chrono_literals;
 
@@ -151,60 +147,6 @@ TEST(Signals, AreTakenByTheLoop) {
   raise(SIGUSR1);
   loop.turn(10s);
   EXPECT_EQ(seen, SIGUSR1);
-}
-
-std::string how_it_ends(std::string const &script) {
-  Loop loop;
-  std::string said;
-  Process const process(loop,
-                        {.program = "sh", .words = {"-c", script}, .environment = {{"A", "7"}}},
-                        [&](std::string const &how) {
-                          said = how;
-                          loop.stop();
-                        });
-  loop.run();
-  return said;
-}
-
-TEST(AProcess, TellsHowItEnded) {
-  EXPECT_THAT(how_it_ends("exit $A"), StrEq("ended with status 7"));
-  EXPECT_THAT(how_it_ends("kill -9 $$"), StrEq("was ended by signal 9"));
-}
-
-TEST(AProcess, EndsWithItsOwner) {
-  Loop loop;
-  int id = 0;
-  {
-    Process const process(loop, {.program = "sleep", .words = {"600"}, .environment = {}},
-                          [](std::string const &) {});
-    id = process.id();
-    EXPECT_EQ(kill(id, 0), 0);
-  }
-  EXPECT_EQ(kill(id, 0), -1);
-}
-
-TEST(AProcess, ThatDoesNotEndWhenItIsAskedIsEnded) {
-  Loop loop;
-  Pipe const pipe;
-  Process process(loop,
-                  {.program = "sh",
-                   .words = {"-c", "trap '' TERM; while :; do sleep 1; done"},
-                   .environment = {}},
-                  [](std::string const &) { ADD_FAILURE() << "it ended by itself"; });
-  process.end(10ms);
-  EXPECT_EQ(kill(process.id(), 0), -1);
-}
-
-TEST(AProgram, ThatFailsIsToldWithWhatItSaid) {
-  try {
-    simhost::events::run(
-        {.program = "sh", .words = {"-c", "echo no luck; exit 3"}, .environment = {}});
-    ADD_FAILURE() << "it did not fail";
-  } catch (std::runtime_error const &error) {
-    EXPECT_THAT(error.what(), HasSubstr("sh ended with status 3: no luck"));
-  }
-  EXPECT_THROW(simhost::events::run({.program = "/nowhere/x", .words = {}, .environment = {}}),
-               std::runtime_error);
 }
 
 }  // namespace
