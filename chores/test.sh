@@ -150,7 +150,7 @@ leave_out_tests() {
 }
 
 leave_out_frames() {
-  cxx_left_out='^TheNetworkDevices\.|^AProcessWithManySockets\.'
+  cxx_left_out='^TheNetworkDevices\.|^WhatASwitchLeavesBehind\.|^AProcessWithManySockets\.'
   deselected="$deselected --deselect tests/simhostd"
   summarize "Left out by --no-frames: tests/simhostd, TheNetworkDevices"
 }

@@ -176,10 +176,15 @@ void Daemon::count_from_now_on() {
   });
 }
 
-void Daemon::connect() {
+void Daemon::disconnect() {
   next_connect_.end();
   bridges_.reset();
+}
+
+void Daemon::connect() {
+  disconnect();
   follows_members_ = false;
+  shortest_aging_ = std::chrono::seconds::max();  // so that ageing begins again
   attempt([this] {
     bridges_.emplace(
         loop_, options_.database, memory_,

@@ -41,6 +41,8 @@ class Daemon {
 
   /// Open vSwitch is there, or there anew: connects to it.
   void connect();
+  /// Open vSwitch is gone, until connect() is called.
+  void disconnect();
   /// Done when what is wanted is in force for the first time.
   void when_ready(std::function<void()> ready) { ready_ = std::move(ready); }
   using Settled = std::function<void(std::uint64_t change, std::string const &troubles)>;

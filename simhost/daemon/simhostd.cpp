@@ -127,7 +127,9 @@ void serve(Words const &words) {
   std::optional<PrivateOpenVswitch> own;
   if (own_folder) {
     own.emplace(loop, *own_folder, words.datapath == "netdev" ? Datapath::netdev : Datapath::system,
-                PrivateOpenVswitch::Told{.started = [&] { daemon.connect(); }, .said = say});
+                PrivateOpenVswitch::Told{.started = [&] { daemon.connect(); },
+                                         .ended = [&] { daemon.disconnect(); },
+                                         .said = say});
     own->start();
   } else {
     daemon.connect();

@@ -4,18 +4,18 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <linux/rtnetlink.h>
-#include <sched.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
 #include <chrono>
 #include <cstdio>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <stdexcept>
 #include <string>
 #include <thread>
+
+#include "own_network.h"
 
 namespace {
 
@@ -26,23 +26,9 @@ using testing::Not;
 using testing::Pair;
 using namespace std::chrono_literals;
 
-// Of users as well, unless the test may make one of networks without.
-void enter_namespace() {
-  int const kinds = geteuid() == 0 ? CLONE_NEWNET : CLONE_NEWNET | CLONE_NEWUSER;
-  auto const user = geteuid();
-  ASSERT_EQ(unshare(kinds), 0) << "namespaces are not allowed here";
-  if (user != 0) {
-    std::ofstream("/proc/self/uid_map") << "0 " << user << " 1";
-  }
-}
-
-void ip(std::string const &words) {
-  ASSERT_EQ(std::system(("ip " + words).c_str()), 0) << words;
-}
-
 class TheNetworkDevices : public testing::Test {
  protected:
-  void SetUp() override { enter_namespace(); }
+  void SetUp() override { enter_own_network(); }
 
   simhost::events::Loop loop;
   int changes = 0;

@@ -46,6 +46,7 @@ struct AnOpenVswitch : testing::Test {
   [[nodiscard]] std::filesystem::path own() const { return folder.file("ovs"); }
   PrivateOpenVswitch::Told told() {
     return {.started = [this] { loop.stop(); },
+            .ended = [] {},
             .said = [this](std::string const &text) { said += text + "\n"; }};
   }
 

@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "events/unix_address.h"
+#include "planes/openvswitch/processes/left_devices.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -85,11 +86,9 @@ PrivateOpenVswitch::PrivateOpenVswitch(events::Loop &loop, std::filesystem::path
       folder_(made(folder)),
       datapath_(datapath),
       told_(std::move(told)),
-      lock_(locked(folder_)) {
-  // What is to be there is told anew, so that nothing of a former run is believed.
-  std::filesystem::remove(folder_ / "conf.db");
-  std::filesystem::remove(folder_ / ".conf.db.~lock~");
-  events::run(command(kTool, {"create", "conf.db", kSchema}));
+      lock_(locked(folder_)),
+      devices_of_others_(network_devices()) {
+  create_database();
 }
 
 PrivateOpenVswitch::~PrivateOpenVswitch() {
@@ -114,6 +113,14 @@ events::Command PrivateOpenVswitch::command(std::string const &program,
           .environment = {{"OVS_RUNDIR", folder}, {"OVS_LOGDIR", folder}, {"OVS_DBDIR", folder}}};
 }
 
+// What is to be there is told anew, so that nothing of a former run is believed; nor does a switch
+// begin with ports that have no flows yet, which takes it longer.
+void PrivateOpenVswitch::create_database() {
+  std::filesystem::remove(folder_ / "conf.db");
+  std::filesystem::remove(folder_ / ".conf.db.~lock~");
+  events::run(command(kTool, {"create", "conf.db", kSchema}));
+}
+
 void PrivateOpenVswitch::start() {
   started_ = events::Clock::now();
   start_database();
@@ -123,12 +130,13 @@ void PrivateOpenVswitch::start() {
 void PrivateOpenVswitch::start_database() {
   std::filesystem::remove(folder_ / "db.sock");
   auto const folder = folder_.string();
-  database_.emplace(loop_,
-                    command(kDatabase, {"-vconsole:off", "-vsyslog:off", "conf.db",
-                                        "--remote=punix:" + folder + "/db.sock",
-                                        "--unixctl=" + folder + "/ovsdb-server.ctl",
-                                        "--log-file=" + folder + "/ovsdb-server.log"}),
-                    [this](std::string const &how) { restart("ovsdb-server " + how); });
+  database_ = std::make_unique<events::Process>(
+      loop_,
+      command(kDatabase,
+              {"-vconsole:off", "-vsyslog:off", "conf.db", "--remote=punix:" + folder + "/db.sock",
+               "--unixctl=" + folder + "/ovsdb-server.ctl",
+               "--log-file=" + folder + "/ovsdb-server.log"}),
+      [this](std::string const &how) { restart("ovsdb-server " + how); });
 }
 
 void PrivateOpenVswitch::start_switch_when_database_is_there() {
@@ -148,8 +156,9 @@ void PrivateOpenVswitch::start_switch() {
   if (datapath_ == Datapath::netdev) {
     words.emplace_back("--disable-system");
   }
-  switch_.emplace(loop_, command(kSwitch, std::move(words)),
-                  [this](std::string const &how) { restart("ovs-vswitchd " + how); });
+  switch_ = std::make_unique<events::Process>(
+      loop_, command(kSwitch, std::move(words)),
+      [this](std::string const &how) { restart("ovs-vswitchd " + how); });
   told_.started();
 }
 
@@ -158,9 +167,33 @@ void PrivateOpenVswitch::restart(std::string const &why) {
   pause_ = lasted > kSteady ? events::Clock::duration{}
                             : std::clamp(pause_ * 2, kFirstPause, kLongestPause);
   told_.said(why + ": both processes of Open vSwitch start anew");
-  switch_.reset();
-  database_.reset();
-  next_ = loop_.after(pause_, [this] { start(); });
+  told_.ended();
+  std::erase_if(left_, [](auto const &process) { return process->is_gone(); });
+  leave(std::move(switch_));
+  leave(std::move(database_));
+  if (datapath_ == Datapath::netdev) {
+    remove_left(folder_, devices_of_others_);
+  }
+  next_ = loop_.after(pause_, [this] { start_anew(); });
+}
+
+void PrivateOpenVswitch::start_anew() {
+  try {
+    create_database();
+    start();
+  } catch (std::runtime_error const &error) {
+    told_.said(error.what());
+    next_ = loop_.after(kLongestPause, [this] { start_anew(); });
+  }
+}
+
+// Nobody waits until the kernel has closed what it had open: that may take many seconds, for all of
+// which no frame moves.
+void PrivateOpenVswitch::leave(std::unique_ptr<events::Process> process) {
+  if (process != nullptr) {
+    process->kill();
+    left_.push_back(std::move(process));
+  }
 }
 
 }  // namespace simhost::openvswitch

@@ -3,8 +3,10 @@
 
 #include <filesystem>
 #include <functional>
-#include <optional>
+#include <memory>
+#include <set>
 #include <string>
+#include <vector>
 
 #include "events/process.h"
 
@@ -24,6 +26,9 @@ class PrivateOpenVswitch {
   struct Told {
     /// The database takes connections; the switch has been started, and reads it.
     std::function<void()> started;
+    /// One of them has ended, and the other one is of no use: connections to either may stay open
+    /// for a while, and nobody replies.
+    std::function<void()> ended;
     /// A sentence for the log.
     std::function<void(std::string const &)> said;
   };
@@ -40,10 +45,13 @@ class PrivateOpenVswitch {
   void start();
 
  private:
+  void create_database();
   void start_database();
   void start_switch_when_database_is_there();
   void start_switch();
   void restart(std::string const &why);
+  void start_anew();
+  void leave(std::unique_ptr<events::Process> process);
   [[nodiscard]] events::Command command(std::string const &program,
                                         std::vector<std::string> words) const;
 
@@ -52,8 +60,11 @@ class PrivateOpenVswitch {
   Datapath datapath_;
   Told told_;
   events::Descriptor lock_;
-  std::optional<events::Process> database_;
-  std::optional<events::Process> switch_;
+  std::set<std::string> devices_of_others_;
+  std::unique_ptr<events::Process> database_;
+  std::unique_ptr<events::Process> switch_;
+  // Killed, and not gone yet.
+  std::vector<std::unique_ptr<events::Process>> left_;
   events::Clock::time_point started_;
   events::Clock::duration pause_ = {};
   events::Loop::Timer next_;

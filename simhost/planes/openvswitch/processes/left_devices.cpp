@@ -1,0 +1,73 @@
+// Bridges are known by their sockets; a device of the kernel's that has no process any more may be
+// removed like any other.
+#include "planes/openvswitch/processes/left_devices.h"
+
+#include <net/if.h>
+
+#include <memory>
+#include <stdexcept>
+#include <system_error>
+#include <vector>
+
+#include "events/netlink_request.h"
+
+namespace simhost::openvswitch {
+namespace {
+
+// Of the data path in ovs-vswitchd itself.
+constexpr auto *kDatapath = "ovs-netdev";
+
+bool is_of_bridge(std::filesystem::path const &socket) {
+  return socket.extension() == ".mgmt" || socket.extension() == ".snoop";
+}
+
+std::vector<std::filesystem::path> sockets_of_bridges(std::filesystem::path const &folder) {
+  std::vector<std::filesystem::path> sockets;
+  std::error_code error;
+  for (auto const &entry : std::filesystem::directory_iterator(folder, error)) {
+    if (is_of_bridge(entry.path())) {
+      sockets.push_back(entry.path());
+    }
+  }
+  return sockets;
+}
+
+void remove_device(std::string const &name) {
+  ifinfomsg device{};
+  device.ifi_index = static_cast<int>(if_nametoindex(name.c_str()));
+  if (device.ifi_index != 0) {
+    try {
+      events::NetlinkRequest(RTM_DELLINK, NLM_F_ACK, device).exchanged();
+    } catch (std::runtime_error const &) {
+      // It goes with the last process that has it open.
+    }
+  }
+}
+
+}  // namespace
+
+std::set<std::string> network_devices() {
+  std::unique_ptr<struct if_nameindex, decltype(&if_freenameindex)> const all(if_nameindex(),
+                                                                              if_freenameindex);
+  std::set<std::string> names;
+  for (auto const *one = all.get(); one != nullptr && one->if_name != nullptr; ++one) {
+    names.emplace(one->if_name);
+  }
+  return names;
+}
+
+void remove_left(std::filesystem::path const &folder, std::set<std::string> const &of_others) {
+  std::set<std::string> devices{kDatapath};
+  for (auto const &socket : sockets_of_bridges(folder)) {
+    devices.insert(socket.stem());
+    std::error_code error;
+    std::filesystem::remove(socket, error);
+  }
+  for (auto const &device : devices) {
+    if (!of_others.contains(device)) {
+      remove_device(device);
+    }
+  }
+}
+
+}  // namespace simhost::openvswitch

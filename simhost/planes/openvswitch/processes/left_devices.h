@@ -1,0 +1,20 @@
+// Devices that an ovs-vswitchd made, and leaves behind for as long as the kernel closes what it had
+// open.
+#pragma once
+
+#include <filesystem>
+#include <set>
+#include <string>
+
+namespace simhost::openvswitch {
+
+/// The names of all network devices of this namespace.
+std::set<std::string> network_devices();
+
+/// Removes those that are the data path's and the bridges' own, so that another ovs-vswitchd can
+/// make them anew, and the sockets in its folder that nobody serves any more. `of_others` stay:
+/// they were there before it was. What cannot be removed is left: it goes by itself, a little
+/// later.
+void remove_left(std::filesystem::path const &folder, std::set<std::string> const &of_others);
+
+}  // namespace simhost::openvswitch
