@@ -5,6 +5,7 @@
 
 #include <chrono>
 #include <csignal>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <string>
@@ -17,6 +18,7 @@ using simhost::events::Loop;
 using simhost::openvswitch::Datapath;
 using simhost::openvswitch::PrivateOpenVswitch;
 using testing::HasSubstr;
+using testing::Not;
 
 // The processes whose command lines name the folder.
 std::vector<int> processes_in(std::filesystem::path const &folder) {
@@ -64,6 +66,28 @@ TEST_F(AnOpenVswitch, StartsAndEndsWithItsOwner) {
   }
   EXPECT_TRUE(processes_in(own()).empty());
   EXPECT_EQ(said, "");
+}
+
+std::string environment_of(int process) {
+  std::ifstream file("/proc/" + std::to_string(process) + "/environ");
+  return {std::istreambuf_iterator<char>(file), {}};
+}
+
+TEST_F(AnOpenVswitch, KeepsMemoryAtHandUnlessToldOtherwise) {
+  auto const tunables = [&] {
+    PrivateOpenVswitch openvswitch(loop, own(), Datapath::netdev, told());
+    openvswitch.start();
+    loop.run();
+    std::string all;
+    for (auto const process : both_processes_in(own())) {
+      all += environment_of(process);
+    }
+    return all;
+  };
+  EXPECT_THAT(tunables(), HasSubstr("GLIBC_TUNABLES=glibc.malloc.tcache_count="));
+  setenv("GLIBC_TUNABLES", "glibc.malloc.check=0", 1);
+  EXPECT_THAT(tunables(), Not(HasSubstr("tcache_count")));
+  unsetenv("GLIBC_TUNABLES");
 }
 
 TEST_F(AnOpenVswitch, StartsWhateverItsFolderIsCalled) {
