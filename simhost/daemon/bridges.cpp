@@ -36,6 +36,8 @@ constexpr auto *kLock = "simhostd";
 constexpr auto kBetweenCounts = 100ms;
 // A second and bridge: more than members say, and less than keeps this process from all else.
 constexpr std::uint32_t kMostPacketIns = 1000;
+// Likewise of one client, of which several may say too much.
+constexpr std::uint32_t kMostOfAClient = 100;
 
 Deadline soon(std::size_t devices = 0) {
   return Deadline::clock::now() + kPatience + devices * kPatienceForEach;
@@ -90,6 +92,7 @@ struct Bridges::Bridge {
   LivePorts live;
   std::set<std::string> aggregated;  // devices that are in groups
   Deadline counted{};
+  std::set<std::uint32_t> meters;
 
   void have(Flows now) {
     taught.have(now);
@@ -176,7 +179,7 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
     auto const socket = folder_ / (wanted.row.name + ".mgmt");
     require_made(wanted, socket);
     auto made = std::make_unique<Bridge>(wanted, socket, deadline);
-    made->connection.limit_packet_ins(kMostPacketIns, deadline);
+    have_meters(*made, wanted.flows->flows, deadline);
     read_flows(*made, deadline);
     for (auto const &port : made->connection.ports(deadline)) {
       made->live.follow(port);
@@ -362,6 +365,28 @@ std::vector<Flow> Bridges::learned_flows(Bridge &bridge, openvswitch::LearnedFlo
   return flows;
 }
 
+void Bridges::have_meters(Bridge &bridge, std::vector<Flow> const &flows, Deadline deadline) {
+  std::map<std::uint32_t, std::uint32_t> rates{{openflow::kControllerMeter, kMostPacketIns}};
+  for (auto const meter : meters_of(flows)) {
+    bridge.meters.insert(meter);
+    rates.emplace(meter, kMostOfAClient);
+  }
+  bridge.connection.have_meters(rates, deadline);
+}
+
+// Before the flows that send frames through them. They stay: another device will have the number.
+void Bridges::add_meters(Bridge &bridge, std::vector<Flow> const &flows, Deadline deadline) {
+  std::vector<std::uint32_t> added;
+  for (auto const meter : meters_of(flows)) {
+    if (bridge.meters.insert(meter).second) {
+      added.push_back(meter);
+    }
+  }
+  if (!added.empty()) {
+    bridge.connection.add_meters(added, kMostOfAClient, deadline);
+  }
+}
+
 std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t change,
                                  std::set<std::string> const &added, Deadline deadline) {
   auto &bridge = connected(wanted, deadline);
@@ -392,6 +417,7 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   if (bridge.sessions != wanted.sessions || ends_counting(difference)) {
     count(bridge, deadline);
   }
+  add_meters(bridge, difference.added_flows, deadline);
   add_changes(difference, changes);
   if (bridge.change != change) {
     changes.emplace_back(openflow::FlowChange{.command = FlowCommand::add,

@@ -95,6 +95,10 @@ class Bridges {
                           std::set<std::string> const &added, openvswitch::Deadline deadline);
   Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
   void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
+  static void have_meters(Bridge &bridge, std::vector<openflow::Flow> const &flows,
+                          openvswitch::Deadline deadline);
+  static void add_meters(Bridge &bridge, std::vector<openflow::Flow> const &flows,
+                         openvswitch::Deadline deadline);
   void add_relearned(Bridge &bridge, WantedBridge const &wanted,
                      openvswitch::Difference &difference, openvswitch::Deadline deadline);
   void add_renewed(Bridge &bridge, WantedBridge const &wanted, openvswitch::Difference &difference,

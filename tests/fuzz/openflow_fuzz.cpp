@@ -134,6 +134,8 @@ void read_multipart(Reader in) {
       return read_all(in, take_group_statistics);
     case MultipartType::groups:
       return read_all(in, take_group);
+    case MultipartType::meters:
+      return read_all(in, take_meter);
     case MultipartType::ports:
       return read_all(in, take_port_description);
     case MultipartType::flow_monitor:

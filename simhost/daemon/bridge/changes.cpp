@@ -55,6 +55,19 @@ void add_forgetting(openflow::Changes &changes) {
   }
 }
 
+std::set<std::uint32_t> meters_of(std::vector<Flow> const &flows) {
+  std::set<std::uint32_t> meters;
+  for (auto const &flow : flows) {
+    if (flow.actions.empty()) {
+      continue;
+    }
+    if (auto const *const to = std::get_if<openflow::ToMeter>(&flow.actions.front())) {
+      meters.insert(to->meter);
+    }
+  }
+  return meters;
+}
+
 bool ends_counting(openvswitch::Difference const &difference) {
   auto const counts = [](Flow const &flow) {
     return std::ranges::find(openvswitch::kCountingTables, flow.table) !=

@@ -2,6 +2,9 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
+#include <set>
+#include <vector>
 
 #include "planes/openvswitch/openflow/change.h"
 #include "planes/openvswitch/reconcile/difference.h"
@@ -12,6 +15,8 @@ namespace simhost::daemon {
 void add_changes(openvswitch::Difference const &difference, openflow::Changes &changes);
 /// All that the bridge learned goes: before anything that teaches it otherwise.
 void add_forgetting(openflow::Changes &changes);
+/// The meters that flows send frames through.
+std::set<std::uint32_t> meters_of(std::vector<openflow::Flow> const &flows);
 /// Whether flows go, or begin anew, that count for others.
 bool ends_counting(openvswitch::Difference const &difference);
 /// How many flows and groups it changes, those not counted that are forgotten.

@@ -3,12 +3,13 @@ are made up, and gone with this process whatever becomes of it."""
 
 import json
 import os
+import re
 import socket
 import struct
 import subprocess
 import time
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, Optional, Sequence
+from typing import Any, Dict, List, Mapping, Optional, Sequence, Set, Tuple
 
 SCHEMA = "/usr/share/openvswitch/vswitch.ovsschema"
 PATIENCE = 30.0
@@ -63,6 +64,7 @@ class OpenVSwitch:
             self._environment[f"OVS_{name}DIR"] = str(folder)
         self._processes: List["subprocess.Popen[bytes]"] = []
         self._forgetting: Dict[str, _Forgetting] = {}
+        self._meters: Set[Tuple[str, int]] = set()
         self._database = f"unix:{folder}/db.sock"
         database = str(folder / "conf.db")
         subprocess.run(["ovsdb-tool", "create", database, SCHEMA], check=True)
@@ -173,10 +175,19 @@ class OpenVSwitch:
 
     def load(self, bridge: str, flows: Sequence[str], groups: Sequence[str]) -> None:
         """Replaces all that the bridge has, in one bundle."""
+        for meter in re.findall(r"meter:(\d+)", "\n".join(flows)):
+            self._have_meter(bridge, int(meter))
         lines = ["flow delete", "group delete group_id=4294967292"]
         lines += [f"group add {group}" for group in groups]
         lines += [f"flow add {flow}" for flow in flows]
         self._ofctl("bundle", bridge, "-", given="\n".join(lines) + "\n")
+
+    def _have_meter(self, bridge: str, meter: int) -> None:
+        """One that nothing is too much for."""
+        if (bridge, meter) not in self._meters:
+            self._meters.add((bridge, meter))
+            rate = "pktps,band=type=drop,rate=1000000"
+            self._ofctl("add-meter", bridge, f"meter={meter},{rate}")
 
     def forget(self, bridge: str) -> None:
         """Makes a bridge forget what it learned, and its data path what came of it."""

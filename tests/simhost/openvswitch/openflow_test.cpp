@@ -319,11 +319,11 @@ TEST(OpenFlow, LimitsWhatFlowsSendUp) {
   {
     // Whatever was said of it before.
     Connection connection(bridge.socket(), soon());
-    connection.limit_packet_ins(1, soon());
+    connection.have_meters({{kControllerMeter, 1}}, soon());
   }
   Connection connection(bridge.socket(), soon());
   connection.set_async({true, false, false}, soon());
-  connection.limit_packet_ins(kRate, soon());
+  connection.have_meters({{kControllerMeter, kRate}}, soon());
   connection.change(to_add({}, {flow_of_table(0, {ToController{}})}), soon());
   for (std::uint32_t count = 0; count < kFrames; ++count) {
     connection.send(frame_through_the_tables(1));
@@ -337,7 +337,7 @@ TEST(OpenFlow, LimitsWhatFlowsSendUp) {
   EXPECT_LT(received, kFrames / 2);
 }
 
-TEST(OpenFlow, HasNoMeterButThatOfWhatFlowsSendUp) {
+TEST(OpenFlow, HasTheMetersThatAreWantedAndNewOnes) {
   Bridge const bridge;
   auto &lab = Lab::shared();
   auto const target = "unix:" + bridge.socket().native();
@@ -345,10 +345,28 @@ TEST(OpenFlow, HasNoMeterButThatOfWhatFlowsSendUp) {
   connection.set_async({.group_and_meter_changes = true}, soon());
   lab.ovs_ofctl({"-OOpenFlow15", "add-meter", target, "meter=7,kbps,band=type=drop,rate=9"});
   EXPECT_TRUE(std::holds_alternative<GroupsOrMetersChanged>(next_event(connection)));
-  connection.limit_packet_ins(10, soon());
-  auto const meters = lab.ovs_ofctl({"-OOpenFlow15", "dump-meters", target});
+  connection.have_meters({{kControllerMeter, 10}}, soon());
+  auto meters = lab.ovs_ofctl({"-OOpenFlow15", "dump-meters", target});
   EXPECT_THAT(meters, testing::HasSubstr("meter=controller pktps burst"));
   EXPECT_THAT(meters, testing::Not(testing::HasSubstr("meter=7")));
+  connection.add_meters(std::vector<std::uint32_t>{7, 8}, 9, soon());
+  meters = lab.ovs_ofctl({"-OOpenFlow15", "dump-meters", target});
+  for (auto const *meter : {"meter=7 pktps burst", "meter=8 pktps burst"}) {
+    EXPECT_THAT(meters, testing::HasSubstr(meter));
+  }
+  EXPECT_THROW(connection.add_meters(std::vector<std::uint32_t>{9, 8}, 9, soon()), Refused);
+
+  // What goes through one that is wanted still stays.
+  for (auto const *flow : {"table=1,actions=meter:7,1", "table=1,ip,actions=meter:8,1"}) {
+    lab.ovs_ofctl({"-OOpenFlow15", "add-flow", target, flow});
+  }
+  connection.have_meters({{kControllerMeter, 10}, {7, 5}}, soon());
+  meters = lab.ovs_ofctl({"-OOpenFlow15", "dump-meters", target});
+  EXPECT_THAT(meters, testing::HasSubstr("rate=5"));
+  EXPECT_THAT(meters, testing::Not(testing::HasSubstr("meter=8")));
+  auto const flows = lab.ovs_ofctl({"-OOpenFlow15", "dump-flows", target, "table=1"});
+  EXPECT_THAT(flows, testing::HasSubstr("meter:7"));
+  EXPECT_THAT(flows, testing::Not(testing::HasSubstr("meter:8")));
 }
 
 TEST(OpenFlow, IsToldOfAFlowThatGoes) {

@@ -54,6 +54,8 @@ inline constexpr std::uint8_t kDispatch = 13;
 inline constexpr std::uint8_t kLists = 14;
 /// Frames of groups that not everybody gets: to those who want them.
 inline constexpr std::uint8_t kGroups = 26;
+/// Up to the daemon: what clients say of groups, by the meter of their port.
+inline constexpr std::uint8_t kHearing = 28;
 /// Out to the port in kReceiver, if its VLANs allow it.
 inline constexpr std::uint8_t kDelivery = 15;
 /// Which uplink carries it: the group of the port's team.

@@ -1,5 +1,6 @@
 #include "planes/openvswitch/openflow/connection.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "planes/openvswitch/openflow/codec/messages.h"
@@ -180,8 +181,34 @@ void Connection::order(std::function<void(Writer &, Xid)> const &put, Deadline d
   wait_for_reply(xid, deadline);
 }
 
-void Connection::limit_packet_ins(std::uint32_t rate, Deadline deadline) {
-  order([&](Writer &out, Xid xid) { put_only_meter(out, xid, rate); }, deadline);
+void Connection::have_meters(std::map<std::uint32_t, std::uint32_t> const &rates,
+                             Deadline deadline) {
+  auto const there = ask<std::uint32_t>([](Writer &out, Xid xid) { put_meters_request(out, xid); },
+                                        take_meter, deadline);
+  order(
+      [&](Writer &out, Xid xid) {
+        for (auto const meter : there) {
+          if (!rates.contains(meter)) {
+            put_no_meter(out, xid, meter);
+          }
+        }
+        for (auto const &[meter, rate] : rates) {
+          bool const is_there = std::ranges::find(there, meter) != there.end();
+          put_meter(out, xid, is_there ? MeterCommand::modify : MeterCommand::add, meter, rate);
+        }
+      },
+      deadline);
+}
+
+void Connection::add_meters(std::span<std::uint32_t const> meters, std::uint32_t rate,
+                            Deadline deadline) {
+  order(
+      [&](Writer &out, Xid xid) {
+        for (auto const meter : meters) {
+          put_meter(out, xid, MeterCommand::add, meter, rate);
+        }
+      },
+      deadline);
 }
 
 void Connection::set_async(AsyncMessages const &wanted, Deadline deadline) {

@@ -5,6 +5,7 @@
 #include <deque>
 #include <filesystem>
 #include <functional>
+#include <map>
 #include <optional>
 #include <span>
 #include <string>
@@ -52,9 +53,12 @@ class Connection {
   void change(Changes const &changes, Deadline deadline);
   /// Returns when the switch is done with all that it was sent.
   void barrier(Deadline deadline);
-  /// From now on flows send up no more than so many frames a second, however many they are sent,
-  /// and there is no other meter.
-  void limit_packet_ins(std::uint32_t rate, Deadline deadline);
+  /// There are these meters from now on and no others, each of which drops what is more than so
+  /// many frames a second; kControllerMeter, of all that flows send up. The flows through those
+  /// that are there already stay.
+  void have_meters(std::map<std::uint32_t, std::uint32_t> const &rates, Deadline deadline);
+  /// New ones, likewise.
+  void add_meters(std::span<std::uint32_t const> meters, std::uint32_t rate, Deadline deadline);
   /// From now on it sends these by itself.
   void set_async(AsyncMessages const &wanted, Deadline deadline);
 

@@ -11,6 +11,9 @@
 
 namespace simhost::openflow {
 
+/// The meter of all that goes up to controllers.
+inline constexpr std::uint32_t kControllerMeter = 0xfffffffe;
+
 /// Which flows are meant: all unless it says otherwise.
 struct FlowFilter {
   std::uint8_t table = kAllTables;

@@ -68,18 +68,31 @@ class Dispatch {
         }
       }
     }
+    if (plan_.network.multicast.hears_igmp || plan_.network.multicast.hears_mld) {
+      send_up();
+    }
   }
-  // Of members that are this switch's.
+  // Of members that are this switch's. Last: what is over a meter's rate goes no further.
   void hear(Match const &message, Actions const &to_groups) {
-    Actions const heard{openflow::ToController{}};
-    auto actions = heard;
-    append(append(actions, to_groups), to_uplinks_);
+    Actions const heard{go_to(table::kHearing)};
+    auto actions = to_groups;
+    append(append(actions, to_uplinks_), heard);
     add(250, Match(message).with(field::kOrigin, kFromClient), actions);
     for (auto const &port : plan_.network.ports) {
       if (port.transmits_by_uplink && sends_frames(port)) {
-        auto out = heard;
-        add(350, Match(message).with(openflow::Field::in_port, port.port),
-            append(out, to_uplinks_));
+        auto out = to_uplinks_;
+        add(350, Match(message).with(openflow::Field::in_port, port.port), append(out, heard));
+      }
+    }
+  }
+  // Each client by a meter of its own, so that none who says too much keeps others from being
+  // heard.
+  void send_up() {
+    for (auto const &port : plan_.network.ports) {
+      if (sends_frames(port)) {
+        program_.add(table::kHearing,
+                     {.match = from(port.port),
+                      .actions = {openflow::ToMeter{port.port}, openflow::ToController{}}});
       }
     }
   }

@@ -38,6 +38,7 @@ enum class MultipartType : std::uint16_t {
   port_statistics = 4,
   group_statistics = 6,
   groups = 7,
+  meters = 10,
   ports = 13,
   flow_monitor = 16,
 };

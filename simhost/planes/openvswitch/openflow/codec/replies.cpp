@@ -254,6 +254,13 @@ GroupEntry take_group(Reader &in) {
   return entry;
 }
 
+std::uint32_t take_meter(Reader &in) {
+  constexpr std::size_t kLeast = 8;
+  auto item = take_item(in, 0, kLeast);
+  item.skip(4);
+  return item.u32();
+}
+
 GroupStatistics take_group_statistics(Reader &in) {
   constexpr std::size_t kLeast = 40;
   GroupStatistics statistics;

@@ -27,6 +27,8 @@ PortStatistics take_port_statistics(Reader &in);
 PortDescription take_port_description(Reader &in);
 GroupEntry take_group(Reader &in);
 GroupStatistics take_group_statistics(Reader &in);
+/// Its number.
+std::uint32_t take_meter(Reader &in);
 FlowUpdate take_flow_update(Reader &in);
 
 }  // namespace simhost::openflow

@@ -39,6 +39,13 @@ void put_multipart(Writer &out, MultipartType type, Xid xid, Payload const &payl
   });
 }
 
+void put_meter_head(Writer &out, std::uint16_t command, std::uint32_t meter) {
+  constexpr std::uint16_t kPacketsWithBurst = 0x2 | 0x4;
+  out.u16(command);
+  out.u16(kPacketsWithBurst);
+  out.u32(meter);
+}
+
 void put_instructions(Writer &out, Actions const &actions) {
   if (actions.empty()) {
     return;
@@ -164,21 +171,17 @@ void put_bundle_add(Writer &out, Xid xid, std::uint32_t bundle, Change const &ch
   });
 }
 
-void put_only_meter(Writer &out, Xid xid, std::uint32_t rate) {
-  enum class Command : std::uint16_t { add = 0, remove = 2 };
-  constexpr std::uint32_t kControllerMeter = 0xfffffffe;
-  constexpr std::uint32_t kAllMeters = 0xffffffff;
-  constexpr std::uint16_t kPacketsWithBurst = 0x2 | 0x4;
+void put_no_meter(Writer &out, Xid xid, std::uint32_t meter) {
+  constexpr std::uint16_t kRemove = 2;
+  put_message(out, MessageType::meter_mod, xid, [&] { put_meter_head(out, kRemove, meter); });
+}
+
+void put_meter(Writer &out, Xid xid, MeterCommand command, std::uint32_t meter,
+               std::uint32_t rate) {
   constexpr std::uint16_t kDropBand = 1;
   constexpr std::uint16_t kBandBytes = 16;
-  auto const put_head = [&](Command command, std::uint32_t meter) {
-    out.u16(static_cast<std::uint16_t>(command));
-    out.u16(kPacketsWithBurst);
-    out.u32(meter);
-  };
-  put_message(out, MessageType::meter_mod, xid, [&] { put_head(Command::remove, kAllMeters); });
   put_message(out, MessageType::meter_mod, xid, [&] {
-    put_head(Command::add, kControllerMeter);
+    put_meter_head(out, static_cast<std::uint16_t>(command), meter);
     out.u16(kDropBand);
     out.u16(kBandBytes);
     out.u32(rate);
@@ -230,6 +233,14 @@ void put_ports_request(Writer &out, Xid xid, MultipartType type, Port port) {
 void put_groups_request(Writer &out, Xid xid, MultipartType type, GroupId group) {
   put_multipart(out, type, xid, [&] {
     out.u32(group);
+    out.zeros(4);
+  });
+}
+
+void put_meters_request(Writer &out, Xid xid) {
+  constexpr std::uint32_t kAllMeters = 0xffffffff;
+  put_multipart(out, MultipartType::meters, xid, [&] {
+    out.u32(kAllMeters);
     out.zeros(4);
   });
 }

@@ -25,8 +25,11 @@ void put_bundle_control(Writer &out, Xid xid, std::uint32_t bundle, BundleContro
 /// Throws like put_change.
 void put_bundle_add(Writer &out, Xid xid, std::uint32_t bundle, Change const &change);
 
-/// Removes all meters, then adds that of what goes up to controllers: so many frames a second.
-void put_only_meter(Writer &out, Xid xid, std::uint32_t rate);
+enum class MeterCommand : std::uint16_t { add = 0, modify = 1 };
+/// One that drops what is more than so many frames a second.
+void put_meter(Writer &out, Xid xid, MeterCommand command, std::uint32_t meter, std::uint32_t rate);
+/// The flows through it go with it.
+void put_no_meter(Writer &out, Xid xid, std::uint32_t meter);
 /// Which messages the switch sends by itself.
 void put_set_async(Writer &out, Xid xid, AsyncMessages const &wanted);
 
@@ -36,6 +39,8 @@ void put_flows_request(Writer &out, Xid xid, MultipartType type, FlowFilter cons
 void put_ports_request(Writer &out, Xid xid, MultipartType type, Port port);
 /// `type` is groups or group_statistics.
 void put_groups_request(Writer &out, Xid xid, MultipartType type, GroupId group);
+/// All of them.
+void put_meters_request(Writer &out, Xid xid);
 void put_flow_monitor_request(Writer &out, Xid xid, std::uint32_t monitor, FlowFilter const &filter,
                               OwnChanges own);
 void put_flow_monitor_cancel(Writer &out, Xid xid, std::uint32_t monitor);
