@@ -42,16 +42,6 @@ std::filesystem::path beside(std::filesystem::path file, char const *suffix) {
   return file;
 }
 
-// No text of JSON has all that a path may have.
-std::vector<std::uint8_t> bytes_of(std::filesystem::path const &path) {
-  auto const &text = path.native();
-  return {text.begin(), text.end()};
-}
-
-storage::SwitchKey switch_in(Json const &question) {
-  return storage::SwitchKey{question.at("switch").get<std::int64_t>()};
-}
-
 storage::Store opened(std::filesystem::path const &state) {
   run_on(stored::plane());
   return {state, populate_fresh_host};
@@ -80,8 +70,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       host_(in_utf8(options_.state.string())),
       state_watch_(loop, store_, options_.state, [this] { look_at_commits(); }),
       devices_(loop, [this] { sync_soon(); }),
-      server_(loop, openvswitch::socket_of(options_.state),
-              [this](Json const &question, Reply const &reply) { handle(question, reply); }),
+      server_(loop, openvswitch::socket_of(options_.state), questions()),
       memory_(store_, [this] { remember_soon(); }),
       announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }),
       beacons_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
@@ -473,158 +462,6 @@ void Daemon::reply_to_waiting() {
   while (!waiting_.empty() && waiting_.begin()->first <= in_force_) {
     waiting_.begin()->second({{"change", in_force_}});
     waiting_.erase(waiting_.begin());
-  }
-}
-
-void Daemon::handle_in_force(std::uint64_t change, Reply const &reply) {
-  if (change <= in_force_) {
-    reply({{"change", in_force_}});
-    return;
-  }
-  waiting_.emplace(change, reply);
-  sync_soon();
-}
-
-// 0 for a port of no team that goes by load: all others are known by their numbers.
-Json Daemon::carrier(Json const &question) const {
-  return {{"device",
-           load_balance_.carrier(switch_in(question), question.at("port").get<std::uint32_t>())}};
-}
-
-Json Daemon::addresses(Json const &question) {
-  if (!bridges_) {
-    return {{"refused", "Open vSwitch cannot be reached: " + troubles_.text()}};
-  }
-  auto const port = question.at("port").get<std::uint32_t>();
-  Json entries = Json::array();
-  for (auto const &one : bridges_->learned(switch_in(question))) {
-    if (one.port == port) {
-      entries.push_back({{"mac", one.address}, {"vlan", one.vlan}, {"age", one.age}});
-    }
-  }
-  return {{"addresses", entries}};
-}
-
-Json Daemon::is_there(std::string const &device) {
-  if (devices_.refresh()) {
-    sync_soon();
-  }
-  auto at = bridges_ ? bridges_->elsewhere(device).value_or("") : std::string();
-  // One that is at a bridge of Open vSwitch may have a master because of that.
-  if (at.empty() && !at_bridges_.contains(device)) {
-    at = devices_.master_of(device);
-  }
-  return {{"there", devices_.find(device).has_value()}, {"at", at}};
-}
-
-// Before it is committed that switches have packets of these sizes, and devices likewise.
-Json Daemon::carry(Json const &question) {
-  PacketSizes sizes;
-  {
-    storage::ReadingTransaction transaction(store_);
-    for (auto const &one : question.at("switches")) {
-      add_packet_sizes(transaction, storage::SwitchKey{one.at(0).get<std::int64_t>()},
-                       one.at(1).get<std::uint32_t>(), sizes);
-    }
-  }
-  for (auto const &one : question.at("devices")) {
-    sizes[one.at(0).get<std::string>()] = one.at(1).get<std::uint32_t>();
-  }
-  devices_.refresh();
-  auto const why = raise_all_packet_sizes(sizes, devices_);
-  return {{"why", why.value_or("")}};
-}
-
-// What goes wrong with it is no reason to say nothing of what is known.
-void Daemon::count_of(storage::SwitchKey key) {
-  try {
-    if (bridges_) {
-      bridges_->count(key);
-    }
-  } catch (std::runtime_error const &error) {
-    fail(error.what());
-  }
-}
-
-Json Daemon::counters(Json const &question) {
-  CounterOwner owner{.switch_key = switch_in(question),
-                     .port = std::nullopt,
-                     .session = question.at("session").get<std::string>()};
-  if (auto const port = question.at("port").get<std::uint32_t>()) {
-    owner.port = storage::PortNumber{port};
-  }
-  count_of(owner.switch_key);
-  storage::ReadingTransaction transaction(store_);
-  counting_.follow(transaction);
-  Json values = Json::object();
-  for (auto const &[name, value] : counting_.counters_of(transaction, owner)) {
-    values[std::string(name)] = value;
-  }
-  return {{"counters", values}};
-}
-
-Json Daemon::counting_sessions(Json const &question) {
-  auto const key = switch_in(question);
-  count_of(key);
-  return {{"sessions", counting_.unsaved_sessions(key)}};
-}
-
-Json Daemon::groups(Json const &question) const {
-  auto const to_json = [](multicast::Address const &address) {
-    return address.family == multicast::Family::ipv4 ? Json(multicast::ipv4_of(address))
-                                                     : Json(address.bytes);
-  };
-  Json groups = Json::array();
-  for (auto const &one :
-       members_.joined(switch_in(question), question.at("port").get<std::uint32_t>())) {
-    auto const &sources = one.joined.sources;
-    Json listed = Json::array();
-    for (auto const &source : sources.listed) {
-      listed.push_back(to_json(source));
-    }
-    groups.push_back({{"address", to_json(one.address)},
-                      {"version", one.joined.version},
-                      {"excludes", sources.are_excluded},
-                      {"sources", listed},
-                      {"age", one.age.count()}});
-  }
-  return {{"groups", groups}};
-}
-
-void Daemon::handle(Json const &question, Reply const &reply) {
-  try {
-    auto const what = question.at("ask").get<std::string>();
-    if (what == "in force") {
-      handle_in_force(question.at("change").get<std::uint64_t>(), reply);
-    } else if (what == "device") {
-      reply(is_there(question.at("name").get<std::string>()));
-    } else if (what == "carry") {
-      reply(carry(question));
-    } else if (what == "carrier") {
-      reply(carrier(question));
-    } else if (what == "addresses") {
-      reply(addresses(question));
-    } else if (what == "counters") {
-      reply(counters(question));
-    } else if (what == "sessions") {
-      reply(counting_sessions(question));
-    } else if (what == "bridge") {
-      reply({{"name", bridge_name(host_, question.at("switch").get<std::string>())},
-             {"folder", bytes_of(options_.database.parent_path())}});
-    } else if (what == "groups") {
-      reply(groups(question));
-    } else if (what == "status") {
-      reply({{"change", in_force_},
-             {"said", troubles_.text()},
-             {"process", getpid()},
-             {"datapath", options_.datapath}});
-    } else {
-      reply({{"refused", "nobody here knows '" + what + "'"}});
-    }
-  } catch (Json::exception const &) {
-    reply({{"refused", "that is no question"}});
-  } catch (std::runtime_error const &error) {
-    reply({{"refused", error.what()}});
   }
 }
 

@@ -72,10 +72,11 @@ class Daemon {
   void settle(Wanted const &wanted);
   void reply_to_waiting();
 
-  void handle(Json const &question, Reply const &reply);
+  // What callers ask.
+  [[nodiscard]] Questions questions();
   void handle_in_force(std::uint64_t change, Reply const &reply);
   [[nodiscard]] Json carry(Json const &question);
-  [[nodiscard]] Json is_there(std::string const &device);
+  [[nodiscard]] Json is_there(Json const &question);
   [[nodiscard]] Json carrier(Json const &question) const;
   [[nodiscard]] Json addresses(Json const &question);
   void count_of(storage::SwitchKey key);
@@ -89,6 +90,8 @@ class Daemon {
   void balance();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
   [[nodiscard]] Json groups(Json const &question) const;
+  [[nodiscard]] Json bridge(Json const &question) const;
+  [[nodiscard]] Json status(Json const &question) const;
 
   events::Loop &loop_;
   Options options_;

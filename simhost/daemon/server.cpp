@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 
 #include <cstdint>
+#include <exception>
 #include <utility>
 #include <vector>
 
@@ -40,11 +41,11 @@ struct Server::Client {
   openvswitch::Lines lines;
 };
 
-Server::Server(events::Loop &loop, std::filesystem::path socket, Handle handle,
+Server::Server(events::Loop &loop, std::filesystem::path socket, Questions questions,
                events::Clock::duration patience)
     : loop_(loop),
       path_(std::move(socket)),
-      handle_(std::move(handle)),
+      questions_(std::move(questions)),
       patience_(patience),
       address_(path_),
       socket_(listening(address_, path_)),
@@ -123,10 +124,18 @@ void Server::handle(std::shared_ptr<Client> const &client, std::string const &li
       send(alive, said);
     }
   };
-  if (question.is_object()) {
-    handle_(question, reply);
-  } else {
+  try {
+    auto const what = question.at("ask").get<std::string>();
+    auto const known = questions_.find(what);
+    if (known == questions_.end()) {
+      reply({{"refused", "nobody here knows '" + what + "'"}});
+    } else {
+      known->second(question, reply);
+    }
+  } catch (Json::exception const &) {
     reply({{"refused", "that is no question"}});
+  } catch (std::exception const &error) {
+    reply({{"refused", error.what()}});
   }
 }
 

@@ -4,8 +4,10 @@
 #include <chrono>
 #include <filesystem>
 #include <functional>
+#include <map>
 #include <memory>
 #include <set>
+#include <string>
 
 #include "events/loop.h"
 #include "events/unix_address.h"
@@ -18,13 +20,16 @@ using openvswitch::Json;
 /// Replies to a question, at once or later. The process that asked may be gone by then.
 using Reply = std::function<void(Json const &)>;
 
+/// What is done with each kind of question, by what its member "ask" says. What it throws is the
+/// reply: of a std::exception the text, and a Json::exception says that it was no question.
+using Questions =
+    std::map<std::string, std::function<void(Json const &question, Reply const &reply)>>;
+
 class Server {
  public:
-  using Handle = std::function<void(Json const &question, Reply const &reply)>;
-
   /// Listens at `socket`, in place of a daemon that is gone. Who does not take what is said to them
   /// in the time of `patience` is dropped. Throws std::runtime_error.
-  Server(events::Loop &loop, std::filesystem::path socket, Handle handle,
+  Server(events::Loop &loop, std::filesystem::path socket, Questions questions,
          events::Clock::duration patience = std::chrono::seconds(10));
   ~Server();
   Server(Server const &) = delete;
@@ -41,7 +46,7 @@ class Server {
 
   events::Loop &loop_;
   std::filesystem::path path_;
-  Handle handle_;
+  Questions questions_;
   events::Clock::duration patience_;
   events::UnixAddress address_;
   events::Descriptor socket_;

@@ -77,8 +77,7 @@ Member::Member(events::Loop &loop, Options options, Say say)
       speaker_{.host = options_.host, .session = random_name()},
       cluster_(options_.servers,
                {.name = kDatabase, .version = kSchemaVersion, .selected = selected_columns()}),
-      server_(loop, agent_socket_of(options_.state),
-              [this](Json const &question, Reply const &reply) { handle(question, reply); }),
+      server_(loop, agent_socket_of(options_.state), questions()),
       lost_(events::Clock::now()) {
   next_connect_ = loop_.after({}, [this] { connect(); });
 }
@@ -326,23 +325,15 @@ void Member::report() {
 
 // What callers ask.
 
-void Member::handle(Json const &question, Reply const &reply) {
-  try {
-    auto const what = question.at("ask").get<std::string>();
-    if (what == "commit") {
-      commit(question, reply);
-    } else if (what == "join") {
-      join(question.at("alias").get<std::string>(), reply);
-    } else if (what == "status") {
-      reply(status());
-    } else {
-      reply({{"refused", "nobody here knows '" + what + "'"}});
-    }
-  } catch (Json::exception const &) {
-    reply({{"refused", "that is no question"}});
-  } catch (std::runtime_error const &error) {
-    reply({{"refused", error.what()}});
-  }
+daemon::Questions Member::questions() {
+  return {
+      {"commit", [this](Json const &question, Reply const &reply) { commit(question, reply); }},
+      {"join",
+       [this](Json const &question, Reply const &reply) {
+         join(question.at("alias").get<std::string>(), reply);
+       }},
+      {"status", [this](Json const &, Reply const &reply) { reply(status()); }},
+  };
 }
 
 void Member::commit(Json const &question, Reply const &reply) {

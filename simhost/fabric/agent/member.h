@@ -63,7 +63,7 @@ class Member {
   void report();
   [[nodiscard]] std::map<std::string, std::string> links();
 
-  void handle(Json const &question, Reply const &reply);
+  [[nodiscard]] daemon::Questions questions();
   void commit(Json const &question, Reply const &reply);
   void join(std::string const &alias, Reply const &reply);
   [[nodiscard]] Json status() const;

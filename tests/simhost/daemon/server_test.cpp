@@ -8,6 +8,7 @@
 #include <filesystem>
 #include <future>
 #include <optional>
+#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -17,6 +18,7 @@
 
 namespace {
 
+using simhost::daemon::Questions;
 using simhost::daemon::Reply;
 using simhost::daemon::Server;
 using simhost::events::Clock;
@@ -35,16 +37,17 @@ std::string large_text() {
 
 struct AServer : testing::Test {
   void listen(Clock::duration patience = kPatience) {
-    server.emplace(
-        loop, simhost::openvswitch::socket_of(state),
-        [this](Json const &question, Reply const &reply) {
-          if (question.at("ask") == "later") {
-            kept = reply;
-          } else {
-            reply({{"text", large_text()}});
-          }
-        },
-        patience);
+    server.emplace(loop, simhost::openvswitch::socket_of(state),
+                   Questions{
+                       {"later", [this](Json const &, Reply const &reply) { kept = reply; }},
+                       {"broken", [](Json const &,
+                                     Reply const &) { throw std::runtime_error("it is broken"); }},
+                       {"now",
+                        [](Json const &, Reply const &reply) {
+                          reply({{"text", large_text()}});
+                        }},
+                   },
+                   patience);
   }
 
   [[nodiscard]] Stream client(std::string_view question) const {
@@ -71,6 +74,17 @@ struct AServer : testing::Test {
     return reply.get().at("text").get<std::string>();
   }
 
+  // The line that comes back for one, which need not be a question.
+  std::string reply_to(std::string_view line) {
+    auto stream = client(line);
+    std::vector<std::uint8_t> taken;
+    comes([&] {
+      stream.receive(taken);
+      return !taken.empty() && taken.back() == '\n';
+    });
+    return {taken.begin(), taken.end()};
+  }
+
   TemporaryFolder folder;
   std::filesystem::path state = folder.file("h.db");
   Loop loop;
@@ -86,6 +100,16 @@ bool is_dropped(Stream const &client) {
 TEST_F(AServer, SendsAReplyThatIsLargerThanASocketHolds) {
   listen();
   EXPECT_TRUE(asked() == large_text());
+}
+
+TEST_F(AServer, SaysWhyItHasNoReply) {
+  listen();
+  constexpr auto *kNoQuestion = "{\"refused\":\"that is no question\"}\n";
+  EXPECT_EQ(reply_to("now\n"), kNoQuestion);
+  EXPECT_EQ(reply_to("[\"ask\"]\n"), kNoQuestion);
+  EXPECT_EQ(reply_to("{\"ask\": 1}\n"), kNoQuestion);
+  EXPECT_EQ(reply_to("{\"ask\": \"never\"}\n"), "{\"refused\":\"nobody here knows 'never'\"}\n");
+  EXPECT_EQ(reply_to("{\"ask\": \"broken\"}\n"), "{\"refused\":\"it is broken\"}\n");
 }
 
 TEST_F(AServer, DropsAClientThatTakesNothing) {

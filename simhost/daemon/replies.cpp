@@ -1,0 +1,180 @@
+// What callers ask the daemon of a state, and what it replies.
+#include <unistd.h>
+
+#include <functional>
+#include <stdexcept>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "daemon/daemon.h"
+#include "daemon/devices/packet_sizes.h"
+#include "daemon/wanted.h"
+
+namespace simhost::daemon {
+namespace {
+
+// No text of JSON has all that a path may have.
+std::vector<std::uint8_t> bytes_of(std::filesystem::path const &path) {
+  auto const &text = path.native();
+  return {text.begin(), text.end()};
+}
+
+storage::SwitchKey switch_in(Json const &question) {
+  return storage::SwitchKey{question.at("switch").get<std::int64_t>()};
+}
+
+}  // namespace
+
+Questions Daemon::questions() {
+  auto const told_by = [this](auto member) {
+    return [this, member](Json const &question, Reply const &reply) {
+      reply(std::invoke(member, *this, question));
+    };
+  };
+  return {
+      {"in force",
+       [this](Json const &question, Reply const &reply) {
+         handle_in_force(question.at("change").get<std::uint64_t>(), reply);
+       }},
+      {"device", told_by(&Daemon::is_there)},
+      {"carry", told_by(&Daemon::carry)},
+      {"carrier", told_by(&Daemon::carrier)},
+      {"addresses", told_by(&Daemon::addresses)},
+      {"counters", told_by(&Daemon::counters)},
+      {"sessions", told_by(&Daemon::counting_sessions)},
+      {"bridge", told_by(&Daemon::bridge)},
+      {"groups", told_by(&Daemon::groups)},
+      {"status", told_by(&Daemon::status)},
+  };
+}
+
+void Daemon::handle_in_force(std::uint64_t change, Reply const &reply) {
+  if (change <= in_force_) {
+    reply({{"change", in_force_}});
+    return;
+  }
+  waiting_.emplace(change, reply);
+  sync_soon();
+}
+
+// 0 for a port of no team that goes by load: all others are known by their numbers.
+Json Daemon::carrier(Json const &question) const {
+  return {{"device",
+           load_balance_.carrier(switch_in(question), question.at("port").get<std::uint32_t>())}};
+}
+
+Json Daemon::addresses(Json const &question) {
+  if (!bridges_) {
+    return {{"refused", "Open vSwitch cannot be reached: " + troubles_.text()}};
+  }
+  auto const port = question.at("port").get<std::uint32_t>();
+  Json entries = Json::array();
+  for (auto const &one : bridges_->learned(switch_in(question))) {
+    if (one.port == port) {
+      entries.push_back({{"mac", one.address}, {"vlan", one.vlan}, {"age", one.age}});
+    }
+  }
+  return {{"addresses", entries}};
+}
+
+Json Daemon::is_there(Json const &question) {
+  auto const device = question.at("name").get<std::string>();
+  if (devices_.refresh()) {
+    sync_soon();
+  }
+  auto at = bridges_ ? bridges_->elsewhere(device).value_or("") : std::string();
+  // One that is at a bridge of Open vSwitch may have a master because of that.
+  if (at.empty() && !at_bridges_.contains(device)) {
+    at = devices_.master_of(device);
+  }
+  return {{"there", devices_.find(device).has_value()}, {"at", at}};
+}
+
+// Before it is committed that switches have packets of these sizes, and devices likewise.
+Json Daemon::carry(Json const &question) {
+  PacketSizes sizes;
+  {
+    storage::ReadingTransaction transaction(store_);
+    for (auto const &one : question.at("switches")) {
+      add_packet_sizes(transaction, storage::SwitchKey{one.at(0).get<std::int64_t>()},
+                       one.at(1).get<std::uint32_t>(), sizes);
+    }
+  }
+  for (auto const &one : question.at("devices")) {
+    sizes[one.at(0).get<std::string>()] = one.at(1).get<std::uint32_t>();
+  }
+  devices_.refresh();
+  auto const why = raise_all_packet_sizes(sizes, devices_);
+  return {{"why", why.value_or("")}};
+}
+
+// What goes wrong with it is no reason to say nothing of what is known.
+void Daemon::count_of(storage::SwitchKey key) {
+  try {
+    if (bridges_) {
+      bridges_->count(key);
+    }
+  } catch (std::runtime_error const &error) {
+    fail(error.what());
+  }
+}
+
+Json Daemon::counters(Json const &question) {
+  CounterOwner owner{.switch_key = switch_in(question),
+                     .port = std::nullopt,
+                     .session = question.at("session").get<std::string>()};
+  if (auto const port = question.at("port").get<std::uint32_t>()) {
+    owner.port = storage::PortNumber{port};
+  }
+  count_of(owner.switch_key);
+  storage::ReadingTransaction transaction(store_);
+  counting_.follow(transaction);
+  Json values = Json::object();
+  for (auto const &[name, value] : counting_.counters_of(transaction, owner)) {
+    values[std::string(name)] = value;
+  }
+  return {{"counters", values}};
+}
+
+Json Daemon::counting_sessions(Json const &question) {
+  auto const key = switch_in(question);
+  count_of(key);
+  return {{"sessions", counting_.unsaved_sessions(key)}};
+}
+
+Json Daemon::groups(Json const &question) const {
+  auto const to_json = [](multicast::Address const &address) {
+    return address.family == multicast::Family::ipv4 ? Json(multicast::ipv4_of(address))
+                                                     : Json(address.bytes);
+  };
+  Json groups = Json::array();
+  for (auto const &one :
+       members_.joined(switch_in(question), question.at("port").get<std::uint32_t>())) {
+    auto const &sources = one.joined.sources;
+    Json listed = Json::array();
+    for (auto const &source : sources.listed) {
+      listed.push_back(to_json(source));
+    }
+    groups.push_back({{"address", to_json(one.address)},
+                      {"version", one.joined.version},
+                      {"excludes", sources.are_excluded},
+                      {"sources", listed},
+                      {"age", one.age.count()}});
+  }
+  return {{"groups", groups}};
+}
+
+Json Daemon::bridge(Json const &question) const {
+  return {{"name", bridge_name(host_, question.at("switch").get<std::string>())},
+          {"folder", bytes_of(options_.database.parent_path())}};
+}
+
+Json Daemon::status(Json const & /*question*/) const {
+  return {{"change", in_force_},
+          {"said", troubles_.text()},
+          {"process", getpid()},
+          {"datapath", options_.datapath}};
+}
+
+}  // namespace simhost::daemon
