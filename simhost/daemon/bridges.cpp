@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <exception>
 #include <iterator>
 #include <stdexcept>
 #include <utility>
@@ -147,7 +148,7 @@ void Bridges::read_database_events() {
       present_.reset();
       told_.changed();
     }
-  } catch (std::runtime_error const &) {
+  } catch (std::exception const &) {
     database_watch_.end();
     told_.disturbed();
   }
@@ -269,7 +270,7 @@ void Bridges::follow_learned(Bridge &bridge, openflow::FlowUpdate const &update)
   }
 }
 
-void Bridges::note_origin(Bridge &bridge, Origin origin) {
+void Bridges::note_origin(Bridge &bridge, Origin origin) const {
   if (origin == Origin::taught || std::exchange(bridge.is_altered, true)) {
     return;
   }
@@ -292,7 +293,7 @@ void Bridges::read_events(Bridge &bridge) {
   try {
     bridge.connection.receive();
     follow_events(bridge);
-  } catch (std::runtime_error const &) {
+  } catch (std::exception const &) {
     bridge.watch.end();
     told_.disturbed();
   }
@@ -436,6 +437,29 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   return size_of(difference);
 }
 
+// What is wrong with one switch is no reason to stop the others.
+std::size_t Bridges::try_flows(WantedBridge const &wanted, std::uint64_t change,
+                               std::set<std::string> const &added, Deadline deadline) {
+  auto const refuse = [&](std::exception const &why) {
+    told_.refused(wanted.alias, why.what());
+    if (auto const &bridge = bridges_[wanted.key]) {
+      bridge->is_altered = true;  // so that what it has is looked at anew
+    } else {
+      bridges_.erase(wanted.key);
+    }
+    return std::size_t{0};
+  };
+  try {
+    return apply_flows(wanted, change, added, deadline);
+  } catch (openflow::Refused const &refused) {
+    return refuse(refused);
+  } catch (std::runtime_error const &) {
+    throw;  // of the connection
+  } catch (std::exception const &error) {
+    return refuse(error);
+  }
+}
+
 std::optional<bool> Bridges::is_live(storage::SwitchKey key, openflow::Port port) const {
   auto const found = bridges_.find(key);
   return found == bridges_.end() ? std::nullopt : std::optional(found->second->live.contains(port));
@@ -519,7 +543,7 @@ std::size_t Bridges::apply(Wanted const &wanted) {
   std::erase_if(bridges_, goes);
   std::size_t changed = 0;
   for (auto const &bridge : wanted.bridges) {
-    changed += apply_flows(bridge, wanted.change, added, deadline);
+    changed += try_flows(bridge, wanted.change, added, deadline);
   }
   if (any_new) {
     apply_rows(wanted, rows, deadline);

@@ -45,6 +45,8 @@ class Bridges {
     std::function<void(std::string const &)> altered;
     /// A bridge has learned what its flows do not teach, or not any more.
     std::function<void()> strayed;
+    /// A switch cannot be run as it is wanted, and goes on as it was.
+    std::function<void(std::string const &alias, std::string const &why)> refused;
     /// Devices in groups are live, or are not any more; see is_live().
     std::function<void()> lived;
     /// A flow of a bridge sent up a frame.
@@ -93,6 +95,9 @@ class Bridges {
                                    openvswitch::Deadline deadline);
   std::size_t apply_flows(WantedBridge const &wanted, std::uint64_t change,
                           std::set<std::string> const &added, openvswitch::Deadline deadline);
+  // Returns how many flows and groups it changed.
+  std::size_t try_flows(WantedBridge const &wanted, std::uint64_t change,
+                        std::set<std::string> const &added, openvswitch::Deadline deadline);
   Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
   void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
   static void have_meters(Bridge &bridge, std::vector<openflow::Flow> const &flows,
@@ -111,7 +116,7 @@ class Bridges {
   void follow_events(Bridge &bridge);
   void follow_learned(Bridge &bridge, openflow::FlowUpdate const &update);
   void look_for_strays(Bridge &bridge);
-  void note_origin(Bridge &bridge, Origin origin);
+  void note_origin(Bridge &bridge, Origin origin) const;
   void count(Bridge &bridge, openvswitch::Deadline deadline);
 
   events::Loop &loop_;

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <exception>
 #include <set>
 #include <utility>
 #include <vector>
@@ -97,12 +98,12 @@ void Daemon::count() {
     if (bridges_) {
       bridges_->count();
     }
-  } catch (std::runtime_error const &error) {
+  } catch (std::exception const &error) {
     fail(error.what());
   }
   try {
     counting_.save();
-  } catch (std::runtime_error const &error) {
+  } catch (std::exception const &error) {
     troubles_.add(error.what());
   }
   remember();
@@ -113,7 +114,7 @@ void Daemon::age() {
     if (bridges_) {
       next_aging_ = loop_.after(bridges_->age(), [this] { age(); });
     }
-  } catch (std::runtime_error const &error) {
+  } catch (std::exception const &error) {
     fail(error.what());
   }
 }
@@ -135,7 +136,7 @@ void Daemon::remember() {
     if (!memory_.save()) {
       remember_soon();
     }
-  } catch (std::runtime_error const &error) {
+  } catch (std::exception const &error) {
     troubles_.add(error.what());
   }
 }
@@ -177,35 +178,37 @@ void Daemon::connect() {
   attempt([this] {
     bridges_.emplace(
         loop_, options_.database, memory_,
-        Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
-                      .host = host_,
-                      .counted =
-                          [this](auto key, auto const &totals, auto const &sessions) {
-                            counting_.count(key, totals, sessions);
-                            load_balance_.count(key, totals);
-                          },
-                      .moved =
-                          [this](auto key, auto port) {
-                            if (port != 0) {
-                              counting_.count_move(key, port);
-                            }
-                          },
-                      .changed = [this] { sync_soon(); },
-                      .altered =
-                          [this](std::string const &bridge) {
-                            say_(fmt::format(
-                                "somebody else changed flows or groups of the bridge {}", bridge));
-                            mend_soon();
-                          },
-                      .strayed = [this] { mend_soon(); },
-                      .lived = [this] { sync_soon(); },
-                      .heard =
-                          [this](auto key, auto const &packet) {
-                            if (!beacons_.receive(key, packet)) {
-                              members_.receive(key, packet);
-                            }
-                          },
-                      .disturbed = [this] { connect_later(); }});
+        Bridges::Told{
+            .owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
+            .host = host_,
+            .counted =
+                [this](auto key, auto const &totals, auto const &sessions) {
+                  counting_.count(key, totals, sessions);
+                  load_balance_.count(key, totals);
+                },
+            .moved =
+                [this](auto key, auto port) {
+                  if (port != 0) {
+                    counting_.count_move(key, port);
+                  }
+                },
+            .changed = [this] { sync_soon(); },
+            .altered =
+                [this](std::string const &bridge) {
+                  say_(fmt::format("somebody else changed flows or groups of the bridge {}",
+                                   bridge));
+                  mend_soon();
+                },
+            .strayed = [this] { mend_soon(); },
+            .refused = [this](auto const &alias, auto const &why) { add_refused(alias, why); },
+            .lived = [this] { sync_soon(); },
+            .heard =
+                [this](auto key, auto const &packet) {
+                  if (!beacons_.receive(key, packet)) {
+                    members_.receive(key, packet);
+                  }
+                },
+            .disturbed = [this] { connect_later(); }});
     sync();
   });
 }
@@ -231,7 +234,7 @@ void Daemon::attempt(std::function<void()> const &work) {
   try {
     work();
     pause_ = {};
-  } catch (std::runtime_error const &error) {
+  } catch (std::exception const &error) {
     fail(error.what());
   }
 }
@@ -243,7 +246,7 @@ void Daemon::look_at_commits() {
     if (storage::commits_of_others(transaction) != commits_) {
       sync_soon();
     }
-  } catch (std::runtime_error const &) {
+  } catch (std::exception const &) {
     sync_soon();  // which says what is wrong with the state
   }
 }
@@ -257,7 +260,7 @@ void Daemon::fail(std::string const &why) {
 // A query that is lost comes again.
 bool Daemon::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) try {
   return bridges_ && bridges_->send(key, frames);
-} catch (std::runtime_error const &error) {
+} catch (std::exception const &error) {
   troubles_.add(error.what());
   connect_later();
   return false;
@@ -376,6 +379,10 @@ void Daemon::sync() {
   counting_.save_new();
 }
 
+void Daemon::add_refused(std::string const &alias, std::string const &why) {
+  troubles_.add(fmt::format("the switch '{}' cannot be run: {}", alias, why));
+}
+
 void Daemon::follow_tunnels(Wanted const &wanted) {
   devices_.refresh();
   auto const is_at_bridge = [&](std::string const &device) {
@@ -447,7 +454,7 @@ void Daemon::settle(Wanted const &wanted) {
   in_force_ = wanted.change;
   sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {
-    troubles_.add(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
+    add_refused(unfit.alias, unfit.why);
   }
   reply_to_waiting();
   if (settled_) {

@@ -69,6 +69,7 @@ class Daemon {
   void take_out_new_devices(Wanted const &wanted);
   // The way of the machine to the hosts beyond tunnels, and what is wrong with it.
   void follow_tunnels(Wanted const &wanted);
+  void add_refused(std::string const &alias, std::string const &why);
   void settle(Wanted const &wanted);
   void reply_to_waiting();
 

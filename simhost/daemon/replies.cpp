@@ -115,7 +115,7 @@ void Daemon::count_of(storage::SwitchKey key) {
     if (bridges_) {
       bridges_->count(key);
     }
-  } catch (std::runtime_error const &error) {
+  } catch (std::exception const &error) {
     fail(error.what());
   }
 }

@@ -4,7 +4,9 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <exception>
 #include <span>
+#include <stdexcept>
 #include <utility>
 
 #include "base/ip_text.h"
@@ -214,6 +216,10 @@ openvswitch::CountedSessions sessions_of(openvswitch::Network const &network) {
   return sessions;
 }
 
+Unfit unfit(WantedBridge const &bridge, std::exception const &why) {
+  return {.key = bridge.key, .alias = bridge.alias, .bridge = bridge.row.name, .why = why.what()};
+}
+
 }  // namespace
 
 // Linux has room for fifteen bytes, and an alias may change.
@@ -276,8 +282,12 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       shorten(wanted.lasts, teaming::until_next_settles(team));
       wanted.bridges.push_back(std::move(bridge));
     } catch (Refused const &refused) {
-      wanted.unfit.push_back(
-          {.key = key, .alias = row.alias, .bridge = bridge.row.name, .why = refused.what()});
+      wanted.unfit.push_back(unfit(bridge, refused));
+    } catch (std::runtime_error const &) {
+      throw;  // of the state, which is all switches'
+    } catch (std::exception const &error) {
+      // What is wrong here with one of them is no reason to stop the others.
+      wanted.unfit.push_back(unfit(bridge, error));
     }
   }
   compiler.forget_others();

@@ -250,6 +250,40 @@ def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
     refused_far_session(lab, "lab", "a")
 
 
+# Of a daemon that goes wrong with switches of these MTUs.
+PLANTED_FAULTS = {
+    6001: "a fault planted in the compiler",
+    6002: "the name of a selection method has at most 15 characters",
+    6003: "the switch refuses to add group",
+}
+
+
+def test_a_switch_with_which_something_is_wrong_stops_no_other(
+    idle: Lab, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    with_faults = TOOLS.parent / "tests" / "simhost" / "simhostd_with_faults"
+    monkeypatch.setattr("simhost._loaded.program", lambda *_, **__: with_faults)
+    idle.start()
+    idle.apply({"switches": [{"alias": "second", "ports": [{"id": "x"}, {"id": "y"}]}]})
+    one, other = idle.client("lab", "a"), idle.client("lab", "b")
+    third, fourth = idle.client("second", "x"), idle.client("second", "y")
+    assert one.reaches(other, attempts=5) and third.reaches(fourth, attempts=5)
+    for mtu, why in PLANTED_FAULTS.items():
+        idle.apply({"switches": [{"alias": "lab", "mtu": mtu}]})
+        said = f"the switch 'lab' cannot be run: {why}"
+        assert said in idle.plane()["said"] and idle.is_in_force()
+        # The others can be changed.
+        idle.set_port("second", "x", vlan=8)
+        assert third.ceases_to_reach(fourth)
+        idle.set_port("second", "x", vlan=0)
+        assert third.comes_to_reach(fourth)
+        assert one.reaches(other, attempts=5)
+        assert idle.log().count(said) == 1
+    # So can it be itself, into one with which nothing is wrong.
+    idle.apply({"switches": [{"alias": "lab", "mtu": 1500, "ports": [{"id": "a", "vlan": 7}]}]})
+    assert not idle.plane()["said"] and one.ceases_to_reach(other)
+
+
 def test_a_switch_with_devices_at_uplinks_alone_is_not_made_unfit(lab: Lab) -> None:
     lab.network("nic0")
     refused_far_session(lab, "lab", "a")
