@@ -351,8 +351,12 @@ void Daemon::sync() {
   follow_devices();
   storage::ReadingTransaction transaction(store_);
   commits_ = storage::commits_of_others(transaction);
-  auto const is_there = [this](std::string const &device) {
-    return devices_.find(device).has_value();
+  auto const is_there = [this](std::string const &name) {
+    auto const device = devices_.find(name);
+    if (device && !device->has_ethernet) {
+      troubles_.add(fmt::format("the device {} carries no frames of Ethernet", name));
+    }
+    return device && device->has_ethernet;
   };
   collectors_.begin();
   auto const complete = [&](storage::SwitchKey key, openvswitch::Network &network) {

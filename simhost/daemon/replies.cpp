@@ -88,7 +88,8 @@ Json Daemon::is_there(Json const &question) {
   if (at.empty() && !at_bridges_.contains(device)) {
     at = devices_.master_of(device);
   }
-  return {{"there", devices_.find(device).has_value()}, {"at", at}};
+  auto const found = devices_.find(device);
+  return {{"there", found.has_value()}, {"ethernet", !found || found->has_ethernet}, {"at", at}};
 }
 
 // Before it is committed that switches have packets of these sizes, and devices likewise.

@@ -100,6 +100,8 @@ BOUNDS = [
 def test_a_device_that_cannot_be_had_changes_nothing(lab: Lab) -> None:
     lab.client("lab", "a")
     lab.network("nic0")
+    # What comes from it begins with no address.
+    lab.host.run("ip", "tuntap", "add", "t0", "mode", "tun")
     # A device has up to 15 letters.
     longest = "d" * 15
     lab.host.run("ip", "link", "add", longest, "type", "veth", "peer", "name", "other")
@@ -111,6 +113,8 @@ def test_a_device_that_cannot_be_had_changes_nothing(lab: Lab) -> None:
         "nowhere": "simhostd sees no device nowhere (QEX_NOT_FOUND)",
         "c1": "the device c1 is at the port 'a' of the switch 'lab' (QEX_BUSY)",
         "u0": "the device u0 is at the uplink 'nic0' (QEX_BUSY)",
+        "lo": "the device lo carries no frames of Ethernet (QEX_NOT_SUPPORTED)",
+        "t0": "the device t0 carries no frames of Ethernet (QEX_NOT_SUPPORTED)",
         # Of Open vSwitch itself.
         bridge: f"the device {bridge} is at the bridge {bridge} (QEX_BUSY)",
         "ovs-netdev": "the device ovs-netdev is at the bridge ovs-netdev (QEX_BUSY)",
@@ -124,6 +128,18 @@ def test_a_device_that_cannot_be_had_changes_nothing(lab: Lab) -> None:
     assert state_of(lab) == before
     lab.ctl("connect", "lab", "b", longest)
     assert lab.is_in_force()
+
+
+def test_a_device_of_another_kind_is_left_out_and_told(idle: Lab) -> None:
+    # Nobody looks at devices before there is a daemon.
+    idle.ctl("connect", "lab", "c", "lo")
+    idle.start()
+    one, other = idle.client("lab", "a"), idle.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    assert idle.plane()["said"] == "the device lo carries no frames of Ethernet"
+    assert idle.log().count("the device lo carries") == 1
+    idle.ctl("disconnect", "lab", "c")
+    assert not idle.plane()["said"]
 
 
 def document(session: Session) -> str:

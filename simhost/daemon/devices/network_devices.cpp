@@ -7,6 +7,7 @@
 #include <linux/rtnetlink.h>
 #include <linux/sockios.h>
 #include <net/if.h>
+#include <net/if_arp.h>
 #include <poll.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
@@ -171,8 +172,11 @@ bool NetworkDevices::take_device(nlmsghdr const &header) {
   if (header.nlmsg_type == RTM_DELLINK) {
     return remove(index);
   }
-  NetworkDevice device{
-      .index = index, .is_up = (info.ifi_flags & IFF_UP) != 0, .has_link = false, .mtu = 0};
+  NetworkDevice device{.index = index,
+                       .is_up = (info.ifi_flags & IFF_UP) != 0,
+                       .has_link = false,
+                       .mtu = 0,
+                       .has_ethernet = info.ifi_type == ARPHRD_ETHER};
   std::string name;
   auto size = IFLA_PAYLOAD(&header);
   for (auto const *attribute = IFLA_RTA(&info); RTA_OK(attribute, size);

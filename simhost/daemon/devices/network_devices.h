@@ -21,7 +21,8 @@ struct NetworkDevice {
   bool is_up;      ///< switched on
   bool has_link;
   std::uint32_t mtu;
-  unsigned master = 0;  ///< the index of the bridge or bond that it is at; 0 for none
+  unsigned master = 0;       ///< the index of the bridge or bond that it is at; 0 for none
+  bool has_ethernet = true;  ///< its frames are those of Ethernet, as a switch's are
 
   bool operator==(NetworkDevice const &) const = default;
 };

@@ -411,6 +411,10 @@ void OpenVswitchPlane::check_device(storage::Transaction &transaction, std::stri
     if (!reply.value("there", true)) {
       throw Refused(QEX_NOT_FOUND, fmt::format("simhostd sees no device {}", device));
     }
+    if (!reply.value("ethernet", true)) {
+      throw Refused(QEX_NOT_SUPPORTED,
+                    fmt::format("the device {} carries no frames of Ethernet", device));
+    }
     if (auto const at = reply.value("at", std::string()); !at.empty()) {
       throw Refused(QEX_BUSY, fmt::format("the device {} is at the bridge {}", device, at));
     }
