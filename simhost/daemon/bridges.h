@@ -65,6 +65,8 @@ class Bridges {
 
   /// The bridge of somebody else that has a device.
   std::optional<std::string> elsewhere(std::string const &device);
+  /// Why Open vSwitch cannot use devices at the bridges.
+  std::map<std::string, std::string> const &errors() { return present().errors; }
   /// Whether frames may go out at a port of the bridge of a switch: it has a link and, in a group,
   /// a partner. Nothing while there is no bridge of it.
   [[nodiscard]] std::optional<bool> is_live(storage::SwitchKey key, openflow::Port port) const;

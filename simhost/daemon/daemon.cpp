@@ -436,6 +436,9 @@ void Daemon::settle(Wanted const &wanted) {
       }
     }
   }
+  for (auto const &[device, error] : bridges_->errors()) {
+    troubles_.add(fmt::format("Open vSwitch cannot use the device {}: {}", device, error));
+  }
   std::set<storage::SwitchKey> keys;
   for (auto const &bridge : wanted.bridges) {
     keys.insert(bridge.key);

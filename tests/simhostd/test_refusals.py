@@ -4,7 +4,7 @@ status that says why, and with nothing changed."""
 import json
 from typing import Any, Dict, NamedTuple, Sequence, Tuple
 
-from frame_lab import Lab
+from frame_lab import Lab, comes_true
 
 Session = Dict[str, Any]
 
@@ -140,6 +140,20 @@ def test_a_device_of_another_kind_is_left_out_and_told(idle: Lab) -> None:
     assert idle.log().count("the device lo carries") == 1
     idle.ctl("disconnect", "lab", "c")
     assert not idle.plane()["said"]
+
+
+def test_a_device_that_open_vswitch_cannot_use_is_told(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    # It has its own of that name.
+    lab.host.run("ip", "link", "add", "vxlan_sys_4789", "type", "veth", "peer", "name", "other")
+    lab.ctl("connect", "lab", "c", "vxlan_sys_4789")
+    said = "Open vSwitch cannot use the device vxlan_sys_4789: its log says why"
+    assert comes_true(lambda: lab.plane()["said"] == said)
+    assert said in lab.ctl("plane") and lab.is_in_force()
+    assert lab.log().count(said) == 1
+    assert one.reaches(other, attempts=5)
+    lab.ctl("disconnect", "lab", "c")
+    assert comes_true(lambda: not lab.plane()["said"])
 
 
 def document(session: Session) -> str:

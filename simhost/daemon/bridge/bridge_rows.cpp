@@ -1,3 +1,4 @@
+// Bridges are known by their names, as the database of Open vSwitch knows them.
 #include "daemon/bridge/bridge_rows.h"
 
 #include <algorithm>

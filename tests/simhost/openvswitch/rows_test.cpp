@@ -59,7 +59,9 @@ Schema schema() {
             {"type", single},
             {"options", map},
             {"ingress_policing_rate", number},
-            {"other_config", map}}},
+            {"other_config", map},
+            {"error", optional},
+            {"ofport", optional}}},
           {"Flow_Table", {{"flow_limit", optional}}}};
 }
 
@@ -192,6 +194,27 @@ TEST(TheRows, SayWhichDevicesAreOthersOrOpenVswitchsOwn) {
   EXPECT_THAT(present_rows(replica(), kHost).elsewhere,
               ElementsAre(Device("eth7", "br0"), Device("ovs-netdev", "ovs-netdev"),
                           Device("ovs-system", "ovs-system"), Device("vs1", "vs1")));
+}
+
+TEST(TheRows, SayWhatOpenVswitchCannotUse) {
+  auto with_errors = replica();
+  with_errors.apply(Json::parse(R"json({
+    "Interface": {
+      "i1": {"modify": {"error": "could not open c1"}},
+      "i2": {"modify": {"error": "nobody here asked for eth7"}}}
+  })json"));
+  EXPECT_THAT(present_rows(replica(), kHost).errors, SizeIs(0));
+  EXPECT_THAT(present_rows(with_errors, kHost).errors,
+              ElementsAre(std::pair("c1", "could not open c1")));
+  // It may say nothing but that there is no port of the device.
+  auto without_port = replica();
+  without_port.apply(Json::parse(R"({"Interface": {"i1": {"modify": {"ofport": -1}}}})"));
+  EXPECT_THAT(present_rows(without_port, kHost).errors,
+              ElementsAre(std::pair("c1", "its log says why")));
+  without_port.apply(Json::parse(R"({"Interface": {"i1": {"modify": {"ofport": 5}}}})"));
+  EXPECT_THAT(present_rows(without_port, kHost).errors, SizeIs(0));
+  // It is nothing that could be made otherwise.
+  EXPECT_THAT(told(present_rows(with_errors, kHost), {vs1()}), SizeIs(0));
 }
 
 TEST(TheRows, ThatSomebodyElseChangedAreMadeAsTheyWere) {

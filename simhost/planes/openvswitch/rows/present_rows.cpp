@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <exception>
+#include <optional>
 #include <stdexcept>
 
 #include "planes/openvswitch/rows/columns.h"
@@ -108,6 +109,29 @@ void add_port(PresentBridge &bridge, std::string const &port_id, Tables const &t
   }
 }
 
+// Nothing if it can be used, or was not tried yet.
+std::optional<std::string> error_of(ovsdb::Row const &interface) {
+  if (auto const errors = ovsdb::atoms_of(interface.at("error")); !errors.empty()) {
+    return errors.front().get<std::string>();
+  }
+  constexpr int kNone = -1;
+  auto const numbers = ovsdb::atoms_of(interface.at("ofport"));
+  bool const has_number = numbers.empty() || numbers.front() != kNone;
+  return has_number ? std::nullopt : std::optional<std::string>("its log says why");
+}
+
+void add_errors(ovsdb::Row const &bridge, Tables const &tables,
+                std::map<std::string, std::string> &errors) {
+  for (auto const &port : ovsdb::atoms_of(bridge.at("ports"))) {
+    for (auto const &id : ovsdb::atoms_of(tables.ports.at(id_in(port)).at("interfaces"))) {
+      auto const &interface = tables.interfaces.at(id_in(id));
+      if (auto error = error_of(interface)) {
+        errors.emplace(interface.at("name").get<std::string>(), *std::move(error));
+      }
+    }
+  }
+}
+
 std::vector<std::string> devices_at(ovsdb::Row const &bridge, Tables const &tables) {
   std::vector<std::string> devices;
   for (auto const &port : ovsdb::atoms_of(bridge.at("ports"))) {
@@ -149,7 +173,8 @@ void select_rows(ovsdb::Selected &selected) {
         "controller", "mirrors", "other_config"}},
       {"Port", {"name", "interfaces", "tag", "trunks", "vlan_mode", "lacp", "other_config"}},
       {"Interface",
-       {"name", "ofport_request", "type", "options", "ingress_policing_rate", "other_config"}},
+       {"name", "ofport_request", "type", "options", "ingress_policing_rate", "other_config",
+        "error", "ofport"}},
       {"Flow_Table", {"flow_limit"}}};
   for (auto const &[table, columns] : read) {
     auto &known = selected[table];
@@ -177,6 +202,7 @@ PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host) {
       if (text_under(row.at("external_ids"), kHost) == host) {
         present.bridges.push_back(bridge_of(id, row, tables));
         present.elsewhere[name] = name;
+        add_errors(row, tables, present.errors);
       } else {
         for (auto const &device : devices_at(row, tables)) {
           present.elsewhere[device] = name;

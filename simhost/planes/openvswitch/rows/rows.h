@@ -74,6 +74,8 @@ struct PresentRows {
   std::uint32_t most_tags = 0;  ///< of the frames that the switch tells apart
   /// Devices of others' bridges, with these; and what each bridge and data path has by itself.
   std::map<std::string, std::string> elsewhere = {};
+  /// Why Open vSwitch cannot use devices that are at this host's bridges, and these themselves.
+  std::map<std::string, std::string> errors = {};
 };
 
 /// The columns that present_rows() reads.
