@@ -11,6 +11,7 @@
 #include <variant>
 
 #include "daemon/bridge/bridge_rows.h"
+#include "daemon/bridge/cached_flows.h"
 #include "daemon/bridge/changes.h"
 #include "daemon/bridge/live_ports.h"
 #include "daemon/bridge/made_bridge.h"
@@ -389,7 +390,8 @@ void Bridges::add_meters(Bridge &bridge, std::vector<Flow> const &flows, Deadlin
 }
 
 std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t change,
-                                 std::set<std::string> const &added, Deadline deadline) {
+                                 std::set<std::string> const &added, Forget const &forget,
+                                 Deadline deadline) {
   auto &bridge = connected(wanted, deadline);
   // A bridge without a marker was made just before.
   bool const is_new = !bridge.change;
@@ -425,7 +427,10 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
                                               .flow = openvswitch::generation_marker(change)});
   }
   if (!changes.empty()) {
-    bridge.connection.change(changes, deadline);
+    auto const forget_it =
+        forget ? [&] { return forget(bridge.name, change); } : std::function<bool()>();
+    change_and_forget(bridge.connection, changes, bridge.change != change,
+                      size_of(difference) > 0 ? forget_it : nullptr, deadline);
     bridge.have(wanted.flows);
     bridge.change = change;
     follow_events(bridge);
@@ -439,7 +444,8 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
 
 // What is wrong with one switch is no reason to stop the others.
 std::size_t Bridges::try_flows(WantedBridge const &wanted, std::uint64_t change,
-                               std::set<std::string> const &added, Deadline deadline) {
+                               std::set<std::string> const &added, Forget const &forget,
+                               Deadline deadline) {
   auto const refuse = [&](std::exception const &why) {
     told_.refused(wanted.alias, why.what());
     if (auto const &bridge = bridges_[wanted.key]) {
@@ -450,7 +456,7 @@ std::size_t Bridges::try_flows(WantedBridge const &wanted, std::uint64_t change,
     return std::size_t{0};
   };
   try {
-    return apply_flows(wanted, change, added, deadline);
+    return apply_flows(wanted, change, added, forget, deadline);
   } catch (openflow::Refused const &refused) {
     return refuse(refused);
   } catch (std::runtime_error const &) {
@@ -520,7 +526,7 @@ std::vector<Source> Bridges::age(Bridge &bridge, Deadline deadline) {
   return sources;
 }
 
-std::size_t Bridges::apply(Wanted const &wanted) {
+std::size_t Bridges::apply(Wanted const &wanted, Forget const &forget) {
   std::size_t devices = 0;
   for (auto const &bridge : wanted.bridges) {
     devices += bridge.row.devices.size();
@@ -543,10 +549,13 @@ std::size_t Bridges::apply(Wanted const &wanted) {
   std::erase_if(bridges_, goes);
   std::size_t changed = 0;
   for (auto const &bridge : wanted.bridges) {
-    changed += try_flows(bridge, wanted.change, added, deadline);
+    changed += try_flows(bridge, wanted.change, added, any_new ? nullptr : forget, deadline);
   }
   if (any_new) {
     apply_rows(wanted, rows, deadline);
+    if (changed > 0 && forget) {
+      forget(wanted.bridges.front().row.name, wanted.change);
+    }
   }
   return changed;
 }

@@ -70,9 +70,12 @@ class Bridges {
   /// Whether frames may go out at a port of the bridge of a switch: it has a link and, in a group,
   /// a partner. Nothing while there is no bridge of it.
   [[nodiscard]] std::optional<bool> is_live(storage::SwitchKey key, openflow::Port port) const;
-  /// Makes everything as it is wanted, and returns when it is in force. Returns how many flows and
-  /// groups it changed, markers not counted.
-  std::size_t apply(Wanted const &wanted);
+  /// Makes what is remembered of flows be forgotten, as forget_cached_flows(). Throws nothing.
+  using Forget = std::function<bool(std::string const &bridge, std::uint64_t generation)>;
+  /// Makes everything as it is wanted, and returns when it is in force: for frames of kinds that
+  /// were there before, only with `forget`. Returns how many flows and groups it changed, markers
+  /// not counted.
+  std::size_t apply(Wanted const &wanted, Forget const &forget = nullptr);
   /// Sends frames from the bridge of a switch; returns whether there is one.
   bool send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
   /// Tells what all bridges counted, and where addresses moved.
@@ -96,10 +99,12 @@ class Bridges {
                                    std::vector<openvswitch::BridgeRow> const &rows,
                                    openvswitch::Deadline deadline);
   std::size_t apply_flows(WantedBridge const &wanted, std::uint64_t change,
-                          std::set<std::string> const &added, openvswitch::Deadline deadline);
+                          std::set<std::string> const &added, Forget const &forget,
+                          openvswitch::Deadline deadline);
   // Returns how many flows and groups it changed.
   std::size_t try_flows(WantedBridge const &wanted, std::uint64_t change,
-                        std::set<std::string> const &added, openvswitch::Deadline deadline);
+                        std::set<std::string> const &added, Forget const &forget,
+                        openvswitch::Deadline deadline);
   Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
   void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
   static void have_meters(Bridge &bridge, std::vector<openflow::Flow> const &flows,

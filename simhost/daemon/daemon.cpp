@@ -321,33 +321,38 @@ bool Daemon::is_new_device(std::string const &name) const {
   return device && known != at_bridges_.end() && known->second != device->index;
 }
 
-void Daemon::take_out_new_devices(Wanted const &wanted) {
+// Returns how many flows and groups that changed.
+std::size_t Daemon::take_out_new_devices(Wanted const &wanted, Bridges::Forget const &forget) {
   bool const has_new = std::ranges::any_of(wanted.bridges, [&](auto const &bridge) {
     return std::ranges::any_of(bridge.row.devices,
                                [&](auto const &device) { return is_new_device(device.first); });
   });
-  if (has_new) {
-    auto others = wanted;
-    for (auto &bridge : others.bridges) {
-      std::erase_if(bridge.row.devices,
-                    [&](auto const &device) { return is_new_device(device.first); });
-    }
-    bridges_->apply(others);
+  if (!has_new) {
+    return 0;
   }
+  auto others = wanted;
+  for (auto &bridge : others.bridges) {
+    std::erase_if(bridge.row.devices,
+                  [&](auto const &device) { return is_new_device(device.first); });
+  }
+  return bridges_->apply(others, forget);
 }
 
-// Without which it is in force for most frames only.
-void Daemon::forget_cached_flows() {
+// Without which a change is in force for most frames only. Where it cannot be, to try once more is
+// of no use.
+bool Daemon::forget_cached_flows(std::string const &bridge, std::uint64_t generation) {
   try {
-    simhost::daemon::forget_cached_flows(options_.database.parent_path());
-  } catch (std::runtime_error const &error) {
+    return simhost::daemon::forget_cached_flows(options_.database.parent_path(), bridge,
+                                                generation);
+  } catch (std::exception const &error) {
     troubles_.add(
         fmt::format("frames may go on for a while as they went before a change: {}", error.what()));
+    return true;
   }
 }
 
 void Daemon::sync() {
-  bool const is_told = !std::exchange(follows_members_, false);
+  bool const follows_members = std::exchange(follows_members_, false);
   follow_devices();
   storage::ReadingTransaction transaction(store_);
   commits_ = storage::commits_of_others(transaction);
@@ -371,10 +376,17 @@ void Daemon::sync() {
   if (counts_anew) {
     bridges_->count();
   }
-  take_out_new_devices(all);
-  auto const changed = bridges_->apply(all);
+  // What was committed since members were heard is told all the same.
+  bool const is_told = !follows_members || all.change != in_force_;
+  Bridges::Forget forget;
+  if (is_told) {
+    forget = [this](std::string const &bridge, std::uint64_t generation) {
+      return forget_cached_flows(bridge, generation);
+    };
+  }
+  auto changed = take_out_new_devices(all, forget);
+  changed += bridges_->apply(all, forget);
   if (changed > 0 && is_told) {
-    forget_cached_flows();
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
   announcer_.follow(all, memory_);

@@ -64,9 +64,9 @@ class Daemon {
   void sync_soon();
   void sync_after(std::optional<ClockTime> const &wait);
   void sync();
-  void forget_cached_flows();
+  bool forget_cached_flows(std::string const &bridge, std::uint64_t generation);
   void follow_devices();
-  void take_out_new_devices(Wanted const &wanted);
+  std::size_t take_out_new_devices(Wanted const &wanted, Bridges::Forget const &forget);
   // The way of the machine to the hosts beyond tunnels, and what is wrong with it.
   void follow_tunnels(Wanted const &wanted);
   void add_refused(std::string const &alias, std::string const &why);

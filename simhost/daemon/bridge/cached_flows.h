@@ -2,7 +2,13 @@
 // up.
 #pragma once
 
+#include <cstdint>
 #include <filesystem>
+#include <functional>
+#include <string>
+
+#include "planes/openvswitch/openflow/change.h"
+#include "planes/openvswitch/openflow/connection.h"
 
 namespace simhost::daemon {
 
@@ -12,5 +18,17 @@ namespace simhost::daemon {
 /// By itself it looks at what it remembers when flows change, but passes over some of it where that
 /// is much: frames went on for up to 1.5 s as they had before.
 void forget_cached_flows(std::filesystem::path const &folder);
+/// Likewise. Returns whether the bridge of that name had that generation in force before: if not,
+/// what is remembered may be how frames went until then.
+bool forget_cached_flows(std::filesystem::path const &folder, std::string const &bridge,
+                         std::uint64_t generation);
+
+/// Makes changes, and does `forget`, if that is anything, so that it finds them made: it returns
+/// whether it did so, as it can tell if they bring another generation. It is done at once, as Open
+/// vSwitch looks at all of its devices before it listens again: most of the time it hears of both
+/// at one time, and of the changes first.
+void change_and_forget(openflow::Connection &connection, openflow::Changes const &changes,
+                       bool is_other_generation, std::function<bool()> const &forget,
+                       openvswitch::Deadline deadline);
 
 }  // namespace simhost::daemon

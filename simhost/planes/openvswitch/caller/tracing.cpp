@@ -142,9 +142,10 @@ std::vector<StoryStep> OpenVswitchPlane::trace(storage::Transaction &transaction
         ask(file_, {{"ask", "bridge"}, {"switch", of_switch.row.identifier}}, kPatience);
     auto const folder = bridge.at("folder").get<std::vector<std::uint8_t>>();
     auto const text =
-        ask_control(find_control_socket(std::string(folder.begin(), folder.end())), "ofproto/trace",
-                    {bridge.at("name").get<std::string>(), fmt::format("in_port={}", at->device),
-                     hexadecimal(frame)},
+        ask_control(find_control_socket(std::string(folder.begin(), folder.end())),
+                    {.name = "ofproto/trace",
+                     .words = {bridge.at("name").get<std::string>(),
+                               fmt::format("in_port={}", at->device), hexadecimal(frame)}},
                     Deadline::clock::now() + kPatience);
     return tell(text, frame, stations.entry(*at),
                 {.station = [&](openflow::Port device) { return stations.named(device); },

@@ -238,7 +238,8 @@ void Connection::control(std::uint32_t bundle, BundleControl control) {
   send(out);
 }
 
-void Connection::change(Changes const &changes, Deadline deadline) {
+void Connection::change(Changes const &changes, Deadline deadline,
+                        std::function<void()> const &meanwhile) {
   auto const bundle = ++bundle_;
   auto const open = next_xid();
   Writer out;
@@ -252,6 +253,9 @@ void Connection::change(Changes const &changes, Deadline deadline) {
   control(bundle, BundleControl::close);
   auto error = wait_for_errors(open, xid_, deadline);
   control(bundle, error ? BundleControl::discard : BundleControl::commit);
+  if (!error && meanwhile) {
+    meanwhile();
+  }
   auto const late_error = wait_for_errors(open, xid_, deadline);
   if (!error && !late_error) {
     return;

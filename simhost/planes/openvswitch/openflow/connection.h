@@ -49,8 +49,10 @@ class Connection {
   // These wait. They throw Disconnected, TimedOut, Malformed and Refused.
 
   /// Makes all of the changes in their order, or none of them: throws ChangeRefused, which says
-  /// which one was refused. After TimedOut nobody knows whether they are made.
-  void change(Changes const &changes, Deadline deadline);
+  /// which one was refused. After TimedOut nobody knows whether they are made. Does `meanwhile`, if
+  /// that is anything, once the switch was told to make them and while it does.
+  void change(Changes const &changes, Deadline deadline,
+              std::function<void()> const &meanwhile = nullptr);
   /// Returns when the switch is done with all that it was sent.
   void barrier(Deadline deadline);
   /// There are these meters from now on and no others, each of which drops what is more than so

@@ -1,13 +1,18 @@
-// One question in JSON-RPC over a connection of its own.
+// Questions in JSON-RPC over a connection of their own.
 #include "planes/openvswitch/trace/control.h"
 
 #include <fmt/format.h>
 
+#include <algorithm>
+#include <cstddef>
 #include <cstdint>
 #include <fstream>
+#include <iterator>
 #include <nlohmann/json.hpp>
 #include <span>
+#include <sstream>
 #include <stdexcept>
+#include <utility>
 
 #include "planes/openvswitch/transport/stream.h"
 
@@ -19,16 +24,44 @@ using Json = nlohmann::json;
 // More is no reply of a program in its right mind.
 constexpr std::size_t kLongestReply = std::size_t{16} << 20;
 
-Json reply_from(Stream &stream, Deadline deadline) {
+// The objects that have come whole: nothing but their ends tells them apart.
+std::vector<Json> objects_in(std::vector<std::uint8_t> const &bytes) {
+  std::istringstream in(std::string(bytes.begin(), bytes.end()));
+  std::vector<Json> objects;
+  try {
+    while (!(in >> std::ws).eof()) {
+      in >> objects.emplace_back();
+    }
+  } catch (Json::parse_error const &) {
+    objects.pop_back();
+  }
+  return objects;
+}
+
+std::vector<Json> replies_from(Stream &stream, std::size_t count, Deadline deadline) {
   std::vector<std::uint8_t> bytes;
   while (bytes.size() < kLongestReply) {
     stream.wait_to_receive(deadline);
     if (stream.receive(bytes)) {
-      // It says no more than this one text.
-      auto reply = Json::parse(bytes, nullptr, false);
-      if (reply.is_object()) {
-        return reply;
+      // It says no more than it is asked.
+      if (auto replies = objects_in(bytes); replies.size() == count) {
+        return replies;
       }
+    }
+  }
+  throw std::runtime_error("ovs-vswitchd says what nobody understands");
+}
+
+ControlReply control_reply(Json const &reply) {
+  if (reply.is_object()) {
+    auto const error = reply.find("error");
+    if (error != reply.end() && !error->is_null()) {
+      return {.is_refused = true,
+              .text = error->is_string() ? error->get<std::string>() : error->dump()};
+    }
+    auto const result = reply.find("result");
+    if (result != reply.end() && result->is_string()) {
+      return {.text = result->get<std::string>()};
     }
   }
   throw std::runtime_error("ovs-vswitchd says what nobody understands");
@@ -53,22 +86,30 @@ std::filesystem::path find_control_socket(std::filesystem::path const &folder) {
       fmt::format("no ovs-vswitchd that can be asked: {} has no control socket", folder.string()));
 }
 
-std::string ask_control(std::filesystem::path const &socket, std::string const &command,
-                        std::vector<std::string> const &words, Deadline deadline) {
+std::vector<ControlReply> ask_control(std::filesystem::path const &socket,
+                                      std::vector<ControlCommand> const &commands,
+                                      Deadline deadline) {
+  std::string questions;
+  for (std::size_t number = 0; number < commands.size(); ++number) {
+    auto const &[name, words] = commands[number];
+    questions += Json{{"id", number}, {"method", name}, {"params", words}}.dump();
+  }
   Stream stream(socket, deadline);
-  auto const question = Json{{"id", 0}, {"method", command}, {"params", words}}.dump();
-  stream.send(std::span(reinterpret_cast<std::uint8_t const *>(question.data()), question.size()));
-  auto const reply = reply_from(stream, deadline);
-  auto const error = reply.find("error");
-  if (error != reply.end() && !error->is_null()) {
-    throw std::runtime_error("ovs-vswitchd: " +
-                             (error->is_string() ? error->get<std::string>() : error->dump()));
+  stream.send(
+      std::span(reinterpret_cast<std::uint8_t const *>(questions.data()), questions.size()));
+  std::vector<ControlReply> replies;
+  std::ranges::transform(replies_from(stream, commands.size(), deadline),
+                         std::back_inserter(replies), control_reply);
+  return replies;
+}
+
+std::string ask_control(std::filesystem::path const &socket, ControlCommand const &command,
+                        Deadline deadline) {
+  auto reply = std::move(ask_control(socket, std::vector{command}, deadline).front());
+  if (reply.is_refused) {
+    throw std::runtime_error("ovs-vswitchd: " + reply.text);
   }
-  auto const result = reply.find("result");
-  if (result == reply.end() || !result->is_string()) {
-    throw std::runtime_error("ovs-vswitchd says what nobody understands");
-  }
-  return result->get<std::string>();
+  return std::move(reply.text);
 }
 
 }  // namespace simhost::openvswitch

@@ -13,9 +13,25 @@ namespace simhost::openvswitch {
 /// if there is none.
 std::filesystem::path find_control_socket(std::filesystem::path const &folder);
 
-/// What it says to a command. Throws std::runtime_error with its reason if it refuses it, and what
-/// Stream does.
-std::string ask_control(std::filesystem::path const &socket, std::string const &command,
-                        std::vector<std::string> const &words, Deadline deadline);
+struct ControlCommand {
+  std::string name;
+  std::vector<std::string> words;
+};
+
+/// What it says to a command, or why it refuses it.
+struct ControlReply {
+  bool is_refused = false;
+  std::string text;
+};
+
+/// What it says to several commands, which it takes in their order. Throws std::runtime_error for
+/// what is no reply, and what Stream does.
+std::vector<ControlReply> ask_control(std::filesystem::path const &socket,
+                                      std::vector<ControlCommand> const &commands,
+                                      Deadline deadline);
+
+/// What it says to one. Throws std::runtime_error with its reason if it refuses it, too.
+std::string ask_control(std::filesystem::path const &socket, ControlCommand const &command,
+                        Deadline deadline);
 
 }  // namespace simhost::openvswitch
