@@ -15,6 +15,7 @@
 #include "daemon/bridge/changes.h"
 #include "daemon/bridge/live_ports.h"
 #include "daemon/bridge/made_bridge.h"
+#include "daemon/bridge/unreached_flows.h"
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/ovsdb/configuration.h"
 #include "planes/openvswitch/reconcile/difference.h"
@@ -94,6 +95,7 @@ struct Bridges::Bridge {
   LivePorts live;
   std::set<std::string> aggregated;  // devices that are in groups
   Deadline counted{};
+  std::size_t added_ahead = 0;  // of flows and groups, before what it has was read
   std::set<std::uint32_t> meters;
 
   void have(Flows now) {
@@ -182,6 +184,7 @@ Bridges::Bridge &Bridges::connected(WantedBridge const &wanted, Deadline deadlin
     require_made(wanted, socket);
     auto made = std::make_unique<Bridge>(wanted, socket, deadline);
     have_meters(*made, wanted.flows->flows, deadline);
+    made->added_ahead = add_unreached(made->connection, socket, *wanted.flows, deadline);
     read_flows(*made, deadline);
     for (auto const &port : made->connection.ports(deadline)) {
       made->live.follow(port);
@@ -439,7 +442,7 @@ std::size_t Bridges::apply_flows(WantedBridge const &wanted, std::uint64_t chang
   bridge.sessions = wanted.sessions;
   bridge.aging = wanted.aging;
   bridge.aggregated = aggregated_devices(wanted.row);
-  return size_of(difference);
+  return size_of(difference) + std::exchange(bridge.added_ahead, 0);
 }
 
 // What is wrong with one switch is no reason to stop the others.

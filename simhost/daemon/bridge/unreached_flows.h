@@ -1,0 +1,19 @@
+// What a bridge is told while no frame can come to it yet.
+#pragma once
+
+#include <cstddef>
+#include <filesystem>
+
+#include "planes/openvswitch/compile/compile.h"
+#include "planes/openvswitch/openflow/connection.h"
+
+namespace simhost::daemon {
+
+/// Adds all groups, and all flows but those by which frames come in, to a bridge that has neither
+/// flows nor groups and is to have many; `socket` is the bridge's own. So nothing passes until the
+/// rest is there, which is no matter of this. Returns how many it added: all or none, unless it
+/// throws std::runtime_error.
+std::size_t add_unreached(openflow::Connection &connection, std::filesystem::path const &socket,
+                          openvswitch::Compiled const &wanted, openvswitch::Deadline deadline);
+
+}  // namespace simhost::daemon
