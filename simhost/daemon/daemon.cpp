@@ -158,10 +158,23 @@ void Daemon::balance() {
   }
 }
 
+// From a timer, too.
+void Daemon::look_at_wires() {
+  try {
+    devices_.refresh();
+    if (wires_.look(devices_)) {
+      sync_soon();
+    }
+  } catch (std::exception const &error) {
+    troubles_.add(error.what());
+  }
+}
+
 void Daemon::count_from_now_on() {
   next_count_ = loop_.after(kBetweenCounts, [this] {
     count();
     balance();
+    look_at_wires();
     count_from_now_on();
   });
 }
@@ -293,9 +306,10 @@ void Daemon::sync_after(std::optional<ClockTime> const &wait) {
 
 void Daemon::follow_devices() {
   bool differ = false;
-  auto const heard_at = [this](storage::SwitchKey key, openflow::Port port) {
-    return Heard{.partner = bridges_ ? bridges_->is_live(key, port) : std::nullopt,
-                 .beacons = beacons_.arrive_at(key, port)};
+  auto const heard_at = [this](storage::SwitchKey key, storage::Device const &device) {
+    return Heard{.partner = bridges_ ? bridges_->is_live(key, device.number) : std::nullopt,
+                 .beacons = beacons_.arrive_at(key, device.number),
+                 .error_percent = wires_.damaged_percent(device.name)};
   };
   devices_.refresh();
   {
@@ -304,6 +318,7 @@ void Daemon::follow_devices() {
     switch_devices(transaction, devices_, say);
     raise_packet_sizes(sizes_to_raise(transaction, devices_), devices_, say);
     devices_.refresh();
+    wires_.leave_lost(devices_);
     differ = links_differ(transaction, devices_, heard_at);
   }
   if (differ) {
@@ -433,10 +448,14 @@ void Daemon::announce(storage::SwitchKey key, std::vector<openvswitch::Announced
 
 void Daemon::settle(Wanted const &wanted) {
   at_bridges_.clear();
+  std::set<std::string> uplinks;
   for (auto const &bridge : wanted.bridges) {
     for (auto const &[name, number] : bridge.row.devices) {
       if (auto const device = devices_.find(name)) {
         at_bridges_[name] = device->index;
+      }
+      if (!bridge.ports.contains(name)) {
+        uplinks.insert(name);
       }
     }
   }
@@ -448,6 +467,7 @@ void Daemon::settle(Wanted const &wanted) {
       }
     }
   }
+  wires_.follow(uplinks);
   for (auto const &[device, error] : bridges_->errors()) {
     troubles_.add(fmt::format("Open vSwitch cannot use the device {}: {}", device, error));
   }

@@ -16,6 +16,7 @@
 #include "daemon/compiler.h"
 #include "daemon/counting/counting.h"
 #include "daemon/devices/network_devices.h"
+#include "daemon/devices/uplink_wires.h"
 #include "daemon/groups/group_members.h"
 #include "daemon/load/load_balance.h"
 #include "daemon/server.h"
@@ -89,6 +90,7 @@ class Daemon {
   void remember();
   void remember_soon();
   void balance();
+  void look_at_wires();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
   [[nodiscard]] Json groups(Json const &question) const;
   [[nodiscard]] Json bridge(Json const &question) const;
@@ -103,6 +105,7 @@ class Daemon {
   std::string host_;
   StateWatch state_watch_;
   NetworkDevices devices_;
+  UplinkWires wires_;
   Server server_;
   Memory memory_;
   Announcer announcer_;

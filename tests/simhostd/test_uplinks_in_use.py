@@ -1,12 +1,14 @@
 """Which uplink frames take as links come and go."""
 
+import json
 import signal
+import time
 from typing import Any
 
 import pytest
 
 from frame_lab import Lab, comes_true
-from simhost import Client, Network
+from simhost import Client, Network, frame
 
 
 def set_teaming(lab: Lab, **teaming: Any) -> None:
@@ -123,3 +125,50 @@ def test_an_uplink_whose_port_is_blocked_is_not_used(
     )
     assert near.reaches(far, attempts=5)
     assert network.came_over(near.mac) == "nic1"
+
+
+class Damaging:
+    """A wire at whose near end frames of more than that device carries count as damaged."""
+
+    def __init__(self, lab: Lab) -> None:
+        run = lab.host.run
+        far = lab.frames.new_namespace()
+        run("ip", "link", "add", "below", "mtu", "9000", "type", "veth", "peer", "name", "end")
+        for device in "below", "end":
+            run("ip", "link", "set", device, "mtu", "9000", "up")
+        for device in "near", "far":
+            run("ip", "link", "add", device, "link", "below", "type", "macvlan", "mode", "bridge")
+        run("ip", "link", "set", "near", "mtu", "1500", "up")
+        run("ip", "link", "set", "far", "mtu", "9000", "netns", str(far.pid))
+        far.run("ip", "link", "set", "far", "name", "eth0", "up")
+        self.client = lab.frames.new_client(far)
+        lab.ctl("uplink", "nic0", "--device", "near")
+
+    def send(self, whole: int, damaged: int) -> None:
+        for frames, size in (whole, 100), (damaged, 3000):
+            for _ in range(frames):
+                self.client.send(frame("ff:ff:ff:ff:ff:ff", self.client.mac, payload=bytes(size)))
+
+
+def test_an_uplink_is_left_while_too_many_frames_come_in_damaged(lab: Lab) -> None:
+    wire = Damaging(lab)
+    set_teaming(lab, criteria=["errors"], error_percent=20)
+    far = lab.network("nic1").client()
+    near = lab.client("lab", "a")
+
+    def comes_over(uplink: str, whole: int, damaged: int) -> bool:
+        def comes() -> bool:
+            wire.send(whole, damaged)
+            time.sleep(0.1)  # what is sent afterwards is to be more soon
+            host = json.loads(lab.ctl("show", "--json"))
+            percent = host["uplinks"][0]["observed"]["error_percent"]
+            carrier = host["switches"][0]["ports"][0]["observed"]["uplink"]
+            return bool(carrier == uplink and percent > 0)
+
+        return comes_true(comes)
+
+    assert comes_over("nic0", whole=9, damaged=1)
+    # What came before is a part of what came lately.
+    assert comes_over("nic1", whole=0, damaged=10)
+    assert near.comes_to_reach(far)
+    assert comes_over("nic0", whole=100, damaged=0)

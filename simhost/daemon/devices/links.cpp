@@ -20,6 +20,9 @@ Link link_by_device(Link link, std::string const &device, NetworkDevices const &
   auto const found = devices.find(device);
   link.driver = found.has_value();
   link.carrier = found && found->has_link;
+  if (!link.carrier) {
+    link.error_percent = 0;  // the wire that is there next may be another one
+  }
   if (found) {
     auto const speed = wire_speed(device);
     link.full_duplex = speed.full_duplex;
@@ -31,11 +34,11 @@ Link link_by_device(Link link, std::string const &device, NetworkDevices const &
 bool is_same(Link const &one, Link const &other) {
   return one.carrier == other.carrier && one.driver == other.driver && one.speed == other.speed &&
          one.full_duplex == other.full_duplex && one.partner == other.partner &&
-         one.beacons == other.beacons;
+         one.beacons == other.beacons && one.error_percent == other.error_percent;
 }
 
 Heard heard_by(storage::Transaction &transaction, storage::Uplink const &uplink,
-               openflow::Port device, HeardAt const &heard_at) {
+               storage::Device const &device, HeardAt const &heard_at) {
   auto const port = uplink.port ? storage::find_port(transaction, *uplink.port) : std::nullopt;
   if (!port) {
     return {};
@@ -59,9 +62,10 @@ std::vector<Changed> changed_links(storage::Transaction &transaction, NetworkDev
     if (auto const device = storage::device_of(transaction, uplink.name)) {
       auto const known = storage::find_link(transaction, uplink.name).value_or(Link{});
       auto link = link_by_device(known, device->name, devices);
-      auto const heard = heard_by(transaction, uplink, device->number, heard_at);
+      auto const heard = heard_by(transaction, uplink, *device, heard_at);
       link.partner = heard.partner.value_or(known.partner);
       link.beacons = heard.beacons.value_or(known.beacons);
+      link.error_percent = heard.error_percent.value_or(link.error_percent);
       if (!is_same(link, known)) {
         changed.push_back({.uplink = uplink.name, .link = link});
       }

@@ -2,12 +2,13 @@
 // gets what is; and the host's own switch from the state to the device.
 #pragma once
 
+#include <cstdint>
 #include <functional>
 #include <optional>
 #include <string>
 
 #include "daemon/devices/network_devices.h"
-#include "planes/openvswitch/openflow/port.h"
+#include "storage/running/devices.h"
 #include "storage/store.h"
 #include "storage/switches.h"
 
@@ -17,12 +18,13 @@ namespace simhost::daemon {
 /// switched is told.
 void switch_devices(storage::Transaction &transaction, NetworkDevices const &devices,
                     std::function<void(std::string const &)> const &say);
-/// What is known of an uplink besides its device; nothing while nobody knows.
+/// What is known of an uplink that its device does not tell; nothing while nobody knows.
 struct Heard {
-  std::optional<bool> partner;  ///< if it is in a group
-  std::optional<bool> beacons;  ///< those of other uplinks arrive
+  std::optional<bool> partner;                 ///< if it is in a group
+  std::optional<bool> beacons;                 ///< those of other uplinks arrive
+  std::optional<std::uint32_t> error_percent;  ///< of what came in was damaged
 };
-using HeardAt = std::function<Heard(storage::SwitchKey key, openflow::Port port)>;
+using HeardAt = std::function<Heard(storage::SwitchKey key, storage::Device const &device)>;
 
 /// Whether a link in the state is not as its device is.
 bool links_differ(storage::Transaction &transaction, NetworkDevices const &devices,
