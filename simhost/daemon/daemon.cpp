@@ -18,7 +18,6 @@
 #include "daemon/only_one.h"
 #include "daemon/wanted.h"
 #include "model/plane.h"
-#include "planes/stored/counters.h"
 #include "planes/stored/stored_plane.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
@@ -48,17 +47,6 @@ storage::Store opened(std::filesystem::path const &state) {
   return {state, populate_fresh_host};
 }
 
-void count_announced(storage::ChangingTransaction &transaction, storage::SwitchKey key,
-                     std::uint64_t sent) {
-  if (!storage::find_switch(transaction, key)) {
-    return;  // gone meanwhile
-  }
-  CounterOwner const owner{.switch_key = key};
-  stored::add_to_counter(transaction, owner, counter_in(&VSRARPStats::rarpPktsSent), sent);
-  stored::set_counter(transaction, owner, counter_in(&VSRARPStats::rarpTime),
-                      static_cast<std::uint64_t>(clock_now(transaction).count()));
-}
-
 }  // namespace
 
 Daemon::Daemon(events::Loop &loop, Options options, Say say)
@@ -79,6 +67,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       members_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
                       .changed = [this] { follow_members(); }}),
       counting_(store_),
+      announced_(store_),
       underlay_(loop, options_.database.parent_path(),
                 [this](std::string const &why) { troubles_.add(why); }),
       collectors_(loop, devices_, [this] { sync_soon(); }) {
@@ -133,7 +122,8 @@ void Daemon::age_by(Wanted const &wanted) {
 // From a timer, too, so that nothing is thrown.
 void Daemon::remember() {
   try {
-    if (!memory_.save()) {
+    bool const all_remembered = memory_.save();
+    if (!announced_.save() || !all_remembered) {
       remember_soon();
     }
   } catch (std::exception const &error) {
@@ -434,15 +424,9 @@ void Daemon::announce(storage::SwitchKey key, std::vector<openvswitch::Announced
   for (auto const &client : clients) {
     frames.push_back(openvswitch::announcement(client));
   }
-  if (!send(key, frames)) {
-    return;
-  }
-  try {
-    storage::ChangingTransaction transaction(store_);
-    count_announced(transaction, key, clients.size());
-    transaction.commit();
-  } catch (std::runtime_error const &error) {
-    troubles_.add(error.what());
+  if (send(key, frames)) {
+    announced_.add(key, clients.size());
+    remember_soon();
   }
 }
 

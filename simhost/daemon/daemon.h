@@ -14,6 +14,7 @@
 #include "daemon/beacons/sent_beacons.h"
 #include "daemon/bridges.h"
 #include "daemon/compiler.h"
+#include "daemon/counting/announced.h"
 #include "daemon/counting/counting.h"
 #include "daemon/devices/network_devices.h"
 #include "daemon/devices/uplink_wires.h"
@@ -113,6 +114,7 @@ class Daemon {
   GroupMembers members_;
   bool follows_members_ = false;  // and nothing else
   Counting counting_;
+  AnnouncedCounts announced_;
   LoadBalance load_balance_;
   unsigned counts_ = 0;  // since the load was looked at
   Underlay underlay_;

@@ -1,6 +1,7 @@
 // Opening the state without ever touching a file that is not ours, and running work on it.
 #include "storage/store.h"
 
+#include <chrono>
 #include <utility>
 
 #include "storage/connection.h"
@@ -104,6 +105,21 @@ void Transaction::commit() {
 
 std::int64_t ChangingTransaction::last_key() const {
   return connection().database().getLastInsertRowid();
+}
+
+bool commit_if_free(Store &store, std::function<void(ChangingTransaction &)> const &change) {
+  try {
+    Patience none(std::chrono::nanoseconds::zero());
+    ChangingTransaction transaction(store, none);
+    change(transaction);
+    transaction.commit();
+    return true;
+  } catch (StateFailure const &failure) {
+    if (failure.kind() != FailureKind::busy) {
+      throw;
+    }
+    return false;
+  }
 }
 
 }  // namespace simhost::storage

@@ -99,4 +99,7 @@ class ChangingTransaction : public Transaction {
   friend class Change;
 };
 
+/// Commits what `change` does, or does nothing while somebody else writes. Returns whether it did.
+bool commit_if_free(Store &store, std::function<void(ChangingTransaction &)> const &change);
+
 }  // namespace simhost::storage

@@ -1,5 +1,6 @@
 """Clients that move to another uplink, or come to a port, are announced to the network."""
 
+import sqlite3
 from typing import Tuple
 
 import pytest
@@ -119,3 +120,23 @@ def test_no_more_than_so_many_are_announced_at_once(lab: Lab, around: Around) ->
     assert comes_true(lambda: "sends over nic0" not in lab.ctl("show"))
     far.expect_none(lambda frame: frame[12:14] == b"\x80\x35")
     assert sent(lab) == 3
+
+
+def test_frames_do_not_wait_for_who_writes_to_the_state(lab: Lab, around: Around) -> None:
+    network, far = around
+    lab.apply({"runtime_options": {"MaxRARPsPerInterval": 1}})
+    one, *others = (lab.client("lab", port) for port in "abc")
+    assert all(client.comes_to_reach(far) for client in (one, *others))
+    network.pull("nic0")
+    far.expect(reverse_arp(one.mac), timeout=30)
+    writer = sqlite3.connect(lab.state, isolation_level=None, timeout=30)
+    writer.execute("BEGIN IMMEDIATE")
+    counted = sent(lab)
+    # Their packets wait for their seconds, and what they are counted by for the writer.
+    for client in others:
+        far.expect(reverse_arp(client.mac), timeout=30)
+    plane = lab.plane()
+    assert plane["in_force"] == plane["change"] and sent(lab) == counted
+    writer.execute("ROLLBACK")
+    writer.close()
+    assert comes_true(lambda: sent(lab) == 3)

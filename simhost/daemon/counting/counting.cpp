@@ -2,7 +2,6 @@
 #include "daemon/counting/counting.h"
 
 #include <algorithm>
-#include <chrono>
 
 #include "planes/stored/counters.h"
 #include "storage/running/readings.h"
@@ -139,22 +138,18 @@ void Counting::save() {
   if (std::ranges::none_of(switches_, is_new)) {
     return;
   }
-  try {
-    storage::Patience none(std::chrono::nanoseconds::zero());
-    storage::ChangingTransaction transaction(store_, none);
-    follow(transaction);
-    remove_other_switches(transaction);
-    for (auto const &[key, one] : switches_) {
-      if (!one.is_saved()) {
-        save_gains(transaction, key, one.tally.gains());
-        save_readings(transaction, key, one.saved, one.tally.last());
-      }
-    }
-    transaction.commit();
-  } catch (storage::StateFailure const &failure) {
-    if (failure.kind() != storage::FailureKind::busy) {
-      throw;
-    }
+  bool const is_saved =
+      storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
+        follow(transaction);
+        remove_other_switches(transaction);
+        for (auto const &[key, one] : switches_) {
+          if (!one.is_saved()) {
+            save_gains(transaction, key, one.tally.gains());
+            save_readings(transaction, key, one.saved, one.tally.last());
+          }
+        }
+      });
+  if (!is_saved) {
     return;
   }
   for (auto &[key, one] : switches_) {

@@ -231,25 +231,20 @@ bool Memory::save() {
   if (unsaved_.empty()) {
     return true;
   }
-  try {
-    storage::Patience none(std::chrono::nanoseconds::zero());
-    storage::ChangingTransaction transaction(store_, none);
-    for (auto const &[key, address, is_known] : unsaved_) {
-      if (is_known) {
-        storage::remember(transaction, key, address);
-      } else {
-        storage::remove_remembered(transaction, key, address);
-      }
-    }
-    transaction.commit();
-  } catch (storage::StateFailure const &failure) {
-    if (failure.kind() != storage::FailureKind::busy) {
-      throw;
-    }
-    return false;
+  bool const is_saved =
+      storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
+        for (auto const &[key, address, is_known] : unsaved_) {
+          if (is_known) {
+            storage::remember(transaction, key, address);
+          } else {
+            storage::remove_remembered(transaction, key, address);
+          }
+        }
+      });
+  if (is_saved) {
+    unsaved_.clear();
   }
-  unsaved_.clear();
-  return true;
+  return is_saved;
 }
 
 template <typename Condition>

@@ -1,0 +1,42 @@
+// Those of a switch that is gone meanwhile are counted nowhere.
+#include "daemon/counting/announced.h"
+
+#include <chrono>
+
+#include "clock/clock.h"
+#include "planes/stored/counters.h"
+
+namespace simhost::daemon {
+
+void AnnouncedCounts::add(storage::SwitchKey key, std::uint64_t sent) {
+  auto &unsaved = unsaved_[key];
+  unsaved.packets += sent;
+  unsaved.last = events::Clock::now();
+}
+
+bool AnnouncedCounts::save() {
+  if (unsaved_.empty()) {
+    return true;
+  }
+  bool const is_saved =
+      storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
+        for (auto const &[key, sent] : unsaved_) {
+          if (!storage::find_switch(transaction, key)) {
+            continue;
+          }
+          CounterOwner const owner{.switch_key = key};
+          stored::add_to_counter(transaction, owner, counter_in(&VSRARPStats::rarpPktsSent),
+                                 sent.packets);
+          auto const when = clock_now(transaction) -
+                            std::chrono::duration_cast<ClockTime>(events::Clock::now() - sent.last);
+          stored::set_counter(transaction, owner, counter_in(&VSRARPStats::rarpTime),
+                              static_cast<std::uint64_t>(when.count()));
+        }
+      });
+  if (is_saved) {
+    unsaved_.clear();
+  }
+  return is_saved;
+}
+
+}  // namespace simhost::daemon
