@@ -2,9 +2,12 @@
 #include "daemon/announcer.h"
 
 #include <algorithm>
+#include <cstdint>
+#include <optional>
 #include <utility>
 
 #include "planes/openvswitch/compile/pipeline.h"
+#include "planes/openvswitch/compile/plan.h"
 
 namespace simhost::daemon {
 namespace {
@@ -22,11 +25,34 @@ Announced client_of(openflow::Flow const &flow, Announced client) {
       client.address = openflow::to_address<6>(address->second.value);
     }
   }
-  if (auto const domain = fields.find(openvswitch::field::kDomain);
-      domain != fields.end() && flow.table == openvswitch::table::kLearnedAddresses) {
-    client.vlan = static_cast<std::uint16_t>(domain->second.value);
-  }
   return client;
+}
+
+// In which VLAN it was learned; nothing for an address that is known in all those of its port.
+std::optional<std::uint16_t> learned_vlan(openflow::Flow const &flow) {
+  auto const &fields = flow.match.fields();
+  auto const domain = fields.find(openvswitch::field::kDomain);
+  return domain == fields.end() || flow.table != openvswitch::table::kLearnedAddresses
+             ? std::nullopt
+             : std::optional(static_cast<std::uint16_t>(domain->second.value));
+}
+
+// Those that a client is reached in, that of frames without a tag first.
+std::vector<std::uint16_t> vlans_of(openvswitch::PortVlan const &vlan) {
+  if (!vlan.carried) {
+    return {vlan.vlan};
+  }
+  auto const carried = openvswitch::carried_by(vlan);
+  std::vector<std::uint16_t> vlans;
+  if (carried.untagged) {
+    vlans.push_back(*carried.untagged);
+  }
+  for (std::size_t tagged = 0; tagged < carried.tagged.size(); ++tagged) {
+    if (carried.tagged[tagged] && tagged != carried.untagged) {
+      vlans.push_back(static_cast<std::uint16_t>(tagged));
+    }
+  }
+  return vlans;
 }
 
 }  // namespace
@@ -50,33 +76,60 @@ void Announcer::follow(Wanted const &wanted, Memory const &memory) {
 void Announcer::follow(WantedBridge const &bridge, Memory const &memory) {
   auto &known = switches_[bridge.key];
   std::map<std::uint32_t, Place> places;
+  Clients moved;
   for (auto const &carried : bridge.carried) {
     auto const before = known.places.find(carried.number);
     bool const is_elsewhere = before == known.places.end() ||
                               before->second.device != carried.device ||
                               before->second.links != carried.links;
     if (has_begun_ && is_elsewhere && carried.is_announced && !carried.links.empty()) {
-      announce(bridge.key, known, carried, memory);
+      moved.merge(clients_at(carried, memory.learned_at(bridge.key, carried.number)));
     }
     places[carried.number] = {.device = carried.device, .links = carried.links};
   }
   known.places = std::move(places);
+  announce(known, moved);
 }
 
-void Announcer::announce(storage::SwitchKey key, OfSwitch &known, Carried const &carried,
-                         Memory const &memory) const {
-  std::set<Announced> clients;
+Announcer::Clients Announcer::clients_at(Carried const &carried,
+                                         std::vector<openflow::Flow> const &learned) {
+  auto const vlans = vlans_of(carried.vlan);
+  Clients clients;
+  auto const add = [&](Announced client) {
+    for (std::size_t place = 0; place < vlans.size(); ++place) {
+      client.vlan = vlans[place];
+      clients.emplace(place, client);
+    }
+  };
   if (carried.has_address()) {
-    clients.insert(carried.client);
+    add(carried.client);
   }
-  for (auto const &flow : memory.learned_at(key, carried.number)) {
-    clients.insert(client_of(flow, carried.client));
+  for (auto const &flow : learned) {
+    auto client = client_of(flow, carried.client);
+    if (auto const vlan = learned_vlan(flow)) {
+      client.vlan = *vlan;
+      clients.emplace(0, client);
+    } else {
+      add(client);
+    }
   }
+  return clients;
+}
+
+// Where a client is now is all that matters. What would have to wait for too long is not kept.
+void Announcer::announce(OfSwitch &known, Clients const &clients) const {
+  std::set<Announced> anew;
+  for (auto const &[place, client] : clients) {
+    anew.insert(client);
+  }
+  std::erase_if(known.due, [&](Due const &due) { return anew.contains(due.announced); });
   auto const until = events::Clock::now() + duration_;
-  for (auto const &client : clients) {
-    // Where it is now is all that matters.
-    std::erase_if(known.due, [&](Due const &due) { return due.announced == client; });
-    known.due.push_back({.announced = client, .until = until});
+  auto const room = std::uint64_t{most_} * static_cast<std::uint64_t>(duration_.count() + 1);
+  for (auto const &[place, client] : clients) {
+    // An address may be known in a VLAN twice, as of the port and as learned there.
+    if (known.due.size() < room && anew.erase(client) > 0) {
+      known.due.push_back({.announced = client, .until = until});
+    }
   }
 }
 

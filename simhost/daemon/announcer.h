@@ -2,11 +2,13 @@
 // reverse-ARP packets, no more in a second than the host's options allow.
 #pragma once
 
+#include <cstddef>
 #include <deque>
 #include <functional>
 #include <map>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "daemon/learned/memory.h"
@@ -27,6 +29,9 @@ class Announcer {
   void follow(Wanted const &wanted, Memory const &memory);
 
  private:
+  // With those first that any client is announced as first: what a trunk port has of many VLANs
+  // keeps no other port waiting.
+  using Clients = std::set<std::pair<std::size_t, openvswitch::Announced>>;
   // Where a client was.
   struct Place {
     std::string device;
@@ -42,8 +47,8 @@ class Announcer {
   };
 
   void follow(WantedBridge const &bridge, Memory const &memory);
-  void announce(storage::SwitchKey key, OfSwitch &known, Carried const &carried,
-                Memory const &memory) const;
+  static Clients clients_at(Carried const &carried, std::vector<openflow::Flow> const &learned);
+  void announce(OfSwitch &known, Clients const &clients) const;
   void send();
 
   events::Loop &loop_;

@@ -193,7 +193,8 @@ void add_carried(storage::Transaction &transaction, openvswitch::Network const &
          .client = {.port = port.port,
                     .number = port.number,
                     .address = port.address.value_or(openflow::EthernetAddress{}),
-                    .vlan = port.vlan.vlan}});
+                    .vlan = port.vlan.vlan},
+         .vlan = port.vlan});
   }
 }
 

@@ -27,6 +27,7 @@ struct Carried {
   std::vector<std::uint32_t> links;  ///< see Way::links; none: it reaches nobody beyond
   bool is_announced;                 ///< when that changes
   openvswitch::Announced client;     ///< with its address if that is known, else zero
+  openvswitch::PortVlan vlan;        ///< in which VLANs it is announced
 
   [[nodiscard]] bool has_address() const { return client.address != openflow::EthernetAddress{}; }
 };

@@ -64,14 +64,13 @@ def test_a_client_is_announced_when_its_device_is_connected(lab: Lab, around: Ar
     lab.set_port("lab", "a", vlan=7)
     mac = "02:00:00:00:00:77"
     lab.frames.client("lab", "a", mac=mac)
-    tagged = reverse_arp(mac)
-    tagged = tagged[:12] + bytes.fromhex("81000007") + tagged[12:]
-    far.expect(tagged, timeout=30)
+    packet = tagged(reverse_arp(mac), 7)
+    far.expect(packet, timeout=30)
     assert network.came_over(mac) == "nic0"
     # A daemon that comes later has no news.
     lab.stop()
     lab.start()
-    far.expect_none(tagged)
+    far.expect_none(packet)
 
 
 def test_addresses_that_a_port_learned_are_announced(lab: Lab, around: Around) -> None:
@@ -87,6 +86,33 @@ def test_addresses_that_a_port_learned_are_announced(lab: Lab, around: Around) -
     for mac in beyond_it:
         far.expect(reverse_arp(mac), timeout=30)
         far.expect_none(reverse_arp(mac), timeout=0.0)
+
+
+def tagged(packet: bytes, vlan: int) -> bytes:
+    return packet[:12] + b"\x81\x00" + vlan.to_bytes(2, "big") + packet[12:] if vlan else packet
+
+
+def test_a_client_of_a_trunk_is_announced_in_each_of_its_vlans(lab: Lab, around: Around) -> None:
+    network, far = around
+    lab.set_port("lab", "a", vlan={"trunk": [0, "10-11", 4094]})
+    near = lab.client("lab", "a")
+    hello = frame(far.mac, near.mac, payload=b"hello")
+    near.send(tagged(hello, 10))
+    far.expect(tagged(hello, 10))
+    network.pull("nic0")
+    for vlan in (0, 10, 11, 4094):
+        far.expect(tagged(reverse_arp(near.mac), vlan), timeout=30)
+    far.expect_none(lambda came: reverse_arp(near.mac)[12:] in came, timeout=0.2)
+    assert comes_true(lambda: sent(lab) == 4)
+    # Where there is no room for all, each client is announced before any is in another VLAN.
+    lab.apply({"runtime_options": {"MaxRARPsPerInterval": 2, "RARPAdvertisementDuration": 0}})
+    other = lab.client("lab", "b")
+    assert other.comes_to_reach(far)
+    before = sent(lab)
+    network.plug("nic0")
+    for mac in (near.mac, other.mac):
+        far.expect(reverse_arp(mac), timeout=30)
+    assert comes_true(lambda: sent(lab) == before + 2)
 
 
 def test_who_does_not_want_it_is_not_announced(lab: Lab, around: Around) -> None:
