@@ -462,6 +462,7 @@ void Daemon::settle(Wanted const &wanted) {
   for (auto const &unfit : wanted.unfit) {
     keys.insert(unfit.key);
   }
+  memory_.keep(wanted.switches);
   members_.keep(keys);
   load_balance_.keep(keys);
   beacons_.keep(keys);

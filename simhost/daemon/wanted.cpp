@@ -249,6 +249,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       std::chrono::seconds(runtime_number(transaction, VS_RT_OPT_RARP_ADVERTISEMENT_DURATION));
   wanted.underlay = wanted_underlay(transaction, host, datapath, is_there);
   for (auto const &[key, row] : storage::all_switches(transaction)) {
+    wanted.switches.insert(key);
     WantedBridge bridge{.key = key,
                         .alias = row.alias,
                         .row = {.name = bridge_name(host, row.identifier), .datapath = datapath},

@@ -6,6 +6,7 @@
 #include <functional>
 #include <map>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -67,6 +68,7 @@ struct Wanted {
   std::vector<WantedBridge> bridges;
   std::optional<WantedUnderlay> underlay = std::nullopt;
   std::vector<Unfit> unfit;
+  std::set<storage::SwitchKey> switches = {};  ///< all of the state, also those that do not run
   std::uint32_t most_tags = 0;
   /// How many moves of a switch are announced in a second, and for how long one is tried.
   std::uint32_t most_announced = 0;

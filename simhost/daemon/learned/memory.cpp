@@ -205,6 +205,11 @@ void Memory::forget(storage::SwitchKey key) {
   remove(key, [](Flow const &) { return true; });
 }
 
+void Memory::keep(std::set<storage::SwitchKey> const &switches) {
+  std::erase_if(bridges_, [&](auto const &known) { return !switches.contains(known.first); });
+  std::erase_if(unsaved_, [&](Unsaved const &one) { return !switches.contains(one.key); });
+}
+
 std::vector<Source> Memory::saw(storage::SwitchKey key,
                                 std::span<openflow::FlowEntry const> sources, storage::SeenAt now) {
   auto &flows = of_bridge(key).flows;

@@ -6,6 +6,7 @@
 #include <functional>
 #include <map>
 #include <optional>
+#include <set>
 #include <span>
 #include <string>
 #include <tuple>
@@ -48,6 +49,8 @@ class Memory {
                           storage::SeenAt now);
   /// Nothing that a bridge knows is to be known once more.
   void forget(storage::SwitchKey key);
+  /// Forgets all switches but these, which the state has.
+  void keep(std::set<storage::SwitchKey> const &switches);
   /// What was learned at a port of a bridge.
   [[nodiscard]] std::vector<openflow::Flow> learned_at(storage::SwitchKey key,
                                                        std::uint32_t port) const;
