@@ -458,12 +458,14 @@ void Daemon::settle(Wanted const &wanted) {
   std::set<storage::SwitchKey> keys;
   for (auto const &bridge : wanted.bridges) {
     keys.insert(bridge.key);
+    multicast_modes_[bridge.key] = bridge.multicast_mode;
   }
   for (auto const &unfit : wanted.unfit) {
     keys.insert(unfit.key);
   }
   memory_.keep(wanted.switches);
   members_.keep(keys);
+  std::erase_if(multicast_modes_, [&](auto const &one) { return !keys.contains(one.first); });
   load_balance_.keep(keys);
   beacons_.keep(keys);
   for (auto const &bridge : wanted.bridges) {

@@ -94,6 +94,7 @@ class Daemon {
   void look_at_wires();
   [[nodiscard]] bool is_new_device(std::string const &name) const;
   [[nodiscard]] Json groups(Json const &question) const;
+  [[nodiscard]] Json multicast_mode(Json const &question) const;
   [[nodiscard]] Json bridge(Json const &question) const;
   [[nodiscard]] Json status(Json const &question) const;
 
@@ -112,7 +113,8 @@ class Daemon {
   Announcer announcer_;
   SentBeacons beacons_;
   GroupMembers members_;
-  bool follows_members_ = false;  // and nothing else
+  bool follows_members_ = false;                       // and nothing else
+  std::map<storage::SwitchKey, int> multicast_modes_;  // that frames obey
   Counting counting_;
   AnnouncedCounts announced_;
   LoadBalance load_balance_;

@@ -45,6 +45,7 @@ Questions Daemon::questions() {
       {"sessions", told_by(&Daemon::counting_sessions)},
       {"bridge", told_by(&Daemon::bridge)},
       {"groups", told_by(&Daemon::groups)},
+      {"multicast mode", told_by(&Daemon::multicast_mode)},
       {"status", told_by(&Daemon::status)},
   };
 }
@@ -164,6 +165,12 @@ Json Daemon::groups(Json const &question) const {
                       {"age", one.age.count()}});
   }
   return {{"groups", groups}};
+}
+
+// None of a switch that has moved no frames.
+Json Daemon::multicast_mode(Json const &question) const {
+  auto const found = multicast_modes_.find(switch_in(question));
+  return found == multicast_modes_.end() ? Json::object() : Json{{"mode", found->second}};
 }
 
 Json Daemon::bridge(Json const &question) const {

@@ -24,6 +24,7 @@
 #include "storage/running/links.h"
 #include "storage/running/readings.h"
 #include "storage/store.h"
+#include "vswitch/mcast_filter_modes.h"
 
 namespace simhost::daemon {
 namespace {
@@ -198,6 +199,13 @@ void add_carried(storage::Transaction &transaction, openvswitch::Network const &
   }
 }
 
+int mode_of(openvswitch::Multicast const &multicast) {
+  if (multicast.hears_igmp) {
+    return multicast.hears_mld ? VS_MCAST_FILTER_MODE_SNOOPING : VS_MCAST_FILTER_MODE_IGMP;
+  }
+  return multicast.hears_mld ? VS_MCAST_FILTER_MODE_MLD : VS_MCAST_FILTER_MODE_LEGACY;
+}
+
 void shorten(std::optional<ClockTime> &lasts, std::optional<ClockTime> const &other) {
   if (other) {
     lasts = std::min(lasts.value_or(*other), *other);
@@ -276,6 +284,7 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       add_wrapping_ports(transaction, network, bridge);
       bridge.aging = std::chrono::seconds(network.addresses.aging);
       bridge.mtu = network.mtu;
+      bridge.multicast_mode = mode_of(network.multicast);
       std::erase_if(bridge.row.devices,
                     [&](auto const &device) { return !is_there(device.first); });
       bridge.row.limits = {{openvswitch::table::kLearnedAddresses, flows->rows.most_learned}};

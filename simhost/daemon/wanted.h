@@ -45,6 +45,7 @@ struct WantedBridge {
   std::vector<Carried> carried = {};
   std::optional<storage::Fabric> fabric = std::nullopt;
   std::uint16_t mtu = 0;
+  int multicast_mode = 0;  ///< VSMcastFilterMode
   /// The host was restarted, and has counted nothing since: what is learned is not to be known.
   bool forgets = false;
 };

@@ -108,6 +108,9 @@ class Plane {
   virtual std::optional<McastGroup> group(storage::Transaction &transaction,
                                           storage::PortNumber port,
                                           AddressBytes const &address) = 0;
+  /// Where a switch sends the frames of groups just now (VSMcastFilterMode), which may be another
+  /// way than the one that is set while a change is pending.
+  virtual int multicast_mode(storage::Transaction &transaction, storage::SwitchKey key) = 0;
   virtual Counters counters(storage::Transaction &transaction, CounterOwner const &owner) = 0;
   /// The mirror sessions of a switch that have counted, in the order of their names.
   virtual std::vector<std::string> counting_sessions(storage::Transaction &transaction,

@@ -2,11 +2,14 @@
 
 import ipaddress
 import json
+import shutil
+from concurrent.futures import ThreadPoolExecutor
 from typing import Any
 
 import group_frames as frames
 import pytest
 from frame_lab import Lab, comes_true
+from lasting_open_vswitch import LastingOpenVSwitch
 from group_clients import SENDER, Clients
 
 GROUP = "239.1.1.1"
@@ -118,7 +121,9 @@ def test_callers_are_told_what_is_joined(clients: Clients) -> None:
     assert len(more) == 1 and len(of_b) == 4
     assert of_c == []
     clients.lab.stop()
-    assert "Timeout" in clients.lab.python(REFUSED)
+    assert "Timeout" in clients.lab.python(
+        REFUSED.format(asked='Host().switches["lab"].ports["b"].groups')
+    )
 
 
 ASKS = """
@@ -137,12 +142,43 @@ print(json.dumps([
 ]))
 """
 REFUSED = """
-from libvswitch import errors
+from libvswitch import checked, errors
 from vswitch import Host
 try:
-    Host().switches["lab"].ports["b"].groups
+    {asked}
 except errors.HostError as error:
     print(error)
+"""
+
+
+def test_callers_are_told_the_mode_that_frames_obey(idle: Lab) -> None:
+    def modes() -> Any:
+        return json.loads(idle.python(MODES))
+
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
+        idle.start(open_vswitch.where)
+        idle.client("lab", "a")
+        idle.apply({"switches": [{"alias": "lab", "multicast": "igmp"}]})
+        assert modes() == ["igmp", "igmp"]
+    shutil.rmtree(idle.run_folder())
+    with ThreadPoolExecutor() as another:
+        # Which waits for it to be in force.
+        change = {"switches": [{"alias": "lab", "multicast": "mld"}]}
+        pending = another.submit(idle.apply, change)
+        assert comes_true(lambda: modes() == ["mld", "igmp"])
+        with LastingOpenVSwitch(idle.host, idle.run_folder()):
+            assert comes_true(lambda: modes() == ["mld", "mld"])
+            pending.result()
+    idle.stop()
+    asked = 'checked.VSQEX_GetMcastFilterMode("lab")'
+    assert "Timeout" in idle.python(REFUSED.format(asked=asked))
+
+
+MODES = """
+import json
+from libvswitch import checked
+modes = checked.VSDVS_GetMcastFilterMode("lab"), checked.VSQEX_GetMcastFilterMode("lab")
+print(json.dumps([mode.name.lower() for mode in modes]))
 """
 
 

@@ -3,9 +3,7 @@
 
 #include "abi/libvswitch/results.h"
 #include "model/lookup.h"
-#include "model/multicast/properties.h"
 #include "model/plane.h"
-#include "model/properties/properties.h"
 #include "vswitch/queries.h"
 
 namespace simhost {
@@ -85,8 +83,8 @@ QEX_ReturnStatus VSQEX_GetMcastFilterMode(char const *switchName, int *mode) {
     auto const alias = require_text(switchName);
     auto &output = require(mode);
     auto &transaction = call.transaction();
-    auto const owner = storage::PropertyOwner::global(get_running_switch(transaction, alias).key);
-    output = static_cast<int>(effective(transaction, multicast::filter_mode, owner));
+    output =
+        running_plane().multicast_mode(transaction, get_running_switch(transaction, alias).key);
   });
 }
 

@@ -2,6 +2,8 @@
 // transaction in which they ask.
 #include "planes/stored/stored_plane.h"
 
+#include "model/multicast/properties.h"
+#include "model/properties/properties.h"
 #include "planes/stored/counters.h"
 #include "planes/stored/links.h"
 #include "planes/stored/mac_tables.h"
@@ -74,6 +76,10 @@ class StoredPlane : public Plane {
   std::optional<McastGroup> group(storage::Transaction &transaction, storage::PortNumber port,
                                   AddressBytes const &address) override {
     return storage::find_group(transaction, port, address);
+  }
+  int multicast_mode(storage::Transaction &transaction, storage::SwitchKey key) override {
+    return static_cast<int>(
+        effective(transaction, multicast::filter_mode, storage::PropertyOwner::global(key)));
   }
   Counters counters(storage::Transaction &transaction, CounterOwner const &owner) override {
     return counters_of(transaction, owner);

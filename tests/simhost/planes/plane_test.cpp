@@ -60,6 +60,9 @@ class FarPlane : public simhost::Plane {
                                            AddressBytes const & /*address*/) override {
     return told_or_refused(std::optional<simhost::McastGroup>());
   }
+  int multicast_mode(Transaction & /*transaction*/, simhost::storage::SwitchKey /*key*/) override {
+    return told_or_refused(0);
+  }
   simhost::Counters counters(Transaction & /*transaction*/,
                              simhost::CounterOwner const & /*owner*/) override {
     return told_or_refused(simhost::Counters());

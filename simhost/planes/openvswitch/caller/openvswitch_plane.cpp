@@ -348,6 +348,15 @@ std::optional<McastGroup> OpenVswitchPlane::group(storage::Transaction &transact
   return found == all.end() ? std::nullopt : std::optional(found->second);
 }
 
+int OpenVswitchPlane::multicast_mode(storage::Transaction &transaction, storage::SwitchKey key) {
+  auto const wanted = stored_.multicast_mode(transaction, key);
+  if (!storage::frames_change(transaction) || !has_device(transaction, key)) {
+    return wanted;
+  }
+  auto const question = question_about("multicast mode", {.switch_key = key, .port = {}});
+  return asked(file_, question).value("mode", wanted);
+}
+
 // Without a daemon they are what they were when it counted last.
 Counters OpenVswitchPlane::counters(storage::Transaction &transaction, CounterOwner const &owner) {
   if (!counts_frames(transaction, owner)) {

@@ -40,6 +40,7 @@ class OpenVswitchPlane : public Plane {
                                    std::size_t length) override;
   std::optional<McastGroup> group(storage::Transaction &transaction, storage::PortNumber port,
                                   AddressBytes const &address) override;
+  int multicast_mode(storage::Transaction &transaction, storage::SwitchKey key) override;
   Counters counters(storage::Transaction &transaction, CounterOwner const &owner) override;
   std::vector<std::string> counting_sessions(storage::Transaction &transaction,
                                              storage::SwitchKey key) override;
