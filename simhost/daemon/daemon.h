@@ -96,6 +96,7 @@ class Daemon {
   [[nodiscard]] Json groups(Json const &question) const;
   [[nodiscard]] Json multicast_mode(Json const &question) const;
   [[nodiscard]] Json bridge(Json const &question) const;
+  [[nodiscard]] Json source(Json const &question) const;
   [[nodiscard]] Json status(Json const &question) const;
 
   events::Loop &loop_;

@@ -9,6 +9,7 @@
 
 #include "daemon/daemon.h"
 #include "daemon/devices/packet_sizes.h"
+#include "daemon/learned/source_facts.h"
 #include "daemon/wanted.h"
 
 namespace simhost::daemon {
@@ -44,6 +45,7 @@ Questions Daemon::questions() {
       {"counters", told_by(&Daemon::counters)},
       {"sessions", told_by(&Daemon::counting_sessions)},
       {"bridge", told_by(&Daemon::bridge)},
+      {"source", told_by(&Daemon::source)},
       {"groups", told_by(&Daemon::groups)},
       {"multicast mode", told_by(&Daemon::multicast_mode)},
       {"status", told_by(&Daemon::status)},
@@ -176,6 +178,16 @@ Json Daemon::multicast_mode(Json const &question) const {
 Json Daemon::bridge(Json const &question) const {
   return {{"name", bridge_name(host_, question.at("switch").get<std::string>())},
           {"folder", bytes_of(options_.database.parent_path())}};
+}
+
+Json Daemon::source(Json const &question) const {
+  auto const known =
+      facts_of_source(memory_, switch_in(question), question.at("port").get<std::uint32_t>(),
+                      question.at("address").get<openflow::EthernetAddress>());
+  return {{"learned", known.is_learned},
+          {"not first", known.is_not_first},
+          {"at port", known.at_port},
+          {"on switch", known.on_switch}};
 }
 
 Json Daemon::status(Json const & /*question*/) const {

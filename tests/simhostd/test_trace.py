@@ -10,6 +10,7 @@ import pytest
 from simhost import Client, Frames, frame
 
 from frame_lab import TOOLS
+from group_frames import joins
 
 PATIENCE = 30.0
 EVERYBODY = "ff:ff:ff:ff:ff:ff"
@@ -283,6 +284,36 @@ def test_what_is_dropped(
     found = last(traced.is_true(at, sent))
     assert found[:2] == why[:2]
     assert why[2] is None or found[2] == why[2]
+
+
+def port_of(traced: Traced, name: str) -> Dict[str, Any]:
+    (switch,) = json.loads(traced.ctl("show", "--json"))["switches"]
+    (found,) = (port for port in switch["ports"] if port["id"] == name)
+    return dict(found)
+
+
+def test_a_question_teaches_nothing(traced: Traced) -> None:
+    """Neither who the client is, nor where an address is, nor who wants a group."""
+    learns = {"learning": True, "limit": 1, "limit_policy": "drop"}
+    traced.set_switch(multicast="snooping")
+    without_address = {"name": port_of(traced, "a")["device"]["name"]}
+    traced.set_port("a", device=without_address, forbids=["forged_transmits"], mac_learning=learns)
+    forged = frame(EVERYBODY, STRANGER)
+    texts = [step["text"] for step in traced.steps("a", forged)]
+    assert "makes its source the client's address, if that has none" in texts
+    assert "has its source learned at port a" in texts
+    traced.steps("a", joins(STRANGER, "192.0.2.1", "239.1.1.1"))
+    said = port_of(traced, "a")
+    assert not said.get("addresses") and not said.get("groups")
+    # Who was taken for another one would be forged.
+    one, other = traced.clients["a"], traced.clients["b"]
+    one.send(frame(EVERYBODY, one.mac))
+    other.expect(frame(EVERYBODY, one.mac))
+    why, setting, _ = last(traced.is_true("a", forged))
+    assert (why, setting) == ("its source is not the client's address", "a/forbids")
+    traced.set_port("a", forbids=[])
+    why, setting, _ = last(traced.is_true("a", forged))
+    assert (why, setting) == ("there is no room for its source", "a/mac_learning")
 
 
 def test_words_for_frames_and_for_people(traced: Traced) -> None:

@@ -270,6 +270,11 @@ std::vector<Flow> Memory::learned_at(storage::SwitchKey key, std::uint32_t port)
                     [&](Flow const &flow) { return openvswitch::number_of(flow.cookie) == port; });
 }
 
+std::vector<Flow> Memory::learned_addresses(storage::SwitchKey key) const {
+  return flows_that(
+      key, [](Flow const &flow) { return flow.table == openvswitch::table::kLearnedAddresses; });
+}
+
 std::vector<Flow> Memory::learned(storage::SwitchKey key, LearnedFlows const &known) const {
   return flows_that(key, [&](Flow const &flow) {
     return flow.table == known.table && flow.cookie == known.cookie;

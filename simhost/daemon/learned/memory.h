@@ -54,6 +54,8 @@ class Memory {
   /// What was learned at a port of a bridge.
   [[nodiscard]] std::vector<openflow::Flow> learned_at(storage::SwitchKey key,
                                                        std::uint32_t port) const;
+  /// The addresses that are learned at any port, or beyond the uplinks.
+  [[nodiscard]] std::vector<openflow::Flow> learned_addresses(storage::SwitchKey key) const;
   /// Likewise what a cookie knows, but for table::kRecentSources, which is not followed.
   [[nodiscard]] std::vector<openflow::Flow> learned(storage::SwitchKey key,
                                                     openvswitch::LearnedFlows const &known) const;

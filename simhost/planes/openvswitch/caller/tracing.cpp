@@ -1,6 +1,7 @@
 // What becomes of a frame: ovs-vswitchd is asked, and the state has the names.
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <chrono>
 #include <optional>
 #include <utility>
@@ -8,11 +9,14 @@
 #include "base/bytes.h"
 #include "base/ip_text.h"
 #include "base/outcomes.h"
+#include "model/mac/learning.h"
+#include "model/mac/properties.h"
 #include "model/mirror/properties.h"
 #include "model/ports/properties.h"
 #include "model/properties/properties.h"
 #include "model/teaming/properties.h"
 #include "planes/openvswitch/caller/openvswitch_plane.h"
+#include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/line/line.h"
 #include "planes/openvswitch/reading/read_mirrors.h"
 #include "planes/openvswitch/trace/control.h"
@@ -26,6 +30,12 @@ namespace {
 using namespace std::chrono_literals;
 
 constexpr auto kPatience = 2000ms;
+
+openflow::EthernetAddress source_of(std::vector<std::uint8_t> const &frame) {
+  openflow::EthernetAddress source{};
+  std::copy_n(frame.begin() + source.size(), source.size(), source.begin());
+  return source;
+}
 
 class Stations {
  public:
@@ -118,6 +128,38 @@ class Stations {
   std::vector<Found> all_;
 };
 
+// What a mark tells the flows of a frame that is a question, and which limit is the one of which it
+// tells.
+struct Mark {
+  std::uint32_t value;
+  SettingOf limit;
+};
+
+Mark mark_for(storage::Transaction &transaction, storage::SwitchKey key, Stations::Found const &at,
+              Json const &known) {
+  constexpr std::string_view kLearning = "mac_learning";
+  Mark mark{.value = kQuestion, .limit = {at.station.name, std::string(kLearning)}};
+  if (at.station.is_uplink) {
+    return mark;
+  }
+  if (known.at("not first").get<bool>()) {
+    mark.value |= kIsNotFirst;
+  }
+  auto const of_port =
+      effective(transaction, mac::management, storage::PropertyOwner::port(key, at.port));
+  bool const is_full_switch =
+      known.at("on switch").get<std::uint64_t>() >= mac::learning_of(transaction, key).macLimit;
+  bool const is_full_port =
+      known.at("at port").get<std::uint64_t>() >= of_port.portMACLearning.macLimit;
+  if (!known.at("learned").get<bool>() && (is_full_port || is_full_switch)) {
+    mark.value |= kHasNoRoom;
+  }
+  if (!is_full_port) {
+    mark.limit.port.clear();
+  }
+  return mark;
+}
+
 std::string hexadecimal(std::vector<std::uint8_t> const &bytes) {
   return fmt::format("{:02x}", fmt::join(bytes, ""));
 }
@@ -140,14 +182,24 @@ std::vector<StoryStep> OpenVswitchPlane::trace(storage::Transaction &transaction
   try {
     auto const bridge =
         ask(file_, {{"ask", "bridge"}, {"switch", of_switch.row.identifier}}, kPatience);
+    auto const known = ask(file_,
+                           {{"ask", "source"},
+                            {"switch", static_cast<std::int64_t>(of_switch.key)},
+                            {"port", static_cast<std::uint32_t>(at->port)},
+                            {"address", source_of(frame)}},
+                           kPatience);
+    auto const mark = mark_for(transaction, of_switch.key, *at, known);
+    auto entry = stations.entry(*at);
+    entry.limit = mark.limit;
     auto const folder = bridge.at("folder").get<std::vector<std::uint8_t>>();
     auto const text =
         ask_control(find_control_socket(std::string(folder.begin(), folder.end())),
                     {.name = "ofproto/trace",
                      .words = {bridge.at("name").get<std::string>(),
-                               fmt::format("in_port={}", at->device), hexadecimal(frame)}},
+                               fmt::format("in_port={},pkt_mark={}", at->device, mark.value),
+                               hexadecimal(frame)}},
                     Deadline::clock::now() + kPatience);
-    return tell(text, frame, stations.entry(*at),
+    return tell(text, frame, entry,
                 {.station = [&](openflow::Port device) { return stations.named(device); },
                  .session = [&](std::uint32_t id) { return stations.session(id); }});
   } catch (NoDaemon const &none) {

@@ -237,6 +237,15 @@ inline constexpr std::array kCountingTables{
     table::kLimits,        table::kLookup,  table::kSwitchLimit, table::kMirrors,
     table::kRemoteMirrors, table::kSending, table::kDropped};
 
+/// In the mark of a packet: it is none, but a question what would become of it, and teaches
+/// nothing.
+inline constexpr std::uint32_t kQuestion = 0x51dea500;
+inline constexpr std::uint32_t kQuestionBits = 0xffffff00;
+/// Likewise what the one who asks knows of the source: there is no room for it where it comes in,
+inline constexpr std::uint32_t kHasNoRoom = 1;
+/// or it is not the address that the client sent from first.
+inline constexpr std::uint32_t kIsNotFirst = 2;
+
 /// Groups of a slot, which come before the groups that lead to them: the low bits are the number of
 /// its first uplink and, above, of the slot among those with that one.
 inline constexpr openflow::GroupId kSpreadingGroups = 0x08000000;

@@ -78,6 +78,17 @@ inline Match with_bits(Match match, openflow::SubField bits, openflow::Value val
   return match;
 }
 
+/// Frames that are questions.
+inline Match questions(Match match) {
+  match.with(openflow::Field::pkt_mark, kQuestion, kQuestionBits);
+  return match;
+}
+/// Likewise those of which that is known: kHasNoRoom or kIsNotFirst.
+inline Match questions(Match match, std::uint32_t known) {
+  match.with(openflow::Field::pkt_mark, kQuestion | known, kQuestionBits | known);
+  return match;
+}
+
 /// Of an address: it is that of many.
 inline constexpr openflow::Value kGroupBit = openflow::Value{1} << 40U;
 

@@ -25,6 +25,7 @@ enum class Field : std::uint8_t {
   in_port,
   // The same as 16 bits: the one that can be written.
   nxm_in_port,
+  pkt_mark,
   reg0,
   reg1,
   reg2,

@@ -38,10 +38,10 @@ constexpr std::array<Protocol, 14> kProtocols{{
 
 /// Where the order of a text is another than that of Field: these come first.
 constexpr std::array kFirst{
-    Field::reg0,    Field::reg1,     Field::reg2,    Field::reg3,    Field::reg4,   Field::reg5,
-    Field::reg6,    Field::reg7,     Field::reg8,    Field::reg9,    Field::reg10,  Field::reg11,
-    Field::reg12,   Field::reg13,    Field::reg14,   Field::reg15,   Field::tun_id, Field::tun_src,
-    Field::tun_dst, Field::metadata, Field::in_port, Field::vlan_vid};
+    Field::pkt_mark, Field::reg0,    Field::reg1,     Field::reg2,    Field::reg3,    Field::reg4,
+    Field::reg5,     Field::reg6,    Field::reg7,     Field::reg8,    Field::reg9,    Field::reg10,
+    Field::reg11,    Field::reg12,   Field::reg13,    Field::reg14,   Field::reg15,   Field::tun_id,
+    Field::tun_src,  Field::tun_dst, Field::metadata, Field::in_port, Field::vlan_vid};
 
 constexpr Value kPriorityShift = 13;
 constexpr Value kPriorityBits = 0xe000;

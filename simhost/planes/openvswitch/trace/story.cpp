@@ -193,17 +193,16 @@ class Story {
       case Counted::unwanted_copy:
         return drop("it is a copy of a mirror session, and no session here takes those");
       case Counted::limit_dropped:
-        return drop("there is no room for its source", limit(visit));
+        return drop("there is no room for its source", entry_.limit);
       case Counted::limit_allowed:
-        return say(Kind::passes, "is let through: there is no room for its source", limit(visit));
+        return say(Kind::passes, "is let through: there is no room for its source", entry_.limit);
+      case Counted::first_address:
+        return tell_first_address(visit);
+      case Counted::learned:
+        return tell_learning(visit);
       default:
         return;
     }
-  }
-
-  [[nodiscard]] SettingOf limit(TraceLine const &visit) const {
-    auto const of_port = visit.table == table::kLimits;
-    return {of_port ? entry_.station.name : std::string(), "mac_learning"};
   }
 
   void tell_vlan() {
@@ -287,8 +286,6 @@ class Story {
       vlans_.front() = *vlan;
     } else if (text.starts_with("output:")) {
       tell_output(line, number_after(text, "output:").value_or(0));
-    } else if (text.starts_with("learn(")) {
-      tell_learning(text);
     } else if (text == "drop" && line.table == table::kDelivery) {
       refuse_receiver();
     } else if (text.find("skipping output to input port") != std::string_view::npos) {
@@ -326,15 +323,22 @@ class Story {
     steps_.back().vlans = vlans_;
   }
 
-  void tell_learning(std::string_view text) {
-    auto const table = number_after(text, "table=").value_or(0);
-    if (table == table::kFirstAddresses) {
+  void tell_first_address(TraceLine const &visit) {
+    if (visit.table == table::kSources) {
       say(Kind::passes, "makes its source the client's address, if that has none");
-    } else if (table == table::kLearnedAddresses && !entry_.station.is_uplink) {
+    }
+  }
+
+  // Of a flow where a question is told from a frame; others with such cookies are what was learned.
+  void tell_learning(TraceLine const &visit) {
+    if (visit.table != table::kLearning) {
+      return;
+    }
+    if (entry_.station.is_uplink) {
+      say(Kind::passes, "has its source learned beyond the uplinks", {{}, "mac_learning"});
+    } else {
       say(Kind::passes, "has its source learned at " + in_words(entry_.station),
           {entry_.station.name, "mac_learning"});
-    } else if (table == table::kLearnedAddresses) {
-      say(Kind::passes, "has its source learned beyond the uplinks", {{}, "mac_learning"});
     }
   }
 

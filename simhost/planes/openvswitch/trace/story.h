@@ -52,6 +52,8 @@ struct Entry {
   SettingOf teaming;
   /// Of what decides that a port sends nothing, if one does.
   SettingOf blocked;
+  /// Of what decides how many addresses are learned there.
+  SettingOf limit = {};
 };
 
 /// `text` is what ovs-vswitchd said of the frame.

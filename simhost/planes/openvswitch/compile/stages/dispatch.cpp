@@ -88,6 +88,7 @@ class Dispatch {
   // Each client by a meter of its own, so that none who says too much keeps others from being
   // heard.
   void send_up() {
+    program_.add(table::kHearing, {.priority = 100, .match = questions(Match())});
     for (auto const &port : plan_.network.ports) {
       if (sends_frames(port)) {
         program_.add(table::kHearing,

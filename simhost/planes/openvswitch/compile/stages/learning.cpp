@@ -50,7 +50,9 @@ void pass_over_fixed(Plan const &plan, Program &program) {
 // One that moves when it is seen elsewhere moves back when it is seen here.
 void learn_own_again(Plan const &plan, Program &program) {
   for (auto const &own : plan.own_addresses()) {
-    add(program, 200, with_address(from(own.port->port), Field::eth_src, own),
+    auto const match = with_address(from(own.port->port), Field::eth_src, own);
+    add(program, 220, questions(match), {go_to(table::kLookup)}, own.port->number);
+    add(program, 200, match,
         {learn(plan, own.port->number, own.port->port, 0), go_to(table::kLookup)},
         own.port->number);
   }
@@ -72,6 +74,14 @@ openflow::Action count_for_switch(Plan const &plan) {
                                                     .content = openflow::whole(Field::eth_src)}}};
 }
 
+// Whether there is room for a source, whoever asks knows.
+void ask(Program &program, Match const &match, std::uint32_t number) {
+  program.add(table::kLearning, {.priority = 150,
+                                 .match = questions(match),
+                                 .actions = {go_to(table::kLookup)},
+                                 .cookie = cookie(Counted::learned, number)});
+}
+
 void judge(Program &program, std::uint8_t where, Port const &port) {
   bool const allows = port.learning->when_full == WhenFull::allow;
   program.add(where, {.priority = 100,
@@ -89,6 +99,11 @@ void learn_at(Plan const &plan, Program &program, Port const &port) {
   }
   actions.push_back(go_to(table::kLimits));
   add(program, 100, from(port.port), std::move(actions), port.number);
+  if (may_have_some) {
+    ask(program, from(port.port), port.number);
+    add(program, 160, questions(from(port.port), kHasNoRoom),
+        {openflow::load(field::kVerdict, 0), go_to(table::kLimits)}, port.number);
+  }
   judge(program, table::kLimits, port);
   judge(program, table::kSwitchLimit, port);
 }
@@ -108,6 +123,7 @@ void learn_beyond(Plan const &plan, Program &program) {
   auto const &addresses = plan.network.addresses;
   if (addresses.uplink_limit != 0 && addresses.limit != 0) {
     auto const learn_from = [&](Match const &match, openflow::Port place) {
+      ask(program, match, 0);
       add(program, 100, match,
           {openflow::load(field::kVerdict, 1), learn(plan, 0, place, addresses.uplink_limit),
            go_to(table::kLimits)},

@@ -107,6 +107,9 @@ void compile_own_frames(Plan const &plan, Program &program) {
                                     .actions = drop(),
                                     .cookie = cookie(Counted::own_frame)});
     remember_at_ports(plan, program);
+    program.add(
+        table::kRemembering,
+        {.priority = 300, .match = questions(Match()), .actions = {go_to(table::kLearning)}});
   }
   drop_known(plan, program, others);
   program.add(table::kOwnFrames, {.actions = {go_to(table::kMirroring)}});

@@ -35,6 +35,20 @@ void drop_forged(Program &program, std::uint8_t where, Match const &match, Port 
                       .cookie = cookie(Counted::forged, port.number)});
 }
 
+// What the client's address is, whoever asks knows.
+void ask_without_address(Program &program, Port const &port) {
+  program.add(table::kSources, {.priority = 150,
+                                .match = questions(from(port.port)),
+                                .actions = {go_to(table::kTags)},
+                                .cookie = cookie(Counted::first_address, port.number)});
+  if (!port.may_forge) {
+    program.add(table::kSources, {.priority = 160,
+                                  .match = questions(from(port.port), kIsNotFirst),
+                                  .actions = drop(),
+                                  .cookie = cookie(Counted::forged, port.number)});
+  }
+}
+
 void compile(Plan const &plan, Program &program, Port const &port) {
   auto const at_port = from(port.port);
   if (port.address_changed) {
@@ -43,6 +57,7 @@ void compile(Plan const &plan, Program &program, Port const &port) {
                                   .actions = drop(),
                                   .cookie = cookie(Counted::address_changed, port.number)});
   } else if (!port.address) {
+    ask_without_address(program, port);
     program.add(table::kSources,
                 {.priority = 100,
                  .match = at_port,
