@@ -182,7 +182,8 @@ void add_trace(CLI::App &app) {
       ->required();
   command->add_flag("--json", given->json, "as JSON");
   command->footer(
-      "Open vSwitch is asked, and sends nothing. Settings are told with their values.\n"
+      "Open vSwitch is asked, and sends nothing but copies for collectors. Settings are told with "
+      "their values.\n"
       "  dst=ff:ff:ff:ff:ff:ff src=02:00:00:00:01:02 vlan=7  a frame in words");
   command->callback([given] { trace(*given); });
 }

@@ -76,6 +76,11 @@ class Collectors:
         assert [packet.copy for packet in packets] == [copy] * count
         return packets
 
+    def drain(self) -> None:
+        """Takes what comes of a trace."""
+        while self._socket.find(lambda data: is_wrapped(data), 0.2):
+            pass
+
     def close(self) -> None:
         self._socket.close()
 
@@ -142,6 +147,13 @@ def test_copies_come_wrapped(lab: Lab, collectors: Collectors) -> None:
         assert sorted(collectors.expect(sent, 2)) == [
             Packet(number, HERE, address, key, False, sent) for address in (ONE, OTHER)
         ]
+        told = lab.ctl("trace", "lab/a", sent.hex())
+        which = f"the key {KEY}" if kind == "gre" else f"the id {ERSPAN}"
+        name = {"gre": "GRE", "erspan2": "ERSPAN II", "erspan3": "ERSPAN III"}[kind]
+        for address in (ONE, OTHER):
+            wrapped = f"the collector {address}, in {name} with {which}, without a tag"
+            assert f"is copied by the mirror session s to {wrapped}" in told
+        collectors.drain()
         # What the port gets, a part of it, with its tag.
         cut = {"snap_length": 64, "keeps_vlan": True, "encapsulation": encapsulation(kind)}
         mirror(lab, session(to=to(ONE), sent_by=[], received_by=[{"port": "a"}], **cut))

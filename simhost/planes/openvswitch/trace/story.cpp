@@ -284,8 +284,15 @@ class Story {
       }
     } else if (auto const vlan = vlan_written(text); vlan && !vlans_.empty()) {
       vlans_.front() = *vlan;
+    } else if (text.starts_with("set_field:") && text.find("->tun_") != std::string_view::npos) {
+      wrapped_.insert_or_assign(std::string(text.substr(text.find("->tun_") + 2)),
+                                std::string(text.substr(10, text.find("->") - 10)));
     } else if (text.starts_with("output:")) {
       tell_output(line, number_after(text, "output:").value_or(0));
+    } else if (text.starts_with("output(port=")) {
+      // Of which not more than so many bytes go.
+      auto const number = text.substr(0, text.find(','));
+      tell_output(line, number_after(number, "port=").value_or(0));
     } else if (text == "drop" && line.table == table::kDelivery) {
       refuse_receiver();
     } else if (text.find("skipping output to input port") != std::string_view::npos) {
@@ -305,13 +312,17 @@ class Story {
   void tell_output(TraceLine const &line, std::uint64_t port) {
     steps_before_output_ = steps_.size();
     left_before_ = left_;
-    auto const to = names_.station(static_cast<openflow::Port>(port));
+    bool const is_wrapped = port == kGrePort || port == kErspanPort;
+    auto const to = is_wrapped ? Station{.name = wrapped_["tun_dst"], .is_uplink = false}
+                               : names_.station(static_cast<openflow::Port>(port));
     auto const tags = tags_in_words(vlans_);
     if (kind_of(line.cookie) == Counted::mirrored) {
       auto const session = names_.session(static_cast<std::uint32_t>(line.cookie));
+      auto const where = is_wrapped
+                             ? fmt::format("the collector {}, {}", to.name, in_wrapping(port))
+                             : in_words(to);
       say(Kind::copied,
-          fmt::format("is copied by the mirror session {} to {}, {}", session.name, in_words(to),
-                      tags),
+          fmt::format("is copied by the mirror session {} to {}, {}", session.name, where, tags),
           session.setting);
       left_ = left_ || is_copy_;
     } else {
@@ -342,6 +353,16 @@ class Story {
     }
   }
 
+  // What was said of the copy before it went to the port that wraps it.
+  [[nodiscard]] std::string in_wrapping(std::uint64_t port) {
+    auto const key = number_in(wrapped_["tun_id"]).value_or(0);
+    if (port == kGrePort) {
+      return fmt::format("in GRE with the key {}", key);
+    }
+    bool const is_third = number_in(wrapped_["tun_erspan_ver"]) == 2;
+    return fmt::format("in ERSPAN {} with the id {}", is_third ? "III" : "II", key);
+  }
+
   void say(Kind kind, std::string text, SettingOf setting = {}) {
     steps_.push_back({.kind = kind, .text = std::move(text), .setting = std::move(setting)});
   }
@@ -361,7 +382,8 @@ class Story {
   Names const &names_;
   std::vector<StoryStep> steps_;
   std::map<unsigned, std::uint64_t> registers_;
-  std::vector<std::uint16_t> vlans_;  // of the tags that it has, the outermost first
+  std::map<std::string, std::string> wrapped_;  // what is said of a wrapped copy, by its fields
+  std::vector<std::uint16_t> vlans_;            // of the tags that it has, the outermost first
   std::size_t bytes_;
   bool is_for_many_;
   bool is_too_large_ = false;
