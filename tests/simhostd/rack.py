@@ -2,14 +2,15 @@
 
 import itertools
 from pathlib import Path
-from types import TracebackType
-from typing import Any, Dict, List, Mapping, Optional, Sequence, Type
+from typing import Any, Dict, List, Mapping, Sequence
 
-from frame_lab import Lab
-from simhost import Client
+from frame_lab import Lab, comes_sooner_or_later
+from simhost import Client, frame
 from simhost._frames import Cabling, Wire
 from simhost._namespaces import Namespace
 
+ALL = "ff:ff:ff:ff:ff:ff"
+_numbers = itertools.count()
 _QUICK = ["type", "bridge", "forward_delay", "0", "mcast_snooping", "0"]
 
 
@@ -29,20 +30,25 @@ class Rack:
     def __enter__(self) -> "Rack":
         return self
 
-    def __exit__(
-        self,
-        kind: Optional[Type[BaseException]],
-        error: Optional[BaseException],
-        trace: Optional[TracebackType],
-    ) -> None:
+    def __exit__(self, *error: object) -> None:
         for host in self.hosts:
-            host.__exit__(kind, error, trace)
+            host.__exit__(*error)
         for namespace in self._namespaces:
             namespace.close()
 
     def start(self) -> None:
         for host in self.hosts:
             host.start()
+
+    def three_clients(self) -> List[Client]:
+        """One at the port "a" of each of three hosts, which are started."""
+        self.start()
+        return [self.client(host, "a") for host in range(3)]
+
+    def set_all(self, **settings: Any) -> None:
+        """What the port "a" has at each host."""
+        for host in self.hosts:
+            host.set_port("lab", "a", **settings)
 
     def namespace(self) -> Namespace:
         """One that goes with this."""
@@ -52,10 +58,45 @@ class Rack:
     def client(self, host: int, port: str, switch: str = "lab") -> Client:
         """A client at a port of a host, whose address no other client of the rack has."""
         client = self.hosts[host].client(switch, port)
-        client.run("ip", "address", "flush", "dev", "eth0")
-        client.address = f"10.9.0.{next(self._addresses)}"
-        client.run("ip", "address", "add", f"{client.address}/24", "dev", "eth0")
+        call(client, f"10.9.0.{next(self._addresses)}")
         return client
+
+
+def call(client: Client, address: str) -> None:
+    """Gives a client an address that clients of other hosts do not have."""
+    client.run("ip", "address", "flush", "dev", "eth0")
+    client.address = address
+    client.run("ip", "address", "add", f"{address}/24", "dev", "eth0")
+
+
+def hello(sender: Client, receiver: str = ALL, **more: Any) -> bytes:
+    """A frame that no other one is like."""
+    return frame(receiver, sender.mac, payload=b"%08d" % next(_numbers) * 6, **more)
+
+
+def all_reach(clients: Sequence[Client]) -> None:
+    """Each comes to reach each other one, and has got nothing yet when this returns.
+
+    Until then Open vSwitch may be asking for the addresses of its peers.
+    """
+    for one, other in itertools.permutations(clients, 2):
+        assert comes_sooner_or_later(one, other, hello(one))
+    for client in clients:
+        while client._socket.find(lambda frame: True, 0.2):
+            pass
+
+
+def check_all_get_one(clients: Sequence[Client]) -> None:
+    """What each sends to all comes to each other one once, and not back."""
+    all_reach(clients)
+    for sender in clients:
+        sent = hello(sender)
+        sender.send(sent)
+        for client in clients:
+            if client is not sender:
+                client.expect(sent)
+        for client in clients:
+            client.expect_none(sent)
 
 
 class Segment:

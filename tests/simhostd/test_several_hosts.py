@@ -7,11 +7,8 @@ import pytest
 
 from frame_lab import comes_sooner_or_later, comes_true
 from group_frames import data, joins, leaves
-from rack import Rack, Segment
-from simhost import Client, frame
-
-ALL = "ff:ff:ff:ff:ff:ff"
-_numbers = itertools.count()
+from rack import Rack, Segment, all_reach, check_all_get_one, hello
+from simhost import Client
 
 
 def document() -> Dict[str, Any]:
@@ -49,38 +46,11 @@ def segment(rack: Rack) -> Segment:
 def clients(rack: Rack, segment: Segment) -> List[Client]:
     """One at each host."""
     del segment
-    rack.start()
-    return [rack.client(host, "a") for host in range(3)]
+    return rack.three_clients()
 
 
-def hello(sender: Client, receiver: str = ALL, **more: Any) -> bytes:
-    """A frame that no other one is like."""
-    return frame(receiver, sender.mac, payload=b"%08d" % next(_numbers) * 6, **more)
-
-
-def set_all(rack: Rack, **settings: Any) -> None:
-    for host in rack.hosts:
-        host.set_port("lab", "a", **settings)
-
-
-def all_reach(clients: List[Client]) -> None:
-    for one, other in itertools.permutations(clients, 2):
-        assert comes_sooner_or_later(one, other, hello(one))
-    for client in clients:
-        while client._socket.find(lambda frame: True, 0.2):
-            pass
-
-
-def test_a_frame_for_all_comes_to_each_host_once(rack: Rack, clients: List[Client]) -> None:
-    all_reach(clients)
-    for sender in clients:
-        sent = hello(sender)
-        sender.send(sent)
-        for client in clients:
-            if client is not sender:
-                client.expect(sent)
-        for client in clients:
-            client.expect_none(sent)
+def test_a_frame_for_all_comes_to_each_host_once(clients: List[Client]) -> None:
+    check_all_get_one(clients)
 
 
 def test_vlans_hold_across_hosts(rack: Rack, clients: List[Client]) -> None:
@@ -94,7 +64,7 @@ def test_vlans_hold_across_hosts(rack: Rack, clients: List[Client]) -> None:
         assert comes_sooner_or_later(one, other, sent, tagged)
         third.expect_none(sent)
     finally:
-        set_all(rack, vlan=0)
+        rack.set_all(vlan=0)
 
 
 def private(vlan: int) -> Dict[str, Any]:
@@ -126,7 +96,7 @@ def test_private_vlans_hold_across_hosts(
                 else:
                     clients[other].expect_none(sent)
     finally:
-        set_all(rack, vlan=0)
+        rack.set_all(vlan=0)
 
 
 def test_an_uplink_fails_and_the_others_hear_of_it(

@@ -8,12 +8,9 @@ from typing import Any, Callable, Dict, Iterator, List
 import pytest
 
 from frame_lab import comes_sooner_or_later, comes_true
-from rack import Rack, Routers
-from simhost import Client, frame
+from rack import ALL, Rack, Routers, all_reach, check_all_get_one, hello
+from simhost import Client
 from simhost._namespaces import Namespace
-
-ALL = "ff:ff:ff:ff:ff:ff"
-_numbers = itertools.count()
 
 
 def fabric(host: int, hosts: int = 3, **changed: Any) -> Dict[str, Any]:
@@ -55,27 +52,7 @@ def routers(rack: Rack) -> Routers:
 def clients(rack: Rack, routers: Routers) -> List[Client]:
     """One at each host."""
     del routers
-    rack.start()
-    return [rack.client(host, "a") for host in range(3)]
-
-
-def hello(sender: Client, receiver: str = ALL, **more: Any) -> bytes:
-    """A frame that no other one is like."""
-    return frame(receiver, sender.mac, payload=b"%08d" % next(_numbers) * 6, **more)
-
-
-def set_all(rack: Rack, **settings: Any) -> None:
-    for host in rack.hosts:
-        host.set_port("lab", "a", **settings)
-
-
-def all_reach(clients: List[Client]) -> None:
-    """Until then Open vSwitch may be asking for the addresses of its peers."""
-    for one, other in itertools.permutations(clients, 2):
-        assert comes_sooner_or_later(one, other, hello(one))
-    for client in clients:
-        while client._socket.find(lambda frame: True, 0.2):
-            pass
+    return rack.three_clients()
 
 
 def is_over(rack: Rack, changed: Callable[[], None], one: Client, other: Client) -> None:
@@ -104,15 +81,7 @@ def test_a_frame_for_all_comes_to_each_host_once(
     rack: Rack, clients: List[Client], encapsulation: str
 ) -> None:
     use(rack, encapsulation)
-    all_reach(clients)
-    for sender in clients:
-        sent = hello(sender)
-        sender.send(sent)
-        for client in clients:
-            if client is not sender:
-                client.expect(sent)
-        for client in clients:
-            client.expect_none(sent)
+    check_all_get_one(clients)
 
 
 def test_a_frame_for_one_host_goes_to_no_other(rack: Rack, clients: List[Client]) -> None:
@@ -164,12 +133,12 @@ def test_vlans_and_priorities_hold_across_hosts(rack: Rack, clients: List[Client
         )
         one.expect_none(in_eight)
     finally:
-        set_all(rack, vlan=0)
+        rack.set_all(vlan=0)
 
 
 def test_private_vlans_hold_across_hosts(rack: Rack, clients: List[Client]) -> None:
     promiscuous, isolated, other = clients
-    set_all(rack, vlan={"id": 101, "private": True})
+    rack.set_all(vlan={"id": 101, "private": True})
     rack.hosts[0].set_port("lab", "a", vlan={"id": 100, "private": True})
     try:
         for one in isolated, other:
@@ -183,7 +152,7 @@ def test_private_vlans_hold_across_hosts(rack: Rack, clients: List[Client]) -> N
             host.set_port("lab", "a", vlan={"id": 102, "private": True})
         assert comes_sooner_or_later(isolated, other, hello(isolated))
     finally:
-        set_all(rack, vlan=0)
+        rack.set_all(vlan=0)
 
 
 def test_a_client_that_moves_to_another_host_is_found_there(
