@@ -52,13 +52,19 @@ std::optional<std::string> obstacle(WantedBridge const &bridge, storage::Address
   return std::nullopt;
 }
 
+}  // namespace
+
+Underlay::Underlay(events::Loop &loop, std::filesystem::path folder, Say say)
+    : loop_(loop), folder_(std::move(folder)), say_(std::move(say)) {}
+
 // Returns whether it was not so before. Throws std::system_error.
-bool put_underlay(WantedUnderlay const &wanted, NetworkDevices const &devices) {
+bool Underlay::put(WantedUnderlay const &wanted, NetworkDevices const &devices) {
   for (auto const &[name, number] : wanted.row.devices) {
     switch_network_device(name, true);
     // Or whoever asks for the address of the bridge may be told that of the device, past which
     // tunnels would not be seen.
     let_resolve(name, false);
+    silent_.insert(name);
   }
   auto const bridge = devices.find(wanted.row.name);
   if (!bridge) {
@@ -72,17 +78,24 @@ bool put_underlay(WantedUnderlay const &wanted, NetworkDevices const &devices) {
   return is_new;
 }
 
-}  // namespace
-
-Underlay::Underlay(events::Loop &loop, std::filesystem::path folder, Say say)
-    : loop_(loop), folder_(std::move(folder)), say_(std::move(say)) {}
+// At devices that carry no tunnels any more.
+void Underlay::let_others_resolve(WantedUnderlay const *wanted, NetworkDevices const &devices) {
+  std::erase_if(silent_, [&](std::string const &name) {
+    bool const goes = wanted == nullptr || !wanted->row.devices.contains(name);
+    if (goes && devices.find(name)) {
+      let_resolve(name, true);
+    }
+    return goes;
+  });
+}
 
 std::vector<std::string> Underlay::follow(
     Wanted const &wanted, NetworkDevices const &devices,
     std::function<bool(std::string const &)> const &is_at_bridge) {
   std::vector<std::string> obstacles;
   try {
-    if (wanted.underlay && put_underlay(*wanted.underlay, devices)) {
+    let_others_resolve(wanted.underlay ? &*wanted.underlay : nullptr, devices);
+    if (wanted.underlay && put(*wanted.underlay, devices)) {
       forget_ways_soon();
     }
   } catch (std::runtime_error const &error) {

@@ -4,6 +4,7 @@
 
 #include <filesystem>
 #include <functional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -26,11 +27,14 @@ class Underlay {
                                   std::function<bool(std::string const &)> const &is_at_bridge);
 
  private:
+  bool put(WantedUnderlay const &wanted, NetworkDevices const &devices);
+  void let_others_resolve(WantedUnderlay const *wanted, NetworkDevices const &devices);
   void forget_ways_soon();
 
   events::Loop &loop_;
   std::filesystem::path folder_;
   Say say_;
+  std::set<std::string> silent_;  // devices at which the kernel tells nobody its addresses
   events::Loop::Timer next_forgetting_;
 };
 
