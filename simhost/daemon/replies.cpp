@@ -2,6 +2,7 @@
 #include <unistd.h>
 
 #include <functional>
+#include <span>
 #include <stdexcept>
 #include <string>
 #include <utility>
@@ -10,6 +11,7 @@
 #include "daemon/daemon.h"
 #include "daemon/devices/packet_sizes.h"
 #include "daemon/learned/source_facts.h"
+#include "daemon/underlay/tunnel_sizes.h"
 #include "daemon/wanted.h"
 
 namespace simhost::daemon {
@@ -19,6 +21,15 @@ namespace {
 std::vector<std::uint8_t> bytes_of(std::filesystem::path const &path) {
   auto const &text = path.native();
   return {text.begin(), text.end()};
+}
+
+TunnelSize tunnel_in(Json const &said) {
+  auto const &way = said.at(0);
+  auto const peer = way.at(1).get<std::vector<std::uint8_t>>();
+  auto const bytes = std::as_bytes(std::span(peer));
+  return {.device = way.at(0).get<std::string>(),
+          .peer = {bytes.begin(), bytes.end()},
+          .size = said.at(1).get<std::uint32_t>()};
 }
 
 storage::SwitchKey switch_in(Json const &question) {
@@ -98,8 +109,14 @@ Json Daemon::is_there(Json const &question) {
 // Before it is committed that switches have packets of these sizes, and devices likewise.
 Json Daemon::carry(Json const &question) {
   PacketSizes sizes;
+  devices_.refresh();
   {
     storage::ReadingTransaction transaction(store_);
+    for (auto const &one : question.at("tunnels")) {
+      if (auto const why = why_too_large(transaction, tunnel_in(one), devices_)) {
+        return {{"why", *why}};
+      }
+    }
     for (auto const &one : question.at("switches")) {
       add_packet_sizes(transaction, storage::SwitchKey{one.at(0).get<std::int64_t>()},
                        one.at(1).get<std::uint32_t>(), sizes);
@@ -108,7 +125,6 @@ Json Daemon::carry(Json const &question) {
   for (auto const &one : question.at("devices")) {
     sizes[one.at(0).get<std::string>()] = one.at(1).get<std::uint32_t>();
   }
-  devices_.refresh();
   auto const why = raise_all_packet_sizes(sizes, devices_);
   return {{"why", why.value_or("")}};
 }

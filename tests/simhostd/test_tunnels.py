@@ -1,6 +1,6 @@
 """Hosts without a common network: tunnels are the uplink of their switch."""
 
-import itertools
+import json
 import signal
 import sys
 from typing import Any, Callable, Dict, Iterator, List
@@ -239,12 +239,38 @@ def test_it_is_said_what_keeps_frames_from_a_tunnel(rack: Rack, clients: List[Cl
         return comes_true(lambda: bool(words == host.plane()["said"]))
 
     assert says("")
-    host.apply({"switches": [{"alias": "lab", "mtu": 1443}]})
-    assert says(
-        "the way to the peer 192.0.3.1 of the switch 'lab' bears an MTU of 1442, and the switch has"
-        " 1443; the way to the peer 192.0.4.1 of the switch 'lab' bears an MTU of 1442, and the"
-        " switch has 1443"
-    )
     host.apply({"switches": [{"alias": "lab", "mtu": 1442}]})
+    host.host.run("ip", "link", "set", "eth1", "mtu", "1499")
+    assert says(
+        "the way to the peer 192.0.3.1 of the switch 'lab' bears an MTU of 1441, and the switch has"
+        " 1442; the way to the peer 192.0.4.1 of the switch 'lab' bears an MTU of 1441, and the"
+        " switch has 1442"
+    )
+    # Which keeps nobody from changing something else.
+    host.set_port("lab", "b", vlan=7)
+    host.set_port("lab", "b", vlan=0)
+    host.host.run("ip", "link", "set", "eth1", "mtu", "1500")
     assert says("")
+    host.apply({"switches": [{"alias": "lab", "mtu": 1400}]})
+
+
+def test_packets_that_no_tunnel_bears_are_refused(rack: Rack, clients: List[Client]) -> None:
+    del clients
+    host = rack.hosts[0]
+
+    def refusal(**settings: Any) -> str:
+        document = {"switches": [{"alias": "lab", **settings}]}
+        refused = host.try_ctl("apply", "-", given=json.dumps(document))
+        assert refused.returncode != 0
+        return refused.stdout
+
+    bound = "bears an MTU of 1442, and the switch would have 1443 (QEX_NOT_SUPPORTED)"
+    assert f"the way to the peer 192.0.3.1 {bound}" in refusal(mtu=1443)
+    host.apply({"switches": [{"alias": "lab", "mtu": 1442, "fabric": {}}]})
+    assert f"the way to the peer 192.0.3.1 {bound}" in refusal(mtu=1443, fabric=fabric(0))
+    host.apply({"switches": [{"alias": "lab", "mtu": 1443}]})
+    assert f"the way to the peer 192.0.4.1 {bound}" in refusal(
+        fabric=fabric(0, peers=[Routers.address(2)])
+    )
+    host.apply({"switches": [{"alias": "lab", "mtu": 1442, "fabric": fabric(0)}]})
     host.apply({"switches": [{"alias": "lab", "mtu": 1400}]})

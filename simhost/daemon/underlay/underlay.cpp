@@ -22,11 +22,6 @@ constexpr std::uint32_t kWrapping = 14 + 4 + 4 + 8 + 8;
 // Until Open vSwitch has heard of an address.
 constexpr events::Clock::duration kUntilKnown = 500ms;
 
-std::uint32_t mtu_of(Route const &route, NetworkDevices const &devices) {
-  auto const device = devices.find(route.device);
-  return route.mtu.value_or(device ? device->mtu : 0);
-}
-
 std::optional<std::string> obstacle(WantedBridge const &bridge, storage::AddressBytes const &peer,
                                     NetworkDevices const &devices,
                                     std::function<bool(std::string const &)> const &is_at_bridge) {
@@ -126,6 +121,11 @@ void Underlay::forget_ways_soon() {
       say_(error.what());
     }
   });
+}
+
+std::uint32_t mtu_of(Route const &route, NetworkDevices const &devices) {
+  auto const device = devices.find(route.device);
+  return route.mtu.value_or(device ? device->mtu : 0);
 }
 
 std::uint32_t mtu_within(std::uint32_t route_mtu, std::size_t address_bytes) {

@@ -10,6 +10,7 @@
 
 #include "daemon/devices/network_devices.h"
 #include "daemon/troubles.h"
+#include "daemon/underlay/network_routes.h"
 #include "daemon/wanted.h"
 #include "events/loop.h"
 
@@ -38,6 +39,8 @@ class Underlay {
   events::Loop::Timer next_forgetting_;
 };
 
+/// The largest packet that a route carries; 0 if nobody knows.
+std::uint32_t mtu_of(Route const &route, NetworkDevices const &devices);
 /// The largest packet of a switch whose frames have two tags, over a route that carries packets of
 /// `route_mtu`.
 std::uint32_t mtu_within(std::uint32_t route_mtu, std::size_t address_bytes);

@@ -2,18 +2,25 @@
 // on.
 #include "planes/openvswitch/caller/packet_sizes.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "model/properties/properties.h"
 #include "model/switches/properties.h"
 #include "storage/ports.h"
 #include "storage/running/devices.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::openvswitch {
 namespace {
 
 std::uint32_t size_of(storage::Transaction &transaction, storage::SwitchKey key) {
   return effective(transaction, switches::mtu, storage::PropertyOwner::global(key));
+}
+
+std::vector<std::uint8_t> numbers_of(storage::AddressBytes const &address) {
+  auto const *const first = reinterpret_cast<std::uint8_t const *>(address.data());
+  return {first, first + address.size()};
 }
 
 // What is asked of one and not agreed to.
@@ -33,6 +40,7 @@ Json larger_ones(Sizes const &asked, Sizes const &agreed) {
 
 std::optional<Json> PacketSizes::question(storage::Transaction &transaction) {
   asked_ = {};
+  auto const underlay = storage::underlay_of(transaction);
   for (auto const &[key, row] : storage::all_switches(transaction)) {
     auto const size = size_of(transaction, key);
     asked_.switches.emplace(static_cast<std::int64_t>(key), size);
@@ -41,9 +49,16 @@ std::optional<Json> PacketSizes::question(storage::Transaction &transaction) {
         asked_.devices.emplace(device->name, size);
       }
     }
+    if (auto const fabric = storage::fabric_of(transaction, key)) {
+      for (auto const &tunnel : fabric->tunnels) {
+        auto &largest = asked_.tunnels[{underlay ? underlay->device : "", numbers_of(tunnel.peer)}];
+        largest = std::max(largest, size);
+      }
+    }
   }
   auto switches = larger_ones(asked_.switches, agreed_.switches);
   auto devices = larger_ones(asked_.devices, agreed_.devices);
+  auto const tunnels = larger_ones(asked_.tunnels, agreed_.tunnels);
   for (auto const &name : std::exchange(added_, {})) {
     auto const holder = storage::find_device(transaction, name);
     if (holder && holder->port) {
@@ -51,11 +66,11 @@ std::optional<Json> PacketSizes::question(storage::Transaction &transaction) {
       devices.push_back({name, size_of(transaction, key)});
     }
   }
-  if (switches.empty() && devices.empty()) {
+  if (switches.empty() && devices.empty() && tunnels.empty()) {
     agreed_ = asked_;
     return std::nullopt;
   }
-  return Json{{"ask", "carry"}, {"switches", switches}, {"devices", devices}};
+  return Json{{"ask", "carry"}, {"switches", switches}, {"devices", devices}, {"tunnels", tunnels}};
 }
 
 }  // namespace simhost::openvswitch

@@ -1,5 +1,5 @@
-// Whether devices can carry the packets of their switches: asked before a change is committed, and
-// only of what the daemon did not agree to before.
+// Whether devices and the ways of tunnels can carry the packets of their switches: asked before a
+// change is committed, and only of what the daemon did not agree to before.
 #pragma once
 
 #include <cstdint>
@@ -8,6 +8,8 @@
 #include <set>
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "planes/openvswitch/line/line.h"
 #include "storage/store.h"
@@ -29,6 +31,8 @@ class PacketSizes {
   struct Sizes {
     std::map<std::int64_t, std::uint32_t> switches;
     std::map<std::string, std::uint32_t> devices;  // of uplinks, which come and go
+    // By the device of the underlay, and the address of the peer.
+    std::map<std::pair<std::string, std::vector<std::uint8_t>>, std::uint32_t> tunnels;
 
     bool operator==(Sizes const &) const = default;
   };
