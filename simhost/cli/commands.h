@@ -66,8 +66,8 @@ std::string description();
 
 /// show, apply, link, uplink, learn, counter: the host and what comes to it from outside.
 void add_world_commands(CLI::App &app);
-/// connect, disconnect, plane, trace: the devices through which real frames go, what moves them,
-/// and what becomes of one.
+/// connect, disconnect, underlay, plane, trace: the devices through which real frames go, what
+/// moves them, and what becomes of one.
 void add_frame_commands(CLI::App &app);
 /// share, join, fabric: what several hosts have together.
 void add_fabric_commands(CLI::App &app);

@@ -50,6 +50,46 @@ void add_disconnect(CLI::App &app) {
       [given] { check(simhost_disconnect(given->switch_name.c_str(), given->port.c_str())); });
 }
 
+struct UnderlayWords {
+  std::string device;
+  std::string address;
+  std::string gateway;
+  bool none = false;
+};
+
+void set_underlay(UnderlayWords const &given) {
+  if (!given.none && given.address.empty()) {
+    throw CLI::RequiredError("address");
+  }
+  auto underlay = nlohmann::json::object();
+  if (!given.none) {
+    underlay = {{"device", given.device}, {"address", given.address}};
+  }
+  if (!given.gateway.empty()) {
+    underlay["gateway"] = given.gateway;
+  }
+  check(simhost_apply(text_of({{"underlay", underlay}}).c_str()));
+}
+
+void add_underlay(CLI::App &app) {
+  auto *const underlay =
+      app.add_subcommand("underlay", "Say what carries tunnels and the copies for collectors");
+  auto const given = words_of_command<UnderlayWords>();
+  auto *const device =
+      underlay->add_option("device", given->device, "as Linux calls it, such as eth1");
+  underlay->add_option("address", given->address,
+                       "of this host, with the bits of its network: 192.0.2.1/24");
+  auto *const gateway =
+      underlay->add_option("--gateway", given->gateway, "by which other networks are reached");
+  underlay->add_flag("--none", given->none, "nothing any more")
+      ->excludes(device)
+      ->excludes(gateway);
+  underlay->footer(
+      "In place of what it was before. The device is no port's and no uplink's:\n"
+      "  simhostctl underlay eth1 192.0.2.1/24 --gateway 192.0.2.254");
+  underlay->callback([given] { set_underlay(*given); });
+}
+
 std::string plane_words(nlohmann::ordered_json const &plane) {
   auto const &change = plane.at("change");
   auto const &in_force = plane.at("in_force");
@@ -193,6 +233,7 @@ void add_trace(CLI::App &app) {
 void add_frame_commands(CLI::App &app) {
   add_connect(app);
   add_disconnect(app);
+  add_underlay(app);
   add_plane(app);
   add_trace(app);
 }

@@ -6,7 +6,7 @@ import re
 import subprocess
 import time
 from pathlib import Path
-from typing import List
+from typing import Any, List
 
 import pytest
 
@@ -360,9 +360,32 @@ def test_says_that_an_answer_cannot_be_written(host: Host, words: str) -> None:
     assert done.stderr == "simhostctl: the output cannot be written\n"
 
 
+def test_says_what_carries_tunnels(host: Host) -> None:
+    def underlay() -> Any:
+        return host.described().get("underlay")
+
+    host.ctl("underlay", "eth1", "192.0.2.1/24", "--gateway", "192.0.2.254")
+    whole = {"device": "eth1", "address": "192.0.2.1/24", "gateway": "192.0.2.254"}
+    assert underlay() == whole
+    for words, why in (
+        (["eth1"], "'address' is missing"),
+        (["eth1", "192.0.2.1"], "underlay.address: must be an address and the bits"),
+        (["eth1", "--none"], "--none"),
+        (["eth1", "192.0.2.1/24", "--gateway", "2001:db8::1"], "an address of the other kind"),
+    ):
+        refused = host.run("underlay", *words)
+        assert refused.returncode != 0 and why in refused.stderr
+        assert underlay() == whole
+    host.ctl("underlay", "eth2", "192.0.2.1/24")
+    assert underlay() == {"device": "eth2", "address": "192.0.2.1/24"}
+    host.ctl("underlay", "--none")
+    assert underlay() is None
+
+
 COMMANDS = (
     *("show", "apply", "link", "uplink", "learn", "counter", "clock", "restart", "reset", "fault"),
-    *("connect", "disconnect", "plane", "trace", "share", "join", "fabric", "calls", "lab"),
+    *("connect", "disconnect", "underlay", "plane", "trace", "share", "join", "fabric"),
+    *("calls", "lab"),
     *("lab up", "lab down", "lab list", "lab exec"),
     *("clock show", "clock stop", "clock run", "clock step", "clock set"),
     *("fault add", "fault list", "fault clear"),
