@@ -36,6 +36,14 @@ std::vector<Shared> all_shared(Transaction &transaction) {
       .all(shared_at);
 }
 
+std::optional<Shared> find_shared(Transaction &transaction, SharedName const &name) {
+  return Query(transaction,
+               "SELECT switch, port, fabric, image, fits FROM shared WHERE switch = ? AND port = ?")
+      .with(std::string_view(name.switch_identifier))
+      .with(std::string_view(name.port))
+      .first(shared_at);
+}
+
 void put_shared(ChangingTransaction &transaction, Shared const &shared) {
   Change(transaction,
          "INSERT OR REPLACE INTO shared (switch, port, fabric, fits) VALUES (?, ?, ?, ?)")

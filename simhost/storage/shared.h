@@ -40,6 +40,7 @@ struct Shared {
 
 /// All of them, each switch before its ports.
 std::vector<Shared> all_shared(Transaction &transaction);
+std::optional<Shared> find_shared(Transaction &transaction, SharedName const &name);
 /// Replaces what was there.
 void put_shared(ChangingTransaction &transaction, Shared const &shared);
 void remove_shared(ChangingTransaction &transaction, SharedName const &name);

@@ -42,6 +42,7 @@ HEADERS = {
     "abi": "abi/host.h",
     "daemon": "daemon/daemon.h",
     "fabric/cluster": "fabric/cluster/cluster.h",
+    "fabric/rows": "fabric/rows/rows.h",
     "fabric/agent": "fabric/agent/agent.h",
     "cli": "cli/commands.h",
 }
@@ -137,12 +138,18 @@ BELOW: Dict[str, List[str]] = {
         *("fabric/shared", "fabric/caller"),
     ],
     "daemon": [
-        one for one in HEADERS if one not in ("daemon", "cli", "fabric/cluster", "fabric/agent")
+        one
+        for one in HEADERS
+        if one not in ("daemon", "cli", "fabric/cluster", "fabric/rows", "fabric/agent")
     ],
     "fabric/cluster": [
         "events",
         "planes/openvswitch/transport",
         "planes/openvswitch/ovsdb",
+    ],
+    "fabric/rows": [
+        *("base", "storage", "clock", "faults", "model", "scenario"),
+        *("planes/openvswitch/transport", "planes/openvswitch/ovsdb", "events", "fabric/shared"),
     ],
     "fabric/agent": [one for one in HEADERS if one not in ("fabric/agent", "cli")],
     # Of the layers below, only what any program may use.

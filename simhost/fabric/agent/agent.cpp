@@ -1,3 +1,4 @@
+// Who tells it something leaves that behind and wakes the thread, which alone touches the member.
 #include "fabric/agent/agent.h"
 
 #include <sys/eventfd.h>

@@ -7,7 +7,7 @@
 #include <string_view>
 #include <thread>
 
-#include "fabric/agent/operations.h"
+#include "fabric/rows/operations.h"
 
 namespace simhost::fabric {
 namespace {

@@ -2,6 +2,7 @@
 #include "fabric/agent/member.h"
 
 #include <fmt/format.h>
+#include <malloc.h>
 
 #include <algorithm>
 #include <chrono>
@@ -55,10 +56,10 @@ Membership membership_in(storage::Store &store, std::string const &host) {
   return found.value_or(Membership{.host = host, .state = random_name()});
 }
 
-std::string words_of(SharedName const &name, Records const &records) {
-  auto const record = records.find({name.switch_identifier, ""});
-  auto const alias = record != records.end() ? record->second.at("alias").get<std::string>()
-                                             : name.switch_identifier;
+std::string words_of(SharedName const &name, Records const &switches) {
+  auto const record = switches.find({name.switch_identifier, ""});
+  auto const alias = record != switches.end() ? record->second.at("alias").get<std::string>()
+                                              : name.switch_identifier;
   return name.port.empty() ? alias : alias + "/" + name.port;
 }
 
@@ -78,7 +79,8 @@ Member::Member(events::Loop &loop, Options options, Say say)
       cluster_(options_.servers,
                {.name = kDatabase, .version = kSchemaVersion, .selected = selected_columns()}),
       server_(loop, agent_socket_of(options_.state), questions()),
-      lost_(events::Clock::now()) {
+      lost_(events::Clock::now()),
+      touched_(options_.host) {
   next_connect_ = loop_.after({}, [this] { connect(); });
 }
 
@@ -88,6 +90,7 @@ void Member::connect() {
   try {
     cluster_.connect();
     lost_.reset();
+    touched_.add_all();
     watch();
     claim();
     settle_undecided();
@@ -122,13 +125,22 @@ void Member::watch() {
 
 void Member::receive() {
   try {
-    if (cluster_.receive()) {
-      claim();
+    if (take_news()) {
       sync_soon();
     }
   } catch (std::runtime_error const &error) {
     lose(error.what());
   }
+}
+
+bool Member::take_news() {
+  auto const changes = cluster_.receive();
+  if (changes.empty()) {
+    return false;
+  }
+  touched_.add(cluster_.replica(), changes);
+  claim();
+  return true;
 }
 
 // The name.
@@ -205,14 +217,18 @@ void Member::sync() {
   }
   auto const waited = next_wait_;
   try {
-    auto const records = records_of(cluster_.replica(), options_.host);
-    auto const revision = revision_of(cluster_.replica());
-    if (!follow_records(records)) {
+    take_news();
+    bool const is_much = touched_.is_all();
+    if (!follow_touched()) {
       sync_soon(std::clamp<events::Clock::duration>(2 * waited, kFirstWait, kLongestWait));
       return;
     }
-    revision_ = revision;
-    tell_joined(records);
+    if (is_much) {
+      // Of all rows at once this is a third of what the process has, and may never be needed again.
+      malloc_trim(0);
+    }
+    revision_ = revision_of(cluster_.replica());
+    tell_joined();
     report_soon();
   } catch (Json::exception const &error) {
     lose(fmt::format("its rows are none of this version: {}", error.what()));
@@ -221,9 +237,17 @@ void Member::sync() {
   }
 }
 
-// Returns whether it could: not while somebody else has the state.
-bool Member::follow_records(Records const &records) {
+// Returns whether it could: not while somebody else has the state. What this host cannot bear it
+// tries again with each change, and with it whatever may depend on that.
+bool Member::follow_touched() {
+  if (touched_.empty() && unborne_.empty()) {
+    return true;
+  }
   auto const before = std::exchange(unborne_, {});
+  if (!before.empty()) {
+    touched_.add_all();
+  }
+  auto news = touched_.news(cluster_.replica());
   while (true) {
     try {
       storage::Patience none(0ns);
@@ -232,20 +256,25 @@ bool Member::follow_records(Records const &records) {
       if (is_new) {
         storage::put_membership(transaction, membership_);
       }
-      if (follow(transaction, membership_, records, unborne_) || is_new) {
+      if (follow(transaction, membership_, news, unborne_) || is_new) {
         storage::advance_frames_change(transaction);
         change_ = storage::frames_change(transaction).value_or(0);
         transaction.commit();
       }
+      touched_.clear();
       return true;
     } catch (Unborne const &why) {
       unborne_[why.name()] = why.what();
       if (!before.contains(why.name())) {
         say_(fmt::format("this host cannot bear what the fabric has of {}: {}",
-                         words_of(why.name(), records), why.what()));
+                         words_of(why.name(), switches_of(cluster_.replica(), options_.host)),
+                         why.what()));
       }
+      touched_.add_all();
+      news = touched_.news(cluster_.replica());
     } catch (storage::StateFailure const &failure) {
       if (failure.kind() == storage::FailureKind::busy) {
+        unborne_ = before;
         return false;
       }
       throw;
@@ -253,10 +282,13 @@ bool Member::follow_records(Records const &records) {
   }
 }
 
-void Member::tell_joined(Records const &records) {
-  for (auto const &[name, record] : records) {
+void Member::tell_joined() {
+  if (joining_.empty()) {
+    return;
+  }
+  for (auto const &[name, record] : switches_of(cluster_.replica(), options_.host)) {
     auto const [first, end] = joining_.equal_range(record.value("alias", std::string()));
-    if (!name.port.empty() || first == end) {
+    if (first == end) {
       continue;
     }
     auto const unborne = unborne_.find(name);
@@ -295,10 +327,10 @@ void Member::report() {
     return;
   }
   try {
-    auto const records = records_of(cluster_.replica(), options_.host);
+    auto const switches = switches_of(cluster_.replica(), options_.host);
     std::map<std::string, std::string> errors;
     for (auto const &[name, why] : unborne_) {
-      errors[words_of(name, records)] = why;
+      errors[words_of(name, switches)] = why;
     }
     if (!in_force_.troubles.empty()) {
       errors["frames"] = in_force_.troubles;
@@ -343,9 +375,12 @@ void Member::commit(Json const &question, Reply const &reply) {
   }
   Proposal proposal{
       .id = question.at("change").get<std::string>(), .host = options_.host, .operations = nullptr};
+  auto const changes = question.at("rows").get<std::vector<Change>>();
+  auto const ports = cluster_.is_connected() ? ports_of(cluster_.replica(), changes) : RowNames();
   proposal.operations =
-      together({only_for(speaker_), operations_of(question.at("rows").get<std::vector<Change>>()),
-                next_revision(), change_insertion(proposal.id, options_.host, false)});
+      together({only_for(speaker_), operations_of(changes, ports), next_revision(),
+                change_insertion(proposal.id, options_.host, false)});
+  auto const connections = cluster_.connections();
   auto const decision = decide(cluster_, proposal, from_now(kLongestDecision));
   if (decision.verdict == Verdict::unknown) {
     undecided_.push_back(proposal);
@@ -356,8 +391,10 @@ void Member::commit(Json const &question, Reply const &reply) {
   } else {
     reply({{"made", proposal.id}});
   }
-  // Its connection may be another one now.
   if (cluster_.is_connected()) {
+    if (cluster_.connections() != connections) {
+      touched_.add_all();
+    }
     watch();
     sync_soon();
   } else {

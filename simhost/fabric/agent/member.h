@@ -14,8 +14,10 @@
 #include "daemon/troubles.h"
 #include "events/loop.h"
 #include "fabric/agent/decision.h"
-#include "fabric/agent/operations.h"
 #include "fabric/cluster/cluster.h"
+#include "fabric/rows/operations.h"
+#include "fabric/rows/rows.h"
+#include "fabric/rows/touched.h"
 #include "fabric/shared/records.h"
 #include "storage/store.h"
 
@@ -56,8 +58,9 @@ class Member {
 
   void sync_soon(events::Clock::duration wait = {});
   void sync();
-  bool follow_records(Records const &records);
-  void tell_joined(Records const &records);
+  bool take_news();
+  bool follow_touched();
+  void tell_joined();
 
   void report_soon();
   void report();
@@ -81,6 +84,7 @@ class Member {
   std::string trouble_;
   std::optional<events::Clock::time_point> lost_;
   std::vector<Proposal> undecided_;
+  Touched touched_;
   std::map<SharedName, std::string> unborne_;
   std::multimap<std::string, Reply> joining_;  // by the alias of the switch
   std::int64_t revision_ = 0;                  // that is in the state

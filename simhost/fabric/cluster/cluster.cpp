@@ -6,7 +6,9 @@
 #include <fmt/ranges.h>
 
 #include <algorithm>
+#include <iterator>
 #include <utility>
+#include <variant>
 
 namespace simhost::fabric {
 namespace {
@@ -30,12 +32,13 @@ std::optional<ovsdb::Row> row_of(ovsdb::Replica const &replica, std::string cons
   return std::nullopt;
 }
 
-// Whether a client has news of its rows.
-bool has_news(ovsdb::Client &client) {
-  bool news = false;
+std::vector<ovsdb::RowChange> news_of(ovsdb::Client &client) {
+  std::vector<ovsdb::RowChange> news;
   client.receive();
-  while (client.next_event()) {
-    news = true;
+  while (auto event = client.next_event()) {
+    if (auto *const changed = std::get_if<ovsdb::Changed>(&*event)) {
+      std::ranges::move(changed->rows, std::back_inserter(news));
+    }
   }
   return news;
 }
@@ -102,6 +105,7 @@ void Cluster::connect_to(openvswitch::TcpAddress const &server) {
                     this->server(), database_.name, version, database_.version));
   }
   connection_->database.monitor(database_.selected, deadline);
+  ++connections_;
 }
 
 // A database that is none of a cluster is connected to itself, and has no log.
@@ -129,12 +133,12 @@ std::array<int, 2> Cluster::descriptors() const {
   return {connection_->database.fd(), connection_->server.fd()};
 }
 
-bool Cluster::receive() {
+std::vector<ovsdb::RowChange> Cluster::receive() {
   return guarded([&] {
-    if (has_news(connection_->server)) {
+    if (!news_of(connection_->server).empty()) {
       check_server();
     }
-    return has_news(connection_->database);
+    return news_of(connection_->database);
   });
 }
 

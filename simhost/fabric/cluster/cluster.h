@@ -45,13 +45,15 @@ class Cluster {
   /// next one first. Throws Unreachable.
   void connect();
   void disconnect() { connection_.reset(); }
+  /// How often it has connected. Nobody tells of what became of the replica in between.
+  [[nodiscard]] std::uint64_t connections() const { return connections_; }
 
   // Of a connection. These throw Unreachable, and there is none any more then.
 
   /// For poll(2): there is something to receive where one of them is readable.
   [[nodiscard]] std::array<int, 2> descriptors() const;
-  /// Reads what is there. Returns whether the replica is another.
-  bool receive();
+  /// Reads what is there. Returns which rows of the replica have changed since.
+  std::vector<ovsdb::RowChange> receive();
   /// As ovsdb::Client does: throws TransactionRefused, too.
   Json transact(Json const &operations, Deadline deadline);
   [[nodiscard]] ovsdb::Replica const &replica() const { return connection_->database.replica(); }
@@ -74,6 +76,7 @@ class Cluster {
   Database database_;
   std::size_t next_ = 0;  // server to be tried
   std::optional<Connection> connection_;
+  std::uint64_t connections_ = 0;
   std::optional<Json> cluster_;  // its identity
   std::int64_t index_ = 0;       // of the last entry of its log that was seen
 };

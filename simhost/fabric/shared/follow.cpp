@@ -22,9 +22,12 @@ using storage::Shared;
 class Following {
  public:
   Following(storage::ChangingTransaction &transaction, Membership const &membership,
-            Records const &records, std::map<SharedName, std::string> const &unborne)
-      : transaction_(transaction), membership_(membership), records_(records), unborne_(unborne) {
-    for (auto &row : storage::all_shared(transaction)) {
+            News const &news, std::map<SharedName, std::string> const &unborne)
+      : transaction_(transaction),
+        membership_(membership),
+        records_(news.records),
+        unborne_(unborne) {
+    for (auto &row : news.names ? shared_of(*news.names) : storage::all_shared(transaction)) {
       auto name = row.name;
       known_.emplace(std::move(name), std::move(row));
     }
@@ -37,9 +40,11 @@ class Following {
       }
     }
     for (auto const &[name, record] : records_) {
+      if (is_agreed(name, record)) {
+        continue;
+      }
       // Of what stands in the way of a switch its ports need not tell.
-      bool const has_switch = name.port.empty() || find_switch(name);
-      if (has_switch && !is_agreed(name, record)) {
+      if (name.port.empty() || find_switch(name)) {
         apply(name, record);
       }
     }
@@ -47,6 +52,16 @@ class Following {
   }
 
  private:
+  [[nodiscard]] std::vector<Shared> shared_of(std::set<SharedName> const &names) const {
+    std::vector<Shared> all;
+    for (auto const &name : names) {
+      if (auto row = storage::find_shared(transaction_, name)) {
+        all.push_back(std::move(*row));
+      }
+    }
+    return all;
+  }
+
   [[nodiscard]] std::optional<storage::FoundSwitch> find_switch(SharedName const &name) const {
     return storage::find_switch(transaction_, storage::SwitchName::identifier,
                                 name.switch_identifier);
@@ -162,8 +177,8 @@ class Following {
 }  // namespace
 
 bool follow(storage::ChangingTransaction &transaction, Membership const &membership,
-            Records const &records, std::map<SharedName, std::string> const &unborne) {
-  return Following(transaction, membership, records, unborne).run();
+            News const &news, std::map<SharedName, std::string> const &unborne) {
+  return Following(transaction, membership, news, unborne).run();
 }
 
 }  // namespace simhost::fabric

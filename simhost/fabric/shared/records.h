@@ -3,6 +3,8 @@
 
 #include <map>
 #include <nlohmann/json.hpp>
+#include <optional>
+#include <set>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -47,10 +49,17 @@ class Unborne : public std::runtime_error {
   SharedName name_;
 };
 
+/// What a fabric has of the switches that the host belongs to.
+struct News {
+  /// Of the only ones that may have changed, whether there are records of them or not; none: any.
+  std::optional<std::set<SharedName>> names;
+  Records records;
+};
+
 /// Makes what is shared here what the fabric says, but for the rows that are known to be unborne.
-/// `records` are those of the switches that the host belongs to. Returns whether anything became
-/// other; throws Unborne, and the transaction must not be committed then.
+/// Returns whether anything became other; throws Unborne, and the transaction must not be committed
+/// then.
 bool follow(storage::ChangingTransaction &transaction, Membership const &membership,
-            Records const &records, std::map<SharedName, std::string> const &unborne);
+            News const &news, std::map<SharedName, std::string> const &unborne);
 
 }  // namespace simhost::fabric

@@ -46,7 +46,7 @@ void wait_for_news(Cluster &cluster) {
     auto const [one, other] = cluster.descriptors();
     std::array<pollfd, 2> polled{{{one, POLLIN, 0}, {other, POLLIN, 0}}};
     ASSERT_GT(::poll(polled.data(), polled.size(), 20'000), 0);
-  } while (!cluster.receive());
+  } while (cluster.receive().empty());
 }
 
 /// Tries again and again, as a service does.

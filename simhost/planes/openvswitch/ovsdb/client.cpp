@@ -87,8 +87,7 @@ bool Client::is_handled(Json const &message) {
   if (method == "echo") {
     send({{"id", message.value("id", Json())}, {"result", params}, {"error", nullptr}});
   } else if (method == "update2" && params.is_array() && params.size() == 2) {
-    replica_.apply(params[1]);
-    events_.emplace_back(Changed{});
+    events_.emplace_back(Changed{replica_.apply(params[1])});
   } else if ((method == "locked" || method == "stolen") && params.is_array() &&
              params.size() == 1 && params[0].is_string()) {
     auto const name = params[0].get<std::string>();

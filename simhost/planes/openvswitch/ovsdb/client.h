@@ -7,6 +7,7 @@
 #include <optional>
 #include <string>
 #include <variant>
+#include <vector>
 
 #include "planes/openvswitch/ovsdb/json.h"
 #include "planes/openvswitch/ovsdb/replica.h"
@@ -36,7 +37,9 @@ class TransactionRefused : public Refused {
 };
 
 /// The replica is another.
-struct Changed {};
+struct Changed {
+  std::vector<RowChange> rows;
+};
 /// A lock that was waited for is this client's.
 struct LockGained {
   std::string name;

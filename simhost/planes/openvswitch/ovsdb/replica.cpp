@@ -101,7 +101,8 @@ Rows const &Replica::rows(std::string const &table) const {
   return found == tables_.end() ? none : found->second;
 }
 
-void Replica::apply(Json const &updates) {
+std::vector<RowChange> Replica::apply(Json const &updates) {
+  std::vector<RowChange> changes;
   require_object(updates);
   for (auto const &[table, columns] : schema_) {
     if (!updates.contains(table)) {
@@ -109,9 +110,16 @@ void Replica::apply(Json const &updates) {
     }
     require_object(updates[table]);
     for (auto const &[uuid, update] : updates[table].items()) {
-      apply_to(columns, tables_[table], uuid, update);
+      auto &rows = tables_[table];
+      auto const row = rows.find(uuid);
+      auto &change = changes.emplace_back(RowChange{table, uuid, std::nullopt});
+      if (row != rows.end()) {
+        change.before = row->second;
+      }
+      apply_to(columns, rows, uuid, update);
     }
   }
+  return changes;
 }
 
 }  // namespace simhost::ovsdb

@@ -2,7 +2,9 @@
 #pragma once
 
 #include <map>
+#include <optional>
 #include <string>
+#include <vector>
 
 #include "planes/openvswitch/ovsdb/json.h"
 #include "planes/openvswitch/ovsdb/schema.h"
@@ -15,6 +17,13 @@ using Row = std::map<std::string, Json>;
 /// By the text of the row's UUID.
 using Rows = std::map<std::string, Row>;
 
+/// A row that became another one.
+struct RowChange {
+  std::string table;
+  std::string uuid;
+  std::optional<Row> before;  ///< none of one that is new
+};
+
 class Replica {
  public:
   Replica() = default;
@@ -24,8 +33,9 @@ class Replica {
   /// None for a table that is not followed.
   [[nodiscard]] Rows const &rows(std::string const &table) const;
 
-  /// Takes over <table-updates2> of ovsdb-server(7). Throws Malformed, and is of no more use then.
-  void apply(Json const &updates);
+  /// Takes over <table-updates2> of ovsdb-server(7), and returns which rows that changes. Throws
+  /// Malformed, and is of no more use then.
+  std::vector<RowChange> apply(Json const &updates);
 
  private:
   Schema schema_;

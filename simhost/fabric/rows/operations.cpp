@@ -1,19 +1,12 @@
 // Transactions in the notation of RFC 7047.
-#include "fabric/agent/operations.h"
+#include "fabric/rows/operations.h"
 
 #include <chrono>
+#include <string>
 #include <utility>
 
 namespace simhost::fabric {
 namespace {
-
-Json settings_in(ovsdb::Row const &row) {
-  auto settings = Json::object();
-  for (auto const &[name, value] : ovsdb::entries_of(row.at("settings"))) {
-    settings[name.get<std::string>()] = value;
-  }
-  return settings;
-}
 
 Json map_of(Json const &object) {
   std::vector<std::pair<Json, Json>> entries;
@@ -51,7 +44,12 @@ char const *table_of(Change const &change) {
   return is_switch(change) ? "Switch" : "Port";
 }
 
-Json where(Change const &change) {
+// A server finds a row by its UUID at once, and by anything else it looks at all that there are.
+// One that this host has not heard of is still found by its name.
+Json where(Change const &change, RowNames const &ports) {
+  if (auto const found = ports.find(change.name); found != ports.end()) {
+    return conditions({{"_uuid", ovsdb::uuid(found->second)}});
+  }
   return is_switch(change)
              ? conditions({{"id", change.name.switch_identifier}})
              : conditions({{"switch", change.name.switch_identifier}, {"id", change.name.port}});
@@ -65,7 +63,7 @@ Json columns_of(Change const &change, Json const &record) {
   return row;
 }
 
-Json unchanged(Change const &change) {
+Json unchanged(Change const &change, Json const &where) {
   auto row = columns_of(change, change.was);
   auto columns = Json::array();
   for (auto const &[name, value] : row.items()) {
@@ -74,7 +72,7 @@ Json unchanged(Change const &change) {
   return {{"op", "wait"},
           {"timeout", 0},
           {"table", table_of(change)},
-          {"where", where(change)},
+          {"where", where},
           {"columns", columns},
           {"until", "=="},
           {"rows", Json::array({std::move(row)})}};
@@ -92,10 +90,10 @@ Json insertion(Change const &change) {
   return {{"op", "insert"}, {"table", table_of(change)}, {"row", std::move(row)}};
 }
 
-void add_update(Json &operations, Change const &change) {
+void add_update(Json &operations, Change const &change, Json const &where) {
   operations.push_back({{"op", "update"},
                         {"table", table_of(change)},
-                        {"where", where(change)},
+                        {"where", where},
                         {"row", columns_of(change, change.now)}});
   if (!is_switch(change)) {
     return;
@@ -103,8 +101,7 @@ void add_update(Json &operations, Change const &change) {
   for (auto const &host : change.was.at("hosts")) {
     auto const &left = change.now.at("hosts");
     if (std::find(left.begin(), left.end(), host) == left.end()) {
-      operations.push_back(
-          mutation("Switch", where(change), "hosts", "delete", ovsdb::set({host})));
+      operations.push_back(mutation("Switch", where, "hosts", "delete", ovsdb::set({host})));
     }
   }
 }
@@ -117,46 +114,6 @@ std::int64_t seconds_now() {
 
 }  // namespace
 
-ovsdb::Selected selected_columns() {
-  return {{"Fabric", {"revision"}},
-          {"Switch", {"id", "alias", "hosts", "settings"}},
-          {"Port", {"switch", "id", "host", "settings"}},
-          {"Host", {"name", "state", "session"}}};
-}
-
-Records records_of(ovsdb::Replica const &replica, std::string const &host) {
-  Records records;
-  for (auto const &[uuid, row] : replica.rows("Switch")) {
-    auto const hosts = ovsdb::atoms_of(row.at("hosts"));
-    if (std::find(hosts.begin(), hosts.end(), Json(host)) != hosts.end()) {
-      records[{row.at("id"), ""}] = {
-          {"alias", row.at("alias")}, {"hosts", hosts}, {"settings", settings_in(row)}};
-    }
-  }
-  for (auto const &[uuid, row] : replica.rows("Port")) {
-    bool const is_named = !row.at("id").get_ref<std::string const &>().empty();
-    if (is_named && records.contains({row.at("switch"), ""})) {
-      records[{row.at("switch"), row.at("id")}] = {{"host", row.at("host")},
-                                                   {"settings", settings_in(row)}};
-    }
-  }
-  return records;
-}
-
-std::int64_t revision_of(ovsdb::Replica const &replica) {
-  auto const &rows = replica.rows("Fabric");
-  return rows.empty() ? 0 : rows.begin()->second.at("revision").get<std::int64_t>();
-}
-
-std::optional<HostRow> find_host(ovsdb::Replica const &replica, std::string const &name) {
-  for (auto const &[uuid, row] : replica.rows("Host")) {
-    if (row.at("name") == name) {
-      return HostRow{.state = row.at("state"), .session = row.at("session")};
-    }
-  }
-  return std::nullopt;
-}
-
 Json only_for(Speaker const &speaker) {
   return Json::array({{{"op", "wait"},
                        {"timeout", 0},
@@ -167,19 +124,19 @@ Json only_for(Speaker const &speaker) {
                        {"rows", Json::array({{{"session", speaker.session}}})}}});
 }
 
-Json operations_of(std::vector<Change> const &changes) {
+Json operations_of(std::vector<Change> const &changes, RowNames const &ports) {
   auto operations = Json::array();
   for (auto const &change : changes) {
     if (change.was.is_null()) {
       operations.push_back(insertion(change));
       continue;
     }
-    operations.push_back(unchanged(change));
+    auto const rows = where(change, ports);
+    operations.push_back(unchanged(change, rows));
     if (change.now.is_null()) {
-      operations.push_back(
-          {{"op", "delete"}, {"table", table_of(change)}, {"where", where(change)}});
+      operations.push_back({{"op", "delete"}, {"table", table_of(change)}, {"where", rows}});
     } else {
-      add_update(operations, change);
+      add_update(operations, change, rows);
     }
   }
   return operations;

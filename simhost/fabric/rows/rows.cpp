@@ -1,0 +1,96 @@
+// A port belongs to the switch that its row names, and so to a host or not.
+#include "fabric/rows/rows.h"
+
+#include <algorithm>
+#include <iterator>
+#include <set>
+#include <string_view>
+#include <utility>
+
+namespace simhost::fabric {
+namespace {
+
+Json settings_in(ovsdb::Row const &row) {
+  auto settings = Json::object();
+  for (auto const &[name, value] : ovsdb::entries_of(row.at("settings"))) {
+    settings[name.get<std::string>()] = value;
+  }
+  return settings;
+}
+
+}  // namespace
+
+ovsdb::Selected selected_columns() {
+  return {{"Fabric", {"revision"}},
+          {"Switch", {"id", "alias", "hosts", "settings"}},
+          {"Port", {"switch", "id", "host", "settings"}},
+          {"Host", {"name", "state", "session"}}};
+}
+
+Records switches_of(ovsdb::Replica const &replica, std::string const &host) {
+  Records records;
+  for (auto const &[uuid, row] : replica.rows("Switch")) {
+    if (has_host(row, host)) {
+      records[switch_in(row)] = {{"alias", row.at("alias")},
+                                 {"hosts", ovsdb::atoms_of(row.at("hosts"))},
+                                 {"settings", settings_in(row)}};
+    }
+  }
+  return records;
+}
+
+std::int64_t revision_of(ovsdb::Replica const &replica) {
+  auto const &rows = replica.rows("Fabric");
+  return rows.empty() ? 0 : rows.begin()->second.at("revision").get<std::int64_t>();
+}
+
+bool has_host(ovsdb::Row const &row, std::string const &host) {
+  auto const hosts = ovsdb::atoms_of(row.at("hosts"));
+  return std::find(hosts.begin(), hosts.end(), Json(host)) != hosts.end();
+}
+
+SharedName switch_in(ovsdb::Row const &row) {
+  return {.switch_identifier = row.at("id").get<std::string>(), .port = {}};
+}
+
+SharedName port_in(ovsdb::Row const &row) {
+  return {.switch_identifier = row.at("switch").get<std::string>(),
+          .port = row.at("id").get<std::string>()};
+}
+
+void add_port(Records &records, ovsdb::Row const &row, Records const &switches) {
+  auto name = port_in(row);
+  if (!name.port.empty() && switches.contains({name.switch_identifier, ""})) {
+    records[std::move(name)] = {{"host", row.at("host")}, {"settings", settings_in(row)}};
+  }
+}
+
+RowNames ports_of(ovsdb::Replica const &replica, std::vector<Change> const &changes) {
+  std::set<std::string_view> wanted;
+  for (auto const &change : changes) {
+    wanted.insert(change.name.port);
+  }
+  std::set<SharedName> names;
+  std::ranges::transform(changes, std::inserter(names, names.end()), &Change::name);
+  RowNames found;
+  for (auto const &[uuid, row] : replica.rows("Port")) {
+    // Most rows are none of them, and no name is made of those.
+    if (wanted.contains(row.at("id").get_ref<std::string const &>())) {
+      if (auto name = port_in(row); names.contains(name)) {
+        found.emplace(std::move(name), uuid);
+      }
+    }
+  }
+  return found;
+}
+
+std::optional<HostRow> find_host(ovsdb::Replica const &replica, std::string const &name) {
+  for (auto const &[uuid, row] : replica.rows("Host")) {
+    if (row.at("name") == name) {
+      return HostRow{.state = row.at("state"), .session = row.at("session")};
+    }
+  }
+  return std::nullopt;
+}
+
+}  // namespace simhost::fabric
