@@ -54,8 +54,22 @@ void Stream::fail(int error) const {
   throw Disconnected(name_ + ": " + error_words(error));
 }
 
+void Stream::encrypt(std::unique_ptr<Cipher> cipher, Deadline deadline) {
+  cipher_ = std::move(cipher);
+  std::vector<std::uint8_t> plain;
+  cipher_->decrypt({}, plain, unsent_);
+  while (!cipher_->is_agreed()) {
+    wait_to_receive(deadline);
+    receive(plain);
+  }
+}
+
 void Stream::send(std::span<std::uint8_t const> bytes) {
-  unsent_.insert(unsent_.end(), bytes.begin(), bytes.end());
+  if (cipher_) {
+    cipher_->encrypt(bytes, unsent_);
+  } else {
+    unsent_.insert(unsent_.end(), bytes.begin(), bytes.end());
+  }
   flush();
 }
 
@@ -67,12 +81,24 @@ void Stream::flush() {
       return;
     }
     if (count < 0 && errno != EINTR) {
-      fail(errno);
+      auto const error = errno;
+      hear_complaint();
+      fail(error);
     }
     sent_ += static_cast<std::size_t>(std::max<ssize_t>(count, 0));
   }
   unsent_.clear();
   sent_ = 0;
+}
+
+// What the other side said before it closed tells more than that it did.
+void Stream::hear_complaint() {
+  std::array<std::uint8_t, kChunk> chunk{};
+  std::vector<std::uint8_t> unused;
+  ssize_t count = 0;
+  while (cipher_ && (count = ::recv(fd(), chunk.data(), chunk.size(), MSG_DONTWAIT)) > 0) {
+    cipher_->decrypt({chunk.data(), static_cast<std::size_t>(count)}, unused, unused);
+  }
 }
 
 bool Stream::receive(std::vector<std::uint8_t> &to) {
@@ -87,8 +113,15 @@ bool Stream::receive(std::vector<std::uint8_t> &to) {
   if (count == 0) {
     throw Disconnected(name_ + ": the other side closed the connection");
   }
-  to.insert(to.end(), chunk.begin(), chunk.begin() + count);
-  return true;
+  std::span const came(chunk.data(), static_cast<std::size_t>(count));
+  if (!cipher_) {
+    to.insert(to.end(), came.begin(), came.end());
+    return true;
+  }
+  auto const before = to.size();
+  cipher_->decrypt(came, to, unsent_);
+  flush();
+  return to.size() > before;
 }
 
 void Stream::wait_to_receive(Deadline deadline) {

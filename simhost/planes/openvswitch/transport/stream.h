@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
+#include <memory>
 #include <span>
 #include <stdexcept>
 #include <string>
@@ -27,6 +28,23 @@ class TimedOut : public std::runtime_error {
   using runtime_error::runtime_error;
 };
 
+/// What becomes of bytes before they go over a socket, and when they came. Its functions append,
+/// and throw Disconnected.
+class Cipher {
+ public:
+  virtual ~Cipher() = default;
+  Cipher() = default;
+  Cipher(Cipher const &) = delete;
+  Cipher &operator=(Cipher const &) = delete;
+
+  /// Whether the two sides agree on one another, as they must before anything is encrypted.
+  [[nodiscard]] virtual bool is_agreed() const = 0;
+  virtual void encrypt(std::span<std::uint8_t const> plain, std::vector<std::uint8_t> &to) = 0;
+  /// `replies` is what the other side's cipher is to be told. It begins with nothing that came.
+  virtual void decrypt(std::span<std::uint8_t const> came, std::vector<std::uint8_t> &to,
+                       std::vector<std::uint8_t> &replies) = 0;
+};
+
 class Stream {
  public:
   /// To the unix socket at `path`. Throws Disconnected, and TimedOut where nobody accepts.
@@ -42,6 +60,8 @@ class Stream {
 
   // These throw Disconnected.
 
+  /// Returns when the two sides agree; throws TimedOut too. Once, before anything is sent.
+  void encrypt(std::unique_ptr<Cipher> cipher, Deadline deadline);
   /// Sends what the socket takes at once, and keeps the rest.
   void send(std::span<std::uint8_t const> bytes);
   /// Appends what is there. Returns whether that was anything.
@@ -51,10 +71,12 @@ class Stream {
 
  private:
   void flush();
+  void hear_complaint();
   [[noreturn]] void fail(int error) const;
 
   std::string name_;
   events::Descriptor socket_;
+  std::unique_ptr<Cipher> cipher_;  // if there is one
   std::vector<std::uint8_t> unsent_;
   std::size_t sent_ = 0;  // of those
 };
