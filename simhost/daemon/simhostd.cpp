@@ -39,6 +39,7 @@ struct Words {
   std::string openvswitch;
   std::string datapath = "netdev";
   std::string fabric;
+  fabric::Credentials credentials;
   std::string host;
 };
 
@@ -72,27 +73,37 @@ std::filesystem::path socket_of(Words const &words) {
                                               : std::string(kSystemSocket);
 }
 
-constexpr std::string_view kTcp = "tcp:";
-
-// Empty if it is no list of servers.
-std::vector<openvswitch::TcpAddress> servers_in(std::string_view text) {
-  std::vector<openvswitch::TcpAddress> servers;
-  while (!text.empty()) {
-    auto const one = text.substr(0, text.find(','));
-    text.remove_prefix(std::min(one.size() + 1, text.size()));
-    auto const server =
-        one.starts_with(kTcp) ? openvswitch::tcp_address(one.substr(kTcp.size())) : std::nullopt;
-    if (!server) {
-      return {};
-    }
-    servers.push_back(*server);
-  }
-  return servers;
+std::string wrong_fabric(std::string const &text) {
+  return fabric::servers_in(text).empty()
+             ? "must be servers such as ssl:192.0.2.1:6641,ssl:192.0.2.2:6641"
+             : std::string();
 }
 
-std::string wrong_fabric(std::string const &text) {
-  return servers_in(text).empty() ? "must be servers such as tcp:192.0.2.1:6641,tcp:192.0.2.2:6641"
-                                  : std::string();
+// What encryption needs, whole where it is used, and nowhere else.
+void require_credentials(Words const &words) {
+  auto const servers = fabric::servers_in(words.fabric);
+  bool const encrypts = std::ranges::any_of(servers, &fabric::Server::is_encrypted);
+  for (auto const &[option, file] : {std::pair{"--private-key", words.credentials.private_key},
+                                     std::pair{"--certificate", words.credentials.certificate},
+                                     std::pair{"--ca-cert", words.credentials.ca_certificate}}) {
+    if (encrypts && file.empty()) {
+      throw std::runtime_error(fmt::format("--fabric ssl: takes {} FILE", option));
+    }
+    if (!encrypts && !file.empty()) {
+      throw std::runtime_error(fmt::format("{}: --fabric names no server as ssl:", option));
+    }
+  }
+}
+
+fabric::Servers servers_of(Words const &words) {
+  auto const &[key, certificate, ca] = words.credentials;
+  auto const absolute = [](auto const &file) {
+    return file.empty() ? file : std::filesystem::absolute(file);
+  };
+  return {.all = fabric::servers_in(words.fabric),
+          .credentials = {.private_key = absolute(key),
+                          .certificate = absolute(certificate),
+                          .ca_certificate = absolute(ca)}};
 }
 
 void serve(Words const &words) {
@@ -116,7 +127,7 @@ void serve(Words const &words) {
   std::optional<fabric::Agent> agent;
   if (!words.fabric.empty()) {
     agent.emplace(fabric::Options{.state = std::filesystem::absolute(words.state),
-                                  .servers = servers_in(words.fabric),
+                                  .servers = servers_of(words),
                                   .host = words.host},
                   say, [] { kill(getpid(), SIGTERM); });
     daemon.when_settled([&](std::uint64_t change, std::string const &troubles) {
@@ -150,7 +161,7 @@ std::string wrong_openvswitch(std::string const &text) {
 int run(int count, char **given) {
   CLI::App app("Moves the frames of a simulated host through Open vSwitch.", "simhostd");
   // Room for the longest option, from which what is said of it is to be told.
-  constexpr std::size_t kColumn = 40;
+  constexpr std::size_t kColumn = 42;
   app.get_formatter()->column_width(kColumn);
   Words words;
   app.add_option("--state", words.state, "the file that holds the state of the host")->required();
@@ -164,15 +175,25 @@ int run(int count, char **given) {
       ->check(CLI::IsMember({"netdev", "system"}));
   auto *const fabric =
       app.add_option("--fabric", words.fabric,
-                     "tcp:ADDRESS:PORT,... are the servers of the database in which this host "
-                     "shares switches with others")
+                     "ssl:ADDRESS:PORT,... are the servers of the database in which this host "
+                     "shares switches with others; tcp: instead of ssl: encrypts nothing")
           ->check(wrong_fabric);
   app.add_option("--host", words.host, "what the host is called there")->needs(fabric);
+  app.add_option("-p,--private-key", words.credentials.private_key,
+                 "file with the host's key (PEM), for servers of ssl:")
+      ->needs(fabric);
+  app.add_option("-c,--certificate", words.credentials.certificate,
+                 "file with the certificate of that key")
+      ->needs(fabric);
+  app.add_option("-C,--ca-cert", words.credentials.ca_certificate,
+                 "file with the certificates of those who vouch for the servers")
+      ->needs(fabric);
   app.set_version_flag("--version", std::string("simhostd ") + SIMHOST_VERSION);
   CLI11_PARSE(app, count, given);
   if (!words.fabric.empty() && words.host.empty()) {
     throw std::runtime_error("--fabric takes a name for this host: --host NAME");
   }
+  require_credentials(words);
   serve(words);
   return 0;
 }

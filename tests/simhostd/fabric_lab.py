@@ -11,6 +11,7 @@ from typing import Any, Dict, List, Mapping, Optional
 
 from simhost._namespaces import PATIENCE, Namespace, own_user_needed
 
+from certificates import Authority, Certificate
 from frame_lab import Lab, comes_true
 
 SCHEMA = Path(__file__).resolve().parents[2] / "simhost/fabric/fabric.ovsschema"
@@ -19,12 +20,36 @@ _HUB = f"{_NETWORK}.1"
 _EMPTY: Dict[str, Any] = {}
 
 
-class Databases:
-    """A cluster of servers of one database."""
+class Trust:
+    """Who vouches for the servers, and who for the hosts."""
 
-    def __init__(self, namespace: Namespace, folder: Path, servers: int, schema: Path) -> None:
+    def __init__(self, folder: Path) -> None:
+        self.of_servers = Authority(folder, "servers")
+        self.of_hosts = Authority(folder, "hosts")
+        self.server = self.of_servers.issue("database")
+
+    def options_of_server(self, number: int) -> List[str]:
+        listens = f"--remote=pssl:{6640 + number}:{_HUB}"
+        return [listens, *self.server.options(self.of_hosts.certificate)]
+
+    def options_of_host(self, certificate: Certificate) -> List[str]:
+        return certificate.options(self.of_servers.certificate)
+
+
+class Databases:
+    """A cluster of servers of one database, encrypted if it is said whom to trust."""
+
+    def __init__(
+        self,
+        namespace: Namespace,
+        folder: Path,
+        servers: int,
+        schema: Path,
+        trust: Optional[Trust] = None,
+    ) -> None:
         self._namespace = namespace
         self._folder = folder
+        self._trust = trust
         self._running: Dict[int, "subprocess.Popen[str]"] = {}
         self._servers = range(servers)
         for server in self._servers:
@@ -38,12 +63,13 @@ class Databases:
 
     @property
     def addresses(self) -> str:
-        return ",".join(f"tcp:{_HUB}:{6640 + server}" for server in self._servers)
+        protocol = "ssl" if self._trust else "tcp"
+        return ",".join(f"{protocol}:{_HUB}:{6640 + server}" for server in self._servers)
 
     def start(self, server: int) -> None:
         control = self._folder / f"{server}.ctl"
         self._running[server] = self._namespace.start(
-            *("ovsdb-server", self._file(server), f"--remote=ptcp:{6640 + server}:{_HUB}"),
+            *("ovsdb-server", self._file(server), *self._listens(server)),
             *(f"--remote=punix:{self._socket(server)}", f"--unixctl={control}"),
             *("-vconsole:off", "-vsyslog:off", f"--log-file={self._folder}/{server}.log"),
             stderr=subprocess.DEVNULL,
@@ -126,6 +152,11 @@ class Databases:
         for server in list(self._running):
             self.kill(server)
 
+    def _listens(self, server: int) -> List[str]:
+        if self._trust:
+            return self._trust.options_of_server(server)
+        return [f"--remote=ptcp:{6640 + server}:{_HUB}"]
+
     def _file(self, server: int) -> str:
         return str(self._folder / f"{server}.db")
 
@@ -145,6 +176,9 @@ class Host(Lab):
         super().__init__(folder, document, outer=fabric.hub)
         self.name = name
         self.options = ["--fabric", fabric.databases.addresses, "--host", name]
+        if fabric.trust:
+            certificate = fabric.trust.of_hosts.issue(name)
+            self.options += fabric.trust.options_of_host(certificate)
 
     def __enter__(self) -> "Host":
         return self
@@ -175,8 +209,11 @@ class Host(Lab):
 class FabricLab:
     """The databases and hosts; gone when it is left."""
 
-    def __init__(self, folder: Path, servers: int = 1, schema: Path = SCHEMA) -> None:
+    def __init__(
+        self, folder: Path, servers: int = 1, schema: Path = SCHEMA, trust: Optional[Trust] = None
+    ) -> None:
         self.folder = folder
+        self.trust = trust
         self._left = ExitStack()
         self.hub = Namespace(own_user=own_user_needed())
         self._left.callback(self.hub.close)
@@ -185,7 +222,7 @@ class FabricLab:
         run("ip", "link", "set", "bridge", "up")
         run("ip", "address", "add", f"{_HUB}/24", "dev", "bridge")
         (folder / "db").mkdir()
-        self.databases = Databases(self.hub, folder / "db", servers, schema)
+        self.databases = Databases(self.hub, folder / "db", servers, schema, trust)
         self._left.callback(self.databases.close)
         self.hosts: List[Host] = []
 

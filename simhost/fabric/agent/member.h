@@ -28,7 +28,7 @@ using daemon::Say;
 
 struct Options {
   std::filesystem::path state;
-  std::vector<openvswitch::TcpAddress> servers;
+  Servers servers;
   std::string host;  ///< its name in the fabric
 };
 

@@ -45,11 +45,11 @@ std::vector<ovsdb::RowChange> news_of(ovsdb::Client &client) {
 
 }  // namespace
 
-Cluster::Cluster(std::vector<openvswitch::TcpAddress> servers, Database database)
+Cluster::Cluster(Servers servers, Database database)
     : servers_(std::move(servers)), database_(std::move(database)) {}
 
 std::string Cluster::server() const {
-  return "tcp:" + openvswitch::text_of(servers_[next_]);
+  return text_of(servers_.all[next_]);
 }
 
 // Lets go of a server that failed, and goes on with the next one.
@@ -61,7 +61,7 @@ auto Cluster::guarded(Work const &work) {
     throw;
   } catch (std::runtime_error const &error) {
     disconnect();
-    next_ = (next_ + 1) % servers_.size();
+    next_ = (next_ + 1) % servers_.all.size();
     throw Unreachable(error.what());
   }
 }
@@ -69,11 +69,11 @@ auto Cluster::guarded(Work const &work) {
 void Cluster::connect() {
   std::vector<std::string> reasons;
   bool is_other_version = false;
-  for (std::size_t tried = 0; tried < servers_.size(); ++tried) {
+  for (std::size_t tried = 0; tried < servers_.all.size(); ++tried) {
     try {
       guarded([&] {
         try {
-          connect_to(servers_[next_]);
+          connect_to(servers_.all[next_]);
         } catch (WrongVersion const &) {
           is_other_version = true;
           throw;
@@ -81,7 +81,10 @@ void Cluster::connect() {
       });
       return;
     } catch (Unreachable const &why) {
-      reasons.emplace_back(why.what());
+      // A file that will not do is no server's own reason.
+      if (std::ranges::find(reasons, why.what()) == reasons.end()) {
+        reasons.emplace_back(why.what());
+      }
     }
   }
   auto const all = fmt::format("{}", fmt::join(reasons, "; "));
@@ -91,10 +94,10 @@ void Cluster::connect() {
   throw Unreachable(all);
 }
 
-void Cluster::connect_to(openvswitch::TcpAddress const &server) {
+void Cluster::connect_to(Server const &server) {
   auto const deadline = Deadline::clock::now() + kPatience;
-  connection_.emplace(Connection{{openvswitch::connected_to(server, deadline), database_.name},
-                                 {openvswitch::connected_to(server, deadline), "_Server"}});
+  auto const stream = [&] { return connected_to(server, servers_.credentials, deadline); };
+  connection_.emplace(Connection{{stream(), database_.name}, {stream(), "_Server"}});
   connection_->server.monitor({{"Database", {"name", "connected", "cid", "index"}}}, deadline);
   check_server();
   auto const version = connection_->database.version(deadline);

@@ -10,8 +10,8 @@
 #include <string>
 #include <vector>
 
+#include "fabric/cluster/servers.h"
 #include "planes/openvswitch/ovsdb/client.h"
-#include "planes/openvswitch/transport/tcp.h"
 
 namespace simhost::fabric {
 
@@ -38,7 +38,7 @@ class Cluster {
     ovsdb::Selected selected;
   };
 
-  Cluster(std::vector<openvswitch::TcpAddress> servers, Database database);
+  Cluster(Servers servers, Database database);
 
   [[nodiscard]] bool is_connected() const { return connection_.has_value(); }
   /// Looks for a server that has the majority with it and all that was seen before, each once, the
@@ -67,12 +67,12 @@ class Cluster {
     ovsdb::Client server;
   };
 
-  void connect_to(openvswitch::TcpAddress const &server);
+  void connect_to(Server const &server);
   void check_server();
   template <typename Work>
   auto guarded(Work const &work);
 
-  std::vector<openvswitch::TcpAddress> servers_;
+  Servers servers_;
   Database database_;
   std::size_t next_ = 0;  // server to be tried
   std::optional<Connection> connection_;

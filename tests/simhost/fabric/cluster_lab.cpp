@@ -60,12 +60,12 @@ std::string ClusterLab::file(std::size_t server, char const *suffix) const {
   return folder_.file((std::to_string(server) + suffix).c_str()).native();
 }
 
-std::vector<openvswitch::TcpAddress> ClusterLab::addresses() const {
-  std::vector<openvswitch::TcpAddress> all;
+Servers ClusterLab::servers() const {
+  std::vector<Server> all;
   for (std::size_t server = 0; server < servers_.size(); ++server) {
-    all.push_back({.host = host(server), .port = kPort});
+    all.push_back({.address = {.host = host(server), .port = kPort}});
   }
-  return all;
+  return {.all = std::move(all), .credentials = {}};
 }
 
 void ClusterLab::start(std::size_t server) {
@@ -86,7 +86,8 @@ void ClusterLab::kill(std::size_t server) {
 void ClusterLab::wait_for(std::size_t server) {
   // The client itself waits for a second before it tries a second time.
   auto const deadline = openvswitch::soon();
-  while (!listens(addresses()[server]) && openvswitch::Deadline::clock::now() < deadline) {
+  while (!listens(servers().all[server].address) &&
+         openvswitch::Deadline::clock::now() < deadline) {
     loop_.turn(std::chrono::milliseconds(5));
   }
   events::run(

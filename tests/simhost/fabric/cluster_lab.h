@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "events/process.h"
-#include "planes/openvswitch/transport/tcp.h"
+#include "fabric/cluster/servers.h"
 #include "temporary_folder.h"
 
 namespace simhost::fabric {
@@ -17,7 +17,7 @@ class ClusterLab {
   /// Of so many servers, all of which are connected to it.
   ClusterLab(std::filesystem::path const &schema, std::size_t servers);
 
-  [[nodiscard]] std::vector<openvswitch::TcpAddress> addresses() const;
+  [[nodiscard]] Servers servers() const;
   /// What Debian's own client prints.
   std::string transact(std::size_t server, std::string const &transaction);
   void start(std::size_t server);

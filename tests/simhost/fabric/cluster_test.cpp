@@ -73,10 +73,24 @@ TEST(TcpAddresses, AreNumbers) {
   }
 }
 
+TEST(Servers, AreNamedWithHowTheyAreReached) {
+  Server const plain{.address = {"192.0.2.1", 6641}};
+  Server const encrypted{.address = {"2001:db8::1", 1}, .is_encrypted = true};
+  EXPECT_THAT(servers_in("tcp:192.0.2.1:6641,ssl:[2001:db8::1]:1"),
+              testing::ElementsAre(plain, encrypted));
+  EXPECT_EQ(text_of(plain), "tcp:192.0.2.1:6641");
+  EXPECT_EQ(text_of(encrypted), "ssl:[2001:db8::1]:1");
+  for (auto const *const text :
+       {"", "192.0.2.1:6641", "pssl:192.0.2.1:6641", "ssl:", "ssl", "ssl:db-1:6641",
+        "ssl:192.0.2.1:6641,", "ssl:192.0.2.1:6641,,", "tcp:192.0.2.1:1 "}) {
+    EXPECT_THAT(servers_in(text), testing::IsEmpty()) << text;
+  }
+}
+
 TEST(ACluster, IsFoundWhereverSomebodyListens) {
   ClusterLab lab(FABRIC_SCHEMA, 1);
-  auto servers = lab.addresses();
-  servers.insert(servers.begin(), {"127.0.0.1", 1});
+  auto servers = lab.servers();
+  servers.all.insert(servers.all.begin(), {.address = {"127.0.0.1", 1}});
   Cluster cluster(servers, changes());
   cluster.connect();
   cluster.transact(insertion("mine"), soon());
@@ -96,16 +110,16 @@ TEST(ACluster, IsRefusedWithAnotherVersionOrDatabase) {
   auto other = changes();
   other.version = "2.";
   EXPECT_THAT(
-      refusal<WrongVersion>([&] { Cluster(lab.addresses(), other).connect(); }),
+      refusal<WrongVersion>([&] { Cluster(lab.servers(), other).connect(); }),
       HasSubstr("its database 'fabric' has a schema of version 1.0.0, which is none of 2.x"));
   other.name = "other";
-  EXPECT_THAT(refusal<Unreachable>([&] { Cluster(lab.addresses(), other).connect(); }),
+  EXPECT_THAT(refusal<Unreachable>([&] { Cluster(lab.servers(), other).connect(); }),
               HasSubstr("it has no database 'other'"));
 }
 
 TEST(ACluster, GoesOnWhenOneOfThreeIsKilledAndStopsWithoutAMajority) {
   ClusterLab lab(FABRIC_SCHEMA, 3);
-  Cluster cluster(lab.addresses(), changes());
+  Cluster cluster(lab.servers(), changes());
   cluster.connect();
   cluster.transact(insertion("first"), soon());
   // The one that it talks to, which leads as well.
@@ -122,7 +136,7 @@ TEST(ACluster, GoesOnWhenOneOfThreeIsKilledAndStopsWithoutAMajority) {
   cluster.transact(insertion("second"), soon());
   EXPECT_THAT(ids(cluster), testing::UnorderedElementsAre("first", "second"));
 
-  lab.kill(cluster.server().find(lab.addresses()[1].host) == std::string::npos ? 1 : 2);
+  lab.kill(cluster.server().find(lab.servers().all[1].address.host) == std::string::npos ? 1 : 2);
   EXPECT_THROW(
       {
         while (true) {

@@ -102,8 +102,8 @@ std::string text_of(TcpAddress const &address) {
              : fmt::format("[{}]:{}", address.host, address.port);
 }
 
-Stream connected_to(TcpAddress const &address, Deadline deadline) {
-  auto const name = "tcp:" + text_of(address);
+Stream connected_to(TcpAddress const &address, Deadline deadline, std::string_view protocol) {
+  auto const name = fmt::format("{}:{}", protocol, text_of(address));
   auto const found = numeric(address.host, std::to_string(address.port));
   if (!found) {
     fail(name, EADDRNOTAVAIL);

@@ -24,7 +24,8 @@ std::optional<TcpAddress> tcp_address(std::string_view text);
 std::string text_of(TcpAddress const &address);
 
 /// Throws Disconnected, and TimedOut where nobody replies. A server that is silently gone is found
-/// out within seconds, whether or not something was sent to it.
-Stream connected_to(TcpAddress const &address, Deadline deadline);
+/// out within seconds, whether or not something was sent to it. `protocol` is that of its name.
+Stream connected_to(TcpAddress const &address, Deadline deadline,
+                    std::string_view protocol = "tcp");
 
 }  // namespace simhost::openvswitch
