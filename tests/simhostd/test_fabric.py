@@ -2,6 +2,7 @@
 is said."""
 
 import json
+import shutil
 import signal
 import subprocess
 import sys
@@ -126,10 +127,7 @@ def test_one_of_two_changes_of_the_same_thing_wins(two: Tuple[Host, Host]) -> No
     other.daemon.send(signal.SIGSTOP)
     assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
     # It has asked when its daemon hears of both.
-    program = "import _libvswitch as vs; print(vs.VSDVS_SetMTU('lab', 1700))"
-    late = subprocess.Popen(
-        [sys.executable, "-c", program], env=other.environment, stdout=subprocess.PIPE, text=True
-    )
+    late = in_background(other, "vs.VSDVS_SetMTU('lab', 1700)")
     assert comes_true(lambda: is_locked(other))
     other.daemon.send(signal.SIGCONT)
     assert late.communicate(timeout=30)[0] == f"{QEX_BUSY}\n"
@@ -139,6 +137,12 @@ def test_one_of_two_changes_of_the_same_thing_wins(two: Tuple[Host, Host]) -> No
     assert one.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK
     other.set_port("lab", "b", vlan={"id": 9})
     assert comes_true(lambda: mtu(other) == 1800 and of_port(one, "b")["vlan"] == 9)
+
+
+def in_background(host: Host, call: str) -> "subprocess.Popen[str]":
+    """A call in a process of its own, which prints its status."""
+    words = [sys.executable, "-c", f"import _libvswitch as vs; print({call})"]
+    return subprocess.Popen(words, env=host.environment, stdout=subprocess.PIPE, text=True)
 
 
 def is_locked(host: Host) -> bool:
@@ -212,11 +216,56 @@ def test_a_name_is_one_host_s(lab: FabricLab) -> None:
     assert comes_true(lambda: taken in thief.log()), thief.log()
     assert thief.log().count(taken) == 1
     thief.stop()
-    # A second process with the same state is the same host, and the first gives way.
     one.stop()
     one.options = [*one.options[:-1], "other"]
     with pytest.raises(Exception, match="belongs to a fabric as 'one', not as 'other'"):
         one.start()
+
+
+def test_a_host_that_is_there_twice_speaks_once(lab: FabricLab) -> None:
+    one = started(lab.host("one", LAB))
+    one.ctl("share", "lab")
+    assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
+    one.stop()
+    twin = lab.host("two")
+    twin.options = one.options
+    shutil.copy(one.state, twin.state)
+    started(one)
+    assert one.daemon is not None
+    one.daemon.send(signal.SIGSTOP)
+    started(twin)
+    assert twin.call("VSDVS_SetMTU", "lab", 1700) == QEX_OK
+    # What it is asked it does when it goes on, and is the host no longer then.
+    late = in_background(one, "vs.VSDVS_AddDVPort('lab', 'late', 7)")
+    assert comes_true(lambda: is_locked(one))
+    one.daemon.send(signal.SIGCONT)
+    assert late.communicate(timeout=30)[0] == f"{QEX_BUSY}\n"
+    assert comes_true(lambda: gave_way(one)), one.log()
+    for _ in range(2):
+        assert one.call("VSDVS_SetMTU", "lab", 1800) == QEX_BUSY
+        assert twin.call("VSDVS_SetMTU", "lab", 1900) == QEX_OK
+    # What is its own the first goes on with.
+    assert one.call("VSDVS_SetMTU", "own", 1800) == QEX_OK
+    assert "late" not in one.ports("lab") and "late" not in twin.ports("lab")
+    assert sorted(row["id"] for row in lab.databases.rows("Port")) == ["a", "b"]
+    assert len(lab.databases.rows("Host")) == 1
+
+    # Who lost the servers meanwhile does not take the name back, for the other would do the same.
+    assert twin.daemon is not None
+    lab.databases.kill(0)
+    assert comes_true(lambda: "the fabric cannot be used" in twin.log())
+    twin.daemon.send(signal.SIGSTOP)
+    lab.databases.start(0)
+    one.stop()
+    started(one)
+    twin.daemon.send(signal.SIGCONT)
+    assert comes_true(lambda: gave_way(twin)), twin.log()
+    assert twin.call("VSDVS_SetMTU", "lab", 1800) == QEX_BUSY
+    assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
+
+
+def gave_way(host: Host) -> bool:
+    return "another simhostd is this host by now" in host.log()
 
 
 def test_a_fabric_of_another_version_is_none(tmp_path: Path) -> None:

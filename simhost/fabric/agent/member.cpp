@@ -113,7 +113,9 @@ void Member::lose(std::string const &why) {
   if (std::exchange(trouble_, why) != why) {
     say_("the fabric cannot be used: " + why);
   }
-  next_connect_ = loop_.after(kReconnect, [this] { connect(); });
+  if (!gave_way_) {
+    next_connect_ = loop_.after(kReconnect, [this] { connect(); });
+  }
 }
 
 void Member::watch() {
@@ -147,9 +149,6 @@ bool Member::take_news() {
 
 void Member::claim() {
   auto const row = find_host(cluster_.replica(), options_.host);
-  if (gave_way_) {
-    throw std::runtime_error("another simhostd is this host by now");
-  }
   if (!row) {
     insert_host();
   } else if (row->state != membership_.state) {
@@ -157,12 +156,15 @@ void Member::claim() {
         "the name '{}' is taken by another host; the operators of the fabric can remove its row",
         options_.host));
   } else if (row->session != speaker_.session) {
-    gave_way_ = speaks_;
-    if (!gave_way_) {
-      take_over(*row);
+    // Two that take the name from one another would never end.
+    gave_way_ = spoke_;
+    if (gave_way_) {
+      throw std::runtime_error("another simhostd is this host by now");
     }
+    take_over(*row);
   }
-  speaks_ = !gave_way_;
+  speaks_ = true;
+  spoke_ = true;
 }
 
 void Member::insert_host() {

@@ -80,6 +80,7 @@ class Member {
   Cluster cluster_;
   daemon::Server server_;
   bool speaks_ = false;    // for the host, to the fabric
+  bool spoke_ = false;     // at any time
   bool gave_way_ = false;  // to another process
   std::string trouble_;
   std::optional<events::Clock::time_point> lost_;
