@@ -375,12 +375,15 @@ void Member::commit(Json const &question, Reply const &reply) {
     reply({{"refused", "the fabric cannot be used: " + trouble_}});
     return;
   }
+  if (cluster_.is_connected()) {
+    writers_ = writers_in(cluster_.replica());
+  }
   Proposal proposal{
       .id = question.at("change").get<std::string>(), .host = options_.host, .operations = nullptr};
   auto const changes = question.at("rows").get<std::vector<Change>>();
   auto const ports = cluster_.is_connected() ? ports_of(cluster_.replica(), changes) : RowNames();
   proposal.operations =
-      together({only_for(speaker_), operations_of(changes, ports), next_revision(),
+      together({only_for(speaker_), operations_of(changes, ports, writers_), next_revision(),
                 change_insertion(proposal.id, options_.host, false)});
   auto const connections = cluster_.connections();
   auto const decision = decide(cluster_, proposal, from_now(kLongestDecision));

@@ -88,6 +88,7 @@ class Member {
   Touched touched_;
   std::map<SharedName, std::string> unborne_;
   std::multimap<std::string, Reply> joining_;  // by the alias of the switch
+  Writers writers_;                            // as they were seen last
   std::int64_t revision_ = 0;                  // that is in the state
   std::uint64_t change_ = 0;                   // of the state, with which it came
   InForce in_force_;

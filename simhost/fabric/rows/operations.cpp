@@ -2,6 +2,7 @@
 #include "fabric/rows/operations.h"
 
 #include <chrono>
+#include <set>
 #include <string>
 #include <utility>
 
@@ -78,8 +79,18 @@ Json unchanged(Change const &change, Json const &where) {
           {"rows", Json::array({std::move(row)})}};
 }
 
-Json insertion(Change const &change) {
+// Who shares a switch may write it; who else may the operators say.
+Json first_writers(Change const &change) {
+  auto writers = Json::object();
+  for (auto const &host : change.now.at("hosts")) {
+    writers[host.get<std::string>()] = host;
+  }
+  return map_of(writers);
+}
+
+Json insertion(Change const &change, Writers const &writers) {
   auto row = columns_of(change, change.now);
+  row["writers"] = writers.at(change.name.switch_identifier);
   if (is_switch(change)) {
     row["id"] = change.name.switch_identifier;
     row["hosts"] = set_of(change.now.at("hosts"));
@@ -112,6 +123,36 @@ std::int64_t seconds_now() {
       .count();
 }
 
+Json unchanged_writers(std::string const &switch_identifier, Json const &writers) {
+  return {{"op", "wait"},
+          {"timeout", 0},
+          {"table", "Switch"},
+          {"where", conditions({{"id", switch_identifier}})},
+          {"columns", Json::array({"writers"})},
+          {"until", "=="},
+          {"rows", Json::array({{{"writers", writers}}})}};
+}
+
+// Of the switches of new ports, which take them over; adds those of new switches.
+Json unchanged_writers(std::vector<Change> const &changes, Writers &writers) {
+  auto operations = Json::array();
+  std::set<std::string> seen;
+  for (auto const &change : changes) {
+    auto const &identifier = change.name.switch_identifier;
+    if (!change.was.is_null() || !seen.insert(identifier).second) {
+      continue;
+    }
+    // A switch comes before its ports.
+    if (is_switch(change)) {
+      writers[identifier] = first_writers(change);
+    } else {
+      auto const &known = writers.try_emplace(identifier, ovsdb::map({})).first->second;
+      operations.push_back(unchanged_writers(identifier, known));
+    }
+  }
+  return operations;
+}
+
 }  // namespace
 
 Json only_for(Speaker const &speaker) {
@@ -124,11 +165,11 @@ Json only_for(Speaker const &speaker) {
                        {"rows", Json::array({{{"session", speaker.session}}})}}});
 }
 
-Json operations_of(std::vector<Change> const &changes, RowNames const &ports) {
-  auto operations = Json::array();
+Json operations_of(std::vector<Change> const &changes, RowNames const &ports, Writers writers) {
+  auto operations = unchanged_writers(changes, writers);
   for (auto const &change : changes) {
     if (change.was.is_null()) {
-      operations.push_back(insertion(change));
+      operations.push_back(insertion(change, writers));
       continue;
     }
     auto const rows = where(change, ports);

@@ -20,8 +20,9 @@ struct Speaker {
 
 /// Refuses the transaction if somebody else speaks for the host by now.
 Json only_for(Speaker const &speaker);
-/// Each row must be as it was. `ports` has the rows of ports that are known.
-Json operations_of(std::vector<Change> const &changes, RowNames const &ports);
+/// Each row must be as it was. `ports` has the rows of ports that are known, and `writers` are
+/// those of the switches that the fabric has.
+Json operations_of(std::vector<Change> const &changes, RowNames const &ports, Writers writers);
 Json next_revision();
 /// A change that was made, or that is never to be made.
 Json change_insertion(std::string const &id, std::string const &host, bool revoked);

@@ -22,7 +22,7 @@ Json settings_in(ovsdb::Row const &row) {
 
 ovsdb::Selected selected_columns() {
   return {{"Fabric", {"revision"}},
-          {"Switch", {"id", "alias", "hosts", "settings"}},
+          {"Switch", {"id", "alias", "hosts", "settings", "writers"}},
           {"Port", {"switch", "id", "host", "settings"}},
           {"Host", {"name", "state", "session"}}};
 }
@@ -47,6 +47,14 @@ std::int64_t revision_of(ovsdb::Replica const &replica) {
 bool has_host(ovsdb::Row const &row, std::string const &host) {
   auto const hosts = ovsdb::atoms_of(row.at("hosts"));
   return std::find(hosts.begin(), hosts.end(), Json(host)) != hosts.end();
+}
+
+Writers writers_in(ovsdb::Replica const &replica) {
+  Writers writers;
+  for (auto const &[uuid, row] : replica.rows("Switch")) {
+    writers[row.at("id")] = row.at("writers");
+  }
+  return writers;
 }
 
 SharedName switch_in(ovsdb::Row const &row) {

@@ -21,6 +21,10 @@ ovsdb::Selected selected_columns();
 
 /// The switches that the host belongs to.
 Records switches_of(ovsdb::Replica const &replica, std::string const &host);
+/// The column that says which hosts may write a switch and its ports, where they have a role.
+using Writers = std::map<std::string, Json>;
+/// By the identifier of the switch.
+Writers writers_in(ovsdb::Replica const &replica);
 /// How many changes there were.
 std::int64_t revision_of(ovsdb::Replica const &replica);
 
