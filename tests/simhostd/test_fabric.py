@@ -121,6 +121,43 @@ def test_what_replaces_the_state_leaves_what_is_shared(
     assert mtu(other) == 1600
 
 
+# Each with the image in hexadecimal.
+KEPT = """
+import libvswitch as vs
+data, length = vs.Cell("void *"), vs.Cell("int")
+assert vs.DVSQEX_PersistentStateGet(data.pointer, length.pointer) == vs.QEX_OK
+print(bytes(data.read(length.value)).hex())
+"""
+LOADED = """
+import libvswitch as vs
+image = list(bytes.fromhex({image!r}))
+print(int(vs.DVSState_ConfigDeserialize(vs.Cell("qex_uint8", image).pointer, len(image))))
+"""
+
+
+def test_an_old_image_brings_back_what_is_the_host_s_own(
+    lab: FabricLab, two: Tuple[Host, Host]
+) -> None:
+    one, other = two
+    assert one.call("VSDVS_SetMTU", "own", 1600) == QEX_OK
+    image = one.python(KEPT).strip()
+    # What came after: of its own, and of what is shared, by itself and by the other.
+    assert one.call("VSDVS_SetMTU", "own", 1700) == QEX_OK
+    assert one.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK
+    other.set_port("lab", "a", vlan={"id": 9})
+    assert other.call("VSDVS_RemoveDVPort", "lab", "b") == QEX_OK
+    assert comes_true(lambda: "b" not in one.ports("lab"))
+    shared = of_port(one, "a"), lab.databases.rows("Switch"), lab.databases.rows("Port")
+    assert one.python(LOADED.format(image=image)) == f"{QEX_OK}\n"
+    assert one.setting("own", "mtu") == 1600
+    assert mtu(one) == 1800 and sorted(one.ports("lab")) == ["a"]
+    now = of_port(one, "a"), lab.databases.rows("Switch"), lab.databases.rows("Port")
+    assert now == shared
+    # It is a member as before.
+    assert other.call("VSDVS_SetMTU", "lab", 1900) == QEX_OK
+    assert comes_true(lambda: mtu(one) == 1900)
+
+
 def test_one_of_two_changes_of_the_same_thing_wins(two: Tuple[Host, Host]) -> None:
     one, other = two
     assert other.daemon is not None
