@@ -126,13 +126,19 @@ VSMACEntry source_of(std::string const &mac, uint16_t vlan, uint32_t vni) {
   return source;
 }
 
-// The state of a host that belongs to a fabric; empty if it belongs to none.
+// The state of a host that belongs to a fabric, or whose daemon is to make it; empty if it belongs
+// to none.
 std::filesystem::path fabric_state() {
   auto &host = this_host();
   std::scoped_lock const held(host.lock());
   storage::ReadingTransaction transaction(host.state());
   auto const &file = host.state_file();
-  return file && storage::find_membership(transaction) ? file->location() : std::filesystem::path();
+  if (!file) {
+    return {};
+  }
+  bool const belongs = storage::find_membership(transaction) ||
+                       std::filesystem::exists(fabric::agent_socket_of(file->location()));
+  return belongs ? file->location() : std::filesystem::path();
 }
 
 std::string in_force_text(openvswitch::InForce const &found) {

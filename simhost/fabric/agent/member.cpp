@@ -412,9 +412,16 @@ void Member::join(std::string const &alias, Reply const &reply) {
     reply({{"refused", "the fabric cannot be used: " + trouble_}});
     return;
   }
-  auto const results = cluster_.transact(
-      together({only_for(speaker_), fabric::join(alias, options_.host), next_revision()}),
-      from_now(kPatience));
+  Json results;
+  try {
+    results = cluster_.transact(
+        together({only_for(speaker_), fabric::join(alias, options_.host), next_revision()}),
+        from_now(kPatience));
+  } catch (Unreachable const &why) {
+    reply({{"refused", why.what()}});
+    lose(why.what());
+    return;
+  }
   if (results.at(1).at("count") == 0) {
     reply({{"refused", fmt::format("the fabric has no switch '{}'", alias)}});
     return;
