@@ -193,4 +193,22 @@ std::optional<std::size_t> bound_uplink_in(Team const &team, std::string_view na
   return place && is_usable(team, team.uplinks[*place], only_the_link) ? place : std::nullopt;
 }
 
+OwnTeaming own_teaming(storage::Transaction &transaction, storage::Port const &port) {
+  auto const owner = owner_of(port);
+  return {.policy = find_value(transaction, policy, owner),
+          .uplink = find_value(transaction, bound_uplink, owner)};
+}
+
+std::optional<std::size_t> uplink_with(Team const &team, OwnTeaming const &own,
+                                       std::vector<Slot> const &shared,
+                                       storage::PortNumber number) {
+  if (own.uplink) {
+    return bound_uplink_in(team, *own.uplink);
+  }
+  if (own.policy) {
+    return uplink_for(slots_in_use(team, *own.policy), *own.policy, number);
+  }
+  return uplink_for(shared, team.policy, number);
+}
+
 }  // namespace simhost::teaming

@@ -85,4 +85,17 @@ std::optional<std::size_t> uplink_for(std::vector<Slot> const &slots, VSTeamPoli
 /// Likewise for a port that is bound to one uplink, which need only be up.
 SIMHOST_API std::optional<std::size_t> bound_uplink_in(Team const &team, std::string_view name);
 
+/// What a port has of its own instead of its switch's.
+struct OwnTeaming {
+  std::optional<VSTeamPolicy> policy;
+  std::optional<std::string> uplink;  ///< the one that it is bound to
+};
+
+SIMHOST_API OwnTeaming own_teaming(storage::Transaction &transaction, storage::Port const &port);
+/// Where in Team::uplinks the uplink is that a port uses, with whatever it has of its own. `shared`
+/// are the slots that the policy of the team has in use.
+SIMHOST_API std::optional<std::size_t> uplink_with(Team const &team, OwnTeaming const &own,
+                                                   std::vector<Slot> const &shared,
+                                                   storage::PortNumber number);
+
 }  // namespace simhost::teaming

@@ -29,24 +29,6 @@ Kept &keep(std::map<storage::SwitchKey, Kept> &all, storage::SwitchKey key, Kept
   return all.insert_or_assign(key, std::move(kept)).first->second;
 }
 
-OwnTeaming own_teaming(storage::Transaction &transaction, storage::Port const &port) {
-  auto const owner = owner_of(port);
-  return {.policy = find_value(transaction, teaming::policy, owner),
-          .uplink = find_value(transaction, teaming::bound_uplink, owner)};
-}
-
-// Where in Team::uplinks the uplink is that a port uses, in whatever it has of its own.
-std::optional<std::size_t> place_by(Team const &team, OwnTeaming const &own,
-                                    std::vector<Slot> const &shared, storage::PortNumber number) {
-  if (own.uplink) {
-    return teaming::bound_uplink_in(team, *own.uplink);
-  }
-  if (own.policy) {
-    return uplink_for(slots_in_use(team, *own.policy), *own.policy, number);
-  }
-  return uplink_for(shared, team.policy, number);
-}
-
 bool announces(VSTeamPolicy const &policy) {
   return (policy.flags & TEAM_FRP_FLAG_NOTIFY_SWITCH) != 0;
 }
@@ -119,7 +101,7 @@ OwnTeaming const &Teaming::own_of(storage::Transaction &transaction, storage::Po
     static OwnTeaming const nothing;
     return nothing;
   }
-  return ports.own.emplace(port.number, own_teaming(transaction, port)).first->second;
+  return ports.own.emplace(port.number, teaming::own_teaming(transaction, port)).first->second;
 }
 
 Teaming::KeptPorts const &Teaming::all_ports(storage::Transaction &transaction,
@@ -152,7 +134,7 @@ std::string Teaming::uplink_of(storage::Transaction &transaction, storage::Port 
     throw Refused(QEX_ENETUNREACH);
   }
   auto const &own = own_of(transaction, port, ports_of_switch(port.switch_key, generations));
-  auto const place = place_by(kept.team, own, kept.slots, port.number);
+  auto const place = teaming::uplink_with(kept.team, own, kept.slots, port.number);
   if (!place) {
     throw Refused(QEX_ENETDOWN);
   }
@@ -175,8 +157,8 @@ std::uint64_t Teaming::count_announced(KeptTeam const &before, KeptTeam const &a
   for (auto at = ports.own.begin(); at != ports.own.end() && count < most; ++at) {
     auto const &[number, own] = *at;
     bool const counts = announces(own.policy.value_or(shared)) &&
-                        has_moved(place_by(before.team, own, before.slots, number),
-                                  place_by(after.team, own, after.slots, number));
+                        has_moved(teaming::uplink_with(before.team, own, before.slots, number),
+                                  teaming::uplink_with(after.team, own, after.slots, number));
     count += counts ? 1 : 0;
   }
   return count;

@@ -24,14 +24,9 @@
 
 namespace simhost::stored {
 
+using teaming::OwnTeaming;
 using teaming::Slot;
 using teaming::Team;
-
-/// What a port has of its own instead of its switch's.
-struct OwnTeaming {
-  std::optional<VSTeamPolicy> policy;
-  std::optional<std::string> uplink;  ///< the one that it is bound to
-};
 
 /// The teams of a host. What was worked out of the state is kept until something changes there on
 /// which it depends, in this process or in another one.
