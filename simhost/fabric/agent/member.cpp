@@ -10,6 +10,7 @@
 #include <utility>
 
 #include "base/outcomes.h"
+#include "fabric/agent/drills.h"
 #include "fabric/caller/fabric_sharing.h"
 #include "model/plane.h"
 #include "storage/running/frames.h"
@@ -231,6 +232,7 @@ void Member::sync() {
     }
     revision_ = revision_of(cluster_.replica());
     tell_joined();
+    reply_to_drills();
     report_soon();
   } catch (Json::exception const &error) {
     lose(fmt::format("its rows are none of this version: {}", error.what()));
@@ -303,6 +305,19 @@ void Member::tell_joined() {
 }
 
 // What the fabric is told of this host.
+
+void Member::reply_to_drills() {
+  for (auto const &drill : drills_for(cluster_.replica(), options_.host)) {
+    auto const operations = together({only_for(speaker_), reply_to(drill, drilled(store_, drill))});
+    try {
+      cluster_.transact(operations, from_now(kPatience));
+      // The reply may have come with news.
+      sync_soon();
+    } catch (ovsdb::TransactionRefused const &refusal) {
+      say_(fmt::format("a drill gets no reply: {}", refusal.what()));
+    }
+  }
+}
 
 void Member::tell(InForce const &in_force) {
   in_force_ = in_force;

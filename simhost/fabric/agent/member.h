@@ -61,6 +61,7 @@ class Member {
   bool take_news();
   bool follow_touched();
   void tell_joined();
+  void reply_to_drills();
 
   void report_soon();
   void report();

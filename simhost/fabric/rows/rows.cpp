@@ -24,7 +24,8 @@ ovsdb::Selected selected_columns() {
   return {{"Fabric", {"revision"}},
           {"Switch", {"id", "alias", "hosts", "settings", "writers"}},
           {"Port", {"switch", "id", "host", "settings"}},
-          {"Host", {"name", "state", "session"}}};
+          {"Host", {"name", "state", "session"}},
+          {"Drill", {"id", "host", "switch", "reply"}}};
 }
 
 Records switches_of(ovsdb::Replica const &replica, std::string const &host) {
