@@ -5,7 +5,7 @@ build_packages='cmake ninja-build g++ swig python3-dev libsqlitecpp-dev libsqlit
   nlohmann-json3-dev libcli11-dev libssl-dev'
 command_packages='python3-typer python3-rich python3-yaml'
 docs_packages='python3-sphinx python3-myst-parser furo'
-frame_packages='openvswitch-switch iproute2 ethtool iputils-ping'
+frame_packages='openvswitch-switch python3-openvswitch iproute2 ethtool iputils-ping'
 test_packages="libgtest-dev libgmock-dev python3-pytest python3-pytest-xdist python3-hypothesis
   valgrind nodejs uidmap groff-base openssl $frame_packages $command_packages $docs_packages"
 check_packages=git
@@ -13,7 +13,7 @@ fuzz_packages='clang libclang-rt-14-dev'
 lint_packages='clang-format clang-tidy shellcheck black flake8 mypy'
 bench_packages='pybind11-dev python3-cffi cython3'
 package_packages="build-essential debhelper dh-python python3-pip python3-setuptools python3-wheel
-  $command_packages"
+  python3-openvswitch $command_packages"
 package_test_packages='lintian mmdebstrap python3-pytest python3-pytest-xdist'
 
 # need PACKAGE...: installs those that are missing. One query, so that a repeat costs nothing.

@@ -13,7 +13,7 @@ from vswitch.values import Words
 if typing.TYPE_CHECKING:
     from vswitch.host import Host
 
-__all__ = ["KINDS", "awatch", "watch"]
+__all__ = ["KINDS", "Seen", "awatch", "differences", "settings_and_macs", "watch"]
 
 KINDS: Tuple[str, ...] = ("switch", "port", "uplink", "link", "carrier", "setting", "mac")
 """What an event may be about: something that comes or goes, a link, the uplink that carries a port,
@@ -90,7 +90,7 @@ class _Watching:
         now, at = seen(self._host, self._kinds), time.time()
         events = [
             Event(at, kind, path, before, after)
-            for path, kind, before, after in _differences(self._before, now)
+            for path, kind, before, after in differences(self._before, now)
         ]
         self._before = now
         return events
@@ -105,7 +105,7 @@ class _Watching:
         return max(until - now, 0)
 
 
-def _differences(before: Seen, now: Seen) -> Iterator[Tuple[str, str, Words, Words]]:
+def differences(before: Seen, now: Seen) -> Iterator[Tuple[str, str, Words, Words]]:
     """What goes first, then what comes or changes, in the order of the host."""
     for (kind, path), value in before.items():
         if (kind, path) not in now:
@@ -137,18 +137,18 @@ def _seen_of_switch(switch: Dict[str, Words]) -> Seen:
     alias = switch["alias"]
     found: Seen = {("switch", alias): {"alias": alias, "id": switch["id"]}}
     found["setting", f"{alias}/running"] = switch["running"]
-    found.update(_settings_and_macs(alias, switch, _table.SWITCH))
+    found.update(settings_and_macs(alias, switch, _table.SWITCH))
     for port in switch["uplink_ports"]:
-        found.update(_settings_and_macs(f"{alias}/{port['id']}", port, _table.UPLINK_PORT))
+        found.update(settings_and_macs(f"{alias}/{port['id']}", port, _table.UPLINK_PORT))
     for port in switch["ports"]:
         path = f"{alias}/{port['id']}"
         found["port", path] = {"id": port["id"]}
         found["carrier", f"{path}/carrier"] = port["observed"].get("uplink")
-        found.update(_settings_and_macs(path, port, _table.PORT))
+        found.update(settings_and_macs(path, port, _table.PORT))
     return found
 
 
-def _settings_and_macs(
+def settings_and_macs(
     path: str, described: Dict[str, Words], known: Dict[str, _table.Property]
 ) -> Seen:
     found: Seen = {}

@@ -1,0 +1,86 @@
+"""Hosts are asked what would carry their ports if an uplink failed.
+
+A row of the database is the question to one host, which writes its reply into it. Nothing is taken
+down.
+"""
+
+import json
+import time
+import uuid
+from dataclasses import dataclass
+from typing import Dict, List, Mapping, Optional, Sequence
+
+from libvswitch.errors import Busy, HostError
+from vswitch.fabric._cluster import Cluster
+from vswitch.fabric._errors import TransactionRefused, Unreachable
+from vswitch.fabric._notation import delete, insert, where
+
+__all__ = ["Failover", "Replies", "drill"]
+
+_KEPT_SECONDS = 3600
+_LAST_WORDS = 2.0
+
+
+@dataclass(frozen=True)
+class Failover:
+    """A port of a host that an uplink carries, and what would carry it without that one."""
+
+    host: str
+    uplink: str
+    port: str
+    meanwhile: Optional[str]
+
+
+Replies = Mapping[str, Optional[Sequence[Failover]]]
+"""By the names of hosts; None of one that did not reply."""
+
+
+def drill(cluster: Cluster, switch: str, hosts: Sequence[str], deadline: float) -> Replies:
+    """Asks hosts about a switch, by its identifier."""
+    asked = {uuid.uuid4().hex: host for host in hosts}
+    now = int(time.time())
+    # Whoever asked and was killed has left its rows.
+    old = delete("Drill", [("time", "<", now - _KEPT_SECONDS)])
+    rows = [
+        insert("Drill", id=id_, host=host, switch=switch, time=now) for id_, host in asked.items()
+    ]
+    cluster.connect(deadline)
+    try:
+        cluster.transact([old, *rows], deadline)
+    except TransactionRefused as refused:
+        raise Busy(refused.words()) from None
+    try:
+        while len(_replied(cluster, asked)) < len(asked) and time.monotonic() < deadline:
+            cluster.follow(deadline)
+        found = _replied(cluster, asked)
+        return {
+            host: _failovers(host, found[id_]) if id_ in found else None
+            for id_, host in asked.items()
+        }
+    finally:
+        _withdraw(cluster, asked)
+
+
+def _replied(cluster: Cluster, asked: Mapping[str, str]) -> Dict[str, str]:
+    """The replies that there are, by their questions."""
+    rows = cluster.rows["Drill"].values()
+    return {row["id"]: row["reply"] for row in rows if row["id"] in asked and row["reply"]}
+
+
+def _failovers(host: str, reply: str) -> List[Failover]:
+    said = json.loads(reply)
+    if "refused" in said:
+        raise HostError(f"{host}: {said['refused']}")
+    return [
+        Failover(host, one["uplink"], one["port"], one["meanwhile"]) for one in said["failovers"]
+    ]
+
+
+def _withdraw(cluster: Cluster, asked: Mapping[str, str]) -> None:
+    if cluster.is_connected:
+        try:
+            gone = [delete("Drill", where(id=id_)) for id_ in asked]
+            cluster.transact(gone, time.monotonic() + _LAST_WORDS)
+        except (TransactionRefused, Unreachable):
+            # Whoever drills next removes what is old.
+            pass

@@ -1,0 +1,121 @@
+"""A connection to one server of a database, over Open vSwitch's module for Python."""
+
+import errno
+import os
+import time
+from typing import Any, Dict, List, NamedTuple, Optional, Sequence
+
+import ovs.jsonrpc
+import ovs.poller
+import ovs.stream
+
+from vswitch.fabric._errors import TransactionRefused, Unreachable
+from vswitch.fabric._notation import Operation
+
+__all__ = ["News", "Server", "Tls", "use"]
+
+
+class Tls(NamedTuple):
+    """Files in PEM."""
+
+    private_key: str
+    certificate: str
+    ca_cert: str
+
+
+def use(tls: Tls) -> None:
+    """From now on this process is known by that certificate."""
+    stream = ovs.stream.Stream
+    stream.ssl_set_private_key_file(tls.private_key)
+    stream.ssl_set_certificate_file(tls.certificate)
+    stream.ssl_set_ca_cert_file(tls.ca_cert)
+
+
+class News(NamedTuple):
+    """What became of rows: which monitor tells it, and what each was and is by its table."""
+
+    monitor: str
+    tables: Dict[str, Dict[str, Any]]
+
+
+class Server:
+    """One that accepted a connection. What breaks it raises Unreachable."""
+
+    def __init__(self, address: str, deadline: float) -> None:
+        self.address = address
+        self._news: List[News] = []
+        left = max(int(1000 * (deadline - time.monotonic())), 0)
+        try:
+            error, stream = ovs.stream.Stream.open_block(ovs.stream.Stream.open(address), left)
+        except (OSError, ValueError) as why:
+            # A file that is none of a key, say.
+            raise Unreachable(f"{address}: {why}") from None
+        if error:
+            raise Unreachable(f"{address}: {_words(error)}")
+        self._rpc = ovs.jsonrpc.Connection(stream)
+
+    def close(self) -> None:
+        self._rpc.close()
+
+    def request(self, method: str, params: Sequence[Any], deadline: float) -> Any:
+        asked = ovs.jsonrpc.Message.create_request(method, params)
+        self._check(self._rpc.send(asked))
+        while True:
+            reply = self._next(deadline)
+            if reply is None:
+                raise Unreachable(f"{self.address}: it does not reply")
+            if reply.id == asked.id:
+                if reply.error is not None:
+                    raise Unreachable(f"{self.address}: {reply.error}")
+                return reply.result
+
+    def transact(self, database: str, operations: Sequence[Operation], deadline: float) -> Any:
+        """The results of the operations; raises TransactionRefused if one failed."""
+        results = self.request("transact", [database, *operations], deadline)
+        for result in results:
+            if result and "error" in result:
+                raise TransactionRefused(result["error"], result.get("details") or "")
+        return results
+
+    def news(self, deadline: float) -> Optional[News]:
+        """What comes next of what is monitored; None if that is nothing until then."""
+        while not self._news:
+            if self._next(deadline) is None:
+                return None
+        return self._news.pop(0)
+
+    def _next(self, deadline: float) -> Any:
+        """The next message; an update becomes news, too."""
+        while True:
+            self._rpc.run()
+            error, message = self._rpc.recv()
+            if message is not None:
+                self._take(message)
+                return message
+            if error != errno.EAGAIN:
+                self._check(error)
+            left = deadline - time.monotonic()
+            if left <= 0:
+                return None
+            poller = ovs.poller.Poller()
+            self._rpc.wait(poller)
+            self._rpc.recv_wait(poller)
+            poller.timer_wait(int(1000 * left) + 1)
+            poller.block()
+
+    def _take(self, message: Any) -> None:
+        if message.type == message.T_REQUEST and message.method == "echo":
+            self._rpc.send(ovs.jsonrpc.Message.create_reply(message.params, message.id))
+        elif message.type == message.T_NOTIFY and message.method == "update":
+            self._news.append(News(*message.params))
+
+    def _check(self, error: int) -> None:
+        if error:
+            # With TLS 1.3 a server says only after the agreement whom it will not have.
+            is_shy = self.address.startswith("ssl:") and not self._rpc.get_received_bytes()
+            more = ", as one does that does not take this certificate" if is_shy else ""
+            raise Unreachable(f"{self.address}: {_words(error)}{more}")
+
+
+def _words(error: int) -> str:
+    return "it hung up" if error == ovs.jsonrpc.EOF else os.strerror(abs(error))
