@@ -94,7 +94,7 @@ lint_changed() {
 # The selected Python tests; ./dev test --help says why not all can be run in one process.
 python_tests() {
   export BUILD_DIR="$root/$folder" PYTHONPATH="$root/$folder/python:$root/$folder/tests/python"
-  for group in docs classes vswitch recordings command contract others; do
+  for group in docs classes vswitch recordings command fabric contract others; do
     # shellcheck disable=SC2046 # none of our file names has a space
     set -- $(sed -n 's/^python //p' "$selected" | of_group "$group" || :)
     [ $# -eq 0 ] || case $group in

@@ -21,7 +21,7 @@ pytest() {
 }
 
 # Folders of tests/ that are suites of their own; ./dev test --help says why.
-apart='contract classes vswitch recordings command docs fuzz packages'
+apart='contract classes vswitch recordings command fabric docs fuzz packages'
 
 # not_apart: of the given tests, those of all other folders.
 not_apart() {

@@ -28,16 +28,17 @@
 # and the build folder through BUILD_DIR. Those of tests/contract run in a process of their own,
 # where LD_LIBRARY_PATH puts the recording host in place of the simulated one; so do those of
 # tests/classes, tests/vswitch and tests/recordings, for once the classes are loaded the flat functions
-# return instances of them. Those of tests/command run the command, which is plain Python, too: the plain
-# interpreter stands for all. By hand:
+# return instances of them. Those of tests/command and tests/fabric run the command, which is plain
+# Python, too: the plain interpreter stands for all. By hand:
 #   export BUILD_DIR=$PWD/build PYTHONPATH=$PWD/build/python:$PWD/build/tests/python
 #   /usr/bin/python3 -m pytest tests --ignore=tests/contract --ignore=tests/classes \
-#     --ignore=tests/vswitch --ignore=tests/recordings --ignore=tests/command --ignore=tests/fuzz \
-#     --ignore=tests/docs --ignore=tests/packages
+#     --ignore=tests/vswitch --ignore=tests/recordings --ignore=tests/command \
+#     --ignore=tests/fabric --ignore=tests/docs --ignore=tests/fuzz --ignore=tests/packages
 #   /usr/bin/python3 -m pytest tests/classes
 #   /usr/bin/python3 -m pytest tests/vswitch
 #   /usr/bin/python3 -m pytest tests/recordings
 #   /usr/bin/python3 -m pytest tests/command
+#   /usr/bin/python3 -m pytest tests/fabric
 #   /usr/bin/python3 -m pytest tests/docs
 #   LD_LIBRARY_PATH=$BUILD_DIR/tests/recording_host /usr/bin/python3 -m pytest tests/contract
 cmd_test() {
@@ -116,10 +117,11 @@ cmd_test() {
   # What follows is for the plain interpreter: fuzzers embed it, peers bind it, and the pages are
   # the same whatever the module is built for.
   if [ "$folder" != build ]; then
-    not_for_this_build "lint, no fast paths, contract recorded, command, docs, fuzzers, bench"
+    not_for_this_build "lint, no fast paths, contract recorded, command, fabric, docs, fuzzers, bench"
   else
     test_no_fast_paths "$@"
     pytest "Command tests" command.xml '' tests/command "$@"
+    [ -z "$frames" ] || pytest "Fabric tests" fabric.xml '' tests/fabric "$@"
     pytest "Docs tests" docs.xml '' tests/docs "$@"
     [ -n "$expression" ] || {
       test_recorded
@@ -152,7 +154,7 @@ leave_out_tests() {
 leave_out_frames() {
   cxx_left_out='^TheNetworkDevices\.|^WhatASwitchLeavesBehind\.|^AProcessWithManySockets\.'
   deselected="$deselected --deselect tests/simhostd"
-  summarize "Left out by --no-frames: tests/simhostd, TheNetworkDevices"
+  summarize "Left out by --no-frames: tests/simhostd, tests/fabric, C++ tests with networks"
 }
 
 may_make_namespaces() {

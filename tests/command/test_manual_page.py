@@ -12,6 +12,7 @@ import pytest
 
 from vswitch import _table
 from vswitch.command import assignments, meeting
+from vswitch.command.fabric.program import group as fabric_group
 from vswitch.command.program import group
 
 ROOT = Path(__file__).resolve().parents[2]
@@ -19,12 +20,21 @@ PACKAGING = ROOT / "packaging"
 GUIDE = ROOT / "docs" / "guides" / "command.md"
 
 
+def made(name: str, program: str) -> str:
+    """A page, in the words of groff."""
+    maker, template = PACKAGING / "make_manual_page.py", PACKAGING / "manual" / f"{name}.1.in"
+    command = ["/usr/bin/python3", "-B", str(maker), str(template), f"{program}:group"]
+    return subprocess.run(command, check=True, stdout=subprocess.PIPE, encoding="utf-8").stdout
+
+
 @pytest.fixture(scope="module")
 def page() -> str:
-    """The page, in the words of groff."""
-    maker, template = PACKAGING / "make_manual_page.py", PACKAGING / "manual" / "vswitch.1.in"
-    command = ["/usr/bin/python3", "-B", str(maker), str(template), "vswitch.command.program:group"]
-    return subprocess.run(command, check=True, stdout=subprocess.PIPE, encoding="utf-8").stdout
+    return made("vswitch", "vswitch.command.program")
+
+
+@pytest.fixture(scope="module")
+def fabric_page() -> str:
+    return made("vswitch-fabric", "vswitch.command.fabric.program")
 
 
 def plain(page: str) -> str:
@@ -43,14 +53,15 @@ def terms(page: str) -> List[str]:
     return re.findall(r"^\.TP\n\\fB(.*)\\fR$", page, re.MULTILINE)
 
 
-def missing(page: str) -> List[str]:
+def missing(page: str, commands: click.Group) -> List[str]:
     """Commands of the program, their options and arguments that are not where they belong."""
     found = []
-    for name, command in group().commands.items():
-        if f".SS vswitch {name} " not in page:
+    for name, command in commands.commands.items():
+        title = f"{commands.name} {name}"
+        if f".SS {title} " not in page:
             found.append(name)
             continue
-        words = {word for term in terms(section(page, f"vswitch {name}")) for word in term.split()}
+        words = {word for term in terms(section(page, title)) for word in term.split()}
         for parameter in command.params:
             is_option = isinstance(parameter, click.Option)
             asked = parameter.opts if is_option else [str(parameter.metavar)]
@@ -59,12 +70,12 @@ def missing(page: str) -> List[str]:
 
 
 def test_every_command_is_there_with_its_options(page: str) -> None:
-    assert missing(plain(page)) == []
+    assert missing(plain(page), group()) == []
 
 
 def test_what_is_not_there_would_be_noticed(page: str) -> None:
     less = plain(page).replace("\\fB--every S\\fR", "", 1).replace(".SS vswitch lag ", ".SS ")
-    assert missing(less) == ["stats --every", "lag"]
+    assert missing(less, group()) == ["stats --every", "lag"]
 
 
 def test_it_says_which_options_all_commands_take(page: str) -> None:
@@ -129,3 +140,24 @@ def test_the_program_takes_its_examples(page: str) -> None:
             place, settings = context.params["place"], context.params["settings"]
             known = _table.PORT if "/" in place else _table.SWITCH
             assert assignments.read(known, settings, lambda setting: setting.default)
+
+
+def test_the_page_of_fabrics_says_all_of_them(fabric_page: str) -> None:
+    said, commands = plain(fabric_page), fabric_group()
+    assert isinstance(commands, click.Group)
+    assert missing(said, commands) == []
+    assert complaints(fabric_page) == ""
+    assert list(statuses(said)) == ["0", "1", "2", "3"]
+    assert {one.split()[0] for one in terms(section(said, "OPTIONS"))} == {
+        *("--fabric", "-p,", "-c,", "-C,")
+    }
+
+
+def test_the_program_takes_its_examples_of_fabrics(fabric_page: str) -> None:
+    examples = re.findall(r"^vswitch (.*)$", section(plain(fabric_page), "EXAMPLES"), re.MULTILINE)
+    assert len(examples) == 5
+    for example in examples:
+        context = fabric_group().make_context("vswitch", shlex.split(example))
+        assert isinstance(context.command, click.Group) and context.params["fabric"]
+        name, *words = context.protected_args + context.args
+        context.command.commands[name].make_context(name, words, context)

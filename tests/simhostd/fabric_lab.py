@@ -66,6 +66,11 @@ class Databases:
         protocol = "ssl" if self._trust else "tcp"
         return ",".join(f"{protocol}:{_HUB}:{6640 + server}" for server in self._servers)
 
+    @property
+    def local_addresses(self) -> str:
+        """For programs that are in no namespace."""
+        return ",".join(f"unix:{self._socket(server)}" for server in self._servers)
+
     def start(self, server: int) -> None:
         control = self._folder / f"{server}.ctl"
         self._running[server] = self._namespace.start(

@@ -1,6 +1,6 @@
 """How people call switches and ports on a command line: SWITCH, or SWITCH/PORT."""
 
-from typing import Optional, Tuple, Union
+from typing import Container, Optional, Tuple, Union
 
 import click
 
@@ -8,7 +8,7 @@ from vswitch.host import Host
 from vswitch.port import Port, UplinkPort
 from vswitch.switch import Switch
 
-__all__ = ["find", "find_port", "split"]
+__all__ = ["find", "find_port", "split", "split_by"]
 
 
 def split(host: Host, place: str) -> Tuple[str, Optional[str]]:
@@ -17,8 +17,13 @@ def split(host: Host, place: str) -> Tuple[str, Optional[str]]:
     An alias may have a slash in it: the longest one that the host has counts. After a slash there
     is a port: a script that has no name for it does not mean the whole switch.
     """
+    return split_by(host.switches, place)
+
+
+def split_by(aliases: Container[str], place: str) -> Tuple[str, Optional[str]]:
+    """Likewise, by the aliases that there are."""
     parts = place.split("/")
-    there = (end for end in range(len(parts), 0, -1) if "/".join(parts[:end]) in host.switches)
+    there = (end for end in range(len(parts), 0, -1) if "/".join(parts[:end]) in aliases)
     end = next(there, 1)
     return "/".join(parts[:end]), "/".join(parts[end:]) if end < len(parts) else None
 

@@ -27,7 +27,7 @@ from vswitch.command.session import Command, Group, TextCommand
 from vswitch.exits import CHANGED, REFUSED, exits
 from vswitch.words import DocumentError, printable
 
-__all__ = ["group", "main"]
+__all__ = ["NAME", "STATUSES", "ends", "group", "main"]
 
 NAME = "vswitch"
 _USAGE = 2
@@ -69,22 +69,27 @@ STATUSES = {
     _USAGE: "the command line is wrong, and nothing was changed",
     CHANGED: "somebody must look: something is left changed, or nobody knows",
 }
-# Lines that are not to be filled follow \b.
-_ENDS = "\n".join(["\b", "Exit status:", *(f"  {n}  {words}" for n, words in STATUSES.items())])
+
+
+def ends(statuses: Dict[int, str]) -> str:
+    """The end of a help text. Lines that are not to be filled follow \\b."""
+    return "\n".join(["\b", "Exit status:", *(f"  {n}  {said}" for n, said in statuses.items())])
 
 
 def about() -> None:
     """Look at the virtual switches of this host, and change them.
 
     A switch is called by its alias, a port SWITCH/PORT. Every command takes --real to refuse a
-    simulated host, and all but draw, record, play and completion take --json for programs.
+    simulated host, and all but draw, record, play and completion take --json for programs. With
+    --fabric before the command it is about the switches that many hosts share: vswitch --fabric
+    SERVERS --help.
     """
 
 
 def group() -> click.Group:
     """All commands."""
     app = typer.Typer(name=NAME, add_completion=False, context_settings=_OPTIONS_FOR_ALL)
-    app.callback(cls=Group, no_args_is_help=True, epilog=_ENDS)(about)
+    app.callback(cls=Group, no_args_is_help=True, epilog=ends(STATUSES))(about)
     for name, function in COMMANDS.items():
         app.command(name, cls=TextCommand if name in _TEXTS else Command)(function)
     made = typer.main.get_command(app)
@@ -92,8 +97,8 @@ def group() -> click.Group:
     return made
 
 
-def main(words: List[str]) -> None:
-    """Runs the program, and ends it."""
+def main(words: List[str], make: Callable[[], click.Group] = group) -> None:
+    """Runs the commands that `make` makes, and ends the program."""
     for number in _SIGNALS:
         # nohup and shells have a program begin with some that it is to ignore.
         if signal.getsignal(number) is not signal.SIG_IGN:
@@ -104,7 +109,7 @@ def main(words: List[str]) -> None:
                 # What an encoding has no bytes for is told all the same.
                 stream.reconfigure(errors="backslashreplace")
         try:
-            _run(words)
+            _run(words, make())
         except (HostError, DocumentError, OSError):
             raise
         except Exception as error:
@@ -114,12 +119,11 @@ def main(words: List[str]) -> None:
             raise SystemExit(CHANGED) from None
 
 
-def _run(words: List[str]) -> None:
-    commands = group()
+def _run(words: List[str], commands: click.Group) -> None:
     if completing.is_asked(commands, NAME):
         return
     try:
-        with commands.make_context(NAME, words) as context:
+        with commands.make_context(commands.name, words) as context:
             context.command.invoke(context)
     except click.exceptions.Exit as end:
         raise SystemExit(end.exit_code) from None

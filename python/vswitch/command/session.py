@@ -10,7 +10,16 @@ from typer.core import TyperCommand, TyperGroup, TyperOption
 from vswitch.host import Host
 from vswitch.words import DocumentError
 
-__all__ = ["Command", "Group", "TextCommand", "from_words", "host", "is_json", "is_real"]
+__all__ = [
+    "Command",
+    "Group",
+    "HostlessCommand",
+    "TextCommand",
+    "from_words",
+    "host",
+    "is_json",
+    "is_real",
+]
 
 
 class _Session:
@@ -61,16 +70,18 @@ def _remember(name: str) -> Callable[[click.Context, click.Parameter, bool], Non
     return callback
 
 
-class TextCommand(TyperCommand):
+class _Plain(TyperCommand):
+    def format_help(self, context: click.Context, formatter: click.HelpFormatter) -> None:
+        """The same text on a terminal, in a pipe and on the manual page."""
+        click.Command.format_help(self, context, formatter)
+
+
+class TextCommand(_Plain):
     """A command that writes what is neither for people alone nor JSON."""
 
     def __init__(self, *arguments: Any, **more: Any) -> None:
         super().__init__(*arguments, **more)
         self.params.append(_flag("--real", "Refuse a simulated host.", _remember("real")))
-
-    def format_help(self, context: click.Context, formatter: click.HelpFormatter) -> None:
-        """The same text on a terminal, in a pipe and on the manual page."""
-        click.Command.format_help(self, context, formatter)
 
 
 class Command(TextCommand):
@@ -78,7 +89,15 @@ class Command(TextCommand):
 
     def __init__(self, *arguments: Any, **more: Any) -> None:
         super().__init__(*arguments, **more)
-        self.params.insert(-1, _flag("--json", "Write JSON, for programs.", _remember("json")))
+        self.params.insert(-1, _json_flag())
+
+
+class HostlessCommand(_Plain):
+    """Likewise, of a command that asks no host."""
+
+    def __init__(self, *arguments: Any, **more: Any) -> None:
+        super().__init__(*arguments, **more)
+        self.params.append(_json_flag())
 
 
 class Group(TyperGroup):
@@ -89,6 +108,10 @@ class Group(TyperGroup):
 
     def format_help(self, context: click.Context, formatter: click.HelpFormatter) -> None:
         click.Command.format_help(self, context, formatter)
+
+
+def _json_flag() -> TyperOption:
+    return _flag("--json", "Write JSON, for programs.", _remember("json"))
 
 
 def _flag(name: str, words: str, callback: Callable[..., Any]) -> TyperOption:

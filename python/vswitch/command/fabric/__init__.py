@@ -1,0 +1,1 @@
+"""The commands of `vswitch --fabric`: the switches that many hosts share, for people."""

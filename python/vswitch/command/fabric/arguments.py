@@ -1,0 +1,63 @@
+"""The arguments that several of these commands have, with the names that the fabric has now."""
+
+from typing import Callable, Iterable, List
+
+import click
+import typer
+
+from libvswitch.errors import HostError
+from vswitch.command.fabric.connection import connected
+from vswitch.fabric import View
+from vswitch.fabric._watching import KINDS
+
+__all__ = ["HOST", "PLACE", "SWITCH", "kinds"]
+
+
+def _named(context: click.Context, begun: str, names: Callable[[View], Iterable[str]]) -> List[str]:
+    """A shell asks: where no fabric tells, there are no names."""
+    try:
+        with connected(context) as fabric:
+            return [one for one in names(fabric.view()) if one.startswith(begun)]
+    except (HostError, OSError, click.UsageError):
+        return []
+
+
+def _places(view: View, begun: str) -> Iterable[str]:
+    """Switches, and the ports of one that there is no doubt about."""
+    aliases = [one for one in view.switches if one.startswith(begun)]
+    of = (
+        aliases
+        if len(aliases) == 1
+        else [one for one in view.switches if begun.startswith(f"{one}/")]
+    )
+    return [*aliases, *(f"{one}/{port}" for one in of for port in view.switches[one].ports)]
+
+
+def _complete_places(context: click.Context, incomplete: str) -> List[str]:
+    return _named(context, incomplete, lambda view: _places(view, incomplete))
+
+
+def _complete_switches(context: click.Context, incomplete: str) -> List[str]:
+    return _named(context, incomplete, lambda view: view.switches)
+
+
+def _complete_hosts(context: click.Context, incomplete: str) -> List[str]:
+    return _named(context, incomplete, lambda view: view.hosts)
+
+
+def kinds(incomplete: str) -> List[str]:
+    return [one for one in KINDS if one.startswith(incomplete)]
+
+
+PLACE = typer.Argument(
+    ...,
+    metavar="SWITCH[/PORT]",
+    help="A switch, or a port of it.",
+    autocompletion=_complete_places,
+)
+SWITCH = typer.Argument(
+    ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=_complete_switches
+)
+HOST = typer.Argument(
+    ..., metavar="HOST", help="The name of a host.", autocompletion=_complete_hosts
+)

@@ -1,0 +1,120 @@
+"""The commands that tell what a fabric has, and change nothing."""
+
+from typing import Any, Dict, List, Mapping, Union
+
+from vswitch import _table
+from vswitch._properties import DEFAULTS
+from vswitch.command import output, places
+from vswitch.command.fabric.arguments import PLACE
+from vswitch.command.fabric.connection import connected
+from vswitch.command.session import is_json
+from vswitch.fabric import Member, SharedPort, SharedSwitch, View
+from vswitch.told import shown
+
+__all__ = ["hosts", "list_", "show"]
+
+
+def _view() -> View:
+    with connected() as fabric:
+        return fabric.view()
+
+
+def list_() -> None:
+    """List the switches, with the hosts that have them."""
+    view = _view()
+    found = [_listed(switch) for switch in view.switches.values()]
+    if is_json():
+        output.write_json(found)
+        return
+    rows = (
+        (
+            one["alias"],
+            one["mtu"],
+            f"{len(one['ports'])} of {one['max_ports']}",
+            sum(1 for host in one["ports"].values() if host is not None),
+            shown(one["hosts"]),
+        )
+        for one in found
+    )
+    output.table(("switch", "mtu", "ports", "connected", "hosts"), rows)
+
+
+def _listed(switch: SharedSwitch) -> Dict[str, Any]:
+    settings = switch.settings
+    return {
+        "alias": switch.alias,
+        "id": switch.id,
+        "mtu": settings.get("mtu", _table.SWITCH["mtu"].default),
+        "max_ports": settings.get("max_ports", DEFAULTS["switches"]["max_ports"]),
+        "ports": {port.id: port.host or None for port in switch.ports.values()},
+        "hosts": list(switch.hosts),
+    }
+
+
+def hosts() -> None:
+    """List the hosts, with what they report: how far they are, their links, and what is wrong.
+
+    A host tells how many of the changes its frames obey. One that is gone tells what was last.
+    """
+    view = _view()
+    if is_json():
+        output.write_json({"revision": view.revision, "hosts": _states(view)})
+        return
+    rows = [
+        (one.name, f"{one.in_force} of {view.revision}", _links(one)) for one in view.hosts.values()
+    ]
+    output.table(("host", "in force", "links"), rows)
+    for host in view.hosts.values():
+        for where, why in host.errors.items():
+            output.line(f"{host.name}: {where}: {why}")
+
+
+def _states(view: View) -> List[Dict[str, Any]]:
+    return [one.state() for one in view.hosts.values()]
+
+
+def _links(host: Member) -> str:
+    return ", ".join(f"{name} {link}" for name, link in host.links.items()) or "none"
+
+
+def show(place: str = PLACE) -> None:
+    """Show a switch with its ports, or a port: what is set, and on which hosts it is."""
+    view = _view()
+    alias, id_ = places.split_by(view.switches, place)
+    switch = view.switches[alias]
+    found: Union[SharedSwitch, SharedPort] = switch if id_ is None else switch.ports[id_]
+    if is_json():
+        output.write_json(found.state())
+    elif isinstance(found, SharedSwitch):
+        output.tree(alias, _switch_branches(found))
+    else:
+        at: output.Branch = (f"connected at: {found.host or 'none'}", ())
+        output.tree(place, [*_branches(found, _table.PORT), at])
+
+
+def _switch_branches(switch: SharedSwitch) -> List[output.Branch]:
+    ports: List[output.Branch] = [
+        (port.id + (f": at {port.host}" if port.host else ""), _branches(port, _table.PORT))
+        for port in switch.ports.values()
+    ]
+    return [
+        (f"id: {switch.id}", ()),
+        (f"hosts: {shown(list(switch.hosts))}", ()),
+        *_branches(switch, _table.SWITCH),
+        *([("ports", ports)] if ports else []),
+    ]
+
+
+def _branches(
+    found: Union[SharedSwitch, SharedPort], known: Mapping[str, Any]
+) -> List[output.Branch]:
+    """What is set."""
+    state, settings = found.state(), found.settings
+    said: List[output.Branch] = []
+    for name, value in state.items():
+        if name == "properties":
+            raw = [(f"{key}: {shown(one)}", ()) for key, one in value.items()]
+            said.append((name, raw))
+        elif name in settings:
+            said.append((f"{name}: {shown(value) if value != '' else 'none'}", ()))
+    return said
