@@ -80,6 +80,7 @@ def test_sessions_of_python(guide: Path, tmp_path: Path) -> None:
         "command",
         "describing_a_host",
         "frames",
+        "many_hosts",
         "performance",
         "rack",
         "record_once",
