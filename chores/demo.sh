@@ -5,6 +5,7 @@
 #
 # Usage: ./dev demo [--python PATH] [--debug-python] [--no-fast-paths]
 #        ./dev demo frames
+#        ./dev demo fabric
 #
 # Runs the command and the programs of examples/, each on a host of its own: tools to copy from, the
 # first steps underneath, records that a tool builds, and a tour through the whole host. The command
@@ -14,12 +15,19 @@
 # With frames, real ones go between clients in network namespaces: a VLAN cuts and joins them, an
 # uplink fails while pings go on, and a mirror shows what another one sends. It takes root's rights
 # or user namespaces, and leaves nothing.
+#
+# With fabric, three hosts share a switch over a cluster of three databases: a private VLAN spans
+# them, an uplink is pulled, a port moves, a host dies and comes back, and then the databases do. It
+# takes and leaves the same.
 cmd_demo() {
-  if [ "${1-}" = frames ]; then
+  case ${1-} in
+  frames | fabric)
+    what=$1
     shift
     demo_frames "$@"
     return
-  fi
+    ;;
+  esac
   only_build_options "$@"
   [ -z "$sanitizers" ] || die "demo: --sanitize is for build and test"
   # shellcheck disable=SC2086 # a list of words
@@ -42,13 +50,14 @@ cmd_demo() {
   [ -n "${LD_LIBRARY_PATH-}" ] || example tour
 }
 
+# What $what says: frames or fabric.
 demo_frames() {
-  [ $# -eq 0 ] || die "demo: frames takes no options"
+  [ $# -eq 0 ] || die "demo: $what takes no options"
   # shellcheck disable=SC2086 # a list of words
-  need $frame_packages
+  need $frame_packages $command_packages
   build
   BUILD_DIR=$root/$folder PYTHONPATH=$root/$folder/python:$root/tests/simhostd \
-    "$python" tests/simhostd/frames_demo.py
+    "$python" "tests/simhostd/${what}_demo.py"
 }
 
 # example NAME ARGUMENTS...: runs a program of examples/.

@@ -12,8 +12,8 @@
 #                 without frames and with them, clones of random hosts, killed processes, hosts that
 #                 share a switch while everything fails, and random pairs of values share what is left
 #   --seed N      what chance chose in an earlier run, which printed its seed
-#   --no-frames   without replays over real frames and hosts that share, where network namespaces
-#                 cannot be made
+#   --no-frames   without replays over real frames, hosts that share and their demo, where network
+#                 namespaces cannot be made
 #
 # A line for each part says how much it did and what was wrong; the status is 1 if anything was.
 # What a fuzzer learns stays in build-fuzzers/corpus, and the next run goes on from there.

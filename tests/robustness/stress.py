@@ -10,6 +10,7 @@ processes, hosts that share a switch and random pairs of values.
 """
 
 import argparse
+import re
 import subprocess
 import sys
 import tempfile
@@ -101,6 +102,31 @@ def killed(seconds: float) -> Outcome:
     return rounds, []
 
 
+def demonstrated(output: str) -> Outcome:
+    """What the demo of a fabric showed: who reached whom, and what became of changes."""
+    joined, parted, _, *others = re.findall(r"(\d+) received", output)
+    wrong = [] if (joined, parted, *others) == ("3", "0", "3", "3", "3") else ["pings"]
+    for shown in (
+        "two    nic0  guest-1  nic1",
+        "nic0 down, nic1 up",
+        "connected at: three",
+        "the change is made, and not in force on two after 1 s",
+        "it has lost the majority of its cluster",
+        "rack/guest-1/forbids: forged_transmits -> absent\n# in force on one, three, two",
+    ):
+        wrong += [shown] if shown not in output else []
+    return 1, [f"not shown: {', '.join(wrong)}: {output}"] if wrong else []
+
+
+def demo() -> Outcome:
+    """Run the demo of a fabric."""
+    command = [sys.executable, str(processes.TESTS / "simhostd" / "fabric_demo.py")]
+    done = subprocess.run(command, capture_output=True, text=True, check=False)
+    if done.returncode:
+        return 0, [f"status {done.returncode}: {done.stdout[-500:]} {done.stderr[-2000:]}"]
+    return demonstrated(done.stdout)
+
+
 def fuzzed(name: str, seed: int, seconds: float) -> Outcome:
     corpus = fuzzing.BUILD / "corpus" / name
     inputs, wrong = fuzzing.run(name, corpus, seed, f"-max_total_time={max(1, int(seconds))}")
@@ -123,6 +149,8 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
         yield Part(f"memory, {kind}", "calls", repeat)
     yield Part("traps, in turns", "calls", whole(program, "traps.py", "in-turns", calls))
     yield Part("traps, in a row", "calls", whole(program, "traps.py", "in-a-row", calls))
+    if frames:
+        yield Part("demo of a fabric", "demos", whole(demo))
     share = SHARES["fuzzing"] / (len(fuzzing.NAMES) + 1)
     states = partial(by_chance, "fuzz/state_files.py", seed)
     yield Part("damaged states", "states", states, share)

@@ -57,6 +57,12 @@ def test_a_program_that_ends_early_is_found() -> None:
     assert len(wrong) == 1 and "ValueError" in wrong[0]
 
 
+def test_a_demo_that_shows_less_is_found() -> None:
+    count, wrong = stress.demonstrated("3 received, 3 received, 30 received, 3 received")
+    assert count == 1
+    assert len(wrong) == 1 and "not shown: pings, two " in wrong[0]
+
+
 @pytest.mark.parametrize("frames", [True, False])
 def test_all_parts_share_the_time(frames: bool) -> None:
     parts = list(stress.parts(1, 20.0, Path(), frames))

@@ -252,6 +252,12 @@ class FabricLab:
         host.host.run("ip", "address", "add", f"{_NETWORK}.{10 + number}/24", "dev", "fabric")
         return host
 
+    def namespace(self) -> Namespace:
+        """One that goes with this."""
+        made = Namespace(self.hub)
+        self._left.callback(made.close)
+        return made
+
     def cut(self, host: Host, up: bool = False) -> None:
         """The wire between a host and the databases."""
         state = "up" if up else "down"

@@ -2,7 +2,7 @@
 
 import itertools
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, Sequence
+from typing import Any, Dict, List, Mapping, Protocol, Sequence
 
 from frame_lab import Lab, comes_sooner_or_later
 from simhost import Client, frame
@@ -99,11 +99,22 @@ def check_all_get_one(clients: Sequence[Client]) -> None:
             client.expect_none(sent)
 
 
+class Hosts(Protocol):
+    """What has hosts, and namespaces that go with it."""
+
+    @property
+    def hosts(self) -> Sequence[Lab]:
+        ...
+
+    def namespace(self) -> Namespace:
+        ...
+
+
 class Segment:
     """A network of two bridges, joined: each host has its first uplink at the one, and its second
     at the other."""
 
-    def __init__(self, rack: Rack) -> None:
+    def __init__(self, rack: Hosts) -> None:
         self.namespace = rack.namespace()
         self.wires: Dict[str, Wire] = {}
         """By host and uplink, such as "0/nic1"."""
