@@ -13,7 +13,6 @@ import platform
 import shutil
 import statistics
 import sys
-import time
 from pathlib import Path
 from typing import Any, Dict, Iterator, List, Mapping
 
@@ -22,27 +21,7 @@ import modules
 import report
 import targets
 from figures import EXPECTED, FIGURES, FORMS, MEASURED, PEERS
-
-
-class Progress:
-    """One line on a terminal that says what is being measured; elsewhere, a line now and then."""
-
-    def __init__(self) -> None:
-        self._terminal = sys.stderr.isatty()
-        self._last = float("-inf")
-
-    def __call__(self, text: str) -> None:
-        now = time.monotonic()
-        if self._terminal:
-            print(f"\r\033[K{text}", end="", file=sys.stderr, flush=True)
-        elif now - self._last > 10:
-            print(text, file=sys.stderr, flush=True)
-            self._last = now
-
-    def clear(self) -> None:
-        """Remove the line."""
-        if self._terminal:
-            print("\r\033[K", end="", file=sys.stderr, flush=True)
+from progress import Progress
 
 
 def make_twin(build: Path) -> None:
