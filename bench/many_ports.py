@@ -6,7 +6,7 @@ import tempfile
 import time
 from contextlib import contextmanager
 from pathlib import Path
-from typing import Any, Dict, Iterator, List
+from typing import Any, Dict, Iterable, Iterator, List
 
 from frame_lab import Lab
 from simhost._namespaces import Namespace
@@ -21,6 +21,18 @@ def _batch(namespace: Namespace, *lines: str) -> None:
     subprocess.run(words, input="\n".join(lines), text=True, check=True)
 
 
+def lay_wires(near: Namespace, far: Namespace, wires: Iterable[int]) -> None:
+    """Devices n0, n1, ... and their far ends f0, f1, ..., of these numbers."""
+    numbers = list(wires)
+    lines = [
+        f"link add n{number} index {_FIRST_INDEX + number} up type veth"
+        f" peer name f{number} index {_FIRST_FAR_INDEX + number} netns {far.pid}"
+        for number in numbers
+    ]
+    _batch(near, *lines)
+    _batch(far, *(f"link set f{number} up" for number in numbers))
+
+
 class ManyPorts:
     """The lab, the devices n0, n1, ... and their far ends f0, f1, ..., and a document of a switch
     that has a port of one VLAN at each."""
@@ -28,13 +40,7 @@ class ManyPorts:
     def __init__(self, lab: Lab, ports: int) -> None:
         self.lab = lab
         self.far = lab.frames.new_namespace()
-        wires = [
-            f"link add n{number} index {_FIRST_INDEX + number} up type veth"
-            f" peer name f{number} index {_FIRST_FAR_INDEX + number} netns {self.far.pid}"
-            for number in range(ports)
-        ]
-        _batch(lab.host, *wires)
-        _batch(self.far, *(f"link set f{number} up" for number in range(ports)))
+        lay_wires(lab.host, self.far, range(ports))
         self.document: Dict[str, Any] = {
             "switches": [
                 {

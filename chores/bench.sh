@@ -4,9 +4,13 @@
 #@ bench  Compare the module's cost with other ways to bind the same calls
 #
 # Usage: ./dev bench [--quick]
+#        ./dev bench --fabric [--quick] [OPTION...]
 #
 #   --quick   a short run, to see that all works: its figures are rough, and it leaves out what is
 #             measured of whole modules
+#   --fabric  what many hosts cost that share a switch, and nothing else: 16 hosts, 10,000 ports and
+#             some minutes, as far as the machine bears it. bench/fabric.py --help has its options;
+#             fabric.json and fabric.svg are left in build/bench/
 #
 # Prints tables of ratios, of checked calls to checks by hand and of objects to flat calls too, what
 # the recorder adds to a call, what real frames cost, and what the simulated host does in a second;
@@ -14,6 +18,11 @@
 # how it measures and how to read it. On a machine with other work to do it takes longer, and ratios
 # stay ratios.
 cmd_bench() {
+  if [ "${1-}" = --fabric ]; then
+    shift
+    bench_fabric "$@"
+    return
+  fi
   quick='' full=surfaces
   case ${1-} in
   --quick)
@@ -46,4 +55,13 @@ cmd_bench() {
     say "dev: a target is missed, or a comparison failed; its table above says which" >&2
     return 1
   }
+}
+
+bench_fabric() {
+  # shellcheck disable=SC2086 # lists of words
+  need $build_packages $frame_packages
+  build
+  step "Measuring hosts that share a switch"
+  BUILD_DIR=$root/$folder PYTHONPATH=$root/$folder/python:$root/tests/simhostd \
+    "$python" bench/fabric.py "$@"
 }

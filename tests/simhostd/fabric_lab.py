@@ -93,6 +93,9 @@ class Databases:
     def running(self) -> List[int]:
         return sorted(self._running)
 
+    def processes(self) -> List[int]:
+        return [process.pid for process in self._running.values()]
+
     def pause(self) -> None:
         """They go on listening."""
         for process in self._running.values():
