@@ -248,18 +248,44 @@ def interrupted(plan):
 
 Plan.apply = interrupted
 """
+WHILE_IT_IS_TOLD = """
+class Interrupted:
+    def __init__(self, pipe, *_, **__):
+        self._pipe = pipe
+
+    def __enter__(self):
+        return self
+
+    def __exit__(self, *_):
+        os.close(self._pipe)
+
+    def write(self, said):
+        whole = said.encode() if isinstance(said, str) else said
+        os.write(self._pipe, whole[:1])
+        os.kill(os.getppid(), signal.SIGINT)
+        time.sleep(1)
+        os.write(self._pipe, whole[1:])
+
+keeping.open = Interrupted
+"""
 WHEN_IT_IS_TOLD = """
 def interrupted(keeper, what):
-    os.write(keeper._pipe, __import__("json").dumps(what).encode())
-    os.kill(os.getppid(), signal.SIGINT)
-    os.close(keeper._pipe)
-    keeper._pipe = None
+    held = None if keeper._pipe is None else os.dup(keeper._pipe)
+    tell(keeper, what)
+    if held is not None:
+        os.kill(os.getppid(), signal.SIGINT)
+        os.close(held)
 
+tell = keeping._Keeper._tell
 keeping._Keeper._tell = interrupted
 """
 
 
-@pytest.mark.parametrize("patch", [WHILE_IT_IS_MADE, WHEN_IT_IS_TOLD], ids=["made", "told"])
+@pytest.mark.parametrize(
+    "patch",
+    [WHILE_IT_IS_MADE, WHILE_IT_IS_TOLD, WHEN_IT_IS_TOLD],
+    ids=["made", "being told", "told"],
+)
 def test_interrupted_it_is_taken_back_at_once(lab: SharedHost, patch: str) -> None:
     before = state(lab)
     done = patched(lab, patch)

@@ -176,10 +176,13 @@ class _Keeper:
             signal.pthread_sigmask(signal.SIG_UNBLOCK, _SIGNALS)
 
     def _tell(self, what: Dict[str, Any]) -> None:
-        """Once: who began it may go on then."""
-        if self._pipe is None:
-            return
-        pipe, self._pipe = self._pipe, None
-        # Who began it may be gone.
-        with contextlib.suppress(OSError), open(pipe, "w", encoding="utf-8") as file:
-            json.dump(what, file)
+        """Once, and whole: who began it may go on then."""
+        mask = signal.pthread_sigmask(signal.SIG_BLOCK, _SIGNALS)
+        try:
+            if self._pipe is not None:
+                pipe, self._pipe = self._pipe, None
+                # Who began it may be gone.
+                with contextlib.suppress(OSError), open(pipe, "wb") as file:
+                    file.write(json.dumps(what).encode())
+        finally:
+            signal.pthread_sigmask(signal.SIG_SETMASK, mask)
