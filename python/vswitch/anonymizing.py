@@ -23,7 +23,8 @@ from vswitch.words import under
 __all__ = ["anonymized"]
 
 KEPT = {
-    "numbers": "VLANs, networks, sizes, times, counters, port numbers and keys of encapsulations",
+    "numbers": "VLANs, networks, sizes, times, counters, port numbers and keys of encapsulations "
+    "of mirror sessions",
     "mac": "the bits for multicast and local addresses, which share their first three bytes; "
     "01:00:5e and 33:33 of groups, no address and all stations",
     "ip": "the family; scopes of multicast and link-local addresses; 224.0.0.0/24, well-known "
@@ -64,8 +65,8 @@ class _Names(abc.ABC):
         ...
 
     @abc.abstractmethod
-    def number(self, given: int) -> int:
-        """A number that is a name."""
+    def number(self, given: int, kind: str = "number", most: int = 0xFFFFFFFF) -> int:
+        """A number that is a name, of as many bits as `most` has."""
 
 
 class _Seen(_Names):
@@ -87,7 +88,7 @@ class _Seen(_Names):
         self.all.add(_words.address(given, "ip"))
         return given
 
-    def number(self, given: int) -> int:
+    def number(self, given: int, kind: str = "number", most: int = 0xFFFFFFFF) -> int:
         self.all.add(given)
         return given
 
@@ -135,8 +136,11 @@ class _Others(_Names):
     def name(self, kind: str, given: str) -> str:
         if not given:
             return given
-        form = "{}-{}" if self._key is None else "{}-{:016x}"
-        made: str = self._other("name", given, lambda n, _: form.format(kind, n), kind)
+        # Linux has room for fifteen bytes of a device.
+        form, bits = ("{}-{:08x}", 32) if kind == "device" else ("{}-{:016x}", 64)
+        if self._key is None:
+            form = "{}-{}"
+        made: str = self._other("name", given, lambda n, _: form.format(kind, n % 2**bits), kind)
         return made
 
     def mac(self, given: str) -> str:
@@ -177,10 +181,10 @@ class _Others(_Names):
         )
         return made
 
-    def number(self, given: int) -> int:
+    def number(self, given: int, kind: str = "number", most: int = 0xFFFFFFFF) -> int:
         if given == 0:
             return given
-        made: int = self._other("number", given, lambda n, _: n & 0xFFFFFFFF or 1, "number")
+        made: int = self._other(kind, given, lambda n, _: n & most or 1, kind)
         return made
 
 
@@ -229,6 +233,7 @@ _SWITCH_KEYS = ("max_ports", "persistent", "version", "running", "counters")
 _GROUP_KEYS = ("version", "source_mode", "vni")
 _MAC_KEYS = ("vlan", "vni", "type", "ages", "age")
 _FAULT_KEYS = ("call", "nth", "times", "status", "exception", "delay")
+_GREATEST_TUNNEL_KEY = 0xFFFFFF
 _BY_KEY = {known.key: known for known in (*_table.SWITCH.values(), *_table.PORT.values())}
 
 
@@ -251,6 +256,7 @@ class _Walk:
             "",
             dict.fromkeys(_HOST_KEYS, _kept),
             uplinks=self._each(self._uplink),
+            underlay=self._underlay,
             runtime_options=self._options,
             switches=self._each(self._switch),
             faults=self._each(self._fault),
@@ -337,9 +343,35 @@ class _Walk:
     # What there is
 
     def _uplink(self, given: Any, path: str) -> Dict[str, Words]:
+        kept = dict.fromkeys(_UPLINK_KEYS, _kept)
         return self._object(
-            given, path, dict.fromkeys(_UPLINK_KEYS, _kept), name=self._name("uplink")
+            given, path, kept, name=self._name("uplink"), device=self._name("device")
         )
+
+    def _underlay(self, given: Any, path: str) -> Dict[str, Words]:
+        return self._object(
+            given, path, {}, device=self._name("device"), address=self._network, gateway=self._ip
+        )
+
+    def _network(self, given: Any, path: str) -> str:
+        """An address, with the bits of its network."""
+        address, slash, bits = _words.text(given, path).partition("/")
+        return self._ip(address, path) + slash + bits
+
+    def _fabric(self, given: Any, path: str) -> Dict[str, Words]:
+        uplink, peers = self._name("uplink"), self._each(self._ip)
+        kept = {"encapsulation": _kept}
+        return self._object(given, path, kept, key=self._tunnel_key, uplink=uplink, peers=peers)
+
+    def _tunnel_key(self, given: Any, path: str) -> int:
+        key = _words.number(given, path, 0, _GREATEST_TUNNEL_KEY)
+        return self._names.number(key, "tunnel key", _GREATEST_TUNNEL_KEY)
+
+    def _device(self, given: Any, path: str) -> Words:
+        """A client's: its name, or that with its address."""
+        if not isinstance(given, dict):
+            return self._name("device")(given, path)
+        return self._object(given, path, {}, name=self._name("device"), mac=self._mac)
 
     def _switch(self, given: Any, path: str) -> Dict[str, Words]:
         alias = given.get("alias") if isinstance(given, dict) else None
@@ -357,6 +389,7 @@ class _Walk:
             path,
             names,
             **dict.fromkeys(_SWITCH_KEYS, _kept),
+            fabric=self._fabric,
             uplinks=self._each(self._name("uplink")),
             addresses=self._each(self._entry),
             mirror_counters=self._sessions,
@@ -383,6 +416,7 @@ class _Walk:
             "port",
             _table.PORT,
             external_id=self._name("external"),
+            device=self._device,
             addresses=self._each(self._entry),
             groups=self._each(self._group),
             counters=_kept,

@@ -3,7 +3,7 @@ was."""
 
 import ipaddress
 import json
-from typing import Any, Iterator, List
+from typing import Any, Iterator, List, Optional
 
 import drawn_documents
 import pytest
@@ -232,6 +232,43 @@ def test_what_was_refused_has_no_names(host: simhost.Host, secret: Switch) -> No
     assert (busy["switch"], busy["status"], busy["words"]) == (switch["alias"], "QEX_BUSY", "Busy")
     trap = by_call["VSDVS_GetPortTeamingPolicy"]
     assert (trap["port"], trap["status"]) == (switch["ports"][1]["id"], "trap")
+
+
+TUNNELS = {
+    "underlay": {"device": "secret1", "address": "203.0.113.77/24", "gateway": "203.0.113.177"},
+    "uplinks": [{"name": "secretnic0", "device": "secret2"}],
+    "switches": [
+        {
+            "alias": "secret",
+            "ports": [
+                {"id": "one", "device": "secret3"},
+                {"id": "other", "device": {"name": "secret4", "mac": "02:00:00:00:77:66"}},
+            ],
+            "fabric": {
+                "encapsulation": "geneve",
+                "key": 77031,
+                "peers": ["203.0.113.78", "2001:db8::77"],
+                "uplink": "secret-tunnels",
+            },
+        }
+    ],
+}
+
+
+@pytest.mark.parametrize("key", [None, b"a key"])
+def test_nothing_survives_of_what_brings_frames(host: simhost.Host, key: Optional[bytes]) -> None:
+    host.apply({"switches": [], "clock": {"stopped": False}})
+    said = anonymized(TUNNELS, key)
+    assert survivors(TUNNELS) != survivors(said) == []
+    fabric = said["switches"][0]["fabric"]
+    assert fabric["key"] < 2**24 and fabric["encapsulation"] == "geneve"
+    assert said["underlay"]["address"].endswith("/24")
+    if key:
+        again = anonymized({**TUNNELS, "uplinks": []}, key)
+        assert again["switches"] == said["switches"]
+    # A host takes it, as it took the other.
+    for document in TUNNELS, said:
+        host_of(document)
 
 
 def test_no_plan_makes_a_host_what_it_says(secret: Switch) -> None:
