@@ -75,8 +75,7 @@ check_mypy() {
 check_words() { "$python" chores/check_words.py; }
 
 # What clang-tidy says of a file depends on what tidy_inputs.py hashes; the hash names a stamp that
-# is left when it had nothing to say. Sources that $untidied matches are passed over, and of those
-# that $lightly matches the analyzer and the checks that take two thirds of the time.
+# is left when it had nothing to say. Sources that $untidied matches are passed over.
 check_tidy() {
   export folder ours="^$root/(include|helpers|recordings|simhost|tests|bench)/"
   stamps=$folder/tidy
@@ -85,21 +84,16 @@ check_tidy() {
   inputs=$("$python" chores/tidy_inputs.py "$folder" ${FUZZERS_DIR:+"$FUZZERS_DIR"} -- \
     $(sources '*.c' '*.cpp' | grep -v "${untidied:-^$}")) || return
   say "$inputs" | while read -r file hash; do
-    stamp=$stamps/$hash
-    [ ! -e "$stamp" ] || continue
-    if say "$file" | grep -q "${lightly:-^$}"; then stamp=$stamp-lightly; fi
-    [ -e "$stamp" ] || say "$file $stamp"
+    [ -e "$stamps/$hash" ] || say "$file $stamps/$hash"
   done | nice xargs -r -n 2 -P "$jobs" sh -c '
     echo "clang-tidy $1"
-    less=
-    case $2 in *-lightly) less="-clang-analyzer-*,-bugprone-*" ;; esac
     case $1 in ./tests/fuzz/*) folder=$FUZZERS_DIR ;; esac
     if ! grep -qF "\"file\": \"$PWD/${1#./}\"" "$folder/compile_commands.json"; then
       echo "$1: no target builds it, so nothing checks it"
       exit 1
     fi
-    findings=$(clang-tidy --quiet -p "$folder" --header-filter "$ours" --checks "$less" "$1" \
-      2>&1) && : >"$2" && exit
+    findings=$(clang-tidy --quiet -p "$folder" --header-filter "$ours" "$1" 2>&1) &&
+      : >"$2" && exit
     printf "%s\n" "$findings" | grep -v " generated\.$" | head -n 40
     exit 1' sh
 }

@@ -17,10 +17,9 @@
 #   -- ARGUMENTS    given to each run of pytest as they are
 #
 # The other options are those of ./dev build; with them lint, which they do not change, is left out.
-# Without them clang-tidy passes over the tests' own C++ and recordings; of the simulated host over
-# its calls, its documents, its programs, and what talks to Open vSwitch or other hosts; and of the
-# rest of it over its analyzer and its bugprone checks: these take long, and ./dev lint has them. The
-# fuzzers that link a whole host are left to ./dev stress.
+# Without them clang-tidy reads the module, its helpers, and of the simulated host what all of it
+# stands on: the rest takes long, and ./dev lint has it. The fuzzers that link a whole host are left
+# to ./dev stress.
 # The summary names what is not for this build, and its last line sums all suites; a skipped test
 # counts as failed, for what was not checked is not known to work.
 #
@@ -86,12 +85,9 @@ cmd_test() {
     tally build 0 1
     report
   fi
-  # The slower part of all sources, which ./dev lint has clang-tidy read: the tests' own, and what
-  # has most of its code from libraries of templates. The module and its helpers are read with all
-  # checks.
+  # The slower part of all sources, which ./dev lint has clang-tidy read.
   untidied='^\./\(tests\|recordings\)/'
-  untidied=$untidied'\|^\./simhost/\(abi\|cli\|daemon\|fabric\|scenario\|planes/openvswitch\)/'
-  lightly='^\./simhost/'
+  untidied=$untidied'\|^\./simhost/\(abi\|cli\|daemon\|fabric\|model\|planes\|scenario\|storage\)/'
   [ -n "$expression" ] || [ "$folder" != build ] || {
     lint
     summarize "Left to ./dev lint: what clang-tidy passes over here"
