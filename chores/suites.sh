@@ -29,10 +29,12 @@ not_apart() {
   grep -v $(printf -- '-e ^tests/%s ' $apart)
 }
 
-# other_tests ARGUMENTS...: those, together.
+# other_tests ARGUMENTS...: those, together, by one process more than there are processors: tests of
+# frames wait for much of their time.
 other_tests() {
   # shellcheck disable=SC2046,SC2086 # lists of words
-  pytest "Python tests" module.xml '' $(printf -- '--ignore=tests/%s ' $apart) "$@"
+  pytest "Python tests" module.xml '' -n $((jobs + 1)) $(printf -- '--ignore=tests/%s ' $apart) \
+    "$@"
 }
 
 # They run in one process, which sums up what they have proven of each call.
