@@ -12,15 +12,13 @@
 #include <string>
 #include <vector>
 
+#include "daemon/bridge/running_bridge.h"
 #include "daemon/learned/ageing.h"
 #include "daemon/learned/mac_table.h"
 #include "daemon/learned/memory.h"
-#include "daemon/learned/taught.h"
 #include "daemon/wanted.h"
 #include "events/loop.h"
-#include "planes/openvswitch/openflow/connection.h"
 #include "planes/openvswitch/ovsdb/client.h"
-#include "planes/openvswitch/reconcile/difference.h"
 #include "planes/openvswitch/rows/rows.h"
 
 namespace simhost::daemon {
@@ -33,33 +31,20 @@ class Bridges {
     std::string
         owner;  ///< how this process is called in words, for another one that wants to write
     std::string host;
-    /// What a bridge counted, and for which mirror sessions; see Tally.
-    std::function<void(storage::SwitchKey, openvswitch::Totals const &,
-                       openvswitch::CountedSessions const &)>
-        counted;
-    /// An address moved to a port, or beyond the uplinks (0).
-    std::function<void(storage::SwitchKey, std::uint32_t port)> moved;
     /// The database has rows that are others than before, whoever changed them.
     std::function<void()> changed;
-    /// Somebody else changed flows or groups of the bridge of that name.
-    std::function<void(std::string const &)> altered;
-    /// A bridge has learned what its flows do not teach, or not any more.
-    std::function<void()> strayed;
     /// A switch cannot be run as it is wanted, and goes on as it was.
     std::function<void(std::string const &alias, std::string const &why)> refused;
-    /// Devices in groups are live, or are not any more; see is_live().
-    std::function<void()> lived;
-    /// A flow of a bridge sent up a frame.
-    std::function<void(storage::SwitchKey, openflow::PacketIn const &)> heard;
-    /// A connection ended.
+    /// The connection to the database ended.
     std::function<void()> disturbed;
+    /// What bridges tell.
+    RunningBridge::Told of_bridges;
   };
 
   /// Connects to the database at `socket`; the sockets of bridges are beside it. Throws
   /// std::runtime_error, which says who writes to the database if somebody else does.
   /// `memory` outlives it.
   Bridges(events::Loop &loop, std::filesystem::path const &socket, Memory &memory, Told told);
-  ~Bridges();
   Bridges(Bridges const &) = delete;
   Bridges &operator=(Bridges const &) = delete;
 
@@ -70,8 +55,7 @@ class Bridges {
   /// Whether frames may go out at a port of the bridge of a switch: it has a link and, in a group,
   /// a partner. Nothing while there is no bridge of it.
   [[nodiscard]] std::optional<bool> is_live(storage::SwitchKey key, openflow::Port port) const;
-  /// Makes what is remembered of flows be forgotten, as forget_cached_flows(). Throws nothing.
-  using Forget = std::function<bool(std::string const &bridge, std::uint64_t generation)>;
+  using Forget = RunningBridge::Forget;
   /// Makes everything as it is wanted, and returns when it is in force: for frames of kinds that
   /// were there before, only with `forget`. Returns how many flows and groups it changed, markers
   /// not counted.
@@ -89,8 +73,6 @@ class Bridges {
   Unseen age();
 
  private:
-  struct Bridge;
-
   void take_ownership();
   void read_database_events();
   openvswitch::PresentRows const &present();
@@ -98,33 +80,12 @@ class Bridges {
   std::set<std::string> apply_rows(Wanted const &wanted,
                                    std::vector<openvswitch::BridgeRow> const &rows,
                                    openvswitch::Deadline deadline);
-  std::size_t apply_flows(WantedBridge const &wanted, std::uint64_t change,
-                          std::set<std::string> const &added, Forget const &forget,
-                          openvswitch::Deadline deadline);
   // Returns how many flows and groups it changed.
   std::size_t try_flows(WantedBridge const &wanted, std::uint64_t change,
                         std::set<std::string> const &added, Forget const &forget,
                         openvswitch::Deadline deadline);
-  Bridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
-  void read_flows(Bridge &bridge, openvswitch::Deadline deadline);
-  static void have_meters(Bridge &bridge, std::vector<openflow::Flow> const &flows,
-                          openvswitch::Deadline deadline);
-  static void add_meters(Bridge &bridge, std::vector<openflow::Flow> const &flows,
-                         openvswitch::Deadline deadline);
-  void add_relearned(Bridge &bridge, WantedBridge const &wanted,
-                     openvswitch::Difference &difference, openvswitch::Deadline deadline);
-  void add_renewed(Bridge &bridge, WantedBridge const &wanted, openvswitch::Difference &difference,
-                   openvswitch::Deadline deadline);
-  std::vector<openflow::Flow> learned_flows(Bridge &bridge,
-                                            openvswitch::LearnedFlows const &learned,
-                                            openvswitch::Deadline deadline);
-  std::vector<Source> age(Bridge &bridge, openvswitch::Deadline deadline);
-  void read_events(Bridge &bridge);
-  void follow_events(Bridge &bridge);
-  void follow_learned(Bridge &bridge, openflow::FlowUpdate const &update);
-  void look_for_strays(Bridge &bridge);
-  void note_origin(Bridge &bridge, Origin origin) const;
-  void count(Bridge &bridge, openvswitch::Deadline deadline);
+  RunningBridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
+  [[nodiscard]] RunningBridge *find(storage::SwitchKey key) const;
 
   events::Loop &loop_;
   std::filesystem::path folder_;
@@ -134,7 +95,7 @@ class Bridges {
   // None once the database has changed: most changes are none of rows, and take no look at them.
   std::optional<openvswitch::PresentRows> present_;
   events::Loop::Watch database_watch_;
-  std::map<storage::SwitchKey, std::unique_ptr<Bridge>> bridges_;
+  std::map<storage::SwitchKey, std::unique_ptr<RunningBridge>> bridges_;
 };
 
 }  // namespace simhost::daemon

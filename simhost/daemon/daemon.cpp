@@ -184,36 +184,40 @@ void Daemon::connect() {
         Bridges::Told{
             .owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
             .host = host_,
-            .counted =
-                [this](auto key, auto const &totals, auto const &sessions) {
-                  counting_.count(key, totals, sessions);
-                  load_balance_.count(key, totals);
-                },
-            .moved =
-                [this](auto key, auto port) {
-                  if (port != 0) {
-                    counting_.count_move(key, port);
-                  }
-                },
             .changed = [this] { sync_soon(); },
-            .altered =
-                [this](std::string const &bridge) {
-                  say_(fmt::format("somebody else changed flows or groups of the bridge {}",
-                                   bridge));
-                  mend_soon();
-                },
-            .strayed = [this] { mend_soon(); },
             .refused = [this](auto const &alias, auto const &why) { add_refused(alias, why); },
-            .lived = [this] { sync_soon(); },
-            .heard =
-                [this](auto key, auto const &packet) {
-                  if (!beacons_.receive(key, packet)) {
-                    members_.receive(key, packet);
-                  }
-                },
-            .disturbed = [this] { connect_later(); }});
+            .disturbed = [this] { connect_later(); },
+            .of_bridges = told_by_bridges()});
     sync();
   });
+}
+
+RunningBridge::Told Daemon::told_by_bridges() {
+  return {.counted =
+              [this](auto key, auto const &totals, auto const &sessions) {
+                counting_.count(key, totals, sessions);
+                load_balance_.count(key, totals);
+              },
+          .moved =
+              [this](auto key, auto port) {
+                if (port != 0) {
+                  counting_.count_move(key, port);
+                }
+              },
+          .altered =
+              [this](std::string const &bridge) {
+                say_(fmt::format("somebody else changed flows or groups of the bridge {}", bridge));
+                mend_soon();
+              },
+          .strayed = [this] { mend_soon(); },
+          .lived = [this] { sync_soon(); },
+          .heard =
+              [this](auto key, auto const &packet) {
+                if (!beacons_.receive(key, packet)) {
+                  members_.receive(key, packet);
+                }
+              },
+          .disturbed = [this] { connect_later(); }};
 }
 
 void Daemon::connect_later() {

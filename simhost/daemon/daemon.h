@@ -57,6 +57,7 @@ class Daemon {
   void count();
   void attempt(std::function<void()> const &work);
   void fail(std::string const &why);
+  [[nodiscard]] RunningBridge::Told told_by_bridges();
   void connect_later();
   void mend_soon();
   void look_at_commits();

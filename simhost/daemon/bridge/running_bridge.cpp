@@ -1,0 +1,341 @@
+// What it tells by itself comes between its replies, and is followed after each of them.
+#include "daemon/bridge/running_bridge.h"
+
+#include <algorithm>
+#include <exception>
+#include <iterator>
+#include <memory>
+#include <utility>
+#include <variant>
+
+#include "daemon/bridge/bridge_rows.h"
+#include "daemon/bridge/cached_flows.h"
+#include "daemon/bridge/changes.h"
+#include "daemon/bridge/made_bridge.h"
+#include "daemon/bridge/unreached_flows.h"
+#include "planes/openvswitch/compile/pipeline.h"
+#include "planes/openvswitch/reconcile/present.h"
+#include "planes/openvswitch/reconcile/relearning.h"
+
+namespace simhost::daemon {
+namespace {
+
+using namespace std::chrono_literals;
+using openflow::Flow;
+using openflow::FlowCommand;
+using openvswitch::Deadline;
+
+// What Open vSwitch says of its flows is older than that anyway.
+constexpr auto kBetweenCounts = 100ms;
+
+std::filesystem::path socket_of(WantedBridge const &wanted, std::filesystem::path const &folder) {
+  return folder / (wanted.row.name + ".mgmt");
+}
+
+openflow::Connection connected(WantedBridge const &wanted, std::filesystem::path const &folder,
+                               Deadline deadline) {
+  auto const socket = socket_of(wanted, folder);
+  require_made(wanted, socket);
+  return {socket, deadline};
+}
+
+bool is_marker(openflow::FlowEntry const &entry) {
+  return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
+}
+
+openvswitch::Difference difference_between(openvswitch::Compiled const &present,
+                                           openvswitch::Compiled const &wanted) {
+  return &present == &wanted
+             ? openvswitch::Difference{}
+             : openvswitch::difference(present.flows, present.groups, wanted.flows, wanted.groups);
+}
+
+// Another client may have come with a device, with an address of its own.
+std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wanted,
+                                                       std::set<std::string> const &added) {
+  std::vector<openvswitch::LearnedFlows> forgotten;
+  for (auto const &[device, port] : wanted.ports) {
+    if (added.contains(device)) {
+      forgotten.push_back(
+          {.table = openvswitch::table::kFirstAddresses,
+           .cookie = openvswitch::cookie(openvswitch::Counted::first_address, port)});
+    }
+  }
+  return forgotten;
+}
+
+}  // namespace
+
+RunningBridge::RunningBridge(events::Loop &loop, std::filesystem::path const &folder,
+                             Memory &memory, Told const &told, WantedBridge const &wanted,
+                             Deadline deadline)
+    : memory_(memory),
+      told_(told),
+      key_(wanted.key),
+      name_(wanted.row.name),
+      connection_(connected(wanted, folder, deadline)),
+      numbers_(wanted.numbers),
+      sessions_(wanted.sessions) {
+  meters_.replace(connection_, wanted.flows->flows, deadline);
+  added_ahead_ = add_unreached(connection_, socket_of(wanted, folder), *wanted.flows, deadline);
+  read_flows(deadline);
+  for (auto const &port : connection_.ports(deadline)) {
+    live_.follow(port);
+  }
+  if (!wanted.row.lags.empty()) {
+    told_.lived();
+  }
+  // What counted while nobody was here, before any of it is changed.
+  count(deadline);
+  watch_ = loop.watch(connection_.fd(), [this] { read_events(); });
+}
+
+void RunningBridge::have(Flows flows) {
+  taught_.have(flows);
+  flows_ = std::move(flows);
+}
+
+// Once it is told of changes, so that none is missed.
+void RunningBridge::read_flows(Deadline deadline) {
+  connection_.set_async({.packet_in = true, .port_status = true, .group_and_meter_changes = true},
+                        deadline);
+  std::vector<openflow::FlowMonitor> monitors;
+  for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
+    // These are recent for a second, and many.
+    if (number != openvswitch::table::kRecentSources) {
+      auto const own = openvswitch::table::is_learned(number) ? openflow::OwnChanges::told
+                                                              : openflow::OwnChanges::untold;
+      monitors.push_back({.number = number + 1U, .filter = {.table = number}, .own = own});
+    }
+  }
+  std::vector<Flow> learned;
+  for (auto const &update : connection_.monitor_flows(monitors, deadline)) {
+    if (openvswitch::table::is_learned(update.flow.table)) {
+      learned.push_back(update.flow);
+    }
+  }
+  auto flows = connection_.flows({}, deadline);
+  if (auto const marker = std::ranges::find_if(flows, is_marker); marker != flows.end()) {
+    change_ = marker->flow.cookie;
+    flows.erase(marker);
+  }
+  auto present = openvswitch::present_of(flows, connection_.groups(deadline));
+  unplaced_ = std::move(present.unplaced);
+  have(std::make_shared<openvswitch::Compiled const>(openvswitch::Compiled{
+      .rows = {}, .flows = std::move(present.flows), .groups = std::move(present.groups)}));
+  if (change_) {
+    memory_.replace(key_, learned);
+  }
+}
+
+void RunningBridge::read_events() {
+  try {
+    connection_.receive();
+    follow_events();
+  } catch (std::exception const &) {
+    watch_.end();
+    told_.disturbed();
+  }
+}
+
+void RunningBridge::follow_events() {
+  bool is_altered = false;
+  bool has_lived = false;
+  while (auto const event = connection_.next_event()) {
+    if (auto const *const packet = std::get_if<openflow::PacketIn>(&*event)) {
+      told_.heard(key_, *packet);
+    }
+    if (auto const *const status = std::get_if<openflow::PortStatus>(&*event)) {
+      bool const is_another = live_.follow(*status);
+      has_lived = has_lived || (is_another && aggregated_.contains(status->port.name));
+    }
+    auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
+    if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
+      follow_learned(*update);
+    } else if (update != nullptr) {
+      is_altered = is_altered || update->event != openflow::FlowUpdate::Event::own;
+    } else if (std::holds_alternative<openflow::GroupsOrMetersChanged>(*event)) {
+      is_altered = true;
+    }
+  }
+  if (has_lived) {
+    told_.lived();
+  }
+  if (is_altered) {
+    note_origin(Origin::foreign);
+  }
+}
+
+void RunningBridge::follow_learned(openflow::FlowUpdate const &update) {
+  if (auto const port = memory_.follow(key_, update)) {
+    told_.moved(key_, *port);
+  }
+  if (update.event < openflow::FlowUpdate::Event::own &&
+      update.event != openflow::FlowUpdate::Event::removed) {
+    note_origin(taught_.origin_of(update));
+  }
+}
+
+void RunningBridge::note_origin(Origin origin) {
+  if (origin == Origin::taught || std::exchange(is_altered_, true)) {
+    return;
+  }
+  if (origin == Origin::foreign) {
+    told_.altered(name_);
+  } else {
+    told_.strayed();
+  }
+}
+
+void RunningBridge::look_for_strays(Deadline deadline) {
+  for (auto const &entry :
+       connection_.flows({.table = openvswitch::table::kRecentSources}, deadline)) {
+    note_origin(taught_.origin_of(entry));
+  }
+}
+
+void RunningBridge::count(Deadline deadline) {
+  told_.counted(key_, totals_of(connection_, numbers_, deadline), sessions_);
+  counted_ = Deadline::clock::now();
+  follow_events();
+}
+
+void RunningBridge::count_anew(Deadline deadline) {
+  if (counted_ + kBetweenCounts < Deadline::clock::now()) {
+    count(deadline);
+  }
+}
+
+// A client need not speak before it is reached in another VLAN: who it is was learned already.
+void RunningBridge::add_relearned(WantedBridge const &wanted, openvswitch::Difference &difference,
+                                  Deadline deadline) {
+  if (difference.forgotten.empty()) {
+    return;
+  }
+  connection_.receive();
+  follow_events();
+  openvswitch::Teachers const teachers(wanted.flows->flows,
+                                       {difference.forgotten.begin(), difference.forgotten.end()});
+  for (auto const &learned : difference.forgotten) {
+    auto const learn = teachers.how_learned(learned);
+    if (!learn) {
+      continue;
+    }
+    for (auto const &before : learned_flows(learned, deadline)) {
+      if (auto flow = openvswitch::relearned(*learn, before)) {
+        difference.added_flows.push_back(std::move(*flow));
+      }
+    }
+  }
+}
+
+// Learning an address once more leaves its flow the timeout that it has.
+void RunningBridge::add_renewed(WantedBridge const &wanted, openvswitch::Difference &difference,
+                                Deadline deadline) {
+  aging_ = wanted.aging;
+  age(deadline);
+  auto renewed = memory_.with_other_timeouts(key_, wanted.flows->flows);
+  std::ranges::move(renewed, std::back_inserter(difference.added_flows));
+}
+
+std::vector<Flow> RunningBridge::learned_flows(openvswitch::LearnedFlows const &learned,
+                                               Deadline deadline) {
+  if (learned.table != openvswitch::table::kRecentSources) {
+    return memory_.learned(key_, learned);
+  }
+  std::vector<Flow> flows;
+  for (auto &entry : connection_.flows(
+           {.table = learned.table, .cookie = learned.cookie, .cookie_mask = ~std::uint64_t{0}},
+           deadline)) {
+    flows.push_back(std::move(entry.flow));
+  }
+  return flows;
+}
+
+std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t change,
+                                 std::set<std::string> const &added, Forget const &forget,
+                                 Deadline deadline) {
+  // A bridge without a marker was made just before.
+  bool const is_new = !change_;
+  memory_.follow_devices(key_, wanted.ports);
+  bool const forgets = wanted.forgets && !has_forgotten_;
+  has_forgotten_ = wanted.forgets;
+  openflow::Changes changes;
+  if (forgets) {
+    memory_.forget(key_);
+    add_forgetting(changes);
+  }
+  auto difference = difference_between(*flows_, *wanted.flows);
+  if (!forgets) {
+    add_relearned(wanted, difference, deadline);
+  }
+  std::ranges::copy(std::exchange(unplaced_, {}), std::back_inserter(difference.forgotten));
+  if (is_new) {
+    std::ranges::move(memory_.recall(key_, wanted.flows->flows, wanted.aging, seen_now()),
+                      std::back_inserter(difference.added_flows));
+  } else {
+    if (aging_ != wanted.aging && !forgets) {
+      add_renewed(wanted, difference, deadline);
+    }
+    std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
+  }
+  if (sessions_ != wanted.sessions || ends_counting(difference)) {
+    count(deadline);
+  }
+  meters_.add(connection_, difference.added_flows, deadline);
+  add_changes(difference, changes);
+  if (change_ != change) {
+    changes.emplace_back(openflow::FlowChange{.command = FlowCommand::add,
+                                              .flow = openvswitch::generation_marker(change)});
+  }
+  if (!changes.empty()) {
+    auto const forget_it = forget ? [&] { return forget(name_, change); } : std::function<bool()>();
+    change_and_forget(connection_, changes, change_ != change,
+                      size_of(difference) > 0 ? forget_it : nullptr, deadline);
+    have(wanted.flows);
+    change_ = change;
+    follow_events();
+  }
+  numbers_ = wanted.numbers;
+  sessions_ = wanted.sessions;
+  aging_ = wanted.aging;
+  aggregated_ = aggregated_devices(wanted.row);
+  return size_of(difference) + std::exchange(added_ahead_, 0);
+}
+
+void RunningBridge::send(std::vector<openflow::PacketOut> const &frames, Deadline deadline) {
+  for (auto const &frame : frames) {
+    connection_.send(frame);
+  }
+  connection_.barrier(deadline);
+}
+
+std::vector<Learned> RunningBridge::learned(Deadline deadline) {
+  auto const sources = age(deadline);
+  return learned_of(connection_.flows({.table = openvswitch::table::kLearnedAddresses}, deadline),
+                    sources);
+}
+
+std::vector<Source> RunningBridge::age(Deadline deadline) {
+  auto const entries = connection_.flows({.table = openvswitch::table::kCountedSources}, deadline);
+  follow_events();
+  auto sources = memory_.saw(key_, entries, seen_now());
+  openflow::Changes changes;
+  std::erase_if(sources, [&](Source const &source) {
+    bool const goes = is_aged(source.unseen, aging_);
+    if (goes) {
+      for (auto const &flow : {where_learned(source.flow), source.flow}) {
+        changes.emplace_back(
+            openflow::FlowChange{.command = FlowCommand::remove_strict, .flow = flow});
+      }
+    }
+    return goes;
+  });
+  if (!changes.empty()) {
+    connection_.change(changes, deadline);
+    follow_events();
+  }
+  return sources;
+}
+
+}  // namespace simhost::daemon
