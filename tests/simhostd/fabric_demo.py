@@ -6,7 +6,7 @@ import os
 import subprocess
 import tempfile
 from pathlib import Path
-from typing import Any, Callable, Dict, List, Tuple
+from typing import Any, Callable, Dict, List, Optional, Tuple
 
 from simhost import Client
 
@@ -20,6 +20,7 @@ UPLINKS = ["nic0", "nic1"]
 TEAMING = {"balance": "explicit", "active": ["nic0"], "standby": ["nic1"]}
 OTHERS: Dict[str, Any] = {"uplinks": [{"name": name} for name in UPLINKS]}
 FIRST = {**OTHERS, "switches": [{"alias": "rack", "teaming": TEAMING}]}
+MTU = '{{"switches": [{{"alias": "rack", "mtu": {}}}]}}'
 PRIVATE = """\
 switches:
 - alias: rack
@@ -41,7 +42,10 @@ class Operator:
         program = str(TOOLS.parent / "bin" / "vswitch")
         self._words = [*lab.hub.words(), program, "--fabric", lab.databases.addresses]
 
-    def __call__(self, *words: str, given: str = "", shown: bool = True) -> str:
+    def __call__(
+        self, *words: str, given: str = "", shown: bool = True, status: Optional[int] = 0
+    ) -> str:
+        """What it says; None stands for any status."""
         done = subprocess.run(
             [*self._words, *words],
             input=given,
@@ -54,6 +58,7 @@ class Operator:
             document = f" <<< '{given}'" if given.startswith("{") else ""
             print(f"$ vswitch --fabric $SERVERS {' '.join(words)}{document}")
             print(done.stdout, end="", flush=True)
+        assert status in (None, done.returncode), (words, done.returncode, done.stdout)
         return done.stdout
 
     def apply(self, document: Dict[str, Any]) -> None:
@@ -139,7 +144,7 @@ def move(operator: Operator, three: Host, gateway: Client) -> Client:
 def kill_host(operator: Operator, two: Host, guest: Client, gateway: Client) -> None:
     say("Host two dies. The others do not care, and the switch is changed without it:")
     killed(two)
-    operator("apply", "-", "--wait", "1", given='{"switches": [{"alias": "rack", "mtu": 1600}]}')
+    operator("apply", "-", "--wait", "1", given=MTU.format(1600), status=3)
     ping(guest, gateway)
     say("It comes back, and has what it missed:")
     started(two)
@@ -154,8 +159,8 @@ def kill_database(lab: FabricLab, operator: Operator, guest: Client, gateway: Cl
     operator.set_guest(forbids=["forged_transmits"])
     say("A second one dies. Nobody can agree on anything now, so nothing is changed:")
     lab.databases.kill(lab.databases.running()[0])
-    assert comes_true(lambda: "lost the majority" in operator("list", shown=False))
-    operator("apply", "-", given='{"switches": [{"alias": "rack", "mtu": 1500}]}')
+    assert comes_true(lambda: "lost the majority" in operator("list", shown=False, status=None))
+    operator("apply", "-", given=MTU.format(1500), status=1)
     say("Frames go on all the same:")
     ping(guest, gateway)
     say("The servers come back:")
