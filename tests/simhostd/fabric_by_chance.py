@@ -1,10 +1,11 @@
 #!/usr/bin/env python3
-"""Hosts that share a switch, while their databases, wires, daemons and callers fail by chance.
+"""Hosts that share a switch, while their databases, wires, daemons and callers fail by chance, and
+what they say to the databases comes late, not, or in part.
 
     fabric_by_chance.py [--seconds N] [--seed N]
 
 In the end all is whole again, and all hosts must have the same: each port that a call added with
-success, none of a call that was refused, and of those of which nobody knew either.
+success, none of a call that was refused, and those of which nobody knew once or not at all.
 """
 
 import json
@@ -14,7 +15,7 @@ import sys
 import tempfile
 import time
 from pathlib import Path
-from typing import Callable, Dict, List, Set
+from typing import Any, Callable, Dict, List, Optional, Sequence, Set
 
 sys.path.insert(0, str(Path(__file__).parents[1] / "support"))
 
@@ -23,8 +24,11 @@ from seeds import Outcome  # noqa: E402
 
 from fabric_lab import FabricLab, Host, killed, started  # noqa: E402
 from frame_lab import TOOLS, comes_true  # noqa: E402
+from relays import FROM_HOST, TO_HOST, Relay  # noqa: E402
 
+PROGRAM = TOOLS.parent / "bin" / "vswitch"
 LAB = {"switches": [{"alias": "lab", "max_ports": 5000}]}
+_UNKNOWN = ("QEX_TIMEOUT", "nobody knows whether the change")
 SERVERS = 3
 STEPS = 40
 
@@ -39,9 +43,20 @@ class Calls:
         self.unknown: Set[str] = set()
 
     def begin(self, host: Host, name: str) -> None:
+        """On a host."""
+        self._begin([TOOLS / "simhostctl", "apply", "-"], name, host.environment)
+
+    def operate(self, lab: FabricLab, relay: Relay, name: str) -> None:
+        """By an operator, who reaches the databases as a host does."""
+        command = [*lab.hub.words(), PROGRAM, "--fabric", relay.addresses, "apply", "-"]
+        self._begin(command, name)
+
+    def _begin(
+        self, command: Sequence[Any], name: str, environment: Optional[Dict[str, str]] = None
+    ) -> None:
         call = subprocess.Popen(
-            [TOOLS / "simhostctl", "apply", "-"],
-            env=host.environment,
+            command,
+            env=environment,
             stdin=subprocess.PIPE,
             stdout=subprocess.DEVNULL,
             stderr=subprocess.PIPE,
@@ -62,11 +77,10 @@ class Calls:
             said = call.communicate(timeout=60)[1]
             if call.returncode == 0:
                 self.made.add(name)
-            elif "QEX_BUSY" in said:
+            elif "QEX_BUSY" in said or _is_operators_refusal(call.returncode, said):
                 self.refused[name] = said.strip()
             else:
-                # Killed, or QEX_TIMEOUT.
-                assert call.returncode < 0 or "QEX_TIMEOUT" in said, said
+                assert call.returncode < 0 or any(word in said for word in _UNKNOWN), said
                 self.unknown.add(name)
         self._running.clear()
 
@@ -77,6 +91,10 @@ class Calls:
             for name, said in sorted(self.refused.items())
             if name in ports
         ]
+
+
+def _is_operators_refusal(status: int, said: str) -> bool:
+    return status == 1 and said.startswith("vswitch: ")
 
 
 class Disturbed:
@@ -92,7 +110,11 @@ class Disturbed:
             self.mend_one()
             return
         host = self._chance.choice(self._lab.hosts)
-        self._chance.choice([self._kill_database, self._pause, self._cut, self._kill_daemon])(host)
+        disturbances = [
+            *(self._kill_database, self._pause, self._cut, self._kill_daemon),
+            *(self._slow, self._hold, self._cut_in_a_message),
+        ]
+        self._chance.choice(disturbances)(host)
 
     def mend_one(self) -> None:
         self._mends.pop(0)()
@@ -118,10 +140,28 @@ class Disturbed:
         self._lab.cut(host)
         self._mends.append(lambda: self._lab.cut(host, up=True))
 
+    def _slow(self, host: Host) -> None:
+        relay = relay_of(host)
+        relay.delay(self._chance.random())
+        self._mends.append(lambda: relay.delay(0))
+
+    def _hold(self, host: Host) -> None:
+        relay = relay_of(host)
+        relay.hold()
+        self._mends.append(relay.release)
+
+    def _cut_in_a_message(self, host: Host) -> None:
+        relay_of(host).cut(self._chance.choice([FROM_HOST, TO_HOST]))
+
     def _kill_daemon(self, host: Host) -> None:
         if host.daemon is not None:
             killed(host)
             self._mends.append(host.start)
+
+
+def relay_of(host: Host) -> Relay:
+    assert host.relay is not None
+    return host.relay
 
 
 def ports_of(host: Host) -> Set[str]:
@@ -133,14 +173,17 @@ def run(seed: int, steps: int = STEPS, hosts: int = 3) -> Outcome:
     chance = random.Random(seed)
     calls = Calls()
     with tempfile.TemporaryDirectory() as folder, FabricLab(Path(folder), SERVERS) as lab:
-        first = started(lab.host("h0", LAB))
+        first = started(lab.relayed(lab.host("h0", LAB)))
         first.ctl("share", "lab")
         for number in range(1, hosts):
-            started(lab.host(f"h{number}")).ctl("join", "lab")
+            started(lab.relayed(lab.host(f"h{number}"))).ctl("join", "lab")
+        before = revision(lab)
         disturbed = Disturbed(lab, chance)
         for step in range(steps):
             for host in chance.sample(lab.hosts, chance.randint(1, hosts)):
                 calls.begin(host, f"{step}-{host.name}")
+            if chance.random() < 0.2:
+                calls.operate(lab, relay_of(chance.choice(lab.hosts)), f"{step}-operator")
             if chance.random() < 0.4:
                 disturbed.disturb()
             if chance.random() < 0.1:
@@ -156,9 +199,17 @@ def run(seed: int, steps: int = STEPS, hosts: int = 3) -> Outcome:
         wrong += ["hosts have different ports"] * (found.count(found[0]) != len(found))
         in_fabric = {str(row["id"]) for row in lab.databases.rows("Port")}
         wrong += ["the fabric has other ports"] * (in_fabric != found[0])
+        # Each call is a change.
+        made = revision(lab) - before
+        wrong += [f"{made} changes made {len(in_fabric)} ports"] * (made != len(in_fabric))
         logs = [host.log() for host in lab.hosts] if wrong else []
-    made = len(calls.made) + len(calls.refused) + len(calls.unknown)
-    return made, [f"seed {seed}: {problem}" for problem in wrong] + logs
+    total = len(calls.made) + len(calls.refused) + len(calls.unknown)
+    return total, [f"seed {seed}: {problem}" for problem in wrong] + logs
+
+
+def revision(lab: FabricLab) -> int:
+    (row,) = lab.databases.rows("Fabric")
+    return int(row["revision"])
 
 
 def add(host: Host, name: str) -> bool:

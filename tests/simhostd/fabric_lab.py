@@ -13,6 +13,7 @@ from simhost._namespaces import PATIENCE, Namespace, own_user_needed
 
 from certificates import Authority, Certificate
 from frame_lab import Lab, comes_true
+from relays import Relay
 
 SCHEMA = Path(__file__).resolve().parents[2] / "simhost/fabric/fabric.ovsschema"
 _NETWORK = "192.0.2"
@@ -183,6 +184,7 @@ class Host(Lab):
         folder.mkdir()
         super().__init__(folder, document, outer=fabric.hub)
         self.name = name
+        self.relay: Optional[Relay] = None
         self.options = ["--fabric", fabric.databases.addresses, "--host", name]
         if fabric.trust:
             certificate = fabric.trust.of_hosts.issue(name)
@@ -253,6 +255,16 @@ class FabricLab:
         run("ip", "link", "set", f"h{number}", "up", "master", "bridge")
         host.host.run("ip", "link", "set", "fabric", "up")
         host.host.run("ip", "address", "add", f"{_NETWORK}.{10 + number}/24", "dev", "fabric")
+        return host
+
+    def relayed(self, host: Host) -> Host:
+        """A host that reaches the databases by a relay of its own."""
+        assert not self.trust
+        first = 7000 + 100 * self.hosts.index(host)
+        servers = len(self.databases.addresses.split(","))
+        host.relay = Relay(self.hub, (_HUB, first), (_HUB, 6640), servers)
+        self._left.callback(host.relay.close)
+        host.options = ["--fabric", host.relay.addresses, "--host", host.name]
         return host
 
     def namespace(self) -> Namespace:

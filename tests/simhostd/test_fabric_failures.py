@@ -12,6 +12,7 @@ from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
 import fabric_by_chance
 from fabric_lab import FabricLab, Host, started
 from frame_lab import comes_true
+from relays import FROM_HOST, TO_HOST
 
 LAB = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
 
@@ -83,6 +84,28 @@ def test_nobody_knows_and_then_it_is_decided(lab: FabricLab, two: Tuple[Host, Ho
     assert comes_true(lambda: mtu(one) == mtu(other) == wanted), (mtu(one), mtu(other), wanted)
     assert one.call("VSDVS_SetMTU", "lab", 1900) == QEX_OK
     assert comes_true(lambda: mtu(other) == 1900)
+
+
+def revision(lab: FabricLab) -> int:
+    (fabric,) = lab.databases.rows("Fabric")
+    return int(fabric["revision"])
+
+
+def test_a_message_that_is_cut_loses_and_doubles_nothing(lab: FabricLab) -> None:
+    one = started(lab.relayed(lab.host("one", LAB)))
+    assert one.relay is not None
+    one.ctl("share", "lab")
+    before = revision(lab)
+    for wanted, direction in ((1600, FROM_HOST), (1700, TO_HOST)):
+        assert comes_true(lambda: are_reported(lab))
+        one.relay.cut(direction)
+        assert one.call("VSDVS_SetMTU", "lab", wanted) == QEX_OK
+        assert lab.databases.settings("Switch")["mtu"] == wanted
+    assert revision(lab) == before + 2
+    # What comes late is no other than what comes at once.
+    one.relay.delay(0.2)
+    assert one.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK
+    assert (lab.databases.settings("Switch")["mtu"], revision(lab)) == (1800, before + 3)
 
 
 def test_whatever_fails_all_hosts_end_alike() -> None:
