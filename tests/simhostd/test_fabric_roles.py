@@ -2,8 +2,9 @@
 
 import json
 import shutil
+import sys
 from pathlib import Path
-from typing import Any, Dict, Iterator, List
+from typing import Any, Dict, Iterator, List, Optional
 
 import pytest
 from _libvswitch import QEX_OK
@@ -15,7 +16,10 @@ from frame_lab import TOOLS, comes_true
 PROGRAM = TOOLS.parent / "bin" / "vswitch"
 ROLES = json.loads((SCHEMA.parent / "fabric.roles.json").read_text(encoding="utf-8"))[1:]
 FOR_HOSTS, FOR_OPERATORS = "192.0.2.1:6640", "192.0.2.1:6641"
-LAB = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
+LAB = {
+    "uplinks": [{"name": "nic0"}, {"name": "nic1"}],
+    "switches": [{"alias": "lab", "uplinks": ["nic0", "nic1"], "ports": [{"id": "a"}]}],
+}
 HOSTS = ("one", "two", "three")
 
 
@@ -107,6 +111,24 @@ def command(lab: RoleLab, *words: str) -> str:
     return done.stdout
 
 
+def hello_of(lab: RoleLab, certificate: Optional[Certificate]) -> str:
+    """What a server says to one who asks which databases there are, with a certificate or none."""
+    program = f"""
+import contextlib, socket, ssl
+context = ssl.create_default_context(cafile={str(lab.roles.of_servers.certificate)!r})
+context.check_hostname = False
+files = {[str(one) for one in certificate or ()]!r}
+if files:
+    context.load_cert_chain(*files)
+with socket.create_connection({tuple(FOR_HOSTS.split(":"))!r}, timeout=30) as plain:
+    # It says why, or has closed before that can be heard.
+    with contextlib.suppress(ssl.SSLError, ConnectionError), context.wrap_socket(plain) as stream:
+        stream.sendall(b'{{"method": "list_dbs", "params": [], "id": 0}}')
+        print(stream.recv(1000).decode(), end="")
+"""
+    return lab.hub.try_run(sys.executable, "-c", program).stdout
+
+
 def test_hosts_write_what_is_theirs_and_switches_that_they_belong_to(lab: RoleLab) -> None:
     one, two = started(lab.certified("one")), started(lab.certified("two"))
     one.ctl("share", "lab")
@@ -127,7 +149,10 @@ def test_hosts_write_what_is_theirs_and_switches_that_they_belong_to(lab: RoleLa
     assert comes_true(lambda: "d" in two.ports("lab"))
     two.set_port("lab", "d", vlan={"id": 9})
     # Questions of operators hosts reply to, each for itself.
-    assert command(lab, "drill", "lab").split() == ["HOST", "DOWN", "PORT", "CARRIED", "BY"]
+    one.client("lab", "a")
+    (carried,) = json.loads(command(lab, "drill", "lab", "--json"))
+    assert (carried["host"], carried["port"]) == ("one", "a")
+    assert {carried["uplink"], carried["meanwhile"]} == {"nic0", "nic1"}
     # Who is taken from it changes it no longer, whatever it has yet.
     two.stop()
     operates(lab, {"hosts": ["one"]})
@@ -175,6 +200,8 @@ def test_nobody_writes_what_is_another_host_s(lab: RoleLab) -> None:
     olga = lab.roles.of_operators.issue("olga")
     assert '"count":1' in lab.says(olga, FOR_OPERATORS, {"op": "delete", **row_of_one})
     select = {"op": "select", "table": "Host", "where": []}
+    assert "fabric" in hello_of(lab, two)
+    assert hello_of(lab, None) == ""
     stranger = Authority(lab.folder, "strangers").issue("one")
     for certificate, address in (
         (olga, FOR_HOSTS),
