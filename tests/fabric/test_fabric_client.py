@@ -12,32 +12,16 @@ from typing import Any, Callable, Dict, Iterator, List, Set, Tuple
 import pytest
 
 from fabric_lab import SCHEMA, Databases, FabricLab
-from frame_lab import TOOLS, comes_true
+from frame_lab import comes_true
 from libvswitch.errors import Busy, HostError, NotRestored
+from operating import PROGRAM, of_lab, populate
 from vswitch import transaction
 from vswitch.command.fabric import changing
-from vswitch.fabric import Fabric, OtherVersion, Unreachable, _deciding
+from vswitch.fabric import Fabric, Failover, OtherVersion, Unreachable, _deciding
+from vswitch.fabric._cluster import Cluster
 from vswitch.fabric._errors import TransactionRefused
 from vswitch.fabric._server import Server
 from vswitch.words import DocumentError
-
-PROGRAM = TOOLS.parent / "bin" / "vswitch"
-SWITCH = {"alias": "lab", "id": "lab-1", "hosts": ["one"], "ports": [{"id": "a", "vlan": 7}]}
-
-
-def of_lab(**members: Any) -> Dict[str, Any]:
-    return {"switches": [{"alias": "lab", **members}]}
-
-
-def populate(databases: Databases) -> None:
-    """As a host does that comes first, and an operator after it."""
-    host = {"name": "one", "state": "s", "session": "s", "links": ["map", [["nic0", "up"]]]}
-    databases.transact(
-        {"op": "insert", "table": "Fabric", "row": {}},
-        {"op": "insert", "table": "Host", "row": host},
-    )
-    with Fabric(databases.local_addresses) as fabric:
-        assert fabric.plan({"switches": [SWITCH]}).apply() == 1
 
 
 @pytest.fixture
@@ -345,6 +329,29 @@ def test_what_the_servers_do_not_let_one_do_is_told(
     for ask in asked:
         with pytest.raises(Busy, match="does not let this client change that: .* of roles"):
             ask()
+
+
+def test_a_host_that_does_not_tell_hides_no_other_s_reply(
+    databases: Databases, fabric: Fabric, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    databases.transact({"op": "insert", "table": "Host", "row": {"name": "two", "state": "t"}})
+    fabric.plan(of_lab(hosts=["one", "two"])).apply()
+    replies = {
+        "one": {"failovers": [{"uplink": "nic0", "port": "a", "meanwhile": None}]},
+        "two": {"refused": "no such switch"},
+    }
+    really = Cluster.follow
+
+    def follow(cluster: Cluster, deadline: float) -> bool:
+        for host, reply in replies.items():
+            row, where = {"reply": json.dumps(reply)}, [["host", "==", host]]
+            databases.transact({"op": "update", "table": "Drill", "where": where, "row": row})
+        return really(cluster, deadline)
+
+    monkeypatch.setattr(Cluster, "follow", follow)
+    told = fabric.drill("lab")
+    assert told["one"] == [Failover("one", "nic0", "a", None)]
+    assert isinstance(told["two"], HostError) and str(told["two"]) == "no such switch"
 
 
 def test_shells_complete_what_the_fabric_has(databases: Databases) -> None:

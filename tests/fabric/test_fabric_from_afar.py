@@ -1,21 +1,17 @@
 """What hosts share, looked at and changed by an operator who is at none of them."""
 
-import contextlib
-import io
 import json
-import signal
 import subprocess
 from pathlib import Path
-from typing import Any, Dict, Iterator, NamedTuple, Sequence
+from typing import Any, Dict, Iterator
 
 import pytest
 
 from certificates import Authority
 from fabric_lab import FabricLab, Host, Trust, killed, started
-from frame_lab import TOOLS, comes_true
-from vswitch.command.fabric import program
+from frame_lab import comes_true
+from operating import PROGRAM, Operator, of_lab
 
-PROGRAM = TOOLS.parent / "bin" / "vswitch"
 LAB: Dict[str, Any] = {
     "uplinks": [{"name": "nic0"}],
     "switches": [
@@ -28,64 +24,6 @@ LAB: Dict[str, Any] = {
     ],
 }
 OTHER: Dict[str, Any] = {"uplinks": [{"name": "nic0"}], "switches": [{"alias": "mine"}]}
-
-
-class Done(NamedTuple):
-    status: int
-    stdout: str
-    stderr: str
-
-
-class Operator:
-    """The command, by somebody who has no host: mostly without a process for each, which takes
-    longer than the rest."""
-
-    def __init__(self, lab: FabricLab) -> None:
-        self._lab = lab
-
-    def __call__(self, *words: str, given: Any = None) -> Done:
-        file = self._lab.folder / "given.json"
-        file.write_text(json.dumps(given), encoding="utf-8")
-        words = tuple(str(file) if word == "-" else word for word in words)
-        handlers = {
-            one: signal.getsignal(one) for one in (signal.SIGINT, signal.SIGTERM, signal.SIGHUP)
-        }
-        said, wrong, status = io.StringIO(), io.StringIO(), 0
-        try:
-            with contextlib.redirect_stdout(said), contextlib.redirect_stderr(wrong):
-                program.main(["--fabric", self._lab.databases.local_addresses, *words])
-        except SystemExit as end:
-            status = int(end.code or 0)
-        finally:
-            for number, handler in handlers.items():
-                signal.signal(number, handler)
-        return Done(status, said.getvalue(), wrong.getvalue().replace(f"{file}: ", "-: "))
-
-    def process(self, *words: str, before: Sequence[str] = ()) -> Done:
-        """In one of its own, at a machine that reaches the servers."""
-        # No library of a host is found from here.
-        own = ["env", "-u", "LD_LIBRARY_PATH", "-u", "SIMHOST_STATE"]
-        servers = ["--fabric", self._lab.databases.addresses]
-        done = subprocess.run(
-            [*self._lab.hub.words(), *own, str(PROGRAM), *before, *servers, *words],
-            stdout=subprocess.PIPE,
-            stderr=subprocess.PIPE,
-            text=True,
-            check=False,
-        )
-        return Done(done.returncode, done.stdout, done.stderr)
-
-    def told(self, *words: str, given: Any = None) -> str:
-        done = self(*words, given=given)
-        assert done.status == 0, done
-        return done.stdout
-
-    def json(self, *words: str, given: Any = None) -> Any:
-        return json.loads(self.told(*words, "--json", given=given))
-
-
-def of_lab(**members: Any) -> Dict[str, Any]:
-    return {"switches": [{"alias": "lab", **members}]}
 
 
 @pytest.fixture
@@ -181,6 +119,8 @@ def test_what_hosts_cannot_bear_and_who_is_away_is_told(lab: FabricLab, operator
     assert done.status == 3 and done.stdout.startswith("taken: absent -> id=")
     assert "not all can bear it: two: taken: " in done.stderr
     assert "two: taken: " in operator.told("hosts")
+    asked = operator("drill", "taken")
+    assert (asked.status, asked.stderr) == (1, "vswitch: two: the host has no such switch\n")
     # A host that is away is waited for in vain.
     killed(other)
     done = operator("apply", "-", "--wait", "0.5", given=of_lab(mtu=1600))

@@ -8,14 +8,14 @@ import json
 import time
 import uuid
 from dataclasses import dataclass
-from typing import Dict, List, Mapping, Optional, Sequence
+from typing import Dict, Mapping, Optional, Sequence, Union
 
 from libvswitch.errors import Busy, HostError
 from vswitch.fabric._cluster import Cluster
 from vswitch.fabric._errors import TransactionRefused, Unreachable
 from vswitch.fabric._notation import delete, insert, where
 
-__all__ = ["Failover", "Replies", "drill"]
+__all__ = ["Failover", "Replies", "Reply", "drill"]
 
 _KEPT_SECONDS = 3600
 _LAST_WORDS = 2.0
@@ -31,8 +31,10 @@ class Failover:
     meanwhile: Optional[str]
 
 
-Replies = Mapping[str, Optional[Sequence[Failover]]]
-"""By the names of hosts; None of one that did not reply."""
+Reply = Union[Sequence[Failover], HostError, None]
+"""Why a host does not tell is a HostError; None is of one that did not reply."""
+Replies = Mapping[str, Reply]
+"""By the names of hosts."""
 
 
 def drill(cluster: Cluster, switch: str, hosts: Sequence[str], deadline: float) -> Replies:
@@ -54,8 +56,7 @@ def drill(cluster: Cluster, switch: str, hosts: Sequence[str], deadline: float) 
             cluster.follow(deadline)
         found = _replied(cluster, asked)
         return {
-            host: _failovers(host, found[id_]) if id_ in found else None
-            for id_, host in asked.items()
+            host: _reply(host, found[id_]) if id_ in found else None for id_, host in asked.items()
         }
     finally:
         _withdraw(cluster, asked)
@@ -67,10 +68,10 @@ def _replied(cluster: Cluster, asked: Mapping[str, str]) -> Dict[str, str]:
     return {row["id"]: row["reply"] for row in rows if row["id"] in asked and row["reply"]}
 
 
-def _failovers(host: str, reply: str) -> List[Failover]:
+def _reply(host: str, reply: str) -> Reply:
     said = json.loads(reply)
     if "refused" in said:
-        raise HostError(f"{host}: {said['refused']}")
+        return HostError(said["refused"])
     return [
         Failover(host, one["uplink"], one["port"], one["meanwhile"]) for one in said["failovers"]
     ]

@@ -123,7 +123,8 @@ class Fabric:
         """What would carry the connected ports of a switch on each of its hosts if an uplink
         failed, as the hosts themselves say. Nothing is taken down.
 
-        None is the reply of a host that has none until then.
+        A host that does not tell replies with a HostError that says why; None is the reply of one
+        that has none until then.
         """
         switch = self.view().switches[alias]
         return drill(self._cluster, switch.id, switch.hosts, time.monotonic() + seconds)

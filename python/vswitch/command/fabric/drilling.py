@@ -24,15 +24,17 @@ def drill(
     """
     with connected() as fabric, output.progress(f"asking the hosts of {alias}"):
         replies = fabric.drill(alias, timeout)
-    found = [one for reply in replies.values() for one in reply or ()]
+    told = [reply for reply in replies.values() if reply and not isinstance(reply, HostError)]
+    found = [one for reply in told for one in reply]
     if is_json():
         output.write_json([dataclasses.asdict(one) for one in found])
     else:
         rows = [(one.host, one.uplink, one.port, one.meanwhile or "none") for one in found]
         output.table(("host", "down", "port", "carried by"), rows)
+    wrong = [f"{host}: {why}" for host, why in replies.items() if isinstance(why, HostError)]
     silent = [host for host, reply in replies.items() if reply is None]
     lost = [f"{one.port} without {one.host}/{one.uplink}" for one in found if one.meanwhile is None]
-    wrong = [f"no uplink would carry {', '.join(lost)}"] if lost else []
+    wrong += [f"no uplink would carry {', '.join(lost)}"] if lost else []
     wrong += [f"no reply from {', '.join(silent)}"] if silent else []
     if wrong:
         raise HostError("; ".join(wrong))
