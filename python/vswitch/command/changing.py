@@ -3,9 +3,10 @@
 A command is a short document: it is checked, made, read back and undone as documents are.
 """
 
+import contextlib
 import dataclasses
 import enum
-from typing import Any, Dict, Iterable, List, Optional, Union
+from typing import Any, Dict, Iterable, Iterator, List, Optional, Union
 
 import click
 import typer
@@ -21,7 +22,21 @@ from vswitch.told import Change
 from vswitch.values import Words
 from vswitch.words import ABSENT, DocumentError
 
-__all__ = ["add", "remove", "set_", "tell", "tell_made", "unset", "uplink"]
+__all__ = [
+    "add",
+    "by_last_word",
+    "cleared",
+    "defaults",
+    "first_members",
+    "given",
+    "members",
+    "remove",
+    "set_",
+    "tell",
+    "tell_made",
+    "unset",
+    "uplink",
+]
 
 Found = Union[Switch, Port, UplinkPort]
 Members = Dict[str, Words]
@@ -44,13 +59,20 @@ def tell_made(changes: Iterable[Change]) -> None:
         tell(changes)
 
 
-def _change(alias: str, members: Members) -> None:
-    """Changes a switch as a document says it. What is wrong is known by a word of the user's."""
-    document = {"switches": [{"alias": alias, **members}]}
+@contextlib.contextmanager
+def by_last_word() -> Iterator[None]:
+    """What is wrong in the document that a command is, is known by a word of the user's."""
     try:
-        documents.read(document)
+        yield
     except DocumentError as error:
         raise click.UsageError(f"{error.path.rpartition('.')[2]}: {error.expected}") from None
+
+
+def _change(alias: str, members: Members) -> None:
+    """Changes a switch as a document says it."""
+    document = {"switches": [{"alias": alias, **members}]}
+    with by_last_word():
+        documents.read(document)
     _carry_out(document)
 
 
@@ -70,7 +92,7 @@ def _change_found(found: Found, members: Members) -> None:
     _change(found.switch.alias, {kind: [{"id": found.id, **members}]})
 
 
-def _members(known: Dict[str, _table.Property], wanted: Members) -> Members:
+def members(known: Dict[str, _table.Property], wanted: Members) -> Members:
     """Settings as a document has them; a text that would clear its setting there, as a property."""
     said = {name: value for name, value in wanted.items() if value != ABSENT}
     properties = {
@@ -104,7 +126,17 @@ def set_(
         return _settings.words_of(known, _settings.read(found, known))
 
     wanted = assignments.read(found._settings, settings, current)
-    _change_found(found, _members(found._settings, wanted))
+    _change_found(found, members(found._settings, wanted))
+
+
+def cleared(known: Dict[str, _table.Property], settings: Iterable[str]) -> Members:
+    names = []
+    for name in settings:
+        setting = assignments.find_setting(known, name)
+        if setting is None:
+            raise click.UsageError(f"no setting {name!r} (there are {', '.join(sorted(known))})")
+        names.append(setting.name)
+    return dict.fromkeys(names, ABSENT)
 
 
 def unset(
@@ -115,14 +147,7 @@ def unset(
 ) -> None:
     """Clear settings of a switch or a port, so that they are what is the default."""
     found = places.find(host(), place)
-    names = []
-    for name in settings:
-        known = assignments.find_setting(found._settings, name)
-        if known is None:
-            there = ", ".join(sorted(found._settings))
-            raise click.UsageError(f"no setting {name!r} (there are {there})")
-        names.append(known.name)
-    _change_found(found, dict.fromkeys(names, ABSENT))
+    _change_found(found, cleared(found._settings, settings))
 
 
 def add(
@@ -161,32 +186,34 @@ def add(
         _refuse(of_port, "a port")
         if alias in host().switches:
             raise Exists(f"the switch {alias!r} is there already")
-        _change(alias, {**_given(of_switch), **_first(_table.SWITCH, settings)})
+        _change(alias, {**given(of_switch), **first_members(_table.SWITCH, settings)})
         return
     _refuse(of_switch, "a switch")
     switch = host().switches[alias]
     if id_ in switch.ports or id_ in switch.uplink_ports:
         raise Exists(f"the port {id_!r} of switch {alias!r} is there already")
-    _change(alias, {"ports": [{"id": id_, **_given(of_port), **_first(_table.PORT, settings)}]})
+    _change(
+        alias, {"ports": [{"id": id_, **given(of_port), **first_members(_table.PORT, settings)}]}
+    )
 
 
-def _given(members: Dict[str, Any]) -> Members:
+def given(members: Dict[str, Any]) -> Members:
     return {name: value for name, value in members.items() if value is not None}
 
 
 def _refuse(members: Dict[str, Any], kind: str) -> None:
-    for name in _given(members):
+    for name in given(members):
         option = f"--{'uplink' if name == 'uplinks' else name.replace('_', '-')}"
         raise click.UsageError(f"{option} is for {kind}")
 
 
-def _first(known: Dict[str, _table.Property], settings: Optional[List[str]]) -> Members:
+def defaults(setting: _table.Property) -> Words:
+    return _settings.words_of(setting, _settings.parse(setting, setting.default, setting.name))
+
+
+def first_members(known: Dict[str, _table.Property], settings: Optional[List[str]]) -> Members:
     """The settings of what is made: members that are not said are the defaults."""
-
-    def current(setting: _table.Property) -> Words:
-        return _settings.words_of(setting, _settings.parse(setting, setting.default, setting.name))
-
-    return _members(known, assignments.read(known, settings or (), current))
+    return members(known, assignments.read(known, settings or (), defaults))
 
 
 def remove(place: str = PLACE) -> None:

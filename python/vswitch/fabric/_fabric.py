@@ -66,14 +66,15 @@ class Fabric:
         self._cluster.connect(time.monotonic() + _PATIENCE)
         return view_of(self._cluster.rows)
 
-    def plan(self, document: Document) -> Plan:
+    def plan(self, document: Document, view: Optional[View] = None) -> Plan:
         """What would change if it were as a document says; DocumentError says where that is wrong.
 
         Beside what documents of a host have, a switch has `hosts`; what each host has of its own is
-        refused.
+        refused. A document that was made of a view is compared with that one: what somebody else
+        changed since is then refused when the plan is applied.
         """
         wishes = _documents.read(document)
-        found = Difference(self.view())
+        found = Difference(view or self.view())
         for wish in wishes:
             found.add(wish)
         return Plan(self, found)

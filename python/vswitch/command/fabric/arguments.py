@@ -10,7 +10,7 @@ from vswitch.command.fabric.connection import connected
 from vswitch.fabric import View
 from vswitch.fabric._watching import KINDS
 
-__all__ = ["HOST", "PLACE", "SWITCH", "kinds"]
+__all__ = ["HOST", "HOSTS", "NEW_PLACE", "PLACE", "SWITCH", "kinds"]
 
 
 def _named(context: click.Context, begun: str, names: Callable[[View], Iterable[str]]) -> List[str]:
@@ -57,6 +57,16 @@ PLACE = typer.Argument(
 )
 SWITCH = typer.Argument(
     ..., metavar="SWITCH", help="The alias of a switch.", autocompletion=_complete_switches
+)
+NEW_PLACE = typer.Argument(
+    ..., metavar="SWITCH[/PORT]", help="What is to be there.", autocompletion=_complete_switches
+)
+HOSTS = typer.Option(
+    None,
+    "--host",
+    metavar="HOST",
+    help="Of a switch: a host that has it; several may be given.",
+    autocompletion=_complete_hosts,
 )
 HOST = typer.Argument(
     ..., metavar="HOST", help="The name of a host.", autocompletion=_complete_hosts

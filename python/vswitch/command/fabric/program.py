@@ -1,13 +1,13 @@
 """The program when a fabric is meant: its commands, and the options before them."""
 
-from typing import Callable, Dict, List, Optional
+from typing import Callable, Dict, List, Optional, Tuple
 
 import click
 import typer
 import typer.main
 
 from vswitch.command import program
-from vswitch.command.fabric import changing, drilling, reading, watching
+from vswitch.command.fabric import assigning, changing, drilling, reading, watching
 from vswitch.command.session import Group, HostlessCommand
 from vswitch.exits import REFUSED
 
@@ -17,8 +17,13 @@ COMMANDS: Dict[str, Callable[..., None]] = {
     "list": reading.list_,
     "show": reading.show,
     "hosts": reading.hosts,
+    "set": assigning.set_,
+    "unset": assigning.unset,
+    "add": assigning.add,
+    "remove": assigning.remove,
     "diff": changing.diff,
     "apply": changing.apply,
+    "backup": reading.backup,
     "outcome": changing.outcome,
     "forget": changing.forget,
     "watch": watching.watch,
@@ -26,6 +31,21 @@ COMMANDS: Dict[str, Callable[..., None]] = {
 }
 
 STATUSES = {**program.STATUSES, REFUSED: "it was refused, and the fabric is as before"}
+
+
+# What takes a change back is a process at the host.
+_OPTIONS_OF_HOSTS = ("--confirm-within", "--real")
+
+
+class _Group(Group):
+    def resolve_command(
+        self, context: click.Context, words: List[str]
+    ) -> Tuple[Optional[str], Optional[click.Command], List[str]]:
+        options = [word for word in words if word.partition("=")[0] in _OPTIONS_OF_HOSTS]
+        for one in [*words[:1], *options]:
+            if one not in COMMANDS and one in (*program.COMMANDS, *options):
+                raise click.UsageError(f"{one!r} is for one host: it goes there, without --fabric")
+        return super().resolve_command(context, words)
 
 
 def about(
@@ -63,7 +83,7 @@ def group() -> click.Group:
         add_completion=False,
         context_settings={"help_option_names": ["-h", "--help"]},
     )
-    app.callback(cls=Group, no_args_is_help=True, epilog=program.ends(STATUSES))(about)
+    app.callback(cls=_Group, no_args_is_help=True, epilog=program.ends(STATUSES))(about)
     for name, function in COMMANDS.items():
         app.command(name, cls=HostlessCommand)(function)
     made = typer.main.get_command(app)

@@ -4,14 +4,14 @@ from typing import Any, Dict, List, Mapping, Union
 
 from vswitch import _table
 from vswitch._properties import DEFAULTS
-from vswitch.command import output, places
+from vswitch.command import files, output, places
 from vswitch.command.fabric.arguments import PLACE
 from vswitch.command.fabric.connection import connected
 from vswitch.command.session import is_json
 from vswitch.fabric import Member, SharedPort, SharedSwitch, View
 from vswitch.told import shown
 
-__all__ = ["hosts", "list_", "show"]
+__all__ = ["backup", "hosts", "list_", "show"]
 
 
 def _view() -> View:
@@ -90,6 +90,27 @@ def show(place: str = PLACE) -> None:
     else:
         at: output.Branch = (f"connected at: {found.host or 'none'}", ())
         output.tree(place, [*_branches(found, _table.PORT), at])
+
+
+def backup() -> None:
+    """Write all of it as a document: YAML, or JSON with --json.
+
+    Applied again, it has what was there then; what came since stays.
+    """
+    view = _view()
+    document = {"switches": [_document_of(switch) for switch in view.switches.values()]}
+    if is_json():
+        output.write_json(document)
+    else:
+        print(files.write(document), end="")
+
+
+def _document_of(switch: SharedSwitch) -> Dict[str, Any]:
+    state = switch.state()
+    for port in state["ports"]:
+        # Hosts connect them, and no document does.
+        del port["observed"]
+    return state
 
 
 def _switch_branches(switch: SharedSwitch) -> List[output.Branch]:

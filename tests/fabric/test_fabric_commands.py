@@ -1,0 +1,108 @@
+"""The commands of an operator that are a short document each, and those that a fabric has not."""
+
+from pathlib import Path
+from typing import Iterator
+
+import pytest
+
+from fabric_lab import FabricLab
+from operating import Operator, of_lab, populate
+from vswitch.fabric import Fabric, View
+
+
+@pytest.fixture
+def lab(tmp_path: Path) -> Iterator[FabricLab]:
+    with FabricLab(tmp_path) as lab:
+        populate(lab.databases)
+        yield lab
+
+
+@pytest.fixture
+def operator(lab: FabricLab) -> Operator:
+    return Operator(lab)
+
+
+def test_settings_are_set_and_cleared(operator: Operator) -> None:
+    assert operator.told("set", "lab", "mtu=9000") == "lab/mtu: absent -> 9000\n"
+    said = operator.told("set", "lab/a", "trunk=10-12,20", "forbids=forged_transmits")
+    assert said.splitlines() == [
+        "lab/a/vlan: 7 -> id=7 trunk=10-12,20",
+        "lab/a/forbids: absent -> forged_transmits",
+    ]
+    # A member leaves the others as they are.
+    operator.told("set", "lab/a", "vlan.priority=3")
+    vlan = {"id": 7, "priority": 3, "trunk": ["10-12", 20]}
+    assert operator.json("show", "lab/a")["vlan"] == vlan
+    assert operator.told("set", "lab", "mtu=9000") == "no changes\n"
+    assert operator.told("unset", "lab/a", "vlan") == (
+        "lab/a/vlan: id=7 trunk=10-12,20 priority=3 -> absent\n"
+    )
+    assert "vlan" not in operator.json("show", "lab/a")
+    for words, status, said in (
+        (("set", "lab", "mtu=1"), 2, "mtu: 1 is below 1280"),
+        (("set", "lab/x", "vlan=7"), 1, "no port 'x' of switch 'lab' in the fabric (there are a)"),
+        (("set", "lab", "mtu"), 2, "'mtu' is not NAME=VALUE"),
+        (("unset", "lab", "x"), 2, "no setting 'x'"),
+    ):
+        done = operator(*words)
+        assert (done.status, said in done.stderr) == (status, True), done
+    assert operator.json("show", "lab")["mtu"] == 9000
+
+
+def test_of_a_member_that_somebody_else_sets_meanwhile_nothing_is_lost(
+    operator: Operator, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    really = Fabric.view
+
+    def view(fabric: Fabric) -> View:
+        before = really(fabric)
+        monkeypatch.setattr(Fabric, "view", really)
+        # In a process of its own, whose change is not this one's.
+        assert operator.process("set", "lab/a", "vlan.trunk=10").status == 0
+        return before
+
+    monkeypatch.setattr(Fabric, "view", view)
+    done = operator("set", "lab/a", "vlan.priority=3")
+    assert done.status == 1 and "somebody else changed the same meanwhile" in done.stderr
+    assert operator.json("show", "lab/a")["vlan"] == {"id": 7, "trunk": [10]}
+
+
+def test_things_come_and_go(operator: Operator) -> None:
+    said = operator.told("add", "new", "--host", "one", "--identifier", "n", "mtu=1600")
+    assert said.splitlines() == ["new: absent -> id=n hosts=one", "new/mtu: absent -> 1600"]
+    operator.told("add", "new/x", "--external-id", "far", "vlan.priority=2")
+    assert operator.json("show", "new/x")["external_id"] == "far"
+    there = {one["alias"]: one for one in operator.json("list")}
+    assert there["new"]["ports"] == {"x": None}
+    for words, said in (
+        (("add", "third"), "--host is missing"),
+        (("add", "new/y", "--host", "one"), "--host is for a switch"),
+        (("add", "other", "--external-id", "x"), "--external-id is for a port"),
+    ):
+        done = operator(*words)
+        assert (done.status, said in done.stderr) == (2, True), done
+    done = operator("add", "new/x")
+    assert done.status == 1 and "is there already" in done.stderr
+    assert operator.told("remove", "new/x") == "new/x: id=x -> absent\n"
+    operator.told("remove", "new")
+    assert [one["alias"] for one in operator.json("list")] == ["lab"]
+
+
+def test_a_backup_is_a_document_that_has_it_back(operator: Operator) -> None:
+    operator.told("set", "lab/a", "trunk=10-12")
+    backup = operator.json("backup")
+    assert operator.told("diff", "-", given=backup) == "no changes\n"
+    operator.told("remove", "lab")
+    operator.told("apply", "-", given=backup)
+    assert operator.json("backup") == backup
+    assert "alias: lab" in operator.told("backup")
+
+
+def test_what_is_for_one_host_says_so(operator: Operator) -> None:
+    for command in ("uplink", "stats", "confirm", "restore", "mirror"):
+        done = operator(command, "lab")
+        assert done.status == 2
+        assert f"{command!r} is for one host: it goes there, without --fabric" in done.stderr
+    done = operator("apply", "-", "--confirm-within", "5", given=of_lab(mtu=1600))
+    assert done.status == 2 and "'--confirm-within' is for one host" in done.stderr
+    assert "mtu" not in operator.json("show", "lab")
