@@ -3,55 +3,19 @@
 import json
 import struct
 from pathlib import Path
-from typing import Any, Dict, Iterator, List, NamedTuple
+from typing import Any, Dict, Iterator, List
 
 import pytest
 from frame_lab import ONE_SWITCH, Lab, comes_true
 from simhost import frame
 from simhost._wires import PacketSocket
+from wrapped_copies import ERSPAN_2, ERSPAN_3, ETHERNET, Packet, is_wrapped, read
 
 BROADCAST = "ff:ff:ff:ff:ff:ff"
 STRANGER = "02:00:00:00:88:01"
 HERE, ONE, OTHER, NOBODY = (f"198.51.100.{number}" for number in (1, 7, 8, 9))
 KEY = 0xC0FFEE
 ERSPAN = 1023
-GRE_KEY, GRE_SEQUENCE = 0x2000, 0x1000
-ETHERNET, ERSPAN_2, ERSPAN_3 = 0x6558, 0x88BE, 0x22EB
-
-
-class Packet(NamedTuple):
-    """What a collector got, as it reads it: RFC 2890, and the drafts of ERSPAN."""
-
-    kind: int
-    source: str
-    destination: str
-    key: int
-    leaves: bool
-    copy: bytes
-
-
-def read(data: bytes) -> Packet:
-    """A packet of GRE, with its Ethernet."""
-    source, destination = (".".join(map(str, data[at : at + 4])) for at in (26, 30))
-    flags, kind = struct.unpack_from("!HH", data, 34)
-    if kind == ETHERNET:
-        assert flags == GRE_KEY
-        (key,) = struct.unpack_from("!I", data, 38)
-        return Packet(kind, source, destination, key, False, data[42:])
-    assert flags == GRE_SEQUENCE
-    first, session = struct.unpack_from("!HH", data, 42)
-    # The version; of VLANs, classes of service, trunks and damage nothing is told.
-    assert first == {ERSPAN_2: 0x1000, ERSPAN_3: 0x2000}[kind] and session <= ERSPAN
-    if kind == ERSPAN_2:
-        assert data[46:50] == bytes(4)
-        return Packet(kind, source, destination, session, False, data[50:])
-    (rest,) = struct.unpack_from("!H", data, 52)
-    assert rest & ~8 == 0
-    return Packet(kind, source, destination, session, bool(rest & 8), data[54:])
-
-
-def is_wrapped(data: bytes) -> bool:
-    return data[12:14] == b"\x08\x00" and data[23] == 47
 
 
 class Collectors:

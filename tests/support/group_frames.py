@@ -81,6 +81,11 @@ def igmp(mac: str, source: str, to: str, message: bytes) -> bytes:
     return _frame(mac, source, to, IGMP, _with_sum(message, 2))
 
 
+def joins_as_of_old(mac: str, source: str, group: str) -> bytes:
+    """A report of version 1 of IGMP, which knows no leaving."""
+    return igmp(mac, source, group, b"\x12\0\0\0" + ipaddress.ip_address(group).packed)
+
+
 def joins(mac: str, source: str, group: str) -> bytes:
     """A report of version 2 of IGMP, or 1 of MLD."""
     packed = ipaddress.ip_address(group).packed
