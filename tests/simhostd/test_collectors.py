@@ -14,6 +14,7 @@ from wrapped_copies import ERSPAN_2, ERSPAN_3, ETHERNET, Packet, is_wrapped, rea
 BROADCAST = "ff:ff:ff:ff:ff:ff"
 STRANGER = "02:00:00:00:88:01"
 HERE, ONE, OTHER, NOBODY = (f"198.51.100.{number}" for number in (1, 7, 8, 9))
+GATEWAY, BEYOND = "198.51.100.254", "203.0.113.9"
 KEY = 0xC0FFEE
 ERSPAN = 1023
 
@@ -177,6 +178,29 @@ def test_a_collector_that_does_not_reply_is_told_and_counted(
     collectors.machine.run("ip", "link", "set", "eth0", "up")
     assert all_reply(lab)
     collectors.expect(send(), 6)
+
+
+def test_a_collector_beyond_a_gateway_is_reached_while_that_replies(
+    lab: Lab, collectors: Collectors
+) -> None:
+    client = lab.client("lab", "a")
+    lab.apply({"underlay": {**UNDERLAY, "gateway": GATEWAY}})
+    mirror(lab, session(to=to(BEYOND)))
+    told = f"the collector {BEYOND} of mirror sessions does not reply"
+    assert comes_true(lambda: lab.is_in_force() and told in lab.plane()["said"])
+    sent = frame(BROADCAST, client.mac, payload=b"beyond" * 20)
+    client.send(sent)
+    failed = {"failedPkts": 1, "mirrorPktFailCnt": 1}
+    assert comes_true(lambda: bool(counters(lab) == failed)), counters(lab)
+    collectors.machine.run("ip", "address", "add", f"{GATEWAY}/24", "dev", "eth0")
+    assert all_reply(lab)
+    client.send(sent)
+    (packet,) = collectors.expect(sent, 1)
+    assert packet.destination == BEYOND
+    both = {**failed, "mirroredPkts": 1, "mirrorPktCnt": 1}
+    assert comes_true(lambda: bool(counters(lab) == both)), counters(lab)
+    collectors.machine.run("ip", "link", "set", "eth0", "down")
+    assert comes_true(lambda: told in lab.plane()["said"])
 
 
 def test_what_comes_back_wrapped_reaches_nobody(lab: Lab, collectors: Collectors) -> None:
