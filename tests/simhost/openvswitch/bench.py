@@ -5,7 +5,6 @@ from pathlib import Path
 from typing import (
     Any,
     Callable,
-    Collection,
     Counter as Counts,
     Dict,
     List,
@@ -17,6 +16,7 @@ from typing import (
 
 from compiler import Compiler
 from frames import Copy, Frame, copies
+from links import Links
 from open_vswitch import OpenVSwitch
 from rules import Rules
 
@@ -36,6 +36,8 @@ class Bench:
         self.set_link = open_vswitch.set_link
         self.devices: Dict[str, int] = {}
         self.more_flows: List[str] = []
+        # What the hosts of all switches have.
+        self.host: Dict[str, Any] = {}
         self._without_link: Set[int] = set()
         self._open_vswitch = open_vswitch
         self._compiler = compiler
@@ -49,18 +51,23 @@ class Bench:
         switch: Mapping[str, Any],
         clients: Sequence[Mapping[str, Any]],
         change: Callable[[str], Optional[str]] = str,
-        down: Collection[str] = (),
+        links: Links = Links(),
         multicast: Optional[Mapping[str, Any]] = None,
+        heard: Optional[Mapping[str, Any]] = None,
     ) -> Rules:
-        """Makes the bridge that switch, with each flow changed or left out first, these uplinks
-        without a link, and groups with these members; its rules."""
-        made = self._compiler.compile(switch, clients, multicast, down)
-        changed = (change(flow) for flow in made["flows"])
-        flows = [flow for flow in changed if flow is not None]
-        self._open_vswitch.load(self._bridge, [*flows, *self.more_flows], made["groups"])
+        """Makes the bridge that switch, with each flow and group changed or left out first, its
+        links as they are after what became of them, and groups with these members, or with those
+        that were heard; its rules."""
+        told = links.documents()
+        made = self._compiler.compile(switch, clients, multicast, told, self.host, heard)
+        flows, groups = (
+            [text for text in map(change, made[kind]) if text is not None]
+            for kind in ("flows", "groups")
+        )
+        self._open_vswitch.load(self._bridge, [*flows, *self.more_flows], groups)
         self.devices = made["devices"]
-        self._cut({self.devices[uplink] for uplink in down})
-        return Rules(switch, made["numbers"], clients, down)
+        self._cut({self.devices[uplink] for uplink in links.down})
+        return Rules(switch, made["numbers"], clients, links)
 
     def _cut(self, devices: Set[int]) -> None:
         """Those and no others have no link."""

@@ -1,23 +1,29 @@
-// Compiles switches for tests: a line of standard input says a host, as a scenario document, and
+// Compiles switches for tests: a line of standard input says a host, as scenario documents, and
 // what of it has a device; a line of standard output is what Open vSwitch would be told of its
 // switch "s".
 #include <arpa/inet.h>
 
+#include <algorithm>
 #include <array>
+#include <chrono>
 #include <cstdint>
 #include <cstdio>
 #include <exception>
 #include <iostream>
 #include <nlohmann/json.hpp>
 #include <optional>
+#include <set>
 #include <stdexcept>
 #include <string>
+#include <vector>
 
 #include "base/outcomes.h"
 #include "model/lookup.h"
 #include "model/plane.h"
 #include "model/teaming/team.h"
 #include "planes/openvswitch/compile/compile.h"
+#include "planes/openvswitch/multicast/membership.h"
+#include "planes/openvswitch/multicast/messages.h"
 #include "planes/openvswitch/openflow/text.h"
 #include "planes/openvswitch/reading/read_network.h"
 #include "planes/stored/links.h"
@@ -96,6 +102,52 @@ simhost::multicast::Groups groups_of(ChangingTransaction &transaction,
   return all;
 }
 
+std::vector<std::uint8_t> bytes_of(std::string const &hexadecimal) {
+  std::vector<std::uint8_t> bytes;
+  for (std::size_t at = 0; at + 1 < hexadecimal.size(); at += 2) {
+    bytes.push_back(static_cast<std::uint8_t>(std::stoul(hexadecimal.substr(at, 2), nullptr, 16)));
+  }
+  return bytes;
+}
+
+// {"queries", "interval": seconds, "places": [{"port", "vlan"}], "said": [{"at": milliseconds,
+// "port", "vlan", "frame"}], "until": milliseconds}. Nobody gets the queries: who is there says
+// again what it wants.
+simhost::multicast::Groups groups_heard(ChangingTransaction &transaction,
+                                        simhost::storage::SwitchKey key,
+                                        simhost::openvswitch::Multicast const &mode,
+                                        Json const &heard) {
+  using simhost::multicast::Time;
+  constexpr std::size_t kMostSources = 10;
+  simhost::multicast::Membership members;
+  Time now{};
+  members.set_options(
+      {.igmp = {.is_heard = mode.hears_igmp, .version = 3, .most_sources = kMostSources},
+       .mld = {.is_heard = mode.hears_mld, .version = 2, .most_sources = kMostSources},
+       .robustness = heard.at("queries"),
+       .interval = std::chrono::seconds(heard.at("interval").get<int>())},
+      now);
+  std::set<simhost::multicast::Place> places;
+  for (auto const &place : heard.at("places")) {
+    places.insert(place_of(transaction, key, place));
+  }
+  members.set_places(places, now);
+  auto const pass = [&](Time until) {
+    while (now < until) {
+      constexpr Time kLeast{1};
+      now = std::min(until, std::max(members.next().value_or(until), now + kLeast));
+      members.advance(now);
+    }
+  };
+  for (auto const &said : heard.at("said")) {
+    pass(Time(said.at("at").get<std::int64_t>()));
+    auto const message = simhost::multicast::decode(bytes_of(said.at("frame")));
+    members.receive(place_of(transaction, key, said), message.value(), now);
+  }
+  pass(Time(heard.at("until").get<std::int64_t>()));
+  return members.groups();
+}
+
 simhost::openvswitch::Observed connect(ChangingTransaction &transaction,
                                        simhost::storage::SwitchKey key, Json const &said) {
   simhost::openvswitch::Observed observed;
@@ -149,12 +201,16 @@ Json numbers_of_devices(ChangingTransaction &transaction, simhost::storage::Swit
 // A caller looks no further than may_be_refused() says.
 simhost::openvswitch::Compiled made_of(ChangingTransaction &transaction,
                                        simhost::storage::SwitchKey key,
-                                       simhost::openvswitch::Observed const &observed) {
+                                       simhost::openvswitch::Observed const &observed,
+                                       Json const &heard) {
   try {
     auto const team = simhost::teaming::team_of(transaction, key, simhost::stored::link_of);
     auto const connected = simhost::storage::port_devices(transaction, key);
-    return simhost::openvswitch::compile(
-        simhost::openvswitch::read_network(transaction, key, team, connected, observed));
+    auto network = simhost::openvswitch::read_network(transaction, key, team, connected, observed);
+    if (!heard.is_null()) {
+      network.multicast.groups = groups_heard(transaction, key, network.multicast, heard);
+    }
+    return simhost::openvswitch::compile(network);
   } catch (simhost::Refused const &refused) {
     if (!simhost::openvswitch::may_be_refused(transaction, key)) {
       throw std::logic_error("no caller expects this to be refused: " +
@@ -167,11 +223,13 @@ simhost::openvswitch::Compiled made_of(ChangingTransaction &transaction,
 Json compiled(Json const &said) {
   simhost::storage::Store store(std::nullopt, [](ChangingTransaction &) {});
   ChangingTransaction transaction(store);
-  simhost::scenario::apply(transaction, said.at("host").dump());
+  for (auto const &document : said.at("host")) {
+    simhost::scenario::apply(transaction, document.dump());
+  }
   auto const key = simhost::get_switch(transaction, "s").key;
   auto observed = connect(transaction, key, said);
   observed.groups = groups_of(transaction, key, said.value("multicast", Json::object()));
-  auto const made = made_of(transaction, key, observed);
+  auto const made = made_of(transaction, key, observed, said.value("heard", Json()));
 
   Json answer{{"devices", numbers_of_devices(transaction, key)},
               {"numbers", numbers_of_ports(transaction, key)},

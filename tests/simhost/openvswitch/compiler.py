@@ -4,7 +4,7 @@ import json
 import os
 import subprocess
 from pathlib import Path
-from typing import Any, Collection, Dict, List, Mapping, Optional, Sequence
+from typing import Any, Dict, List, Mapping, Optional, Sequence
 
 COMPILER = Path(os.environ["BUILD_DIR"], "tests", "simhost", "compile_switches")
 
@@ -26,18 +26,27 @@ class Compiler:
         clients: Sequence[Mapping[str, Any]],
         host: Optional[Mapping[str, Any]] = None,
         multicast: Optional[Mapping[str, Any]] = None,
+        then: Sequence[Mapping[str, Any]] = (),
+        heard: Optional[Mapping[str, Any]] = None,
     ) -> Dict[str, Any]:
         """What it says of a switch whose ports of those names have devices, and all uplinks, and
-        whose groups have those members."""
+        whose groups have those members or what was heard of members, on a host that other documents
+        are applied to then."""
         uplinks: List[str] = list(switch.get("uplinks", []))
         document = {
             "uplinks": [{"name": uplink} for uplink in uplinks],
             "switches": [{"alias": "s", **switch}],
             **(host or {}),
         }
-        question = {"host": document, "uplinks": uplinks, "clients": list(clients)}
+        question = {
+            "host": [document, *then],
+            "uplinks": uplinks,
+            "clients": list(clients),
+        }
         if multicast is not None:
             question["multicast"] = multicast
+        if heard is not None:
+            question["heard"] = heard
         assert self._process.stdin and self._process.stdout
         self._process.stdin.write(json.dumps(question) + "\n")
         self._process.stdin.flush()
@@ -49,14 +58,11 @@ class Compiler:
         switch: Mapping[str, Any],
         clients: Sequence[Mapping[str, Any]],
         multicast: Optional[Mapping[str, Any]] = None,
-        down: Collection[str] = (),
+        then: Sequence[Mapping[str, Any]] = (),
         host: Optional[Mapping[str, Any]] = None,
+        heard: Optional[Mapping[str, Any]] = None,
     ) -> Dict[str, Any]:
-        """Likewise of one that it compiles, some of whose uplinks have no link."""
-        uplinks = [
-            {"name": uplink, "link": "down" if uplink in down else "up"}
-            for uplink in switch.get("uplinks", [])
-        ]
-        answer = self.answer(switch, clients, {"uplinks": uplinks, **(host or {})}, multicast)
+        """Likewise of one that it compiles."""
+        answer = self.answer(switch, clients, host, multicast, then, heard)
         assert "flows" in answer, answer
         return answer

@@ -6,6 +6,7 @@ from typing import Any, Dict, List, Tuple
 from hypothesis import strategies as st
 
 from frames import TAG_TYPES, Frame
+from links import LinkChange, Links
 
 UPLINKS = ["nic0", "nic1", "nic2"]
 PORTS = ["p1", "p2", "p3", "p4"]
@@ -16,6 +17,19 @@ OTHER = "02:00:00:00:00:98"
 FIXED = [f"02:00:00:00:00:a{number}" for number in (1, 2, 3)]
 BROADCAST = "ff:ff:ff:ff:ff:ff"
 SOME_GROUP = "01:00:5e:00:00:05"
+# Such that nobody gets who does not ask for them.
+GROUPS = ["01:00:5e:01:01:01", "33:33:00:01:00:03"]
+# What ports take beside what is for their clients.
+TAKEN = [
+    *[[]] * 5,
+    ["promiscuous"],
+    ["sink"],
+    ["broadcast"],
+    ["multicast"],
+    ["hashed_multicast"],
+    ["multicast", "all_multicast"],
+]
+COLLECTORS = ["198.18.0.7", "198.18.0.8"]
 PRIVATE = [
     {"primary": 100, "secondary": 100, "type": "promiscuous"},
     {"primary": 100, "secondary": 101, "type": "isolated"},
@@ -66,6 +80,7 @@ def teamings(draw: Any, uplinks: List[str]) -> Any:
         "balance": draw(st.sampled_from(["explicit", "port", "mac", "ip"])),
         "active": order[:active],
         "standby": order[active:] if active else [],
+        "flags": draw(st.sampled_from([[], ["rolling"]])),
     }
 
 
@@ -76,7 +91,17 @@ ENTITIES: Dict[str, List[Dict[str, Any]]] = {
 
 
 @st.composite
-def sessions(draw: Any, name: str, uplinks: List[str]) -> Any:
+def wrapping_sessions(draw: Any, said: Dict[str, Any]) -> Any:
+    """A session whose copies go to collectors."""
+    addresses = draw(st.lists(st.sampled_from(COLLECTORS), min_size=1, max_size=2, unique=True))
+    kind = draw(st.sampled_from(["gre", "erspan2", "erspan3"]))
+    wraps = {**said["encapsulation"], "type": kind, "key": 2**32 - 1, "id": 1023}
+    to = [{"ip": address} for address in addresses]
+    return {**said, "type": "encapsulated", "to": to, "encapsulation": wraps}
+
+
+@st.composite
+def sessions(draw: Any, name: str, uplinks: List[str], collectors: bool) -> Any:
     """A mirror session of a port's table."""
     takes = bool(uplinks) and draw(st.booleans())
     places = [{"port": "p3"}, {"port": "p4"}]
@@ -98,7 +123,7 @@ def sessions(draw: Any, name: str, uplinks: List[str]) -> Any:
     for direction, named in ENTITIES.items():
         there = [one for one in named if "uplink" not in one or one["uplink"] in uplinks]
         said[direction] = draw(st.lists(st.sampled_from(there), max_size=2, unique_by=str))
-    return said
+    return draw(wrapping_sessions(said)) if collectors and draw(st.booleans()) else said
 
 
 @st.composite
@@ -113,15 +138,15 @@ def fixed_addresses(draw: Any) -> Any:
 
 
 @st.composite
-def ports(draw: Any, name: str, private: bool, uplinks: List[str]) -> Any:
+def ports(draw: Any, name: str, private: bool, uplinks: List[str], collectors: bool) -> Any:
     said: Dict[str, Any] = {"id": name, "vlan": draw(port_vlans(private))}
     said["blocked"] = draw(RARELY)
     said["nested_tag"] = draw(RARELY)
     said["transmit_uplink"] = draw(RARELY)
     forbidden = st.sampled_from(["promiscuous", "forged_transmits", "mac_changes"])
     said["forbids"] = draw(optional(forbidden))
-    taken = draw(st.sampled_from([[], [], [], ["promiscuous"], ["sink"], ["broadcast"]]))
-    said["ethernet_filter"] = {"frames": taken}
+    asked = draw(st.sets(st.sampled_from(GROUPS)))
+    said["ethernet_filter"] = {"frames": draw(st.sampled_from(TAKEN)), "addresses": sorted(asked)}
     management = {
         "flooding": draw(RARELY),
         "learning": draw(RARELY),
@@ -131,19 +156,19 @@ def ports(draw: Any, name: str, private: bool, uplinks: List[str]) -> Any:
         said["mac_learning"] = management
     if draw(RARELY):
         sids = ["a", "b"][: draw(st.integers(1, 2))]
-        said["mirror_sessions"] = [draw(sessions(sid, uplinks)) for sid in sids]
+        said["mirror_sessions"] = [draw(sessions(sid, uplinks, collectors)) for sid in sids]
     if uplinks and draw(RARELY):
         said["teaming"] = draw(teamings(uplinks))
     return said
 
 
 @st.composite
-def switches(draw: Any) -> Any:
+def switches(draw: Any, collectors: bool) -> Any:
     private = draw(st.booleans())
     uplinks = UPLINKS[: draw(st.integers(0, 3))]
     said: Dict[str, Any] = {
         "uplinks": uplinks,
-        "ports": [draw(ports(name, private, uplinks)) for name in PORTS],
+        "ports": [draw(ports(name, private, uplinks, collectors)) for name in PORTS],
     }
     # In their order, which is that of a team that names none.
     said["uplink_ports"] = [
@@ -162,12 +187,53 @@ def switches(draw: Any) -> Any:
     return said
 
 
+# Milliseconds, some of which are as long as the delay.
+PAUSES = [0, 1, 999, 1000, 5000]
+
+
+def histories(uplinks: List[str]) -> "st.SearchStrategy[Links]":
+    change = st.builds(LinkChange, st.sampled_from(PAUSES), st.sampled_from(uplinks), st.booleans())
+    return st.builds(
+        Links,
+        st.lists(change, min_size=1, max_size=6).map(tuple),
+        st.sampled_from(PAUSES),
+        st.sampled_from([0, 1000]),
+    )
+
+
 @st.composite
-def switches_with_links(draw: Any) -> Any:
-    """Likewise, and the uplinks that have no link."""
-    switch = draw(switches())
-    cut = draw(RARELY) or draw(RARELY)
-    return switch, [uplink for uplink in switch["uplinks"] if cut and draw(st.booleans())]
+def switches_with_links(draw: Any, collectors: bool = False) -> Any:
+    """Likewise, and what became of the links of its uplinks. Some mirror to collectors if there are
+    any."""
+    switch = draw(switches(collectors))
+    changed = switch["uplinks"] and (draw(RARELY) or draw(RARELY))
+    return switch, draw(histories(switch["uplinks"])) if changed else Links()
+
+
+@st.composite
+def mirroring_switches(draw: Any) -> Any:
+    """Likewise such as mirror to collectors what most frames are: of their VLANs."""
+    switch, links = draw(switches_with_links())
+    said: Dict[str, Any] = {
+        "sid": "collected",
+        "snap_length": draw(st.sampled_from([0, 64])),
+        "keeps_vlan": draw(st.booleans()),
+        "encapsulation": {"vlan": draw(st.sampled_from([0, 7]))},
+        "sent_by": [{"port": port} for port in PORTS],
+        "received_by": draw(st.lists(st.sampled_from([{"port": port} for port in PORTS]))),
+    }
+    switch["ports"][0]["mirror_sessions"] = [draw(wrapping_sessions(said))]
+    return switch, links
+
+
+@st.composite
+def choosy_switches(draw: Any) -> Any:
+    """Likewise such as have ports that ask for groups."""
+    switch, links = draw(switches_with_links())
+    for port in switch["ports"]:
+        asked = sorted(draw(st.sets(st.sampled_from(GROUPS))))
+        port["ethernet_filter"] = {"frames": ["multicast"], "addresses": asked}
+    return switch, links
 
 
 @st.composite
@@ -201,7 +267,7 @@ def sources(draw: Any, at: str) -> Any:
 
 
 RESERVED = ["01:80:c2:00:00:01", "01:80:c2:00:00:0e"]
-DESTINATIONS = [*[BROADCAST, SOME_GROUP] * 3, *ADDRESSES * 2, *RESERVED]
+DESTINATIONS = [*[BROADCAST, SOME_GROUP, *GROUPS] * 2, *ADDRESSES * 2, *RESERVED]
 
 
 @st.composite

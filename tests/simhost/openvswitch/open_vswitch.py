@@ -13,6 +13,8 @@ from typing import Any, Dict, List, Mapping, Optional, Sequence, Set, Tuple
 
 SCHEMA = "/usr/share/openvswitch/vswitch.ovsschema"
 PATIENCE = 30.0
+# Where switches send what is to be wrapped for collectors.
+GRE_PORT, ERSPAN_PORT = 65214, 65215
 # The tables that a switch fills by itself.
 LEARNED = (31, 32, 33, 34)
 
@@ -160,6 +162,29 @@ class OpenVSwitch:
             words += ["mtu_request=9190"]
             words += [f"options:tx_pcap={sent_to / name}"] if sent_to else []
         self._vsctl(*words)
+
+    def add_wrapping(
+        self, bridge: str, device: str, sent_to: Path, address: str, collectors: Sequence[str]
+    ) -> None:
+        """Has a bridge wrap what it sends to the ports of collectors, and send it from an address
+        over a device of another bridge, where these have addresses that are known."""
+        under = f"{bridge}-under"
+        words = ["add-br", under, *self._settings(under)]
+        words += ["--", "add-port", under, device, "--", "set", "Interface", device, "type=dummy"]
+        words += ["ofport_request=1", "mtu_request=9190", f"options:tx_pcap={sent_to / device}"]
+        gre = ["remote_ip=flow", "in_key=1", "out_key=flow"]
+        erspan = [*gre, *(f"erspan_{what}=flow" for what in ("ver", "idx", "dir", "hwid"))]
+        for kind, number, options in ("gre", GRE_PORT, gre), ("erspan", ERSPAN_PORT, erspan):
+            name = f"{bridge}-{kind}"
+            words += ["--", "add-port", bridge, name, "--", "set", "Interface", name]
+            words += [f"type={kind}", f"ofport_request={number}"]
+            words += [f"options:{option}" for option in options]
+        self._vsctl(*words)
+        self._ofctl("add-flow", under, "in_port=LOCAL actions=output:1")
+        self.ask("netdev-dummy/ip4addr", under, f"{address}/24")
+        for number, collector in enumerate(collectors):
+            self.ask("ovs/route/add", f"{collector}/32", under)
+            self.ask("tnl/arp/set", under, collector, f"02:00:00:00:c0:{number:02x}")
 
     def set_link(self, bridge: str, number: int, is_up: bool) -> None:
         """Pulls or plugs the cable of a device, and waits until the bridge has seen it."""

@@ -1,13 +1,12 @@
 """The rules of frames by themselves, written from what the settings mean and not from how a switch
 is told of them: where a frame must come out, and with which tags. Of a switch that has learned
-nothing, and that was told of its links."""
+nothing, and that was told what became of its links."""
 
 from collections import Counter
 from dataclasses import dataclass
-from itertools import chain, combinations
+from itertools import chain
 from typing import (
     Any,
-    Collection,
     Counter as Counts,
     Dict,
     Iterable,
@@ -21,22 +20,30 @@ from typing import (
 )
 
 from frames import TAG, TAG_TYPES, Copy, Frame, Tag, Tags
+from links import Links
+from team_rules import Order, Teams
 
 # The tag of the VLAN that a frame is in, and those that are left.
 Entered = Tuple[Tag, Tags]
 
-# Uplinks, the first one first.
-Order = Tuple[str, ...]
-
 GREATEST_VLAN = 4094
 LARGEST_TAGS = 2
 HEADER = 14
+# Groups that nobody has to ask for: all stations, those of the link, those of its neighbours.
+FOR_EVERYBODY = ("ff:ff:ff:ff:ff:ff", "01:00:5e:00:00:", "33:33:00:00:00:", "33:33:ff:")
 # Of the place of an address that is known: past the uplinks.
 BEYOND = "beyond"
 
 
 def is_multicast(address: str) -> bool:
     return bool(int(address[:2], 16) & 1)
+
+
+def collector(address: str, encapsulation: Mapping[str, Any], leaves: bool) -> str:
+    """A collector, with what wraps its copies: only ERSPAN III says which way a frame goes."""
+    kind = encapsulation["type"]
+    number = encapsulation["key" if kind == "gre" else "id"]
+    return f"{address} in {kind} {number}{' leaving' * (leaves and kind == 'erspan3')}"
 
 
 @dataclass(frozen=True)
@@ -63,15 +70,16 @@ class Rules:
         switch: Mapping[str, Any],
         numbers: Mapping[str, int],
         clients: Sequence[Mapping[str, Any]],
-        down: Collection[str] = (),
+        links: Links = Links(),
     ) -> None:
         self.switch = switch
-        self.down = down
+        self.links = links
+        self.teams = Teams(switch, numbers, links)
         self.blocked = [
             port["uplink"] for port in switch.get("uplink_ports", []) if port.get("blocked")
         ]
         self.numbers = numbers
-        self.uplinks: List[str] = list(switch.get("uplinks", []))
+        self.uplinks = self.teams.uplinks
         self.ports: Dict[str, Mapping[str, Any]] = {
             port["id"]: port for port in switch.get("ports", [])
         }
@@ -228,44 +236,6 @@ class Rules:
             return inside.rest
         return ((inside.vlan, inside.priority), *inside.rest)
 
-    # Teams
-
-    def _balance(self, port: str) -> str:
-        teaming = self.ports[port].get("teaming", self.switch.get("teaming", {}))
-        return str(teaming.get("balance", "port"))
-
-    def uplinks_of(self, port: str) -> List[str]:
-        """Where a port's frames may go: one of them, the first if the balance has it so."""
-        teaming = self.ports[port].get("teaming", self.switch.get("teaming", {}))
-        named = teaming.get("active", []) + teaming.get("standby", [])
-        count = len(teaming.get("active", [])) or (1 if named else len(self.uplinks))
-        used = [uplink for uplink in named or self.uplinks if uplink not in self.down][:count]
-        balance = self._balance(port)
-        if balance in ("mac", "ip") or not used:
-            return used
-        first = 0 if balance in ("explicit", "none") else self.numbers[port] % len(used)
-        return [used[first]]
-
-    def receives_at(self, port: str, uplink: str, choosing: Optional[Set[Order]]) -> bool:
-        """Whether what comes in at an uplink is for a port; what is for a client, for those whose
-        sources choose that uplink for it."""
-        uplinks = self.uplinks_of(port)
-        if self._balance(port) == "ip":
-            return uplink in uplinks
-        if self._balance(port) == "mac" and choosing is not None and len(uplinks) > 1:
-            return uplink in uplinks and (*uplinks,) in choosing
-        return uplinks[:1] == [uplink]
-
-    def _choosing(self, place: Optional[str]) -> Iterator[Optional[Set[Order]]]:
-        """By which orders of uplinks a frame for a client may have come in: nobody here knows what
-        is made of its address."""
-        if place not in self.connected:
-            yield None
-            return
-        orders = {(*self.uplinks_of(port),) for port in self.ports if self._balance(port) == "mac"}
-        for count in range(len(orders) + 1):
-            yield from (set(some) for some in combinations(sorted(orders), count))
-
     # What ports want
 
     def _takes_all(self, port: str) -> bool:
@@ -279,6 +249,14 @@ class Rules:
         sink = "sink" in said.get("ethernet_filter", {}).get("frames", [])
         floods = said.get("mac_learning", {}).get("flooding", False)
         return bool(sink or floods or self._takes_all(port))
+
+    def _asks_for(self, port: str, group: str) -> bool:
+        """Whether a port has nothing against the frames of a group: who says which ones it wants
+        gets no others, but those without which nothing works."""
+        said = self.ports[port].get("ethernet_filter", {})
+        frames = set(said.get("frames", []))
+        is_choosy = frames & {"multicast", "hashed_multicast"} and "all_multicast" not in frames
+        return not is_choosy or group.startswith(FOR_EVERYBODY) or group in said["addresses"]
 
     # Addresses
 
@@ -326,6 +304,10 @@ class Rules:
         by_wire_only = self.ports[port].get("transmit_uplink", False)
         return bool(by_wire_only and self.macs.get(port) == frame.source)
 
+    def _choosing(self, place: Optional[str]) -> List[Optional[Set[Order]]]:
+        """By which orders of uplinks what is for a place may have come in."""
+        return [*self.teams.choices()] if place in self.connected else [None]
+
     # Mirrors
 
     def _sessions(self) -> Iterator[Mapping[str, Any]]:
@@ -344,16 +326,22 @@ class Rules:
     ) -> Counts[Copy]:
         """The copies of a frame that came in at `at`, for what mirrors that source."""
         out: Counts[Copy] = Counter()
+        leaves = ("port" if direction == "received_by" else "uplink") in source
         for session in self._sessions():
             if not self._is_taker(session) and source in session.get(direction, []):
-                out += self._copied(session, inside, at)
+                out += self._copied(session, inside, at, leaves)
         return out
 
-    def _copied(self, session: Mapping[str, Any], inside: Inside, at: str) -> Counts[Copy]:
+    def _copied(
+        self, session: Mapping[str, Any], inside: Inside, at: str, leaves: bool = False
+    ) -> Counts[Copy]:
+        """The copies of a frame that comes in, or that leaves the switch."""
         out: Counts[Copy] = Counter()
         most = session.get("snap_length", 0)
         for to in session["to"]:
             place = to.get("port", to.get("uplink"))
+            if "ip" in to:
+                place = collector(to["ip"], session["encapsulation"], leaves)
             tags = inside.rest
             remote = self._encapsulation(session) if "uplink" in to else 0
             # No frame has three tags.
@@ -362,14 +350,14 @@ class Rules:
             if remote:
                 tags = ((remote, 0), *tags)
             # The switch sends nothing to where it came from.
-            reached = (
-                place not in self.blocked
-                if "uplink" in to
-                else place in self.connected and not self._is_cut_off(place)
-            )
-            if reached and place != at:
+            if self._may_get_copies(to) and place != at:
                 out[(place, tags, inside.cut(most, tags))] += 1
         return out
+
+    def _may_get_copies(self, to: Mapping[str, str]) -> bool:
+        if "port" in to:
+            return to["port"] in self.connected and not self._is_cut_off(to["port"])
+        return to.get("uplink") not in self.blocked
 
     @staticmethod
     def _encapsulation(session: Mapping[str, Any]) -> int:
@@ -401,7 +389,7 @@ class Rules:
         for session in self._sessions():
             if self._is_taker(session) and vlan in self._taken(session):
                 ports = [to["port"] for to in session["to"] if to["port"] in self.connected]
-                if ports and self.receives_at(ports[0], at, None):
+                if ports and self.teams.receives_at(ports[0], at, None):
                     out += self._copied(session, inside, at)
         return out
 
@@ -433,7 +421,7 @@ class Rules:
         by_wire_only = self.ports[at].get("transmit_uplink", False)
         if not by_wire_only:
             out += self._to_ports(at, frame, inside, place, None)
-        uplinks = self.uplinks_of(at)
+        uplinks = self.teams.uplinks_of(at)
         if not uplinks or (place not in (None, BEYOND) and not by_wire_only):
             return [out]
         return [out + self._over(uplink, inside, at) for uplink in uplinks]
@@ -471,13 +459,14 @@ class Rules:
     ) -> bool:
         """Whether a port wants a frame, and is one for which it may come in there."""
         to_many = is_multicast(frame.destination)
-        wanted = to_many or port == place or self._takes_all(port)
-        wanted = wanted or (place is None and self._takes_unknown(port))
+        wanted = to_many and self._asks_for(port, frame.destination)
+        wanted = wanted or port == place or self._takes_all(port)
+        wanted = wanted or (place is None and not to_many and self._takes_unknown(port))
         if not wanted or port == at or port not in self.connected:
             return False
         if at not in self.uplinks:
             return True
-        return self.receives_at(port, at, choosing) and not self._sent_by_wire(port, frame)
+        return self.teams.receives_at(port, at, choosing) and not self._sent_by_wire(port, frame)
 
 
 def _is_malformed(frame: Frame) -> bool:

@@ -20,6 +20,7 @@ from drawn_switches import (
     switches_with_links,
 )
 from frames import Frame
+from links import Links
 from open_vswitch import OpenVSwitch
 from rules import Rules
 from seeds import options
@@ -45,10 +46,10 @@ def arrives(bench: Bench, rules: Rules, at: str, frame: Frame) -> None:
 def test_frames_come_out_where_the_rules_say(
     bench: Bench, drawn: Any, clients: Any, sent: List[Tuple[str, Frame]]
 ) -> None:
-    switch, down = drawn
-    rules = bench.load(switch, clients, down=down)
+    switch, links = drawn
+    rules = bench.load(switch, clients, links=links)
     for at, frame in sent:
-        if at in bench.devices and at not in down:
+        if at in bench.devices and at not in links.down:
             arrives(bench, rules, at, frame)
 
 
@@ -69,13 +70,13 @@ def at_two_uplinks(**of_both: Any) -> Dict[str, Any]:
 def test_another_link_would_be_noticed(bench: Bench) -> None:
     clients = [{"port": "p1", "mac": MACS["p1"]}]
     out, into = Frame(BROADCAST, MACS["p1"]), Frame(BROADCAST, STRANGER)
-    states: List[List[str]] = [[], ["nic0"], ["nic0", "nic1"]]
-    for down in states:
-        rules = bench.load(at_two_uplinks(), clients, down=down)
+    states = [Links(), Links.cut("nic0"), Links.cut("nic0", "nic1")]
+    for links in states:
+        rules = bench.load(at_two_uplinks(), clients, links=links)
         arrives(bench, rules, "p1", out)
         others = [Rules(at_two_uplinks(), rules.numbers, clients, one) for one in states]
         for other in others:
-            if other.down != down:
+            if other.links != links:
                 with pytest.raises(AssertionError):
                     arrives(bench, other, "p1", out)
     rules = bench.load(at_two_uplinks(), clients)
