@@ -1,7 +1,5 @@
 """Members by chance, and frames of groups: each comes out where the rules of groups say."""
 
-import ipaddress
-import struct
 from typing import Any, Dict, List, Mapping, Set
 
 import pytest
@@ -10,41 +8,10 @@ from hypothesis import strategies as st
 
 from bench import Bench
 from compiler import Compiler
-from drawn_switches import MACS, PORTS, STRANGER
-from frames import Frame
+from drawn_switches import MACS, PORTS
+from group_traffic import GROUPS, HEARS, OF_THE_LINK, SOURCES, UPLINK, VLAN, family, frame
 from open_vswitch import OpenVSwitch
 from seeds import options
-
-VLAN = 7
-UPLINK = "nic0"
-# Two of each family that may have members, and one that all get.
-GROUPS = ["239.1.1.1", "239.1.1.2", "ff0e::1", "ff0e::2"]
-OF_THE_LINK = ["224.0.0.5", "ff02::5"]
-SOURCES = {4: ["10.0.0.1", "10.0.0.2"], 6: ["fd00::1", "fd00::2"]}
-# The families to which each mode listens.
-HEARS = {"snooping": {4, 6}, "igmp": {4}, "mld": {6}}
-
-
-def family(address: str) -> int:
-    return ipaddress.ip_address(address).version
-
-
-def ethernet(group: str) -> str:
-    last = ipaddress.ip_address(group).packed[-4:]
-    if family(group) == 6:
-        return "33:33:" + last.hex(":")
-    return "01:00:5e:" + bytes([last[1] & 0x7F, *last[2:]]).hex(":")
-
-
-def frame(group: str, source: str, at: str) -> Frame:
-    ends = ipaddress.ip_address(source).packed + ipaddress.ip_address(group).packed
-    if family(group) == 4:
-        packet = b"\x08\x00" + struct.pack("!BBHHHBBH", 0x45, 0, 28, 0, 0, 8, 17, 0) + ends
-    else:
-        packet = b"\x86\xdd" + struct.pack("!IHBB", 6 << 28, 8, 17, 8) + ends
-    tags = ((VLAN, 0),) if at == UPLINK else ()
-    content = packet + struct.pack("!HHHH", 5000, 5001, 8, 0)
-    return Frame(ethernet(group), MACS.get(at, STRANGER), tags, content=content.ljust(48, b"\0"))
 
 
 @st.composite
