@@ -4,55 +4,30 @@ what Open vSwitch is told, and one that is kept does not."""
 import json
 import os
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, Tuple
+from typing import Any, Dict, List, Mapping, Optional, Sequence, Tuple
 
 import pytest
 
 from compiler import Compiler
+from obeyed import CLIENTS, OBEYED, Shown, with_settings
 
 PROPERTIES = json.loads(
     Path(os.environ["BUILD_DIR"], "simhost", "properties.json").read_text(encoding="utf-8")
 )["properties"]
+TESTS = Path(__file__).parents[2]
 SETTINGS = [known for known in PROPERTIES if not known["computed"]]
-CLIENTS = [
-    {"port": "p1", "mac": "02:00:00:00:00:01"},
-    {"port": "p2"},
-]
-TEAM = {"balance": "explicit", "active": ["u2"], "standby": ["u1"]}
-MAP = [
-    {"primary": 70, "secondary": 70, "type": "promiscuous"},
-    {"primary": 70, "secondary": 7, "type": "isolated"},
-]
-SESSION = {"sid": "s", "to": [{"port": "p2"}]}
-
-# Values of the settings that frames obey, each of which changes something.
-OBEYED: Dict[Tuple[str, str], List[Any]] = {
-    ("switch", "mtu"): [1280, 9000],
-    ("switch", "disabled"): [True],
-    ("switch", "teaming"): [TEAM, {"balance": "mac"}, {"balance": "ip"}, {"balance": "explicit"}],
-    ("switch", "private_vlans"): [MAP],
-    ("switch", "mac_learning"): [{"aging_time": 60}, {"limit": 0}],
-    ("switch", "multicast"): ["snooping", "igmp", "mld"],
-    ("switch", "uplink_mirror_sessions"): [[{**SESSION, "received_by": [{"uplink": "u1"}]}]],
-    ("port", "teaming"): [TEAM],
-    ("port", "uplink"): ["u2"],
-    ("port", "transmit_uplink"): [True],
-    ("port", "vlan"): [7, {"trunk": [7]}, {"guest_tagging": True}, {"priority": 3}],
-    ("port", "nested_tag"): [True],
-    ("port", "forbids"): [["forged_transmits"]],
-    ("port", "mac_learning"): [{"learning": True}, {"flooding": True}],
-    ("port", "ethernet_filter"): [
-        {"frames": ["promiscuous"]},
-        {"frames": ["sink"]},
-        {"frames": ["multicast"], "addresses": ["01:00:5e:01:01:01"]},
-    ],
-    ("port", "mirror_sessions"): [[{**SESSION, "sent_by": [{"port": "p1"}]}]],
-    ("port", "blocked"): [True],
-}
 # Values of those that documents name and no frame looks at.
-KEPT: Dict[Tuple[str, str], List[Any]] = {
-    ("port", "alias"): ["somebody"],
-    ("port", "connection"): [77],
+KEPT = {
+    ("port", "alias"): [Shown("somebody", [])],
+    ("port", "connection"): [Shown(77, [])],
+}
+ERSPAN: Dict[str, Any] = {"type": "erspan3", "id": 7}
+WRAPS: Dict[str, Any] = {
+    "sid": "s",
+    "type": "encapsulated",
+    "sent_by": [{"port": "p1"}],
+    "to": [{"ip": "192.0.2.7"}],
+    "encapsulation": ERSPAN,
 }
 
 
@@ -64,17 +39,15 @@ def in_words(known: Mapping[str, Any]) -> str:
     return "_".join(named(known))
 
 
-def told(compiler: Compiler, scope: str, settings: Mapping[str, Any]) -> Any:
+def told(
+    compiler: Compiler,
+    scope: str,
+    settings: Mapping[str, Any],
+    clients: Sequence[Mapping[str, Any]] = CLIENTS,
+    host: Optional[Mapping[str, Any]] = None,
+) -> Any:
     """What Open vSwitch is told of a switch that has them, or whose first port has."""
-    switch: Dict[str, Any] = {
-        "uplinks": ["u1", "u2"],
-        "ports": [{"id": "p1", "vlan": 7}, {"id": "p2", "vlan": 7}],
-    }
-    if scope == "port":
-        switch["ports"][0].update(settings)
-    else:
-        switch.update(settings)
-    made = compiler.compile(switch, CLIENTS)
+    made = compiler.compile(with_settings(scope, dict(settings)), clients, host=host)
     return sorted(made["flows"]), sorted(made["groups"])
 
 
@@ -85,10 +58,10 @@ def test_there_are_values_for_each_setting_that_documents_name() -> None:
 @pytest.mark.parametrize("known", [one for one in SETTINGS if "name" in one], ids=in_words)
 def test_the_table_is_true(compiler: Compiler, known: Mapping[str, Any]) -> None:
     scope, name = named(known)
-    plain = told(compiler, scope, {"vlan": 5} if name == "vlan" else {})
-    for value in [*OBEYED.get((scope, name), []), *KEPT.get((scope, name), [])]:
-        changes = told(compiler, scope, {name: value}) != plain
-        assert known["frames"] == ("obey" if changes else "kept"), value
+    for one in OBEYED.get((scope, name), []) + KEPT.get((scope, name), []):
+        plain = told(compiler, scope, one.beside, one.clients)
+        changes = told(compiler, scope, {**one.beside, name: one.value}, one.clients) != plain
+        assert known["frames"] == ("obey" if changes else "kept"), one.value
 
 
 def raw(known: Mapping[str, Any]) -> Dict[str, Any]:
@@ -126,10 +99,46 @@ def test_what_frames_cannot_obey_is_named(
     (known,) = (one for one in SETTINGS if one.get("name") == setting)
     assert known["beyond_frames"].startswith(f"`{member}`: ")
     scope = known["scope"]
-    session = OBEYED[(scope, setting)][0][0]
+    session = OBEYED[(scope, setting)][0].value[0]
     assert told(compiler, scope, {setting: [{**session, member: value}]}) == told(
         compiler, scope, {setting: [session]}
     )
+
+
+KEPT_OF_WRAPPING: List[Dict[str, Any]] = [{}, {"vlan": 7}, {"cos": 3}, {"granularity": 2}]
+KEPT_FLAGS = ["all_available", "reverse", "best_effort", "shotgun", "block_output"]
+
+
+@pytest.mark.parametrize(
+    "scope, name, values",
+    [
+        ("switch", "teaming", [{"flags": [flag] * few} for flag in KEPT_FLAGS for few in (0, 1)]),
+        ("port", "ethernet_filter", [{"frames": few} for few in ([], ["unicast"], ["broadcast"])]),
+        (
+            "port",
+            "mirror_sessions",
+            [[{**WRAPS, "encapsulation": {**ERSPAN, **more}}] for more in KEPT_OF_WRAPPING],
+        ),
+    ],
+)
+def test_what_is_kept_of_a_setting_changes_nothing(
+    compiler: Compiler, scope: str, name: str, values: List[Any]
+) -> None:
+    host = {"underlay": {"device": "eth9", "address": "192.0.2.1/24"}}
+    first, *others = (told(compiler, scope, {name: value}, host=host) for value in values)
+    assert others == [first] * len(others)
+
+
+@pytest.mark.parametrize(
+    "option", ["ReversePathFwdCheck", "ReversePathFwdCheckPromisc", "AllowFastPath"]
+)
+def test_options_that_are_kept_change_nothing(compiler: Compiler, option: str) -> None:
+    said = (TESTS.parent / "simhost" / "SCENARIOS.md").read_text(encoding="utf-8")
+    (row,) = (line for line in said.splitlines() if line.startswith("| ") and f"`{option}`" in line)
+    assert "kept without effect" in row or "likewise" in row
+    hosts = ({"runtime_options": {option: value}} for value in (0, 1))
+    off, on = (told(compiler, "port", {}, host=host) for host in hosts)
+    assert off == on
 
 
 def test_nothing_else_is_beyond_them() -> None:
