@@ -16,12 +16,12 @@ Loop::Loop() : epoll_(owned(epoll_create1(EPOLL_CLOEXEC), "epoll_create1")) {}
 Loop::Watch Loop::watch(int descriptor, Work ready) {
   epoll_event event{};
   event.events = EPOLLIN;
-  event.data.fd = descriptor;
+  event.data.u64 = ++last_watch_;
   if (epoll_ctl(epoll_.number(), EPOLL_CTL_ADD, descriptor, &event) != 0) {
     fail_with_errno("epoll_ctl");
   }
-  watched_[descriptor] = std::make_shared<Waiting>(Waiting{std::move(ready)});
-  return {*this, descriptor};
+  watched_[last_watch_] = std::make_shared<Waiting>(Waiting{std::move(ready)});
+  return {*this, descriptor, last_watch_};
 }
 
 Loop::Timer Loop::after(Clock::duration wait, Work due) {
@@ -55,7 +55,7 @@ void Loop::turn(Clock::duration longest) {
   }
   // What is done for one may end others: those are looked up when it is their turn.
   for (int at = 0; at < count; ++at) {
-    auto const found = watched_.find(events.at(static_cast<std::size_t>(at)).data.fd);
+    auto const found = watched_.find(events.at(static_cast<std::size_t>(at)).data.u64);
     if (found != watched_.end()) {
       auto const waiting = found->second;
       waiting->work();
@@ -78,6 +78,7 @@ Loop::Watch &Loop::Watch::operator=(Watch &&other) noexcept {
     end();
     loop_ = std::exchange(other.loop_, nullptr);
     descriptor_ = other.descriptor_;
+    number_ = other.number_;
   }
   return *this;
 }
@@ -85,7 +86,7 @@ Loop::Watch &Loop::Watch::operator=(Watch &&other) noexcept {
 void Loop::Watch::wait_for(Ready what) {
   epoll_event event{};
   event.events = what == Ready::to_write ? EPOLLOUT : EPOLLIN;
-  event.data.fd = descriptor_;
+  event.data.u64 = number_;
   if (epoll_ctl(loop_->epoll_.number(), EPOLL_CTL_MOD, descriptor_, &event) != 0) {
     fail_with_errno("epoll_ctl");
   }
@@ -94,7 +95,7 @@ void Loop::Watch::wait_for(Ready what) {
 void Loop::Watch::end() {
   if (auto *const loop = std::exchange(loop_, nullptr)) {
     epoll_ctl(loop->epoll_.number(), EPOLL_CTL_DEL, descriptor_, nullptr);
-    loop->watched_.erase(descriptor_);
+    loop->watched_.erase(number_);
   }
 }
 

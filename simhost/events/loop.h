@@ -48,7 +48,9 @@ class Loop {
   [[nodiscard]] int milliseconds_to_wait(Clock::duration longest) const;
 
   Descriptor epoll_;
-  std::map<int, std::shared_ptr<Waiting>> watched_;
+  // By numbers of which none is used twice, as those of descriptors are.
+  std::map<std::uint64_t, std::shared_ptr<Waiting>> watched_;
+  std::uint64_t last_watch_ = 0;
   Times times_;
   bool stopped_ = false;
 };
@@ -68,10 +70,12 @@ class Loop::Watch {
 
  private:
   friend class Loop;
-  Watch(Loop &loop, int descriptor) : loop_(&loop), descriptor_(descriptor) {}
+  Watch(Loop &loop, int descriptor, std::uint64_t number)
+      : loop_(&loop), descriptor_(descriptor), number_(number) {}
 
   Loop *loop_ = nullptr;
   int descriptor_ = -1;
+  std::uint64_t number_ = 0;
 };
 
 class Loop::Timer {

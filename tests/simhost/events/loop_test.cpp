@@ -91,6 +91,27 @@ TEST(ALoop, LeavesOneAloneThatAnotherEndedInTheSameTurn) {
   EXPECT_EQ(seen.size(), 1U);
 }
 
+TEST(ALoop, TakesNoDescriptorForOneThatHadItsNumberInTheSameTurn) {
+  Loop loop;
+  Pipe pipes[2];
+  Pipe const empty;
+  int seen = 0;
+  Loop::Watch watches[2];
+  auto const replaces_the_other = [&](int own) {
+    return [&, own] {
+      watches[1 - own].end();
+      ASSERT_GE(dup2(empty.out.number(), pipes[1 - own].out.number()), 0);
+      watches[1 - own] = loop.watch(pipes[1 - own].out.number(), [&] { ++seen; });
+    };
+  };
+  watches[0] = loop.watch(pipes[0].out.number(), replaces_the_other(0));
+  watches[1] = loop.watch(pipes[1].out.number(), replaces_the_other(1));
+  pipes[0].write_one();
+  pipes[1].write_one();
+  loop.turn(10s);
+  EXPECT_EQ(seen, 0);
+}
+
 TEST(ALoop, MayReplaceAWatchWithinItsOwnWork) {
   Loop loop;
   Pipe const pipe;
