@@ -120,24 +120,23 @@ void Bridges::count(storage::SwitchKey key) {
 }
 
 // What is wrong with one switch is no reason to stop the others.
-std::size_t Bridges::try_flows(WantedBridge const &wanted, std::uint64_t change,
-                               std::set<std::string> const &added, Forget const &forget,
-                               Deadline deadline) {
+void Bridges::try_flows(WantedBridge const &wanted, std::uint64_t change,
+                        std::set<std::string> const &added, Forget const &forget, Deadline deadline,
+                        Applied &applied) {
   auto const refuse = [&](std::exception const &why) {
-    told_.refused(wanted.alias, why.what());
+    applied.refused.push_back(unfit(wanted, why));
     if (auto *const bridge = find(wanted.key)) {
       bridge->doubt();
     }
-    return std::size_t{0};
   };
   try {
-    return connected(wanted, deadline).apply(wanted, change, added, forget, deadline);
+    applied.changed += connected(wanted, deadline).apply(wanted, change, added, forget, deadline);
   } catch (openflow::Refused const &refused) {
-    return refuse(refused);
+    refuse(refused);
   } catch (std::runtime_error const &) {
     throw;  // of the connection
   } catch (std::exception const &error) {
-    return refuse(error);
+    refuse(error);
   }
 }
 
@@ -167,7 +166,7 @@ Unseen Bridges::age() {
   return next;
 }
 
-std::size_t Bridges::apply(Wanted const &wanted, Forget const &forget) {
+Bridges::Applied Bridges::apply(Wanted const &wanted, Forget const &forget) {
   std::size_t devices = 0;
   for (auto const &bridge : wanted.bridges) {
     devices += bridge.row.devices.size();
@@ -188,17 +187,17 @@ std::size_t Bridges::apply(Wanted const &wanted, Forget const &forget) {
   auto const added = apply_rows(wanted, any_new ? bare : rows, deadline);
   std::erase_if(bridges_, [](auto const &bridge) { return bridge.second->is_altered(); });
   std::erase_if(bridges_, goes);
-  std::size_t changed = 0;
+  Applied applied;
   for (auto const &bridge : wanted.bridges) {
-    changed += try_flows(bridge, wanted.change, added, any_new ? nullptr : forget, deadline);
+    try_flows(bridge, wanted.change, added, any_new ? nullptr : forget, deadline, applied);
   }
   if (any_new) {
     apply_rows(wanted, rows, deadline);
-    if (changed > 0 && forget) {
+    if (applied.changed > 0 && forget) {
       forget(wanted.bridges.front().row.name, wanted.change);
     }
   }
-  return changed;
+  return applied;
 }
 
 }  // namespace simhost::daemon

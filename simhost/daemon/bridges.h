@@ -33,8 +33,6 @@ class Bridges {
     std::string host;
     /// The database has rows that are others than before, whoever changed them.
     std::function<void()> changed;
-    /// A switch cannot be run as it is wanted, and goes on as it was.
-    std::function<void(std::string const &alias, std::string const &why)> refused;
     /// The connection to the database ended.
     std::function<void()> disturbed;
     /// What bridges tell.
@@ -56,10 +54,13 @@ class Bridges {
   /// a partner. Nothing while there is no bridge of it.
   [[nodiscard]] std::optional<bool> is_live(storage::SwitchKey key, openflow::Port port) const;
   using Forget = RunningBridge::Forget;
+  struct Applied {
+    std::size_t changed = 0;     ///< flows and groups, markers not counted
+    std::vector<Unfit> refused;  ///< by Open vSwitch
+  };
   /// Makes everything as it is wanted, and returns when it is in force: for frames of kinds that
-  /// were there before, only with `forget`. Returns how many flows and groups it changed, markers
-  /// not counted.
-  std::size_t apply(Wanted const &wanted, Forget const &forget = nullptr);
+  /// were there before, only with `forget`.
+  Applied apply(Wanted const &wanted, Forget const &forget = nullptr);
   /// Sends frames from the bridge of a switch; returns whether there is one.
   bool send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
   /// Tells what all bridges counted, and where addresses moved.
@@ -80,10 +81,9 @@ class Bridges {
   std::set<std::string> apply_rows(Wanted const &wanted,
                                    std::vector<openvswitch::BridgeRow> const &rows,
                                    openvswitch::Deadline deadline);
-  // Returns how many flows and groups it changed.
-  std::size_t try_flows(WantedBridge const &wanted, std::uint64_t change,
-                        std::set<std::string> const &added, Forget const &forget,
-                        openvswitch::Deadline deadline);
+  void try_flows(WantedBridge const &wanted, std::uint64_t change,
+                 std::set<std::string> const &added, Forget const &forget,
+                 openvswitch::Deadline deadline, Applied &applied);
   RunningBridge &connected(WantedBridge const &wanted, openvswitch::Deadline deadline);
   [[nodiscard]] RunningBridge *find(storage::SwitchKey key) const;
 

@@ -181,13 +181,11 @@ void Daemon::connect() {
   attempt([this] {
     bridges_.emplace(
         loop_, options_.database, memory_,
-        Bridges::Told{
-            .owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
-            .host = host_,
-            .changed = [this] { sync_soon(); },
-            .refused = [this](auto const &alias, auto const &why) { add_refused(alias, why); },
-            .disturbed = [this] { connect_later(); },
-            .of_bridges = told_by_bridges()});
+        Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
+                      .host = host_,
+                      .changed = [this] { sync_soon(); },
+                      .disturbed = [this] { connect_later(); },
+                      .of_bridges = told_by_bridges()});
     sync();
   });
 }
@@ -323,30 +321,6 @@ void Daemon::follow_devices() {
   }
 }
 
-// A device that was made anew under its name has to be put at its bridge anew.
-bool Daemon::is_new_device(std::string const &name) const {
-  auto const device = devices_.find(name);
-  auto const known = at_bridges_.find(name);
-  return device && known != at_bridges_.end() && known->second != device->index;
-}
-
-// Returns how many flows and groups that changed.
-std::size_t Daemon::take_out_new_devices(Wanted const &wanted, Bridges::Forget const &forget) {
-  bool const has_new = std::ranges::any_of(wanted.bridges, [&](auto const &bridge) {
-    return std::ranges::any_of(bridge.row.devices,
-                               [&](auto const &device) { return is_new_device(device.first); });
-  });
-  if (!has_new) {
-    return 0;
-  }
-  auto others = wanted;
-  for (auto &bridge : others.bridges) {
-    std::erase_if(bridge.row.devices,
-                  [&](auto const &device) { return is_new_device(device.first); });
-  }
-  return bridges_->apply(others, forget);
-}
-
 // Without which a change is in force for most frames only. Where it cannot be, to try once more is
 // of no use.
 bool Daemon::forget_cached_flows(std::string const &bridge, std::uint64_t generation) {
@@ -379,7 +353,7 @@ void Daemon::sync() {
     beacons_.follow(key, network);
     collectors_.follow(network);
   };
-  auto const all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
+  auto all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
   bool const counts_anew = counting_.follow(transaction);
   transaction.commit();
   if (counts_anew) {
@@ -393,8 +367,13 @@ void Daemon::sync() {
       return forget_cached_flows(bridge, generation);
     };
   }
-  auto changed = take_out_new_devices(all, forget);
-  changed += bridges_->apply(all, forget);
+  std::size_t changed = 0;
+  if (auto const others = at_bridges_.without_new(all, devices_)) {
+    changed = bridges_->apply(*others, forget).changed;
+  }
+  auto const applied = bridges_->apply(all, forget);
+  changed += applied.changed;
+  all.leave_out(applied.refused);
   if (changed > 0 && is_told) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
@@ -402,10 +381,6 @@ void Daemon::sync() {
   follow_tunnels(all);
   settle(all);
   counting_.save_new();
-}
-
-void Daemon::add_refused(std::string const &alias, std::string const &why) {
-  troubles_.add(fmt::format("the switch '{}' cannot be run: {}", alias, why));
 }
 
 void Daemon::follow_tunnels(Wanted const &wanted) {
@@ -435,18 +410,7 @@ void Daemon::announce(storage::SwitchKey key, std::vector<openvswitch::Announced
 }
 
 void Daemon::settle(Wanted const &wanted) {
-  at_bridges_.clear();
-  std::set<std::string> uplinks;
-  for (auto const &bridge : wanted.bridges) {
-    for (auto const &[name, number] : bridge.row.devices) {
-      if (auto const device = devices_.find(name)) {
-        at_bridges_[name] = device->index;
-      }
-      if (!bridge.ports.contains(name)) {
-        uplinks.insert(name);
-      }
-    }
-  }
+  at_bridges_.follow(wanted, devices_);
   for (auto const &bridge : wanted.bridges) {
     for (auto const &[name, number] : bridge.row.devices) {
       if (auto const other = bridges_->elsewhere(name)) {
@@ -455,7 +419,7 @@ void Daemon::settle(Wanted const &wanted) {
       }
     }
   }
-  wires_.follow(uplinks);
+  wires_.follow(at_bridges_.uplinks());
   for (auto const &[device, error] : bridges_->errors()) {
     troubles_.add(fmt::format("Open vSwitch cannot use the device {}: {}", device, error));
   }
@@ -484,7 +448,7 @@ void Daemon::settle(Wanted const &wanted) {
   in_force_ = wanted.change;
   sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {
-    add_refused(unfit.alias, unfit.why);
+    troubles_.add(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
   }
   reply_to_waiting();
   if (settled_) {

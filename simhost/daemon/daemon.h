@@ -16,6 +16,7 @@
 #include "daemon/compiler.h"
 #include "daemon/counting/announced.h"
 #include "daemon/counting/counting.h"
+#include "daemon/devices/devices_at_bridges.h"
 #include "daemon/devices/network_devices.h"
 #include "daemon/devices/uplink_wires.h"
 #include "daemon/groups/group_members.h"
@@ -69,10 +70,8 @@ class Daemon {
   void sync();
   bool forget_cached_flows(std::string const &bridge, std::uint64_t generation);
   void follow_devices();
-  std::size_t take_out_new_devices(Wanted const &wanted, Bridges::Forget const &forget);
   // The way of the machine to the hosts beyond tunnels, and what is wrong with it.
   void follow_tunnels(Wanted const &wanted);
-  void add_refused(std::string const &alias, std::string const &why);
   void settle(Wanted const &wanted);
   void reply_to_waiting();
 
@@ -93,7 +92,6 @@ class Daemon {
   void remember_soon();
   void balance();
   void look_at_wires();
-  [[nodiscard]] bool is_new_device(std::string const &name) const;
   [[nodiscard]] Json groups(Json const &question) const;
   [[nodiscard]] Json multicast_mode(Json const &question) const;
   [[nodiscard]] Json bridge(Json const &question) const;
@@ -109,6 +107,7 @@ class Daemon {
   std::string host_;
   StateWatch state_watch_;
   NetworkDevices devices_;
+  DevicesAtBridges at_bridges_;
   UplinkWires wires_;
   Server server_;
   Memory memory_;
@@ -127,7 +126,6 @@ class Daemon {
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
   std::optional<std::int64_t> commits_;          // to the state, at the last look
-  std::map<std::string, unsigned> at_bridges_;   // the index of each device
   std::multimap<std::uint64_t, Reply> waiting_;  // for a change to be in force
   std::function<void()> ready_;
   Settled settled_;

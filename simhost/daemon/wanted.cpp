@@ -225,11 +225,18 @@ openvswitch::CountedSessions sessions_of(openvswitch::Network const &network) {
   return sessions;
 }
 
+}  // namespace
+
 Unfit unfit(WantedBridge const &bridge, std::exception const &why) {
   return {.key = bridge.key, .alias = bridge.alias, .bridge = bridge.row.name, .why = why.what()};
 }
 
-}  // namespace
+void Wanted::leave_out(std::vector<Unfit> const &refused) {
+  std::erase_if(bridges, [&](WantedBridge const &bridge) {
+    return std::ranges::find(refused, bridge.key, &Unfit::key) != refused.end();
+  });
+  unfit.insert(unfit.end(), refused.begin(), refused.end());
+}
 
 // Linux has room for fifteen bytes, and an alias may change.
 std::string bridge_name(std::string_view host, std::string const &identifier) {

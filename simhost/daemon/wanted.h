@@ -3,6 +3,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <exception>
 #include <functional>
 #include <map>
 #include <optional>
@@ -58,6 +59,8 @@ struct Unfit {
   std::string why;
 };
 
+Unfit unfit(WantedBridge const &bridge, std::exception const &why);
+
 /// The bridge that carries tunnels.
 struct WantedUnderlay {
   openvswitch::BridgeRow row;
@@ -76,6 +79,9 @@ struct Wanted {
   std::chrono::seconds announced_for{};
   /// When something else is wanted although nobody changes anything.
   std::optional<ClockTime> lasts = std::nullopt;
+
+  /// These are wanted in vain.
+  void leave_out(std::vector<Unfit> const &refused);
 };
 
 /// Whether a device can be put at a bridge.

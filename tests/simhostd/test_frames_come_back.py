@@ -269,7 +269,9 @@ def test_a_switch_with_which_something_is_wrong_stops_no_other(
     third, fourth = idle.client("second", "x"), idle.client("second", "y")
     assert one.reaches(other, attempts=5) and third.reaches(fourth, attempts=5)
     for mtu, why in PLANTED_FAULTS.items():
-        idle.apply({"switches": [{"alias": "lab", "mtu": mtu}]})
+        idle.apply({"switches": [{"alias": "lab", "mtu": mtu, "multicast": "snooping"}]})
+        # What frames obey is as it was.
+        assert multicast_mode(idle) == "legacy"
         said = f"the switch 'lab' cannot be run: {why}"
         assert said in idle.plane()["said"] and idle.is_in_force()
         # The others can be changed.
@@ -282,6 +284,13 @@ def test_a_switch_with_which_something_is_wrong_stops_no_other(
     # So can it be itself, into one with which nothing is wrong.
     idle.apply({"switches": [{"alias": "lab", "mtu": 1500, "ports": [{"id": "a", "vlan": 7}]}]})
     assert not idle.plane()["said"] and one.ceases_to_reach(other)
+    assert multicast_mode(idle) == "snooping"
+
+
+def multicast_mode(lab: Lab) -> str:
+    """The one that frames obey."""
+    asked = "checked.VSQEX_GetMcastFilterMode('lab').name"
+    return lab.python(f"from libvswitch import checked; print({asked})").strip().lower()
 
 
 def test_a_switch_with_devices_at_uplinks_alone_is_not_made_unfit(lab: Lab) -> None:
