@@ -2,8 +2,10 @@
 #include "daemon/announcer.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <set>
 #include <utility>
 
 #include "planes/openvswitch/compile/pipeline.h"
@@ -76,14 +78,14 @@ void Announcer::follow(Wanted const &wanted, Memory const &memory) {
 void Announcer::follow(WantedBridge const &bridge, Memory const &memory) {
   auto &known = switches_[bridge.key];
   std::map<std::uint32_t, Place> places;
-  Clients moved;
+  std::vector<Moved> moved;
   for (auto const &carried : bridge.carried) {
     auto const before = known.places.find(carried.number);
     bool const is_elsewhere = before == known.places.end() ||
                               before->second.device != carried.device ||
                               before->second.links != carried.links;
     if (has_begun_ && is_elsewhere && carried.is_announced && !carried.links.empty()) {
-      moved.merge(clients_at(carried, memory.learned_at(bridge.key, carried.number)));
+      moved.push_back(clients_at(carried, memory.learned_at(bridge.key, carried.number)));
     }
     places[carried.number] = {.device = carried.device, .links = carried.links};
   }
@@ -91,44 +93,61 @@ void Announcer::follow(WantedBridge const &bridge, Memory const &memory) {
   announce(known, moved);
 }
 
-Announcer::Clients Announcer::clients_at(Carried const &carried,
-                                         std::vector<openflow::Flow> const &learned) {
-  auto const vlans = vlans_of(carried.vlan);
-  Clients clients;
-  auto const add = [&](Announced client) {
-    for (std::size_t place = 0; place < vlans.size(); ++place) {
-      client.vlan = vlans[place];
-      clients.emplace(place, client);
-    }
-  };
+Announcer::Moved Announcer::clients_at(Carried const &carried,
+                                       std::vector<openflow::Flow> const &learned) {
+  Moved moved{
+      .number = carried.number, .in_one_vlan = {}, .in_all = {}, .vlans = vlans_of(carried.vlan)};
   if (carried.has_address()) {
-    add(carried.client);
+    moved.in_all.push_back(carried.client);
   }
   for (auto const &flow : learned) {
     auto client = client_of(flow, carried.client);
     if (auto const vlan = learned_vlan(flow)) {
       client.vlan = *vlan;
-      clients.emplace(0, client);
+      moved.in_one_vlan.push_back(client);
     } else {
-      add(client);
+      moved.in_all.push_back(client);
+    }
+  }
+  return moved;
+}
+
+// In the VLAN that each port has at this place.
+std::set<Announced> Announcer::clients_in(std::vector<Moved> const &moved, std::size_t place) {
+  std::set<Announced> clients;
+  for (auto const &port : moved) {
+    if (place == 0) {
+      clients.insert(port.in_one_vlan.begin(), port.in_one_vlan.end());
+    }
+    if (place < port.vlans.size()) {
+      for (auto client : port.in_all) {
+        client.vlan = port.vlans[place];
+        clients.insert(client);
+      }
     }
   }
   return clients;
 }
 
-// Where a client is now is all that matters. What would have to wait for too long is not kept.
-void Announcer::announce(OfSwitch &known, Clients const &clients) const {
-  std::set<Announced> anew;
-  for (auto const &[place, client] : clients) {
-    anew.insert(client);
+// Where a client is now is all that matters. What would have to wait for too long is not kept, and
+// not looked for: ports have up to 4,096 VLANs.
+void Announcer::announce(OfSwitch &known, std::vector<Moved> const &moved) const {
+  std::set<std::uint32_t> numbers;
+  std::size_t places = 1;
+  for (auto const &port : moved) {
+    numbers.insert(port.number);
+    places = std::max(places, port.vlans.size());
   }
-  std::erase_if(known.due, [&](Due const &due) { return anew.contains(due.announced); });
+  std::erase_if(known.due, [&](Due const &due) { return numbers.contains(due.announced.number); });
   auto const until = events::Clock::now() + duration_;
   auto const room = std::uint64_t{most_} * static_cast<std::uint64_t>(duration_.count() + 1);
-  for (auto const &[place, client] : clients) {
-    // An address may be known in a VLAN twice, as of the port and as learned there.
-    if (known.due.size() < room && anew.erase(client) > 0) {
-      known.due.push_back({.announced = client, .until = until});
+  // An address may be known in a VLAN twice, as of the port and as learned there.
+  std::set<Announced> told;
+  for (std::size_t place = 0; place < places && known.due.size() < room; ++place) {
+    for (auto const &client : clients_in(moved, place)) {
+      if (known.due.size() < room && told.insert(client).second) {
+        known.due.push_back({.announced = client, .until = until});
+      }
     }
   }
 }

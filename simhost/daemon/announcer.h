@@ -2,7 +2,9 @@
 // reverse-ARP packets, no more in a second than the host's options allow.
 #pragma once
 
+#include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <deque>
 #include <functional>
 #include <map>
@@ -29,13 +31,19 @@ class Announcer {
   void follow(Wanted const &wanted, Memory const &memory);
 
  private:
-  // With those first that any client is announced as first: what a trunk port has of many VLANs
-  // keeps no other port waiting.
-  using Clients = std::set<std::pair<std::size_t, openvswitch::Announced>>;
   // Where a client was.
   struct Place {
     std::string device;
     std::vector<std::uint32_t> links;
+  };
+  // A port that is reached over another link than before, and its clients. Those of all VLANs are
+  // told in the first one of each port before any is in the next: what a trunk has of many VLANs
+  // keeps no other port waiting.
+  struct Moved {
+    std::uint32_t number;
+    std::vector<openvswitch::Announced> in_one_vlan;
+    std::vector<openvswitch::Announced> in_all;
+    std::vector<std::uint16_t> vlans;
   };
   struct Due {
     openvswitch::Announced announced;
@@ -47,8 +55,10 @@ class Announcer {
   };
 
   void follow(WantedBridge const &bridge, Memory const &memory);
-  static Clients clients_at(Carried const &carried, std::vector<openflow::Flow> const &learned);
-  void announce(OfSwitch &known, Clients const &clients) const;
+  static Moved clients_at(Carried const &carried, std::vector<openflow::Flow> const &learned);
+  static std::set<openvswitch::Announced> clients_in(std::vector<Moved> const &moved,
+                                                     std::size_t place);
+  void announce(OfSwitch &known, std::vector<Moved> const &moved) const;
   void send();
 
   events::Loop &loop_;
