@@ -152,7 +152,7 @@ void Daemon::balance() {
 void Daemon::look_at_wires() {
   try {
     devices_.refresh();
-    if (wires_.look(devices_)) {
+    if (wires_.look(devices_, [this](std::string const &why) { troubles_.add(why); })) {
       sync_soon();
     }
   } catch (std::exception const &error) {

@@ -1,12 +1,14 @@
 // One question for each wire: there are few, and of a thousand ports nobody asks.
 #include "daemon/devices/uplink_wires.h"
 
+#include <fmt/format.h>
 #include <linux/if_link.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <cstddef>
 #include <cstring>
+#include <stdexcept>
 #include <system_error>
 
 #include "events/netlink_request.h"
@@ -32,14 +34,25 @@ void UplinkWires::leave_lost(NetworkDevices const &devices) {
   }
 }
 
-bool UplinkWires::look(NetworkDevices const &devices) {
+bool UplinkWires::look_at(Wire &wire, Ask const &ask) {
+  auto const arrived = wire.index != 0 ? ask(wire.index) : std::nullopt;
+  if (!arrived) {
+    return false;
+  }
+  auto const before = wire.frames.percent();
+  wire.frames.count(events::Clock::now(), *arrived);
+  return wire.frames.percent() != before;
+}
+
+bool UplinkWires::look(NetworkDevices const &devices,
+                       std::function<void(std::string const &)> const &say) {
   leave_lost(devices);
   bool any = false;
   for (auto &[name, wire] : wires_) {
-    if (auto const arrived = wire.index != 0 ? arrived_at(wire.index) : std::nullopt) {
-      auto const before = wire.frames.percent();
-      wire.frames.count(events::Clock::now(), *arrived);
-      any |= wire.frames.percent() != before;
+    try {
+      any |= look_at(wire, ask_);
+    } catch (std::runtime_error const &error) {
+      say(fmt::format("what came in at the device {} is not known: {}", name, error.what()));
     }
   }
   return any;
