@@ -66,9 +66,9 @@ void Bridges::read_database_events() {
       present_.reset();
       told_.changed();
     }
-  } catch (std::exception const &) {
+  } catch (std::exception const &error) {
     database_watch_.end();
-    told_.disturbed();
+    told_.disturbed(error.what());
   }
 }
 

@@ -33,8 +33,8 @@ class Bridges {
     std::string host;
     /// The database has rows that are others than before, whoever changed them.
     std::function<void()> changed;
-    /// The connection to the database ended.
-    std::function<void()> disturbed;
+    /// The connection to the database ended, or is of no more use.
+    std::function<void(std::string const &why)> disturbed;
     /// What bridges tell.
     RunningBridge::Told of_bridges;
   };

@@ -184,7 +184,7 @@ void Daemon::connect() {
         Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
                       .host = host_,
                       .changed = [this] { sync_soon(); },
-                      .disturbed = [this] { connect_later(); },
+                      .disturbed = [this](std::string const &why) { reconnect(why); },
                       .of_bridges = told_by_bridges()});
     sync();
   });
@@ -215,7 +215,7 @@ RunningBridge::Told Daemon::told_by_bridges() {
                   members_.receive(key, packet);
                 }
               },
-          .disturbed = [this] { connect_later(); }};
+          .disturbed = [this](std::string const &why) { reconnect(why); }};
 }
 
 void Daemon::connect_later() {
@@ -258,6 +258,10 @@ void Daemon::look_at_commits() {
 
 void Daemon::fail(std::string const &why) {
   bridges_.reset();
+  reconnect(why);
+}
+
+void Daemon::reconnect(std::string const &why) {
   troubles_.add(why);
   connect_later();
 }
@@ -266,8 +270,7 @@ void Daemon::fail(std::string const &why) {
 bool Daemon::send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames) try {
   return bridges_ && bridges_->send(key, frames);
 } catch (std::exception const &error) {
-  troubles_.add(error.what());
-  connect_later();
+  reconnect(error.what());
   return false;
 }
 

@@ -59,6 +59,7 @@ class Daemon {
   void attempt(std::function<void()> const &work);
   void fail(std::string const &why);
   [[nodiscard]] RunningBridge::Told told_by_bridges();
+  void reconnect(std::string const &why);
   void connect_later();
   void mend_soon();
   void look_at_commits();

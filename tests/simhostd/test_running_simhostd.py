@@ -93,6 +93,14 @@ def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
             waiting.communicate(timeout=30)
 
 
+def test_why_it_connects_anew_is_told(idle: Lab) -> None:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
+        idle.start(open_vswitch.where)
+        os.kill(idle.processes()["ovsdb-server"], signal.SIGKILL)
+        why = f"{idle.run_folder()}/db.sock: the other side closed the connection"
+        assert comes_true(lambda: why in idle.log()), idle.log()
+
+
 def test_a_private_open_vswitch_is_one_daemon_s(lab: Lab, tmp_path: Path) -> None:
     assert lab.daemon is not None
     (tmp_path / "second").mkdir()

@@ -132,9 +132,9 @@ void RunningBridge::read_events() {
   try {
     connection_.receive();
     follow_events();
-  } catch (std::exception const &) {
+  } catch (std::exception const &error) {
     watch_.end();
-    told_.disturbed();
+    told_.disturbed(error.what());
   }
 }
 

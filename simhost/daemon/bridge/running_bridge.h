@@ -42,8 +42,8 @@ class RunningBridge {
     std::function<void()> lived;
     /// A flow sent up a frame.
     std::function<void(storage::SwitchKey, openflow::PacketIn const &)> heard;
-    /// The connection ended.
-    std::function<void()> disturbed;
+    /// The connection ended, or is of no more use.
+    std::function<void(std::string const &why)> disturbed;
   };
 
   /// Makes what is remembered of flows be forgotten, as forget_cached_flows(). Throws nothing.
