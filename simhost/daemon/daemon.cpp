@@ -13,7 +13,6 @@
 #include "abi/fresh_host.h"
 #include "base/utf8.h"
 #include "daemon/bridge/cached_flows.h"
-#include "daemon/devices/links.h"
 #include "daemon/devices/packet_sizes.h"
 #include "daemon/only_one.h"
 #include "daemon/wanted.h"
@@ -66,6 +65,10 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
                       .changed = [this] { sync_soon(); }}),
       members_(loop, {.send = [this](auto key, auto const &frames) { send(key, frames); },
                       .changed = [this] { follow_members(); }}),
+      links_(
+          loop, store_, devices_,
+          [this](auto key, auto const &device) { return heard_at(key, device); },
+          [this] { sync_soon(); }),
       counting_(store_),
       announced_(store_),
       underlay_(loop, options_.database.parent_path(),
@@ -299,29 +302,23 @@ void Daemon::sync_after(std::optional<ClockTime> const &wait) {
   }
 }
 
+Heard Daemon::heard_at(storage::SwitchKey key, storage::Device const &device) const {
+  return {.partner = bridges_ ? bridges_->is_live(key, device.number) : std::nullopt,
+          .beacons = beacons_.arrive_at(key, device.number),
+          .error_percent = wires_.damaged_percent(device.name)};
+}
+
 void Daemon::follow_devices() {
-  bool differ = false;
-  auto const heard_at = [this](storage::SwitchKey key, storage::Device const &device) {
-    return Heard{.partner = bridges_ ? bridges_->is_live(key, device.number) : std::nullopt,
-                 .beacons = beacons_.arrive_at(key, device.number),
-                 .error_percent = wires_.damaged_percent(device.name)};
-  };
   devices_.refresh();
   {
     storage::ReadingTransaction transaction(store_);
     auto const say = [this](std::string const &why) { troubles_.add(why); };
     switch_devices(transaction, devices_, say);
     raise_packet_sizes(sizes_to_raise(transaction, devices_), devices_, say);
-    devices_.refresh();
-    wires_.leave_lost(devices_);
-    differ = links_differ(transaction, devices_, heard_at);
   }
-  if (differ) {
-    storage::ChangingTransaction transaction(store_);
-    put_links(transaction, devices_, heard_at);
-    storage::advance_frames_change(transaction);
-    transaction.commit();
-  }
+  devices_.refresh();
+  wires_.leave_lost(devices_);
+  links_.follow();
 }
 
 // Without which a change is in force for most frames only. Where it cannot be, to try once more is

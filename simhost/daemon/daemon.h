@@ -18,6 +18,7 @@
 #include "daemon/counting/counting.h"
 #include "daemon/devices/devices_at_bridges.h"
 #include "daemon/devices/network_devices.h"
+#include "daemon/devices/saved_links.h"
 #include "daemon/devices/uplink_wires.h"
 #include "daemon/groups/group_members.h"
 #include "daemon/load/load_balance.h"
@@ -71,6 +72,7 @@ class Daemon {
   void sync();
   bool forget_cached_flows(std::string const &bridge, std::uint64_t generation);
   void follow_devices();
+  [[nodiscard]] Heard heard_at(storage::SwitchKey key, storage::Device const &device) const;
   // The way of the machine to the hosts beyond tunnels, and what is wrong with it.
   void follow_tunnels(Wanted const &wanted);
   void settle(Wanted const &wanted);
@@ -117,6 +119,7 @@ class Daemon {
   GroupMembers members_;
   bool follows_members_ = false;                       // and nothing else
   std::map<storage::SwitchKey, int> multicast_modes_;  // that frames obey
+  SavedLinks links_;
   Counting counting_;
   AnnouncedCounts announced_;
   LoadBalance load_balance_;

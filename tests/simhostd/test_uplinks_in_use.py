@@ -2,6 +2,7 @@
 
 import json
 import signal
+import sqlite3
 import time
 from typing import Any
 
@@ -70,6 +71,23 @@ def test_an_uplink_that_returns_is_used_again(network: Network, far: Client, nea
     assert network.came_over(near.mac) == "nic1"
     network.plug("nic0")
     assert comes_true(lambda: near.reaches(far) and network.came_over(near.mac) == "nic0")
+
+
+def test_a_daemon_replies_while_somebody_writes_to_the_state(
+    lab: Lab, network: Network, far: Client, near: Client
+) -> None:
+    writer = sqlite3.connect(lab.state, isolation_level=None, timeout=30)
+    writer.execute("BEGIN IMMEDIATE")
+    network.pull("nic0")
+    # Which it hears before all of these questions are asked.
+    for _ in range(20):
+        assert lab.plane()["in_force"] is not None
+    assert near.comes_to_reach(far)
+    assert "nic0       link up" in lab.ctl("show")
+    writer.execute("ROLLBACK")
+    writer.close()
+    assert comes_true(lambda: "nic0       link down" in lab.ctl("show"))
+    assert network.came_over(near.mac) == "nic1"
 
 
 def test_a_rolling_team_stays_where_it_is(
