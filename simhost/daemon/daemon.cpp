@@ -71,6 +71,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
           [this] { sync_soon(); }),
       counting_(store_),
       announced_(store_),
+      load_balance_(store_),
       underlay_(loop, options_.database.parent_path(),
                 [this](std::string const &why) { troubles_.add(why); }),
       collectors_(loop, devices_, [this] { sync_soon(); }) {
@@ -126,7 +127,8 @@ void Daemon::age_by(Wanted const &wanted) {
 void Daemon::remember() {
   try {
     bool const all_remembered = memory_.save();
-    if (!announced_.save() || !all_remembered) {
+    bool const all_announced = announced_.save();
+    if (!load_balance_.save() || !all_announced || !all_remembered) {
       remember_soon();
     }
   } catch (std::exception const &error) {
@@ -147,6 +149,7 @@ void Daemon::balance() {
     counts_ = 0;
     if (load_balance_.choose()) {
       sync_soon();
+      remember_soon();
     }
   }
 }
@@ -349,7 +352,7 @@ void Daemon::sync() {
   collectors_.begin();
   auto const complete = [&](storage::SwitchKey key, openvswitch::Network &network) {
     members_.follow(transaction, key, network);
-    load_balance_.follow(key, network);
+    load_balance_.follow(transaction, key, network);
     beacons_.follow(key, network);
     collectors_.follow(network);
   };

@@ -53,6 +53,14 @@ char const *const kRememberedSchema = R"sql(
 // In milliseconds since the beginning of 1970.
 char const *const kSeenSchema = "ALTER TABLE remembered ADD COLUMN seen INTEGER";
 
+char const *const kChosenSchema = R"sql(
+  -- Which uplink of a team that goes by load was chosen for a port, as a remainder.
+  CREATE TABLE chosen (
+    port        INTEGER PRIMARY KEY REFERENCES port ON DELETE CASCADE,
+    share       INTEGER NOT NULL
+  ) STRICT;
+)sql";
+
 // Whether the partner is asked to tell of itself each second, not each 30 seconds.
 char const *const kLacpSchema = "ALTER TABLE lag ADD COLUMN is_fast INTEGER NOT NULL DEFAULT 0";
 

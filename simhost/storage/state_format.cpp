@@ -17,8 +17,8 @@ namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
-    kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema,
-    kSeenSchema,       kSharedSchema, kLacpSchema,    kFabricSchema};
+    kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema, kSeenSchema,
+    kSharedSchema,     kLacpSchema,   kFabricSchema,  kChosenSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -118,6 +118,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kSharedSchema);
   database.exec(kLacpSchema);
   database.exec(kFabricSchema);
+  database.exec(kChosenSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

@@ -41,9 +41,15 @@ def test_who_sends_much_gets_an_uplink_of_its_own(lab: Lab) -> None:
     assert comes_true(have_moved)
     after = uplinks(lab)
     assert after[alone] == before[alone]
+    # Also of a daemon that comes later, as long as the host is the same.
+    lab.stop()
+    lab.start()
+    assert uplinks(lab) == after
     for port, client in clients.items():
         client.send(frame(EVERYBODY, client.mac, payload=b"where?"))
         assert comes_true(lambda: network.came_over(client.mac) == after[port])
+    lab.ctl("restart")
+    assert uplinks(lab) == before
     # An uplink that fails is left by all, whatever was chosen.
     network.pull("nic1")
     assert comes_true(lambda: set(uplinks(lab).values()) == {"nic0"})

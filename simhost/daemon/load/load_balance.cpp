@@ -36,17 +36,30 @@ void LoadBalance::count(storage::SwitchKey key, openvswitch::Totals const &total
       sent[openvswitch::number_of(cookie)] += total.bytes;
     }
   }
+  if (!found->second.sent_before) {
+    found->second.sent_before = sent;
+  }
 }
 
-void LoadBalance::follow(storage::SwitchKey key, openvswitch::Network &network) {
+// What the state has is what was chosen, so that a host that is restarted begins anew.
+void LoadBalance::follow(storage::Transaction &transaction, storage::SwitchKey key,
+                         openvswitch::Network &network) {
   auto &known = switches_[key];
   known.teams.assign(network.teams.size(), {});
+  known.shares.clear();
+  storage::ChosenShares chosen;
+  if (std::ranges::any_of(network.teams, &openvswitch::Team::goes_by_load)) {
+    chosen = unsaved_;
+    chosen.merge(storage::chosen_shares(transaction, key));
+  }
   for (auto &port : network.ports) {
     if (port.team && network.teams[*port.team].goes_by_load) {
       auto &team = known.teams[*port.team];
       team.slots = network.teams[*port.team].in_use;
       team.ports.push_back(port.number);
-      port.share = known.shares.try_emplace(port.number, port.share).first->second;
+      auto const share = chosen.find(storage::PortNumber{port.number});
+      port.share = share == chosen.end() ? port.share : share->second;
+      known.shares.emplace(port.number, port.share);
     }
   }
   std::erase_if(known.teams, [](Team const &team) { return team.slots.size() < 2; });
@@ -56,7 +69,7 @@ bool LoadBalance::choose(OfSwitch &of_switch, Team const &team) {
   std::vector<LoadedPort> ports;
   for (auto const number : team.ports) {
     auto const now = under(of_switch.sent, number);
-    auto const before = under(of_switch.sent_before, number);
+    auto const before = under(*of_switch.sent_before, number);
     // What counts less than before began anew.
     ports.push_back({.number = number,
                      .slot = of_switch.shares.at(number) % team.slots.size(),
@@ -64,7 +77,9 @@ bool LoadBalance::choose(OfSwitch &of_switch, Team const &team) {
   }
   auto const move = next_move(ports, team.slots.size());
   if (move) {
-    of_switch.shares[move->number] = static_cast<std::uint32_t>(move->slot);
+    auto const share = static_cast<std::uint32_t>(move->slot);
+    of_switch.shares[move->number] = share;
+    unsaved_[storage::PortNumber{move->number}] = share;
   }
   return move.has_value();
 }
@@ -72,10 +87,12 @@ bool LoadBalance::choose(OfSwitch &of_switch, Team const &team) {
 bool LoadBalance::choose() {
   bool has_chosen = false;
   for (auto &[key, of_switch] : switches_) {
-    for (auto const &team : of_switch.teams) {
-      has_chosen |= choose(of_switch, team);
+    if (of_switch.sent_before) {
+      for (auto const &team : of_switch.teams) {
+        has_chosen |= choose(of_switch, team);
+      }
+      of_switch.sent_before = of_switch.sent;
     }
-    of_switch.sent_before = of_switch.sent;
   }
   return has_chosen;
 }
@@ -94,6 +111,22 @@ openflow::Port LoadBalance::carrier(storage::SwitchKey key, std::uint32_t port) 
 
 void LoadBalance::keep(std::set<storage::SwitchKey> const &keys) {
   std::erase_if(switches_, [&](auto const &one) { return !keys.contains(one.first); });
+}
+
+bool LoadBalance::save() {
+  if (unsaved_.empty()) {
+    return true;
+  }
+  bool const is_saved =
+      storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
+        for (auto const &[port, share] : unsaved_) {
+          storage::put_chosen_share(transaction, port, share);
+        }
+      });
+  if (is_saved) {
+    unsaved_.clear();
+  }
+  return is_saved;
 }
 
 }  // namespace simhost::daemon

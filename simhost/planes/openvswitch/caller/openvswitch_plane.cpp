@@ -20,6 +20,7 @@
 #include "planes/openvswitch/line/line.h"
 #include "planes/openvswitch/multicast/address.h"
 #include "planes/openvswitch/reading/read_network.h"
+#include "storage/load/chosen.h"
 #include "storage/running/devices.h"
 #include "storage/running/frames.h"
 #include "storage/running/remembered.h"
@@ -409,6 +410,7 @@ void OpenVswitchPlane::remove_address(storage::ChangingTransaction &transaction,
 void OpenVswitchPlane::restart(storage::ChangingTransaction &transaction) {
   stored_.restart(transaction);
   storage::remove_remembered(transaction);
+  storage::remove_chosen_shares(transaction);
 }
 
 void OpenVswitchPlane::check_device(storage::Transaction &transaction, std::string_view device) {

@@ -1,0 +1,118 @@
+// What is chosen by load stays chosen, for whoever comes next too.
+#include "daemon/load/load_balance.h"
+
+#include <gmock/gmock.h>
+
+#include "memory_state.h"
+#include "named_switch.h"
+#include "planes/openvswitch/compile/pipeline.h"
+
+namespace {
+
+using namespace simhost;
+using daemon::LoadBalance;
+using storage::ChangingTransaction;
+using storage::ReadingTransaction;
+
+constexpr std::uint64_t kMegabyte = 1'000'000;
+
+struct PortsByLoad : MemoryState {
+  PortsByLoad() {
+    ChangingTransaction transaction(store);
+    key = storage::add_switch(transaction, named("s")).value();
+    for (auto const *name : {"p0", "p1", "p2", "p3"}) {
+      numbers.push_back(static_cast<std::uint32_t>(
+          *storage::add_port(transaction, key, name, storage::PortKind::client)));
+    }
+    transaction.commit();
+  }
+
+  // Which of the two uplinks each port uses.
+  std::vector<std::uint32_t> followed(LoadBalance &load) {
+    openvswitch::Network network;
+    network.teams.push_back({.balance = openvswitch::Balance::share,
+                             .in_use = {{1}, {2}},
+                             .standby = {},
+                             .goes_by_load = true});
+    for (auto const number : numbers) {
+      openvswitch::Port port;
+      port.number = number;
+      port.share = 0;
+      port.team = 0;
+      network.ports.push_back(port);
+    }
+    ReadingTransaction transaction(store);
+    load.follow(transaction, key, network);
+    std::vector<std::uint32_t> shares;
+    for (auto const &port : network.ports) {
+      shares.push_back(port.share % 2);
+    }
+    return shares;
+  }
+
+  // Each port has sent so much in all.
+  void count(LoadBalance &load, std::uint64_t bytes) const {
+    openvswitch::Totals totals;
+    for (auto const number : numbers) {
+      totals[openvswitch::cookie(openvswitch::Counted::in_unicast, number)] = {.packets = 1,
+                                                                               .bytes = bytes};
+    }
+    load.count(key, totals);
+  }
+
+  storage::SwitchKey key{};
+  std::vector<std::uint32_t> numbers;
+};
+
+TEST_F(PortsByLoad, KeepWhatWasChosen) {
+  LoadBalance load(store);
+  EXPECT_THAT(followed(load), testing::Each(0));
+  count(load, 0);
+  load.choose();
+  count(load, kMegabyte);
+  ASSERT_TRUE(load.choose());
+  auto const chosen = followed(load);
+  EXPECT_THAT(chosen, testing::Contains(1));
+  EXPECT_TRUE(load.save());
+  EXPECT_EQ(followed(load), chosen);
+  LoadBalance next(store);
+  EXPECT_EQ(followed(next), chosen);
+}
+
+TEST_F(PortsByLoad, AreNotMovedForWhatWasCountedBefore) {
+  LoadBalance load(store);
+  followed(load);
+  count(load, 9 * kMegabyte);
+  EXPECT_FALSE(load.choose());
+  count(load, 9 * kMegabyte);
+  EXPECT_FALSE(load.choose());
+  count(load, 10 * kMegabyte);
+  EXPECT_TRUE(load.choose());
+}
+
+TEST_F(PortsByLoad, BeginAnewWhenTheHostDoes) {
+  LoadBalance load(store);
+  followed(load);
+  count(load, 0);
+  load.choose();
+  count(load, kMegabyte);
+  ASSERT_TRUE(load.choose());
+  EXPECT_TRUE(load.save());
+  ChangingTransaction transaction(store);
+  storage::remove_chosen_shares(transaction);
+  transaction.commit();
+  EXPECT_THAT(followed(load), testing::Each(0));
+}
+
+TEST_F(PortsByLoad, AreMovedOnWhileTheStateIsWritten) {
+  LoadBalance load(store);
+  followed(load);
+  count(load, 0);
+  load.choose();
+  count(load, kMegabyte);
+  ASSERT_TRUE(load.choose());
+  // Nobody waits for that.
+  EXPECT_THAT(followed(load), testing::Contains(1));
+}
+
+}  // namespace
