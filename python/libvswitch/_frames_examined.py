@@ -18,6 +18,11 @@ _OLDEST = (3, 1)
 _INSTALL = "install Debian's package openvswitch-switch where frames are to move"
 _PATIENCE = 10.0
 _TUN = "/dev/net/tun"
+# What the kernel has of its own for frames, with the module that does it.
+UNTRIED = (
+    ("the data path of the kernel", "openvswitch"),
+    ("groups of uplinks with the bonding of the kernel as their partner", "bonding"),
+)
 # _IOR('T', 207, unsigned), as Linux has it on x86 and ARM.
 _TUNGETFEATURES = 0x800454CF
 # Root's own, and where users may have one.
@@ -42,6 +47,11 @@ def examine(state: Optional[str]) -> typing.Iterator[Found]:
             f"{_TUN} is no device of this machine, so that ovs-vswitchd can make no bridge",
             "load the module tun, or give it to the container",
         )
+    for what, module in UNTRIED:
+        there = "has" if kernel_has(module) else "has not"
+        yield Found(
+            NOTE, _ABOUT, f"{what}, which this kernel {there}: simhostd is untested with it"
+        )
     status = _status(Path(state)) if state else None
     if status is not None:
         yield from _daemon(status)
@@ -55,6 +65,22 @@ def _has_tun() -> bool:
         # Whoever may not open it may not run Open vSwitch either.
         return error.errno in (errno.EACCES, errno.EPERM)
     return True
+
+
+def kernel_has(module: str) -> bool:
+    """Whether it is part of the kernel, or could be."""
+    if Path("/sys/module", module).exists():
+        return True
+    known = Path("/lib/modules", os.uname().release)
+    lists = (known / "modules.builtin", known / "modules.dep")
+    return any(f"/{module}.ko" in _text_of(file) for file in lists)
+
+
+def _text_of(file: Path) -> str:
+    try:
+        return file.read_text(encoding="utf-8", errors="replace")
+    except OSError:
+        return ""
 
 
 def _open_vswitch() -> Found:

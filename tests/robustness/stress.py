@@ -71,6 +71,12 @@ def program(name: str, *arguments: str) -> Outcome:
     return printed(processes.run(str(processes.HERE / name), *arguments))
 
 
+def program_of(place: str) -> Outcome:
+    """Run a program of tests/ that has an end."""
+    command = [sys.executable, str(processes.TESTS / place)]
+    return printed(subprocess.run(command, capture_output=True, text=True, check=False))
+
+
 def by_chance(place: str, seed: int, seconds: float) -> Outcome:
     """Run a program of tests/ on what chance makes, in a process of its own: the sweeps are of the
     module without classes, which some of them load."""
@@ -151,13 +157,15 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
     yield Part("traps, in a row", "calls", whole(program, "traps.py", "in-a-row", calls))
     if frames:
         yield Part("demo of a fabric", "demos", whole(demo))
+        yield Part("what was never tried", "things", whole(program_of, "simhostd/untried.py"))
     share = SHARES["fuzzing"] / (len(fuzzing.NAMES) + 1)
     states = partial(by_chance, "fuzz/state_files.py", seed)
     yield Part("damaged states", "states", states, share)
     for name in fuzzing.NAMES:
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
-    sent = partial(by_chance, "simhost/openvswitch/frames_by_chance.py", seed)
-    yield Part("frames of any content", "frames", sent, SHARES["frames"])
+    for what, name in ("frames of any content", "frames"), ("frames of groups", "groups"):
+        sent = partial(by_chance, f"simhost/openvswitch/{name}_by_chance.py", seed)
+        yield Part(what, "frames", sent, SHARES["frames"] / 2)
     sequences = partial(by_chance, "sequences/sequences.py", seed)
     yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
     replays = [
