@@ -200,7 +200,7 @@ Json Daemon::source(Json const &question) const {
   auto const known =
       facts_of_source(memory_, switch_in(question), question.at("port").get<std::uint32_t>(),
                       question.at("address").get<openflow::EthernetAddress>());
-  return {{"learned", known.is_learned},
+  return {{"learned", known.learned},
           {"not first", known.is_not_first},
           {"at port", known.at_port},
           {"on switch", known.on_switch}};

@@ -316,6 +316,28 @@ def test_a_question_teaches_nothing(traced: Traced) -> None:
     assert (why, setting) == ("there is no room for its source", "a/mac_learning")
 
 
+def test_a_source_is_learned_in_one_vlan(traced: Traced) -> None:
+    learns = {"learning": True, "limit": 1, "limit_policy": "drop"}
+    traced.set_port("a", vlan={"trunk": [7, 9]}, mac_learning=learns)
+    at_once, other = (frame(MACS["b"], STRANGER, vlan=vlan) for vlan in (7, 9))
+    traced.is_true("a", at_once)
+    assert [step for step in traced.is_true("a", at_once) if "to" in step]
+    why, setting, _ = last(traced.is_true("a", other))
+    assert (why, setting) == ("there is no room for its source", "a/mac_learning")
+
+
+def test_there_may_be_no_room_for_a_source_beyond_the_uplinks(traced: Traced) -> None:
+    traced.set_switch(mac_learning={"limit": 1})
+    known, unknown = (frame(MACS["a"], f"02:00:00:00:01:0{n}", vlan=7) for n in (1, 2))
+    learned = "has its source learned beyond the uplinks"
+    texts = [step["text"] for step in traced.is_true("nic0", known)]
+    assert learned in texts
+    (told,) = (step for step in traced.is_true("nic0", unknown) if "room" in step["text"])
+    assert told["text"] == "is let through: there is no room for its source"
+    assert told["setting"]["name"] == "mac_learning" and told["setting"]["port"] is None
+    assert learned in [step["text"] for step in traced.is_true("nic0", known)]
+
+
 def test_words_for_frames_and_for_people(traced: Traced) -> None:
     source = f"src={MACS['a']}"
     said = traced.ctl("trace", "lab/a", f"dst={EVERYBODY}", source, "vlan=9", "size=64")

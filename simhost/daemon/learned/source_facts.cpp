@@ -22,7 +22,9 @@ SourceFacts facts_of_source(Memory const &memory, storage::SwitchKey key, std::u
     ++facts.on_switch;
     if (openvswitch::number_of(flow.cookie) == port) {
       ++facts.at_port;
-      facts.is_learned = facts.is_learned || is_of(flow);
+      if (auto const known = is_of(flow) ? learned_in(flow) : std::nullopt; known && known->vlan) {
+        facts.learned.insert(*known->vlan);
+      }
     }
   }
   return facts;

@@ -4,7 +4,9 @@
 #include <algorithm>
 #include <chrono>
 #include <optional>
+#include <string_view>
 #include <utility>
+#include <vector>
 
 #include "base/bytes.h"
 #include "base/ip_text.h"
@@ -30,6 +32,7 @@ namespace {
 using namespace std::chrono_literals;
 
 constexpr auto kPatience = 2000ms;
+constexpr std::string_view kLearning = "mac_learning";
 
 openflow::EthernetAddress source_of(std::vector<std::uint8_t> const &frame) {
   openflow::EthernetAddress source{};
@@ -110,6 +113,7 @@ class Stations {
     if (at.station.is_uplink) {
       return entry;
     }
+    entry.limit = of_port(kLearning);
     if (find_bytes(transaction_, teaming::bound_uplink, owner)) {
       entry.teaming = of_port("uplink");
     } else if (find_bytes(transaction_, teaming::policy, owner)) {
@@ -128,36 +132,27 @@ class Stations {
   std::vector<Found> all_;
 };
 
-// What a mark tells the flows of a frame that is a question, and which limit is the one of which it
-// tells.
-struct Mark {
-  std::uint32_t value;
-  SettingOf limit;
-};
-
-Mark mark_for(storage::Transaction &transaction, storage::SwitchKey key, Stations::Found const &at,
-              Json const &known) {
-  constexpr std::string_view kLearning = "mac_learning";
-  Mark mark{.value = kQuestion, .limit = {at.station.name, std::string(kLearning)}};
-  if (at.station.is_uplink) {
-    return mark;
-  }
-  if (known.at("not first").get<bool>()) {
-    mark.value |= kIsNotFirst;
+// Which limit keeps a source that is not learned yet from being learned, if one does.
+std::optional<SettingOf> full_limit(storage::Transaction &transaction, storage::SwitchKey key,
+                                    Stations::Found const &at, Json const &known) {
+  auto const at_port = known.at("at port").get<std::uint64_t>();
+  if (at.station.is_uplink && at_port >= TEAM_MAC_LEARNING_LIMIT_ENTRIES_DEFAULT) {
+    return SettingOf{};
   }
   auto const of_port =
       effective(transaction, mac::management, storage::PropertyOwner::port(key, at.port));
+  if (!at.station.is_uplink && at_port >= of_port.portMACLearning.macLimit) {
+    return SettingOf{at.station.name, std::string(kLearning)};
+  }
   bool const is_full_switch =
       known.at("on switch").get<std::uint64_t>() >= mac::learning_of(transaction, key).macLimit;
-  bool const is_full_port =
-      known.at("at port").get<std::uint64_t>() >= of_port.portMACLearning.macLimit;
-  if (!known.at("learned").get<bool>() && (is_full_port || is_full_switch)) {
-    mark.value |= kHasNoRoom;
-  }
-  if (!is_full_port) {
-    mark.limit.port.clear();
-  }
-  return mark;
+  return is_full_switch ? std::optional(SettingOf{{}, std::string(kLearning)}) : std::nullopt;
+}
+
+bool is_learned(std::string const &traced, Json const &known) {
+  auto const domain = learning_domain(traced);
+  auto const learned = known.at("learned").get<std::vector<std::uint16_t>>();
+  return domain && std::ranges::find(learned, *domain) != learned.end();
 }
 
 std::string hexadecimal(std::vector<std::uint8_t> const &bytes) {
@@ -182,23 +177,32 @@ std::vector<StoryStep> OpenVswitchPlane::trace(storage::Transaction &transaction
   try {
     auto const bridge =
         ask(file_, {{"ask", "bridge"}, {"switch", of_switch.row.identifier}}, kPatience);
-    auto const known = ask(file_,
-                           {{"ask", "source"},
-                            {"switch", static_cast<std::int64_t>(of_switch.key)},
-                            {"port", static_cast<std::uint32_t>(at->port)},
-                            {"address", source_of(frame)}},
-                           kPatience);
-    auto const mark = mark_for(transaction, of_switch.key, *at, known);
-    auto entry = stations.entry(*at);
-    entry.limit = mark.limit;
+    auto const known =
+        ask(file_,
+            {{"ask", "source"},
+             {"switch", static_cast<std::int64_t>(of_switch.key)},
+             {"port", at->station.is_uplink ? 0 : static_cast<std::uint32_t>(at->port)},
+             {"address", source_of(frame)}},
+            kPatience);
     auto const folder = bridge.at("folder").get<std::vector<std::uint8_t>>();
-    auto const text =
-        ask_control(find_control_socket(std::string(folder.begin(), folder.end())),
-                    {.name = "ofproto/trace",
-                     .words = {bridge.at("name").get<std::string>(),
-                               fmt::format("in_port={},pkt_mark={}", at->device, mark.value),
-                               hexadecimal(frame)}},
-                    Deadline::clock::now() + kPatience);
+    auto const traced = [&](std::uint32_t mark) {
+      return ask_control(
+          find_control_socket(std::string(folder.begin(), folder.end())),
+          {.name = "ofproto/trace",
+           .words = {bridge.at("name").get<std::string>(),
+                     fmt::format("in_port={},pkt_mark={}", at->device, mark), hexadecimal(frame)}},
+          Deadline::clock::now() + kPatience);
+    };
+    auto const mark = kQuestion | (known.at("not first").get<bool>() ? kIsNotFirst : 0U);
+    auto text = traced(mark);
+    auto entry = stations.entry(*at);
+    auto const limit = full_limit(transaction, of_switch.key, *at, known);
+    // In which VLAN the frame is, the bridge knows.
+    if (limit && !is_learned(text, known)) {
+      entry.limit = *limit;
+      entry.has_no_room = at->station.is_uplink;
+      text = traced(mark | kHasNoRoom);
+    }
     return tell(text, frame, entry,
                 {.station = [&](openflow::Port device) { return stations.named(device); },
                  .session = [&](std::uint32_t id) { return stations.session(id); }});

@@ -23,6 +23,7 @@ using LineKind = TraceLine::Kind;
 constexpr std::size_t kTagBytes = 4;
 constexpr std::size_t kAddresses = 12;
 constexpr std::uint16_t kVlanMask = 0x0fff;
+constexpr auto *kNoRoom = "is let through: there is no room for its source";
 
 constexpr unsigned number_of(Field reg) {
   return static_cast<unsigned>(reg) - static_cast<unsigned>(Field::reg0);
@@ -195,7 +196,7 @@ class Story {
       case Counted::limit_dropped:
         return drop("there is no room for its source", entry_.limit);
       case Counted::limit_allowed:
-        return say(Kind::passes, "is let through: there is no room for its source", entry_.limit);
+        return say(Kind::passes, kNoRoom, entry_.limit);
       case Counted::first_address:
         return tell_first_address(visit);
       case Counted::learned:
@@ -345,7 +346,9 @@ class Story {
     if (visit.table != table::kLearning) {
       return;
     }
-    if (entry_.station.is_uplink) {
+    if (entry_.has_no_room) {
+      say(Kind::passes, kNoRoom, entry_.limit);
+    } else if (entry_.station.is_uplink) {
       say(Kind::passes, "has its source learned beyond the uplinks", {{}, "mac_learning"});
     } else {
       say(Kind::passes, "has its source learned at " + in_words(entry_.station),
@@ -399,6 +402,20 @@ class Story {
 };
 
 }  // namespace
+
+std::optional<std::uint16_t> learning_domain(std::string_view text) {
+  std::uint64_t domain = 0;
+  for (auto const &line : read_trace(text)) {
+    if (line.kind == LineKind::visit && line.table == table::kLearning) {
+      return static_cast<std::uint16_t>(domain);
+    }
+    auto const value = line.kind == LineKind::visit ? std::nullopt : written(line.text);
+    if (value && value->first == number_of(field::kDomain)) {
+      domain = value->second;
+    }
+  }
+  return std::nullopt;
+}
 
 std::vector<StoryStep> tell(std::string_view text, std::vector<std::uint8_t> const &frame,
                             Entry const &entry, Names const &names) {

@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <functional>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -54,7 +55,13 @@ struct Entry {
   SettingOf blocked;
   /// Of what decides how many addresses are learned there.
   SettingOf limit = {};
+  /// Whether there is no room for the source of a frame from an uplink, which is let through.
+  bool has_no_room = false;
 };
+
+/// In which VLAN the source of the frame of which ovs-vswitchd said this would be learned: by its
+/// primary one if it is private. Nothing of a frame that does not get so far.
+std::optional<std::uint16_t> learning_domain(std::string_view text);
 
 /// `text` is what ovs-vswitchd said of the frame.
 std::vector<StoryStep> tell(std::string_view text, std::vector<std::uint8_t> const &frame,
