@@ -62,6 +62,7 @@ void Stream::encrypt(std::unique_ptr<Cipher> cipher, Deadline deadline) {
     wait_to_receive(deadline);
     receive(plain);
   }
+  early_ = std::move(plain);
 }
 
 void Stream::send(std::span<std::uint8_t const> bytes) {
@@ -102,6 +103,11 @@ void Stream::hear_complaint() {
 }
 
 bool Stream::receive(std::vector<std::uint8_t> &to) {
+  if (!early_.empty()) {
+    auto const early = std::exchange(early_, {});
+    to.insert(to.end(), early.begin(), early.end());
+    return true;
+  }
   std::array<std::uint8_t, kChunk> chunk{};
   auto const count = ::recv(fd(), chunk.data(), chunk.size(), MSG_DONTWAIT);
   if (count < 0 && (errno == EAGAIN || errno == EINTR)) {
@@ -127,6 +133,9 @@ bool Stream::receive(std::vector<std::uint8_t> &to) {
 void Stream::wait_to_receive(Deadline deadline) {
   while (true) {
     flush();
+    if (!early_.empty()) {
+      return;
+    }
     pollfd polled{fd(), static_cast<short>(POLLIN | (has_unsent() ? POLLOUT : 0)), 0};
     int const ready = ::poll(&polled, 1, milliseconds_until(deadline));
     if (ready < 0 && errno != EINTR) {

@@ -76,7 +76,8 @@ class Stream {
 
   std::string name_;
   events::Descriptor socket_;
-  std::unique_ptr<Cipher> cipher_;  // if there is one
+  std::unique_ptr<Cipher> cipher_;   // if there is one
+  std::vector<std::uint8_t> early_;  // what came with the end of the agreement
   std::vector<std::uint8_t> unsent_;
   std::size_t sent_ = 0;  // of those
 };
