@@ -157,15 +157,21 @@ void Member::claim() {
         "the name '{}' is taken by another host; the operators of the fabric can remove its row",
         options_.host));
   } else if (row->session != speaker_.session) {
-    // Two that take the name from one another would never end.
-    gave_way_ = spoke_;
-    if (gave_way_) {
-      throw std::runtime_error("another simhostd is this host by now");
-    }
-    take_over(*row);
+    contend(*row);
   }
   speaks_ = true;
   spoke_ = true;
+}
+
+// A server may yet tell of the session that had the name before.
+void Member::contend(HostRow const &row) {
+  gave_way_ = spoke_ && row.session != former_session_;
+  if (gave_way_) {
+    throw std::runtime_error("another simhostd is this host by now");
+  }
+  if (!speaks_) {
+    take_over(row);
+  }
 }
 
 void Member::insert_host() {
@@ -193,6 +199,8 @@ void Member::take_over(HostRow const &row) {
                         {"row", {{"session", speaker_.session}}}});
   cluster_.transact(together({operations, old_changes_deletion(options_.host, long_ago())}),
                     from_now(kPatience));
+  // Two that take the name from one another again and again would never end.
+  former_session_ = spoke_ ? std::string() : row.session;
 }
 
 void Member::settle_undecided() {

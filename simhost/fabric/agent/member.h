@@ -53,6 +53,7 @@ class Member {
   void receive();
   void claim();
   void insert_host();
+  void contend(HostRow const &row);
   void take_over(HostRow const &row);
   void settle_undecided();
 
@@ -80,9 +81,10 @@ class Member {
   Speaker speaker_;
   Cluster cluster_;
   daemon::Server server_;
-  bool speaks_ = false;    // for the host, to the fabric
-  bool spoke_ = false;     // at any time
-  bool gave_way_ = false;  // to another process
+  bool speaks_ = false;         // for the host, to the fabric
+  bool spoke_ = false;          // at any time
+  bool gave_way_ = false;       // to another process
+  std::string former_session_;  // from which it has the name
   std::string trouble_;
   std::optional<events::Clock::time_point> lost_;
   std::vector<Proposal> undecided_;
