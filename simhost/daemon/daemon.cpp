@@ -33,6 +33,9 @@ constexpr events::Clock::duration kLongestPause = 200ms;
 // What was counted since the last time is lost when Open vSwitch is killed.
 constexpr auto kBetweenCounts = 2s;
 
+// While somebody else writes.
+constexpr auto kBetweenTries = 20ms;
+
 // Many addresses may come at once.
 constexpr auto kBetweenSaves = 100ms;
 
@@ -384,6 +387,24 @@ void Daemon::sync() {
   follow_tunnels(all);
   settle(all);
   counting_.save_new();
+  tell_settled();
+}
+
+// Who is told asks the state what was counted until then. From a timer, too.
+void Daemon::tell_settled() {
+  if (!settled_) {
+    return;
+  }
+  try {
+    if (!counting_.save()) {
+      next_telling_ = loop_.after(kBetweenTries, [this] { tell_settled(); });
+      return;
+    }
+  } catch (std::exception const &error) {
+    troubles_.add(error.what());
+  }
+  next_telling_.end();
+  settled_(in_force_, troubles_.text());
 }
 
 void Daemon::follow_tunnels(Wanted const &wanted) {
@@ -454,9 +475,6 @@ void Daemon::settle(Wanted const &wanted) {
     troubles_.add(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
   }
   reply_to_waiting();
-  if (settled_) {
-    settled_(in_force_, troubles_.text());
-  }
   if (auto const ready = std::exchange(ready_, nullptr)) {
     ready();
   }

@@ -76,6 +76,7 @@ class Daemon {
   // The way of the machine to the hosts beyond tunnels, and what is wrong with it.
   void follow_tunnels(Wanted const &wanted);
   void settle(Wanted const &wanted);
+  void tell_settled();
   void reply_to_waiting();
 
   // What callers ask.
@@ -143,6 +144,7 @@ class Daemon {
   events::Loop::Timer next_aging_;
   std::chrono::seconds shortest_aging_ = std::chrono::seconds::max();
   events::Loop::Timer next_remembering_;
+  events::Loop::Timer next_telling_;
 };
 
 }  // namespace simhost::daemon

@@ -22,4 +22,15 @@ char const *const kSharedSchema = R"sql(
   ) STRICT, WITHOUT ROWID;
 )sql";
 
+char const *const kCountedSchema = R"sql(
+  -- What counts at several hosts, host by host: counters as a text, as far as those of the port
+  -- here have them. A host without a name stands for what those of the port were at the last look.
+  CREATE TABLE counted (
+    port        INTEGER NOT NULL REFERENCES port ON DELETE CASCADE,
+    host        TEXT NOT NULL,
+    counters    TEXT NOT NULL,
+    PRIMARY KEY (port, host)
+  ) STRICT, WITHOUT ROWID;
+)sql";
+
 }  // namespace simhost::storage

@@ -78,4 +78,35 @@ bool is_shared(Transaction &transaction, std::string_view switch_identifier) {
       .next();
 }
 
+CountedByHost counted_of(Transaction &transaction, PortNumber number) {
+  CountedByHost counted;
+  Query select(transaction, "SELECT host, counters FROM counted WHERE port = ?");
+  select.with(number);
+  while (select.next()) {
+    counted.emplace(select.text(0), select.text(1));
+  }
+  return counted;
+}
+
+std::map<PortNumber, CountedByHost> counted_of_ports(Transaction &transaction, SwitchKey key) {
+  std::map<PortNumber, CountedByHost> counted;
+  Query select(transaction,
+               "SELECT counted.port, host, counters FROM counted"
+               " JOIN port ON port.number = counted.port WHERE port.switch = ?");
+  select.with(key);
+  while (select.next()) {
+    counted[PortNumber{select.number<std::uint32_t>(0)}].emplace(select.text(1), select.text(2));
+  }
+  return counted;
+}
+
+void put_counted(ChangingTransaction &transaction, PortNumber number, std::string_view host,
+                 std::string_view counters) {
+  Change(transaction, "INSERT OR REPLACE INTO counted (port, host, counters) VALUES (?, ?, ?)")
+      .with(number)
+      .with(host)
+      .with(counters)
+      .run();
+}
+
 }  // namespace simhost::storage

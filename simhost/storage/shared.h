@@ -2,10 +2,13 @@
 #pragma once
 
 #include <cstddef>
+#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
+
+#include "storage/ports.h"
 
 namespace simhost::storage {
 
@@ -47,5 +50,14 @@ void remove_shared(ChangingTransaction &transaction, SharedName const &name);
 /// With all of its ports.
 void remove_shared_switch(ChangingTransaction &transaction, std::string_view identifier);
 bool is_shared(Transaction &transaction, std::string_view switch_identifier);
+
+/// What each host counted of a port: texts of counters by the name of the host.
+using CountedByHost = std::map<std::string, std::string>;
+
+CountedByHost counted_of(Transaction &transaction, PortNumber number);
+/// Of all ports of a switch of which there is any.
+std::map<PortNumber, CountedByHost> counted_of_ports(Transaction &transaction, SwitchKey key);
+void put_counted(ChangingTransaction &transaction, PortNumber number, std::string_view host,
+                 std::string_view counters);
 
 }  // namespace simhost::storage

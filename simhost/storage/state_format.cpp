@@ -18,7 +18,7 @@ namespace {
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
     kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema, kSeenSchema,
-    kSharedSchema,     kLacpSchema,   kFabricSchema,  kChosenSchema};
+    kSharedSchema,     kLacpSchema,   kFabricSchema,  kChosenSchema,     kCountedSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -119,6 +119,7 @@ void create_state(SQLite::Database &database) {
   database.exec(kLacpSchema);
   database.exec(kFabricSchema);
   database.exec(kChosenSchema);
+  database.exec(kCountedSchema);
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

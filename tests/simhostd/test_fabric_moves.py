@@ -1,12 +1,15 @@
-"""Ports of a shared switch that are connected now on one host, now on another."""
+"""Ports of a shared switch that are connected now on one host, now on another, and what goes with
+them."""
 
 from pathlib import Path
-from typing import Iterator
+from typing import Dict, Iterator
 
 import pytest
 
-from fabric_lab import FabricLab, Host, started
+from counted_frames import BROADCAST, LENGTH, come_to, counters, send
+from fabric_lab import FabricLab, Host, kept, restored, started
 from frame_lab import comes_true
+from simhost import Client
 
 CLIENT = "02:00:00:00:00:0a"
 UPLINKS = [{"name": "nic0"}]
@@ -27,6 +30,8 @@ LAB = {
         }
     ],
 }
+# Who is alone counts nobody else's frames.
+ALONE = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
 
 
 @pytest.fixture
@@ -68,3 +73,60 @@ def test_a_port_is_where_it_was_connected_last(lab: FabricLab) -> None:
     # Nobody has it when it is disconnected where it is.
     other.ctl("disconnect", "lab", "a")
     assert lab.databases.rows("Port", id="a")[0]["host"] == ""
+
+
+def counted(frames: int) -> Dict[str, int]:
+    return {"pktsInBroadcast": frames, "bytesInBroadcast": frames * LENGTH}
+
+
+def connect(host: Host) -> Client:
+    return host.frames.client("lab", "a", mac=CLIENT)
+
+
+def test_a_port_takes_its_counters_with_it(lab: FabricLab) -> None:
+    one, other = started(lab.host("one", ALONE)), started(lab.host("two"))
+    one.ctl("share", "lab")
+    other.ctl("join", "lab")
+    send(connect(one), 5, BROADCAST)
+    come_to(lambda: counters(one, "a"), counted(5))
+    at_other = connect(other)
+    come_to(lambda: counters(other, "a"), counted(5))
+    send(at_other, 3, BROADCAST)
+    come_to(lambda: counters(other, "a"), counted(8))
+    # Back, by way of nobody.
+    other.ctl("disconnect", "lab", "a")
+    send(connect(one), 4, BROADCAST)
+    come_to(lambda: counters(one, "a"), counted(12))
+    # Of a host that is gone there is what it told last, and the rest when it is back.
+    one.stop()
+    connect(other)
+    assert comes_true(lambda: counters(other, "a")["pktsInBroadcast"] >= 8)
+    started(one)
+    come_to(lambda: counters(other, "a"), counted(12))
+
+
+def test_a_host_of_an_old_state_takes_back_what_it_has_told(lab: FabricLab) -> None:
+    one, other = started(lab.host("one", ALONE)), started(lab.host("two"))
+    one.ctl("share", "lab")
+    other.ctl("join", "lab")
+    send(connect(one), 2, BROADCAST)
+    come_to(lambda: counters(one, "a"), counted(2))
+    connect(other)
+    come_to(lambda: counters(other, "a"), counted(2))
+    one.stop()
+    kept(one, "old")
+    started(one)
+    send(connect(one), 3, BROADCAST)
+    come_to(lambda: counters(one, "a"), counted(5))
+    connect(other)
+    come_to(lambda: counters(other, "a"), counted(5))
+    one.stop()
+    restored(one, "old")
+    assert counters(one, "a") == counted(2)
+    # While the port is elsewhere.
+    started(one)
+    come_to(lambda: counters(one, "a"), counted(5))
+    send(connect(one), 4, BROADCAST)
+    come_to(lambda: counters(one, "a"), counted(9))
+    connect(other)
+    come_to(lambda: counters(other, "a"), counted(9))

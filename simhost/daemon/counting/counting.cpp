@@ -133,10 +133,10 @@ bool Counting::follow(storage::Transaction &transaction) {
   return any;
 }
 
-void Counting::save() {
+bool Counting::save() {
   auto const is_new = [](auto const &one) { return !one.second.is_saved(); };
   if (std::ranges::none_of(switches_, is_new)) {
-    return;
+    return true;
   }
   bool const is_saved =
       storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
@@ -149,12 +149,12 @@ void Counting::save() {
           }
         }
       });
-  if (!is_saved) {
-    return;
+  if (is_saved) {
+    for (auto &[key, one] : switches_) {
+      one.set_saved();
+    }
   }
-  for (auto &[key, one] : switches_) {
-    one.set_saved();
-  }
+  return is_saved;
 }
 
 void Counting::save_new() {

@@ -22,8 +22,9 @@ class Counting {
   void count(storage::SwitchKey key, openvswitch::Totals const &totals,
              openvswitch::CountedSessions const &sessions);
   void count_move(storage::SwitchKey key, std::uint32_t port);
-  /// Raises the counters of the state. Does nothing while somebody else writes.
-  void save();
+  /// Raises the counters of the state. Does nothing while somebody else writes. Returns whether
+  /// the state has all of them.
+  bool save();
   /// Likewise, if there is a switch of which the state has nothing yet: whether its counters go is
   /// seen from now on.
   void save_new();

@@ -10,6 +10,7 @@
 #include <utility>
 
 #include "base/outcomes.h"
+#include "fabric/agent/counted.h"
 #include "fabric/agent/drills.h"
 #include "fabric/caller/fabric_sharing.h"
 #include "model/plane.h"
@@ -24,6 +25,8 @@ constexpr events::Clock::duration kReconnect = 100ms;
 constexpr events::Clock::duration kFirstWait = 2ms;
 constexpr events::Clock::duration kLongestWait = 50ms;
 constexpr events::Clock::duration kBetweenReports = 100ms;
+// What a host that is killed has counted since nobody else knows.
+constexpr events::Clock::duration kBetweenCounts = 30s;
 // How long a request of this host's own is waited for.
 constexpr auto kPatience = 4s;
 // After so long nobody waits for an outcome.
@@ -57,13 +60,6 @@ Membership membership_in(storage::Store &store, std::string const &host) {
   return found.value_or(Membership{.host = host, .state = random_name()});
 }
 
-std::string words_of(SharedName const &name, Records const &switches) {
-  auto const record = switches.find({name.switch_identifier, ""});
-  auto const alias = record != switches.end() ? record->second.at("alias").get<std::string>()
-                                              : name.switch_identifier;
-  return name.port.empty() ? alias : alias + "/" + name.port;
-}
-
 Json map_of(std::map<std::string, std::string> const &texts) {
   return ovsdb::map({texts.begin(), texts.end()});
 }
@@ -83,6 +79,7 @@ Member::Member(events::Loop &loop, Options options, Say say)
       lost_(events::Clock::now()),
       touched_(options_.host) {
   next_connect_ = loop_.after({}, [this] { connect(); });
+  tell_counts_later();
 }
 
 // The connection.
@@ -92,6 +89,7 @@ void Member::connect() {
     cluster_.connect();
     lost_.reset();
     touched_.add_all();
+    counts_are_due_ = true;
     watch();
     claim();
     settle_undecided();
@@ -142,6 +140,7 @@ bool Member::take_news() {
     return false;
   }
   touched_.add(cluster_.replica(), changes);
+  counts_are_due_ = counts_are_due_ || lets_any_go(cluster_.replica(), changes, options_.host);
   claim();
   return true;
 }
@@ -252,11 +251,14 @@ void Member::sync() {
 // Returns whether it could: not while somebody else has the state. What this host cannot bear it
 // tries again with each change, and with it whatever may depend on that.
 bool Member::follow_touched() {
-  if (touched_.empty() && unborne_.empty()) {
+  bool const is_changed = touched_.has_others() || revision_of(cluster_.replica()) != revision_;
+  bool const tries_again = is_changed && !unborne_.empty();
+  if (touched_.empty() && !tries_again) {
     return true;
   }
-  auto const before = std::exchange(unborne_, {});
-  if (!before.empty()) {
+  auto const before = unborne_;
+  if (tries_again) {
+    unborne_.clear();
     touched_.add_all();
   }
   auto news = touched_.news(cluster_.replica());
@@ -264,13 +266,16 @@ bool Member::follow_touched() {
     try {
       storage::Patience none(0ns);
       storage::ChangingTransaction transaction(store_, none);
-      bool const is_new = !storage::find_membership(transaction);
-      if (is_new) {
+      bool is_other = !storage::find_membership(transaction);
+      if (is_other) {
         storage::put_membership(transaction, membership_);
       }
-      if (follow(transaction, membership_, news, unborne_) || is_new) {
+      is_other = follow(transaction, membership_, news, unborne_) || is_other;
+      if (is_other) {
         storage::advance_frames_change(transaction);
         change_ = storage::frames_change(transaction).value_or(0);
+      }
+      if (take_counts(transaction, news.counts) || is_other) {
         transaction.commit();
       }
       touched_.clear();
@@ -375,9 +380,40 @@ void Member::report() {
       // The reply may have come with news.
       sync_soon();
     }
+    // Not before a port has left in the state as well.
+    if (counts_are_due_ && touched_.empty()) {
+      report_counts();
+    }
   } catch (std::runtime_error const &error) {
     lose(error.what());
   }
+}
+
+void Member::tell_counts_later() {
+  next_counts_ = loop_.after(kBetweenCounts, [this] {
+    counts_are_due_ = true;
+    report_soon();
+    tell_counts_later();
+  });
+}
+
+// Of a port that went the last is counted when that is in force.
+void Member::report_counts() {
+  auto const news = untold(store_, cluster_.replica(), membership_);
+  if (!news) {
+    report_soon();
+    return;
+  }
+  if (!news->operations.empty()) {
+    try {
+      cluster_.transact(together({only_for(speaker_), news->operations}), from_now(kPatience));
+      sync_soon();
+    } catch (ovsdb::TransactionRefused const &refusal) {
+      say_(fmt::format("what was counted is not told: {}", refusal.what()));
+      return;
+    }
+  }
+  counts_are_due_ = news->change > in_force_.change;
 }
 
 // What callers ask.

@@ -66,6 +66,8 @@ class Member {
 
   void report_soon();
   void report();
+  void tell_counts_later();
+  void report_counts();
   [[nodiscard]] std::map<std::string, std::string> links();
 
   [[nodiscard]] daemon::Questions questions();
@@ -96,11 +98,13 @@ class Member {
   std::uint64_t change_ = 0;                   // of the state, with which it came
   InForce in_force_;
   Json reported_;
+  bool counts_are_due_ = false;
   std::vector<events::Loop::Watch> watches_;
   events::Loop::Timer next_connect_;
   events::Loop::Timer next_sync_;
   events::Clock::duration next_wait_{};
   events::Loop::Timer next_report_;
+  events::Loop::Timer next_counts_;
 };
 
 }  // namespace simhost::fabric

@@ -183,6 +183,17 @@ Json operations_of(std::vector<Change> const &changes, RowNames const &ports, Wr
   return operations;
 }
 
+Json counts_update(std::string const &host, std::map<std::string, std::string> const &counts) {
+  auto operations = Json::array();
+  for (auto const &[uuid, text] : counts) {
+    auto update = mutation("Port", conditions({{"_uuid", ovsdb::uuid(uuid)}}), "counters", "delete",
+                           ovsdb::set({host}));
+    update["mutations"].push_back(Json::array({"counters", "insert", ovsdb::map({{host, text}})}));
+    operations.push_back(std::move(update));
+  }
+  return operations;
+}
+
 Json next_revision() {
   return Json::array({mutation("Fabric", Json::array(), "revision", "+=", 1)});
 }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -23,6 +24,8 @@ Json only_for(Speaker const &speaker);
 /// Each row must be as it was. `ports` has the rows of ports that are known, and `writers` are
 /// those of the switches that the fabric has.
 Json operations_of(std::vector<Change> const &changes, RowNames const &ports, Writers writers);
+/// What a host has counted of ports, by the UUIDs of these: texts.
+Json counts_update(std::string const &host, std::map<std::string, std::string> const &counts);
 Json next_revision();
 /// A change that was made, or that is never to be made.
 Json change_insertion(std::string const &id, std::string const &host, bool revoked);

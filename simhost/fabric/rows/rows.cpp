@@ -23,7 +23,7 @@ Json settings_in(ovsdb::Row const &row) {
 ovsdb::Selected selected_columns() {
   return {{"Fabric", {"revision"}},
           {"Switch", {"id", "alias", "hosts", "settings", "writers"}},
-          {"Port", {"switch", "id", "host", "settings"}},
+          {"Port", {"switch", "id", "host", "settings", "counters"}},
           {"Host", {"name", "state", "session"}},
           {"Drill", {"id", "host", "switch", "reply"}}};
 }
@@ -50,6 +50,13 @@ bool has_host(ovsdb::Row const &row, std::string const &host) {
   return std::find(hosts.begin(), hosts.end(), Json(host)) != hosts.end();
 }
 
+std::string words_of(SharedName const &name, Records const &switches) {
+  auto const record = switches.find({name.switch_identifier, ""});
+  auto const alias = record != switches.end() ? record->second.at("alias").get<std::string>()
+                                              : name.switch_identifier;
+  return name.port.empty() ? alias : alias + "/" + name.port;
+}
+
 Writers writers_in(ovsdb::Replica const &replica) {
   Writers writers;
   for (auto const &[uuid, row] : replica.rows("Switch")) {
@@ -65,6 +72,14 @@ SharedName switch_in(ovsdb::Row const &row) {
 SharedName port_in(ovsdb::Row const &row) {
   return {.switch_identifier = row.at("switch").get<std::string>(),
           .port = row.at("id").get<std::string>()};
+}
+
+CountsOfHosts counts_of_hosts(ovsdb::Row const &row) {
+  CountsOfHosts counts;
+  for (auto const &[host, text] : ovsdb::entries_of(row.at("counters"))) {
+    counts[host.get<std::string>()] = counts_in(text.get_ref<std::string const &>());
+  }
+  return counts;
 }
 
 void add_port(Records &records, ovsdb::Row const &row, Records const &switches) {

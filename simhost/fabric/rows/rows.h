@@ -21,6 +21,8 @@ ovsdb::Selected selected_columns();
 
 /// The switches that the host belongs to.
 Records switches_of(ovsdb::Replica const &replica, std::string const &host);
+/// What people call a switch or a port.
+std::string words_of(SharedName const &name, Records const &switches);
 /// The column that says which hosts may write a switch and its ports, where they have a role.
 using Writers = std::map<std::string, Json>;
 /// By the identifier of the switch.
@@ -44,6 +46,8 @@ SharedName port_in(ovsdb::Row const &row);
 using RowNames = std::map<SharedName, std::string>;
 /// Of those ports that become other by changes.
 RowNames ports_of(ovsdb::Replica const &replica, std::vector<Change> const &changes);
+/// What hosts have counted of a port.
+CountsOfHosts counts_of_hosts(ovsdb::Row const &row);
 /// Of a port that has a name, if its switch is one of these.
 void add_port(Records &records, ovsdb::Row const &row, Records const &switches);
 

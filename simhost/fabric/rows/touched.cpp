@@ -1,6 +1,7 @@
 // Names are what hosts share; rows of one name may follow one another.
 #include "fabric/rows/touched.h"
 
+#include <algorithm>
 #include <set>
 
 #include "fabric/rows/rows.h"
@@ -13,6 +14,13 @@ ovsdb::Row const *find_row(ovsdb::Replica const &replica, char const *table,
   auto const &rows = replica.rows(table);
   auto const found = rows.find(uuid);
   return found == rows.end() ? nullptr : &found->second;
+}
+
+// Whether a port says what it said, whatever it has counted meanwhile.
+bool is_same(ovsdb::Row const &before, ovsdb::Row const &now) {
+  return std::ranges::all_of(now, [&](auto const &column) {
+    return column.first == "counters" || before.at(column.first) == column.second;
+  });
 }
 
 Records all_records(ovsdb::Replica const &replica, std::string const &host) {
@@ -29,11 +37,13 @@ Records all_records(ovsdb::Replica const &replica, std::string const &host) {
 void Touched::add_all() {
   is_all_ = true;
   rows_.clear();
+  counted_.clear();
 }
 
 void Touched::clear() {
   is_all_ = false;
   rows_.clear();
+  counted_.clear();
 }
 
 void Touched::add(ovsdb::Replica const &replica, std::vector<ovsdb::RowChange> const &changes) {
@@ -62,19 +72,45 @@ void Touched::add_switch(ovsdb::Replica const &replica, ovsdb::RowChange const &
 }
 
 void Touched::add_port(ovsdb::Replica const &replica, ovsdb::RowChange const &change) {
+  auto const *const now = find_row(replica, "Port", change.uuid);
+  if (now != nullptr) {
+    if (now->at("host") == host_) {
+      counted_.insert(change.uuid);
+    }
+    if (change.before && is_same(*change.before, *now)) {
+      return;
+    }
+  }
   if (change.before) {
     rows_.emplace(port_in(*change.before), change.uuid);
   }
-  if (auto const *const now = find_row(replica, "Port", change.uuid)) {
+  if (now != nullptr) {
     rows_[port_in(*now)] = change.uuid;
+  }
+}
+
+void Touched::add_counts(ovsdb::Row const &row, News &news) const {
+  if (row.at("host") == host_) {
+    if (auto counts = counts_of_hosts(row); !counts.empty()) {
+      news.counts[port_in(row)] = std::move(counts);
+    }
   }
 }
 
 News Touched::news(ovsdb::Replica const &replica) const {
   if (is_all_) {
-    return {.names = std::nullopt, .records = all_records(replica, host_)};
+    News news{.names = std::nullopt, .records = all_records(replica, host_), .counts = {}};
+    for (auto const &[uuid, row] : replica.rows("Port")) {
+      add_counts(row, news);
+    }
+    return news;
   }
-  News news{.names = std::set<SharedName>(), .records = {}};
+  News news{.names = std::set<SharedName>(), .records = {}, .counts = {}};
+  for (auto const &uuid : counted_) {
+    if (auto const *const row = find_row(replica, "Port", uuid)) {
+      add_counts(*row, news);
+    }
+  }
   auto const switches = switches_of(replica, host_);
   for (auto const &[name, uuid] : rows_) {
     news.names->insert(name);

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <map>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -25,17 +26,21 @@ class Touched {
   void clear();
 
   [[nodiscard]] bool is_all() const { return is_all_; }
-  [[nodiscard]] bool empty() const { return !is_all_ && rows_.empty(); }
+  [[nodiscard]] bool empty() const { return !has_others() && counted_.empty(); }
+  /// Whether there is more than what ports have counted.
+  [[nodiscard]] bool has_others() const { return is_all_ || !rows_.empty(); }
   [[nodiscard]] News news(ovsdb::Replica const &replica) const;
 
  private:
   void add_switch(ovsdb::Replica const &replica, ovsdb::RowChange const &change);
   void add_port(ovsdb::Replica const &replica, ovsdb::RowChange const &change);
+  void add_counts(ovsdb::Row const &row, News &news) const;
 
   std::string host_;
   bool is_all_ = true;
   // By the name that a row has or had, its UUID. Of two rows of one name, one has gone.
   std::map<SharedName, std::string> rows_;
+  std::set<std::string> counted_;  // UUIDs of ports that are connected here
 };
 
 }  // namespace simhost::fabric

@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "fabric/shared/counts.h"
 #include "storage/shared.h"
 
 namespace simhost::fabric {
@@ -54,6 +55,8 @@ struct News {
   /// Of the only ones that may have changed, whether there are records of them or not; none: any.
   std::optional<std::set<SharedName>> names;
   Records records;
+  /// Of ports that are connected here.
+  std::map<SharedName, CountsOfHosts> counts;
 };
 
 /// Makes what is shared here what the fabric says, but for the rows that are known to be unborne.

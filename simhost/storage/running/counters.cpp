@@ -26,6 +26,20 @@ std::vector<CounterRow> all_counters(Transaction &transaction, CounterOwner cons
       [](Query const &row) { return CounterRow{.name = row.text(0), .value = value_at(row, 1)}; });
 }
 
+std::map<PortNumber, std::vector<CounterRow>> counters_of_ports(Transaction &transaction,
+                                                                SwitchKey key) {
+  std::map<PortNumber, std::vector<CounterRow>> counters;
+  Query select(transaction,
+               "SELECT port, name, value FROM counter"
+               " WHERE switch = ? AND port IS NOT NULL AND session = '' ORDER BY port, name");
+  select.with(key);
+  while (select.next()) {
+    counters[PortNumber{select.number<std::uint32_t>(0)}].push_back(
+        {.name = select.text(1), .value = value_at(select, 2)});
+  }
+  return counters;
+}
+
 std::optional<std::uint64_t> find_counter(Transaction &transaction, CounterOwner const &owner,
                                           std::string_view name) {
   Query select(transaction, "SELECT value FROM counter " OF_OWNER " AND name = ?");

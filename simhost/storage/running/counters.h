@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -25,6 +26,9 @@ struct CounterRow {
 
 /// The counters of an owner, in the order of their names.
 std::vector<CounterRow> all_counters(Transaction &transaction, CounterOwner const &owner);
+/// Those of all ports of a switch that have counted, likewise.
+std::map<PortNumber, std::vector<CounterRow>> counters_of_ports(Transaction &transaction,
+                                                                SwitchKey key);
 std::optional<std::uint64_t> find_counter(Transaction &transaction, CounterOwner const &owner,
                                           std::string_view name);
 /// Sets a counter, whether or not it was there.

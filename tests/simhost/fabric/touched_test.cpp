@@ -21,7 +21,8 @@ ovsdb::Schema schema() {
   Column const set{.kind = Column::Kind::set, .usual = ovsdb::set({})};
   Column const map{.kind = Column::Kind::map, .usual = ovsdb::map({})};
   return {{"Switch", {{"id", text}, {"alias", text}, {"hosts", set}, {"settings", map}}},
-          {"Port", {{"switch", text}, {"id", text}, {"host", text}, {"settings", map}}}};
+          {"Port",
+           {{"switch", text}, {"id", text}, {"host", text}, {"settings", map}, {"counters", map}}}};
 }
 
 Json hosts(std::vector<Json> const &names) {
@@ -115,6 +116,29 @@ TEST_F(TouchedRows, AreAllWithASwitchThatComesOrGoes) {
   change("Switch", "us", "modify", {{"hosts", hosts({kHost})}});
   EXPECT_EQ(news().names, std::nullopt);
   EXPECT_THAT(news().records, SizeIs(1001));
+}
+
+TEST_F(TouchedRows, CountWithoutBeingOthers) {
+  auto const counters = ovsdb::map({{"there", R"({"pktsInUnicast": 7})"}});
+  auto const counted = testing::ElementsAre(testing::Pair("there", Counts{{"pktsInUnicast", 7}}));
+  change("Port", "u7", "modify", {{"counters", counters}});
+  EXPECT_TRUE(touched_.empty());
+  EXPECT_THAT(news().counts, IsEmpty());
+  // Once it comes here.
+  change("Port", "u7", "modify", {{"host", kHost}});
+  EXPECT_TRUE(touched_.has_others());
+  EXPECT_THAT(*news().names, ElementsAre(port("7")));
+  EXPECT_THAT(news().counts.at(port("7")), counted);
+  touched_.clear();
+  EXPECT_TRUE(touched_.empty());
+  touched_.add_all();
+  EXPECT_THAT(news().counts, SizeIs(1));
+  touched_.clear();
+  change("Port", "u7", "modify", {{"counters", ovsdb::map({{"other", "{}"}})}});
+  EXPECT_FALSE(touched_.empty());
+  EXPECT_FALSE(touched_.has_others());
+  EXPECT_THAT(*news().names, IsEmpty());
+  EXPECT_THAT(news().counts.at(port("7")), SizeIs(2));
 }
 
 TEST_F(TouchedRows, AreNoRowsOfSwitchesOfOthers) {
