@@ -7,6 +7,7 @@ import pytest
 
 from fabric_lab import FabricLab
 from operating import Operator, of_lab, populate
+from vswitch import _table
 from vswitch.fabric import Fabric, View
 
 
@@ -65,6 +66,19 @@ def test_of_a_member_that_somebody_else_sets_meanwhile_nothing_is_lost(
     done = operator("set", "lab/a", "vlan.priority=3")
     assert done.status == 1 and "somebody else changed the same meanwhile" in done.stderr
     assert operator.json("show", "lab/a")["vlan"] == {"id": 7, "trunk": [10]}
+
+
+def test_a_member_of_what_is_set_byte_by_byte_is_refused(operator: Operator) -> None:
+    key = _table.PORT["vlan"].keys[0]
+    raw = {key: {"type": "config", "hex": "00ff"}}
+    operator.told("apply", "-", given=of_lab(ports=[{"id": "a", "properties": raw}]))
+    done = operator("set", "lab/a", "vlan.priority=3")
+    assert done.status == 1
+    assert f"vlan of lab/a is set byte by byte, as {key}: set it as a whole" in done.stderr
+    assert operator.json("show", "lab/a")["properties"] == raw
+    operator.told("set", "lab/a", "vlan=8", "vlan.priority=3")
+    now = operator.json("show", "lab/a")
+    assert now["vlan"] == {"id": 8, "priority": 3} and "properties" not in now
 
 
 def test_things_come_and_go(operator: Operator) -> None:

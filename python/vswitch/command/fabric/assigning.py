@@ -55,6 +55,17 @@ def _change(fabric: Fabric, view: View, alias: str, id_: Optional[str], wanted: 
     tell_made(plan.changes)
 
 
+def _refuse_bytes(place: str, setting: _table.Property, there: Mapping[str, Words]) -> None:
+    """What the members are that are not said: nobody knows of a setting that is held as bytes."""
+    held = there.get("properties")
+    keys = [key for key in setting.keys if isinstance(held, dict) and key in held]
+    if keys:
+        raise HostError(
+            f"{setting.name} of {place} is set byte by byte, as {', '.join(keys)}: "
+            "set it as a whole, or unset it first"
+        )
+
+
 def set_(
     place: str = PLACE,
     settings: List[str] = typer.Argument(
@@ -72,6 +83,7 @@ def set_(
         known = _known(id_)
 
         def current(setting: _table.Property) -> Words:
+            _refuse_bytes(place, setting, there)
             return there[setting.name] if setting.name in there else defaults(setting)
 
         wanted = assignments.read(known, settings, current)
