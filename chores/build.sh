@@ -70,7 +70,7 @@ configure() {
   mkdir -p "$folder"
   flock "$folder/.lock" cmake -S . -B "$folder" -G Ninja --log-level=WARNING \
     -DCMAKE_BUILD_TYPE="$build_type" -DPython3_EXECUTABLE="$python" -DSANITIZE="$sanitizers" \
-    -DFAST_PATHS="$fast_paths" \
+    -DFAST_PATHS="$fast_paths" -DSOURCES_TOGETHER=ON \
     ${testing:+-DBUILD_TESTING=ON} ${benching:+-DBUILD_BENCH=ON} >/dev/null
 }
 
@@ -90,7 +90,7 @@ configure_fuzzers() {
   flock "$FUZZERS_DIR/.lock" cmake -S . -B "$FUZZERS_DIR" -G Ninja --log-level=WARNING \
     -DCMAKE_C_COMPILER=clang -DCMAKE_CXX_COMPILER=clang++ \
     -DCMAKE_BUILD_TYPE=Debug -DCMAKE_CXX_FLAGS_DEBUG=-O1 \
-    -DSANITIZE=fuzzer-no-link,address,undefined -DBUILD_FUZZERS=ON >/dev/null
+    -DSANITIZE=fuzzer-no-link,address,undefined -DBUILD_FUZZERS=ON -DSOURCES_TOGETHER=ON >/dev/null
 }
 
 # build_fuzzers TARGET: all of them, or brief_fuzzers.

@@ -79,7 +79,10 @@ check_words() { "$python" chores/check_words.py; }
 check_tidy() {
   export folder ours="^$root/(include|helpers|recordings|simhost|tests|bench)/"
   stamps=$folder/tidy
-  mkdir -p "$stamps"
+  for built in "$folder" ${FUZZERS_DIR:+"$FUZZERS_DIR"}; do
+    mkdir -p "$built/tidy"
+    "$python" chores/compile_commands.py "$built" "$built/tidy/compile_commands.json" || return
+  done
   # shellcheck disable=SC2046 # none of our file names has a space
   inputs=$("$python" chores/tidy_inputs.py "$folder" ${FUZZERS_DIR:+"$FUZZERS_DIR"} -- \
     $(sources '*.c' '*.cpp' | grep -v "${untidied:-^$}")) || return
@@ -88,11 +91,11 @@ check_tidy() {
   done | nice xargs -r -n 2 -P "$jobs" sh -c '
     echo "clang-tidy $1"
     case $1 in ./tests/fuzz/*) folder=$FUZZERS_DIR ;; esac
-    if ! grep -qF "\"file\": \"$PWD/${1#./}\"" "$folder/compile_commands.json"; then
+    if ! grep -qF "\"file\": \"$PWD/${1#./}\"" "$folder/tidy/compile_commands.json"; then
       echo "$1: no target builds it, so nothing checks it"
       exit 1
     fi
-    findings=$(clang-tidy --quiet -p "$folder" --header-filter "$ours" "$1" 2>&1) &&
+    findings=$(clang-tidy --quiet -p "$folder/tidy" --header-filter "$ours" "$1" 2>&1) &&
       : >"$2" && exit
     printf "%s\n" "$findings" | grep -v " generated\.$" | head -n 40
     exit 1' sh

@@ -8,12 +8,12 @@ has not compiled a source, or not since one of them changed, all headers of the 
 
 import functools
 import hashlib
-import json
 import subprocess
 import sys
 from pathlib import Path
 from typing import Dict, Iterable, List, NamedTuple
 
+from compile_commands import compile_commands
 from ninja_files import made_of
 
 ROOT = Path.cwd()
@@ -29,7 +29,7 @@ class Compilation(NamedTuple):
 def compilations(folder: Path) -> Dict[Path, List[Compilation]]:
     """The commands of a build folder by their sources."""
     found: Dict[Path, List[Compilation]] = {}
-    for entry in json.loads((folder / "compile_commands.json").read_text(encoding="utf-8")):
+    for entry in compile_commands(folder):
         words = entry["command"].split()
         made = words[words.index("-o") + 1]
         source = Path(entry["directory"], entry["file"])

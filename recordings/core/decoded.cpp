@@ -600,6 +600,11 @@ class Values {
 
 }  // namespace
 
+Json member_of(Json const &object, std::string_view name) {
+  auto const found = object.find(name);
+  return found == object.end() ? Json() : *found;
+}
+
 std::vector<Decoded> decode_inputs(Call const &call, Json const &in) {
   return Values(call, in, nullptr, nullptr).inputs();
 }

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <nlohmann/json.hpp>
 #include <stdexcept>
+#include <string_view>
 #include <vector>
 
 #include "recordings/core/shapes.h"
@@ -27,6 +28,9 @@ class Unread : public Misfit {
  public:
   using Misfit::Misfit;
 };
+
+/// null if the object has none of this name.
+Json member_of(Json const &object, std::string_view name);
 
 /// What one argument gives or leaves.
 struct Decoded {

@@ -51,11 +51,6 @@ std::string value_shown(Json const &value) {
   return text.substr(0, end) + "...";
 }
 
-Json member_of(Json const &inputs, std::string_view name) {
-  auto const found = inputs.find(name);
-  return found == inputs.end() ? Json() : *found;
-}
-
 /// Collects what differs of two values, from the outside in.
 class Differing {
  public:

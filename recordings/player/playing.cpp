@@ -20,11 +20,6 @@ std::size_t index_of(Call const &call, std::string_view argument) {
   return static_cast<std::size_t>(found - call.arguments.begin());
 }
 
-Json member_of(Json const &object, char const *name) {
-  auto const found = object.find(name);
-  return found == object.end() ? Json() : *found;
-}
-
 std::string text_or_empty(Json const &value) {
   return value.is_string() ? value.get<std::string>() : std::string();
 }

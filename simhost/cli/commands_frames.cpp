@@ -17,9 +17,9 @@ struct PortWords {
   std::string device;
   std::string mac;
 };
-using Words = std::shared_ptr<PortWords>;
+using AskedPort = std::shared_ptr<PortWords>;
 
-Words port_of(CLI::App &command) {
+AskedPort port_of(CLI::App &command) {
   auto given = words_of_command<PortWords>();
   command.add_option("switch", given->switch_name, "alias of the switch")->required();
   command.add_option("port", given->port, "identifier of the port")->required();

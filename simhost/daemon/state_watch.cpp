@@ -14,7 +14,7 @@ namespace {
 using namespace std::chrono_literals;
 
 constexpr events::Clock::duration kFirstLook = 1ms;
-constexpr events::Clock::duration kLongestPause = 100ms;
+constexpr events::Clock::duration kLongestLook = 100ms;
 
 events::Descriptor watched(std::filesystem::path const &file) {
   auto inotify = events::owned(inotify_init1(IN_CLOEXEC | IN_NONBLOCK), "inotify_init1");
@@ -64,7 +64,7 @@ void StateWatch::tell_when_readable(events::Clock::duration next_look) {
     return;
   }
   next_look_ = loop_.after(
-      next_look, [this, next_look] { tell_when_readable(std::min(2 * next_look, kLongestPause)); });
+      next_look, [this, next_look] { tell_when_readable(std::min(2 * next_look, kLongestLook)); });
 }
 
 }  // namespace simhost::daemon

@@ -81,8 +81,8 @@ Json range_to_json(std::int64_t first, std::int64_t last) {
   return first == last ? Json(first) : Json(fmt::format("{}-{}", first, last));
 }
 
-Bytes address_from(Form const &form, Node const &node) {
-  auto address = scenario::address_from(node.text());
+Bytes address_of(Form const &form, Node const &node) {
+  auto address = address_from(node.text());
   bool const is_mac = address && address->size() == kMacBytes;
   if (form.kind == FormKind::mac && !is_mac) {
     node.fail("must be six bytes such as 02:00:00:00:00:01");
@@ -283,7 +283,7 @@ void read(Form const &form, Node const &node, void *object) {
     case FormKind::mac:
     case FormKind::ip:
     case FormKind::address:
-      form.put_bytes(object, address_from(form, node));
+      form.put_bytes(object, address_of(form, node));
       break;
     case FormKind::record:
       read_record(form, node, object);

@@ -1,7 +1,6 @@
 // Port and uplink rows in SQL.
 #include "storage/ports.h"
 
-#include <limits>
 #include <utility>
 
 #include "storage/query.h"
@@ -9,18 +8,13 @@
 namespace simhost::storage {
 namespace {
 
-PortNumber number_at(Query const &row, int column) {
-  auto const number = row.integer(column, 1, std::numeric_limits<std::uint32_t>::max());
-  return PortNumber(static_cast<std::uint32_t>(number));
-}
-
 // What a row of a port, and of an uplink, is read with; macros, so that a statement is one literal.
 #define SELECT_PORT "SELECT number, switch, identifier, is_uplink FROM port"
 #define SELECT_UPLINK "SELECT name, port FROM uplink"
 
 // Of a row that SELECT_PORT finds.
 Port port_at(Query const &row) {
-  return {.number = number_at(row, 0),
+  return {.number = row.port_number(0),
           .switch_key = SwitchKey{row.integer(1)},
           .identifier = row.name(2),
           .kind = row.flag(3) ? PortKind::uplink : PortKind::client};
@@ -30,7 +24,7 @@ Port port_at(Query const &row) {
 Uplink any_uplink_at(Query const &row) {
   Uplink uplink{.name = row.name(0), .port = std::nullopt};
   if (!row.is_null(1)) {
-    uplink.port = number_at(row, 1);
+    uplink.port = row.port_number(1);
   }
   return uplink;
 }
@@ -124,7 +118,7 @@ std::vector<Port> ports_of(Transaction &transaction, SwitchKey switch_key) {
 
 std::vector<PortNumber> client_numbers(Transaction &transaction, SwitchKey switch_key) {
   Query select(transaction, "SELECT number FROM port WHERE switch = ? AND NOT is_uplink");
-  return select.with(switch_key).all([](Query const &row) { return number_at(row, 0); });
+  return select.with(switch_key).all([](Query const &row) { return row.port_number(0); });
 }
 
 std::uint32_t count_ports(Transaction &transaction, SwitchKey switch_key, PortKind kind) {
@@ -180,7 +174,7 @@ std::vector<AttachedUplink> uplinks_of(Transaction &transaction, SwitchKey switc
                "SELECT uplink.name, port.number FROM port JOIN uplink ON uplink.port = port.number"
                " WHERE port.switch = ? AND port.is_uplink ORDER BY port.number");
   return select.with(switch_key).all([](Query const &row) {
-    return AttachedUplink{.name = row.name(0), .port = number_at(row, 1)};
+    return AttachedUplink{.name = row.name(0), .port = row.port_number(1)};
   });
 }
 

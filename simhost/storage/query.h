@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "storage/connection.h"
+#include "storage/ports.h"
 #include "storage/store.h"
 
 namespace simhost::storage {
@@ -57,6 +58,10 @@ class Query {
   [[nodiscard]] Number number(int column) const {
     static_assert(std::is_unsigned_v<Number> && sizeof(Number) < sizeof(std::int64_t));
     return static_cast<Number>(integer(column, 0, std::numeric_limits<Number>::max()));
+  }
+  [[nodiscard]] PortNumber port_number(int column) const {
+    return PortNumber(
+        static_cast<std::uint32_t>(integer(column, 1, std::numeric_limits<std::uint32_t>::max())));
   }
   /// 0 or 1.
   [[nodiscard]] bool flag(int column) const { return integer(column, 0, 1) != 0; }

@@ -1,11 +1,13 @@
 """./dev check: which tests a change touches, and which clang-tidy looks at again."""
 
+import json
 import os
 import subprocess
 from pathlib import Path
 from typing import Dict, Iterator, List, Set, Tuple
 
 import pytest
+from compile_commands import compile_commands
 from ninja_files import touched
 from select_tests import PYTHON_TESTS
 
@@ -168,3 +170,19 @@ def test_every_part_of_the_tree_says_what_it_touches() -> None:
     for tests in PYTHON_TESTS.values():
         for test in tests:
             assert (ROOT / test).exists(), test
+
+
+def test_each_source_has_a_command_where_several_are_one(tmp_path: Path) -> None:
+    together = tmp_path / "made/Unity/unity_0_cxx.cxx"
+    together.parent.mkdir(parents=True)
+    together.write_text('#include "/tree/one.cpp"\n\n#include "/tree/two.cpp"\n')
+    alone, made = "/tree/alone.cpp", "made/Unity/unity_0_cxx.cxx.o"
+    commands = [
+        {"directory": str(tmp_path), "file": file, "command": f"g++ -DX -o {made} -c {file}"}
+        for file in (str(together), alone)
+    ]
+    (tmp_path / "compile_commands.json").write_text(json.dumps(commands))
+    found = {one["file"]: one["command"] for one in compile_commands(tmp_path)}
+    assert found == {
+        file: f"g++ -DX -o {made} -c {file}" for file in ("/tree/one.cpp", "/tree/two.cpp", alone)
+    }

@@ -1,6 +1,5 @@
 """The layers of the simulated host: each finds those below it and none above."""
 
-import json
 import os
 import re
 import shlex
@@ -9,6 +8,7 @@ from pathlib import Path
 from typing import Dict, List
 
 import pytest
+from compile_commands import compile_commands
 
 ROOT = Path(__file__).resolve().parents[2]
 BUILD = Path(os.environ.get("BUILD_DIR", ROOT / "build"))
@@ -164,8 +164,7 @@ def command_of(layer: str) -> List[str]:
     """The command that compiles a source of a layer, without the source and what it makes."""
     # The sources of the host's two libraries stand in folders of their own within the edge.
     source = re.compile(rf"/simhost/{layer}/(?!libvswitch|libnebPublic).*\.cpp$")
-    commands = json.loads((BUILD / "compile_commands.json").read_text(encoding="utf-8"))
-    entry = next(entry for entry in commands if source.search(entry["file"]))
+    entry = next(entry for entry in compile_commands(BUILD) if source.search(entry["file"]))
     words = shlex.split(entry["command"])
     return words[: words.index("-o")]
 

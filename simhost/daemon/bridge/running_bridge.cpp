@@ -26,7 +26,7 @@ using openflow::FlowCommand;
 using openvswitch::Deadline;
 
 // What Open vSwitch says of its flows is older than that anyway.
-constexpr auto kBetweenCounts = 100ms;
+constexpr auto kCountsLast = 100ms;
 
 std::filesystem::path socket_of(WantedBridge const &wanted, std::filesystem::path const &folder) {
   return folder / (wanted.row.name + ".mgmt");
@@ -201,7 +201,7 @@ void RunningBridge::count(Deadline deadline) {
 }
 
 void RunningBridge::count_anew(Deadline deadline) {
-  if (counted_ + kBetweenCounts < Deadline::clock::now()) {
+  if (counted_ + kCountsLast < Deadline::clock::now()) {
     count(deadline);
   }
 }

@@ -19,8 +19,8 @@ namespace {
 using namespace std::chrono_literals;
 
 // Between two looks: a new collector mostly replies at once.
-constexpr events::Clock::duration kFirstPause = 20ms;
-constexpr events::Clock::duration kLongestPause = 1s;
+constexpr events::Clock::duration kFirstWait = 20ms;
+constexpr events::Clock::duration kLongestWait = 1s;
 
 constexpr std::uint32_t kEthernet = 14;
 constexpr std::uint32_t kTwoTags = 8;
@@ -121,7 +121,7 @@ void Collectors::look_again() {
   }
   next_look_.end();
   if (!collectors_.empty()) {
-    pause_ = std::clamp(2 * pause_, kFirstPause, kLongestPause);
+    pause_ = std::clamp(2 * pause_, kFirstWait, kLongestWait);
     next_look_ = loop_.after(pause_, [this] { look_again(); });
   }
   if (has_changed) {

@@ -18,7 +18,7 @@ using namespace std::chrono_literals;
 constexpr auto kPatienceWithServer = 4s;
 constexpr auto kPause = 50ms;
 // An election takes less; without a majority nobody shall wait for long.
-constexpr auto kElection = 3s;
+constexpr auto kReachedBy = 3s;
 
 // By these words the database says that it will not; all others may be those of a server in need.
 bool is_final(ovsdb::TransactionRefused const &refusal) {
@@ -91,7 +91,7 @@ class Deciding {
   Cluster &cluster_;
   Proposal const &proposal_;
   Deadline deadline_;
-  Deadline reached_by_ = Deadline::clock::now() + kElection;
+  Deadline reached_by_ = Deadline::clock::now() + kReachedBy;
   bool in_doubt_ = false;
   std::string why_;
 };

@@ -42,7 +42,7 @@ void write_addresses(Writer &writer, std::vector<storage::Address> const &addres
   }
 }
 
-Bytes image_of(Parts const &parts) {
+Bytes joined(Parts const &parts) {
   Writer writer;
   writer.text(parts.external_id);
   writer.number(parts.has_device ? 1 : 0);
@@ -78,10 +78,10 @@ Bytes image_of(Transaction &transaction, storage::FoundSwitch const &found) {
 
 Bytes image_of(Transaction &transaction, storage::Port const &port) {
   auto const owner = storage::PropertyOwner::port(port.switch_key, port.number);
-  return image_of({.external_id = storage::external_id_of(transaction, port.number),
-                   .has_device = storage::device_of(transaction, port.number).has_value(),
-                   .properties = storage::properties_of(transaction, owner),
-                   .addresses = addresses_at(transaction, port.switch_key, port.number)});
+  return joined({.external_id = storage::external_id_of(transaction, port.number),
+                 .has_device = storage::device_of(transaction, port.number).has_value(),
+                 .properties = storage::properties_of(transaction, owner),
+                 .addresses = addresses_at(transaction, port.switch_key, port.number)});
 }
 
 std::map<storage::PortNumber, Bytes> images_of_ports(Transaction &transaction,
@@ -106,7 +106,7 @@ std::map<storage::PortNumber, Bytes> images_of_ports(Transaction &transaction,
   }
   std::map<storage::PortNumber, Bytes> images;
   for (auto const &[number, parts] : all) {
-    images[number] = image_of(parts);
+    images[number] = joined(parts);
   }
   return images;
 }

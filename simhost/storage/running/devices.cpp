@@ -2,17 +2,11 @@
 #include "storage/running/devices.h"
 
 #include <algorithm>
-#include <limits>
 
 #include "storage/query.h"
 
 namespace simhost::storage {
 namespace {
-
-PortNumber number_at(Query const &row, int column) {
-  auto const number = row.integer(column, 1, std::numeric_limits<std::uint32_t>::max());
-  return PortNumber(static_cast<std::uint32_t>(number));
-}
 
 // What a device is read with; a macro, so that a statement is one literal.
 #define SELECT_DEVICE "SELECT device.name, device.number, device.mac"
@@ -58,7 +52,7 @@ std::vector<PortDevice> port_devices(Transaction &transaction, SwitchKey key) {
                " JOIN device ON device.port = port.number"
                " WHERE port.switch = ? ORDER BY port.number");
   return select.with(key).all([](Query const &row) {
-    return PortDevice{.port = number_at(row, 3), .device = device_at(row)};
+    return PortDevice{.port = row.port_number(3), .device = device_at(row)};
   });
 }
 
@@ -78,7 +72,7 @@ std::optional<DeviceHolder> find_device(Transaction &transaction, std::string_vi
     if (!row.is_null(0)) {
       holder.uplink = row.name(0);
     } else if (!row.is_null(1)) {
-      holder.port = number_at(row, 1);
+      holder.port = row.port_number(1);
     }
     return holder;
   });

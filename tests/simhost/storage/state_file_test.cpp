@@ -8,7 +8,6 @@
 #include <sys/stat.h>
 
 #include <filesystem>
-#include <fstream>
 #include <functional>
 #include <string>
 
@@ -30,11 +29,6 @@ using simhost::storage::ReadingTransaction;
 using simhost::storage::StateFile;
 using simhost::storage::Store;
 using testing::HasSubstr;
-
-std::string content(std::filesystem::path const &file) {
-  std::ifstream stream(file, std::ios::binary);
-  return {std::istreambuf_iterator<char>(stream), {}};
-}
 
 void execute(std::filesystem::path const &file, std::string const &sql) {
   SQLite::Database(file.string(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(sql);

@@ -51,11 +51,6 @@ std::string refusal_of(std::filesystem::path const &file) {
   }
 }
 
-std::string content(std::filesystem::path const &file) {
-  std::ifstream stream(file, std::ios::binary);
-  return {std::istreambuf_iterator<char>(stream), {}};
-}
-
 TEST(Store, AFileOutlivesItsConnection) {
   TemporaryFolder const folder;
   {

@@ -1,8 +1,10 @@
-// A folder that lasts as long as a test.
+// A folder that lasts as long as a test, and what its files hold.
 #pragma once
 
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 #include <stdexcept>
 #include <string>
 
@@ -27,3 +29,8 @@ class TemporaryFolder {
  private:
   std::filesystem::path path_;
 };
+
+inline std::string content(std::filesystem::path const &file) {
+  std::ifstream stream(file, std::ios::binary);
+  return {std::istreambuf_iterator<char>(stream), {}};
+}

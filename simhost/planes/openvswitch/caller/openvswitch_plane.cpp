@@ -16,6 +16,7 @@
 #include "model/properties/properties.h"
 #include "model/teaming/properties.h"
 #include "model/teaming/team.h"
+#include "planes/openvswitch/caller/patience.h"
 #include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/line/line.h"
 #include "planes/openvswitch/multicast/address.h"
@@ -30,11 +31,6 @@
 
 namespace simhost::openvswitch {
 namespace {
-
-using namespace std::chrono_literals;
-
-// How long a call waits for its change to be in force, and for replies to its questions.
-constexpr auto kPatience = 2000ms;
 
 Json asked(std::filesystem::path const &file, Json const &question) {
   try {

@@ -18,6 +18,7 @@
 #include "model/properties/properties.h"
 #include "model/teaming/properties.h"
 #include "planes/openvswitch/caller/openvswitch_plane.h"
+#include "planes/openvswitch/caller/patience.h"
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/line/line.h"
 #include "planes/openvswitch/reading/read_mirrors.h"
@@ -29,9 +30,6 @@
 namespace simhost::openvswitch {
 namespace {
 
-using namespace std::chrono_literals;
-
-constexpr auto kPatience = 2000ms;
 constexpr std::string_view kLearning = "mac_learning";
 
 openflow::EthernetAddress source_of(std::vector<std::uint8_t> const &frame) {

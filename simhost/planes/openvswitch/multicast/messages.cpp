@@ -23,7 +23,6 @@ using openflow::Reader;
 
 constexpr unsigned kMostTags = 2;
 
-constexpr auto kTenth = 100ms;
 // Of routers that speak version 1 of IGMP, and do not say it.
 constexpr auto kUsualResponse = 10s;
 // How many of its intervals a router is silent for that is gone.
@@ -198,14 +197,14 @@ Query take_igmp_query(Reader in) {
   auto const old = peek<qex_IGMPHdr>(in);
   Query query{.version = old.maxResponseTime == 0 ? 1U : 2U,
               .group = group_asked_for(ipv4_in(old.groupAddr)),
-              .response = old.maxResponseTime * kTenth};
+              .response = old.maxResponseTime * kResponseUnit};
   if (query.version == 1) {
     query.response = kUsualResponse;
   }
   if (bytes > sizeof old) {
     auto const header = take<qex_IGMPv3QueryHdr>(in);
     query.version = 3;
-    query.response = FloatingCode<8>::decoded(header.maxResponseCode) * kTenth;
+    query.response = FloatingCode<8>::decoded(header.maxResponseCode) * kResponseUnit;
     query.sources = take_sources(in, Family::ipv4, ntohs(header.numSources));
     read_routers_habits(header, query);
   }

@@ -13,6 +13,9 @@
 
 namespace simhost::multicast {
 
+/// The unit in which a query tells how long members may take to reply.
+inline constexpr std::chrono::milliseconds kResponseUnit{100};
+
 /// A router asks who is a member.
 struct Query {
   unsigned version = 0;                         ///< 1 to 3 of IGMP, 1 or 2 of MLD

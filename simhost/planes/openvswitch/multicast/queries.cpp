@@ -15,7 +15,6 @@ using namespace std::chrono_literals;
 using openflow::Bytes;
 using openflow::Writer;
 
-constexpr auto kTenth = 100ms;
 constexpr std::uint8_t kMostRobustness = 7;
 
 // All systems of the link.
@@ -52,7 +51,8 @@ void put_sources(Writer &out, Query const &query) {
 
 // 0 would be the first version.
 std::uint8_t tenths(Query const &query) {
-  auto const count = static_cast<std::uint64_t>(std::max(query.response, kTenth) / kTenth);
+  auto const count =
+      static_cast<std::uint64_t>(std::max(query.response, kResponseUnit) / kResponseUnit);
   switch (query.version) {
     case 1:
       return 0;

@@ -16,7 +16,7 @@ constexpr auto kRegisters =
     static_cast<unsigned>(Field::reg15) - static_cast<unsigned>(Field::reg0) + 1;
 
 // In the order of Field.
-constexpr std::array<FieldInfo, kFields> kTable{{
+constexpr std::array<FieldInfo, kFields> kFieldTable{{
     {"tun_id",
      "tun_id",
      "NXM_NX_TUN_ID",
@@ -280,7 +280,7 @@ constexpr std::optional<std::size_t> class_index(std::uint16_t oxm_class) {
 constexpr ByNumber by_number() {
   ByNumber all{};
   for (std::size_t index = 0; index < kFields; ++index) {
-    for (auto const id : {kTable[index].oxm, kTable[index].nxm}) {
+    for (auto const id : {kFieldTable[index].oxm, kFieldTable[index].nxm}) {
       all[*class_index(id.oxm_class)][id.number] = static_cast<Field>(index);
     }
   }
@@ -292,7 +292,7 @@ constexpr ByNumber kByNumber = by_number();
 }  // namespace
 
 FieldInfo const &info(Field field) {
-  return kTable.at(static_cast<std::size_t>(field));
+  return kFieldTable.at(static_cast<std::size_t>(field));
 }
 
 std::optional<Field> find_field(FieldId id) {

@@ -17,13 +17,13 @@ constexpr std::size_t kPairBytes = 8;
 constexpr std::uint16_t kOxmMatch = 1;
 constexpr std::size_t kMatchHeader = 4;
 
-struct Header {
+struct OxmHeader {
   FieldId id;
   bool has_mask;
   std::uint8_t length;
 };
 
-Header take_header(Reader &in) {
+OxmHeader take_oxm_header(Reader &in) {
   auto const oxm_class = in.u16();
   auto const number = in.u8();
   return {{oxm_class, static_cast<std::uint8_t>(number >> 1U)}, (number & 1U) != 0, in.u8()};
@@ -62,7 +62,7 @@ Masked take_content(Reader &in, std::size_t bytes, bool has_mask, Value whole) {
 }
 
 // What follows a header.
-Reader take_payload(Reader &in, Header const &header) {
+Reader take_payload(Reader &in, OxmHeader const &header) {
   Reader payload(in.take(header.length));
   if (header.id.oxm_class == kExperimenterClass && payload.u32() != kOpenVswitch) {
     throw_foreign(header.id);
@@ -76,7 +76,7 @@ void require_size(Reader const &payload, std::size_t bytes, bool has_mask) {
   }
 }
 
-void add_pair(Match &match, Header const &header, Reader &payload) {
+void add_pair(Match &match, OxmHeader const &header, Reader &payload) {
   require_size(payload, kPairBytes, header.has_mask);
   auto const [value, mask] = take_content(payload, kPairBytes, header.has_mask, ones(64));
   auto const half = ones(32);
@@ -84,7 +84,7 @@ void add_pair(Match &match, Header const &header, Reader &payload) {
   match.with(reg(2 * header.id.number + 1), value & half, mask & half);
 }
 
-Masked checked_content(Field field, Header const &header, Reader &payload) {
+Masked checked_content(Field field, OxmHeader const &header, Reader &payload) {
   auto const &[bytes, whole] = std::pair(info(field).bytes, settable_bits(field));
   require_size(payload, bytes, header.has_mask);
   auto const content = take_content(payload, bytes, header.has_mask, whole);
@@ -96,7 +96,7 @@ Masked checked_content(Field field, Header const &header, Reader &payload) {
 }
 
 void take_next(Reader &fields, Match &match) {
-  auto const header = take_header(fields);
+  auto const header = take_oxm_header(fields);
   auto payload = take_payload(fields, header);
   if (header.id.oxm_class == kPairClass && header.id.number < kPairs) {
     add_pair(match, header, payload);
@@ -145,7 +145,7 @@ void put_match(Writer &out, Match const &match) {
 }
 
 Field take_field_number(Reader &in) {
-  auto const header = take_header(in);
+  auto const header = take_oxm_header(in);
   auto const field = get_field(header.id);
   if (header.has_mask || header.length != info(field).bytes) {
     throw Malformed("a field has another length than its kind");
@@ -154,7 +154,7 @@ Field take_field_number(Reader &in) {
 }
 
 FieldContent take_field(Reader &in, bool is_mask) {
-  auto const header = take_header(in);
+  auto const header = take_oxm_header(in);
   auto payload = take_payload(in, header);
   auto const field = get_field(header.id);
   if (is_mask) {
