@@ -177,6 +177,8 @@ def run(seed: int, steps: int = STEPS, hosts: int = 3) -> Outcome:
         first.ctl("share", "lab")
         for number in range(1, hosts):
             started(lab.relayed(lab.host(f"h{number}"))).ctl("join", "lab")
+        # The server that is asked below may be behind the one that told a host.
+        assert comes_true(lambda: len(hosts_of_the_switch(lab)) == hosts)
         before = revision(lab)
         disturbed = Disturbed(lab, chance)
         for step in range(steps):
@@ -197,6 +199,7 @@ def run(seed: int, steps: int = STEPS, hosts: int = 3) -> Outcome:
         found = [ports_of(host) for host in lab.hosts]
         wrong = [problem for ports in found for problem in calls.wrong(ports)]
         wrong += ["hosts have different ports"] * (found.count(found[0]) != len(found))
+        assert comes_true(lambda: last in {row["id"] for row in lab.databases.rows("Port")})
         in_fabric = {str(row["id"]) for row in lab.databases.rows("Port")}
         wrong += ["the fabric has other ports"] * (in_fabric != found[0])
         # Each call is a change.
@@ -205,6 +208,12 @@ def run(seed: int, steps: int = STEPS, hosts: int = 3) -> Outcome:
         logs = [host.log() for host in lab.hosts] if wrong else []
     total = len(calls.made) + len(calls.refused) + len(calls.unknown)
     return total, [f"seed {seed}: {problem}" for problem in wrong] + logs
+
+
+def hosts_of_the_switch(lab: FabricLab) -> Set[str]:
+    (row,) = lab.databases.rows("Switch")
+    said = row["hosts"]
+    return set(said[1]) if isinstance(said, list) else {said}
 
 
 def revision(lab: FabricLab) -> int:
