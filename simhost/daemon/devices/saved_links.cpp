@@ -23,6 +23,7 @@ void SavedLinks::follow() {
     storage::ReadingTransaction transaction(store_);
     differ = links_differ(transaction, devices_, heard_at_);
   }
+  next_.end();
   if (differ && !save()) {
     save_later();
   }
