@@ -323,6 +323,7 @@ void Daemon::follow_devices() {
     raise_packet_sizes(sizes_to_raise(transaction, devices_), devices_, say);
   }
   devices_.refresh();
+  next_sync_.end();  // what was told so far is looked at here
   wires_.leave_lost(devices_);
   links_.follow();
 }
@@ -380,6 +381,9 @@ void Daemon::sync() {
   auto const applied = bridges_->apply(all, forget);
   changed += applied.changed;
   all.leave_out(applied.refused);
+  // As they were known before Open vSwitch opened them: one that was made anew meanwhile is another
+  // one at the next look.
+  at_bridges_.follow(all, devices_);
   if (changed > 0 && is_told) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
@@ -434,7 +438,6 @@ void Daemon::announce(storage::SwitchKey key, std::vector<openvswitch::Announced
 }
 
 void Daemon::settle(Wanted const &wanted) {
-  at_bridges_.follow(wanted, devices_);
   for (auto const &bridge : wanted.bridges) {
     for (auto const &[name, number] : bridge.row.devices) {
       if (auto const other = bridges_->elsewhere(name)) {

@@ -94,9 +94,7 @@ Json Daemon::addresses(Json const &question) {
 
 Json Daemon::is_there(Json const &question) {
   auto const device = question.at("name").get<std::string>();
-  if (devices_.refresh()) {
-    sync_soon();
-  }
+  devices_.refresh();
   auto at = bridges_ ? bridges_->elsewhere(device).value_or("") : std::string();
   // One that is at a bridge of Open vSwitch may have a master because of that.
   if (at.empty() && !at_bridges_.contains(device)) {

@@ -1,18 +1,19 @@
 """Frames go on, or come back, whatever ends; configuration and counters stay as they are."""
 
+import contextlib
 import json
 import os
 import re
 import signal
 import sqlite3
 import subprocess
-from typing import Dict, List
+from typing import Dict, Iterator, List
 
 import pytest
 
 from frame_lab import TOOLS, Lab, comes_sooner_or_later, comes_true
 from lasting_open_vswitch import LastingOpenVSwitch
-from simhost import frame
+from simhost import Client, frame
 
 EVERYBODY = "ff:ff:ff:ff:ff:ff"
 
@@ -185,6 +186,39 @@ def test_a_device_may_vanish_and_return(lab: Lab) -> None:
     lab.wire("c1", one.namespace, "eth0")
     one.set_up()
     assert one.comes_to_reach(other)
+
+
+def test_a_device_may_vanish_and_return_while_another_change_is_made(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.reaches(other, attempts=5)
+    with held_up(lab):
+        lab.client("lab", "c")
+        remake(lab, one)
+    assert one.comes_to_reach(other)
+    lab.host.run("ip", "link", "delete", "c1")
+    assert one.ceases_to_reach(other)
+    with held_up(lab):
+        lab.set_port("lab", "c", vlan=9)
+        remake(lab, one)
+    assert one.comes_to_reach(other)
+
+
+@contextlib.contextmanager
+def held_up(lab: Lab) -> Iterator[None]:
+    """With an Open vSwitch that does nothing, so that whoever tells it something waits."""
+    switch = lab.processes()["ovs-vswitchd"]
+    os.kill(switch, signal.SIGSTOP)
+    try:
+        yield
+    finally:
+        os.kill(switch, signal.SIGCONT)
+
+
+def remake(lab: Lab, client: Client) -> None:
+    """Its device, under the name of the one that it may still have."""
+    lab.host.try_run("ip", "link", "delete", "c1")
+    lab.wire("c1", client.namespace, "eth0")
+    client.set_up()
 
 
 def test_a_device_that_is_not_there_is_refused(lab: Lab) -> None:

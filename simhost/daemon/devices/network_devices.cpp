@@ -83,15 +83,13 @@ NetworkDevices::NetworkDevices(events::Loop &loop, std::function<void()> changed
       changed_(std::move(changed)),
       watch_(loop.watch(socket_.number(), [this] {
         try {
-          if (refresh()) {
-            changed_();
-          }
+          refresh();
         } catch (std::runtime_error const &) {
           changed_();  // who looks asks again, and hears what is wrong
         }
       })) {
   ask_for_all();
-  refresh();
+  take_told();
 }
 
 void NetworkDevices::ask_for_all() {
@@ -104,7 +102,13 @@ void NetworkDevices::ask_for_all() {
   is_asked_ = true;
 }
 
-bool NetworkDevices::refresh() {
+void NetworkDevices::refresh() {
+  if (take_told()) {
+    changed_();
+  }
+}
+
+bool NetworkDevices::take_told() {
   bool has_changed = false;
   if (!is_asked_ && std::exchange(is_to_be_asked_again_, false)) {
     ask_for_all();

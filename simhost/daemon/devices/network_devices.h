@@ -40,9 +40,9 @@ class NetworkDevices {
   /// `changed` is told when one came, went or changed.
   NetworkDevices(events::Loop &loop, std::function<void()> changed);
 
-  /// Takes over what the kernel told: what was done to a device before is known after it. Returns
-  /// whether that was anything.
-  bool refresh();
+  /// Takes over what the kernel told: what was done to a device before is known after it, and
+  /// `changed` is told of it whoever took it over.
+  void refresh();
   [[nodiscard]] std::optional<NetworkDevice> find(std::string_view name) const;
   /// Those that carry no packets of so many bytes, and how large ones they do.
   [[nodiscard]] std::map<std::string, std::uint32_t> smaller_than(std::uint32_t bytes) const;
@@ -55,6 +55,7 @@ class NetworkDevices {
   void ask_for_all();
   void ask_for_all_again();
   // These return whether something is another now.
+  bool take_told();
   bool take(std::span<char const> messages);
   bool take_device(nlmsghdr const &header);
   bool put(std::string const &name, NetworkDevice const &device);
