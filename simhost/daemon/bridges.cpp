@@ -21,12 +21,13 @@ constexpr auto *kLock = "simhostd";
 
 }  // namespace
 
-Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, Memory &memory, Told told)
+Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, openvswitch::Lives lives,
+                 Memory &memory, Told told)
     : loop_(loop),
-      folder_(socket.parent_path()),
+      place_{.folder = socket.parent_path(), .lives = std::move(lives)},
       memory_(memory),
       told_(std::move(told)),
-      database_(socket, "Open_vSwitch", soon()) {
+      database_(socket, "Open_vSwitch", soon(), place_.lives) {
   ovsdb::Selected followed;
   ovsdb::select_configuration(followed);
   openvswitch::select_rows(followed);
@@ -97,7 +98,7 @@ RunningBridge &Bridges::connected(WantedBridge const &wanted, Deadline deadline)
     return *bridge;
   }
   auto made =
-      std::make_unique<RunningBridge>(loop_, folder_, memory_, told_.of_bridges, wanted, deadline);
+      std::make_unique<RunningBridge>(loop_, place_, memory_, told_.of_bridges, wanted, deadline);
   return *bridges_.emplace(wanted.key, std::move(made)).first->second;
 }
 

@@ -41,8 +41,9 @@ class Bridges {
 
   /// Connects to the database at `socket`; the sockets of bridges are beside it. Throws
   /// std::runtime_error, which says who writes to the database if somebody else does.
-  /// `memory` outlives it.
-  Bridges(events::Loop &loop, std::filesystem::path const &socket, Memory &memory, Told told);
+  /// `memory` outlives it. For `lives` see openvswitch::Stream.
+  Bridges(events::Loop &loop, std::filesystem::path const &socket, openvswitch::Lives lives,
+          Memory &memory, Told told);
   Bridges(Bridges const &) = delete;
   Bridges &operator=(Bridges const &) = delete;
 
@@ -88,7 +89,7 @@ class Bridges {
   [[nodiscard]] RunningBridge *find(storage::SwitchKey key) const;
 
   events::Loop &loop_;
-  std::filesystem::path folder_;
+  Place place_;
   Memory &memory_;
   Told told_;
   ovsdb::Client database_;

@@ -181,15 +181,22 @@ void Daemon::count_from_now_on() {
 void Daemon::disconnect() {
   next_connect_.end();
   bridges_.reset();
+  lives_.clear();
 }
 
-void Daemon::connect() {
+void Daemon::connect(openvswitch::Lives lives) {
   disconnect();
+  lives_ = std::move(lives);
+  connect_anew();
+}
+
+void Daemon::connect_anew() {
+  bridges_.reset();
   follows_members_ = false;
   shortest_aging_ = std::chrono::seconds::max();  // so that ageing begins again
   attempt([this] {
     bridges_.emplace(
-        loop_, options_.database, memory_,
+        loop_, options_.database, lives_, memory_,
         Bridges::Told{.owner = fmt::format("simhostd of {}, process {}", host_, getpid()),
                       .host = host_,
                       .changed = [this] { sync_soon(); },
@@ -229,7 +236,7 @@ RunningBridge::Told Daemon::told_by_bridges() {
 
 void Daemon::connect_later() {
   pause_ = std::clamp(2 * pause_, kFirstPause, kLongestPause);
-  next_connect_ = loop_.after(pause_, [this] { connect(); });
+  next_connect_ = loop_.after(pause_, [this] { connect_anew(); });
 }
 
 // Whoever goes on changing what is ours shall not keep this busy.
@@ -332,8 +339,8 @@ void Daemon::follow_devices() {
 // of no use.
 bool Daemon::forget_cached_flows(std::string const &bridge, std::uint64_t generation) {
   try {
-    return simhost::daemon::forget_cached_flows(options_.database.parent_path(), bridge,
-                                                generation);
+    return simhost::daemon::forget_cached_flows(options_.database.parent_path(), bridge, generation,
+                                                lives_);
   } catch (std::exception const &error) {
     troubles_.add(
         fmt::format("frames may go on for a while as they went before a change: {}", error.what()));

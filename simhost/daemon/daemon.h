@@ -43,8 +43,9 @@ class Daemon {
   /// Opens the state, and becomes its daemon. Throws std::runtime_error if it has one.
   Daemon(events::Loop &loop, Options options, Say say);
 
-  /// Open vSwitch is there, or there anew: connects to it.
-  void connect();
+  /// Open vSwitch is there, or there anew: connects to it. For `lives`, of which each stays open
+  /// until disconnect() is called, see openvswitch::Stream.
+  void connect(openvswitch::Lives lives = {});
   /// Open vSwitch is gone, until connect() is called.
   void disconnect();
   /// Done when what is wanted is in force for the first time.
@@ -61,6 +62,7 @@ class Daemon {
   void fail(std::string const &why);
   [[nodiscard]] RunningBridge::Told told_by_bridges();
   void reconnect(std::string const &why);
+  void connect_anew();
   void connect_later();
   void mend_soon();
   void look_at_commits();
@@ -128,6 +130,7 @@ class Daemon {
   Underlay underlay_;
   Collectors collectors_;
   Compiler compiler_;
+  openvswitch::Lives lives_;
   std::optional<Bridges> bridges_;
   std::uint64_t in_force_ = 0;
   std::optional<std::int64_t> commits_;          // to the state, at the last look

@@ -138,7 +138,7 @@ void serve(Words const &words) {
   std::optional<PrivateOpenVswitch> own;
   if (own_folder) {
     own.emplace(loop, *own_folder, words.datapath == "netdev" ? Datapath::netdev : Datapath::system,
-                PrivateOpenVswitch::Told{.started = [&] { daemon.connect(); },
+                PrivateOpenVswitch::Told{.started = [&] { daemon.connect(own->lives()); },
                                          .ended = [&] { daemon.disconnect(); },
                                          .said = say});
     own->start();

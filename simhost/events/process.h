@@ -29,6 +29,8 @@ class Process {
   Process &operator=(Process const &) = delete;
 
   [[nodiscard]] int id() const { return id_; }
+  /// A descriptor that is at its end as soon as it is about to end.
+  [[nodiscard]] int life() const { return life_.number(); }
   /// Asks it to end, and ends it if it has not done so in that time. It runs no more after that;
   /// what it had open may still be closed once as much time has gone again.
   void end(Clock::duration patience);

@@ -32,11 +32,10 @@ std::filesystem::path socket_of(WantedBridge const &wanted, std::filesystem::pat
   return folder / (wanted.row.name + ".mgmt");
 }
 
-openflow::Connection connected(WantedBridge const &wanted, std::filesystem::path const &folder,
-                               Deadline deadline) {
-  auto const socket = socket_of(wanted, folder);
+openflow::Connection connected(WantedBridge const &wanted, Place const &place, Deadline deadline) {
+  auto const socket = socket_of(wanted, place.folder);
   require_made(wanted, socket);
-  return {socket, deadline};
+  return {socket, deadline, place.lives};
 }
 
 bool is_marker(openflow::FlowEntry const &entry) {
@@ -66,18 +65,18 @@ std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wante
 
 }  // namespace
 
-RunningBridge::RunningBridge(events::Loop &loop, std::filesystem::path const &folder,
-                             Memory &memory, Told const &told, WantedBridge const &wanted,
-                             Deadline deadline)
+RunningBridge::RunningBridge(events::Loop &loop, Place const &place, Memory &memory,
+                             Told const &told, WantedBridge const &wanted, Deadline deadline)
     : memory_(memory),
       told_(told),
       key_(wanted.key),
       name_(wanted.row.name),
-      connection_(connected(wanted, folder, deadline)),
+      connection_(connected(wanted, place, deadline)),
       numbers_(wanted.numbers),
       sessions_(wanted.sessions) {
   meters_.replace(connection_, wanted.flows->flows, deadline);
-  added_ahead_ = add_unreached(connection_, socket_of(wanted, folder), *wanted.flows, deadline);
+  added_ahead_ = add_unreached(connection_, socket_of(wanted, place.folder), *wanted.flows,
+                               deadline, place.lives);
   read_flows(deadline);
   for (auto const &port : connection_.ports(deadline)) {
     live_.follow(port);

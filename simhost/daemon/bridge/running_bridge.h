@@ -24,6 +24,12 @@
 
 namespace simhost::daemon {
 
+/// Where an Open vSwitch is.
+struct Place {
+  std::filesystem::path folder;  ///< of its sockets
+  openvswitch::Lives lives;      ///< see openvswitch::Stream
+};
+
 /// What goes wrong with it is thrown as std::runtime_error, and then it is of no more use.
 class RunningBridge {
  public:
@@ -49,9 +55,9 @@ class RunningBridge {
   /// Makes what is remembered of flows be forgotten, as forget_cached_flows(). Throws nothing.
   using Forget = std::function<bool(std::string const &bridge, std::uint64_t generation)>;
 
-  /// Connects to it, by its socket in `folder`. Those that are referred to outlive it.
-  RunningBridge(events::Loop &loop, std::filesystem::path const &folder, Memory &memory,
-                Told const &told, WantedBridge const &wanted, openvswitch::Deadline deadline);
+  /// Connects to it, by its socket in that place. Those that are referred to outlive it.
+  RunningBridge(events::Loop &loop, Place const &place, Memory &memory, Told const &told,
+                WantedBridge const &wanted, openvswitch::Deadline deadline);
   RunningBridge(RunningBridge const &) = delete;
   RunningBridge &operator=(RunningBridge const &) = delete;
 

@@ -16,6 +16,7 @@ using openflow::Changes;
 using openflow::Connection;
 using openflow::Flow;
 using openvswitch::Deadline;
+using openvswitch::Lives;
 
 constexpr std::size_t kConnections = 8;
 // To connect takes longer than one connection takes for fewer.
@@ -45,20 +46,21 @@ void add_groups(Connection &connection, std::span<openflow::Group const> groups,
   }
 }
 
-void add_flows(std::filesystem::path const &socket, std::span<Flow const> flows,
-               Deadline deadline) {
+void add_flows(std::filesystem::path const &socket, std::span<Flow const> flows, Deadline deadline,
+               Lives const &lives) {
   Changes changes;
   changes.reserve(flows.size());
   for (auto const &flow : flows) {
     changes.emplace_back(openflow::FlowChange{.command = openflow::FlowCommand::add, .flow = flow});
   }
-  Connection(socket, deadline).change(changes, deadline);
+  Connection(socket, deadline, lives).change(changes, deadline);
 }
 
 }  // namespace
 
 std::size_t add_unreached(Connection &connection, std::filesystem::path const &socket,
-                          openvswitch::Compiled const &wanted, Deadline deadline) {
+                          openvswitch::Compiled const &wanted, Deadline deadline,
+                          Lives const &lives) {
   auto const flows = unreached(wanted.flows);
   if (flows.size() < kMany || !is_bare(connection, deadline)) {
     return 0;
@@ -70,7 +72,7 @@ std::size_t add_unreached(Connection &connection, std::filesystem::path const &s
   for (std::size_t first = 0; first < flows.size(); first += share) {
     shares.push_back(std::async(std::launch::async, add_flows, socket,
                                 flows.subspan(first, std::min(share, flows.size() - first)),
-                                deadline));
+                                deadline, lives));
   }
   for (auto &done : shares) {
     done.get();

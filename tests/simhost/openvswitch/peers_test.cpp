@@ -1,8 +1,11 @@
 // What the clients make of a switch and of a database that do not keep to the protocol, or that ask
 // whether somebody is there.
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <unistd.h>
 
+#include <array>
 #include <functional>
 
 #include "peer.h"
@@ -95,6 +98,19 @@ TEST(Switch, ThatSaysNothingIsNotWaitedForForEver) {
               openflow::Connection const connection(peer.socket(), Deadline::clock::now());
             }),
             peer.socket().native() + ": no reply in time");
+}
+
+// Whose sockets are closed later.
+TEST(Switch, WhoseProcessHasEndedIsNotWaitedFor) {
+  Peer const peer(hello());
+  std::array<int, 2> ends{};
+  ASSERT_EQ(pipe2(ends.data(), O_CLOEXEC), 0);
+  events::Descriptor const life(ends[0]);
+  events::Descriptor process(ends[1]);
+  openflow::Connection connection(peer.socket(), soon(), {life.number()});
+  process.close();
+  EXPECT_EQ(words_of<Disconnected>([&] { connection.barrier(soon()); }),
+            peer.socket().native() + ": nobody replies any more");
 }
 
 ovsdb::Json nothing_done(std::filesystem::path const &socket) {

@@ -31,8 +31,9 @@ bool is_flow_update(BytesView message) {
 
 }  // namespace
 
-Connection::Connection(std::filesystem::path const &socket, Deadline deadline)
-    : stream_(socket, deadline) {
+Connection::Connection(std::filesystem::path const &socket, Deadline deadline,
+                       openvswitch::Lives lives)
+    : stream_(socket, deadline, std::move(lives)) {
   greet(deadline);
 }
 

@@ -28,9 +28,9 @@ using openvswitch::Deadline;
 /// is of no more use: its owner makes another one.
 class Connection {
  public:
-  /// `socket` is BRIDGE.mgmt in Open vSwitch's run folder. Throws Disconnected, TimedOut, and
-  /// Refused by a switch that speaks another version.
-  Connection(std::filesystem::path const &socket, Deadline deadline);
+  /// `socket` is BRIDGE.mgmt in Open vSwitch's run folder; for `lives` see Stream. Throws
+  /// Disconnected, TimedOut, and Refused by a switch that speaks another version.
+  Connection(std::filesystem::path const &socket, Deadline deadline, openvswitch::Lives lives = {});
 
   /// For poll(2): readable when there is something to receive.
   [[nodiscard]] int fd() const { return stream_.fd(); }

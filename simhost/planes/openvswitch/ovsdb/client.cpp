@@ -63,8 +63,9 @@ std::string text_of(Json const &message) {
 
 }  // namespace
 
-Client::Client(std::filesystem::path const &socket, std::string database, Deadline deadline)
-    : stream_(socket, deadline), database_(std::move(database)) {}
+Client::Client(std::filesystem::path const &socket, std::string database, Deadline deadline,
+               openvswitch::Lives lives)
+    : stream_(socket, deadline, std::move(lives)), database_(std::move(database)) {}
 
 void Client::send(Json const &message) {
   auto const text = text_of(message);

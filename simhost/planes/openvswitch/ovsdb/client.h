@@ -56,7 +56,8 @@ using Event = std::variant<Changed, LockGained, LockLost>;
 class Client {
  public:
   /// Of a database such as "Open_vSwitch". Throws Disconnected.
-  Client(std::filesystem::path const &socket, std::string database, Deadline deadline);
+  Client(std::filesystem::path const &socket, std::string database, Deadline deadline,
+         openvswitch::Lives lives = {});
   /// Likewise, over a stream to the server.
   Client(openvswitch::Stream stream, std::string database)
       : stream_(std::move(stream)), database_(std::move(database)) {}

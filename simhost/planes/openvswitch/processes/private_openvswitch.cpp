@@ -173,6 +173,10 @@ void PrivateOpenVswitch::start_switch() {
   told_.started();
 }
 
+std::vector<int> PrivateOpenVswitch::lives() const {
+  return {database_->life(), switch_->life()};
+}
+
 void PrivateOpenVswitch::restart(std::string const &why) {
   auto const lasted = events::Clock::now() - started_;
   pause_ = lasted > kSteady ? events::Clock::duration{}

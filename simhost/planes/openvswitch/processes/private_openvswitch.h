@@ -43,6 +43,9 @@ class PrivateOpenVswitch {
   PrivateOpenVswitch &operator=(PrivateOpenVswitch const &) = delete;
 
   void start();
+  /// Descriptors that are at their end as soon as one of the two is about to end; open until
+  /// somebody was told that it has.
+  [[nodiscard]] std::vector<int> lives() const;
 
  private:
   void create_database();

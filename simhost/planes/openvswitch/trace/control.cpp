@@ -14,8 +14,6 @@
 #include <stdexcept>
 #include <utility>
 
-#include "planes/openvswitch/transport/stream.h"
-
 namespace simhost::openvswitch {
 namespace {
 
@@ -88,13 +86,13 @@ std::filesystem::path find_control_socket(std::filesystem::path const &folder) {
 
 std::vector<ControlReply> ask_control(std::filesystem::path const &socket,
                                       std::vector<ControlCommand> const &commands,
-                                      Deadline deadline) {
+                                      Deadline deadline, Lives const &lives) {
   std::string questions;
   for (std::size_t number = 0; number < commands.size(); ++number) {
     auto const &[name, words] = commands[number];
     questions += Json{{"id", number}, {"method", name}, {"params", words}}.dump();
   }
-  Stream stream(socket, deadline);
+  Stream stream(socket, deadline, lives);
   stream.send(
       std::span(reinterpret_cast<std::uint8_t const *>(questions.data()), questions.size()));
   std::vector<ControlReply> replies;

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "planes/openvswitch/transport/system.h"
+#include "planes/openvswitch/transport/stream.h"
 
 namespace simhost::openvswitch {
 
@@ -25,10 +25,10 @@ struct ControlReply {
 };
 
 /// What it says to several commands, which it takes in their order. Throws std::runtime_error for
-/// what is no reply, and what Stream does.
+/// what is no reply, and what Stream does, as for `lives`.
 std::vector<ControlReply> ask_control(std::filesystem::path const &socket,
                                       std::vector<ControlCommand> const &commands,
-                                      Deadline deadline);
+                                      Deadline deadline, Lives const &lives = {});
 
 /// What it says to one. Throws std::runtime_error with its reason if it refuses it, too.
 std::string ask_control(std::filesystem::path const &socket, ControlCommand const &command,

@@ -35,8 +35,8 @@ events::UnixAddress address_of(std::filesystem::path const &path) {
 
 }  // namespace
 
-Stream::Stream(std::filesystem::path const &path, Deadline deadline)
-    : name_(path.native()), socket_(make_socket()) {
+Stream::Stream(std::filesystem::path const &path, Deadline deadline, Lives lives)
+    : name_(path.native()), socket_(make_socket()), lives_(std::move(lives)) {
   auto const address = address_of(path);
   while (::connect(fd(), address.get(), address.size()) != 0) {
     // A full backlog tells nobody when there is room again.
@@ -46,6 +46,7 @@ Stream::Stream(std::filesystem::path const &path, Deadline deadline)
     if (Deadline::clock::now() >= deadline) {
       throw TimedOut(name_ + ": nobody accepts the connection in time");
     }
+    poll_for(0, 0);
     std::this_thread::sleep_for(std::chrono::milliseconds(1));
   }
 }
@@ -130,21 +131,34 @@ bool Stream::receive(std::vector<std::uint8_t> &to) {
   return to.size() > before;
 }
 
+short Stream::poll_for(short events, int milliseconds) const {
+  std::vector<pollfd> all{{.fd = fd(), .events = events, .revents = 0}};
+  for (auto const life : lives_) {
+    all.push_back({.fd = life, .events = POLLIN, .revents = 0});
+  }
+  if (::poll(all.data(), all.size(), milliseconds) < 0 && errno != EINTR) {
+    fail(errno);
+  }
+  auto const has_ended = [](pollfd const &life) { return life.revents != 0; };
+  // What was said before is heard.
+  if ((all.front().revents & POLLIN) == 0 && std::any_of(all.begin() + 1, all.end(), has_ended)) {
+    throw Disconnected(name_ + ": nobody replies any more");
+  }
+  return all.front().revents;
+}
+
 void Stream::wait_to_receive(Deadline deadline) {
   while (true) {
     flush();
     if (!early_.empty()) {
       return;
     }
-    pollfd polled{fd(), static_cast<short>(POLLIN | (has_unsent() ? POLLOUT : 0)), 0};
-    int const ready = ::poll(&polled, 1, milliseconds_until(deadline));
-    if (ready < 0 && errno != EINTR) {
-      fail(errno);
-    }
-    if (ready > 0 && (polled.revents & ~POLLOUT) != 0) {
+    auto const told = poll_for(static_cast<short>(POLLIN | (has_unsent() ? POLLOUT : 0)),
+                               milliseconds_until(deadline));
+    if ((told & ~POLLOUT) != 0) {
       return;
     }
-    if (ready == 0 && Deadline::clock::now() >= deadline) {
+    if (told == 0 && Deadline::clock::now() >= deadline) {
       throw TimedOut(name_ + ": no reply in time");
     }
   }

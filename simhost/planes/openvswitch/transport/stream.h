@@ -45,10 +45,15 @@ class Cipher {
                        std::vector<std::uint8_t> &replies) = 0;
 };
 
+/// Descriptors that are at their end as soon as those who reply have ended. Sockets tell that
+/// later: the kernel takes its time to close what a process had open.
+using Lives = std::vector<int>;
+
 class Stream {
  public:
-  /// To the unix socket at `path`. Throws Disconnected, and TimedOut where nobody accepts.
-  Stream(std::filesystem::path const &path, Deadline deadline);
+  /// To the unix socket at `path`. Throws Disconnected, and TimedOut where nobody accepts. Nobody
+  /// waits any longer once one of `lives` is at its end, which is Disconnected.
+  Stream(std::filesystem::path const &path, Deadline deadline, Lives lives = {});
   /// Over a socket that is connected already, and does not block; `name` is the other side's.
   Stream(std::string name, events::Descriptor connected)
       : name_(std::move(name)), socket_(std::move(connected)) {}
@@ -72,10 +77,13 @@ class Stream {
  private:
   void flush();
   void hear_complaint();
+  /// Returns what poll(2) tells of the socket within that time, and throws if nobody is to reply.
+  short poll_for(short events, int milliseconds) const;
   [[noreturn]] void fail(int error) const;
 
   std::string name_;
   events::Descriptor socket_;
+  Lives lives_;
   std::unique_ptr<Cipher> cipher_;   // if there is one
   std::vector<std::uint8_t> early_;  // what came with the end of the agreement
   std::vector<std::uint8_t> unsent_;
