@@ -75,8 +75,10 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       counting_(store_),
       announced_(store_),
       load_balance_(store_),
-      underlay_(loop, options_.database.parent_path(),
-                [this](std::string const &why) { troubles_.add(why); }),
+      underlay_(
+          loop, lock_.number(),
+          [this] { simhost::daemon::forget_cached_flows(options_.database.parent_path(), lives_); },
+          [this](std::string const &why) { troubles_.add(why); }),
       collectors_(loop, devices_, [this] { sync_soon(); }) {
   storage::ChangingTransaction transaction(store_);
   storage::take_frames(transaction);
@@ -87,6 +89,15 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
 void Daemon::save() {
   age();
   count();
+}
+
+void Daemon::leave_devices() {
+  try {
+    devices_.refresh();
+    underlay_.end(devices_);
+  } catch (std::exception const &error) {
+    say_(error.what());
+  }
 }
 
 void Daemon::count() {

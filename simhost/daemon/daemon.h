@@ -55,6 +55,8 @@ class Daemon {
   void when_settled(Settled settled) { settled_ = std::move(settled); }
   /// Puts into the state what was counted and seen, as it does from time to time.
   void save();
+  /// Open vSwitch has ended for good: the devices of the machine are as if it had never been.
+  void leave_devices();
 
  private:
   void count();

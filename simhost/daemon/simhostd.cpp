@@ -148,6 +148,11 @@ void serve(Words const &words) {
   loop.run();
   notify("STOPPING=1");
   daemon.save();
+  if (own) {
+    daemon.disconnect();
+    own.reset();
+    daemon.leave_devices();
+  }
   say("ends");
 }
 

@@ -1,6 +1,7 @@
 """Tunnels of IPv6, what cannot be beside tunnels, and what the underlay leaves behind."""
 
 import json
+import signal
 from pathlib import Path
 from typing import Any, Dict, List
 
@@ -101,3 +102,15 @@ def test_a_device_replies_for_itself_when_it_is_no_underlay_any_more(idle: Lab) 
         assert comes_true(lambda: silent() == [device])
     idle.apply({"underlay": {}})
     assert comes_true(lambda: silent() == [])
+    # So it does without a daemon, however that ended.
+    idle.apply({"underlay": {"device": "under", "address": "192.0.2.1/24"}})
+    assert comes_true(lambda: silent() == ["under"])
+    idle.stop()
+    assert silent() == []
+    idle.start()
+    assert silent() == ["under"]
+    idle.stop(signal.SIGKILL)
+    assert silent() == ["under"]
+    idle.apply({"underlay": {}})
+    idle.start()
+    assert silent() == []

@@ -7,7 +7,6 @@
 #include <utility>
 
 #include "base/ip_text.h"
-#include "daemon/bridge/cached_flows.h"
 #include "daemon/underlay/network_routes.h"
 
 namespace simhost::daemon {
@@ -49,8 +48,8 @@ std::optional<std::string> obstacle(WantedBridge const &bridge, storage::Address
 
 }  // namespace
 
-Underlay::Underlay(events::Loop &loop, std::filesystem::path folder, Say say)
-    : loop_(loop), folder_(std::move(folder)), say_(std::move(say)) {}
+Underlay::Underlay(events::Loop &loop, int file, std::function<void()> forget, Say say)
+    : loop_(loop), forget_(std::move(forget)), say_(std::move(say)), silent_(file) {}
 
 // Returns whether it was not so before. Throws std::system_error.
 bool Underlay::put(WantedUnderlay const &wanted, NetworkDevices const &devices) {
@@ -58,8 +57,8 @@ bool Underlay::put(WantedUnderlay const &wanted, NetworkDevices const &devices) 
     switch_network_device(name, true);
     // Or whoever asks for the address of the bridge may be told that of the device, past which
     // tunnels would not be seen.
+    silent_.add(name);
     let_resolve(name, false);
-    silent_.insert(name);
   }
   auto const bridge = devices.find(wanted.row.name);
   if (!bridge) {
@@ -75,13 +74,16 @@ bool Underlay::put(WantedUnderlay const &wanted, NetworkDevices const &devices) 
 
 // At devices that carry no tunnels any more.
 void Underlay::let_others_resolve(WantedUnderlay const *wanted, NetworkDevices const &devices) {
-  std::erase_if(silent_, [&](std::string const &name) {
-    bool const goes = wanted == nullptr || !wanted->row.devices.contains(name);
-    if (goes && devices.find(name)) {
+  auto const names = silent_.all();
+  for (auto const &name : names) {
+    if (wanted != nullptr && wanted->row.devices.contains(name)) {
+      continue;
+    }
+    if (devices.find(name)) {
       let_resolve(name, true);
     }
-    return goes;
-  });
+    silent_.remove(name);
+  }
 }
 
 std::vector<std::string> Underlay::follow(
@@ -116,7 +118,7 @@ std::vector<std::string> Underlay::follow(
 void Underlay::forget_ways_soon() {
   next_forgetting_ = loop_.after(kUntilKnown, [this] {
     try {
-      forget_cached_flows(folder_);
+      forget_();
     } catch (std::runtime_error const &error) {
       say_(error.what());
     }

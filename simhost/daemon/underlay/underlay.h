@@ -2,14 +2,13 @@
 // whether tunnels can do with them.
 #pragma once
 
-#include <filesystem>
 #include <functional>
-#include <set>
 #include <string>
 #include <vector>
 
 #include "daemon/devices/network_devices.h"
 #include "daemon/troubles.h"
+#include "daemon/underlay/kept_names.h"
 #include "daemon/underlay/network_routes.h"
 #include "daemon/wanted.h"
 #include "events/loop.h"
@@ -18,8 +17,9 @@ namespace simhost::daemon {
 
 class Underlay {
  public:
-  /// The sockets of Open vSwitch are in `folder`. What goes wrong later is told to `say`.
-  Underlay(events::Loop &loop, std::filesystem::path folder, Say say);
+  /// `forget` is done when what Open vSwitch remembers of flows is to be forgotten; what it throws
+  /// is told to `say`. What has to be undone of it is in `file`, see KeptNames.
+  Underlay(events::Loop &loop, int file, std::function<void()> forget, Say say);
 
   /// Makes the bridge of the underlay, if it is there, the way of the machine to its peers. Returns
   /// what keeps frames from going through tunnels, in words. `is_at_bridge` says of another device
@@ -27,15 +27,18 @@ class Underlay {
   std::vector<std::string> follow(Wanted const &wanted, NetworkDevices const &devices,
                                   std::function<bool(std::string const &)> const &is_at_bridge);
 
+  /// Nothing carries tunnels any more.
+  void end(NetworkDevices const &devices) { let_others_resolve(nullptr, devices); }
+
  private:
   bool put(WantedUnderlay const &wanted, NetworkDevices const &devices);
   void let_others_resolve(WantedUnderlay const *wanted, NetworkDevices const &devices);
   void forget_ways_soon();
 
   events::Loop &loop_;
-  std::filesystem::path folder_;
+  std::function<void()> forget_;
   Say say_;
-  std::set<std::string> silent_;  // devices at which the kernel tells nobody its addresses
+  KeptNames silent_;  // devices at which the kernel tells nobody its addresses
   events::Loop::Timer next_forgetting_;
 };
 
