@@ -3,6 +3,7 @@
 import doctest
 import os
 import signal
+import socket
 import subprocess
 import sys
 import time
@@ -180,25 +181,47 @@ WAITS = """
 
 
 @pytest.fixture
-def interrupted(pytester: pytest.Pytester) -> Iterator["subprocess.Popen[bytes]"]:
+def temporary(pytester: pytest.Pytester) -> Path:
+    """Where a run has temporary files, but for those of pytest itself."""
+    return pytester.mkdir("temporary")
+
+
+Interrupted = Callable[..., "subprocess.Popen[bytes]"]
+
+
+@pytest.fixture
+def interrupted(pytester: pytest.Pytester, temporary: Path) -> Iterator[Interrupted]:
     """A run of pytest in the foreground of a terminal, whose test waits."""
     pytester.makepyfile(WAITS)
-    words = [sys.executable, "-m", "pytest", "-q", "-p", "no:cacheprovider"]
-    environment = {**os.environ, "FRAMES_RUN": str(pytester.path)}
-    run = subprocess.Popen(
-        words, env=environment, stdout=subprocess.DEVNULL, start_new_session=True
-    )
-    for _ in waiting_for(lambda: Path(pytester.path, "reached").exists()):
-        assert run.poll() is None
-    yield run
-    run.kill()
-    run.communicate()
+    environment = {**os.environ, "FRAMES_RUN": str(pytester.path), "TMPDIR": str(temporary)}
+    with ExitStack() as stack:
+
+        def start(*more: str) -> "subprocess.Popen[bytes]":
+            words = [sys.executable, "-m", "pytest", "-q", "-p", "no:cacheprovider", *more]
+            run = subprocess.Popen(
+                words, env=environment, stdout=subprocess.DEVNULL, start_new_session=True
+            )
+            stack.callback(run.wait)
+            stack.callback(run.kill)
+            for _ in waiting_for(lambda: Path(pytester.path, "reached").exists()):
+                assert run.poll() is None
+            return run
+
+        yield start
 
 
-@pytest.mark.parametrize("number", [signal.SIGINT, signal.SIGKILL])
+@pytest.mark.parametrize(
+    ("number", "workers"), [(signal.SIGINT, "1"), (signal.SIGTERM, "0"), (signal.SIGKILL, "0")]
+)
 def test_nothing_is_left_of_a_run_that_is_interrupted(
-    pytester: pytest.Pytester, interrupted: "subprocess.Popen[bytes]", number: signal.Signals
+    pytester: pytest.Pytester,
+    temporary: Path,
+    interrupted: Interrupted,
+    number: signal.Signals,
+    workers: str,
 ) -> None:
+    before = surroundings()
+    run = interrupted("-n", workers)
     mark = f"FRAMES_RUN={pytester.path}"
     processes = processes_with(mark)
     assert {"simhostd", "ovsdb-server", "ovs-vswitchd", "sleep"} <= set(processes.values())
@@ -209,11 +232,22 @@ def test_nothing_is_left_of_a_run_that_is_interrupted(
         namespaces = {of(process) for process in processes} - {of(os.getpid())}
         # The host, the network, and three clients.
         assert len(namespaces) == 5
-        os.killpg(interrupted.pid, number)
-        interrupted.wait(timeout=PATIENCE)
+        os.killpg(run.pid, number)
+        run.wait(timeout=PATIENCE)
         for _ in waiting_for(lambda: not processes_with(mark)):
             pass
-        assert not namespaces & {of(int(entry.name)) for entry in entries()}
+        # Some are still being taken down, and have no environment any more.
+        for _ in waiting_for(lambda: not namespaces & {of(int(entry.name)) for entry in entries()}):
+            pass
+    assert surroundings() == before
+    assert not list(temporary.iterdir())
+
+
+def surroundings() -> List[str]:
+    """The devices, the named namespaces and the mounts of who runs tests."""
+    devices = sorted(name for _, name in socket.if_nameindex())
+    named = sorted(str(entry) for entry in Path("/run/netns").glob("*"))
+    return [*devices, *named, Path("/proc/self/mountinfo").read_text(encoding="utf-8")]
 
 
 def waiting_for(done: Callable[[], bool]) -> Iterator[None]:
