@@ -77,7 +77,11 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       load_balance_(store_),
       underlay_(
           loop, lock_.number(),
-          [this] { simhost::daemon::forget_cached_flows(options_.database.parent_path(), lives_); },
+          [this] {
+            if (bridges_) {
+              simhost::daemon::forget_cached_flows(options_.database.parent_path(), lives_);
+            }
+          },
           [this](std::string const &why) { troubles_.add(why); }),
       collectors_(loop, devices_, [this] { sync_soon(); }) {
   storage::ChangingTransaction transaction(store_);
@@ -398,10 +402,10 @@ void Daemon::sync() {
   }
   auto const applied = bridges_->apply(all, forget);
   changed += applied.changed;
-  all.leave_out(applied.refused);
   // As they were known before Open vSwitch opened them: one that was made anew meanwhile is another
-  // one at the next look.
+  // one at the next look. Those of a switch whose flows are refused are at its bridge all the same.
   at_bridges_.follow(all, devices_);
+  all.leave_out(applied.refused);
   if (changed > 0 && is_told) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }

@@ -171,6 +171,8 @@ void Process::read_life() {
   life_watch_.end();
   if (auto const status = status_of_ending(id_)) {
     tell(how_it_ended(*status));
+  } else {
+    tells_end_ = false;
   }
 }
 

@@ -9,7 +9,7 @@ import sys
 import time
 from contextlib import ExitStack
 from pathlib import Path
-from typing import Any, Callable, Dict, Iterator, List
+from typing import Any, Callable, Dict, Iterator, List, Set
 
 import pytest
 import simhost
@@ -239,15 +239,18 @@ def test_nothing_is_left_of_a_run_that_is_interrupted(
         # Some are still being taken down, and have no environment any more.
         for _ in waiting_for(lambda: not namespaces & {of(int(entry.name)) for entry in entries()}):
             pass
-    assert surroundings() == before
+    # Others may run tests meanwhile, and are done with what they made sooner or later.
+    for _ in waiting_for(lambda: surroundings() <= before):
+        pass
     assert not list(temporary.iterdir())
 
 
-def surroundings() -> List[str]:
+def surroundings() -> Set[str]:
     """The devices, the named namespaces and the mounts of who runs tests."""
     devices = sorted(name for _, name in socket.if_nameindex())
     named = sorted(str(entry) for entry in Path("/run/netns").glob("*"))
-    return [*devices, *named, Path("/proc/self/mountinfo").read_text(encoding="utf-8")]
+    mounts = Path("/proc/self/mountinfo").read_text(encoding="utf-8").splitlines()
+    return {*devices, *named, *mounts}
 
 
 def waiting_for(done: Callable[[], bool]) -> Iterator[None]:

@@ -3,7 +3,9 @@
 
 #include <fmt/format.h>
 
+#include <optional>
 #include <stdexcept>
+#include <system_error>
 #include <utility>
 
 #include "base/ip_text.h"
@@ -75,14 +77,22 @@ bool Underlay::put(WantedUnderlay const &wanted, NetworkDevices const &devices) 
 // At devices that carry no tunnels any more.
 void Underlay::let_others_resolve(WantedUnderlay const *wanted, NetworkDevices const &devices) {
   auto const names = silent_.all();
+  std::optional<std::system_error> first;
   for (auto const &name : names) {
     if (wanted != nullptr && wanted->row.devices.contains(name)) {
       continue;
     }
-    if (devices.find(name)) {
-      let_resolve(name, true);
+    try {
+      if (devices.find(name)) {
+        let_resolve(name, true);
+      }
+      silent_.remove(name);
+    } catch (std::system_error const &error) {
+      first = first.value_or(error);
     }
-    silent_.remove(name);
+  }
+  if (first) {
+    throw std::system_error(*first);
   }
 }
 
