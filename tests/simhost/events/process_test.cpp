@@ -79,7 +79,7 @@ Command with_many_sockets(std::string const &then) {
   auto const program =
       "import os, signal, socket\n"
       "held = [socket.socket(socket.AF_PACKET, socket.SOCK_RAW, 0x0300)"
-      " for _ in range(50)]\n" +
+      " for _ in range(150)]\n" +
       then;
   std::vector<std::string> words{"--net", "/usr/bin/python3", "-c", program};
   if (geteuid() != 0) {

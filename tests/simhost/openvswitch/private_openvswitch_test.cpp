@@ -8,7 +8,9 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <sstream>
 #include <string>
+#include <utility>
 
 #include "temporary_folder.h"
 
@@ -20,13 +22,18 @@ using simhost::openvswitch::PrivateOpenVswitch;
 using testing::HasSubstr;
 using testing::Not;
 
+// Nothing of a process that ends meanwhile: an iterator of the file would throw.
+std::string content_of(std::filesystem::path const &file) {
+  std::ostringstream all;
+  all << std::ifstream(file).rdbuf();
+  return all.str();
+}
+
 // The processes whose command lines name the folder.
 std::vector<int> processes_in(std::filesystem::path const &folder) {
   std::vector<int> found;
   for (auto const &entry : std::filesystem::directory_iterator("/proc")) {
-    std::ifstream file(entry.path() / "cmdline");
-    std::string const line(std::istreambuf_iterator<char>(file), {});
-    if (line.find(folder.string()) != std::string::npos) {
+    if (content_of(entry.path() / "cmdline").find(folder.string()) != std::string::npos) {
       found.push_back(std::stoi(entry.path().filename()));
     }
   }
@@ -47,13 +54,21 @@ std::vector<int> both_processes_in(std::filesystem::path const &folder) {
 struct AnOpenVswitch : testing::Test {
   [[nodiscard]] std::filesystem::path own() const { return folder.file("ovs"); }
   PrivateOpenVswitch::Told told() {
-    return {.started = [this] { loop.stop(); },
+    return {.started = [this] { has_started = true; },
             .ended = [] {},
             .said = [this](std::string const &text) { said += text + "\n"; }};
   }
 
+  // It may have done so already.
+  void wait_until_started() {
+    while (!std::exchange(has_started, false)) {
+      loop.turn(std::chrono::seconds(1));
+    }
+  }
+
   TemporaryFolder folder;
   Loop loop;
+  bool has_started = false;
   std::string said;
 };
 
@@ -61,7 +76,7 @@ TEST_F(AnOpenVswitch, StartsAndEndsWithItsOwner) {
   {
     PrivateOpenVswitch openvswitch(loop, own(), Datapath::netdev, told());
     openvswitch.start();
-    loop.run();
+    wait_until_started();
     EXPECT_EQ(both_processes_in(own()).size(), 2U);
   }
   EXPECT_TRUE(processes_in(own()).empty());
@@ -69,15 +84,14 @@ TEST_F(AnOpenVswitch, StartsAndEndsWithItsOwner) {
 }
 
 std::string environment_of(int process) {
-  std::ifstream file("/proc/" + std::to_string(process) + "/environ");
-  return {std::istreambuf_iterator<char>(file), {}};
+  return content_of("/proc/" + std::to_string(process) + "/environ");
 }
 
 TEST_F(AnOpenVswitch, KeepsMemoryAtHandUnlessToldOtherwise) {
   auto const tunables = [&] {
     PrivateOpenVswitch openvswitch(loop, own(), Datapath::netdev, told());
     openvswitch.start();
-    loop.run();
+    wait_until_started();
     std::string all;
     for (auto const process : both_processes_in(own())) {
       all += environment_of(process);
@@ -95,7 +109,7 @@ TEST_F(AnOpenVswitch, StartsWhateverItsFolderIsCalled) {
   auto const deep = own() / std::string(120, 'd') / std::string(120, 'e');
   PrivateOpenVswitch openvswitch(loop, deep, Datapath::netdev, told());
   openvswitch.start();
-  loop.run();
+  wait_until_started();
   EXPECT_EQ(both_processes_in(deep).size(), 2U);
   EXPECT_EQ(said, "");
 }
@@ -103,12 +117,12 @@ TEST_F(AnOpenVswitch, StartsWhateverItsFolderIsCalled) {
 TEST_F(AnOpenVswitch, ComesBackWhole) {
   PrivateOpenVswitch openvswitch(loop, own(), Datapath::netdev, told());
   openvswitch.start();
-  loop.run();
+  wait_until_started();
   for (auto const which : {0, 1}) {
     auto const before = both_processes_in(own());
     ASSERT_EQ(before.size(), 2U);
     kill(before.at(static_cast<std::size_t>(which)), SIGKILL);
-    loop.run();
+    wait_until_started();
     for (auto const process : both_processes_in(own())) {
       EXPECT_THAT(before, testing::Not(testing::Contains(process)));
     }
