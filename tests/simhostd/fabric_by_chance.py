@@ -177,7 +177,7 @@ def run(seed: int, steps: int = STEPS, hosts: int = 3) -> Outcome:
         first.ctl("share", "lab")
         for number in range(1, hosts):
             started(lab.relayed(lab.host(f"h{number}"))).ctl("join", "lab")
-        # The server that is asked below may be behind the one that told a host.
+        # The server that is asked below may know less than the one that told a host.
         assert comes_true(lambda: len(hosts_of_the_switch(lab)) == hosts)
         before = revision(lab)
         disturbed = Disturbed(lab, chance)
