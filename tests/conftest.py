@@ -5,6 +5,8 @@ import signal
 import sys
 from pathlib import Path
 
+import pytest
+
 # For the tests of the plug-in; pytest takes this from the first conftest only.
 pytest_plugins = ["pytester"]
 
@@ -21,3 +23,11 @@ os.environ["PYTHONPATH"] = os.pathsep.join(_PATH)
 
 # What a script starts in the background ignores interrupts, and so would the programs under test.
 signal.signal(signal.SIGINT, signal.default_int_handler)
+
+
+def pytest_collection_finish(session: pytest.Session) -> None:
+    """Once the classes are loaded the flat functions return instances of them."""
+    if "libvswitch" in sys.modules:
+        flat = [item.nodeid for item in session.items if "module" in item.path.parts]
+        if flat:
+            raise pytest.UsageError(f"a test file loads the classes, and so {flat[0]} would fail")

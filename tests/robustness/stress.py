@@ -157,7 +157,7 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
     yield Part("traps, in a row", "calls", whole(program, "traps.py", "in-a-row", calls))
     if frames:
         yield Part("demo of a fabric", "demos", whole(demo))
-        yield Part("what was never tried", "things", whole(program_of, "simhostd/untried.py"))
+        yield Part("what was never tried", "things", whole(program_of, "classes/untried.py"))
     share = SHARES["fuzzing"] / (len(fuzzing.NAMES) + 1)
     states = partial(by_chance, "fuzz/state_files.py", seed)
     yield Part("damaged states", "states", states, share)
