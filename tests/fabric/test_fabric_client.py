@@ -6,6 +6,7 @@ import json
 import os
 import subprocess
 import sys
+import time
 from pathlib import Path
 from typing import Any, Callable, Dict, Iterator, List, Set, Tuple
 
@@ -20,7 +21,7 @@ from vswitch.command.fabric import changing
 from vswitch.fabric import Fabric, Failover, OtherVersion, Unreachable, _deciding
 from vswitch.fabric._cluster import Cluster
 from vswitch.fabric._errors import TransactionRefused
-from vswitch.fabric._server import Server
+from vswitch.fabric._server import News, Server
 from vswitch.words import DocumentError
 
 
@@ -310,6 +311,16 @@ def test_what_changes_is_told_as_it_comes(databases: Databases, fabric: Fabric) 
                 event = next(events)
                 told.add(f"{event.kind} {event}")
                 assert told <= lines
+
+
+def test_news_of_the_servers_hide_none_of_the_fabric(
+    fabric: Fabric, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    fabric.view()
+    come = [News("_Server", {}), News("fabric", {})]
+    monkeypatch.setattr(Server, "news", lambda self, deadline: come.pop(0) if come else None)
+    assert fabric._cluster.follow(time.monotonic())
+    assert not fabric._cluster.follow(time.monotonic())
 
 
 def test_what_the_servers_do_not_let_one_do_is_told(

@@ -127,12 +127,13 @@ class Cluster:
             while True:
                 until = min(deadline, time.monotonic() + _SILENCE)
                 news = self._server.news(until)
-                if news is not None and self._take(news):
-                    return self._take_all()
+                if news is not None:
+                    if self._take(news):
+                        return self._take_all()
+                    continue
                 if time.monotonic() >= deadline:
                     return False
-                if news is None:
-                    self._server.request("echo", [], time.monotonic() + _PATIENCE)
+                self._server.request("echo", [], time.monotonic() + _PATIENCE)
         except Unreachable:
             self.disconnect()
             raise

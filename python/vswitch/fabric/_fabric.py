@@ -89,7 +89,10 @@ class Fabric:
         return Plan(self, found)
 
     def outcome(self, change: str) -> bool:
-        """Whether a change was made of which nobody knew. One that was not will not be."""
+        """Whether a change was made of which nobody knew. One that was not will not be.
+
+        To be asked within an hour: after that it is False for one that was made, too.
+        """
         deadline = time.monotonic() + _PATIENCE
         self._cluster.connect(deadline)
         return _deciding.settle(self._cluster, change, deadline)

@@ -95,7 +95,8 @@ def outcome(
 ) -> None:
     """Tell whether a change was made of which nobody knew; one that was not never will be.
 
-    The status is 1 when it was not.
+    The status is 1 when it was not. Ask within an hour: what is known of changes is removed after
+    that, and one that was made is told as one that was not.
     """
     with connected() as fabric:
         made = fabric.outcome(change)

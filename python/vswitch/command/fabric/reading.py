@@ -1,6 +1,6 @@
 """The commands that tell what a fabric has, and change nothing."""
 
-from typing import Any, Dict, List, Mapping, Union
+from typing import Any, Dict, List, Union
 
 from vswitch import _table
 from vswitch._properties import DEFAULTS
@@ -89,7 +89,7 @@ def show(place: str = PLACE) -> None:
         output.tree(alias, _switch_branches(found))
     else:
         at: output.Branch = (f"connected at: {found.host or 'none'}", ())
-        output.tree(place, [*_branches(found, _table.PORT), at])
+        output.tree(place, [*_branches(found), at])
 
 
 def backup() -> None:
@@ -115,20 +115,18 @@ def _document_of(switch: SharedSwitch) -> Dict[str, Any]:
 
 def _switch_branches(switch: SharedSwitch) -> List[output.Branch]:
     ports: List[output.Branch] = [
-        (port.id + (f": at {port.host}" if port.host else ""), _branches(port, _table.PORT))
+        (port.id + (f": at {port.host}" if port.host else ""), _branches(port))
         for port in switch.ports.values()
     ]
     return [
         (f"id: {switch.id}", ()),
         (f"hosts: {shown(list(switch.hosts))}", ()),
-        *_branches(switch, _table.SWITCH),
+        *_branches(switch),
         *([("ports", ports)] if ports else []),
     ]
 
 
-def _branches(
-    found: Union[SharedSwitch, SharedPort], known: Mapping[str, Any]
-) -> List[output.Branch]:
+def _branches(found: Union[SharedSwitch, SharedPort]) -> List[output.Branch]:
     """What is set."""
     state, settings = found.state(), found.settings
     said: List[output.Branch] = []
