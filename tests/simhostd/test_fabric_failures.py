@@ -10,6 +10,7 @@ import pytest
 from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
 
 import fabric_by_chance
+from fabric_by_chance import revision
 from fabric_lab import FabricLab, Host, started
 from frame_lab import comes_true
 from relays import FROM_HOST, TO_HOST
@@ -84,11 +85,6 @@ def test_nobody_knows_and_then_it_is_decided(lab: FabricLab, two: Tuple[Host, Ho
     assert comes_true(lambda: mtu(one) == mtu(other) == wanted), (mtu(one), mtu(other), wanted)
     assert one.call("VSDVS_SetMTU", "lab", 1900) == QEX_OK
     assert comes_true(lambda: mtu(other) == 1900)
-
-
-def revision(lab: FabricLab) -> int:
-    (fabric,) = lab.databases.rows("Fabric")
-    return int(fabric["revision"])
 
 
 def test_a_message_that_is_cut_loses_and_doubles_nothing(lab: FabricLab) -> None:

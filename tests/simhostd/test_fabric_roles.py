@@ -80,7 +80,7 @@ class RoleLab(FabricLab):
         """What becomes of a transaction of whoever has that certificate."""
         options = certificate.options(self.roles.of_servers.certificate)
         words = ["transact", f"ssl:{address}", json.dumps(["fabric", *operations])]
-        return self.hub.try_run("ovsdb-client", "--timeout=5", *options, *words).stdout
+        return self.hub.try_run("ovsdb-client", "--timeout=30", *options, *words).stdout
 
 
 @pytest.fixture

@@ -159,7 +159,7 @@ def test_callers_are_told_the_mode_that_frames_obey(idle: Lab) -> None:
         idle.start(open_vswitch.where)
         idle.client("lab", "a")
         idle.apply({"switches": [{"alias": "lab", "multicast": "igmp"}]})
-        assert modes() == ["igmp", "igmp"]
+        assert comes_true(lambda: modes() == ["igmp", "igmp"])
     shutil.rmtree(idle.run_folder())
     with ThreadPoolExecutor() as another:
         # Which waits for it to be in force.

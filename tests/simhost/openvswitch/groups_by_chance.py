@@ -110,8 +110,8 @@ def disagreement(
     out = wires.transmit(at, data.to_bytes())
     for place in [*PORTS, UPLINK]:
         came = out.pop((place, data.with_tags(tags.get(place, ()))), 0)
-        wanted = place == UPLINK or gets(switch, members, place, group, source)
-        if came > 1 or came != (came if wanted is None else wanted and place != at):
+        wanted = place != at and (place == UPLINK or gets(switch, members, place, group, source))
+        if came > 1 or came != (came if wanted is None else wanted):
             return f"{group} from {source} at {at}: {came} at {place}, where {wanted} was wanted"
     return f"{group} from {source} at {at}: also {out}" if out else ""
 
