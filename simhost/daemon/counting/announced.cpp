@@ -1,6 +1,7 @@
 // Those of a switch that is gone meanwhile are counted nowhere.
 #include "daemon/counting/announced.h"
 
+#include <algorithm>
 #include <chrono>
 
 #include "clock/clock.h"
@@ -27,8 +28,11 @@ bool AnnouncedCounts::save() {
           CounterOwner const owner{.switch_key = key};
           stored::add_to_counter(transaction, owner, counter_in(&VSRARPStats::rarpPktsSent),
                                  sent.packets);
-          auto const when = clock_now(transaction) -
-                            std::chrono::duration_cast<ClockTime>(events::Clock::now() - sent.last);
+          auto const ago =
+              clock_is_stopped(transaction)
+                  ? ClockTime::zero()
+                  : std::chrono::duration_cast<ClockTime>(events::Clock::now() - sent.last);
+          auto const when = std::max(clock_now(transaction) - ago, ClockTime::zero());
           stored::set_counter(transaction, owner, counter_in(&VSRARPStats::rarpTime),
                               static_cast<std::uint64_t>(when.count()));
         }

@@ -1,0 +1,69 @@
+// Announcements are counted at the time that the host's clock showed when they went out.
+#include "daemon/counting/announced.h"
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <cstdint>
+#include <thread>
+
+#include "clock/clock.h"
+#include "memory_state.h"
+#include "named_switch.h"
+#include "planes/stored/counters.h"
+
+namespace {
+
+using namespace std::chrono_literals;
+using simhost::ClockTime;
+using simhost::counter_in;
+using simhost::daemon::AnnouncedCounts;
+using simhost::storage::ChangingTransaction;
+using simhost::storage::ReadingTransaction;
+using simhost::storage::SwitchKey;
+
+struct Announcements : MemoryState {
+  Announcements() {
+    ChangingTransaction transaction(store);
+    key = simhost::storage::add_switch(transaction, named("s")).value();
+    transaction.commit();
+  }
+
+  void set_clock(ClockTime to, bool stops) {
+    ChangingTransaction transaction(store);
+    simhost::set_clock(transaction, to);
+    if (stops) {
+      simhost::stop_clock(transaction);
+    }
+    transaction.commit();
+  }
+
+  simhost::Counters counters() {
+    ReadingTransaction transaction(store);
+    return simhost::stored::counters_of(transaction, {.switch_key = key});
+  }
+
+  SwitchKey key{};
+  AnnouncedCounts announced{store};
+};
+
+TEST_F(Announcements, WentOutWhenTheStoppedClockSays) {
+  constexpr ClockTime kStopped = 5s;
+  set_clock(kStopped, true);
+  announced.add(key, 3);
+  std::this_thread::sleep_for(10ms);
+  ASSERT_TRUE(announced.save());
+  EXPECT_EQ(counters().of(counter_in(&VSRARPStats::rarpPktsSent)), 3U);
+  EXPECT_EQ(counters().of(counter_in(&VSRARPStats::rarpTime)),
+            static_cast<std::uint64_t>(kStopped.count()));
+}
+
+TEST_F(Announcements, WentOutNoEarlierThanTheClockBegins) {
+  announced.add(key, 1);
+  std::this_thread::sleep_for(100ms);
+  set_clock(ClockTime::zero(), false);
+  ASSERT_TRUE(announced.save());
+  EXPECT_LE(counters().of(counter_in(&VSRARPStats::rarpTime)), std::uint64_t{60'000});
+}
+
+}  // namespace
