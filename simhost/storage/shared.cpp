@@ -95,7 +95,7 @@ std::map<PortNumber, CountedByHost> counted_of_ports(Transaction &transaction, S
                " JOIN port ON port.number = counted.port WHERE port.switch = ?");
   select.with(key);
   while (select.next()) {
-    counted[PortNumber{select.number<std::uint32_t>(0)}].emplace(select.text(1), select.text(2));
+    counted[select.port_number(0)].emplace(select.text(1), select.text(2));
   }
   return counted;
 }

@@ -12,7 +12,7 @@ ChosenShares chosen_shares(Transaction &transaction, SwitchKey key) {
   ChosenShares shares;
   select.with(key);
   while (select.next()) {
-    shares.emplace(PortNumber{select.number<std::uint32_t>(0)}, select.number<std::uint32_t>(1));
+    shares.emplace(select.port_number(0), select.number<std::uint32_t>(1));
   }
   return shares;
 }

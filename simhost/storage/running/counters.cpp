@@ -34,7 +34,7 @@ std::map<PortNumber, std::vector<CounterRow>> counters_of_ports(Transaction &tra
                " WHERE switch = ? AND port IS NOT NULL AND session = '' ORDER BY port, name");
   select.with(key);
   while (select.next()) {
-    counters[PortNumber{select.number<std::uint32_t>(0)}].push_back(
+    counters[select.port_number(0)].push_back(
         {.name = select.text(1), .value = value_at(select, 2)});
   }
   return counters;
