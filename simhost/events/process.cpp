@@ -3,6 +3,7 @@
 
 #include <fcntl.h>
 #include <poll.h>
+#include <sys/eventfd.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
 #include <sys/syscall.h>
@@ -172,7 +173,11 @@ void Process::read_life() {
   if (auto const status = status_of_ending(id_)) {
     tell(how_it_ended(*status));
   } else {
-    tells_end_ = false;
+    // Whoever has the number is told nothing by it any more.
+    auto const silent = owned(eventfd(0, EFD_CLOEXEC), "eventfd");
+    if (dup3(silent.number(), life_.number(), O_CLOEXEC) < 0) {
+      fail_with_errno("dup3");
+    }
   }
 }
 

@@ -29,9 +29,9 @@ class Process {
   Process &operator=(Process const &) = delete;
 
   [[nodiscard]] int id() const { return id_; }
-  /// A descriptor that is at its end as soon as it is about to end; negative, which poll(2) passes
-  /// over, once the program has closed its own end and gone on.
-  [[nodiscard]] int life() const { return tells_end_ ? life_.number() : -1; }
+  /// A descriptor that is at its end as soon as it is about to end. It tells nothing any more once
+  /// the program has closed its own end and gone on.
+  [[nodiscard]] int life() const { return life_.number(); }
   /// Asks it to end, and ends it if it has not done so in that time. It runs no more after that;
   /// what it had open may still be closed once as much time has gone again.
   void end(Clock::duration patience);
@@ -57,7 +57,6 @@ class Process {
 
   int id_;
   bool runs_ = true;
-  bool tells_end_ = true;
   Descriptor life_;
   Descriptor descriptor_;
   std::function<void(std::string)> ended_;

@@ -2,6 +2,7 @@
 #include "events/process.h"
 
 #include <gmock/gmock.h>
+#include <poll.h>
 #include <unistd.h>
 
 #include <csignal>
@@ -130,6 +131,21 @@ TEST(AProcess, ThatIsKilledIsGoneSoonerOrLaterAndNobodyIsTold) {
     loop.turn(10s);
   }
   EXPECT_EQ(kill(process.id(), 0), -1);
+}
+
+TEST(AProcess, TellsNothingOfItsEndOnceItHasClosedWhatTellsIt) {
+  Loop loop;
+  Process const process(
+      loop,
+      {.program = "/usr/bin/python3",
+       .words = {"-c", "import os, signal; os.closerange(3, 65536); signal.pause()"},
+       .environment = {}},
+      [](std::string const &how) { ADD_FAILURE() << "it " << how; });
+  pollfd life{.fd = process.life(), .events = POLLIN, .revents = 0};
+  ASSERT_EQ(poll(&life, 1, 30'000), 1) << "it has closed it";
+  loop.turn(1s);
+  EXPECT_EQ(poll(&life, 1, 0), 0);
+  EXPECT_EQ(kill(process.id(), 0), 0);
 }
 
 TEST(AProcess, MayCloseWhatItDidNotOpen) {
