@@ -6,6 +6,7 @@
 #include "memory_state.h"
 #include "named_switch.h"
 #include "planes/openvswitch/compile/pipeline.h"
+#include "temporary_folder.h"
 
 namespace {
 
@@ -16,8 +17,9 @@ using storage::ReadingTransaction;
 
 constexpr std::uint64_t kMegabyte = 1'000'000;
 
-struct PortsByLoad : MemoryState {
+struct PortsByLoad : testing::Test {
   PortsByLoad() {
+    run_on(stored::plane());
     ChangingTransaction transaction(store);
     key = storage::add_switch(transaction, named("s")).value();
     for (auto const *name : {"p0", "p1", "p2", "p3"}) {
@@ -62,6 +64,9 @@ struct PortsByLoad : MemoryState {
 
   storage::SwitchKey key{};
   std::vector<std::uint32_t> numbers;
+  TemporaryFolder folder;
+  // In a file, so that somebody else can write to it.
+  storage::Store store{folder.file("host.db"), MemoryState::populate};
 };
 
 TEST_F(PortsByLoad, KeepWhatWasChosen) {
@@ -111,8 +116,15 @@ TEST_F(PortsByLoad, AreMovedOnWhileTheStateIsWritten) {
   load.choose();
   count(load, kMegabyte);
   ASSERT_TRUE(load.choose());
-  // Nobody waits for that.
-  EXPECT_THAT(followed(load), testing::Contains(1));
+  {
+    storage::Store other(folder.file("host.db"), MemoryState::populate);
+    ChangingTransaction const writing(other);
+    EXPECT_FALSE(load.save()) << "nobody waits for that";
+    EXPECT_THAT(followed(load), testing::Contains(1));
+  }
+  EXPECT_TRUE(load.save());
+  LoadBalance another(store);
+  EXPECT_THAT(followed(another), testing::Contains(1));
 }
 
 }  // namespace
