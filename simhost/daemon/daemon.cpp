@@ -364,8 +364,9 @@ bool Daemon::forget_cached_flows(std::string const &bridge, std::uint64_t genera
 }
 
 void Daemon::sync() {
-  bool const follows_members = std::exchange(follows_members_, false);
   follow_devices();
+  // What devices changed meanwhile is told all the same.
+  bool const follows_members = std::exchange(follows_members_, false);
   storage::ReadingTransaction transaction(store_);
   commits_ = storage::commits_of_others(transaction);
   auto const is_there = [this](std::string const &name) {

@@ -101,10 +101,10 @@ std::vector<std::string> Underlay::follow(
     std::function<bool(std::string const &)> const &is_at_bridge) {
   std::vector<std::string> obstacles;
   try {
-    let_others_resolve(wanted.underlay ? &*wanted.underlay : nullptr, devices);
     if (wanted.underlay && put(*wanted.underlay, devices)) {
       forget_ways_soon();
     }
+    let_others_resolve(wanted.underlay ? &*wanted.underlay : nullptr, devices);
   } catch (std::runtime_error const &error) {
     obstacles.emplace_back(error.what());
   }
