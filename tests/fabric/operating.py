@@ -77,9 +77,6 @@ def of_lab(**members: Any) -> Dict[str, Any]:
 def populate(databases: Databases) -> None:
     """As a host does that comes first, and an operator after it."""
     host = {"name": "one", "state": "s", "session": "s", "links": ["map", [["nic0", "up"]]]}
-    databases.transact(
-        {"op": "insert", "table": "Fabric", "row": {}},
-        {"op": "insert", "table": "Host", "row": host},
-    )
+    databases.insert(Fabric={}, Host=host)
     with Fabric(databases.local_addresses) as fabric:
         assert fabric.plan({"switches": [SWITCH]}).apply() == 1

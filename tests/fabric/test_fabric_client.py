@@ -124,7 +124,7 @@ def test_of_two_changes_of_the_same_thing_one_wins(databases: Databases, fabric:
 def test_a_new_port_may_be_changed_by_the_hosts_that_its_switch_then_has(
     databases: Databases, fabric: Fabric
 ) -> None:
-    databases.transact({"op": "insert", "table": "Host", "row": {"name": "two", "state": "t"}})
+    databases.insert(Host={"name": "two", "state": "t"})
 
     def writers(port: str) -> Set[str]:
         (row,) = [row for row in databases.rows("Port") if row["id"] == port]
@@ -160,7 +160,7 @@ def test_a_host_that_comes_to_have_a_switch_may_not_bear_a_port_of_it(
     databases: Databases, fabric: Fabric
 ) -> None:
     row = {"name": "two", "state": "t", "errors": ["map", [["lab/a", "no"], ["other", "no"]]]}
-    databases.transact({"op": "insert", "table": "Host", "row": row})
+    databases.insert(Host=row)
     plan = fabric.plan(of_lab(hosts=["one", "two"]))
     assert changing.unborne(fabric.view(), plan) == [("two", "lab/a", "no")]
     errors = {"errors": ["map", [["frames", "none go"]]]}
@@ -345,7 +345,7 @@ def test_what_the_servers_do_not_let_one_do_is_told(
 def test_a_host_that_does_not_tell_hides_no_other_s_reply(
     databases: Databases, fabric: Fabric, monkeypatch: pytest.MonkeyPatch
 ) -> None:
-    databases.transact({"op": "insert", "table": "Host", "row": {"name": "two", "state": "t"}})
+    databases.insert(Host={"name": "two", "state": "t"})
     fabric.plan(of_lab(hosts=["one", "two"])).apply()
     replies = {
         "one": {"failovers": [{"uplink": "nic0", "port": "a", "meanwhile": None}]},

@@ -5,6 +5,7 @@ import json
 import shutil
 import signal
 import subprocess
+import uuid
 from contextlib import ExitStack
 from pathlib import Path
 from typing import Any, Dict, List, Mapping, Optional
@@ -127,15 +128,31 @@ class Databases:
         """Through any of the servers."""
         return self._transact("fabric", min(self._running), *operations)
 
-    def _transact(self, database: str, server: int, *operations: Mapping[str, Any]) -> Any:
-        words = ["transact", f"unix:{self._socket(server)}", json.dumps([database, *operations])]
-        results = json.loads(
-            self._namespace.run("ovsdb-client", f"--timeout={PATIENCE:.0f}", *words)
+    def insert(self, **rows: Mapping[str, Any]) -> None:
+        """A row into each table. A server that does not hear from its leader for a moment tries
+        again what may be there already, and then is refused."""
+        ids = {table: str(uuid.uuid4()) for table in rows}
+        results = self._tried(
+            "fabric",
+            min(self._running),
+            *(
+                {"op": "insert", "table": table, "row": row, "uuid": ids[table]}
+                for table, row in rows.items()
+            ),
         )
+        there = {table: self.rows(table, _uuid=["uuid", one]) for table, one in ids.items()}
+        assert all(there.values()), results
+
+    def _transact(self, database: str, server: int, *operations: Mapping[str, Any]) -> Any:
+        results = self._tried(database, server, *operations)
         assert not any("error" in result for result in results if result), results
         return results
 
-    def rows(self, table: str, **equal: str) -> List[Dict[str, Any]]:
+    def _tried(self, database: str, server: int, *operations: Mapping[str, Any]) -> Any:
+        words = ["transact", f"unix:{self._socket(server)}", json.dumps([database, *operations])]
+        return json.loads(self._namespace.run("ovsdb-client", f"--timeout={PATIENCE:.0f}", *words))
+
+    def rows(self, table: str, **equal: Any) -> List[Dict[str, Any]]:
         where = [[column, "==", value] for column, value in equal.items()]
         found: List[Dict[str, Any]] = self.transact(
             {"op": "select", "table": table, "where": where}
