@@ -1,5 +1,6 @@
 """Puts beside the module, for every suite, what the build made for tests, and the tables."""
 
+import gc
 import os
 import signal
 import sys
@@ -26,8 +27,11 @@ signal.signal(signal.SIGINT, signal.default_int_handler)
 
 
 def pytest_collection_finish(session: pytest.Session) -> None:
-    """Once the classes are loaded the flat functions return instances of them."""
+    # Once the classes are loaded the flat functions return instances of them.
     if "libvswitch" in sys.modules:
         flat = [item.nodeid for item in session.items if "module" in item.path.parts]
         if flat:
             raise pytest.UsageError(f"a test file loads the classes, and so {flat[0]} would fail")
+    # Tests that look for what nobody holds any more would look at all of them, each time.
+    gc.collect()
+    gc.freeze()
