@@ -102,6 +102,8 @@ def configure(folder: Path, *options: str) -> None:
         f"-B{folder}",
         "-GNinja",
         f"-DHOST_LIBRARY_DIR={RECORDING_HOST}",
+        # Which is compiled in a third of the time.
+        "-DCMAKE_BUILD_TYPE=Debug",
         f"-DPython3_EXECUTABLE={sys.executable}",
         *options,
     )
