@@ -11,6 +11,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <csignal>
 #include <cstdlib>
 #include <fstream>
@@ -110,13 +111,16 @@ std::string how_it_ended(int status) {
   return code == 127 ? "cannot be run" : "ended with status " + std::to_string(code);
 }
 
-// How a child ends that the kernel has begun to take down, as waitpid() will tell once it is gone.
-std::optional<int> status_of_ending(pid_t child) {
+// How a process ends that the kernel has begun to take down, as waitpid() will tell its parent once
+// it is gone.
+std::optional<int> status_of_ending(pid_t process) {
   constexpr std::size_t kFlags = 6;  // counted from what follows the name
   constexpr std::size_t kStatus = 49;
   constexpr unsigned long kIsExiting = 4;
-  std::ifstream file("/proc/" + std::to_string(child) + "/stat");
-  std::string const line(std::istreambuf_iterator<char>(file), {});
+  // Of one that vanishes meanwhile there is nothing to read, and a mere iterator would throw.
+  std::ostringstream content;
+  content << std::ifstream("/proc/" + std::to_string(process) + "/stat").rdbuf();
+  auto const line = content.str();
   std::istringstream after_name(line.substr(std::min(line.rfind(')'), line.size() - 1) + 1));
   std::vector<std::string> const fields(std::istream_iterator<std::string>(after_name), {});
   if (fields.size() <= kStatus || (std::stoul(fields[kFlags]) & kIsExiting) == 0) {
@@ -149,19 +153,24 @@ Process::Start Process::start(Command const &command) {
 Process::Process(Loop &loop, Command const &command, std::function<void(std::string)> ended)
     : Process(loop, start(command), std::move(ended)) {}
 
-Process::Process(Loop &loop, Start start, std::function<void(std::string)> ended)
+Process::Process(Loop &loop, Start start, std::function<void(std::string)> ended) try
     : id_(start.id),
       life_(std::move(start.life)),
       descriptor_(owned(static_cast<int>(syscall(SYS_pidfd_open, id_, 0)), "pidfd_open")),
       ended_(std::move(ended)),
       life_watch_(loop.watch(life_.number(), [this] { read_life(); })),
-      watch_(loop.watch(descriptor_.number(), [this] { tell(reap()); })) {}
+      watch_(loop.watch(descriptor_.number(), [this] { tell(reap()); })) {
+} catch (...) {
+  // Nobody has it.
+  ::kill(start.id, SIGKILL);
+  waitpid(start.id, nullptr, 0);
+}
 
 Process::~Process() {
   if (runs_) {
     constexpr auto kPatience = std::chrono::seconds(1);
     kill();
-    if (is_gone_within(kPatience)) {
+    if (is_gone_within(is_left_ ? Clock::duration() : kPatience)) {
       reap();
     }
   }
@@ -204,10 +213,8 @@ void Process::end(Clock::duration patience) {
   ::kill(id_, SIGTERM);
   if (!is_gone_within(patience)) {
     kill();
-    // The kernel needs nobody who waits for it.
     if (!is_gone_within(patience)) {
-      watch_.end();
-      runs_ = false;
+      is_left_ = true;
       return;
     }
   }
@@ -226,6 +233,10 @@ std::string Process::reap() {
   waitpid(id_, &status, 0);
   runs_ = false;
   return how_it_ended(status);
+}
+
+bool is_ending(int process) {
+  return status_of_ending(process).has_value() || (::kill(process, 0) != 0 && errno == ESRCH);
 }
 
 void run(Command const &command) {

@@ -33,7 +33,7 @@ class Process {
   /// the program has closed its own end and gone on.
   [[nodiscard]] int life() const { return life_.number(); }
   /// Asks it to end, and ends it if it has not done so in that time. It runs no more after that;
-  /// what it had open may still be closed once as much time has gone again.
+  /// what it had open may still be closed once as much time has gone again: is_gone() tells.
   void end(Clock::duration patience);
   /// Ends it at once, and waits for nothing. Nobody is told.
   void kill();
@@ -57,12 +57,16 @@ class Process {
 
   int id_;
   bool runs_ = true;
+  bool is_left_ = false;  // to the kernel, which needs nobody who waits for it
   Descriptor life_;
   Descriptor descriptor_;
   std::function<void(std::string)> ended_;
   Loop::Watch life_watch_;
   Loop::Watch watch_;
 };
+
+/// Whether the kernel takes a process down, or has done so: it may still close what that had open.
+bool is_ending(int process);
 
 /// Runs a program to its end. Throws std::runtime_error, with what it said, if it failed.
 void run(Command const &command);

@@ -3,14 +3,20 @@
 
 #include <gmock/gmock.h>
 #include <poll.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
+#include <cstdlib>
 #include <filesystem>
 #include <stdexcept>
 #include <string>
+#include <system_error>
 #include <vector>
 
+#include "refused_calls.h"
 #include "temporary_folder.h"
 
 namespace {
@@ -120,6 +126,11 @@ TEST(AProcessWithManySockets, IsLeftToTheKernelIfItsEndTakesLong) {
   }
   process.end(1ms);
   EXPECT_EQ(kill(process.id(), 0), 0);
+  EXPECT_FALSE(process.is_gone());
+  while (!process.is_gone()) {
+    loop.turn(10s);
+  }
+  EXPECT_EQ(kill(process.id(), 0), -1);
 }
 
 TEST(AProcess, ThatIsKilledIsGoneSoonerOrLaterAndNobodyIsTold) {
@@ -146,6 +157,23 @@ TEST(AProcess, TellsNothingOfItsEndOnceItHasClosedWhatTellsIt) {
   loop.turn(1s);
   EXPECT_EQ(poll(&life, 1, 0), 0);
   EXPECT_EQ(kill(process.id(), 0), 0);
+}
+
+void start_where_processes_cannot_be_watched() {
+  Loop loop;
+  refuse_calls({SYS_pidfd_open}, EMFILE);
+  try {
+    Process const process(loop, {.program = "sleep", .words = {"600"}, .environment = {}},
+                          [](std::string const &) {});
+  } catch (std::system_error const &) {
+    // The test has no other child.
+    std::_Exit(waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD ? 0 : 2);
+  }
+  std::_Exit(1);
+}
+
+TEST(AProcess, ThatCannotBeWatchedIsNotLeftRunning) {
+  EXPECT_EXIT(start_where_processes_cannot_be_watched(), testing::ExitedWithCode(0), "");
 }
 
 TEST(AProcess, MayCloseWhatItDidNotOpen) {
