@@ -8,18 +8,27 @@
 #include <sys/ioctl.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstring>
+#include <filesystem>
 #include <fstream>
 
 #include "events/descriptor.h"
+#include "events/process.h"
 #include "own_network.h"
+#include "planes/openvswitch/processes/private_openvswitch.h"
 #include "temporary_folder.h"
 
 namespace {
 
 using simhost::events::Descriptor;
+using simhost::events::Loop;
+using simhost::events::Process;
+using simhost::openvswitch::Datapath;
 using simhost::openvswitch::network_devices;
+using simhost::openvswitch::PrivateOpenVswitch;
 using simhost::openvswitch::remove_left;
+using namespace std::chrono_literals;
 
 // Held by a process that is about to end for as long as this is open.
 Descriptor tap(char const *name) {
@@ -55,6 +64,35 @@ TEST(WhatASwitchLeavesBehind, IsRemovedUnlessItIsOfOthers) {
 
   // Nothing is left, and nothing is wrong with that.
   remove_left(folder.file("nowhere"), others);
+}
+
+// It does nothing but bear the name.
+TEST(WhatASwitchLeavesBehind, IsRemovedByTheNextOneInItsFolder) {
+  enter_own_network();
+  TemporaryFolder const folder;
+  auto const own = folder.file("ovs");
+  std::filesystem::create_directory(own);
+  auto const program = folder.file("ovs-vswitchd");
+  std::filesystem::copy_file("/bin/sleep", program);
+  Loop loop;
+  auto const of_another = tap("vs2");
+  auto const left_beside_next_one = [&] {
+    std::ofstream(own / "vs1.mgmt") << "";
+    auto const datapath = tap("ovs-netdev");
+    auto const bridge = tap("vs1");
+    PrivateOpenVswitch const next(loop, own, Datapath::netdev, {});
+    return network_devices();
+  };
+  EXPECT_THAT(left_beside_next_one(), testing::UnorderedElementsAre("lo", "vs2"));
+  Process running(loop, {.program = program, .words = {"600"}, .environment = {}},
+                  [](std::string const &) {});
+  while (!simhost::openvswitch::is_switch_running()) {
+    loop.turn(1ms);
+  }
+  // Which data path that is cannot be told.
+  EXPECT_THAT(left_beside_next_one(), testing::UnorderedElementsAre("lo", "vs2", "ovs-netdev"));
+  running.end(1s);
+  EXPECT_THAT(left_beside_next_one(), testing::UnorderedElementsAre("lo", "vs2"));
 }
 
 }  // namespace

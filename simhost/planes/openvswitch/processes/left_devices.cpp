@@ -3,13 +3,16 @@
 #include "planes/openvswitch/processes/left_devices.h"
 
 #include <net/if.h>
+#include <sys/stat.h>
 
+#include <fstream>
 #include <memory>
 #include <stdexcept>
 #include <system_error>
 #include <vector>
 
 #include "events/netlink_request.h"
+#include "events/process.h"
 
 namespace simhost::openvswitch {
 namespace {
@@ -44,6 +47,19 @@ void remove_device(std::string const &name) {
   }
 }
 
+// What tells its network namespace from others; 0 for a process that is gone. Its ns/net is not for
+// everybody to read.
+ino_t network_of(std::filesystem::path const &process) {
+  struct stat found {};
+  return stat((process / "net/dev").c_str(), &found) == 0 ? found.st_ino : 0;
+}
+
+bool is_switch(std::filesystem::path const &process) {
+  std::string name;
+  std::getline(std::ifstream(process / "comm"), name);
+  return name == "ovs-vswitchd";
+}
+
 }  // namespace
 
 std::set<std::string> network_devices() {
@@ -52,6 +68,17 @@ std::set<std::string> network_devices() {
   std::set<std::string> names;
   for (auto const *one = all.get(); one != nullptr && one->if_name != nullptr; ++one) {
     names.emplace(one->if_name);
+  }
+  return names;
+}
+
+std::set<std::string> devices_of_others(std::filesystem::path const &folder) {
+  auto names = network_devices();
+  for (auto const &socket : sockets_of_bridges(folder)) {
+    names.erase(socket.stem());
+  }
+  if (!is_switch_running()) {
+    names.erase(kDatapath);
   }
   return names;
 }
@@ -68,6 +95,19 @@ void remove_left(std::filesystem::path const &folder, std::set<std::string> cons
       remove_device(device);
     }
   }
+}
+
+bool is_switch_running() {
+  auto const own = network_of("/proc/self");
+  std::error_code error;
+  for (auto const &entry : std::filesystem::directory_iterator("/proc", error)) {
+    auto const &process = entry.path();
+    if (is_switch(process) && network_of(process) == own &&
+        !events::is_ending(std::stoi(process.filename().native()))) {
+      return true;
+    }
+  }
+  return false;
 }
 
 }  // namespace simhost::openvswitch

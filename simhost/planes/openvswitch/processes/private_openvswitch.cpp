@@ -94,7 +94,11 @@ PrivateOpenVswitch::PrivateOpenVswitch(events::Loop &loop, std::filesystem::path
       datapath_(datapath),
       told_(std::move(told)),
       lock_(locked(folder_)),
-      devices_of_others_(network_devices()) {
+      devices_of_others_(devices_of_others(folder_)) {
+  // One that ended with its owner a moment ago may still be taken down.
+  if (datapath_ == Datapath::netdev) {
+    remove_left(folder_, devices_of_others_);
+  }
   create_database();
 }
 
