@@ -2,7 +2,9 @@
 #include "planes/openvswitch/processes/private_openvswitch.h"
 
 #include <gmock/gmock.h>
+#include <sys/syscall.h>
 
+#include <cerrno>
 #include <chrono>
 #include <csignal>
 #include <cstdlib>
@@ -12,6 +14,7 @@
 #include <string>
 #include <utility>
 
+#include "refused_calls.h"
 #include "temporary_folder.h"
 
 namespace {
@@ -128,6 +131,34 @@ TEST_F(AnOpenVswitch, ComesBackWhole) {
     }
   }
   EXPECT_THAT(said, HasSubstr("was ended by signal 9: both processes of Open vSwitch start anew"));
+}
+
+void start_where_no_process_can_be_made_any_more(std::filesystem::path const &own) {
+  Loop loop;
+  std::string said;
+  PrivateOpenVswitch openvswitch(loop, own, Datapath::netdev,
+                                 {.started = [] { std::_Exit(1); },
+                                  .ended = [] {},
+                                  .said = [&](std::string const &text) { said += text + "\n"; }});
+  openvswitch.start();
+  refuse_calls({SYS_clone, SYS_clone3, SYS_fork, SYS_vfork}, EAGAIN);
+  // It goes on trying.
+  auto const failures = [&] {
+    std::size_t count = 0;
+    for (auto at = said.find("Open vSwitch cannot be started: fork"); at != std::string::npos;
+         at = said.find("Open vSwitch cannot be started: fork", at + 1)) {
+      ++count;
+    }
+    return count;
+  };
+  while (failures() < 2) {
+    loop.turn(std::chrono::seconds(1));
+  }
+  std::_Exit(0);
+}
+
+TEST_F(AnOpenVswitch, IsTriedAgainWhenTheMachineHasNoRoomForItsProcesses) {
+  EXPECT_EXIT(start_where_no_process_can_be_made_any_more(own()), testing::ExitedWithCode(0), "");
 }
 
 TEST_F(AnOpenVswitch, IsRefusedWhereItCannotBe) {

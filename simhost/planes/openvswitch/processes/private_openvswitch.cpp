@@ -135,7 +135,7 @@ void PrivateOpenVswitch::create_database() {
 void PrivateOpenVswitch::start() {
   started_ = events::Clock::now();
   start_database();
-  start_switch_when_database_is_there();
+  next_ = loop_.after(0ms, [this] { start_switch_when_database_is_there(); });
 }
 
 void PrivateOpenVswitch::start_database() {
@@ -152,7 +152,11 @@ void PrivateOpenVswitch::start_database() {
 
 void PrivateOpenVswitch::start_switch_when_database_is_there() {
   if (takes_connections(folder_ / "db.sock")) {
-    start_switch();
+    try {
+      start_switch();
+    } catch (std::runtime_error const &error) {
+      start_later(error);
+    }
     return;
   }
   constexpr auto kLookAgain = 2ms;
@@ -187,9 +191,7 @@ void PrivateOpenVswitch::restart(std::string const &why) {
                             : std::clamp(pause_ * 2, kFirstPause, kLongestPause);
   told_.said(why + ": both processes of Open vSwitch start anew");
   told_.ended();
-  std::erase_if(left_, [](auto const &process) { return process->is_gone(); });
-  leave(std::move(switch_));
-  leave(std::move(database_));
+  leave_both();
   if (datapath_ == Datapath::netdev) {
     remove_left(folder_, devices_of_others_);
   }
@@ -201,9 +203,21 @@ void PrivateOpenVswitch::start_anew() {
     create_database();
     start();
   } catch (std::runtime_error const &error) {
-    told_.said(error.what());
-    next_ = loop_.after(kLongestPause, [this] { start_anew(); });
+    start_later(error);
   }
+}
+
+// The machine may have no room for another process just now.
+void PrivateOpenVswitch::start_later(std::runtime_error const &obstacle) {
+  told_.said(fmt::format("Open vSwitch cannot be started: {}", obstacle.what()));
+  leave_both();
+  next_ = loop_.after(kLongestPause, [this] { start_anew(); });
+}
+
+void PrivateOpenVswitch::leave_both() {
+  std::erase_if(left_, [](auto const &process) { return process->is_gone(); });
+  leave(std::move(switch_));
+  leave(std::move(database_));
 }
 
 // Nobody waits until the kernel has closed what it had open: that may take many seconds, for all of

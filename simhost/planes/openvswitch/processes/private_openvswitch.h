@@ -5,6 +5,7 @@
 #include <functional>
 #include <memory>
 #include <set>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -54,6 +55,8 @@ class PrivateOpenVswitch {
   void start_switch();
   void restart(std::string const &why);
   void start_anew();
+  void start_later(std::runtime_error const &obstacle);
+  void leave_both();
   void leave(std::unique_ptr<events::Process> process);
   [[nodiscard]] events::Command command(std::string const &program,
                                         std::vector<std::string> words) const;
