@@ -4,6 +4,7 @@
 #include <sys/socket.h>
 #include <sys/stat.h>
 
+#include <cerrno>
 #include <cstdint>
 #include <exception>
 #include <utility>
@@ -48,16 +49,27 @@ Server::Server(events::Loop &loop, std::filesystem::path socket, Questions quest
       questions_(std::move(questions)),
       patience_(patience),
       address_(path_),
-      socket_(listening(address_, path_)),
-      watch_(loop_.watch(socket_.number(), [this] { accept_one(); })) {}
+      socket_(listening(address_, path_)) {
+  accept_some();
+}
 
 Server::~Server() {
   unlinkat(address_.folder(), path_.filename().c_str(), 0);
 }
 
+void Server::accept_some() {
+  watch_ = loop_.watch(socket_.number(), [this] { accept_one(); });
+}
+
 void Server::accept_one() {
   Descriptor accepted(accept4(socket_.number(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
   if (!accepted) {
+    if (errno == EMFILE || errno == ENFILE || errno == ENOBUFS || errno == ENOMEM) {
+      // Who comes goes on being there, and each turn of the loop would find that at once.
+      constexpr auto kPause = std::chrono::milliseconds(100);
+      watch_.end();
+      next_accepting_ = loop_.after(kPause, [this] { accept_some(); });
+    }
     return;  // gone again, or the next turn finds it
   }
   auto const client = std::make_shared<Client>(path_, std::move(accepted));
@@ -119,11 +131,14 @@ void Server::wait_for(std::shared_ptr<Client> const &client) {
 
 void Server::handle(std::shared_ptr<Client> const &client, std::string const &line) {
   auto const question = Json::parse(line, nullptr, false);
-  auto const reply = [this, weak = std::weak_ptr<Client>(client)](Json const &said) {
-    if (auto const alive = weak.lock()) {
-      send(alive, said);
-    }
-  };
+  std::weak_ptr<Client> const weak(client);
+  Reply const reply(
+      [this, weak](Json const &said) {
+        if (auto const alive = weak.lock()) {
+          send(alive, said);
+        }
+      },
+      [weak] { return !weak.expired(); });
   try {
     auto const what = question.at("ask").get<std::string>();
     auto const known = questions_.find(what);

@@ -8,6 +8,7 @@
 #include <memory>
 #include <set>
 #include <string>
+#include <utility>
 
 #include "events/loop.h"
 #include "events/unix_address.h"
@@ -18,7 +19,23 @@ namespace simhost::daemon {
 using openvswitch::Json;
 
 /// Replies to a question, at once or later. The process that asked may be gone by then.
-using Reply = std::function<void(Json const &)>;
+class Reply {
+ public:
+  using Say = std::function<void(Json const &)>;
+
+  Reply() = default;
+  Reply(Say say, std::function<bool()> is_awaited)
+      : say_(std::move(say)), is_awaited_(std::move(is_awaited)) {}
+
+  void operator()(Json const &said) const { say_(said); }
+  explicit operator bool() const { return static_cast<bool>(say_); }
+  /// Whether the process that asked is still there.
+  [[nodiscard]] bool is_awaited() const { return is_awaited_(); }
+
+ private:
+  Say say_;
+  std::function<bool()> is_awaited_;
+};
 
 /// What is done with each kind of question, by what its member "ask" says. What it throws is the
 /// reply: of a std::exception the text, and a Json::exception says that it was no question.
@@ -38,6 +55,7 @@ class Server {
  private:
   struct Client;
 
+  void accept_some();
   void accept_one();
   void serve(std::shared_ptr<Client> const &client);
   void send(std::shared_ptr<Client> const &client, Json const &said);
@@ -51,6 +69,7 @@ class Server {
   events::UnixAddress address_;
   events::Descriptor socket_;
   events::Loop::Watch watch_;
+  events::Loop::Timer next_accepting_;
   std::set<std::shared_ptr<Client>> clients_;
 };
 

@@ -3,6 +3,8 @@
 
 #include <gmock/gmock.h>
 #include <poll.h>
+#include <sys/resource.h>
+#include <unistd.h>
 
 #include <cstdint>
 #include <filesystem>
@@ -132,6 +134,46 @@ TEST_F(AServer, LetsQuestionsWaitUntilTheirClientHasTakenItsReply) {
     stream.receive(taken);
     return static_cast<bool>(kept);
   }));
+}
+
+// As many as there are now, and no more: whoever opens something next fails.
+rlimit limited_to_open_descriptors() {
+  rlimit before{};
+  getrlimit(RLIMIT_NOFILE, &before);
+  auto const next = dup(0);
+  close(next);
+  rlimit const limit{.rlim_cur = static_cast<rlim_t>(next), .rlim_max = before.rlim_max};
+  setrlimit(RLIMIT_NOFILE, &limit);
+  return before;
+}
+
+TEST_F(AServer, WaitsForDescriptorsInPeace) {
+  listen();
+  auto stream = client("{\"ask\": \"broken\"}\n");
+  auto const before = limited_to_open_descriptors();
+  int turns = 0;
+  bool is_over = false;
+  auto const end = loop.after(300ms, [&] { is_over = true; });
+  while (!is_over) {
+    loop.turn(kPatience);
+    ++turns;
+  }
+  setrlimit(RLIMIT_NOFILE, &before);
+  EXPECT_LE(turns, 10);
+  std::vector<std::uint8_t> taken;
+  EXPECT_TRUE(comes([&] {
+    stream.receive(taken);
+    return !taken.empty();
+  }));
+}
+
+TEST_F(AServer, KnowsWhoAwaitsAReply) {
+  listen();
+  std::optional<Stream> asking(client("{\"ask\": \"later\"}\n"));
+  ASSERT_TRUE(comes([&] { return static_cast<bool>(kept); }));
+  EXPECT_TRUE(kept.is_awaited());
+  asking.reset();
+  EXPECT_TRUE(comes([&] { return !kept.is_awaited(); }));
 }
 
 TEST_F(AServer, GoesOnWhenAClientIsGoneBeforeItsReply) {
