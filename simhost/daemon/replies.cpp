@@ -68,6 +68,7 @@ void Daemon::handle_in_force(std::uint64_t change, Reply const &reply) {
     reply({{"change", in_force_}});
     return;
   }
+  std::erase_if(waiting_, [](auto const &one) { return !one.second.is_awaited(); });
   waiting_.emplace(change, reply);
   sync_soon();
 }
