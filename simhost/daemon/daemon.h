@@ -9,6 +9,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "daemon/announcer.h"
 #include "daemon/beacons/sent_beacons.h"
@@ -89,6 +90,8 @@ class Daemon {
   [[nodiscard]] Json carry(Json const &question);
   [[nodiscard]] Json is_there(Json const &question);
   [[nodiscard]] Json carrier(Json const &question) const;
+  // Nothing if Open vSwitch cannot be reached.
+  [[nodiscard]] std::optional<std::vector<Learned>> learned_of(storage::SwitchKey key);
   [[nodiscard]] Json addresses(Json const &question);
   void count_of(storage::SwitchKey key);
   [[nodiscard]] Json counters(Json const &question);

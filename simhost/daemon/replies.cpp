@@ -1,7 +1,10 @@
 // What callers ask the daemon of a state, and what it replies.
 #include <unistd.h>
 
+#include <exception>
 #include <functional>
+#include <map>
+#include <optional>
 #include <span>
 #include <stdexcept>
 #include <string>
@@ -79,13 +82,26 @@ Json Daemon::carrier(Json const &question) const {
            load_balance_.carrier(switch_in(question), question.at("port").get<std::uint32_t>())}};
 }
 
+std::optional<std::vector<Learned>> Daemon::learned_of(storage::SwitchKey key) {
+  try {
+    if (bridges_) {
+      return bridges_->learned(key);
+    }
+  } catch (std::exception const &error) {
+    fail(error.what());
+  }
+  return std::nullopt;
+}
+
 Json Daemon::addresses(Json const &question) {
-  if (!bridges_) {
+  auto const key = switch_in(question);
+  auto const port = question.at("port").get<std::uint32_t>();
+  auto const learned = learned_of(key);
+  if (!learned) {
     return {{"refused", "Open vSwitch cannot be reached: " + troubles_.text()}};
   }
-  auto const port = question.at("port").get<std::uint32_t>();
   Json entries = Json::array();
-  for (auto const &one : bridges_->learned(switch_in(question))) {
+  for (auto const &one : *learned) {
     if (one.port == port) {
       entries.push_back({{"mac", one.address}, {"vlan", one.vlan}, {"age", one.age}});
     }
