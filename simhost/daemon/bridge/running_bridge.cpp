@@ -67,7 +67,8 @@ std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wante
 
 RunningBridge::RunningBridge(events::Loop &loop, Place const &place, Memory &memory,
                              Told const &told, WantedBridge const &wanted, Deadline deadline)
-    : memory_(memory),
+    : loop_(loop),
+      memory_(memory),
       told_(told),
       key_(wanted.key),
       name_(wanted.row.name),
@@ -191,6 +192,7 @@ void RunningBridge::look_for_strays(Deadline deadline) {
        connection_.flows({.table = openvswitch::table::kRecentSources}, deadline)) {
     note_origin(taught_.origin_of(entry));
   }
+  follow_events();
 }
 
 void RunningBridge::count(Deadline deadline) {
@@ -307,12 +309,15 @@ void RunningBridge::send(std::vector<openflow::PacketOut> const &frames, Deadlin
     connection_.send(frame);
   }
   connection_.barrier(deadline);
+  // Not here: this may be what follows from one of them.
+  next_events_ = loop_.after(0ms, [this] { read_events(); });
 }
 
 std::vector<Learned> RunningBridge::learned(Deadline deadline) {
   auto const sources = age(deadline);
-  return learned_of(connection_.flows({.table = openvswitch::table::kLearnedAddresses}, deadline),
-                    sources);
+  auto const flows = connection_.flows({.table = openvswitch::table::kLearnedAddresses}, deadline);
+  follow_events();
+  return learned_of(flows, sources);
 }
 
 std::vector<Source> RunningBridge::age(Deadline deadline) {

@@ -98,6 +98,7 @@ class RunningBridge {
   void note_origin(Origin origin);
   void have(Flows flows);
 
+  events::Loop &loop_;
   Memory &memory_;
   Told const &told_;
   storage::SwitchKey key_;
@@ -120,6 +121,7 @@ class RunningBridge {
   std::size_t added_ahead_ = 0;  // of flows and groups, before what it has was read
   Meters meters_;
   events::Loop::Watch watch_;
+  events::Loop::Timer next_events_;
 };
 
 }  // namespace simhost::daemon
