@@ -7,6 +7,7 @@
 #include <exception>
 #include <stdexcept>
 #include <utility>
+#include <variant>
 
 #include "daemon/bridge/bridge_rows.h"
 #include "daemon/bridge/patience.h"
@@ -51,19 +52,28 @@ std::optional<std::string> Bridges::elsewhere(std::string const &device) {
 void Bridges::take_ownership() {
   if (!database_.lock(kLock, soon())) {
     auto const &owner = present().owner;
+    bool const is_known = !owner.empty() && owner != told_.owner;
     throw std::runtime_error(
-        fmt::format("{} writes to this Open vSwitch", owner.empty() ? "another one" : owner));
+        fmt::format("{} writes to this Open vSwitch", is_known ? owner : "another one"));
   }
+}
+
+// Returns whether there were any.
+bool Bridges::take_database_events() {
+  bool any = false;
+  while (auto const event = database_.next_event()) {
+    if (std::holds_alternative<ovsdb::LockLost>(*event)) {
+      throw std::runtime_error("somebody took the right to write to this Open vSwitch away");
+    }
+    any = true;
+  }
+  return any;
 }
 
 void Bridges::read_database_events() {
   try {
     database_.receive();
-    bool has_changed = false;
-    while (database_.next_event()) {
-      has_changed = true;
-    }
-    if (has_changed) {
+    if (take_database_events()) {
       present_.reset();
       told_.changed();
     }
@@ -83,11 +93,13 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted,
   if (operations.empty()) {
     return {};
   }
+  operations.insert(operations.begin(), ovsdb::Json{{"op", "assert"}, {"lock", kLock}});
   auto added = added_devices(present(), rows);
   ovsdb::raise_configuration(operations);
   auto const number = ovsdb::raised_configuration(database_.transact(operations, deadline));
   ovsdb::wait_for_configuration(database_, number, deadline);
   // What others changed meanwhile was told to that wait.
+  take_database_events();
   present_.reset();
   told_.changed();
   return added;

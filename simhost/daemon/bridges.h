@@ -76,6 +76,7 @@ class Bridges {
 
  private:
   void take_ownership();
+  bool take_database_events();
   void read_database_events();
   openvswitch::PresentRows const &present();
   // Returns the devices that were put at bridges.

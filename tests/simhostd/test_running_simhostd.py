@@ -94,6 +94,20 @@ def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
             waiting.communicate(timeout=30)
 
 
+def test_who_takes_the_right_to_write_has_it(lab: Lab) -> None:
+    database = f"unix:{lab.run_folder()}/db.sock"
+    thief = lab.host.start("ovsdb-client", "steal", database, "simhostd", stdout=subprocess.DEVNULL)
+    try:
+        said = "another one writes to this Open vSwitch"
+        assert comes_true(lambda: said in lab.log()), lab.log()
+    finally:
+        thief.kill()
+        thief.communicate()
+    assert comes_true(lambda: said not in lab.ctl("plane")), lab.log()
+    lab.set_port("lab", "a", vlan=7)
+    assert comes_true(lab.is_in_force)
+
+
 def test_why_it_connects_anew_is_told(idle: Lab) -> None:
     with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
