@@ -25,6 +25,15 @@ std::string refusal(std::string const &device, std::uint32_t size, std::system_e
 }
 
 // Those that carry less.
+// One that is gone meanwhile has no size, and keeps no other from getting its own.
+void put_back(std::string const &name, std::uint32_t size) {
+  try {
+    set_network_device_mtu(name, size);
+  } catch (std::system_error const &) {
+    // What stands in the way of the whole is told.
+  }
+}
+
 std::vector<std::pair<std::string, NetworkDevice>> too_small(PacketSizes const &sizes,
                                                              NetworkDevices const &devices) {
   std::vector<std::pair<std::string, NetworkDevice>> found;
@@ -102,7 +111,7 @@ std::optional<std::string> raise_all_packet_sizes(PacketSizes const &sizes,
       set_network_device_mtu(name, sizes.at(name));
     } catch (std::system_error const &error) {
       for (auto const &[before, device] : std::span(raised).first(at)) {
-        set_network_device_mtu(before, device.mtu);
+        put_back(before, device.mtu);
       }
       return refusal(name, sizes.at(name), error);
     }
