@@ -114,3 +114,18 @@ def test_a_device_replies_for_itself_when_it_is_no_underlay_any_more(idle: Lab) 
     idle.apply({"underlay": {}})
     idle.start()
     assert silent() == []
+
+
+def test_a_device_that_never_replied_for_itself_does_not_afterwards(idle: Lab) -> None:
+    for device in "under", "other":
+        idle.wire(device, idle.frames.new_namespace(), "far")
+    idle.host.run("ip", "link", "set", "under", "arp", "off")
+    idle.start()
+    for device in "under", "other":
+        idle.apply({"underlay": {"device": device, "address": "192.0.2.1/24"}})
+        assert comes_true(idle.is_in_force)
+        assert "NOARP" in flags(idle, device)
+    idle.apply({"underlay": {}})
+    assert comes_true(idle.is_in_force)
+    assert "NOARP" not in flags(idle, "other")
+    assert "NOARP" in flags(idle, "under")

@@ -57,14 +57,19 @@ struct QuestionForAll {
   std::uint32_t filter = RTEXT_FILTER_SKIP_STATS;
 };
 
-void set_flag(std::string_view name, unsigned flag, bool is_set) {
-  auto const socket = any_socket();
+unsigned short flags_of(Descriptor const &socket, std::string_view name) {
   auto request = request_for(name);
   if (ioctl(socket.number(), SIOCGIFFLAGS, &request) != 0) {
     events::fail_with_errno(std::string(name));
   }
-  auto const flags = static_cast<unsigned short>(request.ifr_flags);
+  return static_cast<unsigned short>(request.ifr_flags);
+}
+
+void set_flag(std::string_view name, unsigned flag, bool is_set) {
+  auto const socket = any_socket();
+  auto const flags = flags_of(socket, name);
   auto const wanted = static_cast<unsigned short>(is_set ? flags | flag : flags & ~flag);
+  auto request = request_for(name);
   request.ifr_flags = static_cast<short>(wanted);
   if (flags != wanted && ioctl(socket.number(), SIOCSIFFLAGS, &request) != 0) {
     events::fail_with_errno(std::string(name));
@@ -281,6 +286,10 @@ void set_network_device_mtu(std::string_view name, std::uint32_t bytes) {
 
 void switch_network_device(std::string_view name, bool up) {
   set_flag(name, IFF_UP, up);
+}
+
+bool resolves(std::string_view name) {
+  return (flags_of(any_socket(), name) & IFF_NOARP) == 0;
 }
 
 void let_resolve(std::string_view name, bool resolves) {

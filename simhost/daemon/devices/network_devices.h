@@ -76,6 +76,7 @@ void switch_network_device(std::string_view name, bool up);
 /// Has it carry packets of so many bytes. Throws std::system_error.
 void set_network_device_mtu(std::string_view name, std::uint32_t bytes);
 /// Whether the kernel tells those who ask there for addresses of this machine. Likewise.
+bool resolves(std::string_view name);
 void let_resolve(std::string_view name, bool resolves);
 
 }  // namespace simhost::daemon

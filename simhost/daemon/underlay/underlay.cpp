@@ -59,8 +59,10 @@ bool Underlay::put(WantedUnderlay const &wanted, NetworkDevices const &devices) 
     switch_network_device(name, true);
     // Or whoever asks for the address of the bridge may be told that of the device, past which
     // tunnels would not be seen.
-    silent_.add(name);
-    let_resolve(name, false);
+    if (resolves(name)) {
+      silent_.add(name);
+      let_resolve(name, false);
+    }
   }
   auto const bridge = devices.find(wanted.row.name);
   if (!bridge) {
