@@ -145,8 +145,8 @@ void Daemon::age_by(Wanted const &wanted) {
 void Daemon::remember() {
   try {
     bool const all_remembered = memory_.save();
-    bool const all_announced = announced_.save();
-    if (!load_balance_.save() || !all_announced || !all_remembered) {
+    // Those after it tell by the readings of a switch whether it has begun anew.
+    if (!counting_.save() || !announced_.save() || !load_balance_.save() || !all_remembered) {
       remember_soon();
     }
   } catch (std::exception const &error) {

@@ -1,4 +1,4 @@
-// Those of a switch that is gone meanwhile are counted nowhere.
+// Those of a switch that is gone meanwhile are counted nowhere either.
 #include "daemon/counting/announced.h"
 
 #include <algorithm>
@@ -6,6 +6,7 @@
 
 #include "clock/clock.h"
 #include "planes/stored/counters.h"
+#include "storage/running/readings.h"
 
 namespace simhost::daemon {
 
@@ -22,7 +23,7 @@ bool AnnouncedCounts::save() {
   bool const is_saved =
       storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
         for (auto const &[key, sent] : unsaved_) {
-          if (!storage::find_switch(transaction, key)) {
+          if (!storage::has_readings(transaction, key)) {
             continue;
           }
           CounterOwner const owner{.switch_key = key};

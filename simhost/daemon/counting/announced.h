@@ -18,6 +18,7 @@ class AnnouncedCounts {
   void add(storage::SwitchKey key, std::uint64_t sent);
   /// Puts into the state what is not there yet. Returns whether all of it is: nothing is put while
   /// somebody else writes, for whom frames are not to wait. Not within a transaction on the store.
+  /// A switch without readings has begun anew: what went out before is counted nowhere.
   bool save();
 
  private:

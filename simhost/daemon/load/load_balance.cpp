@@ -5,6 +5,7 @@
 
 #include "daemon/load/next_move.h"
 #include "planes/openvswitch/compile/pipeline.h"
+#include "storage/running/readings.h"
 
 namespace simhost::daemon {
 namespace {
@@ -49,7 +50,11 @@ void LoadBalance::follow(storage::Transaction &transaction, storage::SwitchKey k
   known.shares.clear();
   storage::ChosenShares chosen;
   if (std::ranges::any_of(network.teams, &openvswitch::Team::goes_by_load)) {
-    chosen = unsaved_;
+    if (!storage::has_readings(transaction, key)) {
+      unsaved_.erase(key);
+    }
+    auto const unsaved = unsaved_.find(key);
+    chosen = unsaved == unsaved_.end() ? chosen : unsaved->second;
     chosen.merge(storage::chosen_shares(transaction, key));
   }
   for (auto &port : network.ports) {
@@ -65,7 +70,7 @@ void LoadBalance::follow(storage::Transaction &transaction, storage::SwitchKey k
   std::erase_if(known.teams, [](Team const &team) { return team.slots.size() < 2; });
 }
 
-bool LoadBalance::choose(OfSwitch &of_switch, Team const &team) {
+bool LoadBalance::choose(storage::SwitchKey key, OfSwitch &of_switch, Team const &team) {
   std::vector<LoadedPort> ports;
   for (auto const number : team.ports) {
     auto const now = under(of_switch.sent, number);
@@ -79,7 +84,7 @@ bool LoadBalance::choose(OfSwitch &of_switch, Team const &team) {
   if (move) {
     auto const share = static_cast<std::uint32_t>(move->slot);
     of_switch.shares[move->number] = share;
-    unsaved_[storage::PortNumber{move->number}] = share;
+    unsaved_[key][storage::PortNumber{move->number}] = share;
   }
   return move.has_value();
 }
@@ -89,7 +94,7 @@ bool LoadBalance::choose() {
   for (auto &[key, of_switch] : switches_) {
     if (of_switch.sent_before) {
       for (auto const &team : of_switch.teams) {
-        has_chosen |= choose(of_switch, team);
+        has_chosen |= choose(key, of_switch, team);
       }
       of_switch.sent_before = of_switch.sent;
     }
@@ -110,7 +115,9 @@ openflow::Port LoadBalance::carrier(storage::SwitchKey key, std::uint32_t port) 
 }
 
 void LoadBalance::keep(std::set<storage::SwitchKey> const &keys) {
-  std::erase_if(switches_, [&](auto const &one) { return !keys.contains(one.first); });
+  auto const goes = [&](auto const &one) { return !keys.contains(one.first); };
+  std::erase_if(switches_, goes);
+  std::erase_if(unsaved_, goes);
 }
 
 bool LoadBalance::save() {
@@ -119,8 +126,12 @@ bool LoadBalance::save() {
   }
   bool const is_saved =
       storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
-        for (auto const &[port, share] : unsaved_) {
-          storage::put_chosen_share(transaction, port, share);
+        for (auto const &[key, shares] : unsaved_) {
+          if (storage::has_readings(transaction, key)) {
+            for (auto const &[port, share] : shares) {
+              storage::put_chosen_share(transaction, port, share);
+            }
+          }
         }
       });
   if (is_saved) {

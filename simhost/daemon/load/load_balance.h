@@ -34,6 +34,7 @@ class LoadBalance {
   void keep(std::set<storage::SwitchKey> const &keys);
   /// Puts into the state what was chosen. Returns whether all of it is there: nothing is put while
   /// somebody else writes, for whom frames are not to wait. Not within a transaction on the store.
+  /// A switch without readings has begun anew: nothing is put that was chosen for it before.
   bool save();
 
  private:
@@ -49,11 +50,11 @@ class LoadBalance {
     std::optional<std::map<std::uint32_t, std::uint64_t>> sent_before;
   };
 
-  bool choose(OfSwitch &of_switch, Team const &team);
+  bool choose(storage::SwitchKey key, OfSwitch &of_switch, Team const &team);
 
   storage::Store &store_;
   std::map<storage::SwitchKey, OfSwitch> switches_;
-  storage::ChosenShares unsaved_;
+  std::map<storage::SwitchKey, storage::ChosenShares> unsaved_;
 };
 
 }  // namespace simhost::daemon

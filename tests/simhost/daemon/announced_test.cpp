@@ -11,6 +11,8 @@
 #include "memory_state.h"
 #include "named_switch.h"
 #include "planes/stored/counters.h"
+#include "storage/running/counters.h"
+#include "storage/running/readings.h"
 
 namespace {
 
@@ -26,15 +28,17 @@ struct Announcements : MemoryState {
   Announcements() {
     ChangingTransaction transaction(store);
     key = simhost::storage::add_switch(transaction, named("s")).value();
+    simhost::storage::put_readings(transaction, key, {});
     transaction.commit();
   }
 
   void set_clock(ClockTime to, bool stops) {
     ChangingTransaction transaction(store);
-    simhost::set_clock(transaction, to);
+    // One that runs would go on between the two.
     if (stops) {
       simhost::stop_clock(transaction);
     }
+    simhost::set_clock(transaction, to);
     transaction.commit();
   }
 
@@ -56,6 +60,17 @@ TEST_F(Announcements, WentOutWhenTheStoppedClockSays) {
   EXPECT_EQ(counters().of(counter_in(&VSRARPStats::rarpPktsSent)), 3U);
   EXPECT_EQ(counters().of(counter_in(&VSRARPStats::rarpTime)),
             static_cast<std::uint64_t>(kStopped.count()));
+}
+
+TEST_F(Announcements, AreNoneOfASwitchThatBeganAnew) {
+  announced.add(key, 3);
+  {
+    ChangingTransaction transaction(store);
+    simhost::storage::remove_counters(transaction);
+    transaction.commit();
+  }
+  ASSERT_TRUE(announced.save());
+  EXPECT_EQ(counters().of(counter_in(&VSRARPStats::rarpPktsSent)), 0U);
 }
 
 TEST_F(Announcements, WentOutNoEarlierThanTheClockBegins) {

@@ -6,6 +6,8 @@
 #include "memory_state.h"
 #include "named_switch.h"
 #include "planes/openvswitch/compile/pipeline.h"
+#include "storage/running/counters.h"
+#include "storage/running/readings.h"
 #include "temporary_folder.h"
 
 namespace {
@@ -22,6 +24,7 @@ struct PortsByLoad : testing::Test {
     run_on(stored::plane());
     ChangingTransaction transaction(store);
     key = storage::add_switch(transaction, named("s")).value();
+    storage::put_readings(transaction, key, {});
     for (auto const *name : {"p0", "p1", "p2", "p3"}) {
       numbers.push_back(static_cast<std::uint32_t>(
           *storage::add_port(transaction, key, name, storage::PortKind::client)));
@@ -106,6 +109,22 @@ TEST_F(PortsByLoad, BeginAnewWhenTheHostDoes) {
   ChangingTransaction transaction(store);
   storage::remove_chosen_shares(transaction);
   transaction.commit();
+  EXPECT_THAT(followed(load), testing::Each(0));
+}
+
+TEST_F(PortsByLoad, AreNotGivenWhatWasChosenBeforeTheHostBeganAnew) {
+  LoadBalance load(store);
+  followed(load);
+  count(load, 0);
+  load.choose();
+  count(load, kMegabyte);
+  ASSERT_TRUE(load.choose());
+  {
+    ChangingTransaction transaction(store);
+    storage::remove_counters(transaction);
+    transaction.commit();
+  }
+  EXPECT_TRUE(load.save());
   EXPECT_THAT(followed(load), testing::Each(0));
 }
 
