@@ -41,7 +41,7 @@ def test_a_client_that_is_moved_is_announced(lab: Lab, around: Around) -> None:
     assert near.comes_to_reach(far)
     assert network.came_over(near.mac) == "nic0"
     network.pull("nic0")
-    far.expect(reverse_arp(near.mac), timeout=30)
+    far.expect(reverse_arp(near.mac))
     assert network.came_over(near.mac) == "nic1"
     # Nobody here is told, and the silent other one, of whom nothing is known, is not announced.
     near.expect_none(reverse_arp(near.mac))
@@ -49,7 +49,7 @@ def test_a_client_that_is_moved_is_announced(lab: Lab, around: Around) -> None:
     far.expect_none(reverse_arp(other.mac), timeout=0.0)
     assert comes_true(lambda: sent(lab) == 1)
     network.plug("nic0")
-    far.expect(reverse_arp(near.mac), timeout=30)
+    far.expect(reverse_arp(near.mac))
     assert comes_true(lambda: network.came_over(near.mac) == "nic0")
     # What comes back over the other uplink has taught this switch nothing.
     hello = frame(near.mac, far.mac, payload=b"hello")
@@ -65,7 +65,7 @@ def test_a_client_is_announced_when_its_device_is_connected(lab: Lab, around: Ar
     mac = "02:00:00:00:00:77"
     lab.frames.client("lab", "a", mac=mac)
     packet = tagged(reverse_arp(mac), 7)
-    far.expect(packet, timeout=30)
+    far.expect(packet)
     assert network.came_over(mac) == "nic0"
     # A daemon that comes later has no news.
     lab.stop()
@@ -84,7 +84,7 @@ def test_addresses_that_a_port_learned_are_announced(lab: Lab, around: Around) -
         far.expect(hello)
     network.pull("nic0")
     for mac in beyond_it:
-        far.expect(reverse_arp(mac), timeout=30)
+        far.expect(reverse_arp(mac))
         far.expect_none(reverse_arp(mac), timeout=0.0)
 
 
@@ -111,7 +111,7 @@ def test_a_client_of_a_trunk_is_announced_in_each_of_its_vlans(lab: Lab, around:
     before = sent(lab)
     network.plug("nic0")
     for mac in (near.mac, other.mac):
-        far.expect(reverse_arp(mac), timeout=30)
+        far.expect(reverse_arp(mac))
     assert comes_true(lambda: sent(lab) == before + 2)
 
 
@@ -122,7 +122,7 @@ def test_who_does_not_want_it_is_not_announced(lab: Lab, around: Around) -> None
     loud, silent = lab.client("lab", "a"), lab.client("lab", "b")
     assert loud.comes_to_reach(far) and silent.comes_to_reach(far)
     network.pull("nic0")
-    far.expect(reverse_arp(loud.mac), timeout=30)
+    far.expect(reverse_arp(loud.mac))
     far.expect_none(reverse_arp(silent.mac))
 
 
@@ -134,12 +134,12 @@ def test_no_more_than_so_many_are_announced_at_once(lab: Lab, around: Around) ->
     assert one.comes_to_reach(far) and other.comes_to_reach(far)
     network.pull("nic0")
     for client in (one, other):
-        far.expect(reverse_arp(client.mac), timeout=30)
+        far.expect(reverse_arp(client.mac))
     assert comes_true(lambda: sent(lab) == 2)
     # Who has to wait longer than that is not announced.
     lab.apply({"runtime_options": {"RARPAdvertisementDuration": 0}})
     network.plug("nic0")
-    far.expect(reverse_arp(one.mac), timeout=30)
+    far.expect(reverse_arp(one.mac))
     assert comes_true(lambda: sent(lab) == 3)
     lab.apply({"runtime_options": {"MaxRARPsPerInterval": 0}})
     network.pull("nic0")
@@ -154,13 +154,13 @@ def test_frames_do_not_wait_for_who_writes_to_the_state(lab: Lab, around: Around
     one, *others = (lab.client("lab", port) for port in "abc")
     assert all(client.comes_to_reach(far) for client in (one, *others))
     network.pull("nic0")
-    far.expect(reverse_arp(one.mac), timeout=30)
+    far.expect(reverse_arp(one.mac))
     writer = sqlite3.connect(lab.state, isolation_level=None, timeout=30)
     writer.execute("BEGIN IMMEDIATE")
     counted = sent(lab)
     # Their packets wait for their seconds, and what they are counted by for the writer.
     for client in others:
-        far.expect(reverse_arp(client.mac), timeout=30)
+        far.expect(reverse_arp(client.mac))
     plane = lab.plane()
     assert plane["in_force"] == plane["change"] and sent(lab) == counted
     writer.execute("ROLLBACK")

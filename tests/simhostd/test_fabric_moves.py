@@ -61,12 +61,12 @@ def test_a_port_is_where_it_was_connected_last(lab: FabricLab) -> None:
     one.frames.client("lab", "a", mac=CLIENT)
     assert lab.databases.rows("Port", id="a")[0]["host"] == "one"
     assert lab.databases.rows("Port", id="b")[0]["host"] == "two"
-    here.expect(is_announcement, timeout=20)
+    here.expect(is_announcement)
     there.expect_none(is_announcement)
 
     other.frames.client("lab", "a", mac=CLIENT)
     assert lab.databases.rows("Port", id="a")[0]["host"] == "two"
-    there.expect(is_announcement, timeout=20)
+    there.expect(is_announcement)
     assert comes_true(lambda: device_of(one, "a") is None)
     here.expect_none(is_announcement)
     assert device_of(other, "b") is not None

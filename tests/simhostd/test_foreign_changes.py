@@ -53,7 +53,7 @@ class Meddler:
 def busy(lab: Lab) -> Lab:
     """Two clients at ports and one beyond two uplinks."""
     one, other, far = lab.client("lab", "a"), lab.client("lab", "b"), lab.network("nic0", "nic1")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     assert one.comes_to_reach(far.client())
     # What the host does by itself is nobody else's.
     assert "somebody else" not in lab.log()
@@ -166,7 +166,7 @@ def test_bridges_of_others_are_left_alone(idle: Lab, lasting: LastingOpenVSwitch
     others = "other0", "other-port"
     idle.start(lasting.where)
     one, other = idle.client("lab", "a"), idle.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     meddler = Meddler(idle)
     meddler.vsctl(
         *("add-br", others[0], "--", "set", "Bridge", others[0], "datapath_type=netdev"),
@@ -186,7 +186,7 @@ def test_bridges_of_others_are_left_alone(idle: Lab, lasting: LastingOpenVSwitch
 def test_a_device_of_another_bridge_is_left_there(idle: Lab, lasting: LastingOpenVSwitch) -> None:
     idle.start(lasting.where)
     one, other = idle.client("lab", "a"), idle.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     meddler = Meddler(idle)
     meddler.vsctl("add-br", "other0", "--", "set", "Bridge", "other0", "datapath_type=netdev")
     idle.host.run("ip", "link", "add", "taken0", "type", "veth", "peer", "name", "taken1")

@@ -22,7 +22,7 @@ def test_without_a_daemon_changes_are_pending(idle: Lab) -> None:
     assert idle.plane() == {"change": None, "in_force": None, "said": None}
     idle.start()
     one, other = idle.client("lab", "a"), idle.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     idle.stop()
     before = idle.plane()["change"]
     idle.set_port("lab", "a", vlan=7)
@@ -35,7 +35,7 @@ def test_without_a_daemon_changes_are_pending(idle: Lab) -> None:
     assert one.ceases_to_reach(other)
     idle.set_port("lab", "b", vlan=7)
     # Open vSwitch started anew: where a client is, it knows when the client has sent something.
-    assert other.reaches(one, attempts=5)
+    assert other.comes_to_reach(one)
 
 
 @pytest.mark.parametrize("program", ["ovs-vswitchd", "ovsdb-server"])
@@ -43,7 +43,7 @@ def test_either_process_of_open_vswitch_may_be_killed(lab: Lab, program: str) ->
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     lab.set_port("lab", "a", vlan=7)
     lab.set_port("lab", "b", vlan=7)
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     os.kill(lab.processes()[program], signal.SIGKILL)
     assert one.comes_to_reach(other)
     assert f"{program} was ended by signal 9" in lab.log()
@@ -53,7 +53,7 @@ def test_either_process_of_open_vswitch_may_be_killed(lab: Lab, program: str) ->
 
 def test_clients_that_say_nothing_are_reached_after_a_kill(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     to_other = frame(other.mac, one.mac, payload=b"are you there?")
     # It is not to ask who was there.
     other.run("ip", "neighbour", "flush", "dev", "eth0")
@@ -71,14 +71,14 @@ def test_clients_that_say_nothing_are_reached_after_a_kill(lab: Lab) -> None:
     third.expect(at_last)
     # Those before would have come by then.
     third.expect_none(lambda came: came in (to_other, to_third), timeout=0)
-    assert third.reaches(one, attempts=5)
+    assert third.comes_to_reach(one)
     # What Open vSwitch remembers of such frames goes a little later.
     assert comes_sooner_or_later(one, third, to_third)
 
 
 def test_clients_that_say_nothing_are_reached_after_the_daemon_is_killed(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     to_other = frame(other.mac, one.mac, payload=b"are you there?")
     other.run("ip", "neighbour", "flush", "dev", "eth0")
     assert comes_true(lambda: len(remembered(lab)) == 2)
@@ -103,7 +103,7 @@ def remembered(lab: Lab) -> List[str]:
 
 def test_a_killed_daemon_leaves_nothing_running_and_another_takes_over(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.stop(signal.SIGKILL)
     lab.start()
     assert len(lab.processes()) == 2
@@ -116,10 +116,10 @@ def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> N
     with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
         idle.stop()
         # Frames go on without it, and count.
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
         said, before = idle.log(), counted(idle)
         idle.start(open_vswitch.where)
         assert "in force" not in idle.log().replace(said, "")
@@ -127,7 +127,7 @@ def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> N
         # An unrelated change leaves what was counted and learned alone.
         idle.set_port("lab", "c", vlan=9)
         kept(before, counted(idle))
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
 
 
 def counted(lab: Lab) -> Dict[str, int]:
@@ -180,7 +180,7 @@ def test_without_its_package_it_says_which(idle: Lab, file: str) -> None:
 
 def test_a_device_may_vanish_and_return(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.host.run("ip", "link", "delete", "c1")
     assert one.ceases_to_reach(other)
     lab.wire("c1", one.namespace, "eth0")
@@ -190,7 +190,7 @@ def test_a_device_may_vanish_and_return(lab: Lab) -> None:
 
 def test_a_device_may_vanish_and_return_while_another_change_is_made(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     with held_up(lab):
         lab.client("lab", "c")
         remake(lab, one)
@@ -241,7 +241,7 @@ def test_a_caller_that_is_killed_leaves_old_or_new(lab: Lab) -> None:
         ["/usr/bin/python3", "-c", program], env=lab.environment, stdout=subprocess.PIPE
     )
     assert caller.stdout is not None and caller.stdout.readline()
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     caller.kill()
     caller.communicate()
     assert one.comes_to_reach(other)
@@ -260,7 +260,7 @@ FAR_SESSION = {
 
 def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     spare = {"alias": "spare", "ports": [{"id": "s", "mirror_sessions": [FAR_SESSION]}]}
     second = {"alias": "second", "ports": [{"id": "x"}, {"id": "y"}]}
     lab.apply({"switches": [spare, second]})
@@ -269,15 +269,15 @@ def test_a_switch_that_cannot_be_run_goes_on_as_it_was(lab: Lab) -> None:
     why = "the switch 'lab' cannot be run: the mirror session 'far'"
     assert comes_true(lambda: why in lab.plane()["said"])
     assert lab.log().count(why) == 1
-    assert one.reaches(other, attempts=5)
-    assert third.reaches(fourth, attempts=5)
+    assert one.comes_to_reach(other)
+    assert third.comes_to_reach(fourth)
     # The others can be changed, but not into such a one.
     lab.set_port("second", "x", vlan=8)
     assert lab.is_in_force() and third.ceases_to_reach(fourth)
     refused_far_session(lab, "second", "x")
     # So can it be itself.
     lab.set_port("lab", "a", vlan=7)
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.set_port("lab", "a", mirror_sessions=[])
     assert not lab.plane()["said"] and lab.is_in_force()
     assert one.ceases_to_reach(other)
@@ -301,7 +301,7 @@ def test_a_switch_with_which_something_is_wrong_stops_no_other(
     idle.apply({"switches": [{"alias": "second", "ports": [{"id": "x"}, {"id": "y"}]}]})
     one, other = idle.client("lab", "a"), idle.client("lab", "b")
     third, fourth = idle.client("second", "x"), idle.client("second", "y")
-    assert one.reaches(other, attempts=5) and third.reaches(fourth, attempts=5)
+    assert one.comes_to_reach(other) and third.comes_to_reach(fourth)
     for mtu, why in PLANTED_FAULTS.items():
         idle.apply({"switches": [{"alias": "lab", "mtu": mtu, "multicast": "snooping"}]})
         said = f"the switch 'lab' cannot be run: {why}"
@@ -313,7 +313,7 @@ def test_a_switch_with_which_something_is_wrong_stops_no_other(
         assert third.ceases_to_reach(fourth)
         idle.set_port("second", "x", vlan=0)
         assert third.comes_to_reach(fourth)
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
         assert idle.log().count(said) == 1
     # So can it be itself, into one with which nothing is wrong.
     idle.apply({"switches": [{"alias": "lab", "mtu": 1500, "ports": [{"id": "a", "vlan": 7}]}]})

@@ -17,18 +17,18 @@ from lasting_open_vswitch import LastingOpenVSwitch
 
 def test_a_vlan_cuts_and_joins(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.set_port("lab", "a", vlan=7)
     assert one.ceases_to_reach(other)
     lab.set_port("lab", "b", vlan=7)
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.ctl("disconnect", "lab", "b")
     assert one.ceases_to_reach(other)
 
 
 def test_no_frame_goes_as_before_once_a_call_has_returned(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
 
     def sent(times: int) -> bytes:
         made = frame(other.mac, one.mac, payload=bytes([times]) * 46)
@@ -62,7 +62,7 @@ def test_it_is_said_if_nobody_can_make_open_vswitch_forget(lab: Lab) -> None:
 def test_a_client_that_says_nothing_is_known_in_another_vlan(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     # Of neither port the address is configured.
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     for client in one, other:
         client.run("ip", "neighbour", "flush", "dev", "eth0")
     for vlan in 7, 8:
@@ -77,7 +77,7 @@ def test_it_takes_no_privileges_where_namespaces_of_users_are_allowed(tmp_path: 
     with Lab(tmp_path, ONE_SWITCH, own_user=True) as lab:
         lab.start()
         one, other = lab.client("lab", "a"), lab.client("lab", "b")
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
 
 
 def test_a_folder_may_have_a_name_longer_than_the_address_of_a_socket(tmp_path: Path) -> None:
@@ -86,7 +86,7 @@ def test_a_folder_may_have_a_name_longer_than_the_address_of_a_socket(tmp_path: 
     with Lab(folder, ONE_SWITCH) as lab:
         lab.start()
         one, other = lab.client("lab", "a"), lab.client("lab", "b")
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
 
 
 def test_an_uplink_fails_and_frames_go_on(lab: Lab) -> None:
@@ -146,30 +146,30 @@ checked.VSDVS_AddDVPort("made", "y", 0)
 def test_a_switch_made_by_calls_moves_frames(lab: Lab) -> None:
     lab.python(MADE_BY_CALLS)
     one, other = lab.client("made", "x"), lab.client("made", "y")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.python("from libvswitch import checked; checked.VSDVS_DestroyVSwitch('made')")
     assert one.ceases_to_reach(other)
 
 
 def test_a_disabled_switch_moves_nothing_and_an_enabled_one_does(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.apply({"switches": [{"alias": "lab", "disabled": True}]})
     assert one.ceases_to_reach(other)
     lab.apply({"switches": [{"alias": "lab", "disabled": False}]})
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
 
 
 def test_a_port_that_is_removed_moves_nothing_and_a_new_one_does(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.python("from libvswitch import checked; checked.VSDVS_RemoveDVPort('lab', 'b')")
     assert one.ceases_to_reach(other)
     lab.python("from libvswitch import checked; checked.VSDVS_AddDVPort('lab', 'b', 0)")
     assert one.ceases_to_reach(other)
     lab.ctl("connect", "lab", "b", "c2")
     # Who it is is known again when it speaks.
-    assert other.reaches(one, attempts=5)
+    assert other.comes_to_reach(one)
 
 
 def test_a_restart_of_the_host_leaves_what_is_persistent(lab: Lab) -> None:
@@ -178,13 +178,13 @@ def test_a_restart_of_the_host_leaves_what_is_persistent(lab: Lab) -> None:
     stays = lab.client("lab", "a"), lab.client("lab", "b")
     goes = lab.client("made", "x"), lab.client("made", "y")
     for one, other in (stays, goes):
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
     lab.have_counted()
     lab.ctl("restart")
     one, other = stays
     assert not one.reaches(other)
     # Who they are is known again when they have spoken.
-    assert other.reaches(one, attempts=5)
+    assert other.comes_to_reach(one)
     one, other = goes
     assert one.ceases_to_reach(other)
 
@@ -195,7 +195,7 @@ def test_a_restart_of_the_host_forgets_what_was_learned(idle: Lab, is_there: boo
     with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
         assert learned(idle) == [31, 32]
         for client in one, other:
             # It is not to ask who was there.
@@ -207,7 +207,7 @@ def test_a_restart_of_the_host_forgets_what_was_learned(idle: Lab, is_there: boo
         if not is_there:
             idle.start(open_vswitch.where)
         assert learned(idle) == []
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
         # Once: whatever changes then is no reason to do so again.
         idle.set_port("lab", "c", vlan=9)
         assert learned(idle) == [31, 32]
@@ -237,14 +237,14 @@ def test_what_cannot_be_done_is_refused_and_nothing_has_changed(lab: Lab) -> Non
     assert f"{why} (QEX_NOT_SUPPORTED)" in done.stdout
     assert lab.plane()["change"] == change
     assert shown(lab) == before
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
 
 
 def test_learned_addresses_are_asked_of_the_data_path(lab: Lab) -> None:
     management = {"learning": True, "flooding": True}
     lab.set_port("lab", "a", mac_learning=management)
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     assert f"{one.mac} learned" in lab.ctl("show")
 
 

@@ -135,7 +135,7 @@ def test_a_device_of_another_kind_is_left_out_and_told(idle: Lab) -> None:
     idle.ctl("connect", "lab", "c", "lo")
     idle.start()
     one, other = idle.client("lab", "a"), idle.client("lab", "b")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     assert idle.plane()["said"] == "the device lo carries no frames of Ethernet"
     assert idle.log().count("the device lo carries") == 1
     idle.ctl("disconnect", "lab", "c")
@@ -151,7 +151,7 @@ def test_a_device_that_open_vswitch_cannot_use_is_told(lab: Lab) -> None:
     assert comes_true(lambda: lab.plane()["said"] == said)
     assert said in lab.ctl("plane") and lab.is_in_force()
     assert lab.log().count(said) == 1
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     lab.ctl("disconnect", "lab", "c")
     assert comes_true(lambda: not lab.plane()["said"])
 
@@ -173,7 +173,7 @@ def state_of(lab: Lab) -> Tuple[Any, Any]:
 def test_a_mirror_session_past_a_bound_changes_nothing(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     lab.network("nic0", "nic1")
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)
     for bound in BOUNDS:
         before = state_of(lab)
         for session in bound.refused:
@@ -186,4 +186,4 @@ def test_a_mirror_session_past_a_bound_changes_nothing(lab: Lab) -> None:
         assert lab.is_in_force()
         lab.set_port("lab", "a", mirror_sessions=[])
         lab.set_port("lab", "b", vlan=0)
-    assert one.reaches(other, attempts=5)
+    assert one.comes_to_reach(other)

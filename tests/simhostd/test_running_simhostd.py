@@ -68,11 +68,11 @@ def test_the_open_vswitch_of_the_machine(idle: Lab) -> None:
         )
         assert daemon.stdout is not None and daemon.stdout.readline() == "ready\n"
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
         daemon.terminate()
         daemon.communicate(timeout=30)
         # Frames go on without it.
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
 
 
 def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
@@ -147,7 +147,7 @@ def test_paths_are_of_any_bytes(tmp_path: Path) -> None:
     with Lab(folder, ONE_SWITCH) as lab:
         lab.start()
         one, other = lab.client("lab", "a"), lab.client("lab", "b")
-        assert one.reaches(other, attempts=5)
+        assert one.comes_to_reach(other)
         frame = [f"dst={other.mac}", f"src={one.mac}"]
         assert "goes out at port b" in lab.ctl("trace", "lab/a", *frame)
         assert lab.is_in_force()

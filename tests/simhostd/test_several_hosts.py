@@ -156,7 +156,7 @@ def test_members_of_groups_are_found_across_hosts(rack: Rack, clients: List[Clie
         text = b"%d" % next(number)
         sent = sends(text)
         try:
-            other.expect(sent)
+            other.expect(sent, timeout=0.3)
         except AssertionError:
             return False
         return third._socket.find(sent, 0.1) is None

@@ -9,7 +9,7 @@ from typing import Any, Dict, List, Optional, Sequence
 
 from simhost._daemon import Daemon
 from simhost._host import SharedHost
-from simhost._namespaces import Namespace, own_user_needed, require_tools
+from simhost._namespaces import PATIENCE, Namespace, own_user_needed, require_tools
 from simhost._wires import PacketSocket, Wanted
 
 _DEVICE = "eth0"
@@ -46,7 +46,7 @@ class Client:
         """
         self._socket.send(frame)
 
-    def expect(self, wanted: Wanted, timeout: float = 1.0) -> bytes:
+    def expect(self, wanted: Wanted, timeout: float = PATIENCE) -> bytes:
         """Waits for a frame, or for one of which a function is true, takes it and returns it.
 
         Frames that nobody takes wait for the next question.
@@ -94,7 +94,7 @@ class Client:
         words = ["ping", "-c", "1", "-W", patience, other.address]
         return any(self.run(*words).returncode == 0 for _ in range(attempts))
 
-    def comes_to_reach(self, other: "Client", timeout: float = 30.0) -> bool:
+    def comes_to_reach(self, other: "Client", timeout: float = PATIENCE) -> bool:
         """Likewise, at some time."""
         deadline = time.monotonic() + timeout
         while time.monotonic() < deadline:
@@ -102,7 +102,7 @@ class Client:
                 return True
         return False
 
-    def ceases_to_reach(self, other: "Client", timeout: float = 30.0) -> bool:
+    def ceases_to_reach(self, other: "Client", timeout: float = PATIENCE) -> bool:
         """At some time no ping is replied to any more.
 
         What the host changes is in force when its call returns; what happens around it, such as a
