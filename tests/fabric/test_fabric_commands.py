@@ -76,6 +76,7 @@ def test_a_member_of_what_is_set_byte_by_byte_is_refused(operator: Operator) -> 
     assert done.status == 1
     assert f"vlan of lab/a is set byte by byte, as {key}: set it as a whole" in done.stderr
     assert operator.json("show", "lab/a")["properties"] == raw
+    assert f"{key}: config 00ff" in operator.told("show", "lab/a")
     operator.told("set", "lab/a", "vlan=8", "vlan.priority=3")
     now = operator.json("show", "lab/a")
     assert now["vlan"] == {"id": 8, "priority": 3} and "properties" not in now
@@ -117,6 +118,7 @@ def test_what_is_for_one_host_says_so(operator: Operator) -> None:
         done = operator(command, "lab")
         assert done.status == 2
         assert f"{command!r} is for one host: it goes there, without --fabric" in done.stderr
+        assert done.stderr.endswith("\nvswitch: see vswitch --fabric SERVERS --help\n")
     done = operator("apply", "-", "--confirm-within", "5", given=of_lab(mtu=1600))
     assert done.status == 2 and "'--confirm-within' is for one host" in done.stderr
     assert "mtu" not in operator.json("show", "lab")

@@ -9,7 +9,7 @@ import contextlib
 import io
 import json
 import sys
-from typing import Any, Callable, Iterable, Iterator, Sequence, Tuple
+from typing import Any, Callable, Iterable, Iterator, List, Mapping, Sequence, Tuple
 
 from rich import box
 from rich.console import Console, RenderableType
@@ -25,6 +25,7 @@ __all__ = [
     "after_change",
     "line",
     "progress",
+    "properties",
     "table",
     "tree",
     "write_json",
@@ -33,6 +34,12 @@ __all__ = [
 
 Branch = Tuple[str, Sequence[Any]]
 """A line of a tree, and the branches below it."""
+
+
+def properties(held: Mapping[str, Any]) -> List[Branch]:
+    """Those that are told byte for byte."""
+    return [(f"{key}: {one['type']} {one['hex']}", ()) for key, one in held.items()]
+
 
 # Wide enough that nothing is wrapped or cut.
 _NO_END = 100_000

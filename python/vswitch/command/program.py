@@ -128,7 +128,7 @@ def _run(words: List[str], commands: click.Group) -> None:
     except click.exceptions.Exit as end:
         raise SystemExit(end.exit_code) from None
     except click.UsageError as error:
-        path = error.ctx.command_path if error.ctx is not None else NAME
+        path = error.ctx.command_path if error.ctx is not None else commands.name
         print(f"{NAME}: {printable(error.format_message())}", file=sys.stderr)
         print(f"{NAME}: see {path} --help", file=sys.stderr)
         raise SystemExit(_USAGE) from None

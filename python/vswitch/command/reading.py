@@ -89,10 +89,7 @@ def _said(value: object) -> str:
 
 
 def _properties_branches(described: Dict[str, Any], name: str) -> List[output.Branch]:
-    held = described.get(name, {})
-    below: List[output.Branch] = [
-        (f"{key}: {one['type']} {one['hex']}", ()) for key, one in held.items()
-    ]
+    below = output.properties(described.get(name, {}))
     return [(name, below)] if below else []
 
 

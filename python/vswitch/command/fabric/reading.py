@@ -132,8 +132,7 @@ def _branches(found: Union[SharedSwitch, SharedPort]) -> List[output.Branch]:
     said: List[output.Branch] = []
     for name, value in state.items():
         if name == "properties":
-            raw = [(f"{key}: {shown(one)}", ()) for key, one in value.items()]
-            said.append((name, raw))
+            said.append((name, output.properties(value)))
         elif name in settings:
             said.append((f"{name}: {shown(value) if value != '' else 'none'}", ()))
     return said
