@@ -14,6 +14,7 @@ from _libvswitch import QEX_BUSY, QEX_OK
 
 from fabric_lab import SCHEMA, FabricLab, Host, kept, killed, restored, started
 from frame_lab import comes_true
+from simhost._daemon import Daemon
 
 LAB: Dict[str, Any] = {
     "uplinks": [{"name": "nic0"}],
@@ -161,7 +162,7 @@ def test_an_old_image_brings_back_what_is_the_host_s_own(
 def test_one_of_two_changes_of_the_same_thing_wins(two: Tuple[Host, Host]) -> None:
     one, other = two
     assert other.daemon is not None
-    other.daemon.send(signal.SIGSTOP)
+    pause(other.daemon, other)
     assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
     # It has asked when its daemon hears of both.
     late = in_background(other, "vs.VSDVS_SetMTU('lab', 1700)")
@@ -174,6 +175,15 @@ def test_one_of_two_changes_of_the_same_thing_wins(two: Tuple[Host, Host]) -> No
     assert one.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK
     other.set_port("lab", "b", vlan={"id": 9})
     assert comes_true(lambda: mtu(other) == 1800 and of_port(one, "b")["vlan"] == 9)
+
+
+def pause(daemon: Daemon, host: Host) -> None:
+    """Until it goes on, nobody but callers writes to the state."""
+    daemon.send(signal.SIGSTOP)
+    while is_locked(host):
+        daemon.send(signal.SIGCONT)
+        assert comes_true(lambda: not is_locked(host))
+        daemon.send(signal.SIGSTOP)
 
 
 def in_background(host: Host, call: str) -> "subprocess.Popen[str]":
@@ -269,7 +279,7 @@ def test_a_host_that_is_there_twice_speaks_once(lab: FabricLab) -> None:
     shutil.copy(one.state, twin.state)
     started(one)
     assert one.daemon is not None
-    one.daemon.send(signal.SIGSTOP)
+    pause(one.daemon, one)
     started(twin)
     assert twin.call("VSDVS_SetMTU", "lab", 1700) == QEX_OK
     # What it is asked it does when it goes on, and is the host no longer then.
