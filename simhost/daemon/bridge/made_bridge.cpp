@@ -28,6 +28,9 @@ void require_made(WantedBridge const &wanted, std::filesystem::path const &socke
       (!tun || ioctl(tun.number(), TUNGETFEATURES, &features) != 0)) {
     why += fmt::format(", for which it needs {}: {}", kTun, std::strerror(errno));
   }
+  if (wanted.row.datapath == "system" && access("/sys/module/openvswitch", F_OK) != 0) {
+    why += ", for which it needs the kernel's module openvswitch";
+  }
   throw std::runtime_error(why);
 }
 
