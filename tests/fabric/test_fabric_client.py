@@ -405,3 +405,9 @@ def test_what_it_takes_is_told_where_it_is_missing() -> None:
     done = subprocess.run([sys.executable, "-c", program], capture_output=True, text=True)
     assert done.returncode == 1
     assert done.stderr.endswith("; --fabric takes Debian's python3-openvswitch\n"), done.stderr
+        ("set lab mt", ["plain,mtu="]),
+        ("set lab/a forbids=mac_changes,forg", ["plain,forbids=mac_changes,forged_transmits"]),
+        ("set lab/a teaming.active=", ["plain,teaming.active=nic0"]),
+        ("add lab/new vla", ["plain,vlan="]),
+        ("add other mt", ["plain,mtu="]),
+        ("unset lab/a vl", ["plain,vlan"]),

@@ -82,6 +82,26 @@ def test_a_member_of_what_is_set_byte_by_byte_is_refused(operator: Operator) -> 
     assert now["vlan"] == {"id": 8, "priority": 3} and "properties" not in now
 
 
+def test_what_no_program_wrote_is_shown_as_it_is(lab: FabricLab, operator: Operator) -> None:
+    for written, shown in (("none", "properties: none"), ('{"x.y": 7}', "properties: x.y=7")):
+        row = {"settings": ["map", [["properties", written]]]}
+        lab.databases.transact({"op": "update", "table": "Port", "where": [], "row": row})
+        assert shown in operator.told("show", "lab/a")
+
+
+def test_wrong_words_are_told_with_where_to_look(operator: Operator) -> None:
+    for words, helped in (
+        (("set", "lab", "mtu=1"), "vswitch --fabric SERVERS set"),
+        (("uplink", "lab"), "vswitch --fabric SERVERS"),
+        (("set", "lab"), "vswitch --fabric SERVERS set"),
+        (("shew",), "vswitch --fabric SERVERS"),
+    ):
+        done = operator(*words)
+        assert done.status == 2
+        assert done.stderr.endswith(f"vswitch: see {helped} --help\n"), done.stderr
+    assert operator("set", "--help").stdout.startswith("Usage: vswitch --fabric SERVERS set ")
+
+
 def test_things_come_and_go(operator: Operator) -> None:
     said = operator.told("add", "new", "--host", "one", "--identifier", "n", "mtu=1600")
     assert said.splitlines() == ["new: absent -> id=n hosts=one", "new/mtu: absent -> 1600"]

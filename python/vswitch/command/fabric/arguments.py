@@ -1,16 +1,27 @@
 """The arguments that several of these commands have, with the names that the fabric has now."""
 
-from typing import Callable, Iterable, List
+from typing import Callable, Dict, Iterable, List, Set
 
 import click
 import typer
 
 from libvswitch.errors import HostError
+from vswitch import _table
+from vswitch.command import assignments, places
 from vswitch.command.fabric.connection import connected
 from vswitch.fabric import View
 from vswitch.fabric._watching import KINDS
 
-__all__ = ["HOST", "HOSTS", "NEW_PLACE", "PLACE", "SWITCH", "kinds"]
+__all__ = [
+    "HOST",
+    "HOSTS",
+    "NEW_PLACE",
+    "PLACE",
+    "SWITCH",
+    "complete_names",
+    "complete_settings",
+    "kinds",
+]
 
 
 def _named(context: click.Context, begun: str, names: Callable[[View], Iterable[str]]) -> List[str]:
@@ -43,6 +54,35 @@ def _complete_switches(context: click.Context, incomplete: str) -> List[str]:
 
 def _complete_hosts(context: click.Context, incomplete: str) -> List[str]:
     return _named(context, incomplete, lambda view: view.hosts)
+
+
+def _known(view: View, place: str) -> Dict[str, _table.Property]:
+    return _table.SWITCH if places.split_by(view.switches, place)[1] is None else _table.PORT
+
+
+def _uplinks(view: View, place: str) -> Set[str]:
+    """Those that the hosts of a switch tell of."""
+    switch = view.switches.get(places.split_by(view.switches, place)[0])
+    there = switch.hosts if switch is not None else ()
+    return {uplink for host in there if host in view.hosts for uplink in view.hosts[host].links}
+
+
+def complete_names(context: click.Context, incomplete: str) -> List[str]:
+    """Settings of the place that stands before them."""
+    place = str(context.params.get("place"))
+    return _named(context, incomplete, lambda view: _known(view, place))
+
+
+def complete_settings(context: click.Context, incomplete: str) -> List[str]:
+    """Likewise, and what they may be set to."""
+    place = str(context.params.get("place"))
+    return _named(
+        context,
+        incomplete,
+        lambda view: assignments.offered(
+            _known(view, place), incomplete, lambda: sorted(_uplinks(view, place))
+        ),
+    )
 
 
 def kinds(incomplete: str) -> List[str]:

@@ -18,7 +18,13 @@ from vswitch.command.changing import (
     members,
     tell_made,
 )
-from vswitch.command.fabric.arguments import HOSTS, NEW_PLACE, PLACE
+from vswitch.command.fabric.arguments import (
+    HOSTS,
+    NEW_PLACE,
+    PLACE,
+    complete_names,
+    complete_settings,
+)
 from vswitch.command.fabric.connection import connected
 from vswitch.fabric import Fabric, View, _documents
 from vswitch.values import Words
@@ -69,7 +75,10 @@ def _refuse_bytes(place: str, setting: _table.Property, there: Mapping[str, Word
 def set_(
     place: str = PLACE,
     settings: List[str] = typer.Argument(
-        ..., metavar="NAME=VALUE...", help="Settings, or members of them."
+        ...,
+        metavar="NAME=VALUE...",
+        help="Settings, or members of them.",
+        autocompletion=complete_settings,
     ),
 ) -> None:
     """Change settings of a switch or a port.
@@ -92,7 +101,9 @@ def set_(
 
 def unset(
     place: str = PLACE,
-    settings: List[str] = typer.Argument(..., metavar="NAME...", help="Settings."),
+    settings: List[str] = typer.Argument(
+        ..., metavar="NAME...", help="Settings.", autocompletion=complete_names
+    ),
 ) -> None:
     """Clear settings of a switch or a port, so that they are what is the default."""
     with connected() as fabric:
@@ -104,7 +115,11 @@ def unset(
 def add(
     place: str = NEW_PLACE,
     settings: Optional[List[str]] = typer.Argument(
-        None, metavar="[NAME=VALUE...]", help="Settings, as of set.", show_default=False
+        None,
+        metavar="[NAME=VALUE...]",
+        help="Settings, as of set.",
+        show_default=False,
+        autocompletion=complete_settings,
     ),
     host: Optional[List[str]] = HOSTS,
     identifier: Optional[str] = typer.Option(

@@ -131,8 +131,15 @@ def _branches(found: Union[SharedSwitch, SharedPort]) -> List[output.Branch]:
     state, settings = found.state(), found.settings
     said: List[output.Branch] = []
     for name, value in state.items():
-        if name == "properties":
+        if name == "properties" and _are_bytes(value):
             said.append((name, output.properties(value)))
         elif name in settings:
             said.append((f"{name}: {shown(value) if value != '' else 'none'}", ()))
     return said
+
+
+def _are_bytes(held: Any) -> bool:
+    """Whether properties are as hosts write them; somebody else may write anything."""
+    return isinstance(held, dict) and all(
+        isinstance(one, dict) and set(one) == {"type", "hex"} for one in held.values()
+    )
