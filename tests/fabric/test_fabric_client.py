@@ -7,6 +7,7 @@ import os
 import subprocess
 import sys
 import time
+from contextlib import suppress
 from pathlib import Path
 from typing import Any, Callable, Dict, Iterator, List, Set, Tuple
 
@@ -212,6 +213,32 @@ def test_a_lost_reply_loses_and_doubles_nothing(
     assert changes(databases) == [False, False]
 
 
+def test_what_a_server_makes_twice_is_made_once(
+    databases: Databases, fabric: Fabric, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    really: Transact = Server.transact
+
+    def transact(*arguments: Any) -> Any:
+        with suppress(TransactionRefused):
+            really(*arguments)
+        return really(*arguments)
+
+    def follow(cluster: Cluster, deadline: float) -> bool:
+        told = {"reply": json.dumps({"failovers": []})}
+        databases.transact({"op": "update", "table": "Drill", "where": [], "row": told})
+        return wait(cluster, deadline)
+
+    wait = Cluster.follow
+    monkeypatch.setattr(Server, "transact", transact)
+    monkeypatch.setattr(Cluster, "follow", follow)
+    assert fabric.plan(of_lab(mtu=1600, ports=[{"id": "b"}])).apply() == 2
+    assert (mtu(fabric), fabric.view().revision) == (1600, 2)
+    assert changes(databases) == [False, False]
+    assert fabric.drill("lab") == {"one": []}
+    assert databases.rows("Drill") == []
+    assert fabric.outcome("of nobody") is False
+
+
 def test_a_change_that_is_interrupted_is_told_whole(
     databases: Databases, fabric: Fabric, monkeypatch: pytest.MonkeyPatch
 ) -> None:
@@ -389,6 +416,12 @@ def test_shells_complete_what_the_fabric_has(databases: Databases) -> None:
         ("show lab/", ["plain,lab/a"]),
         ("forget ", ["plain,one"]),
         ("ap", ["plain,apply"]),
+        ("set lab mt", ["plain,mtu="]),
+        ("set lab/a forbids=mac_changes,forg", ["plain,forbids=mac_changes,forged_transmits"]),
+        ("set lab/a teaming.active=", ["plain,teaming.active=nic0"]),
+        ("add lab/new vla", ["plain,vlan="]),
+        ("add other mt", ["plain,mtu="]),
+        ("unset lab/a vl", ["plain,vlan"]),
     ):
         asked = {"COMP_WORDS": " ".join([*begun, more]), "_VSWITCH_COMPLETE": "bash_complete"}
         environment = {**os.environ, **asked}
@@ -405,9 +438,3 @@ def test_what_it_takes_is_told_where_it_is_missing() -> None:
     done = subprocess.run([sys.executable, "-c", program], capture_output=True, text=True)
     assert done.returncode == 1
     assert done.stderr.endswith("; --fabric takes Debian's python3-openvswitch\n"), done.stderr
-        ("set lab mt", ["plain,mtu="]),
-        ("set lab/a forbids=mac_changes,forg", ["plain,forbids=mac_changes,forged_transmits"]),
-        ("set lab/a teaming.active=", ["plain,teaming.active=nic0"]),
-        ("add lab/new vla", ["plain,vlan="]),
-        ("add other mt", ["plain,mtu="]),
-        ("unset lab/a vl", ["plain,vlan"]),

@@ -1,6 +1,6 @@
 #!/usr/bin/env python3
 """Hosts that share a switch, while their databases, wires, daemons and callers fail by chance, and
-what they say to the databases comes late, not, or in part.
+what they say to the databases comes late, not, in part, or twice.
 
     fabric_by_chance.py [--seconds N] [--seed N]
 
@@ -112,7 +112,7 @@ class Disturbed:
         host = self._chance.choice(self._lab.hosts)
         disturbances = [
             *(self._kill_database, self._pause, self._cut, self._kill_daemon),
-            *(self._slow, self._hold, self._cut_in_a_message),
+            *(self._slow, self._hold, self._repeat, self._cut_in_a_message),
         ]
         self._chance.choice(disturbances)(host)
 
@@ -149,6 +149,11 @@ class Disturbed:
         relay = relay_of(host)
         relay.hold()
         self._mends.append(relay.release)
+
+    def _repeat(self, host: Host) -> None:
+        relay = relay_of(host)
+        relay.repeat()
+        self._mends.append(lambda: relay.repeat(False))
 
     def _cut_in_a_message(self, host: Host) -> None:
         relay_of(host).cut(self._chance.choice([FROM_HOST, TO_HOST]))

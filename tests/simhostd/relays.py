@@ -1,6 +1,6 @@
 #!/usr/bin/env python3
 """A relay between a host and the servers of its databases, which delays what it passes on, holds it
-back, or cuts a connection in the middle of a message.
+back, cuts a connection in the middle of a message, or has transactions made twice.
 
     relays.py ADDRESS FIRST_PORT TO_ADDRESS TO_FIRST_PORT SERVERS
 
@@ -8,14 +8,18 @@ obeys a command in each line of its standard input, and says when it does.
 """
 
 import asyncio
+import codecs
+import json
 import subprocess
 import sys
 from contextlib import suppress
-from typing import List, Set, Tuple
+from typing import Any, Dict, Iterator, List, Set, Tuple
 
 from simhost._namespaces import PATIENCE, Namespace
 
 FROM_HOST, TO_HOST = "from_host", "to_host"
+# No client numbers its requests so.
+_FIRST = "first"
 
 
 class Relay:
@@ -48,6 +52,11 @@ class Relay:
         """Passes on half of what comes next in a direction over each connection, and ends it."""
         self._tell(f"cut {direction}")
 
+    def repeat(self, on: bool = True) -> None:
+        """Has each transaction made twice from now on, and passes on what became of it the second
+        time: as a server does that lost sight of its leader meanwhile."""
+        self._tell(f"repeat {int(on)}")
+
     def close(self) -> None:
         self._process.kill()
         self._process.communicate(timeout=PATIENCE)
@@ -71,6 +80,7 @@ class _Passing:
         self.delay = 0.0
         self.goes = asyncio.Event()
         self.goes.set()
+        self.repeats = False
         self.connections: List["_Connection"] = []
 
     def obey(self, command: str, *values: str) -> None:
@@ -80,6 +90,8 @@ class _Passing:
             self.goes.clear()
         elif command == "release":
             self.goes.set()
+        elif command == "repeat":
+            self.repeats = values == ("1",)
         else:
             for one in self.connections:
                 one.is_cut.add(values[0])
@@ -88,6 +100,7 @@ class _Passing:
 class _Connection:
     def __init__(self, passing: _Passing) -> None:
         self._passing = passing
+        self._is_made = asyncio.Event()
         self.is_cut: Set[str] = set()
 
     async def run(
@@ -119,14 +132,46 @@ class _Connection:
     async def _pass(
         self, reader: asyncio.StreamReader, writer: asyncio.StreamWriter, direction: str
     ) -> None:
+        messages = _Messages()
         while data := await reader.read(65536):
             await asyncio.sleep(self._passing.delay)
             await self._passing.goes.wait()
-            is_cut = direction in self.is_cut
-            writer.write(data[: len(data) // 2] if is_cut else data)
-            await writer.drain()
-            if is_cut:
+            for text, said in messages.add(data):
+                if said.get("id") == _FIRST:
+                    self._is_made.set()
+                    continue
+                if self._passing.repeats and said.get("method") == "transact":
+                    await self._make(said, writer)
+                is_cut = direction in self.is_cut
+                writer.write(text[: len(text) // 2] if is_cut else text)
+                await writer.drain()
+                if is_cut:
+                    return
+
+    async def _make(self, said: Dict[str, Any], writer: asyncio.StreamWriter) -> None:
+        """Has a transaction made of which nobody is told."""
+        self._is_made.clear()
+        writer.write(json.dumps({**said, "id": _FIRST}).encode())
+        await self._is_made.wait()
+
+
+class _Messages:
+    """The objects that a stream is made of."""
+
+    def __init__(self) -> None:
+        self._decoder = codecs.getincrementaldecoder("utf-8")()
+        self._left = ""
+
+    def add(self, data: bytes) -> Iterator[Tuple[bytes, Dict[str, Any]]]:
+        """Those that are whole by now: as they came, and what they say."""
+        self._left += self._decoder.decode(data)
+        while self._left:
+            try:
+                said, end = json.JSONDecoder().raw_decode(self._left)
+            except ValueError:
                 return
+            text, self._left = self._left[:end], self._left[end:].lstrip()
+            yield text.encode(), said
 
 
 async def _relay(address: str, first: str, to_address: str, to_first: str, servers: str) -> None:

@@ -10,7 +10,7 @@ import pytest
 from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
 
 import fabric_by_chance
-from fabric_by_chance import revision
+from fabric_by_chance import relay_of, revision
 from fabric_lab import FabricLab, Host, started
 from frame_lab import comes_true
 from relays import FROM_HOST, TO_HOST
@@ -102,6 +102,28 @@ def test_a_message_that_is_cut_loses_and_doubles_nothing(lab: FabricLab) -> None
     one.relay.delay(0.2)
     assert one.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK
     assert (lab.databases.settings("Switch")["mtu"], revision(lab)) == (1800, before + 3)
+
+
+def test_what_a_server_makes_twice_is_made_once(lab: FabricLab) -> None:
+    one, other = lab.relayed(lab.host("one", LAB)), lab.relayed(lab.host("two"))
+    for host in (one, other):
+        relay_of(host).repeat()
+        started(host)
+    one.ctl("share", "lab")
+    other.ctl("join", "lab")
+    assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
+    other.set_port("lab", "b", vlan={"id": 9})
+    assert one.call("VSDVS_RemoveDVPort", "lab", "a") == QEX_OK
+    assert comes_true(lambda: (mtu(other), set(one.ports("lab"))) == (1600, {"b"}))
+    # Who had the name lets go of it.
+    one.stop()
+    started(one)
+    assert other.call("VSDVS_SetMTU", "lab", 1700) == QEX_OK
+    assert comes_true(lambda: are_reported(lab))
+    assert mtu(one) == 1700
+    assert revision(lab) == len(lab.databases.rows("Change")) == 6
+    for host in (one, other):
+        assert "the fabric cannot be used" not in host.log(), host.log()
 
 
 def test_whatever_fails_all_hosts_end_alike() -> None:

@@ -8,12 +8,12 @@ import json
 import time
 import uuid
 from dataclasses import dataclass
-from typing import Dict, Mapping, Optional, Sequence, Union
+from typing import Dict, Iterable, Mapping, Optional, Sequence, Union
 
 from libvswitch.errors import Busy, HostError
 from vswitch.fabric._cluster import Cluster
 from vswitch.fabric._errors import TransactionRefused, Unreachable
-from vswitch.fabric._notation import delete, insert, where
+from vswitch.fabric._notation import Operation, delete, insert, select, where
 
 __all__ = ["Failover", "Replies", "Reply", "drill"]
 
@@ -48,10 +48,7 @@ def drill(cluster: Cluster, switch: str, hosts: Sequence[str], deadline: float) 
     ]
     cluster.connect(deadline)
     try:
-        cluster.transact([old, *rows], deadline)
-    except TransactionRefused as refused:
-        raise Busy(refused.words()) from None
-    try:
+        _ask(cluster, [old, *rows], asked, deadline)
         while len(_replied(cluster, asked)) < len(asked) and time.monotonic() < deadline:
             cluster.follow(deadline)
         found = _replied(cluster, asked)
@@ -60,6 +57,18 @@ def drill(cluster: Cluster, switch: str, hosts: Sequence[str], deadline: float) 
         }
     finally:
         _withdraw(cluster, asked)
+
+
+def _ask(
+    cluster: Cluster, operations: Sequence[Operation], asked: Iterable[str], deadline: float
+) -> None:
+    try:
+        cluster.transact(operations, deadline)
+    except TransactionRefused as refused:
+        # A server may try a second time by itself, and refuse then what it has made.
+        which = [select("Drill", where(id=id_), "id") for id_ in asked]
+        if not all(one["rows"] for one in cluster.transact(which, deadline)):
+            raise Busy(refused.words()) from None
 
 
 def _replied(cluster: Cluster, asked: Mapping[str, str]) -> Dict[str, str]:

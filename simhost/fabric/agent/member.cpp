@@ -33,8 +33,6 @@ constexpr auto kPatience = 4s;
 constexpr auto kLongestDecision = 10s;
 // A server is looked for that long before callers are refused.
 constexpr auto kElection = 3s;
-// Nobody asks for the outcome of older ones.
-constexpr std::int64_t kKeptSeconds = 3600;
 
 std::string random_name() {
   std::random_device random;
@@ -43,11 +41,6 @@ std::string random_name() {
 
 Deadline from_now(std::chrono::milliseconds time) {
   return Deadline::clock::now() + time;
-}
-
-std::int64_t long_ago() {
-  auto const now = std::chrono::system_clock::now().time_since_epoch();
-  return std::chrono::duration_cast<std::chrono::seconds>(now).count() - kKeptSeconds;
 }
 
 Membership membership_in(storage::Store &store, std::string const &host) {
@@ -64,6 +57,15 @@ Json map_of(std::map<std::string, std::string> const &texts) {
   return ovsdb::map({texts.begin(), texts.end()});
 }
 
+// Of a change that is not known to be made.
+Json told(Proposal const &proposal, Decision const &decision) {
+  if (decision.verdict == Verdict::refused) {
+    return {{"refused", decision.why}};
+  }
+  return {{"unknown", fmt::format("nobody knows whether the change {} is made: {}", proposal.id,
+                                  decision.why)}};
+}
+
 }  // namespace
 
 Member::Member(events::Loop &loop, Options options, Say say)
@@ -72,7 +74,7 @@ Member::Member(events::Loop &loop, Options options, Say say)
       say_(std::move(say)),
       store_(options_.state, [](storage::ChangingTransaction &) {}),
       membership_(membership_in(store_, options_.host)),
-      speaker_{.host = options_.host, .session = random_name()},
+      claim_({.host = options_.host, .session = random_name()}, membership_.state),
       cluster_(options_.servers,
                {.name = kDatabase, .version = kSchemaVersion, .selected = selected_columns()}),
       server_(loop, agent_socket_of(options_.state), questions()),
@@ -91,7 +93,7 @@ void Member::connect() {
     touched_.add_all();
     counts_are_due_ = true;
     watch();
-    claim();
+    claim_.make(cluster_);
     settle_undecided();
     say_(fmt::format("the fabric is at {}", cluster_.server()));
     trouble_.clear();
@@ -105,14 +107,14 @@ void Member::connect() {
 void Member::lose(std::string const &why) {
   watches_.clear();
   cluster_.disconnect();
-  speaks_ = false;
+  claim_.lose();
   if (!lost_) {
     lost_ = events::Clock::now();
   }
   if (std::exchange(trouble_, why) != why) {
     say_("the fabric cannot be used: " + why);
   }
-  if (!gave_way_) {
+  if (!claim_.gave_way()) {
     next_connect_ = loop_.after(kReconnect, [this] { connect(); });
   }
 }
@@ -141,65 +143,8 @@ bool Member::take_news() {
   }
   touched_.add(cluster_.replica(), changes);
   counts_are_due_ = counts_are_due_ || lets_any_go(cluster_.replica(), changes, options_.host);
-  claim();
+  claim_.make(cluster_);
   return true;
-}
-
-// The name.
-
-void Member::claim() {
-  auto const row = find_host(cluster_.replica(), options_.host);
-  if (!row) {
-    insert_host();
-  } else if (row->state != membership_.state) {
-    throw std::runtime_error(fmt::format(
-        "the name '{}' is taken by another host; the operators of the fabric can remove its row",
-        options_.host));
-  } else if (row->session != speaker_.session) {
-    contend(*row);
-  }
-  speaks_ = true;
-  spoke_ = true;
-}
-
-// A server may yet tell of the session that had the name before.
-void Member::contend(HostRow const &row) {
-  gave_way_ = spoke_ && row.session != former_session_;
-  if (gave_way_) {
-    throw std::runtime_error("another simhostd is this host by now");
-  }
-  if (!speaks_) {
-    take_over(row);
-  }
-}
-
-void Member::insert_host() {
-  try {
-    cluster_.transact(
-        Json::array({{{"op", "insert"}, {"table", "Fabric"}, {"row", Json::object()}}}),
-        from_now(kPatience));
-  } catch (ovsdb::TransactionRefused const &) {
-    // It has its one row already.
-  }
-  cluster_.transact(Json::array({{{"op", "insert"},
-                                  {"table", "Host"},
-                                  {"row",
-                                   {{"name", options_.host},
-                                    {"state", membership_.state},
-                                    {"session", speaker_.session}}}}}),
-                    from_now(kPatience));
-}
-
-void Member::take_over(HostRow const &row) {
-  auto operations = only_for({.host = options_.host, .session = row.session});
-  operations.push_back({{"op", "update"},
-                        {"table", "Host"},
-                        {"where", Json::array({Json::array({"name", "==", options_.host})})},
-                        {"row", {{"session", speaker_.session}}}});
-  cluster_.transact(together({operations, old_changes_deletion(options_.host, long_ago())}),
-                    from_now(kPatience));
-  // Two that take the name from one another again and again would never end.
-  former_session_ = spoke_ ? std::string() : row.session;
 }
 
 void Member::settle_undecided() {
@@ -222,7 +167,7 @@ void Member::sync_soon(events::Clock::duration wait) {
 }
 
 void Member::sync() {
-  if (!speaks_) {
+  if (!claim_.speaks()) {
     return;
   }
   auto const waited = next_wait_;
@@ -321,7 +266,8 @@ void Member::tell_joined() {
 
 void Member::reply_to_drills() {
   for (auto const &drill : drills_for(cluster_.replica(), options_.host)) {
-    auto const operations = together({only_for(speaker_), reply_to(drill, drilled(store_, drill))});
+    auto const operations =
+        together({only_for(claim_.speaker()), reply_to(drill, drilled(store_, drill))});
     try {
       cluster_.transact(operations, from_now(kPatience));
       // The reply may have come with news.
@@ -353,7 +299,7 @@ std::map<std::string, std::string> Member::links() {
 }
 
 void Member::report() {
-  if (!speaks_) {
+  if (!claim_.speaks()) {
     return;
   }
   try {
@@ -370,7 +316,7 @@ void Member::report() {
       row["in_force"] = revision_;
     }
     if (row != reported_) {
-      auto operations = only_for(speaker_);
+      auto operations = only_for(claim_.speaker());
       operations.push_back({{"op", "update"},
                             {"table", "Host"},
                             {"where", Json::array({Json::array({"name", "==", options_.host})})},
@@ -406,7 +352,8 @@ void Member::report_counts() {
   }
   if (!news->operations.empty()) {
     try {
-      cluster_.transact(together({only_for(speaker_), news->operations}), from_now(kPatience));
+      cluster_.transact(together({only_for(claim_.speaker()), news->operations}),
+                        from_now(kPatience));
       sync_soon();
     } catch (ovsdb::TransactionRefused const &refusal) {
       say_(fmt::format("what was counted is not told: {}", refusal.what()));
@@ -429,31 +376,14 @@ daemon::Questions Member::questions() {
   };
 }
 
-void Member::commit(Json const &question, Reply const &reply) {
-  if (!speaks_ && (!lost_ || events::Clock::now() - *lost_ > kElection)) {
-    reply({{"refused", "the fabric cannot be used: " + trouble_}});
-    return;
+Decision Member::decided(Proposal const &proposal) {
+  if (!claim_.speaks() && (!lost_ || events::Clock::now() - *lost_ > kElection)) {
+    return {.verdict = Verdict::refused, .why = "the fabric cannot be used: " + trouble_};
   }
-  if (cluster_.is_connected()) {
-    writers_ = writers_in(cluster_.replica());
-  }
-  Proposal proposal{
-      .id = question.at("change").get<std::string>(), .host = options_.host, .operations = nullptr};
-  auto const changes = question.at("rows").get<std::vector<Change>>();
-  auto const ports = cluster_.is_connected() ? ports_of(cluster_.replica(), changes) : RowNames();
-  proposal.operations =
-      together({only_for(speaker_), operations_of(changes, ports, writers_), next_revision(),
-                change_insertion(proposal.id, options_.host, false)});
   auto const connections = cluster_.connections();
-  auto const decision = decide(cluster_, proposal, from_now(kLongestDecision));
+  auto decision = decide(cluster_, proposal, from_now(kLongestDecision));
   if (decision.verdict == Verdict::unknown) {
     undecided_.push_back(proposal);
-    reply({{"unknown", fmt::format("nobody knows whether the change {} is made: {}", proposal.id,
-                                   decision.why)}});
-  } else if (decision.verdict == Verdict::refused) {
-    reply({{"refused", decision.why}});
-  } else {
-    reply({{"made", proposal.id}});
   }
   if (cluster_.is_connected()) {
     if (cluster_.connections() != connections) {
@@ -464,29 +394,40 @@ void Member::commit(Json const &question, Reply const &reply) {
   } else {
     lose(decision.why);
   }
+  return decision;
+}
+
+void Member::commit(Json const &question, Reply const &reply) {
+  auto const changes = question.at("rows").get<std::vector<Change>>();
+  RowNames ports;
+  if (cluster_.is_connected()) {
+    writers_ = writers_in(cluster_.replica());
+    ports = ports_of(cluster_.replica(), changes);
+  }
+  auto const proposal =
+      proposed(question.at("change").get<std::string>(), operations_of(changes, ports, writers_));
+  auto const decision = decided(proposal);
+  reply(decision.verdict == Verdict::made ? Json{{"made", proposal.id}} : told(proposal, decision));
 }
 
 void Member::join(std::string const &alias, Reply const &reply) {
-  if (!speaks_) {
-    reply({{"refused", "the fabric cannot be used: " + trouble_}});
-    return;
-  }
-  Json results;
-  try {
-    results = cluster_.transact(
-        together({only_for(speaker_), fabric::join(alias, options_.host), next_revision()}),
-        from_now(kPatience));
-  } catch (Unreachable const &why) {
-    reply({{"refused", why.what()}});
-    lose(why.what());
-    return;
-  }
-  if (results.at(1).at("count") == 0) {
+  auto const proposal = proposed(random_name(), fabric::join(alias, options_.host));
+  auto const decision = decided(proposal);
+  if (decision.verdict == Verdict::made) {
+    joining_.emplace(alias, reply);
+  } else if (cluster_.is_connected() && !has_switch(cluster_.replica(), alias)) {
     reply({{"refused", fmt::format("the fabric has no switch '{}'", alias)}});
-    return;
+  } else {
+    reply(told(proposal, decision));
   }
-  joining_.emplace(alias, reply);
-  sync_soon();
+}
+
+// With a change id, so that it is made once, whatever a server tries again.
+Proposal Member::proposed(std::string const &id, Json const &operations) const {
+  return {.id = id,
+          .host = options_.host,
+          .operations = together({only_for(claim_.speaker()), operations, next_revision(),
+                                  change_insertion(id, options_.host, false)})};
 }
 
 Json Member::status() const {

@@ -13,9 +13,9 @@
 #include "daemon/server.h"
 #include "daemon/troubles.h"
 #include "events/loop.h"
+#include "fabric/agent/claim.h"
 #include "fabric/agent/decision.h"
 #include "fabric/cluster/cluster.h"
-#include "fabric/rows/operations.h"
 #include "fabric/rows/rows.h"
 #include "fabric/rows/touched.h"
 #include "fabric/shared/records.h"
@@ -51,10 +51,6 @@ class Member {
   void lose(std::string const &why);
   void watch();
   void receive();
-  void claim();
-  void insert_host();
-  void contend(HostRow const &row);
-  void take_over(HostRow const &row);
   void settle_undecided();
 
   void sync_soon(events::Clock::duration wait = {});
@@ -71,6 +67,8 @@ class Member {
   [[nodiscard]] std::map<std::string, std::string> links();
 
   [[nodiscard]] daemon::Questions questions();
+  [[nodiscard]] Proposal proposed(std::string const &id, Json const &operations) const;
+  Decision decided(Proposal const &proposal);
   void commit(Json const &question, Reply const &reply);
   void join(std::string const &alias, Reply const &reply);
   [[nodiscard]] Json status() const;
@@ -80,13 +78,9 @@ class Member {
   Say say_;
   storage::Store store_;
   Membership membership_;
-  Speaker speaker_;
+  Claim claim_;
   Cluster cluster_;
   daemon::Server server_;
-  bool speaks_ = false;         // for the host, to the fabric
-  bool spoke_ = false;          // at any time
-  bool gave_way_ = false;       // to another process
-  std::string former_session_;  // from which it has the name
   std::string trouble_;
   std::optional<events::Clock::time_point> lost_;
   std::vector<Proposal> undecided_;

@@ -165,6 +165,13 @@ Json only_for(Speaker const &speaker) {
                        {"rows", Json::array({{{"session", speaker.session}}})}}});
 }
 
+Json session_selection(std::string const &host) {
+  return Json::array({{{"op", "select"},
+                       {"table", "Host"},
+                       {"where", conditions({{"name", host}})},
+                       {"columns", Json::array({"session"})}}});
+}
+
 Json operations_of(std::vector<Change> const &changes, RowNames const &ports, Writers writers) {
   auto operations = unchanged_writers(changes, writers);
   for (auto const &change : changes) {
@@ -220,8 +227,15 @@ Json old_changes_deletion(std::string const &host, std::int64_t time) {
 }
 
 Json join(std::string const &alias, std::string const &host) {
-  return Json::array(
-      {mutation("Switch", conditions({{"alias", alias}}), "hosts", "insert", ovsdb::set({host}))});
+  auto const where = conditions({{"alias", alias}});
+  return Json::array({{{"op", "wait"},
+                       {"timeout", 0},
+                       {"table", "Switch"},
+                       {"where", where},
+                       {"columns", Json::array({"alias"})},
+                       {"until", "=="},
+                       {"rows", Json::array({{{"alias", alias}}})}},
+                      mutation("Switch", where, "hosts", "insert", ovsdb::set({host}))});
 }
 
 Json together(std::initializer_list<Json> lists) {

@@ -21,6 +21,8 @@ struct Speaker {
 
 /// Refuses the transaction if somebody else speaks for the host by now.
 Json only_for(Speaker const &speaker);
+/// Who speaks for a host, as rows.
+Json session_selection(std::string const &host);
 /// Each row must be as it was. `ports` has the rows of ports that are known, and `writers` are
 /// those of the switches that the fabric has.
 Json operations_of(std::vector<Change> const &changes, RowNames const &ports, Writers writers);
@@ -32,6 +34,7 @@ Json change_insertion(std::string const &id, std::string const &host, bool revok
 Json change_selection(std::string const &id);
 /// Those of the host from before that time, in seconds since the beginning of 1970.
 Json old_changes_deletion(std::string const &host, std::int64_t time);
+/// Refuses the transaction if there is no switch of that alias.
 Json join(std::string const &alias, std::string const &host);
 
 /// All of the operations in all of the lists.

@@ -40,6 +40,11 @@ Records switches_of(ovsdb::Replica const &replica, std::string const &host) {
   return records;
 }
 
+bool has_switch(ovsdb::Replica const &replica, std::string const &alias) {
+  return std::ranges::any_of(replica.rows("Switch"),
+                             [&](auto const &row) { return row.second.at("alias") == alias; });
+}
+
 std::int64_t revision_of(ovsdb::Replica const &replica) {
   auto const &rows = replica.rows("Fabric");
   return rows.empty() ? 0 : rows.begin()->second.at("revision").get<std::int64_t>();

@@ -21,6 +21,8 @@ ovsdb::Selected selected_columns();
 
 /// The switches that the host belongs to.
 Records switches_of(ovsdb::Replica const &replica, std::string const &host);
+/// Whether there is one of that alias, on any host.
+bool has_switch(ovsdb::Replica const &replica, std::string const &alias);
 /// What people call a switch or a port.
 std::string words_of(SharedName const &name, Records const &switches);
 /// The column that says which hosts may write a switch and its ports, where they have a role.
