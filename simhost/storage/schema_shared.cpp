@@ -1,4 +1,5 @@
-// The tables of a host that shares switches with others.
+// The tables of a host that shares switches with others, and the triggers that tell what of that a
+// transaction touches, by whichever way and process.
 #include "storage/schema.h"
 
 namespace simhost::storage {
@@ -31,6 +32,126 @@ char const *const kCountedSchema = R"sql(
     counters    TEXT NOT NULL,
     PRIMARY KEY (port, host)
   ) STRICT, WITHOUT ROWID;
+)sql";
+
+char const *const kTouchedSchema = R"sql(
+  -- The names of what is shared that may have become other since its row of "shared" was put. Within
+  -- a statement that inserts or updates OR IGNORE would say nothing to the triggers.
+  CREATE TABLE touched (
+    switch      TEXT NOT NULL,
+    port        TEXT NOT NULL,
+    PRIMARY KEY (switch, port)
+  ) STRICT, WITHOUT ROWID;
+
+  CREATE VIEW shared_switch AS
+    SELECT switch.key, shared.switch FROM switch
+      CROSS JOIN shared ON shared.switch = switch.identifier AND shared.port = '';
+  CREATE VIEW shared_port AS
+    SELECT port.number, shared.switch, port.identifier AS port FROM port
+      CROSS JOIN switch ON switch.key = port.switch
+      CROSS JOIN shared ON shared.switch = switch.identifier AND shared.port = ''
+      WHERE NOT port.is_uplink;
+
+  CREATE TRIGGER touched_by_added_switch AFTER INSERT ON switch
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared WHERE switch = new.identifier
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_removed_switch AFTER DELETE ON switch
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared WHERE switch = old.identifier
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_changed_switch AFTER UPDATE OF alias, max_ports, version ON switch
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, '' FROM shared_switch WHERE key = new.key
+      ON CONFLICT DO NOTHING;
+  END;
+
+  CREATE TRIGGER touched_by_added_port AFTER INSERT ON port
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, new.identifier FROM shared_switch
+      WHERE key = new.switch AND NOT new.is_uplink
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_removed_port AFTER DELETE ON port
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, old.identifier FROM shared_switch
+      WHERE key = old.switch AND NOT old.is_uplink
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_changed_port AFTER UPDATE OF external_id ON port
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.number
+      ON CONFLICT DO NOTHING;
+  END;
+
+  CREATE TRIGGER touched_by_connected_port AFTER INSERT ON device
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_disconnected_port AFTER DELETE ON device
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
+      ON CONFLICT DO NOTHING;
+  END;
+
+  CREATE TRIGGER touched_by_set_property AFTER INSERT ON property
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = new.switch AND new.port IS NULL
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_changed_property AFTER UPDATE ON property
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = new.switch AND new.port IS NULL
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_removed_property AFTER DELETE ON property
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = old.switch AND old.port IS NULL
+      ON CONFLICT DO NOTHING;
+  END;
+
+  -- Addresses that were learned (type 2) are not shared.
+  CREATE TRIGGER touched_by_added_address AFTER INSERT ON address
+    WHEN new.type <> 2 AND EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = new.switch AND new.port IS NULL
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_changed_address AFTER UPDATE OF port, type ON address
+    WHEN (new.type <> 2 OR old.type <> 2) AND EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = new.switch AND new.port IS NULL
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = old.switch AND old.port IS NULL
+      ON CONFLICT DO NOTHING;
+  END;
+  CREATE TRIGGER touched_by_removed_address AFTER DELETE ON address
+    WHEN old.type <> 2 AND EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = old.switch AND old.port IS NULL
+      ON CONFLICT DO NOTHING;
+  END;
 )sql";
 
 }  // namespace simhost::storage

@@ -13,6 +13,13 @@ Shared shared_at(Query const &row) {
           .fits = row.flag(4)};
 }
 
+void forget_touched(ChangingTransaction &transaction, SharedName const &name) {
+  Change(transaction, "DELETE FROM touched WHERE switch = ? AND port = ?")
+      .with(std::string_view(name.switch_identifier))
+      .with(std::string_view(name.port))
+      .run();
+}
+
 }  // namespace
 
 std::optional<Membership> find_membership(Transaction &transaction) {
@@ -33,6 +40,14 @@ std::vector<Shared> all_shared(Transaction &transaction) {
   return Query(transaction,
                "SELECT switch, port, fabric, image, fits FROM shared"
                " ORDER BY switch, port")
+      .all(shared_at);
+}
+
+std::vector<Shared> all_shared(Transaction &transaction, std::string_view switch_identifier) {
+  return Query(transaction,
+               "SELECT switch, port, fabric, image, fits FROM shared WHERE switch = ?"
+               " ORDER BY port")
+      .with(switch_identifier)
       .all(shared_at);
 }
 
@@ -59,6 +74,7 @@ void put_shared(ChangingTransaction &transaction, Shared const &shared) {
         .with(std::string_view(shared.name.port))
         .run();
   }
+  forget_touched(transaction, shared.name);
 }
 
 void remove_shared(ChangingTransaction &transaction, SharedName const &name) {
@@ -66,16 +82,45 @@ void remove_shared(ChangingTransaction &transaction, SharedName const &name) {
       .with(std::string_view(name.switch_identifier))
       .with(std::string_view(name.port))
       .run();
+  forget_touched(transaction, name);
 }
 
 void remove_shared_switch(ChangingTransaction &transaction, std::string_view identifier) {
   Change(transaction, "DELETE FROM shared WHERE switch = ?").with(identifier).run();
+  Change(transaction, "DELETE FROM touched WHERE switch = ?").with(identifier).run();
 }
 
 bool is_shared(Transaction &transaction, std::string_view switch_identifier) {
   return Query(transaction, "SELECT 1 FROM shared WHERE switch = ? AND port = ''")
       .with(switch_identifier)
       .next();
+}
+
+std::vector<SharedName> touched(Transaction &transaction) {
+  return Query(transaction, "SELECT switch, port FROM touched ORDER BY switch, port")
+      .all([](Query const &row) {
+        return SharedName{.switch_identifier = row.name(0), .port = row.text(1)};
+      });
+}
+
+void touch(ChangingTransaction &transaction, std::string_view switch_identifier) {
+  Change(transaction,
+         "INSERT OR IGNORE INTO touched SELECT switch, port FROM shared WHERE switch = ?")
+      .with(switch_identifier)
+      .run();
+  Change(transaction,
+         "INSERT OR IGNORE INTO touched SELECT switch.identifier, port.identifier FROM switch"
+         " JOIN port ON port.switch = switch.key AND NOT port.is_uplink"
+         " WHERE switch.identifier = ?")
+      .with(switch_identifier)
+      .run();
+}
+
+void forget_touched(ChangingTransaction &transaction) {
+  // What is empty would be written all the same.
+  if (Query(transaction, "SELECT 1 FROM touched LIMIT 1").next()) {
+    Change(transaction, "DELETE FROM touched").run();
+  }
 }
 
 CountedByHost counted_of(Transaction &transaction, PortNumber number) {

@@ -43,6 +43,7 @@ struct Shared {
 
 /// All of them, each switch before its ports.
 std::vector<Shared> all_shared(Transaction &transaction);
+std::vector<Shared> all_shared(Transaction &transaction, std::string_view switch_identifier);
 std::optional<Shared> find_shared(Transaction &transaction, SharedName const &name);
 /// Replaces what was there.
 void put_shared(ChangingTransaction &transaction, Shared const &shared);
@@ -50,6 +51,14 @@ void remove_shared(ChangingTransaction &transaction, SharedName const &name);
 /// With all of its ports.
 void remove_shared_switch(ChangingTransaction &transaction, std::string_view identifier);
 bool is_shared(Transaction &transaction, std::string_view switch_identifier);
+
+/// Those that may have become other since they were put or removed, whoever did it, each switch
+/// before its ports: all of a switch that is gone, and ports that were never put.
+std::vector<SharedName> touched(Transaction &transaction);
+/// All of a switch may have become other.
+void touch(ChangingTransaction &transaction, std::string_view switch_identifier);
+/// None of them has.
+void forget_touched(ChangingTransaction &transaction);
 
 /// What each host counted of a port: texts of counters by the name of the host.
 using CountedByHost = std::map<std::string, std::string>;

@@ -17,8 +17,9 @@ namespace {
 
 // What takes a state of version kOldestSchema to the next, that one to the one after it, ...
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
-    kGenerationSchema, kFramesSchema, kReadingSchema, kRememberedSchema, kSeenSchema,
-    kSharedSchema,     kLacpSchema,   kFabricSchema,  kChosenSchema,     kCountedSchema};
+    kGenerationSchema, kFramesSchema,  kReadingSchema, kRememberedSchema,
+    kSeenSchema,       kSharedSchema,  kLacpSchema,    kFabricSchema,
+    kChosenSchema,     kCountedSchema, kTouchedSchema};
 
 // A table, index, view or trigger.
 struct Part {
@@ -110,16 +111,9 @@ void create_state(SQLite::Database &database) {
   set_version(database, kSchemaVersion);
   database.exec(kSchema);
   database.exec(kRunningSchema);
-  database.exec(kGenerationSchema);
-  database.exec(kFramesSchema);
-  database.exec(kReadingSchema);
-  database.exec(kRememberedSchema);
-  database.exec(kSeenSchema);
-  database.exec(kSharedSchema);
-  database.exec(kLacpSchema);
-  database.exec(kFabricSchema);
-  database.exec(kChosenSchema);
-  database.exec(kCountedSchema);
+  for (auto const *step : kSteps) {
+    database.exec(step);
+  }
 }
 
 void bring_forward(SQLite::Database &database, std::int64_t version,

@@ -65,6 +65,7 @@ void share(storage::ChangingTransaction &transaction, std::string const &switch_
   storage::put_shared(transaction, {.name = {.switch_identifier = switch_identifier, .port = {}},
                                     .fabric = {},
                                     .image = std::nullopt});
+  storage::touch(transaction, switch_identifier);
 }
 
 void join(std::filesystem::path const &state, std::string const &alias) {
@@ -88,6 +89,7 @@ void FabricSharing::prepare(storage::ChangingTransaction &transaction) {
     asked(state_, {{"ask", "commit"}, {"change", new_change()}, {"rows", changes}});
     agree(transaction, changes);
   }
+  storage::forget_touched(transaction);
 }
 
 }  // namespace simhost::fabric

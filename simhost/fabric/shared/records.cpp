@@ -47,95 +47,80 @@ class Comparison {
       : transaction_(transaction), membership_(membership) {}
 
   std::vector<Change> changes() {
-    auto const all = storage::all_shared(transaction_);
-    for (auto row = all.begin(); row != all.end();) {
-      auto const end = std::find_if(row, all.end(), [&](Shared const &other) {
-        return other.name.switch_identifier != row->name.switch_identifier;
-      });
-      compare({row, end});
-      row = end;
+    for (auto const &name : storage::touched(transaction_)) {
+      if (!storage::is_shared(transaction_, name.switch_identifier)) {
+        continue;
+      }
+      auto const found = find_switch(transaction_, name.switch_identifier);
+      if (!found) {
+        leave(name);
+      } else if (name.port.empty()) {
+        compare_switch(*found, *storage::find_shared(transaction_, name));
+      } else {
+        compare_port(*found, name);
+      }
     }
     return std::move(changes_);
   }
 
  private:
-  // The first row is that of the switch.
-  void compare(std::vector<Shared> const &rows) {
-    auto const found = find_switch(transaction_, rows.front().name.switch_identifier);
-    if (found) {
-      compare_switch(*found, rows.front());
-      compare_ports(*found, rows);
-    } else if (rows.front().image) {
-      leave(rows);
-    }
-  }
-
   void compare_switch(storage::FoundSwitch const &found, Shared const &row) {
     if (row.fabric.empty()) {
-      add(row, nullptr, record_of(transaction_, found, Json::array({membership_.host})));
+      add(row.name, nullptr, record_of(transaction_, found, Json::array({membership_.host})));
     } else if (image_of(transaction_, found) != row.image) {
       if (!row.fits) {
         refuse_unborne(fmt::format("the switch '{}'", found.row.alias));
       }
       auto const was = Json::parse(row.fabric);
-      add(row, was, record_of(transaction_, found, was.at("hosts")));
+      add(row.name, was, record_of(transaction_, found, was.at("hosts")));
     }
   }
 
-  void compare_ports(storage::FoundSwitch const &found, std::vector<Shared> const &rows) {
-    std::map<std::string_view, Shared const *> known;
-    for (auto const &row : rows) {
-      known[row.name.port] = &row;
-    }
-    auto const images = images_of_ports(transaction_, found.key);
-    for (auto const &port : storage::ports_of(transaction_, found.key)) {
-      auto const row = known.find(port.identifier);
-      if (port.kind == storage::PortKind::uplink) {
-        continue;
+  void compare_port(storage::FoundSwitch const &found, SharedName const &name) {
+    auto const row = storage::find_shared(transaction_, name);
+    auto const port = storage::find_port(transaction_, found.key, name.port);
+    if (!port || port->kind == storage::PortKind::uplink) {
+      if (row && row->image) {
+        add(name, Json::parse(row->fabric), nullptr);
       }
-      if (row == known.end()) {
-        add({.name = {found.row.identifier, port.identifier}, .fabric = {}, .image = {}}, nullptr,
-            record_of(transaction_, port, membership_, ""));
-      } else {
-        compare_port(port, images.at(port.number), *row->second);
-        known.erase(row);
+    } else if (!row) {
+      add(name, nullptr, record_of(transaction_, *port, membership_, ""));
+    } else if (image_of(transaction_, *port) != row->image) {
+      if (!row->fits) {
+        refuse_unborne(fmt::format("the port '{}'", name.port));
       }
-    }
-    for (auto const &[identifier, row] : known) {
-      if (!identifier.empty() && row->image) {
-        add(*row, Json::parse(row->fabric), nullptr);
-      }
+      auto const was = Json::parse(row->fabric);
+      add(name, was, record_of(transaction_, *port, membership_, was.at("host")));
     }
   }
 
-  void compare_port(storage::Port const &port, Bytes const &image, Shared const &row) {
-    if (image == row.image) {
+  // Of a switch that this host had, and has no more.
+  void leave(SharedName const &name) {
+    auto const row = storage::find_shared(transaction_, name);
+    if (!row || !had_switch(name)) {
       return;
     }
-    if (!row.fits) {
-      refuse_unborne(fmt::format("the port '{}'", port.identifier));
+    auto const was = Json::parse(row->fabric);
+    auto now = was;
+    if (name.port.empty()) {
+      std::erase(now.at("hosts").get_ref<Json::array_t &>(), Json(membership_.host));
+    } else if (was.at("host") == membership_.host) {
+      now["host"] = "";
     }
-    auto const was = Json::parse(row.fabric);
-    add(row, was, record_of(transaction_, port, membership_, was.at("host")));
+    add(name, was, now);
   }
 
-  void leave(std::vector<Shared> const &rows) {
-    for (auto const &row : rows) {
-      auto const was = Json::parse(row.fabric);
-      auto now = was;
-      if (row.name.port.empty()) {
-        std::erase(now.at("hosts").get_ref<Json::array_t &>(), Json(membership_.host));
-      } else if (was.at("host") == membership_.host) {
-        now["host"] = "";
-      }
-      add(row, was, now);
-    }
+  // Otherwise it could not bear it.
+  [[nodiscard]] bool had_switch(SharedName const &name) {
+    auto const row = storage::find_shared(
+        transaction_, {.switch_identifier = name.switch_identifier, .port = {}});
+    return row && row->image;
   }
 
   // What has another image may say the same.
-  void add(Shared const &row, Json was, Json now) {
+  void add(SharedName const &name, Json was, Json now) {
     if (was != now) {
-      changes_.push_back({.name = row.name, .was = std::move(was), .now = std::move(now)});
+      changes_.push_back({.name = name, .was = std::move(was), .now = std::move(now)});
     }
   }
 

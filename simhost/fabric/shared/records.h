@@ -32,9 +32,9 @@ struct Change {
 void to_json(Json &said, Change const &change);
 void from_json(Json const &said, Change &change);
 
-/// What a transaction made other than this host and the fabric agreed on. A switch that is gone
-/// here is left to its other hosts. Refuses to change what the fabric has and this host cannot bear
-/// (QEX_BUSY).
+/// What a transaction made other than this host and the fabric agreed on, of what is touched. A
+/// switch that is gone here is left to its other hosts. Refuses to change what the fabric has and
+/// this host cannot bear (QEX_BUSY).
 std::vector<Change> changes_of(storage::Transaction &transaction, Membership const &membership);
 /// The fabric has them.
 void agree(storage::ChangingTransaction &transaction, std::vector<Change> const &changes);

@@ -21,9 +21,6 @@ Settings settings_of(storage::Transaction &transaction, storage::Port const &por
 /// device: made in a small part of the time that settings take.
 Bytes image_of(storage::Transaction &transaction, storage::FoundSwitch const &found);
 Bytes image_of(storage::Transaction &transaction, storage::Port const &port);
-/// Of all ports of a switch, in a small part of the time that they take one by one.
-std::map<storage::PortNumber, Bytes> images_of_ports(storage::Transaction &transaction,
-                                                     storage::SwitchKey key);
 
 /// Makes the settings these, and no others. Throws what the host refuses (Refused), and
 /// scenario::DocumentError for what is no such setting.

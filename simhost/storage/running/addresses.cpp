@@ -80,6 +80,15 @@ std::vector<PlacedAddress> fixed_addresses(Transaction &transaction, SwitchKey k
   });
 }
 
+std::vector<Address> fixed_addresses(Transaction &transaction, Place const &place) {
+  Query select(transaction, "SELECT " ADDRESS_COLUMNS
+                            " FROM address"
+                            " WHERE switch = ? AND ifnull(port, 0) = ? AND type IN (?, ?)"
+                            " ORDER BY type, mac, vid, vni");
+  select.with(place.switch_key).with(port_or_none(place));
+  return select.with(VS_MAC_ADDR_TYPE_STATIC).with(VS_MAC_ADDR_TYPE_USER).all(address_at);
+}
+
 std::optional<FoundAddress> find_address(Transaction &transaction, SwitchKey key,
                                          AddressName const &name) {
   Query select(transaction,

@@ -53,6 +53,8 @@ struct PlacedAddress {
 
 /// The static and user addresses of a switch, in the order of their ports, those of the team last.
 std::vector<PlacedAddress> fixed_addresses(Transaction &transaction, SwitchKey key);
+/// Those at a place.
+std::vector<Address> fixed_addresses(Transaction &transaction, Place const &place);
 /// An address of a switch, wherever it is.
 std::optional<FoundAddress> find_address(Transaction &transaction, SwitchKey key,
                                          AddressName const &name);
