@@ -90,7 +90,7 @@ void Member::connect() {
   try {
     cluster_.connect();
     lost_.reset();
-    touched_.add_all();
+    begin_anew();
     counts_are_due_ = true;
     watch();
     claim_.make(cluster_);
@@ -101,6 +101,12 @@ void Member::connect() {
   } catch (std::runtime_error const &error) {
     lose(error.what());
   }
+}
+
+// Nobody has told of what changed before.
+void Member::begin_anew() {
+  touched_.add_all();
+  port_rows_.begin(cluster_.replica());
 }
 
 // Said once, however often it is tried.
@@ -142,6 +148,7 @@ bool Member::take_news() {
     return false;
   }
   touched_.add(cluster_.replica(), changes);
+  port_rows_.follow(cluster_.replica(), changes);
   counts_are_due_ = counts_are_due_ || lets_any_go(cluster_.replica(), changes, options_.host);
   claim_.make(cluster_);
   return true;
@@ -387,7 +394,7 @@ Decision Member::decided(Proposal const &proposal) {
   }
   if (cluster_.is_connected()) {
     if (cluster_.connections() != connections) {
-      touched_.add_all();
+      begin_anew();
     }
     watch();
     sync_soon();
@@ -402,7 +409,7 @@ void Member::commit(Json const &question, Reply const &reply) {
   RowNames ports;
   if (cluster_.is_connected()) {
     writers_ = writers_in(cluster_.replica());
-    ports = ports_of(cluster_.replica(), changes);
+    ports = port_rows_.of(cluster_.replica(), changes);
   }
   auto const proposal =
       proposed(question.at("change").get<std::string>(), operations_of(changes, ports, writers_));

@@ -16,6 +16,7 @@
 #include "fabric/agent/claim.h"
 #include "fabric/agent/decision.h"
 #include "fabric/cluster/cluster.h"
+#include "fabric/rows/port_rows.h"
 #include "fabric/rows/rows.h"
 #include "fabric/rows/touched.h"
 #include "fabric/shared/records.h"
@@ -48,6 +49,7 @@ class Member {
 
  private:
   void connect();
+  void begin_anew();
   void lose(std::string const &why);
   void watch();
   void receive();
@@ -85,6 +87,7 @@ class Member {
   std::optional<events::Clock::time_point> lost_;
   std::vector<Proposal> undecided_;
   Touched touched_;
+  PortRows port_rows_;
   std::map<SharedName, std::string> unborne_;
   std::multimap<std::string, Reply> joining_;  // by the alias of the switch
   Writers writers_;                            // as they were seen last

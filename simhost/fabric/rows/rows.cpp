@@ -2,9 +2,6 @@
 #include "fabric/rows/rows.h"
 
 #include <algorithm>
-#include <iterator>
-#include <set>
-#include <string_view>
 #include <utility>
 
 namespace simhost::fabric {
@@ -92,25 +89,6 @@ void add_port(Records &records, ovsdb::Row const &row, Records const &switches) 
   if (!name.port.empty() && switches.contains({name.switch_identifier, ""})) {
     records[std::move(name)] = {{"host", row.at("host")}, {"settings", settings_in(row)}};
   }
-}
-
-RowNames ports_of(ovsdb::Replica const &replica, std::vector<Change> const &changes) {
-  std::set<std::string_view> wanted;
-  for (auto const &change : changes) {
-    wanted.insert(change.name.port);
-  }
-  std::set<SharedName> names;
-  std::ranges::transform(changes, std::inserter(names, names.end()), &Change::name);
-  RowNames found;
-  for (auto const &[uuid, row] : replica.rows("Port")) {
-    // Most rows are none of them, and no name is made of those.
-    if (wanted.contains(row.at("id").get_ref<std::string const &>())) {
-      if (auto name = port_in(row); names.contains(name)) {
-        found.emplace(std::move(name), uuid);
-      }
-    }
-  }
-  return found;
 }
 
 std::optional<HostRow> find_host(ovsdb::Replica const &replica, std::string const &name) {

@@ -46,8 +46,6 @@ SharedName switch_in(ovsdb::Row const &row);
 SharedName port_in(ovsdb::Row const &row);
 /// The UUIDs of rows, by what hosts call them.
 using RowNames = std::map<SharedName, std::string>;
-/// Of those ports that become other by changes.
-RowNames ports_of(ovsdb::Replica const &replica, std::vector<Change> const &changes);
 /// What hosts have counted of a port.
 CountsOfHosts counts_of_hosts(ovsdb::Row const &row);
 /// Of a port that has a name, if its switch is one of these.

@@ -14,7 +14,6 @@ namespace simhost::fabric {
 namespace {
 
 using testing::ElementsAre;
-using testing::Pair;
 
 Json record(std::string const &host) {
   return {{"host", host}, {"settings", Json::object()}};
@@ -75,17 +74,6 @@ TEST(Operations, LetWhoSharesASwitchWriteIt) {
   auto const own = ovsdb::map({{"one", "one"}});
   EXPECT_EQ(operations[0].at("row").at("writers"), own);
   EXPECT_EQ(operations[1].at("row").at("writers"), own);
-}
-
-TEST(Operations, KnowThePortsOfAReplica) {
-  ovsdb::Column const text{.kind = ovsdb::Column::Kind::single, .usual = ""};
-  ovsdb::Replica replica(ovsdb::Schema{{"Port", {{"switch", text}, {"id", text}}}});
-  replica.apply({{"Port",
-                  {{"1", {{"initial", {{"switch", "s"}, {"id", "a"}}}}},
-                   {"2", {{"initial", {{"switch", "t"}, {"id", "a"}}}}},
-                   {"3", {{"initial", {{"switch", "s"}, {"id", "b"}}}}}}}});
-  auto const known = ports_of(replica, {change("a", nullptr), change("c", nullptr)});
-  EXPECT_THAT(known, ElementsAre(Pair(SharedName{.switch_identifier = "s", .port = "a"}, "1")));
 }
 
 }  // namespace
