@@ -44,6 +44,11 @@ openvswitch::PresentRows const &Bridges::present() {
   return *present_;
 }
 
+void Bridges::forget_rows() {
+  present_.reset();
+  rows_made_.reset();
+}
+
 std::optional<std::string> Bridges::elsewhere(std::string const &device) {
   auto const found = present().elsewhere.find(device);
   return found == present().elsewhere.end() ? std::nullopt : std::optional(found->second);
@@ -74,7 +79,7 @@ void Bridges::read_database_events() {
   try {
     database_.receive();
     if (take_database_events()) {
-      present_.reset();
+      forget_rows();
       told_.changed();
     }
   } catch (std::exception const &error) {
@@ -89,8 +94,13 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted,
   // As many as those need that stay as they are, too.
   auto const most_tags =
       wanted.unfit.empty() ? wanted.most_tags : std::max(wanted.most_tags, present().most_tags);
+  RowsMade made{.rows = rows, .most_tags = most_tags};
+  if (rows_made_ == made) {
+    return {};
+  }
   auto operations = openvswitch::operations(present(), rows, told_.host, told_.owner, most_tags);
   if (operations.empty()) {
+    rows_made_ = std::move(made);
     return {};
   }
   operations.insert(operations.begin(), ovsdb::Json{{"op", "assert"}, {"lock", kLock}});
@@ -100,7 +110,7 @@ std::set<std::string> Bridges::apply_rows(Wanted const &wanted,
   ovsdb::wait_for_configuration(database_, number, deadline);
   // What others changed meanwhile was told to that wait.
   take_database_events();
-  present_.reset();
+  forget_rows();
   told_.changed();
   return added;
 }

@@ -75,10 +75,18 @@ class Bridges {
   Unseen age();
 
  private:
+  struct RowsMade {
+    std::vector<openvswitch::BridgeRow> rows;
+    std::uint32_t most_tags = 0;
+
+    bool operator==(RowsMade const &) const = default;
+  };
+
   void take_ownership();
   bool take_database_events();
   void read_database_events();
   openvswitch::PresentRows const &present();
+  void forget_rows();
   // Returns the devices that were put at bridges.
   std::set<std::string> apply_rows(Wanted const &wanted,
                                    std::vector<openvswitch::BridgeRow> const &rows,
@@ -96,6 +104,7 @@ class Bridges {
   ovsdb::Client database_;
   // None once the database has changed: most changes are none of rows, and take no look at them.
   std::optional<openvswitch::PresentRows> present_;
+  std::optional<RowsMade> rows_made_;  // of which nothing in those differs
   events::Loop::Watch database_watch_;
   std::map<storage::SwitchKey, std::unique_ptr<RunningBridge>> bridges_;
 };
