@@ -12,11 +12,13 @@ CompiledSwitch const &Compiler::compile(storage::SwitchKey key, openvswitch::Net
   }
   auto flows = std::make_shared<openvswitch::Compiled const>(openvswitch::compile(network));
   auto &kept = kept_[key];
+  replaced_.push_back(std::move(kept.made.flows));
   kept = {.made = {.network = std::move(network), .flows = std::move(flows)}};
   return kept.made;
 }
 
 void Compiler::forget_others() {
+  replaced_.clear();
   std::erase_if(kept_, [](auto const &kept) { return !kept.second.is_asked_for; });
   for (auto &[key, kept] : kept_) {
     kept.is_asked_for = false;

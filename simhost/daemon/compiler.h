@@ -4,6 +4,7 @@
 
 #include <map>
 #include <memory>
+#include <vector>
 
 #include "planes/openvswitch/compile/compile.h"
 #include "storage/switches.h"
@@ -23,7 +24,8 @@ class Compiler {
   /// What compile() makes of it: the same as the last time, if that is still so. Refuses as
   /// compile() does. Valid until the next call.
   CompiledSwitch const &compile(storage::SwitchKey key, openvswitch::Network network);
-  /// Forgets those that were not asked for since the last time.
+  /// Forgets those that were not asked for since the last time, and what was made anew as it was
+  /// before: to be done when nobody waits, as that takes a part of what it took to make it.
   void forget_others();
 
  private:
@@ -33,6 +35,7 @@ class Compiler {
   };
 
   std::map<storage::SwitchKey, Kept> kept_;
+  std::vector<Flows> replaced_;
 };
 
 }  // namespace simhost::daemon

@@ -273,6 +273,7 @@ void Daemon::attempt(std::function<void()> const &work) {
   } catch (std::exception const &error) {
     fail(error.what());
   }
+  compiler_.forget_others();
 }
 
 // Whoever waits for a change has told of it already, most of the time.

@@ -308,7 +308,6 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
       wanted.unfit.push_back(unfit(bridge, error));
     }
   }
-  compiler.forget_others();
   return wanted;
 }
 
