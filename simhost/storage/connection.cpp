@@ -48,8 +48,13 @@ bool has_moved(SQLite::Database const &database) {
   return moved != 0;
 }
 
-std::int64_t schema_version(SQLite::Database &database) {
-  return database.execAndGet("PRAGMA schema_version").getInt64();
+// Asked for after each change by others.
+std::int64_t schema_version(Connection &connection) {
+  auto &statement = connection.prepared("PRAGMA schema_version", false);
+  statement.executeStep();
+  auto const version = statement.getColumn(0).getInt64();
+  statement.tryReset();
+  return version;
 }
 
 }  // namespace
@@ -120,7 +125,7 @@ void Connection::watch() {
 
 void Connection::require_schema() {
   storage::require_schema(*database_);
-  schema_ = schema_version(*database_);
+  schema_ = schema_version(*this);
   seen_ = data_version();
 }
 
@@ -136,7 +141,7 @@ void Connection::require_schema_of_now() {
     return;
   }
   guarded([&] {
-    if (schema_version(*database_) != schema_) {
+    if (schema_version(*this) != schema_) {
       require_schema();
     }
   });
