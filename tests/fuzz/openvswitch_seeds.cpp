@@ -60,7 +60,8 @@ void put_questions(openflow::Writer &out) {
   openflow::put_ports_request(out, 1, MultipartType::ports, openflow::kAnyPort);
   openflow::put_groups_request(out, 1, MultipartType::groups, openflow::kAllGroups);
   openflow::put_groups_request(out, 1, MultipartType::group_statistics, openflow::kAllGroups);
-  openflow::put_flow_monitor_request(out, 1, 1, {50}, openflow::OwnChanges::told);
+  openflow::put_flow_monitor_request(
+      out, 1, {.number = 1, .filter = {50}, .own = openflow::OwnChanges::told});
   openflow::put_packet_out(
       out, 1, {1, {openflow::set(openflow::reg(3), 4), openflow::ToController{}}, Bytes(14)});
   // An error, and a flow that tells of its removal.

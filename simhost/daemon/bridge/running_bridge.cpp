@@ -42,6 +42,23 @@ bool is_marker(openflow::FlowEntry const &entry) {
   return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
 }
 
+// Of all tables but one: what is there is recent for a second, and much.
+std::vector<openflow::FlowMonitor> monitors() {
+  using openflow::OwnChanges;
+  using openflow::PresentFlows;
+  std::vector<openflow::FlowMonitor> monitors;
+  for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
+    if (number != openvswitch::table::kRecentSources) {
+      bool const is_learned = openvswitch::table::is_learned(number);
+      monitors.push_back({.number = number + 1U,
+                          .filter = {.table = number},
+                          .own = is_learned ? OwnChanges::told : OwnChanges::untold,
+                          .present = is_learned ? PresentFlows::told : PresentFlows::untold});
+    }
+  }
+  return monitors;
+}
+
 openvswitch::Difference difference_between(openvswitch::Compiled const &present,
                                            openvswitch::Compiled const &wanted) {
   return &present == &wanted
@@ -78,15 +95,19 @@ RunningBridge::RunningBridge(events::Loop &loop, Place const &place, Memory &mem
   meters_.replace(connection_, wanted.flows->flows, deadline);
   added_ahead_ = add_unreached(connection_, socket_of(wanted, place.folder), *wanted.flows,
                                deadline, place.lives);
-  read_flows(deadline);
-  for (auto const &port : connection_.ports(deadline)) {
+  auto contents =
+      connection_.follow({.packet_in = true, .port_status = true, .group_and_meter_changes = true},
+                         monitors(), deadline);
+  // What counted while nobody was here, before any of it is changed.
+  tell_counted(contents.flows, contents.port_statistics);
+  for (auto const &port : contents.ports) {
     live_.follow(port);
   }
   if (!wanted.row.lags.empty()) {
     told_.lived();
   }
-  // What counted while nobody was here, before any of it is changed.
-  count(deadline);
+  take(std::move(contents));
+  follow_events();
   watch_ = loop.watch(connection_.fd(), [this] { read_events(); });
 }
 
@@ -95,35 +116,21 @@ void RunningBridge::have(Flows flows) {
   flows_ = std::move(flows);
 }
 
-// Once it is told of changes, so that none is missed.
-void RunningBridge::read_flows(Deadline deadline) {
-  connection_.set_async({.packet_in = true, .port_status = true, .group_and_meter_changes = true},
-                        deadline);
-  std::vector<openflow::FlowMonitor> monitors;
-  for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
-    // These are recent for a second, and many.
-    if (number != openvswitch::table::kRecentSources) {
-      auto const own = openvswitch::table::is_learned(number) ? openflow::OwnChanges::told
-                                                              : openflow::OwnChanges::untold;
-      monitors.push_back({.number = number + 1U, .filter = {.table = number}, .own = own});
-    }
-  }
-  std::vector<Flow> learned;
-  for (auto const &update : connection_.monitor_flows(monitors, deadline)) {
-    if (openvswitch::table::is_learned(update.flow.table)) {
-      learned.push_back(update.flow);
-    }
-  }
-  auto flows = connection_.flows({}, deadline);
+void RunningBridge::take(openflow::Contents contents) {
+  auto &flows = contents.flows;
   if (auto const marker = std::ranges::find_if(flows, is_marker); marker != flows.end()) {
     change_ = marker->flow.cookie;
     flows.erase(marker);
   }
-  auto present = openvswitch::present_of(flows, connection_.groups(deadline));
+  auto present = openvswitch::present_of(flows, contents.groups);
   unplaced_ = std::move(present.unplaced);
   have(std::make_shared<openvswitch::Compiled const>(openvswitch::Compiled{
       .rows = {}, .flows = std::move(present.flows), .groups = std::move(present.groups)}));
   if (change_) {
+    std::vector<Flow> learned;
+    for (auto &update : contents.monitored) {
+      learned.push_back(std::move(update.flow));
+    }
     memory_.replace(key_, learned);
   }
 }
@@ -195,9 +202,15 @@ void RunningBridge::look_for_strays(Deadline deadline) {
   follow_events();
 }
 
-void RunningBridge::count(Deadline deadline) {
-  told_.counted(key_, totals_of(connection_, numbers_, deadline), sessions_);
+void RunningBridge::tell_counted(std::span<openflow::FlowEntry const> flows,
+                                 std::span<openflow::PortStatistics const> ports) {
+  told_.counted(key_, totals_of(flows, ports, numbers_), sessions_);
   counted_ = Deadline::clock::now();
+}
+
+void RunningBridge::count(Deadline deadline) {
+  auto const flows = counting_flows(connection_, deadline);
+  tell_counted(flows, connection_.port_statistics(openflow::kAnyPort, deadline));
   follow_events();
 }
 

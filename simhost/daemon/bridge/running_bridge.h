@@ -8,6 +8,7 @@
 #include <functional>
 #include <optional>
 #include <set>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -85,7 +86,10 @@ class RunningBridge {
   std::vector<Source> age(openvswitch::Deadline deadline);
 
  private:
-  void read_flows(openvswitch::Deadline deadline);
+  // What is there once it is told of changes, so that none is missed.
+  void take(openflow::Contents contents);
+  void tell_counted(std::span<openflow::FlowEntry const> flows,
+                    std::span<openflow::PortStatistics const> ports);
   void add_relearned(WantedBridge const &wanted, openvswitch::Difference &difference,
                      openvswitch::Deadline deadline);
   void add_renewed(WantedBridge const &wanted, openvswitch::Difference &difference,

@@ -1,6 +1,7 @@
 // Flows of the tables that count, and statistics of ports.
 #include "daemon/counting/bridge_totals.h"
 
+#include <algorithm>
 #include <limits>
 #include <vector>
 
@@ -11,9 +12,15 @@ namespace {
 
 using openvswitch::Counted;
 
+bool counts(openflow::Flow const &flow) {
+  auto const kind = openvswitch::kind_of(flow.cookie);
+  return kind != Counted::nothing && kind != Counted::port &&
+         std::ranges::find(openvswitch::kCountingTables, flow.table) !=
+             openvswitch::kCountingTables.end();
+}
+
 void add_flow(openflow::FlowEntry const &entry, openvswitch::Totals &totals) {
-  auto const kind = openvswitch::kind_of(entry.flow.cookie);
-  if (kind != Counted::nothing && kind != Counted::port) {
+  if (counts(entry.flow)) {
     auto &total = totals[entry.flow.cookie];
     total.packets += entry.traffic.packets;
     total.bytes += entry.traffic.bytes;
@@ -37,17 +44,24 @@ void add_device(openflow::PortStatistics const &statistics, std::uint32_t number
 
 }  // namespace
 
-openvswitch::Totals totals_of(openflow::Connection &connection, PortNumbers const &numbers,
-                              openvswitch::Deadline deadline) {
-  openvswitch::Totals totals;
+std::vector<openflow::FlowEntry> counting_flows(openflow::Connection &connection,
+                                                openvswitch::Deadline deadline) {
   std::vector<openflow::FlowFilter> counting;
+  counting.reserve(openvswitch::kCountingTables.size());
   for (auto const table : openvswitch::kCountingTables) {
     counting.push_back({.table = table});
   }
-  for (auto const &entry : connection.flows_of(counting, deadline)) {
+  return connection.flows_of(counting, deadline);
+}
+
+openvswitch::Totals totals_of(std::span<openflow::FlowEntry const> flows,
+                              std::span<openflow::PortStatistics const> ports,
+                              PortNumbers const &numbers) {
+  openvswitch::Totals totals;
+  for (auto const &entry : flows) {
     add_flow(entry, totals);
   }
-  for (auto const &statistics : connection.port_statistics(openflow::kAnyPort, deadline)) {
+  for (auto const &statistics : ports) {
     auto const known = numbers.find(statistics.port);
     if (known != numbers.end()) {
       add_device(statistics, known->second, totals);

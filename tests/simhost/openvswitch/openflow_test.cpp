@@ -417,13 +417,36 @@ TEST(OpenFlow, IsAskedForSeveralThingsAtOnce) {
     tables.push_back(entry.flow.table);
   }
   EXPECT_THAT(tables, testing::ElementsAre(7, 5));
-  std::vector<FlowMonitor> const monitors{{.number = 1, .filter = {6}},
-                                          {.number = 2, .filter = {5}}};
+  std::vector<FlowMonitor> const monitors{
+      {.number = 1, .filter = {6}},
+      {.number = 2, .filter = {7}, .present = PresentFlows::untold},
+      {.number = 3, .filter = {5}}};
   tables.clear();
   for (auto const &update : connection.monitor_flows(monitors, soon())) {
     tables.push_back(update.flow.table);
   }
   EXPECT_THAT(tables, testing::ElementsAre(6, 5));
+}
+
+TEST(OpenFlow, TellsAllThatThereIsOnceItIsFollowed) {
+  Bridge const bridge(2);
+  Connection connection(bridge.socket(), soon());
+  connection.change(to_add(sample_groups(), {Flow{5}, Flow{6}}), soon());
+  auto const all =
+      connection.follow({.group_and_meter_changes = true}, of_table_5(OwnChanges::told), soon());
+  ASSERT_EQ(all.monitored.size(), 1);
+  EXPECT_EQ(all.monitored[0].flow, Flow{5});
+  ASSERT_EQ(all.flows.size(), 2);
+  EXPECT_EQ(all.groups.size(), sample_groups().size());
+  // The bridge has one of its own name.
+  EXPECT_EQ(all.ports.size(), 3);
+  EXPECT_EQ(all.port_statistics.size(), 3);
+
+  Connection other(bridge.socket(), soon());
+  other.change({FlowChange{FlowCommand::remove, Flow{5}}}, soon());
+  EXPECT_EQ(std::get<FlowUpdate>(next_event(connection)).event, FlowUpdate::Event::removed);
+  other.change({GroupChange{GroupCommand::remove, Group{kAllGroups}}}, soon());
+  EXPECT_TRUE(std::holds_alternative<GroupsOrMetersChanged>(next_event(connection)));
 }
 
 TEST(OpenFlow, MonitorsFlows) {

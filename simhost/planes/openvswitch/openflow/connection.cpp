@@ -311,6 +311,36 @@ std::vector<Item> Connection::ask(Put const &put, Take const &take, Deadline dea
       take, deadline);
 }
 
+Contents Connection::follow(AsyncMessages const &wanted, std::span<FlowMonitor const> monitors,
+                            Deadline deadline) {
+  Writer out;
+  auto const begin = next_xid();
+  put_set_async(out, begin, wanted);
+  put_barrier_request(out, begin);
+  for (auto const &monitor : monitors) {
+    put_flow_monitor_request(out, next_xid(), monitor);
+  }
+  auto const flows = next_xid();
+  put_flows_request(out, flows, MultipartType::flows, {});
+  auto const groups = next_xid();
+  put_groups_request(out, groups, MultipartType::groups, kAllGroups);
+  auto const ports = next_xid();
+  put_ports_request(out, ports, MultipartType::ports, kAnyPort);
+  auto const statistics = next_xid();
+  put_ports_request(out, statistics, MultipartType::port_statistics, kAnyPort);
+  send(out);
+  wait_for_reply(begin, deadline);
+  Contents all;
+  for (auto monitor = begin + 1; monitor != flows; ++monitor) {
+    take_items(monitor, take_flow_update, all.monitored, deadline);
+  }
+  take_items(flows, take_flow, all.flows, deadline);
+  take_items(groups, take_group, all.groups, deadline);
+  take_items(ports, take_port_description, all.ports, deadline);
+  take_items(statistics, take_port_statistics, all.port_statistics, deadline);
+  return all;
+}
+
 std::vector<FlowEntry> Connection::flows(FlowFilter const &filter, Deadline deadline) {
   return flows_of(std::span(&filter, 1), deadline);
 }
@@ -367,12 +397,7 @@ std::vector<GroupStatistics> Connection::group_statistics(Deadline deadline) {
 
 std::vector<FlowUpdate> Connection::monitor_flows(std::span<FlowMonitor const> monitors,
                                                   Deadline deadline) {
-  return ask_each<FlowUpdate>(
-      monitors,
-      [](Writer &out, Xid xid, FlowMonitor const &monitor) {
-        put_flow_monitor_request(out, xid, monitor.number, monitor.filter, monitor.own);
-      },
-      take_flow_update, deadline);
+  return ask_each<FlowUpdate>(monitors, put_flow_monitor_request, take_flow_update, deadline);
 }
 
 void Connection::cancel_monitor(std::uint32_t monitor, Deadline deadline) {

@@ -67,6 +67,10 @@ class Connection {
   // What is asked of several things is sent at once: Open vSwitch looks at all of its devices
   // before it listens to a connection again.
 
+  /// From now on it sends these by itself, and each change of flows as monitor_flows() says.
+  /// Returns all that there is.
+  Contents follow(AsyncMessages const &wanted, std::span<FlowMonitor const> monitors,
+                  Deadline deadline);
   std::vector<FlowEntry> flows(FlowFilter const &filter, Deadline deadline);
   /// Of one filter after the other.
   std::vector<FlowEntry> flows_of(std::span<FlowFilter const> filters, Deadline deadline);
@@ -75,7 +79,8 @@ class Connection {
   std::vector<PortDescription> ports(Deadline deadline);
   std::vector<GroupEntry> groups(Deadline deadline);
   std::vector<GroupStatistics> group_statistics(Deadline deadline);
-  /// From now on each change of such flows, its own too, is an event. Returns what there is.
+  /// From now on each change of such flows, its own too, is an event. Returns what there is, as far
+  /// as that is to be told.
   std::vector<FlowUpdate> monitor_flows(std::span<FlowMonitor const> monitors, Deadline deadline);
   /// Ends one that there is. For others Open vSwitch has no reply that tells what it is about.
   void cancel_monitor(std::uint32_t monitor, Deadline deadline);

@@ -122,6 +122,15 @@ struct FlowUpdate : ReadFlow {
   FlowRemoved::Reason reason{};  // of a removal
 };
 
+/// What a switch has, and what it counted.
+struct Contents {
+  std::vector<FlowUpdate> monitored;  ///< what monitors begin with
+  std::vector<FlowEntry> flows;
+  std::vector<GroupEntry> groups;
+  std::vector<PortDescription> ports;
+  std::vector<PortStatistics> port_statistics;
+};
+
 /// Somebody else changed groups or meters; how, is to be asked.
 struct GroupsOrMetersChanged {};
 

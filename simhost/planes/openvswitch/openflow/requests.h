@@ -31,12 +31,15 @@ struct PacketOut {
 
 /// Whether a monitor says what a change of its own connection changed.
 enum class OwnChanges { untold, told };
+/// Whether it begins with the flows that there are.
+enum class PresentFlows { untold, told };
 
 /// Flows of which each change is told.
 struct FlowMonitor {
   std::uint32_t number;  // of one's own
   FlowFilter filter;
   OwnChanges own = OwnChanges::untold;
+  PresentFlows present = PresentFlows::told;
 };
 
 /// Messages that a switch sends by itself.

@@ -14,8 +14,9 @@ constexpr std::uint16_t kAtomic = 1;
 constexpr std::uint16_t kOrdered = 2;
 constexpr std::uint8_t kAddMonitor = 0;
 constexpr std::uint8_t kRemoveMonitor = 2;
-// What is there, what is added, removed and modified, with instructions.
-constexpr std::uint16_t kMonitorAll = 0x1f;
+constexpr std::uint16_t kMonitorPresent = 0x1;
+// What is added, removed and modified, with instructions.
+constexpr std::uint16_t kMonitorChanges = 0x1e;
 // Changes of the connection's own are not cut short.
 constexpr std::uint16_t kMonitorOwn = 0x40;
 
@@ -245,10 +246,12 @@ void put_meters_request(Writer &out, Xid xid) {
   });
 }
 
-void put_flow_monitor_request(Writer &out, Xid xid, std::uint32_t monitor, FlowFilter const &filter,
-                              OwnChanges own) {
-  auto const flags = own == OwnChanges::told ? kMonitorAll | kMonitorOwn : kMonitorAll;
-  put_monitor(out, xid, monitor, kAddMonitor, static_cast<std::uint16_t>(flags), filter);
+void put_flow_monitor_request(Writer &out, Xid xid, FlowMonitor const &monitor) {
+  auto const flags = kMonitorChanges |
+                     (monitor.present == PresentFlows::told ? kMonitorPresent : 0U) |
+                     (monitor.own == OwnChanges::told ? kMonitorOwn : 0U);
+  put_monitor(out, xid, monitor.number, kAddMonitor, static_cast<std::uint16_t>(flags),
+              monitor.filter);
 }
 
 void put_flow_monitor_cancel(Writer &out, Xid xid, std::uint32_t monitor) {

@@ -41,8 +41,7 @@ void put_ports_request(Writer &out, Xid xid, MultipartType type, Port port);
 void put_groups_request(Writer &out, Xid xid, MultipartType type, GroupId group);
 /// All of them.
 void put_meters_request(Writer &out, Xid xid);
-void put_flow_monitor_request(Writer &out, Xid xid, std::uint32_t monitor, FlowFilter const &filter,
-                              OwnChanges own);
+void put_flow_monitor_request(Writer &out, Xid xid, FlowMonitor const &monitor);
 void put_flow_monitor_cancel(Writer &out, Xid xid, std::uint32_t monitor);
 
 }  // namespace simhost::openflow
