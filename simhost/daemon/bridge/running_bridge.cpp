@@ -42,6 +42,10 @@ bool is_marker(openflow::FlowEntry const &entry) {
   return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
 }
 
+bool is_gate(openflow::FlowEntry const &entry) {
+  return entry.foreign.empty() && entry.flow == gate();
+}
+
 // Of all tables but one: what is there is recent for a second, and much.
 std::vector<openflow::FlowMonitor> monitors() {
   using openflow::OwnChanges;
@@ -122,6 +126,7 @@ void RunningBridge::take(openflow::Contents contents) {
     change_ = marker->flow.cookie;
     flows.erase(marker);
   }
+  is_closed_ = std::erase_if(flows, is_gate) > 0;
   auto present = openvswitch::present_of(flows, contents.groups);
   unplaced_ = std::move(present.unplaced);
   have(std::make_shared<openvswitch::Compiled const>(openvswitch::Compiled{
@@ -301,6 +306,10 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
   if (change_ != change) {
     changes.emplace_back(openflow::FlowChange{.command = FlowCommand::add,
                                               .flow = openvswitch::generation_marker(change)});
+  }
+  if (std::exchange(is_closed_, false)) {
+    changes.emplace_back(
+        openflow::FlowChange{.command = FlowCommand::remove_strict, .flow = gate()});
   }
   if (!changes.empty()) {
     auto const forget_it = forget ? [&] { return forget(name_, change); } : std::function<bool()>();

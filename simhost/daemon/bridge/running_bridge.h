@@ -123,6 +123,7 @@ class RunningBridge {
   std::set<std::string> aggregated_;  // devices that are in groups
   openvswitch::Deadline counted_{};
   std::size_t added_ahead_ = 0;  // of flows and groups, before what it has was read
+  bool is_closed_ = false;       // by gate()
   Meters meters_;
   events::Loop::Watch watch_;
   events::Loop::Timer next_events_;

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <future>
+#include <limits>
 #include <span>
 #include <vector>
 
@@ -18,32 +19,23 @@ using openflow::Flow;
 using openvswitch::Deadline;
 using openvswitch::Lives;
 
-constexpr std::size_t kConnections = 8;
+// It accepts one in each turn, so that more of them begin too late.
+constexpr std::size_t kConnections = 16;
 // To connect takes longer than one connection takes for fewer.
 constexpr std::size_t kMany = 1000;
-
-std::span<Flow const> unreached(std::span<Flow const> all) {
-  // They are in the order of their tables.
-  static_assert(openvswitch::table::kAdmission == 0);
-  auto const first =
-      std::ranges::upper_bound(all, openvswitch::table::kAdmission, {}, &Flow::table);
-  return {first, all.end()};
-}
 
 bool is_bare(Connection &connection, Deadline deadline) {
   return connection.aggregate({}, deadline).flows == 0 && connection.groups(deadline).empty();
 }
 
-void add_groups(Connection &connection, std::span<openflow::Group const> groups,
-                Deadline deadline) {
-  Changes changes;
+void add_gate_and_groups(Connection &connection, std::span<openflow::Group const> groups,
+                         Deadline deadline) {
+  Changes changes{openflow::FlowChange{.flow = gate()}};
   for (auto const &group : groups) {
     changes.emplace_back(
         openflow::GroupChange{.command = openflow::GroupCommand::add, .group = group});
   }
-  if (!changes.empty()) {
-    connection.change(changes, deadline);
-  }
+  connection.change(changes, deadline);
 }
 
 void add_flows(std::filesystem::path const &socket, std::span<Flow const> flows, Deadline deadline,
@@ -58,15 +50,22 @@ void add_flows(std::filesystem::path const &socket, std::span<Flow const> flows,
 
 }  // namespace
 
+openflow::Flow gate() {
+  Flow flow;
+  flow.table = openvswitch::table::kAdmission;
+  flow.priority = std::numeric_limits<std::uint16_t>::max();
+  return flow;
+}
+
 std::size_t add_unreached(Connection &connection, std::filesystem::path const &socket,
                           openvswitch::Compiled const &wanted, Deadline deadline,
                           Lives const &lives) {
-  auto const flows = unreached(wanted.flows);
+  std::span const flows(wanted.flows);
   if (flows.size() < kMany || !is_bare(connection, deadline)) {
     return 0;
   }
   // First, as flows lead to them.
-  add_groups(connection, wanted.groups, deadline);
+  add_gate_and_groups(connection, wanted.groups, deadline);
   auto const share = (flows.size() + kConnections - 1) / kConnections;
   std::vector<std::future<void>> shares;
   for (std::size_t first = 0; first < flows.size(); first += share) {

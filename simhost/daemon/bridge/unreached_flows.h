@@ -9,10 +9,13 @@
 
 namespace simhost::daemon {
 
-/// Adds all groups, and all flows but those by which frames come in, to a bridge that has neither
-/// flows nor groups and is to have many; `socket` is the bridge's own. So nothing passes until the
-/// rest is there, which is no matter of this. Returns how many it added: all or none, unless it
-/// throws std::runtime_error. For `lives` see openvswitch::Stream.
+/// Drops whatever comes in.
+openflow::Flow gate();
+
+/// Adds all groups and flows, and gate(), to a bridge that has neither flows nor groups and is to
+/// have many; `socket` is the bridge's own. So nothing passes until the gate goes, which is no
+/// matter of this. Returns how many it added, the gate not counted: all or none, unless it throws
+/// std::runtime_error. For `lives` see openvswitch::Stream.
 std::size_t add_unreached(openflow::Connection &connection, std::filesystem::path const &socket,
                           openvswitch::Compiled const &wanted, openvswitch::Deadline deadline,
                           openvswitch::Lives const &lives = {});

@@ -44,20 +44,30 @@ struct ABridge : testing::Test {
   openflow::Connection connection;
 };
 
-TEST_F(ABridge, HasAllButWhatLetsFramesIn) {
+TEST_F(ABridge, HasAllAndAGate) {
   auto const wanted = switch_of(150);
   auto const added = add(wanted);
-  std::vector<std::string> flows;
+  std::vector<std::string> flows{to_text(gate())};
   for (auto const &flow : wanted.flows) {
-    if (flow.table != 0) {
-      flows.push_back(to_text(flow));
-    }
+    flows.push_back(to_text(flow));
   }
   std::ranges::sort(flows);
   ASSERT_GT(flows.size(), 1000U);
   EXPECT_EQ(bridge.flows(), flows);
   EXPECT_EQ(bridge.groups().size(), wanted.groups.size());
-  EXPECT_EQ(added, flows.size() + wanted.groups.size());
+  EXPECT_EQ(added, wanted.flows.size() + wanted.groups.size());
+}
+
+// Whatever wanted flows let in, and with whatever priority.
+TEST_F(ABridge, LetsNothingInThroughTheGate) {
+  auto const wanted = switch_of(150);
+  add(wanted);
+  for (auto const &flow : wanted.flows) {
+    EXPECT_TRUE(flow.table != gate().table || flow.priority < gate().priority) << to_text(flow);
+  }
+  auto const traced = openvswitch::Lab::shared().ovs_appctl(
+      {"ofproto/trace", bridge.name(), "in_port=10,dl_type=0x88b5"});
+  EXPECT_THAT(traced, testing::HasSubstr("0. priority 65535\n    drop\n"));
 }
 
 TEST_F(ABridge, IsLeftAloneIfFramesMayPassAlready) {
