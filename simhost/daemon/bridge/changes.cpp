@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "planes/openvswitch/compile/compile.h"
 #include "planes/openvswitch/compile/pipeline.h"
 
 namespace simhost::daemon {
@@ -11,6 +12,10 @@ using openflow::Flow;
 using openflow::FlowCommand;
 using openflow::Group;
 using openflow::GroupCommand;
+
+bool is_marker(openflow::FlowEntry const &entry) {
+  return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
+}
 
 void add_changes(openvswitch::Difference const &difference, openflow::Changes &changes) {
   auto const change_group = [&](GroupCommand command, Group const &group) {

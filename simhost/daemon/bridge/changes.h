@@ -7,10 +7,13 @@
 #include <vector>
 
 #include "planes/openvswitch/openflow/change.h"
+#include "planes/openvswitch/openflow/replies.h"
 #include "planes/openvswitch/reconcile/difference.h"
 
 namespace simhost::daemon {
 
+/// Whether a flow says which generation of the bridge is in force, and nothing else.
+bool is_marker(openflow::FlowEntry const &entry);
 /// In the order in which nothing refers to what is not there.
 void add_changes(openvswitch::Difference const &difference, openflow::Changes &changes);
 /// All that the bridge learned goes: before anything that teaches it otherwise.

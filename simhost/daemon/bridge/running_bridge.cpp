@@ -12,6 +12,7 @@
 #include "daemon/bridge/cached_flows.h"
 #include "daemon/bridge/changes.h"
 #include "daemon/bridge/made_bridge.h"
+#include "daemon/bridge/restoring.h"
 #include "daemon/bridge/unreached_flows.h"
 #include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/reconcile/present.h"
@@ -36,10 +37,6 @@ openflow::Connection connected(WantedBridge const &wanted, Place const &place, D
   auto const socket = socket_of(wanted, place.folder);
   require_made(wanted, socket);
   return {socket, deadline, place.lives};
-}
-
-bool is_marker(openflow::FlowEntry const &entry) {
-  return entry.foreign.empty() && entry.flow == openvswitch::generation_marker(entry.flow.cookie);
 }
 
 bool is_gate(openflow::FlowEntry const &entry) {
@@ -313,8 +310,16 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
   }
   if (!changes.empty()) {
     auto const forget_it = forget ? [&] { return forget(name_, change); } : std::function<bool()>();
-    change_and_forget(connection_, changes, change_ != change,
-                      size_of(difference) > 0 ? forget_it : nullptr, deadline);
+    try {
+      change_and_forget(connection_, changes, change_ != change,
+                        size_of(difference) > 0 ? forget_it : nullptr, deadline);
+    } catch (openflow::HalfMade const &) {
+      restore(connection_, *flows_, change_.value_or(0), deadline);
+      if (forget) {
+        forget(name_, change_.value_or(0));
+      }
+      throw;
+    }
     have(wanted.flows);
     change_ = change;
     follow_events();

@@ -10,6 +10,7 @@
 #include "lab.h"
 #include "planes/openvswitch/openflow/codec/requests.h"
 #include "planes/openvswitch/openflow/connection.h"
+#include "planes/openvswitch/openflow/form.h"
 #include "planes/openvswitch/openflow/text.h"
 #include "samples.h"
 
@@ -192,6 +193,86 @@ TEST(OpenFlow, MakesNoneOfTheChangesIfOneIsRefusedAtTheCommit) {
             "OFPGMFC_GROUP_EXISTS: the group exists");
   EXPECT_EQ(bridge.flows(), std::vector<std::string>());
   EXPECT_EQ(bridge.groups(), std::vector<std::string>());
+}
+
+// The commit is not held back, as the switch took such changes before.
+TEST(OpenFlow, MakesNoneOfTheChangesIfOneOfAKnownFormIsRefusedAtTheCommit) {
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  Group const group{1};
+  auto const to_group = flow_of_table(1, {ToGroup{1}});
+  connection.change({GroupChange{GroupCommand::add, group}, FlowChange{FlowCommand::add, Flow{2}},
+                     FlowChange{FlowCommand::add, to_group}},
+                    soon());
+  connection.change(
+      {GroupChange{GroupCommand::remove, group}, FlowChange{FlowCommand::remove, Flow{kAllTables}}},
+      soon());
+  EXPECT_EQ(bridge.flows(), std::vector<std::string>());
+  EXPECT_EQ(words_of_refusal(connection, to_add({}, {Flow{2}, to_group}), 1),
+            "the switch refuses to add flow table=1, actions=group:1: "
+            "OFPBAC_BAD_OUT_GROUP: the group of an action does not exist");
+  EXPECT_EQ(bridge.flows(), std::vector<std::string>());
+}
+
+TEST(OpenFlow, MakesNoneOfTheChangesIfOneOfAKnownFormNeedsAMeterThatIsGone) {
+  constexpr std::uint32_t kMeter = 7;
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  connection.have_meters({{kMeter, 1}}, soon());
+  auto const changes = to_add({}, {Flow{2}, flow_of_table(1, {ToMeter{kMeter}, Output{1}})});
+  connection.change(changes, soon());
+  connection.change({FlowChange{FlowCommand::remove, Flow{kAllTables}}}, soon());
+  connection.have_meters({}, soon());
+  EXPECT_THROW(connection.change(changes, soon()), ChangeRefused);
+  EXPECT_EQ(bridge.flows(), std::vector<std::string>());
+}
+
+// A flow that says a number wherever a form leaves it out.
+Flow flow_that_says(Field field, Value value) {
+  auto flow = flow_of_table(1, {Learn{.table = 2, .specs = {LearnedMatch{whole(field), value}}}});
+  flow.match.with(field, value);
+  if (field != Field::in_port) {
+    flow.actions.emplace_back(set(field, value));
+  }
+  return flow;
+}
+
+std::vector<Flow> flows_with_numbers_that_forms_leave_out() {
+  std::vector<Field> fields{Field::metadata, Field::tun_id, Field::eth_src, Field::eth_dst};
+  for (unsigned number = 0; number < 16; ++number) {
+    fields.push_back(reg(number));
+  }
+  std::vector<Flow> flows;
+  for (auto const field : fields) {
+    for (auto const value : {Value{0}, Value{1}, ones(info(field).bits)}) {
+      flows.push_back(flow_that_says(field, value));
+    }
+  }
+  for (std::uint16_t const vlan : {0, 1, 4094, 4095}) {
+    auto &flow = flows.emplace_back(
+        flow_of_table(1, {set(Field::vlan_vid, kVlanPresent | vlan), Output{1}}));
+    flow.match.vlan(vlan);
+  }
+  for (Port const port : {Port{1}, Port{2}, kLastOwn}) {
+    auto &flow = flows.emplace_back(flow_of_table(1, {Output{port}}));
+    flow.match.with(Field::in_port, port);
+  }
+  for (auto const cookie : {std::uint64_t{1}, ~std::uint64_t{1}}) {
+    auto &flow = flows.emplace_back(flow_of_table(1, {Learn{.table = 2, .cookie = cookie}}));
+    flow.cookie = cookie;
+  }
+  return flows;
+}
+
+TEST(OpenFlow, TakesAnyOfTheNumbersThatFormsLeaveOut) {
+  Bridge const bridge;
+  for (auto const &flow : flows_with_numbers_that_forms_leave_out()) {
+    // It knows no forms, so that what the switch says to each is heard.
+    Connection connection(bridge.socket(), soon());
+    EXPECT_NO_THROW(connection.change(to_add({}, {flow}), soon())) << to_text(flow);
+    EXPECT_EQ(connection.flows({1}, soon()).at(0).flow, flow) << to_text(flow);
+    connection.change({FlowChange{FlowCommand::remove, Flow{kAllTables}}}, soon());
+  }
 }
 
 TEST(OpenFlow, ChangesNothingThroughAClientThatDiesBeforeTheCommit) {

@@ -7,6 +7,8 @@
 
 #include <array>
 #include <functional>
+#include <initializer_list>
+#include <string>
 
 #include "peer.h"
 #include "planes/openvswitch/openflow/codec/foreign.h"
@@ -90,6 +92,48 @@ TEST(Switch, IsToldThatSomebodyIsThere) {
     connection.barrier(soon());
   }
   EXPECT_THAT(peer.heard(), HasSubstr(message(3, 9, 6, 10) + "ab"));
+}
+
+// Its replies to requests of these numbers: to what controls a bundle, and to a change that it
+// refuses for its command.
+std::string controlled(std::initializer_list<char> numbers) {
+  constexpr char kBundleControl = 33;
+  std::string said;
+  for (auto const number : numbers) {
+    said += message(kBundleControl, number);
+  }
+  return said;
+}
+std::string refused(char number) {
+  return message(1, number, 6, 12) + std::string{0, 5, 0, 6};
+}
+
+// Four messages for a bundle of one change: what opens it, the change, what closes it, the commit.
+TEST(Switch, IsWaitedForBeforeTheCommitOnlyWhereAFormIsNew) {
+  Peer const peer(hello() + controlled({4, 5, 9, 13}));
+  openflow::Connection connection(peer.socket(), soon());
+  auto const change_flow = [&](openflow::Flow const &flow, Deadline deadline) {
+    connection.change({openflow::FlowChange{.flow = flow}}, deadline);
+  };
+  change_flow({.cookie = 1}, soon());
+  change_flow({.cookie = 2}, soon());
+  EXPECT_THROW(change_flow({.cookie = 3, .actions = {openflow::Output{1}}}, Deadline::clock::now()),
+               TimedOut);
+}
+
+TEST(Switch, ThatRefusesWhatItTookBeforeIsNotTrustedInThat) {
+  Peer const peer(hello() + controlled({4, 5}) + refused(7) + controlled({8, 9}) + refused(11) +
+                  controlled({12, 13}));
+  openflow::Connection connection(peer.socket(), soon());
+  auto const change_flow = [&](std::uint64_t cookie) {
+    connection.change({openflow::FlowChange{.flow = {.cookie = cookie}}}, soon());
+  };
+  change_flow(1);
+  EXPECT_EQ(words_of<openflow::HalfMade>([&] { change_flow(2); }),
+            "the switch makes some changes, but refuses to add flow cookie=0x2, actions=drop: "
+            "OFPFMFC_BAD_COMMAND: the command is unknown");
+  // No form is known any more: it discards what is refused.
+  EXPECT_THROW(change_flow(3), openflow::ChangeRefused);
 }
 
 TEST(Switch, ThatSaysNothingIsNotWaitedForForEver) {

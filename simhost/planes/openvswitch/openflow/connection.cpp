@@ -216,19 +216,21 @@ void Connection::set_async(AsyncMessages const &wanted, Deadline deadline) {
   order([&](Writer &out, Xid xid) { put_set_async(out, xid, wanted); }, deadline);
 }
 
-std::optional<ErrorReply> Connection::wait_for_errors(Xid first, Xid last, Deadline deadline) {
-  std::optional<ErrorReply> error;
+Connection::Outcome Connection::wait_for_outcome(Xid first, Xid last, Deadline deadline) {
+  Outcome outcome;
   while (true) {
     auto const message = wait_for_message(deadline);
     if (is_handled(message, first, last)) {
       continue;
     }
     auto const header = header_of(message);
-    if (header.type == MessageType::error && !error) {
-      error = error_of(message);
+    bool const is_error = header.type == MessageType::error;
+    if (is_error && !outcome.error) {
+      outcome.error = error_of(message);
     }
     if (header.xid == last) {
-      return error;
+      outcome.is_refused = is_error;
+      return outcome;
     }
   }
 }
@@ -248,25 +250,40 @@ void Connection::change(Changes const &changes, Deadline deadline,
   for (auto const &change : changes) {
     put_bundle_add(out, next_xid(), bundle, change);
   }
-  send(out);
   // The reply to this comes after the errors of the changes; a commit that did not wait for it
-  // would make those that are no error.
-  control(bundle, BundleControl::close);
-  auto error = wait_for_errors(open, xid_, deadline);
-  control(bundle, error ? BundleControl::discard : BundleControl::commit);
+  // would make those that are no error. Each wait is a turn of Open vSwitch's loop.
+  put_bundle_control(out, next_xid(), bundle, BundleControl::close);
+  std::optional<ErrorReply> error;
+  bool const are_known = known_forms_.include(changes);
+  if (are_known) {
+    put_bundle_control(out, next_xid(), bundle, BundleControl::commit);
+    send(out);
+  } else {
+    send(out);
+    error = wait_for_outcome(open, xid_, deadline).error;
+    control(bundle, error ? BundleControl::discard : BundleControl::commit);
+  }
   if (!error && meanwhile) {
     meanwhile();
   }
-  auto const late_error = wait_for_errors(open, xid_, deadline);
-  if (!error && !late_error) {
+  auto const end = wait_for_outcome(open, xid_, deadline);
+  if (!error && !end.error) {
+    if (!are_known) {
+      known_forms_.add(changes);
+    }
     return;
   }
-  error = error ? error : late_error;
+  error = error ? error : end.error;
   auto const index = error->xid - open - 1;
   if (index >= changes.size()) {
     throw Refused(*error);
   }
-  throw ChangeRefused(index, to_text(changes[index]), *error);
+  auto const refused = to_text(changes[index]);
+  if (are_known && !end.is_refused) {
+    known_forms_ = {};
+    throw HalfMade(refused, *error);
+  }
+  throw ChangeRefused(index, refused, *error);
 }
 
 template <typename Item, typename Take>

@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "planes/openvswitch/openflow/change.h"
+#include "planes/openvswitch/openflow/form.h"
 #include "planes/openvswitch/openflow/replies.h"
 #include "planes/openvswitch/openflow/requests.h"
 #include "planes/openvswitch/transport/stream.h"
@@ -49,8 +50,9 @@ class Connection {
   // These wait. They throw Disconnected, TimedOut, Malformed and Refused.
 
   /// Makes all of the changes in their order, or none of them: throws ChangeRefused, which says
-  /// which one was refused. After TimedOut nobody knows whether they are made. Does `meanwhile`, if
-  /// that is anything, once the switch was told to make them and while it does.
+  /// which one was refused; or HalfMade, if the switch refuses what it took before in the same
+  /// form. After TimedOut nobody knows whether they are made. Does `meanwhile`, if that is
+  /// anything, once the switch was told to make them and while it does.
   void change(Changes const &changes, Deadline deadline,
               std::function<void()> const &meanwhile = nullptr);
   /// Returns when the switch is done with all that it was sent.
@@ -100,9 +102,12 @@ class Connection {
   bool is_handled(Message const &message, std::uint32_t first_xid, std::uint32_t last_xid);
   /// The reply to a request, or the error: throws Refused.
   Message wait_for_reply(std::uint32_t xid, Deadline deadline);
-  /// Takes replies to requests of these numbers until the last one's, and returns the first error.
-  std::optional<ErrorReply> wait_for_errors(std::uint32_t first, std::uint32_t last,
-                                            Deadline deadline);
+  struct Outcome {
+    std::optional<ErrorReply> error;  ///< the first one
+    bool is_refused = false;          ///< the last request
+  };
+  /// Takes replies to requests of these numbers until the last one's.
+  Outcome wait_for_outcome(std::uint32_t first, std::uint32_t last, Deadline deadline);
   void control(std::uint32_t bundle, BundleControl control);
   /// All items of a multipart reply.
   template <typename Item, typename Put, typename Take>
@@ -120,6 +125,7 @@ class Connection {
   std::deque<Event> events_;
   std::uint32_t xid_ = 0;
   std::uint32_t bundle_ = 0;
+  KnownForms known_forms_;
 };
 
 }  // namespace simhost::openflow

@@ -57,4 +57,13 @@ class ChangeRefused : public Refused {
   std::size_t index_;
 };
 
+/// The switch refuses a change, but made others that came with it.
+class HalfMade : public Refused {
+ public:
+  /// `change` is the text of what it refuses.
+  HalfMade(std::string const &change, ErrorReply const &error)
+      : Refused("the switch makes some changes, but refuses to " + change + ": " + to_text(error),
+                error) {}
+};
+
 }  // namespace simhost::openflow
