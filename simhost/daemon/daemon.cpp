@@ -115,7 +115,7 @@ void Daemon::count() {
   try {
     counting_.save();
   } catch (std::exception const &error) {
-    troubles_.add(error.what());
+    keep_nothing(error.what());
   }
   remember();
 }
@@ -148,10 +148,23 @@ void Daemon::remember() {
     // Those after it tell by the readings of a switch whether it has begun anew.
     if (!counting_.save() || !announced_.save() || !load_balance_.save() || !all_remembered) {
       remember_soon();
+    } else {
+      keep_nothing({});
     }
   } catch (std::exception const &error) {
-    troubles_.add(error.what());
+    keep_nothing(error.what());
   }
+}
+
+// Whoever is told of troubles is told of those of a look at all.
+void Daemon::keep_nothing(std::string const &why) {
+  if (std::exchange(why_nothing_is_kept_, why) == why) {
+    return;
+  }
+  if (!why.empty()) {
+    troubles_.add(why);
+  }
+  sync_soon();
 }
 
 void Daemon::remember_soon() {
@@ -429,7 +442,7 @@ void Daemon::tell_settled() {
       return;
     }
   } catch (std::exception const &error) {
-    troubles_.add(error.what());
+    keep_nothing(error.what());
   }
   next_telling_.end();
   settled_(in_force_, troubles_.text());
@@ -500,6 +513,9 @@ void Daemon::settle(Wanted const &wanted) {
   sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {
     troubles_.add(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
+  }
+  if (!why_nothing_is_kept_.empty()) {
+    troubles_.add(why_nothing_is_kept_);
   }
   reply_to_waiting();
   if (auto const ready = std::exchange(ready_, nullptr)) {

@@ -101,6 +101,9 @@ class Daemon {
   void age_by(Wanted const &wanted);
   void remember();
   void remember_soon();
+  // Until the state takes it, as a full disk does not, what was counted and seen waits here. That
+  // is over when nothing is said why.
+  void keep_nothing(std::string const &why);
   void balance();
   void look_at_wires();
   [[nodiscard]] Json groups(Json const &question) const;
@@ -152,6 +155,7 @@ class Daemon {
   events::Loop::Timer next_aging_;
   std::chrono::seconds shortest_aging_ = std::chrono::seconds::max();
   events::Loop::Timer next_remembering_;
+  std::string why_nothing_is_kept_;  // at the last attempt
   events::Loop::Timer next_telling_;
 };
 

@@ -44,13 +44,15 @@ struct Words {
   std::string host;
 };
 
-// The journal has times of its own.
+// The journal has times of its own. What cannot be said, as on a full disk, is no reason to end.
 void say(std::string const &text) {
+  std::string line;
   if (std::getenv("JOURNAL_STREAM") == nullptr) {
     auto const now = std::chrono::floor<std::chrono::seconds>(std::chrono::system_clock::now());
-    fmt::print(stderr, "{:%FT%TZ} ", fmt::gmtime(now));
+    line = fmt::format("{:%FT%TZ} ", fmt::gmtime(now));
   }
-  fmt::print(stderr, "simhostd: {}\n", text);
+  line += fmt::format("simhostd: {}\n", text);
+  std::fputs(line.c_str(), stderr);
 }
 
 void tell_ready(Words const &words) {
@@ -210,6 +212,8 @@ int run(int count, char **given) {
   }
   require_credentials(words);
   keep_memory();
+  // A file that may not grow is one that cannot be written to, as on a full disk.
+  std::signal(SIGXFSZ, SIG_IGN);
   serve(words);
   return 0;
 }

@@ -303,6 +303,12 @@ def started(host: Host) -> Host:
     return host
 
 
+def are_reported(lab: FabricLab) -> bool:
+    """Whether all hosts have told that the last change is in force."""
+    (fabric,) = lab.databases.rows("Fabric")
+    return all(row["in_force"] == fabric["revision"] for row in lab.databases.rows("Host"))
+
+
 def restored(host: Host, name: str) -> None:
     """Puts a copy of the state that was kept under a name in its place."""
     shutil.copy(host.folder / name, host.state)

@@ -11,7 +11,7 @@ from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
 
 import fabric_by_chance
 from fabric_by_chance import relay_of, revision
-from fabric_lab import FabricLab, Host, started
+from fabric_lab import FabricLab, Host, are_reported, started
 from frame_lab import comes_true
 from relays import FROM_HOST, TO_HOST
 
@@ -30,12 +30,6 @@ def two(lab: FabricLab) -> Tuple[Host, Host]:
     one.ctl("share", "lab")
     other.ctl("join", "lab")
     return one, other
-
-
-def are_reported(lab: FabricLab) -> bool:
-    """Whether all hosts have told that the last change is in force."""
-    (fabric,) = lab.databases.rows("Fabric")
-    return all(row["in_force"] == fabric["revision"] for row in lab.databases.rows("Host"))
 
 
 def calling(host: Host, mtu: int) -> "subprocess.Popen[str]":

@@ -1,0 +1,90 @@
+"""A state that takes nothing for a while, as on a full disk: frames go on, what they left behind is
+kept until it can be put there, and who asks is told."""
+
+import resource
+from pathlib import Path
+
+from counted_frames import BROADCAST, LENGTH, come_to, counters, send
+from fabric_lab import FabricLab, are_reported, started
+from frame_lab import Lab, comes_true
+
+FULL = "host.db cannot be read or written"
+SHARED = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
+
+
+def set_room(lab: Lab, size: int) -> None:
+    """No file that the daemon writes to becomes larger."""
+    assert lab.daemon is not None
+    _, most = resource.prlimit(lab.daemon.pid, resource.RLIMIT_FSIZE)
+    resource.prlimit(lab.daemon.pid, resource.RLIMIT_FSIZE, (size, most))
+
+
+def fill(lab: Lab) -> None:
+    """What the daemon puts into its state goes to the end of the log of that, which is larger than
+    the one of what it says."""
+    set_room(lab, Path(f"{lab.state}-wal").stat().st_size)
+
+
+def make_room(lab: Lab) -> None:
+    set_room(lab, resource.RLIM_INFINITY)
+
+
+def of_broadcasts(frames: int) -> object:
+    return {"pktsInBroadcast": frames, "bytesInBroadcast": frames * LENGTH}
+
+
+def test_what_is_counted_on_a_full_disk_is_there_when_it_has_room(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    send(one, 3, BROADCAST)
+    come_to(lambda: counters(lab, "a"), of_broadcasts(3))
+    fill(lab)
+    send(one, 2, BROADCAST)
+    assert comes_true(lambda: FULL in lab.plane()["said"])
+    assert FULL in lab.log()
+    come_to(lambda: counters(lab, "a"), of_broadcasts(5))
+    send(one, 1, BROADCAST)
+    for _ in range(6):
+        other.expect(lambda frame: frame[:6] == b"\xff" * 6)
+    make_room(lab)
+    assert comes_true(lambda: not lab.plane()["said"])
+    come_to(lambda: counters(lab, "a"), of_broadcasts(6))
+    lab.stop()
+    assert counters(lab, "a") == of_broadcasts(6)
+
+
+def test_a_daemon_goes_on_that_cannot_even_say_what_is_wrong(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    before = lab.log()
+    set_room(lab, 0)
+    send(one, 2, BROADCAST)
+    assert comes_true(lambda: FULL in lab.plane()["said"])
+    assert lab.log() == before
+    make_room(lab)
+    assert comes_true(lambda: not lab.plane()["said"])
+    come_to(lambda: counters(lab, "a"), of_broadcasts(2))
+
+
+def test_a_fabric_is_told_of_a_full_disk_and_when_it_has_room(tmp_path: Path) -> None:
+    with FabricLab(tmp_path) as lab:
+        one, other = started(lab.host("one", SHARED)), started(lab.host("two"))
+        one.ctl("share", "lab")
+        other.ctl("join", "lab")
+        client = one.client("lab", "a")
+
+        def troubles() -> str:
+            (row,) = lab.databases.rows("Host", name="one")
+            return str(dict(row["errors"][1]).get("frames", ""))
+
+        # What others have changed is to be in the state already.
+        assert comes_true(lambda: are_reported(lab)) and troubles() == ""
+        fill(one)
+        send(client, 4, BROADCAST)
+        assert comes_true(lambda: FULL in troubles()), one.log()
+        # A device that comes has the daemon look at all once more, and frames go on.
+        one.host.run("ip", "link", "add", "new", "type", "veth", "peer", "name", "newer")
+        come_to(lambda: counters(one, "a"), of_broadcasts(4))
+        assert FULL in one.plane()["said"]
+        make_room(one)
+        assert comes_true(lambda: troubles() == "")
+        other.client("lab", "a")
+        come_to(lambda: counters(other, "a"), of_broadcasts(4))
