@@ -220,6 +220,16 @@ def test_what_comes_back_wrapped_reaches_nobody(lab: Lab, collectors: Collectors
     client.expect_none(lambda came: b"back" in came)
 
 
+def port_a(lab: Lab) -> Dict[str, Any]:
+    (port,) = (
+        one
+        for switch in json.loads(lab.ctl("show", "--json"))["switches"]
+        for one in switch["ports"]
+        if one["id"] == "a" and switch["alias"] == "lab"
+    )
+    return dict(port)
+
+
 @pytest.mark.parametrize(
     "said, why",
     [
@@ -234,10 +244,54 @@ def test_what_cannot_be_is_refused(lab: Lab, said: Dict[str, Any], why: str) -> 
     document = {"switches": [{"alias": "lab", "ports": ports}]}
     refused = lab.try_ctl("apply", "-", given=json.dumps(document))
     assert refused.returncode != 0 and f"the mirror session 's' {why}" in refused.stdout
-    (port,) = (
-        one
-        for switch in json.loads(lab.ctl("show", "--json"))["switches"]
-        for one in switch["ports"]
-        if one["id"] == "a" and switch["alias"] == "lab"
-    )
-    assert "mirror_sessions" not in port
+    assert "mirror_sessions" not in port_a(lab)
+
+
+# The record of such a session, a call that appends it, and what it returns.
+APPENDS = """
+import _libvswitch as vs
+table = vs.alloc_dvmirror_session_table(1, 1)
+vs.DVMirrorSessionTable_version_set(table, vs.VS_DVMIRROR_VERSION_V3)
+session = vs.DVMirrorSessionTable___getitem__(table, 0)
+vs.DVMirrorSession_sid_set(session, "s")
+vs.DVMirrorSession_type_set(session, vs.VS_DVMIRROR_SESSIONTYPE_ERMIRROR_SRC)
+vs.DVMirrorSession_numDstEntities_set(session, 1)
+entity = vs.DVMirrorSessionTable_get_first_session_entity(table, 0)
+vs.DVMirrorEntity_type_set(entity, vs.MIRROR_ENTTYPE_IP)
+vs.DVMirrorEntity_set_entity(entity, "{address}")
+print(vs.VSDVS_AppendDVMirrorSessions("lab", "a", table) == vs.{status})
+"""
+ASSIGNS = """
+from libvswitch.errors import HostError
+from vswitch import Host, Mirror, MirrorEnd
+port = Host().switches["lab"].ports["a"]
+try:
+    port.mirrors += (Mirror("s", type="encapsulated", to=(MirrorEnd(ip="{address}"),)),)
+    print("assigned")
+except HostError as error:
+    print(type(error).__name__, error)
+"""
+OF_IPV6 = "2001:db8::7"
+NOT_OF_IPV6 = "mirrors to an address of IPv6, or over an underlay of IPv6, which is not done here"
+
+
+@pytest.mark.parametrize(
+    "underlay, address",
+    [(UNDERLAY, OF_IPV6), ({"device": "under", "address": "2001:db8::1/64"}, ONE)],
+)
+def test_collectors_of_ipv6_are_refused_however_one_asks(
+    lab: Lab, collectors: Collectors, underlay: Dict[str, str], address: str
+) -> None:
+    lab.client("lab", "a")
+    lab.apply({"underlay": underlay})
+    before = lab.plane()["change"]
+    assert lab.python(APPENDS.format(address=address, status="QEX_NOT_SUPPORTED")) == "True\n"
+    assert lab.python(ASSIGNS.format(address=address)).startswith("NotSupported ")
+    ports = [{"id": "a", "mirror_sessions": [session(to=to(address))]}]
+    document = {"switches": [{"alias": "lab", "ports": ports}]}
+    refused = lab.try_ctl("apply", "-", given=json.dumps(document))
+    assert refused.returncode == 1
+    why = f"the mirror session 's' {NOT_OF_IPV6} (QEX_NOT_SUPPORTED)"
+    assert why in refused.stdout
+    assert lab.plane()["change"] == before
+    assert "mirror_sessions" not in port_a(lab)
