@@ -164,7 +164,7 @@ Json Daemon::counters(Json const &question) {
   }
   count_of(owner.switch_key);
   storage::ReadingTransaction transaction(store_);
-  counting_.follow(transaction);
+  counting_.forget_removed(transaction);
   Json values = Json::object();
   for (auto const &[name, value] : counting_.counters_of(transaction, owner)) {
     values[std::string(name)] = value;

@@ -16,6 +16,11 @@ void AnnouncedCounts::add(storage::SwitchKey key, std::uint64_t sent) {
   unsaved.last = events::Clock::now();
 }
 
+void AnnouncedCounts::follow(storage::Transaction &transaction) {
+  std::erase_if(unsaved_,
+                [&](auto const &one) { return !storage::has_readings(transaction, one.first); });
+}
+
 bool AnnouncedCounts::save() {
   if (unsaved_.empty()) {
     return true;

@@ -16,6 +16,9 @@ class AnnouncedCounts {
 
   /// So many packets of a switch went out just now.
   void add(storage::SwitchKey key, std::uint64_t sent);
+  /// Forgets what went out of switches without readings, which have begun anew: before new readings
+  /// hide that.
+  void follow(storage::Transaction &transaction);
   /// Puts into the state what is not there yet. Returns whether all of it is: nothing is put while
   /// somebody else writes, for whom frames are not to wait. Not within a transaction on the store.
   /// A switch without readings has begun anew: what went out before is counted nowhere.

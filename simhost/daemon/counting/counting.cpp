@@ -2,6 +2,7 @@
 #include "daemon/counting/counting.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "planes/stored/counters.h"
 #include "storage/running/readings.h"
@@ -122,15 +123,18 @@ std::vector<std::string> Counting::unsaved_sessions(SwitchKey key) const {
   return sessions;
 }
 
-bool Counting::follow(storage::Transaction &transaction) {
-  bool any = false;
+void Counting::forget_removed(storage::Transaction &transaction) {
   for (auto &[key, one] : switches_) {
     if (one.is_in_state && !storage::has_readings(transaction, key)) {
       one = {};
-      any = true;
+      has_forgotten_ = true;
     }
   }
-  return any;
+}
+
+bool Counting::follow(storage::Transaction &transaction) {
+  forget_removed(transaction);
+  return std::exchange(has_forgotten_, false);
 }
 
 bool Counting::save() {
@@ -140,7 +144,7 @@ bool Counting::save() {
   }
   bool const is_saved =
       storage::commit_if_free(store_, [this](storage::ChangingTransaction &transaction) {
-        follow(transaction);
+        forget_removed(transaction);
         remove_other_switches(transaction);
         for (auto const &[key, one] : switches_) {
           if (!one.is_saved()) {

@@ -35,7 +35,9 @@ class Counting {
   std::vector<std::string> unsaved_sessions(storage::SwitchKey key) const;
 
   /// Counters of the state may have been removed, and with them what was counted: then nothing is
-  /// left here either, and the next count() is the first one. Returns whether some were.
+  /// left here either, and the next count() is the first one.
+  void forget_removed(storage::Transaction &transaction);
+  /// Likewise. Returns whether some were since it was asked last.
   bool follow(storage::Transaction &transaction);
 
  private:
@@ -53,6 +55,7 @@ class Counting {
 
   storage::Store &store_;
   std::map<storage::SwitchKey, OfSwitch> switches_;
+  bool has_forgotten_ = false;  // what follow() has not told yet
 };
 
 }  // namespace simhost::daemon

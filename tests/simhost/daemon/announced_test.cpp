@@ -73,6 +73,19 @@ TEST_F(Announcements, AreNoneOfASwitchThatBeganAnew) {
   EXPECT_EQ(counters().of(counter_in(&VSRARPStats::rarpPktsSent)), 0U);
 }
 
+TEST_F(Announcements, AreNoneOfASwitchThatHasNewReadingsByNow) {
+  announced.add(key, 3);
+  {
+    ChangingTransaction transaction(store);
+    simhost::storage::remove_counters(transaction);
+    announced.follow(transaction);
+    simhost::storage::put_readings(transaction, key, {});
+    transaction.commit();
+  }
+  ASSERT_TRUE(announced.save());
+  EXPECT_EQ(counters().of(counter_in(&VSRARPStats::rarpPktsSent)), 0U);
+}
+
 TEST_F(Announcements, WentOutNoEarlierThanTheClockBegins) {
   announced.add(key, 1);
   std::this_thread::sleep_for(100ms);
