@@ -399,6 +399,9 @@ void Daemon::sync() {
   };
   auto all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
   bool const counts_anew = counting_.follow(transaction);
+  if (counts_anew) {
+    announced_.follow(transaction);
+  }
   transaction.commit();
   if (counts_anew) {
     bridges_->count();
