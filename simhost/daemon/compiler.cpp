@@ -17,11 +17,17 @@ CompiledSwitch const &Compiler::compile(storage::SwitchKey key, openvswitch::Net
   return kept.made;
 }
 
-void Compiler::forget_others() {
-  replaced_.clear();
-  std::erase_if(kept_, [](auto const &kept) { return !kept.second.is_asked_for; });
+void Compiler::begin() {
   for (auto &[key, kept] : kept_) {
     kept.is_asked_for = false;
+  }
+  has_begun_ = true;
+}
+
+void Compiler::forget_others() {
+  replaced_.clear();
+  if (std::exchange(has_begun_, false)) {
+    std::erase_if(kept_, [](auto const &kept) { return !kept.second.is_asked_for; });
   }
 }
 

@@ -24,8 +24,10 @@ class Compiler {
   /// What compile() makes of it: the same as the last time, if that is still so. Refuses as
   /// compile() does. Valid until the next call.
   CompiledSwitch const &compile(storage::SwitchKey key, openvswitch::Network network);
-  /// Forgets those that were not asked for since the last time, and what was made anew as it was
-  /// before: to be done when nobody waits, as that takes a part of what it took to make it.
+  /// Those that nobody asks for from now on are to be forgotten.
+  void begin();
+  /// Forgets them, and what was made anew as it was before: to be done when nobody waits, as that
+  /// takes a part of what it took to make it. Without begin() nobody had a chance to ask.
   void forget_others();
 
  private:
@@ -36,6 +38,7 @@ class Compiler {
 
   std::map<storage::SwitchKey, Kept> kept_;
   std::vector<Flows> replaced_;
+  bool has_begun_ = false;
 };
 
 }  // namespace simhost::daemon

@@ -430,7 +430,11 @@ void Daemon::sync() {
   announcer_.follow(all, memory_);
   follow_tunnels(all);
   settle(all);
-  counting_.save_new();
+  try {
+    counting_.save_new();
+  } catch (std::exception const &error) {
+    keep_nothing(error.what());
+  }
   tell_settled();
 }
 

@@ -256,6 +256,7 @@ std::uint64_t fingerprint(std::string_view text) {
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
                  std::string const &datapath, IsThere const &is_there, Compiler &compiler,
                  Complete const &complete) {
+  compiler.begin();
   Wanted wanted;
   wanted.change = storage::frames_change(transaction).value_or(0);
   wanted.most_announced =

@@ -44,7 +44,12 @@ TEST(TheCompiler, ForgetsSwitchesThatNobodyAsksFor) {
   Compiler compiler;
   std::weak_ptr const first = compiler.compile(kKey, network_of(2)).flows;
   compiler.forget_others();
+  EXPECT_FALSE(first.expired()) << "nobody had a chance to ask";
+  compiler.begin();
+  compiler.compile(kKey, network_of(2));
+  compiler.forget_others();
   EXPECT_FALSE(first.expired());
+  compiler.begin();
   compiler.forget_others();
   EXPECT_TRUE(first.expired());
 }
