@@ -12,6 +12,7 @@
 #include "daemon/bridge/cached_flows.h"
 #include "daemon/bridge/changes.h"
 #include "daemon/bridge/made_bridge.h"
+#include "daemon/bridge/patience.h"
 #include "daemon/bridge/restoring.h"
 #include "daemon/bridge/unreached_flows.h"
 #include "planes/openvswitch/compile/pipeline.h"
@@ -314,7 +315,8 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
       change_and_forget(connection_, changes, change_ != change,
                         size_of(difference) > 0 ? forget_it : nullptr, deadline);
     } catch (openflow::HalfMade const &) {
-      restore(connection_, *flows_, change_.value_or(0), deadline);
+      // Of the change's own time there may be too little left, and what is half would stay.
+      restore(connection_, *flows_, change_.value_or(0), soon());
       if (forget) {
         forget(name_, change_.value_or(0));
       }
