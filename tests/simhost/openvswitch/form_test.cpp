@@ -159,6 +159,7 @@ TEST(Form, IsAnotherOneForOtherActions) {
       {without_result},
       {from_frame},
       {Clone{{Output{1}}}},
+      {Clone{{Output{1}, Output{1}, Output{1}}}},
       {Clone{{}}, Output{1}},
       {CheckPacketLarger{1, bit(Field::reg1, 0)}},
       {CheckPacketLarger{1, bit(Field::reg2, 0)}},

@@ -116,11 +116,22 @@ Actions like(Actions const &actions) {
   return masked;
 }
 
+// With those of its clones.
+std::size_t count_of(Actions const &actions) {
+  auto count = actions.size();
+  for (auto const &action : actions) {
+    if (auto const *const clone = std::get_if<Clone>(&action)) {
+      count += count_of(clone->actions);
+    }
+  }
+  return count;
+}
+
 // Not exactly: one action more makes the form no other one, but twice as many do.
 char magnitude_of(Change const &change) {
   auto const *const of_flow = std::get_if<FlowChange>(&change);
   return of_flow == nullptr ? '\0'
-                            : static_cast<char>(std::bit_width(of_flow->flow.actions.size()));
+                            : static_cast<char>(std::bit_width(count_of(of_flow->flow.actions)));
 }
 
 FlowChange like(FlowChange const &change) {
