@@ -129,6 +129,19 @@ std::optional<int> status_of_ending(pid_t process) {
   return std::stoi(fields[kStatus]);
 }
 
+// It ends as soon as it runs again.
+bool is_killed(pid_t process) {
+  constexpr auto kKill = 1ULL << (SIGKILL - 1);
+  std::ifstream file("/proc/" + std::to_string(process) + "/status");
+  for (std::string line; std::getline(file, line);) {
+    if ((line.starts_with("SigPnd:") || line.starts_with("ShdPnd:")) &&
+        (std::stoull(line.substr(7), nullptr, 16) & kKill) != 0) {
+      return true;
+    }
+  }
+  return false;
+}
+
 struct Pipe {
   Descriptor read;
   Descriptor write;
@@ -183,9 +196,10 @@ void Process::read_life() {
     tell(how_it_ended(*status));
   } else {
     // Whoever has the number is told nothing by it any more.
-    auto const silent = owned(eventfd(0, EFD_CLOEXEC), "eventfd");
-    if (dup3(silent.number(), life_.number(), O_CLOEXEC) < 0) {
-      fail_with_errno("dup3");
+    Descriptor const silent(eventfd(0, EFD_CLOEXEC));
+    // Where there is none its end cannot be looked up either, and is told once it is gone.
+    if (silent) {
+      dup3(silent.number(), life_.number(), O_CLOEXEC);
     }
   }
 }
@@ -236,7 +250,8 @@ std::string Process::reap() {
 }
 
 bool is_ending(int process) {
-  return status_of_ending(process).has_value() || (::kill(process, 0) != 0 && errno == ESRCH);
+  return is_killed(process) || status_of_ending(process).has_value() ||
+         (::kill(process, 0) != 0 && errno == ESRCH);
 }
 
 void run(Command const &command) {
