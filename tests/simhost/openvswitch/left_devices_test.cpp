@@ -93,6 +93,11 @@ TEST(WhatASwitchLeavesBehind, IsRemovedByTheNextOneInItsFolder) {
   EXPECT_THAT(left_beside_next_one(), testing::UnorderedElementsAre("lo", "vs2", "ovs-netdev"));
   running.end(1s);
   EXPECT_THAT(left_beside_next_one(), testing::UnorderedElementsAre("lo", "vs2"));
+
+  // One that runs where its process is not seen.
+  auto const datapath = tap("ovs-netdev");
+  PrivateOpenVswitch const next(loop, own, Datapath::netdev, {});
+  EXPECT_THAT(network_devices(), testing::UnorderedElementsAre("lo", "vs2", "ovs-netdev"));
 }
 
 }  // namespace

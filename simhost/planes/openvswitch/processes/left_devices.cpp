@@ -74,10 +74,11 @@ std::set<std::string> network_devices() {
 
 std::set<std::string> devices_of_others(std::filesystem::path const &folder) {
   auto names = network_devices();
-  for (auto const &socket : sockets_of_bridges(folder)) {
+  auto const sockets = sockets_of_bridges(folder);
+  for (auto const &socket : sockets) {
     names.erase(socket.stem());
   }
-  if (!is_switch_running()) {
+  if (!sockets.empty() && !is_switch_running()) {
     names.erase(kDatapath);
   }
   return names;
@@ -107,7 +108,7 @@ bool is_switch_running() {
       return true;
     }
   }
-  return false;
+  return static_cast<bool>(error);
 }
 
 }  // namespace simhost::openvswitch
