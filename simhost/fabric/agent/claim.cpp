@@ -76,8 +76,11 @@ void Claim::insert_host(Cluster &cluster) const {
 }
 
 void Claim::take_over(Cluster &cluster, HostRow const &row) {
-  // Two that take the name from one another again and again would never end.
-  former_if_is_ours_ = spoke_ ? std::string() : row.session;
+  // Of two that took the name from one another again and again there would be no end: whoever spoke
+  // takes it from none but the first.
+  if (!spoke_) {
+    former_if_is_ours_ = row.session;
+  }
   auto operations = only_for({.host = speaker_.host, .session = row.session});
   operations.push_back({{"op", "update"},
                         {"table", "Host"},
