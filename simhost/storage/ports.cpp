@@ -89,18 +89,6 @@ std::string external_id_of(Transaction &transaction, PortNumber number) {
   return select.with(number).next() ? select.text(0) : std::string();
 }
 
-std::map<PortNumber, std::string> external_ids(Transaction &transaction, SwitchKey switch_key) {
-  Query select(transaction,
-               "SELECT number, external_id FROM port"
-               " WHERE switch = ? AND external_id IS NOT NULL");
-  std::map<PortNumber, std::string> all;
-  select.with(switch_key);
-  while (select.next()) {
-    all[PortNumber(select.number<std::uint32_t>(0))] = select.text(1);
-  }
-  return all;
-}
-
 bool set_external_id(ChangingTransaction &transaction, PortNumber number,
                      std::string_view external_id) {
   Change update(transaction, "UPDATE OR IGNORE port SET external_id = ? WHERE number = ?");

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <cstdint>
-#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -44,8 +43,6 @@ std::optional<Port> find_port_by_external_id(Transaction &transaction, SwitchKey
 std::optional<Port> next_port(Transaction &transaction, SwitchKey switch_key, PortNumber number);
 /// What another system calls the port; empty if none does.
 std::string external_id_of(Transaction &transaction, PortNumber number);
-/// Of each port of a switch that another system calls something.
-std::map<PortNumber, std::string> external_ids(Transaction &transaction, SwitchKey switch_key);
 /// False if another port of the switch is known by it.
 bool set_external_id(ChangingTransaction &transaction, PortNumber number,
                      std::string_view external_id);

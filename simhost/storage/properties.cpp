@@ -65,16 +65,6 @@ std::vector<NamedProperty> properties_of(Transaction &transaction, PropertyOwner
   });
 }
 
-std::vector<OwnedProperty> properties_of_ports(Transaction &transaction, SwitchKey key) {
-  Query select(transaction,
-               "SELECT type, value, name, port FROM property WHERE switch = ? AND scope = ?"
-               " ORDER BY ifnull(port, 0), name");
-  return select.with(key).with(PropertyScope::port).all([](Query const &row) {
-    return OwnedProperty{.port = PortNumber(row.number<std::uint32_t>(3)),
-                         .named = {.name = row.text(2), .property = property_at(row)}};
-  });
-}
-
 std::vector<PortProperty> port_properties(Transaction &transaction, SwitchKey key,
                                           std::string_view name) {
   Query select(transaction,

@@ -59,14 +59,6 @@ struct NamedProperty {
 /// The properties of an owner, in the order of their names.
 std::vector<NamedProperty> properties_of(Transaction &transaction, PropertyOwner const &owner);
 
-struct OwnedProperty {
-  PortNumber port;
-  NamedProperty named;
-};
-
-/// Those of all ports of a switch, in the order of their ports and then of their names.
-std::vector<OwnedProperty> properties_of_ports(Transaction &transaction, SwitchKey key);
-
 struct PortProperty {
   PortNumber port;
   std::vector<std::byte> value;

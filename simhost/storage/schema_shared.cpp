@@ -35,8 +35,8 @@ char const *const kCountedSchema = R"sql(
 )sql";
 
 char const *const kTouchedSchema = R"sql(
-  -- The names of what is shared that may have become other since its row of "shared" was put. Within
-  -- a statement that inserts or updates OR IGNORE would say nothing to the triggers.
+  -- The names of what is shared that may have become other since its row of "shared" was put. The
+  -- triggers say ON CONFLICT, as the OR of a statement that sets them off takes the place of theirs.
   CREATE TABLE touched (
     switch      TEXT NOT NULL,
     port        TEXT NOT NULL,
@@ -51,6 +51,10 @@ char const *const kTouchedSchema = R"sql(
       CROSS JOIN switch ON switch.key = port.switch
       CROSS JOIN shared ON shared.switch = switch.identifier AND shared.port = ''
       WHERE NOT port.is_uplink;
+
+  -- What was committed before there were triggers is looked at once.
+  INSERT INTO touched SELECT switch, port FROM shared;
+  INSERT INTO touched SELECT switch, port FROM shared_port WHERE true ON CONFLICT DO NOTHING;
 
   CREATE TRIGGER touched_by_added_switch AFTER INSERT ON switch
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN

@@ -43,14 +43,6 @@ std::vector<Shared> all_shared(Transaction &transaction) {
       .all(shared_at);
 }
 
-std::vector<Shared> all_shared(Transaction &transaction, std::string_view switch_identifier) {
-  return Query(transaction,
-               "SELECT switch, port, fabric, image, fits FROM shared WHERE switch = ?"
-               " ORDER BY port")
-      .with(switch_identifier)
-      .all(shared_at);
-}
-
 std::optional<Shared> find_shared(Transaction &transaction, SharedName const &name) {
   return Query(transaction,
                "SELECT switch, port, fabric, image, fits FROM shared WHERE switch = ? AND port = ?")

@@ -43,7 +43,6 @@ struct Shared {
 
 /// All of them, each switch before its ports.
 std::vector<Shared> all_shared(Transaction &transaction);
-std::vector<Shared> all_shared(Transaction &transaction, std::string_view switch_identifier);
 std::optional<Shared> find_shared(Transaction &transaction, SharedName const &name);
 /// Replaces what was there.
 void put_shared(ChangingTransaction &transaction, Shared const &shared);

@@ -1,9 +1,12 @@
 // What is shared, as rows of a state.
 #include "storage/shared.h"
 
+#include <SQLiteCpp/SQLiteCpp.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "state_files.h"
+#include "storage/ports.h"
 #include "storage/store.h"
 
 namespace simhost::storage {
@@ -52,6 +55,48 @@ TEST(WhatIsShared, IsOfOneMembership) {
   put_membership(transaction, {.host = "two", .state = "y"});
   EXPECT_EQ(find_membership(transaction)->host, "two");
   EXPECT_EQ(find_membership(transaction)->state, "y");
+}
+
+// As it was when each call looked at all that is shared.
+void forget_how_to_note_what_is_touched(std::filesystem::path const &file) {
+  SQLite::Database database(file, SQLite::OPEN_READWRITE);
+  std::vector<std::string> triggers;
+  SQLite::Statement select(database, "SELECT name FROM sqlite_schema WHERE type = 'trigger'");
+  while (select.executeStep()) {
+    triggers.push_back(select.getColumn(0).getString());
+  }
+  select.reset();
+  for (auto const &trigger : triggers) {
+    if (trigger.starts_with("touched_by_")) {
+      database.exec("DROP TRIGGER " + trigger);
+    }
+  }
+  database.exec(
+      "DROP VIEW shared_port; DROP VIEW shared_switch; DROP TABLE touched;"
+      "PRAGMA user_version = 13");
+}
+
+TEST(WhatIsShared, IsAllLookedAtOnceInAFileOfAnOlderHost) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  {
+    Store store(file, populate_nothing);
+    ChangingTransaction transaction(store);
+    auto const key = find_switch(transaction, SwitchName::alias, "a")->key;
+    put_shared(transaction, {.name = {"a", ""}, .fabric = "{}", .image = {}});
+    put_shared(transaction, {.name = {"a", "gone"}, .fabric = "{}", .image = {}});
+    ASSERT_TRUE(add_port(transaction, key, "new", PortKind::client));
+    forget_touched(transaction);
+    transaction.commit();
+  }
+  forget_how_to_note_what_is_touched(file);
+  Store store(file, populate_nothing);
+  ReadingTransaction transaction(store);
+  std::vector<std::string> found;
+  for (auto const &name : touched(transaction)) {
+    found.push_back(name.switch_identifier + "/" + name.port);
+  }
+  EXPECT_THAT(found, testing::UnorderedElementsAre("a/", "a/gone", "a/new"));
 }
 
 }  // namespace
