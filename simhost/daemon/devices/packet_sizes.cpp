@@ -24,7 +24,6 @@ std::string refusal(std::string const &device, std::uint32_t size, std::system_e
                      error.code().message());
 }
 
-// Those that carry less.
 // One that is gone meanwhile has no size, and keeps no other from getting its own.
 void put_back(std::string const &name, std::uint32_t size) {
   try {
@@ -34,6 +33,7 @@ void put_back(std::string const &name, std::uint32_t size) {
   }
 }
 
+// Those that carry less.
 std::vector<std::pair<std::string, NetworkDevice>> too_small(PacketSizes const &sizes,
                                                              NetworkDevices const &devices) {
   std::vector<std::pair<std::string, NetworkDevice>> found;
