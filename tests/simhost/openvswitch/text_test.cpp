@@ -113,6 +113,8 @@ TEST(ActionText, HasEachKind) {
   EXPECT_EQ(text_of(Resubmit{1, 3}), "resubmit(3,1)");
   EXPECT_EQ(text_of(PushVlan{}), "push_vlan:0x8100");
   EXPECT_EQ(text_of(PopVlan{}), "pop_vlan");
+  EXPECT_EQ(text_of(Push{whole(Field::eth_dst)}), "push:NXM_OF_ETH_DST[]");
+  EXPECT_EQ(text_of(Pop{part(reg(1), 4, 8)}), "pop:NXM_NX_REG1[4..8]");
   EXPECT_EQ(text_of(CheckPacketLarger{1500, bit(reg(0), 3)}),
             "check_pkt_larger(1500)->NXM_NX_REG0[3]");
   EXPECT_EQ(text_of(Note{{0x00, 0x11}}), "note:00.11.00.00.00.00");

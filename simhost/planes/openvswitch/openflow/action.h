@@ -84,6 +84,16 @@ struct Move {
   friend auto operator<=>(Move const &, Move const &) = default;
 };
 
+/// Puts bits on the frame's stack, which is empty at first, or takes as many from it again.
+struct Push {
+  SubField source;
+  friend auto operator<=>(Push const &, Push const &) = default;
+};
+struct Pop {
+  SubField destination;
+  friend auto operator<=>(Pop const &, Pop const &) = default;
+};
+
 /// A part of a flow that is learned; numbers have their lowest bit for the lowest of the bits.
 struct LearnedMatch {
   SubField field;
@@ -141,8 +151,8 @@ struct Note {
 
 /// One of them. An empty list drops the frame.
 class Action : public std::variant<Output, OutputFrom, OutputTruncated, ToController, ToGroup,
-                                   ToMeter, Resubmit, PushVlan, PopVlan, SetField, Move, Learn,
-                                   Clone, CheckPacketLarger, Note> {
+                                   ToMeter, Resubmit, PushVlan, PopVlan, SetField, Move, Push, Pop,
+                                   Learn, Clone, CheckPacketLarger, Note> {
  public:
   using variant::variant;
 };

@@ -82,6 +82,8 @@ struct ActionText {
   std::string operator()(Move const &move) const {
     return fmt::format("move:{}->{}", part_text(move.source), part_text(move.destination));
   }
+  std::string operator()(Push const &push) const { return "push:" + part_text(push.source); }
+  std::string operator()(Pop const &pop) const { return "pop:" + part_text(pop.destination); }
   std::string operator()(Learn const &learn) const {
     auto text = fmt::format("learn(table={}", learn.table);
     auto const add = [&text](bool is_there, std::string_view name, auto const &content) {

@@ -84,6 +84,12 @@ Action take_check(Reader &in) {
   return CheckPacketLarger{bytes, checked(field, first, 1)};
 }
 
+SubField take_stacked(Reader &in) {
+  unsigned const first = in.u16();
+  auto const field = take_field_number(in);
+  return checked(field, first, in.u16());
+}
+
 std::variant<SubField, Value> take_learned_content(Reader &in, std::uint16_t header,
                                                    unsigned bits) {
   if ((header & kLearnedNumber) == 0) {
@@ -161,6 +167,10 @@ Action take_extended(Reader &in, unsigned depth) {
       return take_resubmit(in);
     case ExtendedType::output_from:
       return take_output_from(in);
+    case ExtendedType::push:
+      return Push{take_stacked(in)};
+    case ExtendedType::pop:
+      return Pop{take_stacked(in)};
     case ExtendedType::learn:
       return take_learn(in, false);
     case ExtendedType::limited_learn:

@@ -117,6 +117,8 @@ class ActionPut {
       put_field_number(out_, move.destination.field);
     });
   }
+  void operator()(Push const &push) const { put_stack(ExtendedType::push, push.source); }
+  void operator()(Pop const &pop) const { put_stack(ExtendedType::pop, pop.destination); }
   void operator()(Learn const &learn) const {
     bool const is_limited = learn.limit != 0 || learn.result;
     extended(is_limited ? ExtendedType::limited_learn : ExtendedType::learn, [&] {
@@ -180,6 +182,14 @@ class ActionPut {
     put(ActionType::output, [&] {
       out_.u32(port);
       out_.u16(most_bytes);
+    });
+  }
+
+  void put_stack(ExtendedType type, SubField const &part) const {
+    extended(type, [&] {
+      out_.u16(part.first);
+      put_field_number(out_, part.field);
+      out_.u16(part.bits);
     });
   }
 

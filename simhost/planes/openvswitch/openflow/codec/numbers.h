@@ -28,6 +28,8 @@ enum class ExtendedType : std::uint16_t {
   resubmit = 14,
   output_from = 15,
   learn = 16,
+  push = 27,
+  pop = 28,
   output_truncated = 39,
   clone = 42,
   limited_learn = 45,
