@@ -62,22 +62,6 @@ def test_what_is_not_let_in_is_dropped(lab: Lab) -> None:
     come_to(lambda: counters(lab, "a"), {**counted, "pktsInDropped": 11})
 
 
-def test_what_a_port_has_no_room_for_is_counted_within_bounds(lab: Lab) -> None:
-    """As dropped or as let in, by however many frames of its kind; some of them nowhere."""
-    learns = {"learning": True, "flooding": True, "limit": 1, "limit_policy": "drop"}
-    lab.set_port("lab", "a", mac_learning=learns)
-    one = lab.client("lab", "a")
-    send(one, 10, BROADCAST)
-    come_to_count(lab, 10)
-    for number in range(3):
-        send(one, 20, BROADCAST, source=f"02:00:00:00:77:{number:02x}")
-    assert comes_true(lambda: counters(lab, "a").get("noLearningDroppedPkts", 0) >= 3)
-    lab.have_counted()
-    found = counters(lab, "a")
-    assert found["noLearningDroppedPkts"] == found["pktsInDropped"]
-    assert 10 <= found["pktsInBroadcast"] <= 70 - found["pktsInDropped"]
-
-
 def come_to_count(lab: Lab, frames: int) -> None:
     """What port a was let send, to all."""
     counted = {"pktsInBroadcast": frames, "bytesInBroadcast": frames * LENGTH}

@@ -49,7 +49,7 @@ std::vector<openflow::FlowMonitor> monitors() {
   using openflow::OwnChanges;
   using openflow::PresentFlows;
   std::vector<openflow::FlowMonitor> monitors;
-  for (std::uint8_t number = 0; number <= openvswitch::table::kCountedSources; ++number) {
+  for (std::uint8_t number = 0; number <= openvswitch::kLastReached; ++number) {
     if (number != openvswitch::table::kRecentSources) {
       bool const is_learned = openvswitch::table::is_learned(number);
       monitors.push_back({.number = number + 1U,

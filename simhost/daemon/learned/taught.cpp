@@ -17,6 +17,10 @@ openvswitch::Counted taught_in(std::uint8_t table) {
       return Counted::learned;
     case openvswitch::table::kRecentSources:
       return Counted::recent_source;
+    case openvswitch::table::kMovedSources:
+      return Counted::moved_source;
+    case openvswitch::table::kRefusedSources:
+      return Counted::refused_source;
     default:
       return Counted::counted_source;
   }

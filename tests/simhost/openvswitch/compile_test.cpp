@@ -183,7 +183,7 @@ TEST(Compiling, ChangesGroupsOnlyWhenAnotherUplinkComesFirst) {
 std::vector<std::string> teachers_in(Network const &network) {
   std::vector<std::string> found;
   for (auto const &flow : compile(network).flows) {
-    if (flow.table == table::kLearning && flow.cookie == cookie(Counted::port, 1) &&
+    if (flow.table == table::kTeaching && flow.cookie == cookie(Counted::port, 1) &&
         flow.priority == 100) {
       found.push_back(to_text(flow));
     }

@@ -16,7 +16,9 @@ PATIENCE = 30.0
 # Where switches send what is to be wrapped for collectors.
 GRE_PORT, ERSPAN_PORT = 65214, 65215
 # The tables that a switch fills by itself.
-LEARNED = (31, 32, 33, 34)
+LEARNED = (31, 32, 33, 34, 35, 36)
+# Those that count what callers are told of.
+COUNTING = (9, 10, 19, 22, 23, 24, 29)
 
 
 class _Forgetting:
@@ -197,6 +199,45 @@ class OpenVSwitch:
     def have_bridge(self, bridge: str) -> None:
         """A bridge without devices, if it is not there."""
         self._vsctl("--may-exist", "add-br", bridge, *self._settings(bridge))
+
+    def limit_learned(self, bridge: str, limit: int) -> None:
+        """So many addresses at most, as a switch is told beside its flows."""
+        table = ["create", "Flow_Table", f"flow_limit={limit}", "overflow_policy=refuse"]
+        to_bridge = ["set", "Bridge", bridge, "flow_tables:32=@limited"]
+        self._vsctl("--", "--id=@limited", *table, "--", *to_bridge)
+
+    def add_up_often(self) -> None:
+        """So that nobody has to wait half a second for what was counted."""
+        self._vsctl("set", "Open_vSwitch", ".", "other_config:max-revalidator=20")
+
+    def frames_received(self) -> int:
+        """Of all devices, since it began."""
+        return sum(
+            int(number)
+            for number in re.findall(
+                r"packets received: (\d+)", self.ask("dpif-netdev/pmd-stats-show")
+            )
+        )
+
+    def counted(self, bridge: str) -> Dict[int, int]:
+        """The frames that its flows counted, by their cookies; those of the tables that count."""
+        self.ask("revalidator/wait")
+        counted: Dict[int, int] = {}
+        for line in self._ofctl("dump-flows", bridge).splitlines()[1:]:
+            found = re.search(r"cookie=(0x[0-9a-f]+), .*table=(\d+), n_packets=(\d+)", line)
+            if found and int(found[2]) in COUNTING:
+                cookie = int(found[1], 16)
+                counted[cookie] = counted.get(cookie, 0) + int(found[3])
+        return {cookie: frames for cookie, frames in counted.items() if frames}
+
+    def known_places(self, bridge: str) -> Dict[str, int]:
+        """Where the addresses are that it learned."""
+        self.ask("revalidator/wait")
+        found = re.findall(
+            r"dl_dst=(\S+) actions=set_field:(\w+)/0xffff->reg6",
+            self._ofctl("dump-flows", bridge, "table=32"),
+        )
+        return {address: int(place, 16) for address, place in found}
 
     def load(self, bridge: str, flows: Sequence[str], groups: Sequence[str]) -> None:
         """Replaces all that the bridge has, in one bundle."""

@@ -106,10 +106,11 @@ Compiled compile(Network const &network) {
   check(network);
   Plan const plan(network);
   Program program;
-  for (auto *stage : {compile_admission, compile_sources, compile_tags, compile_private_vlans,
-                      compile_own_frames, compile_mirrors, compile_remote_mirrors, compile_learning,
-                      compile_lookup, compile_receiving, compile_dispatch, compile_groups,
-                      compile_lists, compile_delivery, compile_teams, compile_counting}) {
+  for (auto *stage :
+       {compile_admission, compile_sources, compile_tags, compile_private_vlans, compile_own_frames,
+        compile_mirrors, compile_remote_mirrors, compile_learning, compile_adding_up,
+        compile_lookup, compile_receiving, compile_dispatch, compile_groups, compile_lists,
+        compile_delivery, compile_teams, compile_counting}) {
     stage(plan, program);
   }
   return {.rows = {.most_learned = network.addresses.limit},

@@ -14,9 +14,10 @@ namespace table {
 
 /// What may come in at all; writes kOrigin.
 inline constexpr std::uint8_t kAdmission = 0;
-/// Whose addresses a port may send from; writes kVerdict for the next one.
+/// Whose addresses a port may send from; asks kFirstAddresses for the next one.
 inline constexpr std::uint8_t kSources = 1;
-/// Whether a client whose address is not known sent from its first one; reads kVerdict.
+/// Whether a client whose address is not known sends from its first one; reads kDestination, writes
+/// kVerdict.
 inline constexpr std::uint8_t kFirstAddress = 2;
 /// From tags to kVlan and kPriority; the tag goes.
 inline constexpr std::uint8_t kTags = 3;
@@ -36,7 +37,7 @@ inline constexpr std::uint8_t kRemoteMirrors = 29;
 inline constexpr std::uint8_t kMirroring = 7;
 /// Sources that an uplink should not have for a while; fills kRecentSources.
 inline constexpr std::uint8_t kRemembering = 25;
-/// Where an address is; writes kVerdict.
+/// Whether the source is learned: asks kLearnedAddresses, which writes kDestination.
 inline constexpr std::uint8_t kLearning = 8;
 /// What becomes of frames from addresses past the limit of their port; reads and writes kVerdict.
 inline constexpr std::uint8_t kLimits = 9;
@@ -88,15 +89,36 @@ inline constexpr std::uint8_t kRecentSources = 33;
 /// kLimits for nothing but the time since a source was seen last.
 inline constexpr std::uint8_t kCountedSources = 34;
 
+/// Sources that a port had no room for; filled by the switch itself.
+inline constexpr std::uint8_t kRefusedSources = 35;
+/// Sources that moved in the last seconds; filled by the switch itself.
+inline constexpr std::uint8_t kMovedSources = 36;
+
+/// Of frames whose source is not known where they come in: whether Open vSwitch only adds them up,
+/// and what became of them then. One of its flows is all that a Learn into it may add; writes
+/// kVerdict.
+inline constexpr std::uint8_t kAddingUp = 37;
+/// Whether a source is known where its frame comes in; reads kDestination, writes kVerdict.
+inline constexpr std::uint8_t kSourcePlaces = 38;
+/// Learns where a source is, unless it kStays elsewhere; writes kVerdict.
+inline constexpr std::uint8_t kTeaching = 39;
+/// Gives a source its room of the switch; writes kVerdict.
+inline constexpr std::uint8_t kTakingRoom = 40;
+/// Of clients whose address is not known: whether a source is the first one; reads kVerdict.
+inline constexpr std::uint8_t kFirstOrForged = 41;
+
 /// Whether the switch fills the table by itself.
 constexpr bool is_learned(std::uint8_t table) {
-  return table >= kFirstAddresses && table <= kCountedSources;
+  return table >= kFirstAddresses && table <= kMovedSources;
 }
 
 /// Reached by no frame: the cookie of its one flow is the number of the change that is in force.
 inline constexpr std::uint8_t kGeneration = 250;
 
 }  // namespace table
+
+/// The last table that frames reach.
+inline constexpr std::uint8_t kLastReached = table::kFirstOrForged;
 
 namespace field {
 
@@ -112,6 +134,15 @@ inline constexpr openflow::SubField kVerdict{kFacts, 1, 1};
 inline constexpr openflow::SubField kRecent{kFacts, 2, 2};
 /// The frame is on its way out of the switch; known to sessions that tell it.
 inline constexpr openflow::SubField kLeaves{kFacts, 4, 1};
+/// Open vSwitch adds up what frames did: a Learn says then that it found room, whether it did or
+/// not.
+inline constexpr openflow::SubField kAddsUp{kFacts, 5, 1};
+/// The source has its room of the switch.
+inline constexpr openflow::SubField kIsCounted{kFacts, 6, 1};
+/// The source moved just before: what adds up came before that.
+inline constexpr openflow::SubField kStays{kFacts, 7, 1};
+/// Likewise, and nothing of that has been added up yet.
+inline constexpr openflow::SubField kJustMoved{kFacts, 8, 1};
 /// The frame's own VLAN, 0 for none.
 inline constexpr auto kVlan = openflow::Field::reg2;
 /// A PrivateKind.
@@ -217,7 +248,10 @@ enum class Counted : std::uint8_t {
   out_lost = 25,  ///< by the device itself, like the next ones
   in_damaged = 26,
   out_damaged = 27,
-  unwanted_copy = 28,  ///< dropped: a copy of a mirror session, which none here takes
+  unwanted_copy = 28,   ///< dropped: a copy of a mirror session, which none here takes
+  adding_up = 29,       ///< what kAddingUp holds
+  refused_source = 30,  ///< what kRefusedSources holds
+  moved_source = 31,    ///< what kMovedSources holds
 };
 
 constexpr std::uint64_t cookie(Counted counted, std::uint32_t number = 0) {

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "planes/openvswitch/compile/stages/adding_up.h"
 #include "planes/openvswitch/compile/stages/own_addresses.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
@@ -10,6 +11,13 @@ namespace simhost::openvswitch {
 namespace {
 
 using openflow::Field;
+
+// In seconds: what a data path has not used for longer, it has no more, and nothing of it is to be
+// added up.
+constexpr std::uint16_t kLongestUnadded = 15;
+
+// At a port: somebody may send from one address after the other.
+constexpr std::uint32_t kMostRefused = 100;
 
 openflow::Action learn(Plan const &plan, std::uint32_t number, openflow::Port place,
                        std::uint32_t limit) {
@@ -28,22 +36,23 @@ openflow::Action learn(Plan const &plan, std::uint32_t number, openflow::Port pl
                                       .content = openflow::Value{place}}}};
 }
 
-void add(Program &program, std::uint16_t priority, Match const &match, Actions actions,
-         std::uint32_t number) {
-  program.add(table::kLearning, {.priority = priority,
-                                 .match = match,
-                                 .actions = std::move(actions),
-                                 .cookie = cookie(Counted::port, number)});
+void add(Program &program, std::uint8_t where, std::uint16_t priority, Match const &match,
+         Actions actions, std::uint32_t number) {
+  program.add(where, {.priority = priority,
+                      .match = match,
+                      .actions = std::move(actions),
+                      .cookie = cookie(Counted::port, number)});
 }
 
 // An address that stays where it is teaches nothing.
 void pass_over_fixed(Plan const &plan, Program &program) {
   for (auto const &own : plan.own_addresses()) {
-    add(program, 200, with_address(Match(), Field::eth_src, own), {go_to(table::kLookup)},
-        own.port->number);
+    add(program, table::kLearning, 200, with_address(Match(), Field::eth_src, own),
+        {go_to(table::kLookup)}, own.port->number);
   }
   for (auto const &fixed : plan.fixed_places()) {
-    add(program, 210, with_address(Match(), Field::eth_src, fixed), {go_to(table::kLookup)}, 0);
+    add(program, table::kLearning, 210, with_address(Match(), Field::eth_src, fixed),
+        {go_to(table::kLookup)}, 0);
   }
 }
 
@@ -51,8 +60,9 @@ void pass_over_fixed(Plan const &plan, Program &program) {
 void learn_own_again(Plan const &plan, Program &program) {
   for (auto const &own : plan.own_addresses()) {
     auto const match = with_address(from(own.port->port), Field::eth_src, own);
-    add(program, 220, questions(match), {go_to(table::kLookup)}, own.port->number);
-    add(program, 200, match,
+    add(program, table::kLearning, 220, questions(match), {go_to(table::kLookup)},
+        own.port->number);
+    add(program, table::kLearning, 200, match,
         {learn(plan, own.port->number, own.port->port, 0), go_to(table::kLookup)},
         own.port->number);
   }
@@ -70,8 +80,11 @@ openflow::Action count_for_switch(Plan const &plan) {
       .deletes_learned = true,
       .limit = plan.network.addresses.limit,
       .result = field::kVerdict,
-      .specs = {in_domain(), openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
-                                                    .content = openflow::whole(Field::eth_src)}}};
+      .specs = {
+          in_domain(),
+          openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
+                                 .content = openflow::whole(Field::eth_src)},
+          openflow::LearnedLoad{.destination = field::kIsCounted, .content = openflow::Value{1}}}};
 }
 
 // Whether there is room for a source, whoever asks knows.
@@ -82,30 +95,66 @@ void ask(Program &program, Match const &match, std::uint32_t number) {
                                  .cookie = cookie(Counted::learned, number)});
 }
 
-void judge(Program &program, std::uint8_t where, Port const &port) {
+// A source that has no room by the time its frames are added up had none.
+void take_room(Plan const &plan, Program &program) {
+  auto const count = count_for_switch(plan);
+  program.add(table::kTakingRoom, {.priority = 100,
+                                   .match = with_bits(Match(), field::kIsCounted, 1),
+                                   .actions = {count, go_to(table::kLookup)}});
+  program.add(table::kTakingRoom, {.actions = {openflow::load(field::kAddsUp, 0), count,
+                                               does_it_add_up(), go_to(table::kSwitchLimit)}});
+  program.add(table::kSwitchLimit,
+              {.priority = 200,
+               .match = with_bits(Match(), field::kAddsUp, 1),
+               .actions = {openflow::load(field::kAddsUp, 0), openflow::load(field::kVerdict, 0),
+                           go_to(table::kSwitchLimit)}});
+}
+
+// What is learned tells nothing of an address that is elsewhere: it may have moved there since, or
+// have come there because there was no room for it here.
+openflow::Action remember_refused(Port const &port) {
+  return openflow::Learn{
+      .table = table::kRefusedSources,
+      .priority = 100,
+      .cookie = cookie(Counted::refused_source, port.number),
+      .hard_timeout = kLongestUnadded,
+      .deletes_learned = true,
+      .limit = kMostRefused,
+      .specs = {
+          openflow::LearnedMatch{.field = openflow::whole(Field::in_port),
+                                 .content = openflow::Value{port.port}},
+          in_domain(),
+          openflow::LearnedMatch{.field = openflow::whole(Field::eth_src),
+                                 .content = openflow::whole(Field::eth_src)},
+          openflow::LearnedLoad{.destination = field::kVerdict, .content = openflow::Value{0}}}};
+}
+
+void judge(Program &program, std::uint8_t where, Port const &port, Actions actions) {
   bool const allows = port.learning->when_full == WhenFull::allow;
+  append(actions, allows ? Actions{go_to(table::kLookup)} : drop());
   program.add(where, {.priority = 100,
                       .match = with_bits(from(port.port), field::kVerdict, 0),
-                      .actions = allows ? Actions{go_to(table::kLookup)} : drop(),
+                      .actions = std::move(actions),
                       .cookie = cookie(allows ? Counted::limit_allowed : Counted::limit_dropped,
                                        port.number)});
 }
 
 void learn_at(Plan const &plan, Program &program, Port const &port) {
   bool const may_have_some = port.learning->limit != 0 && plan.network.addresses.limit != 0;
-  Actions actions{openflow::load(field::kVerdict, may_have_some ? 1 : 0)};
   if (may_have_some) {
-    actions.push_back(learn(plan, port.number, port.port, port.learning->limit));
-  }
-  actions.push_back(go_to(table::kLimits));
-  add(program, 100, from(port.port), std::move(actions), port.number);
-  if (may_have_some) {
+    add(program, table::kLearning, 100, from(port.port), learn_source(), port.number);
+    teach(program, from(port.port), port.port,
+          learn(plan, port.number, port.port, port.learning->limit),
+          cookie(Counted::port, port.number));
     ask(program, from(port.port), port.number);
-    add(program, 160, questions(from(port.port), kHasNoRoom),
+    add(program, table::kLearning, 160, questions(from(port.port), kHasNoRoom),
+        {openflow::load(field::kVerdict, 0), go_to(table::kSwitchLimit)}, port.number);
+  } else {
+    add(program, table::kLearning, 100, from(port.port),
         {openflow::load(field::kVerdict, 0), go_to(table::kLimits)}, port.number);
   }
-  judge(program, table::kLimits, port);
-  judge(program, table::kSwitchLimit, port);
+  judge(program, table::kLimits, port, may_have_some ? Actions{remember_refused(port)} : Actions());
+  judge(program, table::kSwitchLimit, port, {});
 }
 
 bool learns(Network const &network) {
@@ -117,18 +166,22 @@ bool learns(Network const &network) {
 }
 
 void learn_beyond(Plan const &plan, Program &program) {
-  add(program, 300,
+  add(program, table::kLearning, 300,
       with_bits(Match(), field::kRecent, static_cast<openflow::Value>(Recent::is_on_way)),
       {go_to(table::kLookup)}, 0);
   auto const &addresses = plan.network.addresses;
   if (addresses.uplink_limit != 0 && addresses.limit != 0) {
     auto const learn_from = [&](Match const &match, openflow::Port place) {
       ask(program, match, 0);
-      add(program, 100, match,
-          {openflow::load(field::kVerdict, 1), learn(plan, 0, place, addresses.uplink_limit),
-           go_to(table::kLimits)},
-          0);
+      add(program, table::kLearning, 100, match, learn_source(), 0);
+      teach(program, match, place, learn(plan, 0, place, addresses.uplink_limit),
+            cookie(Counted::port));
     };
+    // What is not learned takes no room of the switch.
+    program.add(table::kLimits,
+                {.priority = 100,
+                 .match = with_bits(Match().with(field::kOrigin, kFromUplink), field::kVerdict, 0),
+                 .actions = {go_to(table::kLookup)}});
     if (plan.network.is_mesh()) {
       for (auto const &tunnel : plan.network.uplinks) {
         learn_from(from(tunnel.port), tunnel.port);
@@ -164,8 +217,9 @@ void compile_learning(Plan const &plan, Program &program) {
   }
   program.add(table::kLearning, {.actions = {go_to(table::kLookup)}});
   if (learns(plan.network)) {
-    program.add(table::kLimits, {.actions = {count_for_switch(plan), go_to(table::kCountedSources),
-                                             go_to(table::kSwitchLimit)}});
+    program.add(table::kLimits,
+                {.actions = {go_to(table::kCountedSources), go_to(table::kTakingRoom)}});
+    take_room(plan, program);
     program.add(table::kSwitchLimit, {.actions = {go_to(table::kLookup)}});
   }
 }

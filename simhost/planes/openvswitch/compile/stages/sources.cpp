@@ -1,6 +1,7 @@
 // From which addresses a client may send. One whose address is not known has the first that it
 // sends from: a flow that is learned in a table of its own, where there is room for one of each
 // port.
+#include "planes/openvswitch/compile/stages/adding_up.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {
@@ -35,6 +36,33 @@ void drop_forged(Program &program, std::uint8_t where, Match const &match, Port 
                       .cookie = cookie(Counted::forged, port.number)});
 }
 
+// Where it is known, which is all there is to go by when a frame is added up later: in the VLAN of
+// the port, unless in all.
+Actions look_up_first(Plan const &plan, Port const &port) {
+  Actions actions;
+  if (!port.vlan.carried) {
+    actions.push_back(openflow::set(field::kDomain, plan.kind_of(port.vlan.vlan).domain));
+  }
+  append(actions, look_up_source(table::kFirstAddresses));
+  return actions;
+}
+
+void judge_first_address(Plan const &plan, Program &program, Port const &port) {
+  auto const at_port = from(port.port);
+  program.add(table::kFirstAddress,
+              {.priority = 200,
+               .match = Match(at_port).with(field::kDestination, port.port),
+               .actions = {openflow::set(field::kDestination, 0), go_to(table::kTags)},
+               .cookie = cookie(Counted::port, port.number)});
+  program.add(table::kFirstAddress,
+              {.priority = 100,
+               .match = at_port,
+               .actions = {openflow::set(field::kDestination, 0), learn_first_address(plan, port),
+                           does_it_add_up(), go_to(table::kFirstOrForged)},
+               .cookie = cookie(Counted::port, port.number)});
+  drop_forged(program, table::kFirstOrForged, at_port, port);
+}
+
 // What the client's address is, whoever asks knows.
 void ask_without_address(Program &program, Port const &port) {
   program.add(table::kSources, {.priority = 150,
@@ -58,14 +86,15 @@ void compile(Plan const &plan, Program &program, Port const &port) {
                                   .cookie = cookie(Counted::address_changed, port.number)});
   } else if (!port.address) {
     ask_without_address(program, port);
-    program.add(table::kSources,
-                {.priority = 100,
-                 .match = at_port,
-                 .actions = {openflow::load(field::kVerdict, 1), learn_first_address(plan, port),
-                             go_to(table::kFirstAddress)},
-                 .cookie = cookie(Counted::port, port.number)});
+    auto actions =
+        port.may_forge ? Actions{learn_first_address(plan, port)} : look_up_first(plan, port);
+    actions.push_back(go_to(table::kFirstAddress));
+    program.add(table::kSources, {.priority = 100,
+                                  .match = at_port,
+                                  .actions = std::move(actions),
+                                  .cookie = cookie(Counted::port, port.number)});
     if (!port.may_forge) {
-      drop_forged(program, table::kFirstAddress, with_bits(at_port, field::kVerdict, 0), port);
+      judge_first_address(plan, program, port);
     }
   } else if (!port.may_forge) {
     program.add(table::kSources,
@@ -87,6 +116,12 @@ void compile_sources(Plan const &plan, Program &program) {
   }
   program.add(table::kSources, {.actions = {go_to(table::kTags)}});
   program.add(table::kFirstAddress, {.actions = {go_to(table::kTags)}});
+  // Known by the time it is added up, it was so before.
+  auto const says = openflow::ones(1) << field::kVerdict.first;
+  auto const adds_up = openflow::ones(1) << field::kAddsUp.first;
+  program.add(table::kFirstOrForged, {.priority = 200,
+                                      .match = Match().with(field::kFacts, says, says | adds_up),
+                                      .actions = {go_to(table::kTags)}});
 }
 
 }  // namespace simhost::openvswitch

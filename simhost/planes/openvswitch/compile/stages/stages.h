@@ -12,6 +12,7 @@ void compile_sources(Plan const &plan, Program &program);
 void compile_tags(Plan const &plan, Program &program);
 void compile_private_vlans(Plan const &plan, Program &program);
 void compile_own_frames(Plan const &plan, Program &program);
+void compile_adding_up(Plan const &plan, Program &program);
 void compile_learning(Plan const &plan, Program &program);
 void compile_lookup(Plan const &plan, Program &program);
 void compile_receiving(Plan const &plan, Program &program);
