@@ -163,9 +163,14 @@ def parts(seed: int, minutes: float, folder: Path, frames: bool = True) -> Itera
     yield Part("damaged states", "states", states, share)
     for name in fuzzing.NAMES:
         yield Part(f"fuzzing, {name}", "inputs", partial(fuzzed, name, seed), share)
-    for what, name in ("frames of any content", "frames"), ("frames of groups", "groups"):
+    of_frames = [
+        ("frames of any content", "frames"),
+        ("frames of groups", "groups"),
+        ("frames past limits", "added_up"),
+    ]
+    for what, name in of_frames:
         sent = partial(by_chance, f"simhost/openvswitch/{name}_by_chance.py", seed)
-        yield Part(what, "frames", sent, SHARES["frames"] / 2)
+        yield Part(what, "frames", sent, SHARES["frames"] / len(of_frames))
     sequences = partial(by_chance, "sequences/sequences.py", seed)
     yield Part("sequences of calls", "sequences", sequences, SHARES["sequences"])
     replays = [
