@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+#include "planes/openvswitch/compile/own_addresses.h"
 #include "planes/openvswitch/compile/stages/adding_up.h"
-#include "planes/openvswitch/compile/stages/own_addresses.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {

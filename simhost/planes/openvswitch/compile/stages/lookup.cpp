@@ -1,7 +1,7 @@
 // Where a frame's destination is.
 #include <utility>
 
-#include "planes/openvswitch/compile/stages/own_addresses.h"
+#include "planes/openvswitch/compile/own_addresses.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
 namespace simhost::openvswitch {

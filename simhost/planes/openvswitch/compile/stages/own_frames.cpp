@@ -1,7 +1,7 @@
 // Frames of this switch that the network sends back, over another uplink than they took: an address
 // that is here does not come from outside. Of addresses that are learned, or not known, the last
 // second or two count, so that a client that moved to another host is soon heard there.
-#include "planes/openvswitch/compile/stages/own_addresses.h"
+#include "planes/openvswitch/compile/own_addresses.h"
 #include "planes/openvswitch/compile/stages/recent_sources.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
