@@ -129,7 +129,7 @@ def test_a_data_path_that_the_kernel_has_not_is_told(idle: Lab) -> None:
     wanted = ", for which it needs the kernel's module openvswitch\n"
 
     def is_told() -> bool:
-        # The kernel may load it once it is asked for; whether it may be used from here nobody knows.
+        # The kernel may load it once it is asked for; whether that lets it be used nobody knows.
         if Path("/sys/module/openvswitch").exists():
             return bool(re.search(told, idle.log())) or idle.is_in_force()
         return bool(re.search(told + wanted, idle.log()))
