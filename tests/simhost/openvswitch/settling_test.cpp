@@ -43,7 +43,8 @@ TEST_F(ASettlingDaemon, TellsNobodyBeforeWhatItCountedIsInTheState) {
   Daemon daemon(loop,
                 {.state = folder.file("host.db"),
                  .database = openvswitch::Lab::shared().database_socket(),
-                 .datapath = "netdev"},
+                 // One that makes no devices.
+                 .datapath = "dummy"},
                 [](std::string const &) {});
   bool is_ready = false;
   bool is_told = false;
