@@ -52,6 +52,16 @@ char const *const kTouchedSchema = R"sql(
       CROSS JOIN shared ON shared.switch = switch.identifier AND shared.port = ''
       WHERE NOT port.is_uplink;
 
+  -- Whoever puts a place here, which is a switch or a port of it, has it noted if it is shared.
+  CREATE VIEW touched_place AS SELECT NULL AS switch, NULL AS port WHERE false;
+  CREATE TRIGGER touched_at_place INSTEAD OF INSERT ON touched_place BEGIN
+    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
+      ON CONFLICT DO NOTHING;
+    INSERT INTO touched SELECT switch, '' FROM shared_switch
+      WHERE key = new.switch AND new.port IS NULL
+      ON CONFLICT DO NOTHING;
+  END;
+
   -- What was committed before there were triggers is looked at once.
   INSERT INTO touched SELECT switch, port FROM shared;
   INSERT INTO touched SELECT switch, port FROM shared_port WHERE true ON CONFLICT DO NOTHING;
@@ -68,8 +78,7 @@ char const *const kTouchedSchema = R"sql(
   END;
   CREATE TRIGGER touched_by_changed_switch AFTER UPDATE OF alias, max_ports, version ON switch
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, '' FROM shared_switch WHERE key = new.key
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (new.key, NULL);
   END;
 
   CREATE TRIGGER touched_by_added_port AFTER INSERT ON port
@@ -86,75 +95,44 @@ char const *const kTouchedSchema = R"sql(
   END;
   CREATE TRIGGER touched_by_changed_port AFTER UPDATE OF external_id ON port
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.number
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (new.switch, new.number);
   END;
 
   CREATE TRIGGER touched_by_connected_port AFTER INSERT ON device
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (NULL, new.port);
   END;
   CREATE TRIGGER touched_by_disconnected_port AFTER DELETE ON device
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (NULL, old.port);
   END;
 
   CREATE TRIGGER touched_by_set_property AFTER INSERT ON property
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, '' FROM shared_switch
-      WHERE key = new.switch AND new.port IS NULL
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (new.switch, new.port);
   END;
   CREATE TRIGGER touched_by_changed_property AFTER UPDATE ON property
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, '' FROM shared_switch
-      WHERE key = new.switch AND new.port IS NULL
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (new.switch, new.port);
   END;
   CREATE TRIGGER touched_by_removed_property AFTER DELETE ON property
     WHEN EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, '' FROM shared_switch
-      WHERE key = old.switch AND old.port IS NULL
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (old.switch, old.port);
   END;
 
   -- Addresses that were learned (type 2) are not shared.
   CREATE TRIGGER touched_by_added_address AFTER INSERT ON address
     WHEN new.type <> 2 AND EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, '' FROM shared_switch
-      WHERE key = new.switch AND new.port IS NULL
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (new.switch, new.port);
   END;
   CREATE TRIGGER touched_by_changed_address AFTER UPDATE OF port, type ON address
     WHEN (new.type <> 2 OR old.type <> 2) AND EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = new.port
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, '' FROM shared_switch
-      WHERE key = new.switch AND new.port IS NULL
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, '' FROM shared_switch
-      WHERE key = old.switch AND old.port IS NULL
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (new.switch, new.port);
+    INSERT INTO touched_place VALUES (old.switch, old.port);
   END;
   CREATE TRIGGER touched_by_removed_address AFTER DELETE ON address
     WHEN old.type <> 2 AND EXISTS (SELECT 1 FROM shared) BEGIN
-    INSERT INTO touched SELECT switch, port FROM shared_port WHERE number = old.port
-      ON CONFLICT DO NOTHING;
-    INSERT INTO touched SELECT switch, '' FROM shared_switch
-      WHERE key = old.switch AND old.port IS NULL
-      ON CONFLICT DO NOTHING;
+    INSERT INTO touched_place VALUES (old.switch, old.port);
   END;
 )sql";
 

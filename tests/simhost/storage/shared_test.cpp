@@ -72,7 +72,8 @@ void forget_how_to_note_what_is_touched(std::filesystem::path const &file) {
     }
   }
   database.exec(
-      "DROP VIEW shared_port; DROP VIEW shared_switch; DROP TABLE touched;"
+      "DROP VIEW touched_place; DROP VIEW shared_port; DROP VIEW shared_switch;"
+      "DROP TABLE touched;"
       "PRAGMA user_version = 13");
 }
 
