@@ -6,6 +6,7 @@ from typing import Iterator
 import pytest
 
 from frame_lab import ONE_SWITCH, Lab
+from lasting_open_vswitch import LastingOpenVSwitch
 
 
 @pytest.fixture
@@ -19,3 +20,11 @@ def idle(tmp_path: Path) -> Iterator[Lab]:
 def lab(idle: Lab) -> Lab:
     idle.start()
     return idle
+
+
+@pytest.fixture
+def clock(idle: Lab) -> Iterator[LastingOpenVSwitch]:
+    """Of the Open vSwitch of a lab with a daemon: it can be stopped, and put forward."""
+    with LastingOpenVSwitch(idle.host, idle.run_folder(), clock_may_stand=True) as open_vswitch:
+        idle.start(open_vswitch.where)
+        yield open_vswitch

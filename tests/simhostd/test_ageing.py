@@ -5,9 +5,7 @@ import os
 import signal
 import sqlite3
 import time
-from typing import Any, Dict, Iterator, Tuple
-
-import pytest
+from typing import Any, Dict, Tuple
 
 from frame_lab import Lab, comes_true, learned_ages
 from lasting_open_vswitch import LastingOpenVSwitch
@@ -20,13 +18,6 @@ SEEN = "02:00:00:00:77:01"
 LONG = 70000
 
 LearnersAndSpectator = Tuple[Client, Client, Client]
-
-
-@pytest.fixture
-def clock(idle: Lab) -> Iterator[LastingOpenVSwitch]:
-    with LastingOpenVSwitch(idle.host, idle.run_folder(), clock_may_stand=True) as open_vswitch:
-        idle.start(open_vswitch.where)
-        yield open_vswitch
 
 
 def set_aging(lab: Lab, seconds: int) -> None:

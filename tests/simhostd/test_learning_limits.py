@@ -3,7 +3,7 @@ go, and what of them is counted, exact to the frame."""
 
 import os
 import signal
-from typing import Any, Dict, Iterator
+from typing import Any, Dict
 
 import pytest
 
@@ -197,13 +197,6 @@ def test_an_address_that_is_put_somewhere_takes_no_room(lab: Lab) -> None:
     dropped = {"pktsInDropped": refused, "noLearningDroppedPkts": refused}
     one.tells(InBroadcast=let_in, **dropped)
     other.tells(OutBroadcast=let_in)
-
-
-@pytest.fixture
-def clock(idle: Lab) -> Iterator[LastingOpenVSwitch]:
-    with LastingOpenVSwitch(idle.host, idle.run_folder(), clock_may_stand=True) as open_vswitch:
-        idle.start(open_vswitch.where)
-        yield open_vswitch
 
 
 def test_an_address_that_ages_leaves_its_room(idle: Lab, clock: LastingOpenVSwitch) -> None:

@@ -65,6 +65,15 @@ struct PortsByLoad : testing::Test {
     load.count(key, totals);
   }
 
+  // All send as much by one uplink, and then some by the other.
+  void move_some(LoadBalance &load) {
+    followed(load);
+    count(load, 0);
+    load.choose();
+    count(load, kMegabyte);
+    ASSERT_TRUE(load.choose());
+  }
+
   storage::SwitchKey key{};
   std::vector<std::uint32_t> numbers;
   TemporaryFolder folder;
@@ -75,10 +84,7 @@ struct PortsByLoad : testing::Test {
 TEST_F(PortsByLoad, KeepWhatWasChosen) {
   LoadBalance load(store);
   EXPECT_THAT(followed(load), testing::Each(0));
-  count(load, 0);
-  load.choose();
-  count(load, kMegabyte);
-  ASSERT_TRUE(load.choose());
+  move_some(load);
   auto const chosen = followed(load);
   EXPECT_THAT(chosen, testing::Contains(1));
   EXPECT_TRUE(load.save());
@@ -100,11 +106,7 @@ TEST_F(PortsByLoad, AreNotMovedForWhatWasCountedBefore) {
 
 TEST_F(PortsByLoad, BeginAnewWhenTheHostDoes) {
   LoadBalance load(store);
-  followed(load);
-  count(load, 0);
-  load.choose();
-  count(load, kMegabyte);
-  ASSERT_TRUE(load.choose());
+  move_some(load);
   EXPECT_TRUE(load.save());
   ChangingTransaction transaction(store);
   storage::remove_chosen_shares(transaction);
@@ -114,11 +116,7 @@ TEST_F(PortsByLoad, BeginAnewWhenTheHostDoes) {
 
 TEST_F(PortsByLoad, AreNotGivenWhatWasChosenBeforeTheHostBeganAnew) {
   LoadBalance load(store);
-  followed(load);
-  count(load, 0);
-  load.choose();
-  count(load, kMegabyte);
-  ASSERT_TRUE(load.choose());
+  move_some(load);
   {
     ChangingTransaction transaction(store);
     storage::remove_counters(transaction);
@@ -130,11 +128,7 @@ TEST_F(PortsByLoad, AreNotGivenWhatWasChosenBeforeTheHostBeganAnew) {
 
 TEST_F(PortsByLoad, AreMovedOnWhileTheStateIsWritten) {
   LoadBalance load(store);
-  followed(load);
-  count(load, 0);
-  load.choose();
-  count(load, kMegabyte);
-  ASSERT_TRUE(load.choose());
+  move_some(load);
   {
     storage::Store other(folder.file("host.db"), MemoryState::populate);
     ChangingTransaction const writing(other);
