@@ -368,6 +368,25 @@ def test_news_of_the_servers_hide_none_of_the_fabric(
     assert not fabric._cluster.follow(time.monotonic())
 
 
+def test_what_a_server_had_no_time_to_say_hides_nothing_that_it_said(
+    monkeypatch: pytest.MonkeyPatch,
+) -> None:
+    said = ["it does not take this certificate"]
+
+    def connect(cluster: Cluster, deadline: float) -> None:
+        if said:
+            raise Unreachable(said.pop())
+        time.sleep(max(deadline - time.monotonic(), 0))
+        raise Unreachable("it timed out")
+
+    monkeypatch.setattr(Cluster, "_connect", connect)
+    with pytest.raises(Unreachable, match="^it does not take this certificate$"):
+        Cluster(["any"]).connect(time.monotonic() + 0.3)
+    # Nothing else was said.
+    with pytest.raises(Unreachable, match="^it timed out$"):
+        Cluster(["any"]).connect(time.monotonic() + 0.05)
+
+
 def test_what_the_servers_do_not_let_one_do_is_told(
     fabric: Fabric, monkeypatch: pytest.MonkeyPatch
 ) -> None:

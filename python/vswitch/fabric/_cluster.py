@@ -24,6 +24,8 @@ _COLUMNS = {
 # For one server to accept a connection, and to say what it has.
 _PATIENCE = 2.0
 _PAUSE = 0.1
+# What ends so near to a deadline was cut short by it.
+_NEAR = 0.01
 # One that says nothing for so long is asked whether it is there.
 _SILENCE = 5.0
 
@@ -44,6 +46,7 @@ class Cluster:
 
     def connect(self, deadline: float) -> None:
         """To the first server that will do; raises Unreachable if none does until then."""
+        said: List[str] = []
         while not self.is_connected:
             reasons = []
             for _ in self._addresses:
@@ -54,8 +57,12 @@ class Cluster:
                     raise
                 except Unreachable as why:
                     reasons.append(str(why))
-            if time.monotonic() + _PAUSE > deadline:
-                raise Unreachable("; ".join(reasons))
+            left = deadline - time.monotonic()
+            # Servers that had no time to say what is wrong hide nothing that they said before.
+            if left > _NEAR or not said:
+                said = reasons
+            if left < _PAUSE:
+                raise Unreachable("; ".join(said))
             time.sleep(_PAUSE)
 
     def disconnect(self) -> None:
