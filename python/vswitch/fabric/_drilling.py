@@ -66,9 +66,16 @@ def _ask(
         cluster.transact(operations, deadline)
     except TransactionRefused as refused:
         # A server may try a second time by itself, and refuse then what it has made.
-        which = [select("Drill", where(id=id_), "id") for id_ in asked]
-        if not all(one["rows"] for one in cluster.transact(which, deadline)):
+        if not _are_there(cluster, asked, deadline):
             raise Busy(refused.words()) from None
+
+
+def _are_there(cluster: Cluster, asked: Iterable[str], deadline: float) -> bool:
+    which = [select("Drill", where(id=id_), "id") for id_ in asked]
+    try:
+        return all(one["rows"] for one in cluster.transact(which, deadline))
+    except TransactionRefused:
+        return False
 
 
 def _replied(cluster: Cluster, asked: Mapping[str, str]) -> Dict[str, str]:
