@@ -39,7 +39,7 @@ inline constexpr std::uint8_t kMirroring = 7;
 inline constexpr std::uint8_t kRemembering = 25;
 /// Whether the source is learned: asks kLearnedAddresses, which writes kDestination.
 inline constexpr std::uint8_t kLearning = 8;
-/// What becomes of frames from addresses past the limit of their port; reads and writes kVerdict.
+/// What becomes of frames from addresses past the limit of their port; reads kVerdict.
 inline constexpr std::uint8_t kLimits = 9;
 /// Likewise past that of the switch.
 inline constexpr std::uint8_t kSwitchLimit = 19;
@@ -86,7 +86,7 @@ inline constexpr std::uint8_t kLearnedAddresses = 32;
 /// Sources that ports sent from in the last second or two; filled by the switch itself.
 inline constexpr std::uint8_t kRecentSources = 33;
 /// Sources that are learned, as many as the switch may have; filled by the switch itself. Asked by
-/// kLimits for nothing but the time since a source was seen last.
+/// kLimits, so that the time since a source was seen last is known; writes kIsCounted.
 inline constexpr std::uint8_t kCountedSources = 34;
 
 /// Sources that a port had no room for; filled by the switch itself.
