@@ -254,6 +254,17 @@ def test_what_a_host_cannot_bear_is_told(lab: FabricLab, two: Tuple[Host, Host])
     assert third.setting("lab", "mtu") == 1500
 
 
+def test_a_switch_that_the_fabric_has_not_cannot_be_joined(
+    lab: FabricLab, two: Tuple[Host, Host]
+) -> None:
+    (before,) = lab.databases.rows("Fabric")
+    done = two[1].try_ctl("join", "nowhere")
+    assert done.returncode == 1
+    assert "the fabric has no switch 'nowhere'" in done.stdout
+    (now,) = lab.databases.rows("Fabric")
+    assert now["revision"] == before["revision"]
+
+
 def test_a_name_is_one_host_s(lab: FabricLab) -> None:
     one = started(lab.host("one", LAB))
     thief = lab.host("two", OTHER)

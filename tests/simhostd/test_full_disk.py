@@ -54,8 +54,8 @@ def test_what_is_counted_on_a_full_disk_is_there_when_it_has_room(lab: Lab) -> N
 
 def test_a_daemon_goes_on_that_cannot_even_say_what_is_wrong(lab: Lab) -> None:
     one = lab.client("lab", "a")
-    before = lab.log()
     set_room(lab, 0)
+    before = lab.log()
     send(one, 2, BROADCAST)
     assert comes_true(lambda: FULL in lab.plane()["said"])
     assert lab.log() == before
@@ -76,7 +76,7 @@ def test_a_fabric_is_told_of_a_full_disk_and_when_it_has_room(tmp_path: Path) ->
             return str(dict(row["errors"][1]).get("frames", ""))
 
         # What others have changed is to be in the state already.
-        assert comes_true(lambda: are_reported(lab)) and troubles() == ""
+        assert comes_true(lambda: are_reported(lab) and troubles() == "")
         fill(one)
         send(client, 4, BROADCAST)
         assert comes_true(lambda: FULL in troubles()), one.log()
