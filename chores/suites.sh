@@ -50,7 +50,9 @@ junit() {
   step "$title"
   rm -f "$xml"
   status=0
-  "$@" || status=$?
+  # Interrupted, a suite first ends what it has begun. One whose runner is ended is told so.
+  trap 'exit 130' INT
+  setpriv --pdeathsig TERM "$@" || status=$?
   counts='0 1'
   if [ -e "$xml" ]; then
     counts=$(/usr/bin/python3 tests/count_junit.py "$xml") || counts='0 1'

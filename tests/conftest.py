@@ -25,6 +25,29 @@ os.environ["PYTHONPATH"] = os.pathsep.join(_PATH)
 # What a script starts in the background ignores interrupts, and so would the programs under test.
 signal.signal(signal.SIGINT, signal.default_int_handler)
 
+_has_workers = False
+
+
+@pytest.hookimpl(optionalhook=True)  # type: ignore[misc]  # pluggy is not typed
+def pytest_xdist_setupnodes() -> None:
+    global _has_workers
+    _has_workers = True
+
+
+def _end_in_order(*_: object) -> None:
+    """As if interrupted from a terminal, which interrupts workers, too: what tests have begun ends
+    with them."""
+    signal.signal(signal.SIGTERM, signal.SIG_IGN)
+    if _has_workers:
+        # Which are its only children then, for it runs no test by itself.
+        for task in Path("/proc/self/task").iterdir():
+            for worker in (task / "children").read_text(encoding="ascii").split():
+                os.kill(int(worker), signal.SIGINT)
+    raise KeyboardInterrupt
+
+
+signal.signal(signal.SIGTERM, _end_in_order)
+
 
 def pytest_collection_finish(session: pytest.Session) -> None:
     # Once the classes are loaded the flat functions return instances of them.
