@@ -13,6 +13,7 @@ import fabric_by_chance
 from fabric_by_chance import relay_of, revision
 from fabric_lab import FabricLab, Host, are_reported, started
 from frame_lab import comes_true
+from going_frames import GoingFrames
 from relays import FROM_HOST, TO_HOST
 
 LAB = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
@@ -45,20 +46,24 @@ def mtu(host: Host) -> Any:
 
 def test_a_majority_decides(lab: FabricLab, two: Tuple[Host, Host]) -> None:
     one, other = two
-    lab.databases.kill(lab.databases.leader())
-    assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
-    assert comes_true(lambda: mtu(other) == 1600)
-    (last, alone) = lab.databases.running()
-    lab.databases.kill(last)
-    # It takes the other one a moment to see it.
-    assert comes_true(lambda: not lab.databases.tells("connected", alone))
-    assert other.call("VSDVS_SetMTU", "lab", 1700) == QEX_BUSY
-    assert other.call("VSDVS_CreateVSwitch", "own", "", "", 0, 1, 0, 1700, 0) == QEX_OK
-    assert mtu(other) == 1600
-    lab.databases.start(last)
-    assert comes_true(lambda: other.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK)
-    assert comes_true(lambda: mtu(one) == 1800)
-    assert lab.databases.settings("Switch")["mtu"] == 1800
+    one.set_port("lab", "b")
+    near, far = one.client("lab", "a"), one.client("lab", "b")
+    assert near.comes_to_reach(far)
+    with GoingFrames(near, far):
+        lab.databases.kill(lab.databases.leader())
+        assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
+        assert comes_true(lambda: mtu(other) == 1600)
+        (last, alone) = lab.databases.running()
+        lab.databases.kill(last)
+        # It takes the other one a moment to see it.
+        assert comes_true(lambda: not lab.databases.tells("connected", alone))
+        assert other.call("VSDVS_SetMTU", "lab", 1700) == QEX_BUSY
+        assert other.call("VSDVS_CreateVSwitch", "own", "", "", 0, 1, 0, 1700, 0) == QEX_OK
+        assert mtu(other) == 1600
+        lab.databases.start(last)
+        assert comes_true(lambda: other.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK)
+        assert comes_true(lambda: mtu(one) == 1800)
+        assert lab.databases.settings("Switch")["mtu"] == 1800
 
 
 def test_nobody_knows_and_then_it_is_decided(lab: FabricLab, two: Tuple[Host, Host]) -> None:

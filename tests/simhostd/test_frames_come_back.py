@@ -12,6 +12,7 @@ from typing import Dict, Iterator, List
 import pytest
 
 from frame_lab import TOOLS, Lab, comes_sooner_or_later, comes_true
+from going_frames import GoingFrames
 from lasting_open_vswitch import LastingOpenVSwitch
 from simhost import Client, frame
 
@@ -117,17 +118,31 @@ def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> N
         idle.start(open_vswitch.where)
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
         assert one.comes_to_reach(other)
-        idle.stop()
-        # Frames go on without it, and count.
-        assert one.comes_to_reach(other)
-        said, before = idle.log(), counted(idle)
-        idle.start(open_vswitch.where)
-        assert "in force" not in idle.log().replace(said, "")
-        kept(before, counted(idle))
-        # An unrelated change leaves what was counted and learned alone.
-        idle.set_port("lab", "c", vlan=9)
-        kept(before, counted(idle))
-        assert one.comes_to_reach(other)
+        with GoingFrames(one, other):
+            idle.stop()
+            # They are counted without it, too.
+            come_to_count_more(idle)
+            said, before = idle.log(), counted(idle)
+            idle.start(open_vswitch.where)
+            assert "in force" not in idle.log().replace(said, "")
+            kept(before, counted(idle))
+            # An unrelated change leaves what was counted and learned alone.
+            idle.set_port("lab", "c", vlan=9)
+            kept(before, counted(idle))
+
+
+def test_frames_that_do_not_go_on_are_missed(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.comes_to_reach(other)
+    with pytest.raises(AssertionError, match="frames did not come"):
+        with GoingFrames(one, other, patience=0.1):
+            lab.set_port("lab", "a", vlan=7)
+            lab.set_port("lab", "a", vlan=0)
+
+
+def come_to_count_more(lab: Lab) -> None:
+    before = sum(counted(lab).values())
+    assert comes_true(lambda: sum(counted(lab).values()) > before)
 
 
 def counted(lab: Lab) -> Dict[str, int]:

@@ -4,11 +4,13 @@ is there."""
 import ipaddress
 import signal
 import sys
+from typing import Callable
 
 import group_frames as frames
 import pytest
 from frame_lab import Lab, comes_true
-from group_clients import Clients
+from going_frames import GoingFrames
+from group_clients import SENDER, Clients
 from lasting_open_vswitch import LastingOpenVSwitch
 
 GROUP, OTHER_GROUP, IPV6_GROUP = "239.1.1.1", "239.2.2.2", "ff15::101"
@@ -136,6 +138,10 @@ def sent_up(lab: Lab) -> int:
     return sum(int(flow.split("n_packets=")[1].split(",")[0]) for flow in flows)
 
 
+def going_data(mac: str) -> Callable[[int], bytes]:
+    return lambda number: frames.data(mac, SENDER, GROUP, b"going on, %d" % number)
+
+
 def test_members_go_on_getting_frames_while_a_daemon_starts_anew(idle: Lab) -> None:
     with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
@@ -146,24 +152,25 @@ def test_members_go_on_getting_frames_while_a_daemon_starts_anew(idle: Lab) -> N
         assert clients.comes_to_get("one", GROUP)
         clients.says("other", frames.joins, OTHER_GROUP)
         assert clients.comes_to_get("other", OTHER_GROUP)
-        idle.stop(signal.SIGKILL)
-        assert clients.gets(GROUP) == "one"
-        assert clients.gets(OTHER_GROUP) == "other"
-        idle.have_counted()
-        heard = sent_up(idle)
-        assert heard > 0
-        idle.start(open_vswitch.where)
-        # The flows that lead to a daemon are those of before.
-        assert sent_up(idle) >= heard
-        # By which nobody has long to reply.
-        clients.mode("igmp", IGMPQueryInterval=1, IGMPQueries=10)
+        with GoingFrames(sender, one, going_data(sender.mac)):
+            idle.stop(signal.SIGKILL)
+            assert clients.gets(GROUP) == "one"
+            assert clients.gets(OTHER_GROUP) == "other"
+            idle.have_counted()
+            heard = sent_up(idle)
+            assert heard > 0
+            idle.start(open_vswitch.where)
+            # The flows that lead to a daemon are those of before.
+            assert sent_up(idle) >= heard
+            # By which nobody has long to reply.
+            clients.mode("igmp", IGMPQueryInterval=1, IGMPQueries=10)
 
-        def is_known() -> bool:
-            got = clients.gets(GROUP)
-            assert "one" in got
-            return got == "one"
+            def is_known() -> bool:
+                got = clients.gets(GROUP)
+                assert "one" in got
+                return got == "one"
 
-        assert comes_true(is_known)
+            assert comes_true(is_known)
         # Who says nothing when it is asked is a member no more.
         assert clients.comes_to_get("", OTHER_GROUP)
         member.communicate()

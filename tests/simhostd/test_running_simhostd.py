@@ -10,6 +10,7 @@ from pathlib import Path
 import pytest
 
 from frame_lab import ONE_SWITCH, TOOLS, Lab, comes_true
+from going_frames import GoingFrames
 from lasting_open_vswitch import LastingOpenVSwitch
 
 READY = "READY=1\nSTATUS=moves the frames of "
@@ -69,10 +70,10 @@ def test_the_open_vswitch_of_the_machine(idle: Lab) -> None:
         assert daemon.stdout is not None and daemon.stdout.readline() == "ready\n"
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
         assert one.comes_to_reach(other)
-        daemon.terminate()
-        daemon.communicate(timeout=30)
-        # Frames go on without it.
-        assert one.comes_to_reach(other)
+        with GoingFrames(one, other):
+            daemon.terminate()
+            daemon.communicate(timeout=30)
+            assert one.comes_to_reach(other)
 
 
 def test_one_writes_to_an_open_vswitch(idle: Lab, tmp_path: Path) -> None:
