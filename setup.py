@@ -28,6 +28,7 @@ CONFIGURATION = {
     "RECORDINGS_INSTALL_DIR": "vswitch/recordings",
     "HOST_RUNPATH": "$ORIGIN/simhost/lib",
     "INSTALL_METADATA": "OFF",
+    "SOURCES_TOGETHER": "ON",
     # A wheel cannot ask for libraries of the system.
     "COMPILE_FMT_IN": "ON",
 }
