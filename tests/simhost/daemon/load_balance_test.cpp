@@ -17,9 +17,9 @@ using daemon::LoadBalance;
 using storage::ChangingTransaction;
 using storage::ReadingTransaction;
 
-constexpr std::uint64_t kMegabyte = 1'000'000;
-
 struct PortsByLoad : testing::Test {
+  static constexpr std::uint64_t kMegabyte = 1'000'000;
+
   PortsByLoad() {
     run_on(stored::plane());
     ChangingTransaction transaction(store);

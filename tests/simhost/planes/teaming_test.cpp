@@ -20,10 +20,10 @@ namespace {
 using simhost::Link;
 using testing::ElementsAre;
 
-constexpr auto kSent = simhost::counter_in(&VSRARPStats::rarpPktsSent);
-constexpr auto kTime = simhost::counter_in(&VSRARPStats::rarpTime);
+struct Teams : Plane {
+  static constexpr auto kSent = simhost::counter_in(&VSRARPStats::rarpPktsSent);
+  static constexpr auto kTime = simhost::counter_in(&VSRARPStats::rarpTime);
 
-struct Teaming : Plane {
   std::string hint(simhost::storage::Port const &port) {
     return simhost::running_plane().team_uplink(transaction, port);
   }
@@ -58,7 +58,7 @@ VSTeamPolicy policy(std::initializer_list<char const *> active,
   return made;
 }
 
-TEST_F(Teaming, WithoutAPolicyPortsSpreadOverAllUplinks) {
+TEST_F(Teams, WithoutAPolicyPortsSpreadOverAllUplinks) {
   std::set<std::string> used{hint(p1), hint(p2)};
   for (auto const *name : {"p3", "p4"}) {
     used.insert(hint(simhost::add_client_port(transaction, key, name)));
@@ -66,20 +66,20 @@ TEST_F(Teaming, WithoutAPolicyPortsSpreadOverAllUplinks) {
   EXPECT_THAT(used, ElementsAre("nic0", "nic1", "nic2"));
 }
 
-TEST_F(Teaming, TheSwitchsPolicyHoldsForAllPorts) {
+TEST_F(Teams, TheSwitchsPolicyHoldsForAllPorts) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink2"}, {"uplink1"}));
   EXPECT_EQ(hint(p1), "nic1");
   EXPECT_EQ(hint(p2), "nic1");
 }
 
-TEST_F(Teaming, APortsOwnPolicyComesFirst) {
+TEST_F(Teams, APortsOwnPolicyComesFirst) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink2"}));
   set_policy(of(p1), VSPROP_PORT_TEAMING_POLICY, policy({"uplink3"}));
   EXPECT_EQ(hint(p1), "nic2");
   EXPECT_EQ(hint(p2), "nic1");
 }
 
-TEST_F(Teaming, AStandbyUplinkStepsInAndBack) {
+TEST_F(Teams, AStandbyUplinkStepsInAndBack) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2", "uplink3"}));
   EXPECT_EQ(hint(p1), "nic0");
   down("nic0");
@@ -90,7 +90,7 @@ TEST_F(Teaming, AStandbyUplinkStepsInAndBack) {
   EXPECT_EQ(hint(p1), "nic0");
 }
 
-TEST_F(Teaming, ARollingTeamStaysWhereItIs) {
+TEST_F(Teams, ARollingTeamStaysWhereItIs) {
   auto rolling = policy({"uplink1"}, {"uplink2"});
   rolling.flags = TEAM_FRP_FLAG_ROLLING;
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, rolling);
@@ -105,7 +105,7 @@ TEST_F(Teaming, ARollingTeamStaysWhereItIs) {
   EXPECT_EQ(hint(p1), "nic0");
 }
 
-TEST_F(Teaming, TheAdminSwitchTakesALinkDown) {
+TEST_F(Teams, TheAdminSwitchTakesALinkDown) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
   simhost::running_plane().set_admin_state(transaction, "nic0", false);
   EXPECT_FALSE(simhost::running_plane().link_is_up(transaction, "nic0"));
@@ -115,7 +115,7 @@ TEST_F(Teaming, TheAdminSwitchTakesALinkDown) {
   EXPECT_EQ(hint(p1), "nic0");
 }
 
-TEST_F(Teaming, AnUplinkIsUsedOnlyAfterTheUpDelay) {
+TEST_F(Teams, AnUplinkIsUsedOnlyAfterTheUpDelay) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
   simhost::set_runtime_option(transaction, VS_RT_OPT_TEAM_POLICY_UP_DELAY, 500);
   down("nic0");
@@ -126,7 +126,7 @@ TEST_F(Teaming, AnUplinkIsUsedOnlyAfterTheUpDelay) {
   EXPECT_EQ(hint(p1), "nic0");
 }
 
-TEST_F(Teaming, CriteriaTakeUplinksOut) {
+TEST_F(Teams, CriteriaTakeUplinksOut) {
   auto fast = policy({"uplink1"}, {"uplink2"});
   fast.linkCriteria = TEAM_FRP_CRIT_LINK_SPEED_GTE;
   fast.speed = 10000;
@@ -146,7 +146,7 @@ TEST_F(Teaming, CriteriaTakeUplinksOut) {
 }
 
 // Each criterion takes an uplink out for its own reason, and only where a policy names it.
-TEST_F(Teaming, CriteriaLookAtWhatAnUplinkIsLike) {
+TEST_F(Teams, CriteriaLookAtWhatAnUplinkIsLike) {
   struct {
     qex_uint32 criterion;
     void (*spoil)(Link &);
@@ -169,7 +169,7 @@ TEST_F(Teaming, CriteriaLookAtWhatAnUplinkIsLike) {
   }
 }
 
-TEST_F(Teaming, AnUplinkFailsWithMoreErrorsThanThePolicyBears) {
+TEST_F(Teams, AnUplinkFailsWithMoreErrorsThanThePolicyBears) {
   auto careful = policy({"uplink1"}, {"uplink2"});
   careful.linkCriteria = TEAM_FRP_CRIT_LINK_ERR;
   careful.percentError = 5;
@@ -180,7 +180,7 @@ TEST_F(Teaming, AnUplinkFailsWithMoreErrorsThanThePolicyBears) {
   EXPECT_EQ(hint(p1), "nic1");
 }
 
-TEST_F(Teaming, ABlockedUplinkPortIsNotUsedWhereItIsACriterion) {
+TEST_F(Teams, ABlockedUplinkPortIsNotUsedWhereItIsACriterion) {
   auto const uplink_port = simhost::get_port(transaction, key, "uplink1");
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}, {"uplink2"}));
   simhost::set_property(transaction, of(uplink_port), QEX_NEBPROP_PORT_BLOCK,
@@ -192,7 +192,7 @@ TEST_F(Teaming, ABlockedUplinkPortIsNotUsedWhereItIsACriterion) {
   EXPECT_EQ(hint(p1), "nic1");
 }
 
-TEST_F(Teaming, APolicyNamesUplinkPortsByTheirNames) {
+TEST_F(Teams, APolicyNamesUplinkPortsByTheirNames) {
   auto const uplink_port = simhost::get_port(transaction, key, "uplink2");
   simhost::set_property(transaction, of(uplink_port), QEX_NEBPROP_PORT_ALIAS,
                         simhost::bytes_of_text("right"));
@@ -202,7 +202,7 @@ TEST_F(Teaming, APolicyNamesUplinkPortsByTheirNames) {
   }
 }
 
-TEST_F(Teaming, AnOverrideBindsAPort) {
+TEST_F(Teams, AnOverrideBindsAPort) {
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, policy({"uplink1"}));
   simhost::set_property(transaction, of(p1), VSPROP_PORT_TEAMING_OVERRIDE,
                         simhost::bytes_of_text("uplink3"));
@@ -212,7 +212,7 @@ TEST_F(Teaming, AnOverrideBindsAPort) {
   EXPECT_EQ(status_of([&] { hint(p1); }), QEX_ENETDOWN) << "whatever its teaming says";
 }
 
-TEST_F(Teaming, TheStatusSaysWhyThereIsNoUplink) {
+TEST_F(Teams, TheStatusSaysWhyThereIsNoUplink) {
   for (auto const *uplink : {"nic0", "nic1", "nic2"}) {
     down(uplink);
   }
@@ -225,7 +225,7 @@ TEST_F(Teaming, TheStatusSaysWhyThereIsNoUplink) {
             QEX_NOT_SUPPORTED);
 }
 
-TEST_F(Teaming, MovesAreAnnounced) {
+TEST_F(Teams, MovesAreAnnounced) {
   auto notifying = policy({"uplink1"}, {"uplink2"});
   notifying.flags = TEAM_FRP_FLAG_NOTIFY_SWITCH;
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, notifying);
@@ -242,7 +242,7 @@ TEST_F(Teaming, MovesAreAnnounced) {
   EXPECT_EQ(counted(kSent), 2U);
 }
 
-TEST_F(Teaming, ASwitchThatDoesNotRunAnnouncesNothing) {
+TEST_F(Teams, ASwitchThatDoesNotRunAnnouncesNothing) {
   auto notifying = policy({"uplink1"}, {"uplink2"});
   notifying.flags = TEAM_FRP_FLAG_NOTIFY_SWITCH;
   set_policy(of_switch(), VSPROP_SWITCH_TEAMING, notifying);
@@ -252,7 +252,7 @@ TEST_F(Teaming, ASwitchThatDoesNotRunAnnouncesNothing) {
   EXPECT_EQ(hint(p1), "nic1");
 }
 
-struct Lags : Teaming {
+struct Lags : Teams {
   std::vector<simhost::Lag> lags() { return simhost::lags_of(transaction, key); }
   QEX_ReturnStatus put(std::string const &name, std::vector<std::string> const &uplinks) {
     return status_of([&] { simhost::put_lag(transaction, key, name, uplinks); });
