@@ -11,7 +11,6 @@ from counted_frames import BROADCAST, LENGTH, come_to, counters, send
 from frame_lab import Lab, comes_true, learned_ages
 from lasting_open_vswitch import LastingOpenVSwitch
 from simhost import Client
-from simhost._namespaces import PATIENCE
 
 ROW = 5
 
@@ -141,19 +140,20 @@ def test_a_forged_address_takes_no_room(lab: Lab) -> None:
     one.tells(InBroadcast=let_in, OutBroadcast=more, pktsInDropped=forged)
 
 
-def test_frames_count_where_the_address_was_that_moves(idle: Lab) -> None:
-    idle.start()
-    lab = idle
+def test_frames_count_where_the_address_was_that_moves(
+    idle: Lab, clock: LastingOpenVSwitch
+) -> None:
     for port in "ab":
-        lab.set_port("lab", port, **learns(limit=2))
-    one, other = Sender(lab, "a"), Sender(lab, "b")
+        idle.set_port("lab", port, **learns(limit=2))
+    one, other = (Sender(idle, port, clock_stands=True) for port in "ab")
+    # Nothing is added up before it moves.
+    clock.stop_clock()
     moving = bytes.fromhex(address(1).replace(":", ""))
     here = there = 0
     for _ in range(3):
-        # Nothing of it has to be added up before it moves.
         send(one.client, ROW, BROADCAST, source=address(1))
         for _ in range(ROW):
-            other.client.expect(lambda frame: frame[6:12] == moving, PATIENCE)
+            other.client.expect(lambda frame: frame[6:12] == moving)
         here += ROW
         there += other.rows(address(1))
     one.tells(InBroadcast=here, OutBroadcast=there, numMACsMoved=2)

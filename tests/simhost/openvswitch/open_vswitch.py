@@ -206,10 +206,6 @@ class OpenVSwitch:
         to_bridge = ["set", "Bridge", bridge, "flow_tables:32=@limited"]
         self._vsctl("--", "--id=@limited", *table, "--", *to_bridge)
 
-    def add_up_often(self) -> None:
-        """So that nobody has to wait half a second for what was counted."""
-        self._vsctl("set", "Open_vSwitch", ".", "other_config:max-revalidator=20")
-
     def frames_received(self) -> int:
         """Of all devices, since it began."""
         return sum(
