@@ -1,13 +1,16 @@
 """Ports of a shared switch that are connected now on one host, now on another, and what goes with
 them."""
 
+import json
+import os
+import signal
 from pathlib import Path
 from typing import Dict, Iterator
 
 import pytest
 
 from counted_frames import BROADCAST, LENGTH, come_to, counters, send
-from fabric_lab import FabricLab, Host, kept, restored, started
+from fabric_lab import FabricLab, Host, are_reported, kept, restored, started
 from frame_lab import comes_true
 from simhost import Client
 
@@ -30,6 +33,7 @@ LAB = {
         }
     ],
 }
+TWO_PORTS = {"switches": [{"alias": "lab", "ports": [{"id": "a"}, {"id": "b"}]}]}
 # Who is alone counts nobody else's frames.
 ALONE = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
 
@@ -103,6 +107,36 @@ def test_a_port_takes_its_counters_with_it(lab: FabricLab) -> None:
     assert comes_true(lambda: counters(other, "a")["pktsInBroadcast"] >= 8)
     started(one)
     come_to(lambda: counters(other, "a"), counted(12))
+
+
+def told(lab: FabricLab, host: str, port: str) -> Dict[str, int]:
+    """What a host has told of what it counted of a port."""
+    (row,) = lab.databases.rows("Port", id=port)
+    found: Dict[str, int] = json.loads(dict(row["counters"][1]).get(host, "{}"))
+    return found
+
+
+def test_what_was_counted_is_told_by_when_a_move_is_in_force(lab: FabricLab) -> None:
+    one, other = started(lab.host("one", TWO_PORTS)), started(lab.host("two"))
+    one.ctl("share", "lab")
+    other.ctl("join", "lab")
+    one.ctl("counter", "lab", "pktsInUnicast", "1", "--port", "a")
+    known = counters(one, "a")
+    here, beside = connect(one), one.client("lab", "b")
+    send(here, 5, BROADCAST)
+    come_to(lambda: counters(one, "a"), {**counted(5), **known})
+    send(here, 4, BROADCAST)
+    for _ in range(9):
+        beside.expect(lambda frame: frame.startswith(b"\xff" * 6))
+    one.have_counted()
+    switch = one.processes()["ovs-vswitchd"]
+    os.kill(switch, signal.SIGSTOP)
+    connect(other)
+    # The port has left by then in the state of the one, and not yet for its frames.
+    assert comes_true(lambda: told(lab, "one", "a"))
+    os.kill(switch, signal.SIGCONT)
+    assert comes_true(lambda: are_reported(lab))
+    assert told(lab, "one", "a") == {**counted(9), **known}
 
 
 def test_a_host_of_an_old_state_takes_back_what_it_has_told(lab: FabricLab) -> None:

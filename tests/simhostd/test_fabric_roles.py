@@ -169,6 +169,38 @@ def test_hosts_write_what_is_theirs_and_switches_that_they_belong_to(lab: RoleLa
     assert one.call("VSDVS_RemoveDVPort", "lab", "d") == QEX_OK
 
 
+def told(lab: RoleLab, host: str) -> List[str]:
+    """Of which ports a host has told what it counted."""
+    ports = lab.databases.rows("Port")
+    return sorted(row["id"] for row in ports if host in dict(row["counters"][1]))
+
+
+def test_what_a_host_may_not_tell_keeps_back_nothing_else(lab: RoleLab) -> None:
+    one = started(lab.certified("one"))
+    one.apply({"switches": [{"alias": "own", "ports": [{"id": "b"}]}]})
+    for switch in "lab", "own":
+        one.ctl("share", switch)
+    one.stop()
+
+    def let_write(*hosts: str) -> None:
+        row = {"writers": ["map", [[host, host] for host in hosts]]}
+        lab.databases.transact(
+            {"op": "update", "table": "Switch", "where": [["alias", "==", "lab"]], "row": row},
+            {"op": "update", "table": "Port", "where": [["id", "==", "a"]], "row": row},
+        )
+
+    let_write()
+    for switch, port in ("lab", "a"), ("own", "b"):
+        one.ctl("counter", switch, "pktsInUnicast", "7", "--port", port)
+    started(one)
+    assert comes_true(lambda: told(lab, "one") == ["b"])
+    assert comes_true(lambda: "what was counted is not told: " in one.log())
+    one.stop()
+    let_write("one")
+    started(one)
+    assert comes_true(lambda: told(lab, "one") == ["a", "b"])
+
+
 def test_nobody_writes_what_is_another_host_s(lab: RoleLab) -> None:
     one = started(lab.certified("one"))
     two = lab.roles.of_hosts.issue("two")

@@ -33,17 +33,18 @@ std::map<SharedName, CountsOfHosts> told_by(ovsdb::Replica const &replica,
   return told;
 }
 
-// Those that the fabric has otherwise, by the UUIDs of the ports.
-std::map<std::string, std::string> others(ovsdb::Replica const &replica, std::string const &host,
-                                          std::map<SharedName, Counts> const &own) {
-  std::map<std::string, std::string> texts;
+// Those that the fabric has otherwise, by the switches and the UUIDs of the ports.
+std::map<std::string, std::map<std::string, std::string>> others(
+    ovsdb::Replica const &replica, std::string const &host,
+    std::map<SharedName, Counts> const &own) {
+  std::map<std::string, std::map<std::string, std::string>> texts;
   for (auto const &[uuid, row] : replica.rows("Port")) {
     auto const counts = own.find(port_in(row));
     if (counts == own.end()) {
       continue;
     }
     if (auto text = text_of(counts->second); text != text_by(row, host)) {
-      texts.emplace(uuid, std::move(text));
+      texts[counts->first.switch_identifier].emplace(uuid, std::move(text));
     }
   }
   return texts;
@@ -76,7 +77,9 @@ std::optional<Untold> untold(storage::Store &store, ovsdb::Replica const &replic
   if (!has_looked) {
     return std::nullopt;
   }
-  untold.operations = counts_update(membership.host, others(replica, membership.host, own));
+  for (auto const &[switch_identifier, counts] : others(replica, membership.host, own)) {
+    untold.operations[switch_identifier] = counts_update(membership.host, counts);
+  }
   return untold;
 }
 

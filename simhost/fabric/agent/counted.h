@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -17,8 +18,8 @@ bool lets_any_go(ovsdb::Replica const &replica, std::vector<ovsdb::RowChange> co
                  std::string const &host);
 /// What the fabric is to be told.
 struct Untold {
-  Json operations;           ///< none if there is nothing
-  std::uint64_t change = 0;  ///< of the state, when that was looked at
+  std::map<std::string, Json> operations;  ///< by the switch, only of those of which there is any
+  std::uint64_t change = 0;                ///< of the state, when that was looked at
 };
 /// Nothing while somebody else has the state. What the fabric has of this host and the state has
 /// not, as one that was restored, comes back first, so that nothing falls.

@@ -310,6 +310,12 @@ void Member::report() {
     return;
   }
   try {
+    // Not before a port has left in the state as well; and what is said to be in force counts there
+    // no more.
+    if (counts_are_due_ && touched_.empty() && !report_counts()) {
+      report_soon();
+      return;
+    }
     auto const switches = switches_of(cluster_.replica(), options_.host);
     std::map<std::string, std::string> errors;
     for (auto const &[name, why] : unborne_) {
@@ -333,10 +339,6 @@ void Member::report() {
       // The reply may have come with news.
       sync_soon();
     }
-    // Not before a port has left in the state as well.
-    if (counts_are_due_ && touched_.empty()) {
-      report_counts();
-    }
   } catch (std::runtime_error const &error) {
     lose(error.what());
   }
@@ -350,24 +352,44 @@ void Member::tell_counts_later() {
   });
 }
 
-// Of a port that went the last is counted when that is in force.
-void Member::report_counts() {
+// Returns whether it could: not while somebody else has the state. Of a port that went the last is
+// counted when that is in force.
+bool Member::report_counts() {
   auto const news = untold(store_, cluster_.replica(), membership_);
   if (!news) {
-    report_soon();
-    return;
+    return false;
   }
-  if (!news->operations.empty()) {
-    try {
-      cluster_.transact(together({only_for(claim_.speaker()), news->operations}),
-                        from_now(kPatience));
-      sync_soon();
-    } catch (ovsdb::TransactionRefused const &refusal) {
-      say_(fmt::format("what was counted is not told: {}", refusal.what()));
-      return;
+  auto all = Json::array();
+  for (auto const &[switch_identifier, operations] : news->operations) {
+    all.insert(all.end(), operations.begin(), operations.end());
+  }
+  std::string why;
+  if (!all.empty() && !tell_counts(all, why)) {
+    why.clear();
+    // Who may not write one of the switches shall be heard of the others.
+    for (auto const &[switch_identifier, operations] : news->operations) {
+      tell_counts(operations, why);
     }
   }
+  if (std::exchange(why_counts_are_untold_, why) != why && !why.empty()) {
+    say_(fmt::format("what was counted is not told: {}", why));
+  }
+  // What was refused is tried again when all are told the next time.
   counts_are_due_ = news->change > in_force_.change;
+  return true;
+}
+
+// Returns whether they were taken; else the reason is in `why`.
+bool Member::tell_counts(Json const &operations, std::string &why) {
+  try {
+    cluster_.transact(together({only_for(claim_.speaker()), operations}), from_now(kPatience));
+    // The reply may have come with news.
+    sync_soon();
+    return true;
+  } catch (ovsdb::TransactionRefused const &refusal) {
+    why = refusal.what();
+    return false;
+  }
 }
 
 // What callers ask.

@@ -65,7 +65,8 @@ class Member {
   void report_soon();
   void report();
   void tell_counts_later();
-  void report_counts();
+  bool report_counts();
+  bool tell_counts(Json const &operations, std::string &why);
   [[nodiscard]] std::map<std::string, std::string> links();
 
   [[nodiscard]] daemon::Questions questions();
@@ -96,6 +97,7 @@ class Member {
   InForce in_force_;
   Json reported_;
   bool counts_are_due_ = false;
+  std::string why_counts_are_untold_;
   std::vector<events::Loop::Watch> watches_;
   events::Loop::Timer next_connect_;
   events::Loop::Timer next_sync_;
