@@ -12,6 +12,7 @@ from pathlib import Path
 from typing import Any, Callable, Dict, Iterator, List, Set, Tuple
 
 import pytest
+from ovs.jsonrpc import Message
 
 from fabric_lab import SCHEMA, Databases, FabricLab
 from frame_lab import comes_true
@@ -19,7 +20,15 @@ from libvswitch.errors import Busy, HostError, NotRestored
 from operating import PROGRAM, of_lab, populate
 from vswitch import transaction
 from vswitch.command.fabric import changing
-from vswitch.fabric import Fabric, Failover, OtherVersion, Unreachable, _deciding
+from vswitch.fabric import (
+    Fabric,
+    Failover,
+    OtherVersion,
+    Unreachable,
+    _cluster,
+    _deciding,
+    _server,
+)
 from vswitch.fabric._cluster import Cluster
 from vswitch.fabric._errors import TransactionRefused
 from vswitch.fabric._server import News, Server
@@ -366,6 +375,52 @@ def test_news_of_the_servers_hide_none_of_the_fabric(
     monkeypatch.setattr(Server, "news", lambda self, deadline: come.pop(0) if come else None)
     assert fabric._cluster.follow(time.monotonic())
     assert not fabric._cluster.follow(time.monotonic())
+
+
+class NewsWithoutEnd:
+    """From a server, with a clock that goes on with each of them."""
+
+    def __init__(self, monitor: str) -> None:
+        self._news = News(monitor, {})
+        self.time = 0.0
+
+    def monotonic(self) -> float:
+        return self.time
+
+    def __call__(self, *_: object) -> News:
+        self.time += 0.01
+        assert self.time < 60, "nobody looks at the deadline"
+        return self._news
+
+    def recv(self) -> Tuple[int, Any]:
+        self()
+        return 0, Message.create_notify("update", self._news)
+
+
+@pytest.mark.parametrize("monitor, has_any", [("_Server", False), ("fabric", True)])
+def test_of_news_without_end_some_are_left_for_the_next_time(
+    fabric: Fabric, monkeypatch: pytest.MonkeyPatch, monitor: str, has_any: bool
+) -> None:
+    fabric.view()
+    without_end = NewsWithoutEnd(monitor)
+    with monkeypatch.context() as patched:
+        patched.setattr(_cluster, "time", without_end)
+        patched.setattr(Server, "news", without_end)
+        assert fabric._cluster.follow(5.0) == has_any
+
+
+def test_who_tells_of_other_things_only_does_not_reply(
+    fabric: Fabric, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    fabric.view()
+    server = fabric._cluster._server
+    assert server is not None
+    without_end = NewsWithoutEnd("fabric")
+    with monkeypatch.context() as patched:
+        patched.setattr(_server, "time", without_end)
+        patched.setattr(server._rpc, "recv", without_end.recv)
+        with pytest.raises(Unreachable, match="it does not reply"):
+            server.request("echo", [], 5.0)
 
 
 def test_what_a_server_had_no_time_to_say_hides_nothing_that_it_said(

@@ -26,6 +26,8 @@ _PATIENCE = 2.0
 _PAUSE = 0.1
 # What ends so near to a deadline was cut short by it.
 _NEAR = 0.01
+# What comes without end is left for the next time after so long.
+_AT_ONCE = 0.5
 # One that says nothing for so long is asked whether it is there.
 _SILENCE = 5.0
 
@@ -132,27 +134,27 @@ class Cluster:
         assert self._server is not None
         try:
             while True:
-                until = min(deadline, time.monotonic() + _SILENCE)
-                news = self._server.news(until)
-                if news is not None:
-                    if self._take(news):
-                        return self._take_all()
-                    continue
+                news = self._server.news(min(deadline, time.monotonic() + _SILENCE))
+                if self._take_all(news):
+                    return True
+                # There may be no end of news of the servers themselves.
                 if time.monotonic() >= deadline:
                     return False
-                self._server.request("echo", [], time.monotonic() + _PATIENCE)
+                if news is None:
+                    self._server.request("echo", [], time.monotonic() + _PATIENCE)
         except Unreachable:
             self.disconnect()
             raise
 
-    def _take_all(self) -> bool:
-        """What has come, too."""
+    def _take_all(self, news: Optional[News]) -> bool:
+        """And what has come after it. Returns whether any is about rows of the fabric."""
         assert self._server is not None
-        news = self._server.news(time.monotonic())
+        end = time.monotonic() + _AT_ONCE
+        any_of_fabric = False
         while news is not None:
-            self._take(news)
-            news = self._server.news(time.monotonic())
-        return True
+            any_of_fabric = self._take(news) or any_of_fabric
+            news = self._server.news(0) if time.monotonic() < end else None
+        return any_of_fabric
 
     def _take(self, news: News) -> bool:
         """Returns whether it is about rows of the fabric."""

@@ -62,12 +62,13 @@ class Server:
         self._check(self._rpc.send(asked))
         while True:
             reply = self._next(deadline)
-            if reply is None:
-                raise Unreachable(f"{self.address}: it does not reply")
-            if reply.id == asked.id:
+            if reply is not None and reply.id == asked.id:
                 if reply.error is not None:
                     raise Unreachable(f"{self.address}: {reply.error}")
                 return reply.result
+            # It may tell of other things without end.
+            if reply is None or time.monotonic() >= deadline:
+                raise Unreachable(f"{self.address}: it does not reply")
 
     def transact(self, database: str, operations: Sequence[Operation], deadline: float) -> Any:
         """The results of the operations; raises TransactionRefused if one failed."""
