@@ -61,6 +61,7 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
       host_(in_utf8(options_.state.string())),
       state_watch_(loop, store_, options_.state, [this] { look_at_commits(); }),
       devices_(loop, [this] { sync_soon(); }),
+      client_addresses_(loop, [this] { sync_soon(); }),
       server_(loop, openvswitch::socket_of(options_.state), questions()),
       memory_(store_, [this] { remember_soon(); }),
       announcer_(loop, [this](auto key, auto const &clients) { announce(key, clients); }),
@@ -189,6 +190,7 @@ void Daemon::balance() {
 void Daemon::look_at_wires() {
   try {
     devices_.refresh();
+    client_addresses_.look();
     if (wires_.look(devices_, [this](std::string const &why) { troubles_.add(why); })) {
       sync_soon();
     }
@@ -390,6 +392,11 @@ void Daemon::sync() {
     }
     return device && device->has_ethernet;
   };
+  client_addresses_.begin();
+  auto const address_at = [this](std::string const &name) {
+    auto const device = devices_.find(name);
+    return device ? client_addresses_.at(device->index) : std::nullopt;
+  };
   collectors_.begin();
   auto const complete = [&](storage::SwitchKey key, openvswitch::Network &network) {
     members_.follow(transaction, key, network);
@@ -397,7 +404,8 @@ void Daemon::sync() {
     beacons_.follow(key, network);
     collectors_.follow(network);
   };
-  auto all = wanted_of(transaction, host_, options_.datapath, is_there, compiler_, complete);
+  auto all =
+      wanted_of(transaction, host_, options_.datapath, is_there, address_at, compiler_, complete);
   bool const counts_anew = counting_.follow(transaction);
   if (counts_anew) {
     announced_.follow(transaction);

@@ -17,6 +17,7 @@
 #include "daemon/compiler.h"
 #include "daemon/counting/announced.h"
 #include "daemon/counting/counting.h"
+#include "daemon/devices/client_addresses.h"
 #include "daemon/devices/devices_at_bridges.h"
 #include "daemon/devices/network_devices.h"
 #include "daemon/devices/saved_links.h"
@@ -121,6 +122,7 @@ class Daemon {
   std::string host_;
   StateWatch state_watch_;
   NetworkDevices devices_;
+  ClientAddresses client_addresses_;
   DevicesAtBridges at_bridges_;
   UplinkWires wires_;
   Server server_;

@@ -161,6 +161,18 @@ teaming::Team team_with_devices(storage::Transaction &transaction, storage::Swit
                           });
 }
 
+// Only that of a client that was given one can be another than it should be.
+openvswitch::Observed observed_at(std::span<storage::PortDevice const> connected,
+                                  AddressAt const &address_at) {
+  openvswitch::Observed observed;
+  for (auto const &[port, device] : connected) {
+    if (auto const seen = device.mac ? address_at(device.name) : std::nullopt) {
+      observed.addresses.emplace(port, *seen);
+    }
+  }
+  return observed;
+}
+
 bool notifies(VSTeamPolicy const &policy) {
   return (policy.flags & TEAM_FRP_FLAG_NOTIFY_SWITCH) != 0;
 }
@@ -171,6 +183,10 @@ std::vector<std::uint32_t> links_of(openvswitch::Way const *way) {
     return way == nullptr ? std::vector<std::uint32_t>() : way->links;
   }
   return {way->links.front()};
+}
+
+bool gets_out(openvswitch::Port const &port) {
+  return openvswitch::sends_frames(port) && !openvswitch::is_closed(port);
 }
 
 void add_carried(storage::Transaction &transaction, openvswitch::Network const &network,
@@ -189,7 +205,7 @@ void add_carried(storage::Transaction &transaction, openvswitch::Network const &
     bridge.carried.push_back(
         {.number = port.number,
          .device = devices[port.number],
-         .links = links_of(openvswitch::sends_frames(port) ? ways.of(port) : nullptr),
+         .links = links_of(gets_out(port) ? ways.of(port) : nullptr),
          .is_announced = set == own.end() ? notifies(shared) : set->second,
          .client = {.port = port.port,
                     .number = port.number,
@@ -254,8 +270,8 @@ std::uint64_t fingerprint(std::string_view text) {
 }
 
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
-                 std::string const &datapath, IsThere const &is_there, Compiler &compiler,
-                 Complete const &complete) {
+                 std::string const &datapath, IsThere const &is_there, AddressAt const &address_at,
+                 Compiler &compiler, Complete const &complete) {
   compiler.begin();
   Wanted wanted;
   wanted.change = storage::frames_change(transaction).value_or(0);
@@ -283,7 +299,8 @@ Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
     }
     try {
       auto const team = team_with_devices(transaction, key);
-      auto read = openvswitch::read_network(transaction, key, team, connected, {});
+      auto read = openvswitch::read_network(transaction, key, team, connected,
+                                            observed_at(connected, address_at));
       complete(key, read);
       auto const &[network, flows] = compiler.compile(key, std::move(read));
       bridge.flows = flows;

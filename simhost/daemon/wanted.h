@@ -87,13 +87,17 @@ struct Wanted {
 /// Whether a device can be put at a bridge.
 using IsThere = std::function<bool(std::string const &device)>;
 
+/// The address of the client at a device, where anybody sees it.
+using AddressAt =
+    std::function<std::optional<openflow::EthernetAddress>(std::string const &device)>;
+
 /// Puts into a network what frames told of it.
 using Complete = std::function<void(storage::SwitchKey key, openvswitch::Network &network)>;
 
 /// `host` tells the bridges of this host from those of others in one namespace.
 Wanted wanted_of(storage::Transaction &transaction, std::string_view host,
-                 std::string const &datapath, IsThere const &is_there, Compiler &compiler,
-                 Complete const &complete);
+                 std::string const &datapath, IsThere const &is_there, AddressAt const &address_at,
+                 Compiler &compiler, Complete const &complete);
 
 /// The bridge of a switch.
 std::string bridge_name(std::string_view host, std::string const &identifier);

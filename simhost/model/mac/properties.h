@@ -96,6 +96,8 @@ inline constexpr auto management =
         .obeys<check_management>()
         .json("mac_learning", form::record<VSPMACManagement>(kManagementMembers))
         .frames_obey()
+        .frames_cannot(
+            "`mac_change`: whose device is no other end of a veth pair, changes it unseen")
         .says("MAC learning of the port, and whether its client may change its address");
 
 inline constexpr auto learning_stats = property<VSPMACLearningStats>(VSPROP_PORT_MAC_LEARNING_STATS)

@@ -21,6 +21,8 @@ inline constexpr auto forbids =
         .defaults_to({.flags = 0})
         .json("forbids", form::bits<&VSPropSecurity::flags>(kForbidden))
         .frames_obey()
+        .frames_cannot(
+            "`mac_changes`: whose device is no other end of a veth pair, changes it unseen")
         .says(
             "what the client of the port may not do; `promiscuous` keeps it out of promiscuous "
             "mirror sessions, the others are without effect where no frames move");

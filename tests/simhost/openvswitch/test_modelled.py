@@ -86,23 +86,26 @@ def test_the_table_is_true_of_what_documents_do_not_name(
     assert known["frames"] == ("obey" if changes else "kept")
 
 
+SESSION = OBEYED[("port", "mirror_sessions")][0].value[0]
+
+
 @pytest.mark.parametrize(
-    "setting, member, value",
+    "setting, member, value, other",
     [
-        ("mirror_sessions", "sampling_rate", 10),
-        ("uplink_mirror_sessions", "sampling_rate", 10),
+        ("mirror_sessions", "sampling_rate", [SESSION], [{**SESSION, "sampling_rate": 10}]),
+        ("uplink_mirror_sessions", "sampling_rate", [SESSION], [{**SESSION, "sampling_rate": 10}]),
+        # The clients here are those whose devices nobody sees.
+        ("forbids", "mac_changes", [], ["mac_changes"]),
+        ("mac_learning", "mac_change", {"mac_change": True}, {"mac_change": False}),
     ],
 )
 def test_what_frames_cannot_obey_is_named(
-    compiler: Compiler, setting: str, member: str, value: Any
+    compiler: Compiler, setting: str, member: str, value: Any, other: Any
 ) -> None:
-    (known,) = (one for one in SETTINGS if one.get("name") == setting)
+    (known,) = (one for one in SETTINGS if one.get("name") == setting and "beyond_frames" in one)
     assert known["beyond_frames"].startswith(f"`{member}`: ")
     scope = known["scope"]
-    session = OBEYED[(scope, setting)][0].value[0]
-    assert told(compiler, scope, {setting: [{**session, member: value}]}) == told(
-        compiler, scope, {setting: [session]}
-    )
+    assert told(compiler, scope, {setting: value}) == told(compiler, scope, {setting: other})
 
 
 KEPT_OF_WRAPPING: List[Dict[str, Any]] = [{}, {"vlan": 7}, {"cos": 3}, {"granularity": 2}]
@@ -143,7 +146,7 @@ def test_options_that_are_kept_change_nothing(compiler: Compiler, option: str) -
 
 def test_nothing_else_is_beyond_them() -> None:
     beyond = {known.get("name") for known in PROPERTIES if "beyond_frames" in known}
-    assert beyond == {"mirror_sessions", "uplink_mirror_sessions"}
+    assert beyond == {"mirror_sessions", "uplink_mirror_sessions", "forbids", "mac_learning"}
 
 
 def test_nothing_that_frames_obey_is_said_to_be_without_effect() -> None:

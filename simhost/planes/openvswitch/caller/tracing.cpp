@@ -16,6 +16,7 @@
 #include "model/mirror/properties.h"
 #include "model/ports/properties.h"
 #include "model/properties/properties.h"
+#include "model/security/properties.h"
 #include "model/teaming/properties.h"
 #include "planes/openvswitch/caller/openvswitch_plane.h"
 #include "planes/openvswitch/caller/patience.h"
@@ -111,6 +112,9 @@ class Stations {
     if (at.station.is_uplink) {
       return entry;
     }
+    bool const is_forbidden = (effective(transaction_, security::forbids, owner).flags &
+                               VSPORT_SECURITY_DISALLOW_MAC_CHANGE) != 0;
+    entry.change = of_port(is_forbidden ? "forbids" : kLearning);
     entry.limit = of_port(kLearning);
     if (find_bytes(transaction_, teaming::bound_uplink, owner)) {
       entry.teaming = of_port("uplink");

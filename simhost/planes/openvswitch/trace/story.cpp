@@ -184,7 +184,7 @@ class Story {
       case Counted::forged:
         return drop("its source is not the client's address", of_port("forbids"));
       case Counted::address_changed:
-        return drop("the client has changed its address", of_port("forbids"));
+        return drop("the client has changed its address", entry_.change);
       case Counted::wrong_tag:
         return drop("the port has no such VLAN", of_port("vlan"));
       case Counted::nested_tag:

@@ -53,6 +53,8 @@ struct Entry {
   SettingOf teaming;
   /// Of what decides that a port sends nothing, if one does.
   SettingOf blocked;
+  /// Of what decides whether the client may change its address.
+  SettingOf change = {};
   /// Of what decides how many addresses are learned there.
   SettingOf limit = {};
   /// Whether there is no room for the source of a frame from an uplink, which is let through.
