@@ -363,7 +363,9 @@ void Daemon::follow_devices() {
   devices_.refresh();
   next_sync_.end();  // what was told so far is looked at here
   wires_.leave_lost(devices_);
-  links_.follow();
+  if (auto const why = links_.follow()) {
+    troubles_.add(*why);
+  }
 }
 
 // Without which a change is in force for most frames only. Where it cannot be, to try once more is

@@ -52,6 +52,25 @@ def test_what_is_counted_on_a_full_disk_is_there_when_it_has_room(lab: Lab) -> N
     assert counters(lab, "a") == of_broadcasts(6)
 
 
+def test_links_that_cannot_be_put_on_a_full_disk_stop_no_other_change(lab: Lab) -> None:
+    network = lab.network("nic0", "nic1")
+    far, one, other = network.client(), lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.comes_to_reach(far)
+    fill(lab)
+    network.pull("nic0")
+    assert comes_true(lambda: FULL in lab.plane()["said"])
+    for port in "ab":
+        lab.set_port("lab", port, vlan=7)
+    assert comes_true(lab.is_in_force)
+    assert one.comes_to_reach(other)
+    for port in "ab":
+        lab.set_port("lab", port, vlan=0)
+    make_room(lab)
+    assert comes_true(lambda: "sends over nic1" in lab.ctl("show"))
+    assert comes_true(lambda: not lab.plane()["said"])
+    assert one.comes_to_reach(far)
+
+
 def test_a_daemon_goes_on_that_cannot_even_say_what_is_wrong(lab: Lab) -> None:
     one = lab.client("lab", "a")
     set_room(lab, 0)

@@ -8,6 +8,13 @@
 #include "storage/running/frames.h"
 
 namespace simhost::daemon {
+namespace {
+
+// Of somebody who writes to the state, and of a disk that is full.
+constexpr auto kUntilFree = std::chrono::milliseconds(10);
+constexpr auto kUntilRoom = std::chrono::milliseconds(500);
+
+}  // namespace
 
 SavedLinks::SavedLinks(events::Loop &loop, storage::Store &store, NetworkDevices const &devices,
                        HeardAt heard_at, std::function<void()> saved)
@@ -17,16 +24,22 @@ SavedLinks::SavedLinks(events::Loop &loop, storage::Store &store, NetworkDevices
       heard_at_(std::move(heard_at)),
       saved_(std::move(saved)) {}
 
-void SavedLinks::follow() {
+std::optional<std::string> SavedLinks::follow() {
   bool differ = false;
   {
     storage::ReadingTransaction transaction(store_);
     differ = links_differ(transaction, devices_, heard_at_);
   }
   next_.end();
-  if (differ && !save()) {
-    save_later();
+  try {
+    if (differ && !save()) {
+      save_later(kUntilFree);
+    }
+  } catch (std::exception const &error) {
+    save_later(kUntilRoom);
+    return error.what();
   }
+  return std::nullopt;
 }
 
 bool SavedLinks::save() {
@@ -37,16 +50,15 @@ bool SavedLinks::save() {
 }
 
 // From a timer, so that nothing is thrown.
-void SavedLinks::save_later() {
-  constexpr auto kUntilFree = std::chrono::milliseconds(10);
-  next_ = loop_.after(kUntilFree, [this] {
+void SavedLinks::save_later(events::Clock::duration wait) {
+  next_ = loop_.after(wait, [this] {
     try {
       if (!save()) {
-        save_later();
+        save_later(kUntilFree);
         return;
       }
     } catch (std::exception const &) {
-      // Whoever looks at the state says what is wrong with it.
+      // Whoever follows them next is told why.
     }
     saved_();
   });
