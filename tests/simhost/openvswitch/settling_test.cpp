@@ -1,8 +1,11 @@
 // A daemon tells that a change is in force, and what it does not tell before.
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
+#include <sys/resource.h>
 
 #include <chrono>
+#include <csignal>
 #include <optional>
+#include <string>
 
 #include "daemon/daemon.h"
 #include "lab.h"
@@ -39,24 +42,69 @@ struct ASettlingDaemon : testing::Test {
   events::Loop loop;
 };
 
-TEST_F(ASettlingDaemon, TellsNobodyBeforeWhatItCountedIsInTheState) {
-  Daemon daemon(loop,
-                {.state = folder.file("host.db"),
-                 .database = openvswitch::Lab::shared().database_socket(),
-                 // One that makes no devices.
-                 .datapath = "dummy"},
-                [](std::string const &) {});
+struct DaemonOfTheState {
+  explicit DaemonOfTheState(ASettlingDaemon &test)
+      : daemon(test.loop,
+               {.state = test.folder.file("host.db"),
+                .database = openvswitch::Lab::shared().database_socket(),
+                // One that makes no devices.
+                .datapath = "dummy"},
+               [](std::string const &) {}) {
+    daemon.when_ready([this] { is_ready = true; });
+    daemon.when_settled([this](std::uint64_t, std::string const &said) {
+      is_told = true;
+      troubles = said;
+    });
+  }
+
+  void connect() { daemon.connect(); }
+
+  Daemon daemon;
   bool is_ready = false;
   bool is_told = false;
-  daemon.when_ready([&] { is_ready = true; });
-  daemon.when_settled([&](std::uint64_t, std::string const &) { is_told = true; });
+  std::string troubles;
+};
+
+// No file that this process writes to becomes larger.
+class FullDisk {
+ public:
+  FullDisk() {
+    std::signal(SIGXFSZ, SIG_IGN);
+    getrlimit(RLIMIT_FSIZE, &before_);
+    rlimit const none{.rlim_cur = 0, .rlim_max = before_.rlim_max};
+    setrlimit(RLIMIT_FSIZE, &none);
+  }
+  FullDisk(FullDisk const &) = delete;
+  FullDisk &operator=(FullDisk const &) = delete;
+  ~FullDisk() { setrlimit(RLIMIT_FSIZE, &before_); }
+
+ private:
+  rlimit before_{};
+};
+
+TEST_F(ASettlingDaemon, TellsNobodyBeforeWhatItCountedIsInTheState) {
+  DaemonOfTheState daemon(*this);
   {
     storage::ChangingTransaction const held(others);
     daemon.connect();
-    turn_until(is_ready);
-    EXPECT_FALSE(is_told);
+    turn_until(daemon.is_ready);
+    EXPECT_FALSE(daemon.is_told);
   }
-  turn_until(is_told);
+  turn_until(daemon.is_told);
+}
+
+TEST_F(ASettlingDaemon, TellsWhyWhatItCountedCannotBePutThere) {
+  DaemonOfTheState daemon(*this);
+  {
+    storage::ChangingTransaction const held(others);
+    daemon.connect();
+    turn_until(daemon.is_ready);
+  }
+  {
+    FullDisk const full;
+    turn_until(daemon.is_told);
+  }
+  EXPECT_THAT(daemon.troubles, testing::HasSubstr("cannot be read or written"));
 }
 
 }  // namespace
