@@ -3,6 +3,11 @@
 
 #include <gmock/gmock.h>
 
+#include <ostream>
+#include <string>
+#include <tuple>
+#include <vector>
+
 #include "events/loop.h"
 #include "lab.h"
 #include "memory_state.h"
@@ -71,6 +76,37 @@ TEST_F(ARunningBridge, IsAsBeforeWhenOpenVswitchRefusesOneOfTheChanges) {
   EXPECT_EQ(bridge.flows(), before);
   EXPECT_THAT(forgotten, testing::ElementsAre(3, 2));
 }
+
+struct Asked {
+  char const *what;
+  void (*ask)(RunningBridge &);
+
+  friend void PrintTo(Asked const &asked, std::ostream *out) { *out << asked.what; }
+};
+
+struct ARunningBridgeThatIsAsked : ARunningBridge, testing::WithParamInterface<Asked> {};
+
+// Which leaves nothing to read for whoever waits for more.
+TEST_P(ARunningBridgeThatIsAsked, TellsWhatCameBeforeTheReply) {
+  std::vector<std::string> altered;
+  told.altered = [&](auto const &name) { altered.push_back(name); };
+  running.apply(wanted({numbered(1, 1)}), 1, {}, nullptr, soon());
+  openvswitch::Lab::shared().ovs_ofctl(
+      {"-OOpenFlow15", "add-flow", "unix:" + bridge.socket().string(), "table=1,actions=drop"});
+  GetParam().ask(running);
+  loop.turn({});
+  EXPECT_THAT(altered, testing::ElementsAre(bridge.name()));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    All, ARunningBridgeThatIsAsked,
+    testing::Values(
+        Asked{"Send", [](RunningBridge &running) { running.send({}, soon()); }},
+        Asked{"Count", [](RunningBridge &running) { running.count(soon()); }},
+        Asked{"Strays", [](RunningBridge &running) { running.look_for_strays(soon()); }},
+        Asked{"Learned", [](RunningBridge &running) { std::ignore = running.learned(soon()); }},
+        Asked{"Age", [](RunningBridge &running) { std::ignore = running.age(soon()); }}),
+    [](auto const &asked) { return asked.param.what; });
 
 }  // namespace
 }  // namespace simhost::daemon
