@@ -19,9 +19,8 @@ NetlinkRequest &NetlinkRequest::with(std::uint16_t type, std::span<std::byte con
   return *this;
 }
 
-nlmsghdr &NetlinkRequest::exchanged() {
-  auto const socket =
-      owned(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE), "netlink");
+nlmsghdr &NetlinkRequest::exchanged(int protocol) {
+  auto const socket = owned(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, protocol), "netlink");
   if (send(socket.number(), bytes_.data(), header().nlmsg_len, 0) < 0) {
     fail_with_errno("netlink");
   }

@@ -1,4 +1,4 @@
-// A request of rtnetlink, and its reply.
+// A request by netlink, and its reply.
 #pragma once
 
 #include <linux/netlink.h>
@@ -28,7 +28,7 @@ class NetlinkRequest {
   }
 
   /// The kernel's reply, which takes the place of the request.
-  nlmsghdr &exchanged();
+  nlmsghdr &exchanged(int protocol = NETLINK_ROUTE);
 
  private:
   nlmsghdr &header() { return *reinterpret_cast<nlmsghdr *>(bytes_.data()); }

@@ -12,6 +12,7 @@
 #include <stdexcept>
 
 #include "events/descriptor.h"
+#include "events/netlink_family.h"
 
 namespace simhost::daemon {
 
@@ -28,7 +29,7 @@ void require_made(WantedBridge const &wanted, std::filesystem::path const &socke
       (!tun || ioctl(tun.number(), TUNGETFEATURES, &features) != 0)) {
     why += fmt::format(", for which it needs {}: {}", kTun, std::strerror(errno));
   }
-  if (wanted.row.datapath == "system" && access("/sys/module/openvswitch", F_OK) != 0) {
+  if (wanted.row.datapath == "system" && !events::has_netlink_family("ovs_datapath")) {
     why += ", for which it needs the kernel's module openvswitch";
   }
   throw std::runtime_error(why);
