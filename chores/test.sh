@@ -148,9 +148,11 @@ leave_out_tests() {
 }
 
 leave_out_frames() {
-  cxx_left_out='^TheNetworkDevices\.|^WhatASwitchLeavesBehind\.|^AProcessWithManySockets\.'
+  cxx_left_out='^TheNetworkDevices\.|^TheWires\.|^WhatASwitchLeavesBehind\.'
+  cxx_left_out=$cxx_left_out'|^AProcessWithManySockets\.|^StateFileAsRoot\.'
   deselected="$deselected --deselect tests/simhostd"
-  summarize "Left out by --no-frames: tests/simhostd, tests/fabric, C++ tests with networks"
+  summarize "Left out by --no-frames: tests/simhostd, tests/fabric, bench/test_fabric_costs.py"
+  summarize "Left out by --no-frames: C++ tests that make namespaces: $cxx_left_out"
 }
 
 may_make_namespaces() {
@@ -200,6 +202,7 @@ test_fuzzers() {
 # The peers of the comparison, without its figures.
 test_peers() {
   if build_peers; then
+    [ -n "$frames" ] || set -- --deselect bench/test_fabric_costs.py "$@"
     pytest "Bench tests" bench.xml '' bench "$@"
   else
     tally "Bench tests" 0 1
