@@ -84,7 +84,9 @@ Daemon::Daemon(events::Loop &loop, Options options, Say say)
             }
           },
           [this](std::string const &why) { troubles_.add(why); }),
-      collectors_(loop, devices_, [this] { sync_soon(); }) {
+      collectors_(loop, devices_, [this] { sync_soon(); }) {}
+
+void Daemon::begin() {
   storage::ChangingTransaction transaction(store_);
   storage::take_frames(transaction);
   transaction.commit();

@@ -44,6 +44,8 @@ class Daemon {
  public:
   /// Opens the state, and becomes its daemon. Throws std::runtime_error if it has one.
   Daemon(events::Loop &loop, Options options, Say say);
+  /// Takes the frames of the state: what changes in it waits for Open vSwitch from now on.
+  void begin();
 
   /// Open vSwitch is there, or there anew: connects to it. For `lives`, of which each stays open
   /// until disconnect() is called, see openvswitch::Stream.

@@ -112,7 +112,6 @@ fabric::Servers servers_of(Words const &words) {
 void serve(Words const &words) {
   auto const own_folder = folder_of_own(words);
   if (own_folder) {
-    // Before the state is taken: what changes in it is pending then until a daemon is there.
     openvswitch::require_package();
   }
   events::Loop loop;
@@ -144,6 +143,10 @@ void serve(Words const &words) {
                 PrivateOpenVswitch::Told{.started = [&] { daemon.connect(own->lives()); },
                                          .ended = [&] { daemon.disconnect(); },
                                          .said = say});
+  }
+  // Not before all is there that it takes: what changes waits then until a daemon is there.
+  daemon.begin();
+  if (own) {
     own->start();
   } else {
     daemon.connect();

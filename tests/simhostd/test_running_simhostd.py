@@ -156,12 +156,29 @@ def test_a_private_open_vswitch_is_one_daemon_s(lab: Lab, tmp_path: Path) -> Non
 
 
 def test_a_folder_that_cannot_be_used_is_told(idle: Lab) -> None:
-    done = idle.host.try_run(
-        *(str(TOOLS / "simhostd"), "--state", str(idle.state), "--openvswitch", "private:/proc/no")
-    )
-    assert done.returncode == 1
-    why = "the folder /proc/no of the Open vSwitch cannot be used: No such file or directory"
-    assert done.stdout == f"simhostd: {why}\n"
+    file, folder = idle.folder / "file", idle.folder / "folder"
+    file.write_text("kept\n")
+    folder.mkdir()
+    unusable = {
+        "/proc/no": "No such file or directory",
+        str(file): "Not a directory",
+        f"{file}/in": "Not a directory",
+        str(folder): "Read-only file system",
+        f"{folder}/in": "Read-only file system",
+    }
+    # The daemon sees a medium there that can only be read; that binds root, too.
+    mount = 'mount -t tmpfs -o ro none "$0" && exec "$@"'
+    for path, why in unusable.items():
+        done = idle.host.try_run(
+            *("unshare", "--mount", "sh", "-c", mount, str(folder)),
+            *(str(TOOLS / "simhostd"), "--state", str(idle.state)),
+            *("--openvswitch", f"private:{path}"),
+        )
+        assert done.returncode == 1, path
+        told = f"simhostd: the folder {path} of the Open vSwitch cannot be used: {why}\n"
+        assert done.stdout == told
+    assert file.read_text() == "kept\n" and not list(folder.iterdir())
+    assert idle.plane()["change"] is None and not idle.processes()
 
 
 def test_paths_are_of_any_bytes(tmp_path: Path) -> None:
