@@ -1,10 +1,14 @@
 """What demonstrations say, and pings that they show."""
 
+import itertools
 import re
-import time
+import signal
+import subprocess
+import threading
 from typing import Callable
 
 from simhost import Client
+from simhost._namespaces import PATIENCE
 
 
 def say(text: str) -> None:
@@ -19,11 +23,21 @@ def ping(client: Client, other: Client, count: int = 3) -> None:
 
 
 def ping_while(client: Client, other: Client, meanwhile: Callable[[], None]) -> None:
-    """Three seconds of pings, and something that happens in the middle."""
-    words = ["ping", "-c", "30", "-i", "0.1", "-W", "0.3", other.address]
-    with client.start(*words, stdout=-1) as pinging:
-        time.sleep(1)
+    """Pings, and something that happens in the middle and after which they go on."""
+    words = ["ping", "-i", "0.1", "-W", "0.3", other.address]
+    # Those that were replied to before and are read after it are fewer.
+    before, after = 10, 20
+    with client.start(*words, stdout=subprocess.PIPE) as pinging:
+        assert pinging.stdout is not None
+        ending = threading.Timer(PATIENCE, pinging.kill)
+        ending.start()
+        replies = (line for line in pinging.stdout if "bytes from" in line)
+        had = len(list(itertools.islice(replies, before)))
         meanwhile()
+        had += len(list(itertools.islice(replies, after)))
+        pinging.send_signal(signal.SIGINT)
         said = pinging.communicate()[0]
+        ending.cancel()
+    assert had == before + after, f"after {had} pings no more were replied to"
     print(f"$ {' '.join(words)}")
     print(next(line for line in said.splitlines() if "received" in line), flush=True)

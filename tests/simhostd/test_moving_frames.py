@@ -291,7 +291,9 @@ def test_the_demo_shows_what_it_says() -> None:
         [sys.executable, demo], stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True
     )
     assert done.returncode == 0, done.stdout
-    joined, cut, joined_again, _, mirrored = re.findall(r"(\d+) received", done.stdout)
+    joined, cut, joined_again, failed_over, mirrored = re.findall(r"(\d+) received", done.stdout)
     assert (joined, cut, joined_again, mirrored) == ("3", "0", "3", "3"), done.stdout
+    # A third of them before the uplink failed.
+    assert int(failed_over) >= 30, done.stdout
     assert "nic0       link down" in done.stdout and "sends over nic1" in done.stdout
     assert done.stdout.count("probe: ") == 2
