@@ -187,3 +187,52 @@ def test_a_mirror_session_past_a_bound_changes_nothing(lab: Lab) -> None:
         lab.set_port("lab", "a", mirror_sessions=[])
         lab.set_port("lab", "b", vlan=0)
     assert one.comes_to_reach(other)
+
+
+def test_what_stands_in_for_wires_is_refused_for_devices(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    far = lab.network("nic0").client()
+    assert one.comes_to_reach(far)
+    of_uplink = "the uplink 'nic0' has the device u0: what comes over it cannot be set"
+    of_port = "the port 'a' of the switch 'lab' has the device c1: what comes over it cannot be set"
+    of_clock = "the frames of the device c1 go by real time"
+    mac = "02:00:00:00:50:01"
+    commands = {
+        ("link", "nic0", "down"): of_uplink,
+        ("link", "nic0", "up"): of_uplink,
+        ("learn", "lab", mac): of_uplink,
+        ("learn", "lab", mac, "--port", "a"): of_port,
+        ("counter", "lab", "pktsInUnicast", "3", "--port", "a"): of_port,
+        ("counter", "lab", "pktsInUnicast", "3", "--port", "uplink1"): of_uplink,
+        ("clock", "stop"): of_clock,
+    }
+    said = {
+        **{"link": "down", "lacp": "up", "speed": 1000, "duplex": "half", "beacons": "down"},
+        **{"error_percent": 3, "driver": False},
+    }
+    learned = {"mac": mac, "type": "learned"}
+    switches: Dict[str, Dict[str, Any]] = {
+        of_port: {"ports": [{"id": "a", "addresses": [learned]}]},
+        of_uplink: {"addresses": [learned]},
+    }
+    documents: Sequence[Tuple[Any, str]] = [
+        *(({"uplinks": [{"name": "nic0", key: said[key]}]}, of_uplink) for key in said),
+        *(({"switches": [{"alias": "lab", **it}]}, why) for why, it in switches.items()),
+        ({"clock": {"stopped": True}}, of_clock),
+    ]
+
+    def host() -> Any:
+        whole = json.loads(lab.ctl("show", "--json"))
+        return state_of(lab), whole["uplinks"], whole["clock"]["stopped"]
+
+    before = host()
+    for words, why in commands.items():
+        done = lab.try_ctl(*words)
+        assert (done.returncode, f"{why} (QEX_NOT_SUPPORTED)" in done.stdout) == (1, True), words
+    for whole, why in documents:
+        done = lab.try_ctl("apply", "-", given=json.dumps(whole))
+        assert (done.returncode, f"{why} (QEX_NOT_SUPPORTED)" in done.stdout) == (1, True), whole
+    assert host() == before
+    # What has no device has none of it refused.
+    lab.ctl("uplink", "nic1", "--link", "down", "--speed", "1000", "--duplex", "half")
+    assert one.comes_to_reach(far)
