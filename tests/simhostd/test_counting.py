@@ -4,8 +4,9 @@ import json
 import os
 import signal
 import socket
+import sqlite3
 import subprocess
-from typing import Any, Dict
+from typing import Any, Dict, Set
 
 import pytest
 
@@ -120,6 +121,28 @@ def test_counters_of_a_restarted_host_begin_anew(lab: Lab) -> None:
     come_to_count(lab, 0)
     send(one, 2, BROADCAST)
     come_to_count(lab, 2)
+
+
+def test_counters_do_not_fall_when_a_daemon_with_its_own_open_vswitch_is_killed(lab: Lab) -> None:
+    one = lab.client("lab", "a")
+    send(one, 3, BROADCAST)
+    come_to_count(lab, 3)
+    # What has been put into the state is there whatever becomes of the daemon.
+    assert comes_true(lambda: 3 in kept_counts(lab))
+    lab.stop(signal.SIGKILL)
+    come_to_count(lab, 3)
+    lab.start()
+    come_to_count(lab, 3)
+    send(one, 4, BROADCAST)
+    come_to_count(lab, 7)
+
+
+def kept_counts(lab: Lab) -> Set[int]:
+    """The values of counters in the state."""
+    state = sqlite3.connect(lab.state)
+    rows = state.execute("SELECT value FROM counter").fetchall()
+    state.close()
+    return {value for (value,) in rows}
 
 
 def test_what_an_open_vswitch_that_stays_counts_without_a_daemon_is_counted(idle: Lab) -> None:
