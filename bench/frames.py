@@ -18,6 +18,7 @@ from pathlib import Path
 from statistics import median
 from typing import Dict, Iterator, List, NamedTuple, Sequence, Tuple
 
+from come_back import gaps
 from targets import FRAMES, NOISE
 
 from frame_lab import Lab
@@ -39,10 +40,11 @@ class Effort(NamedTuple):
     flooded: int
     broadcasts: int
     resynced: int  # ports of the switch whose flows are gone
+    ends: int  # of each of what frames come back after
 
 
-FULL = Effort(9, 0.5, 3_000, 9, 20, (100, 1_000), 1_000, 3_000, 20, 500)
-QUICK = Effort(2, 0.1, 200, 2, 5, (10, 100), 100, 300, 3, 100)
+FULL = Effort(9, 0.5, 3_000, 9, 20, (100, 1_000), 1_000, 3_000, 20, 500, 5)
+QUICK = Effort(2, 0.1, 200, 2, 5, (10, 100), 100, 300, 3, 100, 1)
 
 
 class Row(NamedTuple):
@@ -312,6 +314,11 @@ def resync_rows(effort: Effort) -> Iterator[Row]:
     yield Row(f"a daemon resyncs {flows:,} flows", min(seconds), "s", "resync")
 
 
+def come_back_rows(effort: Effort) -> Iterator[Row]:
+    for name, seconds in gaps(effort.ends):
+        yield Row(f"no frames: {name}", seconds, "s", "come back")
+
+
 def rows(effort: Effort, quick: bool) -> Iterator[Row]:
     yield from frame_rows(effort)
     yield from call_rows(effort, quick)
@@ -319,6 +326,7 @@ def rows(effort: Effort, quick: bool) -> Iterator[Row]:
     yield from from_nothing_rows(effort)
     yield from flood_rows(effort)
     yield from resync_rows(effort)
+    yield from come_back_rows(effort)
 
 
 def main() -> int:

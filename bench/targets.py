@@ -92,6 +92,7 @@ FRAMES: Dict[str, Dict[str, float]] = {
     "change, 1,000 ports": {"most": 20.0},
     "from nothing": {"most": 2.0},
     "resync": {"most": 0.2},
+    "come back": {"most": 2.0},
 }
 """For a figure of real frames, in its own unit: what it is to be at least, and at most."""
 

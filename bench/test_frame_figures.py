@@ -4,6 +4,7 @@ from typing import List
 
 import pytest
 
+import come_back
 import frames
 
 
@@ -27,3 +28,7 @@ def test_a_copy_too_few_or_too_many_is_noticed(counts: List[int]) -> None:
     frames.check_copies([0, 2, 2], 2)
     with pytest.raises(AssertionError):
         frames.check_copies(counts, 2)
+
+
+def test_the_longest_time_without_a_frame_is_found() -> None:
+    assert come_back.longest([1.0, 1.5, 4.0, 4.25]) == 2.5
