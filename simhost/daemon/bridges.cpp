@@ -181,6 +181,12 @@ std::vector<Learned> Bridges::learned(storage::SwitchKey key) {
   return bridge == nullptr ? std::vector<Learned>() : bridge->learned(soon());
 }
 
+bool Bridges::forget_learned(storage::SwitchKey key, std::uint32_t port,
+                             KnownAddress const &address) {
+  auto *const bridge = find(key);
+  return bridge != nullptr && bridge->forget_learned(port, address, soon());
+}
+
 Unseen Bridges::age() {
   auto next = kBetweenLooks;
   for (auto const &[key, bridge] : bridges_) {

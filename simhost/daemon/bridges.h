@@ -70,6 +70,8 @@ class Bridges {
   void count(storage::SwitchKey key);
   /// What the bridge of a switch has learned.
   std::vector<Learned> learned(storage::SwitchKey key);
+  /// See RunningBridge::forget_learned().
+  bool forget_learned(storage::SwitchKey key, std::uint32_t port, KnownAddress const &address);
   /// Looks when addresses were seen last, and takes out those for which that is too long ago.
   /// Returns when to do so again.
   Unseen age();

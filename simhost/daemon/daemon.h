@@ -96,6 +96,7 @@ class Daemon {
   // Nothing if Open vSwitch cannot be reached.
   [[nodiscard]] std::optional<std::vector<Learned>> learned_of(storage::SwitchKey key);
   [[nodiscard]] Json addresses(Json const &question);
+  [[nodiscard]] Json forget_learned(Json const &question);
   void count_of(storage::SwitchKey key);
   [[nodiscard]] Json counters(Json const &question);
   [[nodiscard]] Json counting_sessions(Json const &question);

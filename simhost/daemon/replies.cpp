@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "daemon/bridge/cached_flows.h"
 #include "daemon/daemon.h"
 #include "daemon/devices/packet_sizes.h"
 #include "daemon/learned/source_facts.h"
@@ -56,6 +57,7 @@ Questions Daemon::questions() {
       {"carry", told_by(&Daemon::carry)},
       {"carrier", told_by(&Daemon::carrier)},
       {"addresses", told_by(&Daemon::addresses)},
+      {"forget learned", told_by(&Daemon::forget_learned)},
       {"counters", told_by(&Daemon::counters)},
       {"sessions", told_by(&Daemon::counting_sessions)},
       {"bridge", told_by(&Daemon::bridge)},
@@ -107,6 +109,32 @@ Json Daemon::addresses(Json const &question) {
     }
   }
   return {{"addresses", entries}};
+}
+
+// What the data path has not added up yet would teach it once more, and what it remembers still
+// goes there.
+Json Daemon::forget_learned(Json const &question) {
+  auto const forget_cached = [this] {
+    simhost::daemon::forget_cached_flows(options_.database.parent_path(), lives_);
+  };
+  bool was_learned = false;
+  try {
+    if (!bridges_) {
+      return {{"refused", "Open vSwitch cannot be reached: " + troubles_.text()}};
+    }
+    forget_cached();
+    was_learned =
+        bridges_->forget_learned(switch_in(question), question.at("port").get<std::uint32_t>(),
+                                 {question.at("mac").get<openflow::EthernetAddress>(),
+                                  question.at("vlan").get<std::uint16_t>()});
+    if (was_learned) {
+      forget_cached();
+    }
+  } catch (std::runtime_error const &error) {
+    fail(error.what());
+    return {{"refused", error.what()}};
+  }
+  return {{"learned", was_learned}};
 }
 
 Json Daemon::is_there(Json const &question) {

@@ -51,6 +51,12 @@ void add_changes(openvswitch::Difference const &difference, openflow::Changes &c
   }
 }
 
+void add_removals(std::vector<Flow> const &flows, openflow::Changes &changes) {
+  for (auto const &flow : flows) {
+    changes.emplace_back(openflow::FlowChange{.command = FlowCommand::remove_strict, .flow = flow});
+  }
+}
+
 void add_forgetting(openflow::Changes &changes) {
   for (auto number = openvswitch::table::kFirstAddresses; openvswitch::table::is_learned(number);
        ++number) {

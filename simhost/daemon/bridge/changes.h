@@ -16,6 +16,8 @@ namespace simhost::daemon {
 bool is_marker(openflow::FlowEntry const &entry);
 /// In the order in which nothing refers to what is not there.
 void add_changes(openvswitch::Difference const &difference, openflow::Changes &changes);
+/// These go, if they are there.
+void add_removals(std::vector<openflow::Flow> const &flows, openflow::Changes &changes);
 /// All that the bridge learned goes: before anything that teaches it otherwise.
 void add_forgetting(openflow::Changes &changes);
 /// The meters that flows send frames through.

@@ -269,6 +269,21 @@ std::vector<Flow> RunningBridge::learned_flows(openvswitch::LearnedFlows const &
   return flows;
 }
 
+// What is put somewhere is not where it was learned, and not there again when it is taken away.
+std::vector<Flow> RunningBridge::learned_elsewhere(
+    openvswitch::Difference const &difference) const {
+  std::vector<Flow> learned;
+  for (auto const &flow : difference.added_flows) {
+    if (flow.table == openvswitch::table::kFixedAddresses) {
+      if (auto const known = find_known_address(flow.match, openflow::Field::eth_dst)) {
+        std::ranges::move(memory_.learned_of(key_, known->first, known->second),
+                          std::back_inserter(learned));
+      }
+    }
+  }
+  return learned;
+}
+
 std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t change,
                                  std::set<std::string> const &added, Forget const &forget,
                                  Deadline deadline) {
@@ -300,6 +315,9 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
     count(deadline);
   }
   meters_.add(connection_, difference.added_flows, deadline);
+  if (!is_new) {
+    add_removals(learned_elsewhere(difference), changes);
+  }
   add_changes(difference, changes);
   if (change_ != change) {
     changes.emplace_back(openflow::FlowChange{.command = FlowCommand::add,
@@ -349,6 +367,25 @@ std::vector<Learned> RunningBridge::learned(Deadline deadline) {
   return learned_of(flows, sources);
 }
 
+bool RunningBridge::forget_learned(std::uint32_t port, KnownAddress const &address,
+                                   Deadline deadline) {
+  connection_.receive();
+  follow_events();
+  auto const flows = memory_.learned_of(key_, address.first, address.second);
+  auto const is_there = [&](Flow const &flow) {
+    return flow.table == openvswitch::table::kLearnedAddresses &&
+           openvswitch::number_of(flow.cookie) == port;
+  };
+  if (std::ranges::none_of(flows, is_there)) {
+    return false;
+  }
+  openflow::Changes changes;
+  add_removals(flows, changes);
+  connection_.change(changes, deadline);
+  follow_events();
+  return true;
+}
+
 std::vector<Source> RunningBridge::age(Deadline deadline) {
   auto const entries = connection_.flows({.table = openvswitch::table::kCountedSources}, deadline);
   follow_events();
@@ -357,10 +394,7 @@ std::vector<Source> RunningBridge::age(Deadline deadline) {
   std::erase_if(sources, [&](Source const &source) {
     bool const goes = is_aged(source.unseen, aging_);
     if (goes) {
-      for (auto const &flow : {where_learned(source.flow), source.flow}) {
-        changes.emplace_back(
-            openflow::FlowChange{.command = FlowCommand::remove_strict, .flow = flow});
-      }
+      add_removals({where_learned(source.flow), source.flow}, changes);
     }
     return goes;
   });

@@ -82,6 +82,10 @@ class RunningBridge {
   /// Looks for what strayed where so much comes and goes that nobody follows it.
   void look_for_strays(openvswitch::Deadline deadline);
   std::vector<Learned> learned(openvswitch::Deadline deadline);
+  /// Takes out what is learned of an address in a VLAN at a port (0: beyond the uplinks). Returns
+  /// whether anything is.
+  bool forget_learned(std::uint32_t port, KnownAddress const &address,
+                      openvswitch::Deadline deadline);
   /// Returns when the addresses that stay were seen last; the others are taken out.
   std::vector<Source> age(openvswitch::Deadline deadline);
 
@@ -94,6 +98,8 @@ class RunningBridge {
                      openvswitch::Deadline deadline);
   void add_renewed(WantedBridge const &wanted, openvswitch::Difference &difference,
                    openvswitch::Deadline deadline);
+  [[nodiscard]] std::vector<openflow::Flow> learned_elsewhere(
+      openvswitch::Difference const &difference) const;
   std::vector<openflow::Flow> learned_flows(openvswitch::LearnedFlows const &learned,
                                             openvswitch::Deadline deadline);
   void read_events();

@@ -3,8 +3,6 @@
 
 #include <chrono>
 #include <map>
-#include <optional>
-#include <utility>
 
 #include "daemon/learned/memory.h"
 #include "planes/openvswitch/compile/pipeline.h"
@@ -12,24 +10,10 @@
 namespace simhost::daemon {
 namespace {
 
-// An address, in its VLAN.
-using KnownAddress = std::pair<openflow::EthernetAddress, std::uint16_t>;
-
-std::optional<KnownAddress> find_address(openflow::Match const &match, openflow::Field field) {
-  auto const &fields = match.fields();
-  auto const address = fields.find(field);
-  auto const vlan = fields.find(openvswitch::field::kDomain);
-  if (address == fields.end() || vlan == fields.end()) {
-    return std::nullopt;
-  }
-  return KnownAddress(openflow::to_address<6>(address->second.value),
-                      static_cast<std::uint16_t>(vlan->second.value));
-}
-
 std::map<KnownAddress, Unseen> by_address(std::span<Source const> sources) {
   std::map<KnownAddress, Unseen> unseen;
   for (auto const &source : sources) {
-    if (auto const known = find_address(source.flow.match, openflow::Field::eth_src)) {
+    if (auto const known = find_known_address(source.flow.match, openflow::Field::eth_src)) {
       unseen.emplace(*known, source.unseen);
     }
   }
@@ -42,12 +26,24 @@ std::uint32_t seconds(std::chrono::nanoseconds time) {
 
 }  // namespace
 
+std::optional<KnownAddress> find_known_address(openflow::Match const &match,
+                                               openflow::Field field) {
+  auto const &fields = match.fields();
+  auto const address = fields.find(field);
+  auto const vlan = fields.find(openvswitch::field::kDomain);
+  if (address == fields.end() || vlan == fields.end()) {
+    return std::nullopt;
+  }
+  return KnownAddress(openflow::to_address<6>(address->second.value),
+                      static_cast<std::uint16_t>(vlan->second.value));
+}
+
 std::vector<Learned> learned_of(std::span<openflow::FlowEntry const> flows,
                                 std::span<Source const> sources) {
   std::vector<Learned> all;
   auto const unseen = by_address(sources);
   for (auto const &entry : flows) {
-    auto const known = find_address(entry.flow.match, openflow::Field::eth_dst);
+    auto const known = find_known_address(entry.flow.match, openflow::Field::eth_dst);
     if (known && learned_in(entry.flow)) {
       auto const source = unseen.find(*known);
       all.push_back({.address = known->first,

@@ -2,13 +2,22 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <span>
+#include <utility>
 #include <vector>
 
 #include "daemon/learned/ageing.h"
 #include "planes/openvswitch/openflow/replies.h"
 
 namespace simhost::daemon {
+
+/// An address, in its VLAN.
+using KnownAddress = std::pair<openflow::EthernetAddress, std::uint16_t>;
+
+/// That by which a flow goes, as a source or a destination; nothing of one that goes by none, or in
+/// whichever VLAN.
+std::optional<KnownAddress> find_known_address(openflow::Match const &match, openflow::Field field);
 
 /// An address that a bridge has learned.
 struct Learned {

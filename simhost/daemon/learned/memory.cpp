@@ -275,6 +275,25 @@ std::vector<Flow> Memory::learned_addresses(storage::SwitchKey key) const {
       key, [](Flow const &flow) { return flow.table == openvswitch::table::kLearnedAddresses; });
 }
 
+std::vector<Flow> Memory::learned_of(storage::SwitchKey key,
+                                     openflow::EthernetAddress const &address,
+                                     std::uint16_t vlan) const {
+  std::vector<Flow> flows;
+  auto const bridge = bridges_.find(key);
+  for (auto const as : {RememberedAs::learned, RememberedAs::counted}) {
+    Remembered learned{.as = as, .vlan = vlan, .mac = {}, .port = std::nullopt};
+    std::ranges::transform(address, learned.mac.begin(),
+                           [](std::uint8_t one) { return std::byte{one}; });
+    if (bridge != bridges_.end()) {
+      auto const known = bridge->second.flows.find(openflow::place(flow_of(learned)));
+      if (known != bridge->second.flows.end()) {
+        flows.push_back(known->second.flow);
+      }
+    }
+  }
+  return flows;
+}
+
 std::vector<Flow> Memory::learned(storage::SwitchKey key, LearnedFlows const &known) const {
   return flows_that(key, [&](Flow const &flow) {
     return flow.table == known.table && flow.cookie == known.cookie;

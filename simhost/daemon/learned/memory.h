@@ -56,6 +56,10 @@ class Memory {
                                                        std::uint32_t port) const;
   /// The addresses that are learned at any port, or beyond the uplinks.
   [[nodiscard]] std::vector<openflow::Flow> learned_addresses(storage::SwitchKey key) const;
+  /// What is learned of an address in a VLAN: where it is, and that it has room.
+  [[nodiscard]] std::vector<openflow::Flow> learned_of(storage::SwitchKey key,
+                                                       openflow::EthernetAddress const &address,
+                                                       std::uint16_t vlan) const;
   /// Likewise what a cookie knows, but for table::kRecentSources, which is not followed.
   [[nodiscard]] std::vector<openflow::Flow> learned(storage::SwitchKey key,
                                                     openvswitch::LearnedFlows const &known) const;

@@ -146,6 +146,24 @@ Json question_about(std::string_view what, Place const &place) {
           {"port", place.port ? static_cast<std::uint32_t>(*place.port) : 0}};
 }
 
+// Whether an address was put there, and is not any more.
+bool remove_fixed(Plane &stored, storage::ChangingTransaction &transaction, Place const &place,
+                  VSMACEntry const &entry) {
+  for (auto const type : {VS_MAC_ADDR_TYPE_STATIC, VS_MAC_ADDR_TYPE_USER}) {
+    try {
+      auto fixed = entry;
+      fixed.macAddrType = type;
+      stored.remove_address(transaction, place, fixed);
+      return true;
+    } catch (Refused const &refused) {
+      if (refused.status() != QEX_NOT_FOUND) {
+        throw;
+      }
+    }
+  }
+  return false;
+}
+
 // By what is sent, which the state does not know.
 bool goes_by_load(storage::Transaction &transaction, storage::Port const &port) {
   auto const owner = storage::PropertyOwner::port(port.switch_key, port.number);
@@ -400,7 +418,20 @@ void OpenVswitchPlane::put_address(storage::ChangingTransaction &transaction, Pl
 
 void OpenVswitchPlane::remove_address(storage::ChangingTransaction &transaction, Place const &place,
                                       VSMACEntry const &entry) {
-  stored_.remove_address(transaction, place, entry);
+  bool const may_be_learned =
+      entry.macAddrType == VS_MAC_ADDR_TYPE_LEARNED || entry.macAddrType == VS_MAC_ADDR_TYPE_ALL;
+  if (!may_be_learned || !has_frames(transaction, place)) {
+    stored_.remove_address(transaction, place, entry);
+  } else if (entry.macAddrType == VS_MAC_ADDR_TYPE_LEARNED ||
+             !remove_fixed(stored_, transaction, place, entry)) {
+    auto question = question_about("forget learned", place);
+    question["mac"] = std::to_array(entry.macAddress);
+    question["vlan"] = qex_uint16{entry.vid};
+    // Frames are in no virtual network.
+    if (entry.vni != 0 || !asked(file_, question).at("learned").get<bool>()) {
+      throw Refused(QEX_NOT_FOUND);
+    }
+  }
 }
 
 void OpenVswitchPlane::restart(storage::ChangingTransaction &transaction) {
