@@ -121,6 +121,34 @@ def test_what_has_no_addresses_keeps_to_one(links: Links) -> None:
     assert links.accepted(P1) == links.accepted(BROADCAST) == {"nic0", "nic1"}
 
 
+def from_address(number: int, is_ipv6: bool) -> Frame:
+    """One flow of sixteen, by its address."""
+    if is_ipv6:
+        header = bytes.fromhex("86dd" "6000000000003b40")
+        addresses = [bytes.fromhex("fd00" + 13 * "00") + bytes([at]) for at in (number, 0xFF)]
+    else:
+        header = bytes.fromhex("0800" "450000140000000040000000")
+        addresses = [bytes([10, 0, 0, at]) for at in (number, 0xFF)]
+    return Frame(STRANGER, P1, content=header + b"".join(addresses) + bytes(30))
+
+
+@pytest.mark.parametrize("is_ipv6", [False, True])
+def test_flows_keep_to_one_by_their_addresses(links: Links, is_ipv6: bool) -> None:
+    links.have(balance="ip", active=["nic0", "nic1"])
+
+    def used() -> List[str]:
+        sent = [links.send("p1", from_address(number, is_ipv6)) for number in range(1, 17)]
+        return [uplink for copies in sent for uplink, _, _ in copies]
+
+    before = used()
+    assert len(before) == 16 and set(before) == {"nic0", "nic1"}
+    assert used() == before
+    links.down("nic0")
+    assert used() == 16 * ["nic1"]
+    links.up("nic0")
+    assert used() == before
+
+
 def test_a_group_is_one_link(links: Links) -> None:
     switch = {
         "uplinks": list(UPLINKS),
