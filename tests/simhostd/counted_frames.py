@@ -11,7 +11,7 @@ from simhost._namespaces import PATIENCE
 BROADCAST, MULTICAST = "ff:ff:ff:ff:ff:ff", "01:00:5e:01:02:03"
 LENGTH = 60
 # A type of Ethernet that is nobody's.
-PLAIN, IN_VLAN_5 = "88b5", "8100000588b5"
+PLAIN, IN_VLAN_5, IN_VLAN_7 = "88b5", "8100000588b5", "8100000788b5"
 
 
 def send(client: Client, times: int, to: str, source: str = "", head: str = PLAIN) -> None:

@@ -1,7 +1,8 @@
 """Clients that move to another uplink, or come to a port, are announced to the network."""
 
 import sqlite3
-from typing import Tuple
+import time
+from typing import List, Tuple
 
 import pytest
 
@@ -18,11 +19,25 @@ def reverse_arp(mac: str) -> bytes:
     return packet.ljust(60, b"\0")
 
 
+SENT = """
+from libvswitch import checked
+sent = checked.VSQEX_GetRARPStats("lab")
+print(sent.rarpPktsSent, sent.rarpTime, sent.maxRARPTime)
+"""
+
+
+def counted(lab: Lab) -> List[int]:
+    """How many were sent, when the last one was, and the time that nobody counts."""
+    return [int(said) for said in lab.python(SENT).split()]
+
+
 def sent(lab: Lab) -> int:
-    program = (
-        "from libvswitch import checked; print(checked.VSQEX_GetRARPStats('lab').rarpPktsSent)"
-    )
-    return int(lab.python(program))
+    return counted(lab)[0]
+
+
+def now() -> int:
+    """As the clock of a host says it."""
+    return int(time.time() * 1000)
 
 
 Around = Tuple[Network, Client]
@@ -63,10 +78,14 @@ def test_a_client_is_announced_when_its_device_is_connected(lab: Lab, around: Ar
     network, far = around
     lab.set_port("lab", "a", vlan=7)
     mac = "02:00:00:00:00:77"
+    begun = now()
     lab.frames.client("lab", "a", mac=mac)
     packet = tagged(reverse_arp(mac), 7)
     far.expect(packet)
     assert network.came_over(mac) == "nic0"
+    assert comes_true(lambda: sent(lab) == 1)
+    _, when, longest = counted(lab)
+    assert begun <= when <= now() and longest == 0
     # A daemon that comes later has no news.
     lab.stop()
     lab.start()

@@ -6,11 +6,21 @@ import signal
 import socket
 import sqlite3
 import subprocess
-from typing import Any, Dict, Set
+from typing import Any, Dict, Set, Tuple
 
 import pytest
 
-from counted_frames import BROADCAST, IN_VLAN_5, LENGTH, MULTICAST, come_to, counters, send
+from counted_frames import (
+    BROADCAST,
+    IN_VLAN_5,
+    IN_VLAN_7,
+    LENGTH,
+    MULTICAST,
+    PLAIN,
+    come_to,
+    counters,
+    send,
+)
 from frame_lab import TOOLS, Lab, comes_true, learned_ages
 from lasting_open_vswitch import LastingOpenVSwitch
 
@@ -61,6 +71,67 @@ def test_what_is_not_let_in_is_dropped(lab: Lab) -> None:
     lab.set_port("lab", "a", blocked=True)
     send(one, 2, BROADCAST)
     come_to(lambda: counters(lab, "a"), {**counted, "pktsInDropped": 11})
+
+
+def traffic(**rows: Tuple[int, int]) -> Dict[str, int]:
+    """Counters of so many frames of that length each, by where they went and to whom."""
+    counted: Dict[str, int] = {}
+    for name, (frames, length) in rows.items():
+        counted.update({f"pkts{name}": frames, f"bytes{name}": frames * length})
+    return counted
+
+
+def test_frames_count_at_ports_of_every_kind(lab: Lab) -> None:
+    kinds: Dict[str, Dict[str, Any]] = {
+        "access": {"vlan": 5},
+        "trunk": {"vlan": {"trunk": [5]}, "nested_tag": True},
+        "curious": {"vlan": 5, "ethernet_filter": {"frames": ["promiscuous"]}},
+        "isolated": {"vlan": 71},
+        "alone": {"vlan": 71},
+        "server": {"vlan": 70},
+    }
+    private = [
+        {"primary": 70, "secondary": secondary, "type": kind}
+        for secondary, kind in ((70, "promiscuous"), (71, "isolated"))
+    ]
+    ports = [{"id": port, **settings} for port, settings in kinds.items()]
+    lab.apply({"switches": [{"alias": "lab", "private_vlans": private, "ports": ports}]})
+    macs = {port: f"02:00:00:00:00:0{number}" for number, port in enumerate(kinds, 1)}
+    clients = {port: lab.frames.client("lab", port, mac=mac) for port, mac in macs.items()}
+    # A second tag may not leave at the others. Once one without has passed, Open vSwitch would take
+    # these for such.
+    send(clients["trunk"], 2, BROADCAST, head=IN_VLAN_5[:8] + IN_VLAN_7)
+    send(clients["trunk"], 3, BROADCAST, head=IN_VLAN_5)
+    send(clients["access"], 4, macs["trunk"])
+    send(clients["access"], 5, macs["trunk"], head=IN_VLAN_5)
+    send(clients["isolated"], 6, BROADCAST)
+    from_trunk = {"OutBroadcast": (3, LENGTH)}
+    wanted = {
+        "access": {**traffic(InUnicast=(4, LENGTH), **from_trunk), "pktsInDropped": 5},
+        "trunk": traffic(InBroadcast=(5, LENGTH), OutUnicast=(4, LENGTH)),
+        "curious": traffic(OutUnicast=(4, LENGTH), **from_trunk),
+        "isolated": traffic(InBroadcast=(6, LENGTH)),
+        "alone": {},
+        "server": traffic(OutBroadcast=(6, LENGTH)),
+    }
+    come_to(lambda: {port: counters(lab, port) for port in kinds}, wanted)
+
+
+def test_a_frame_that_is_too_large_counts_and_goes_nowhere(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    for near, client in (("c1", one), ("c2", other)):
+        lab.host.run("ip", "link", "set", near, "mtu", "2000")
+        client.namespace.run("ip", "link", "set", "eth0", "mtu", "2000")
+    head = bytes.fromhex((BROADCAST + one.mac).replace(":", "") + PLAIN)
+    # The MTU, with a header of Ethernet, and one byte more.
+    whole, larger = (head.ljust(length, b".") for length in (1514, 1515))
+    for sent in (larger, whole):
+        one.send(sent)
+    other.expect(whole)
+    other.expect_none(larger, timeout=0)
+    for port, way in (("a", "In"), ("b", "Out")):
+        counted = {f"pkts{way}Broadcast": 2, f"bytes{way}Broadcast": 1514 + 1515}
+        come_to(lambda: counters(lab, port), counted)
 
 
 def come_to_count(lab: Lab, frames: int) -> None:
@@ -157,21 +228,51 @@ def test_what_an_open_vswitch_that_stays_counts_without_a_daemon_is_counted(idle
         come_to_count(idle, 7)
 
 
+AT_A, AT_NIC0, IN_VLAN = {"port": "a"}, {"uplink": "nic0"}, {"vlan": 7}
+TO_B, TO_C, TO_NOBODY = {"port": "b"}, {"port": "c"}, {"port": "d"}
+# What they copy of three frames from port a and two from beyond nic0, all of VLAN 7.
+SESSIONS: Dict[str, Tuple[Dict[str, Any], Dict[str, int]]] = {
+    "of a port": ({"sent_by": [AT_A]}, {"mirroredPkts": 3, "mirrorPktCnt": 3}),
+    "to a port": ({"received_by": [AT_A]}, {"mirroredPkts": 2, "mirrorPktCnt": 2}),
+    "both ways": (
+        {"sent_by": [AT_A], "received_by": [AT_A]},
+        {"mirroredPkts": 5, "mirrorPktCnt": 5},
+    ),
+    "of a VLAN": ({"sent_by": [IN_VLAN]}, {"mirroredPkts": 3, "mirrorPktCnt": 3}),
+    "to a VLAN": ({"received_by": [IN_VLAN]}, {"mirroredPkts": 2, "mirrorPktCnt": 2}),
+    "to an uplink": ({"sent_by": [AT_NIC0]}, {"mirroredPkts": 3, "mirrorPktCnt": 3}),
+    "of an uplink": ({"received_by": [AT_NIC0]}, {"mirroredPkts": 2, "mirrorPktCnt": 2}),
+    "cut": ({"sent_by": [AT_A], "snap_length": 20}, {"mirroredPkts": 3, "mirrorPktCnt": 3}),
+    "to two": (
+        {"sent_by": [AT_A], "to": [TO_B, TO_C]},
+        {"mirroredPkts": 3, "mirrorPktCnt": 6},
+    ),
+    "to one of two": (
+        {"sent_by": [AT_A], "to": [TO_B, TO_NOBODY]},
+        {"mirroredPkts": 3, "mirrorPktCnt": 3},
+    ),
+    "to nobody": ({"sent_by": [AT_A], "to": [TO_NOBODY]}, {"discardedPkts": 3}),
+    "disabled": ({"sent_by": [AT_A], "disabled": True}, {}),
+}
+
+
 def test_mirror_sessions_count_what_they_copy(lab: Lab) -> None:
-    one = lab.client("lab", "a")
-    lab.client("lab", "b")
-    to = [{"port": "b"}, {"port": "c"}]
-    session = {"sid": "s", "to": to, "sent_by": [{"port": "a"}]}
-    lab.set_port("lab", "b", vlan=99)
-    lab.set_port("lab", "a", mirror_sessions=[session])
+    beyond = lab.network("nic0").client()
+    one, *_ = (lab.client("lab", port) for port in "abc")
+    for port in "bcd":
+        lab.set_port("lab", port, vlan=99)
+    sessions = [{"sid": sid, "to": [TO_B], **said} for sid, (said, _) in SESSIONS.items()]
+    lab.set_port("lab", "a", vlan=7, mirror_sessions=sessions)
 
     def counted() -> Any:
         (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
         return switch["mirror_counters"]
 
     send(one, 3, BROADCAST)
-    # No device is at c.
-    come_to(counted, {"s": {"mirroredPkts": 3, "mirrorPktCnt": 3}})
+    send(beyond, 2, BROADCAST, head=IN_VLAN_7)
+    come_to(counted, {sid: values for sid, (_, values) in SESSIONS.items() if values})
+    # Copies are none of what is sent out at a port.
+    assert counters(lab, "b") == {}
 
 
 REFUSED = "simhostctl: {} has the device {}: what comes over it cannot be set (QEX_NOT_SUPPORTED)\n"
