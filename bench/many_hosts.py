@@ -217,8 +217,9 @@ class _Caller:
         """When the call began, and when it returned."""
         assert self._process.stdin is not None and self._process.stdout is not None
         print(port, vlan, file=self._process.stdin, flush=True)
-        status, began, returned = json.loads(self._process.stdout.readline())
-        assert status == 0, status
+        refusal, began, returned = json.loads(self._process.stdout.readline())
+        if refusal:
+            raise RuntimeError(f"a change was refused: {refusal}")
         return began, returned
 
     def __enter__(self) -> "_Caller":
@@ -231,10 +232,15 @@ class _Caller:
 
 _CALLS = f"""
 import json, sys, time
-import _libvswitch as vs
+from libvswitch import checked
+from libvswitch.errors import HostError
 for line in sys.stdin:
     port, vlan = line.split()
+    refusal = ""
     began = time.monotonic()
-    status = vs.VSDVS_SetPortVLANPolicy({SWITCH!r}, port, int(vlan), 0, 0, 0, None, 0)
-    print(json.dumps([status, began, time.monotonic()]), flush=True)
+    try:
+        checked.VSDVS_SetPortVLANPolicy({SWITCH!r}, port, int(vlan), 0, False, False)
+    except HostError as why:
+        refusal = str(why)
+    print(json.dumps([refusal, began, time.monotonic()]), flush=True)
 """
