@@ -90,9 +90,9 @@ def test_a_fabric_is_told_of_a_full_disk_and_when_it_has_room(tmp_path: Path) ->
         other.ctl("join", "lab")
         client = one.client("lab", "a")
 
-        def troubles() -> str:
+        def troubles(where: str = "frames") -> str:
             (row,) = lab.databases.rows("Host", name="one")
-            return str(dict(row["errors"][1]).get("frames", ""))
+            return str(dict(row["errors"][1]).get(where, ""))
 
         # What others have changed is to be in the state already.
         assert comes_true(lambda: are_reported(lab) and troubles() == "")
@@ -103,7 +103,13 @@ def test_a_fabric_is_told_of_a_full_disk_and_when_it_has_room(tmp_path: Path) ->
         one.host.run("ip", "link", "add", "new", "type", "veth", "peer", "name", "newer")
         come_to(lambda: counters(one, "a"), of_broadcasts(4))
         assert FULL in one.plane()["said"]
+        # The servers are not to tell all that there is again and again meanwhile.
+        connections = one.log().count("the fabric is at")
+        other.set_port("lab", "a", vlan=7)
+        assert comes_true(lambda: FULL in troubles("state")), one.log()
         make_room(one)
-        assert comes_true(lambda: troubles() == "")
+        assert comes_true(lambda: one.ports("lab")["a"].get("vlan") == 7)
+        assert comes_true(lambda: troubles() == troubles("state") == "")
+        assert one.log().count("the fabric is at") == connections
         other.client("lab", "a")
         come_to(lambda: counters(other, "a"), of_broadcasts(4))

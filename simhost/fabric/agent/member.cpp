@@ -21,7 +21,9 @@ namespace {
 
 using namespace std::chrono_literals;
 
-constexpr events::Clock::duration kReconnect = 100ms;
+// Each attempt may have a server tell all that there is.
+constexpr events::Clock::duration kFirstPause = 100ms;
+constexpr events::Clock::duration kLongestPause = 1s;
 constexpr events::Clock::duration kFirstWait = 2ms;
 constexpr events::Clock::duration kLongestWait = 50ms;
 constexpr events::Clock::duration kBetweenReports = 100ms;
@@ -121,7 +123,8 @@ void Member::lose(std::string const &why) {
     say_("the fabric cannot be used: " + why);
   }
   if (!claim_.gave_way()) {
-    next_connect_ = loop_.after(kReconnect, [this] { connect(); });
+    pause_ = std::clamp(2 * pause_, kFirstPause, kLongestPause);
+    next_connect_ = loop_.after(pause_, [this] { connect(); });
   }
 }
 
@@ -193,11 +196,30 @@ void Member::sync() {
     tell_joined();
     reply_to_drills();
     report_soon();
+    pause_ = {};
+    state_pause_ = {};
+    tell_of_state({});
   } catch (Json::exception const &error) {
     lose(fmt::format("its rows are none of this version: {}", error.what()));
+  } catch (storage::StateFailure const &failure) {
+    // To have the servers tell all once more would be of no use.
+    tell_of_state(failure.what());
+    state_pause_ = std::clamp(2 * state_pause_, kFirstPause, kLongestPause);
+    sync_soon(state_pause_);
   } catch (std::runtime_error const &error) {
     lose(error.what());
   }
+}
+
+// Why the state takes nothing, said once.
+void Member::tell_of_state(std::string const &why) {
+  if (std::exchange(trouble_of_state_, why) == why) {
+    return;
+  }
+  if (!why.empty()) {
+    say_("the fabric cannot be followed: " + why);
+  }
+  report_soon();
 }
 
 // Returns whether it could: not while somebody else has the state. What this host cannot bear it
@@ -324,6 +346,9 @@ void Member::report() {
     if (!in_force_.troubles.empty()) {
       errors["frames"] = in_force_.troubles;
     }
+    if (!trouble_of_state_.empty()) {
+      errors["state"] = trouble_of_state_;
+    }
     Json row{{"links", map_of(links())}, {"errors", map_of(errors)}};
     if (in_force_.change >= change_) {
       row["in_force"] = revision_;
@@ -353,29 +378,32 @@ void Member::tell_counts_later() {
 }
 
 // Returns whether it could: not while somebody else has the state. Of a port that went the last is
-// counted when that is in force.
+// counted when that is in force. What was refused is tried again when all are told the next time.
 bool Member::report_counts() {
-  auto const news = untold(store_, cluster_.replica(), membership_);
-  if (!news) {
-    return false;
-  }
-  auto all = Json::array();
-  for (auto const &[switch_identifier, operations] : news->operations) {
-    all.insert(all.end(), operations.begin(), operations.end());
-  }
   std::string why;
-  if (!all.empty() && !tell_counts(all, why)) {
-    why.clear();
-    // Who may not write one of the switches shall be heard of the others.
-    for (auto const &[switch_identifier, operations] : news->operations) {
-      tell_counts(operations, why);
+  try {
+    auto const news = untold(store_, cluster_.replica(), membership_);
+    if (!news) {
+      return false;
     }
+    auto all = Json::array();
+    for (auto const &[switch_identifier, operations] : news->operations) {
+      all.insert(all.end(), operations.begin(), operations.end());
+    }
+    if (!all.empty() && !tell_counts(all, why)) {
+      why.clear();
+      // Who may not write one of the switches shall be heard of the others.
+      for (auto const &[switch_identifier, operations] : news->operations) {
+        tell_counts(operations, why);
+      }
+    }
+    counts_are_due_ = news->change > in_force_.change;
+  } catch (storage::StateFailure const &failure) {
+    why = failure.what();
   }
   if (std::exchange(why_counts_are_untold_, why) != why && !why.empty()) {
     say_(fmt::format("what was counted is not told: {}", why));
   }
-  // What was refused is tried again when all are told the next time.
-  counts_are_due_ = news->change > in_force_.change;
   return true;
 }
 

@@ -59,6 +59,7 @@ class Member {
   void sync();
   bool take_news();
   bool follow_touched();
+  void tell_of_state(std::string const &why);
   void tell_joined();
   void reply_to_drills();
 
@@ -98,10 +99,13 @@ class Member {
   Json reported_;
   bool counts_are_due_ = false;
   std::string why_counts_are_untold_;
+  std::string trouble_of_state_;
   std::vector<events::Loop::Watch> watches_;
   events::Loop::Timer next_connect_;
+  events::Clock::duration pause_{};  // before it
   events::Loop::Timer next_sync_;
   events::Clock::duration next_wait_{};
+  events::Clock::duration state_pause_{};  // while the state takes nothing
   events::Loop::Timer next_report_;
   events::Loop::Timer next_counts_;
 };
