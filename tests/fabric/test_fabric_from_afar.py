@@ -123,9 +123,13 @@ def test_what_hosts_cannot_bear_and_who_is_away_is_told(lab: FabricLab, operator
     assert (asked.status, asked.stderr) == (1, "vswitch: two: the host has no such switch\n")
     # A host that is away is waited for in vain.
     killed(other)
+    said = {"errors": ["map", [["state", "the disk is full"], ["taken", "is taken"]]]}
+    of_two = [["name", "==", "two"]]
+    lab.databases.transact({"op": "update", "table": "Host", "where": of_two, "row": said})
     done = operator("apply", "-", "--wait", "0.5", given=of_lab(mtu=1600))
     assert (done.status, done.stdout) == (3, "lab/mtu: 9000 -> 1600\n")
-    assert done.stderr == ("vswitch: the change is made, and not in force on two after 0.5 s\n")
+    why = "two (state: the disk is full)"
+    assert done.stderr == f"vswitch: the change is made, and not in force on {why} after 0.5 s\n"
     assert comes_true(lambda: one.setting("lab", "mtu") == 1600)
     # Gone for good, it is forgotten.
     assert operator.told("forget", "two").splitlines() == [

@@ -15,7 +15,7 @@ from vswitch.fabric._drilling import Replies, drill
 from vswitch.fabric._errors import OtherVersion, Unreachable
 from vswitch.fabric._notation import Operation
 from vswitch.fabric._plan import Difference, Plan
-from vswitch.fabric._view import View, view_of
+from vswitch.fabric._view import GENERAL, Member, View, view_of
 from vswitch.fabric._watching import events
 from vswitch.told import Event
 
@@ -119,7 +119,8 @@ class Fabric:
             if not late:
                 return view
             if time.monotonic() >= deadline:
-                words = f"the change is made, and not in force on {', '.join(late)}"
+                named = ", ".join(_with_errors(view.hosts[name]) for name in late)
+                words = f"the change is made, and not in force on {named}"
                 raise NotRestored(f"{words} after {seconds:g} s", left=late)
             self._follow(deadline)
 
@@ -169,6 +170,12 @@ class Fabric:
         revision = _deciding.commit(self._cluster, change, operations)
         transaction.commit()
         return revision
+
+
+def _with_errors(host: Member) -> str:
+    """A host, with what may keep it from following."""
+    why = [f"{where}: {host.errors[where]}" for where in GENERAL if where in host.errors]
+    return f"{host.name} ({'; '.join(why)})" if why else host.name
 
 
 def _addresses(servers: str) -> Tuple[str, ...]:

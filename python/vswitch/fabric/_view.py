@@ -9,7 +9,7 @@ from vswitch import _table
 from vswitch.fabric._notation import Rows, pairs_in, values_in
 from vswitch.values import Words
 
-__all__ = ["Member", "Named", "SharedPort", "SharedSwitch", "View", "value_of"]
+__all__ = ["GENERAL", "Member", "Named", "SharedPort", "SharedSwitch", "View", "value_of"]
 
 
 class Named(Dict[str, Any]):
@@ -72,6 +72,11 @@ class SharedSwitch(_Shared):
             **_ordered(self.settings, _table.SWITCH),
             "ports": [port.state() for port in self.ports.values()],
         }
+
+
+GENERAL = ("frames", "state")
+"""What hosts call errors that concern no switch alone: of what moves frames, and of what keeps
+the state, as on a full disk."""
 
 
 @dataclass(frozen=True)

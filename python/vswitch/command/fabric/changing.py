@@ -14,12 +14,10 @@ from vswitch.command.fabric.arguments import HOST
 from vswitch.command.fabric.connection import connected
 from vswitch.command.session import is_json
 from vswitch.fabric import Fabric, Plan, View
+from vswitch.fabric._view import GENERAL
 from vswitch.words import DocumentError
 
 __all__ = ["apply", "diff", "forget", "outcome", "unborne"]
-
-# What hosts call an error that concerns no switch alone.
-_FRAMES = "frames"
 
 _FILE = typer.Argument(..., metavar="FILE", help="A document, YAML or JSON; - is standard input.")
 
@@ -84,7 +82,7 @@ def unborne(view: View, plan: Plan) -> List[Tuple[str, str, str]]:
         for host in view.hosts.values()
         if host.name in plan.hosts
         for where, why in host.errors.items()
-        if where == _FRAMES
+        if where in GENERAL
         or f"{where}/".startswith(whole)
         or any(path.startswith(f"{where}/") for path in changed)
     ]
