@@ -16,6 +16,7 @@ GROUP = "239.1.1.1"
 OTHER_GROUP = "239.2.2.2"
 IPV6_GROUP = "ff15::101"
 GROUP_BYTES = ipaddress.ip_address(GROUP).packed
+ALL_NODES = ipaddress.ip_address("ff02::1").packed
 STRANGER = "198.51.100.8"
 
 
@@ -66,6 +67,12 @@ def test_sources_of_ipv6_are_looked_at(clients: Clients) -> None:
     clients.says("other", frames.reports, frames.IS_EXCLUDE, IPV6_GROUP, ["2001:db8::7"])
     assert clients.comes_to_get("one", IPV6_GROUP)
     assert clients.gets(GROUP) == "one other"
+    # Queries come from an address of the link, unless it is said which.
+    query = clients.hears("other", frames.is_mld_query)
+    assert query[22:30] == bytes.fromhex("fe80000000000000") and query[38:54] == ALL_NODES
+    clients.mode("mld", IGMPQueries=1, IGMPQueryInterval=1, MLDRouterIP="fe80::77")
+    chosen = ipaddress.ip_address("fe80::77").packed
+    clients.hears("other", lambda came: frames.is_mld_query(came) and came[22:38] == chosen)
 
 
 def test_who_is_silent_is_a_member_no_more(clients: Clients) -> None:
@@ -87,6 +94,18 @@ def test_routers_get_all_groups_and_what_members_say(clients: Clients) -> None:
     clients["one"].expect_none(lambda frame: frame == report)
     # It asks no more.
     assert clients.comes_to_get("", GROUP)
+    # One that asks nobody says what it is.
+    clients.says("other", frames.routes_by_pim)
+    assert clients.comes_to_get("other", GROUP)
+    clients.says("one", frames.routes)
+    assert clients.comes_to_get("one other", GROUP)
+    # Those are routers of IPv4.
+    clients.mode("mld", IGMPQueries=1)
+    assert clients.comes_to_get("", IPV6_GROUP)
+    clients.says("other", frames.asks_for_ipv6)
+    assert clients.comes_to_get("other", IPV6_GROUP)
+    clients.says("one", frames.routes_ipv6)
+    assert clients.comes_to_get("one other", IPV6_GROUP)
 
 
 def test_a_kernel_joins_and_leaves(clients: Clients) -> None:
@@ -110,7 +129,7 @@ def test_callers_are_told_what_is_joined(clients: Clients) -> None:
     clients.says("one", frames.reports, frames.IS_INCLUDE, GROUP, [SENDER])
     clients.says("one", frames.joins, IPV6_GROUP)
     assert clients.comes_to_get("one", GROUP)
-    of_b, of_c = json.loads(clients.lab.python(ASKS))
+    of_b, of_c = groups_of_ports(clients)
     ethernet, of_ipv6, of_ipv4, more = (
         [group for group in of_b if group[0] == address]
         for address in (frames.mac_of(GROUP), IPV6_GROUP, GROUP, frames.mac_of(IPV6_GROUP))
@@ -120,10 +139,23 @@ def test_callers_are_told_what_is_joined(clients: Clients) -> None:
     assert of_ipv6 == [[IPV6_GROUP, 1, "none", []]]
     assert len(more) == 1 and len(of_b) == 4
     assert of_c == []
+    clients.says("other", frames.reports, frames.IS_EXCLUDE, GROUP, [SENDER])
+    assert clients.comes_to_get("other", GROUP, STRANGER)
+    assert [GROUP, 3, "exclude", [SENDER]] in groups_of_ports(clients)[1]
+    clients.says("one", frames.reports, frames.TO_INCLUDE, GROUP)
+    assert clients.comes_to_get("", GROUP)
+    of_b, of_c = groups_of_ports(clients)
+    assert sorted(group[0] for group in of_b) == [frames.mac_of(IPV6_GROUP), IPV6_GROUP]
+    assert [GROUP, 3, "exclude", [SENDER]] in of_c
     clients.lab.stop()
     assert "Timeout" in clients.lab.python(
         REFUSED.format(asked='Host().switches["lab"].ports["b"].groups')
     )
+
+
+def groups_of_ports(clients: Clients) -> Any:
+    """Of b and of c."""
+    return json.loads(clients.lab.python(ASKS))
 
 
 ASKS = """
@@ -190,6 +222,7 @@ def test_without_listening_ports_get_what_they_ask_for(clients: Clients) -> None
     assert clients.gets(OTHER_GROUP) == "other"
     assert clients.gets(IPV6_GROUP) == "other"
     assert clients.gets("224.0.0.251") == clients.gets("ff02::1") == "one other"
+    assert groups_of_ports(clients) == [[[frames.mac_of(GROUP), 0, "none", []]], []]
     # It is asked for besides what is joined.
     clients.mode("snooping", IGMPQueries=1)
     assert clients.comes_to_get("one", GROUP)

@@ -7,6 +7,7 @@ from typing import Sequence
 IGMP = 2
 UDP = 17
 ICMPV6 = 58
+PIM = 103
 ALL_SYSTEMS = "224.0.0.1"
 # Of records.
 IS_INCLUDE, IS_EXCLUDE, TO_INCLUDE, TO_EXCLUDE, ALLOW, BLOCK = range(1, 7)
@@ -44,7 +45,7 @@ def mac_of(group: str) -> str:
 def _ipv4(source: str, to: str, protocol: int, payload: bytes) -> bytes:
     options = _IPV4_ALERT if protocol == IGMP else b""
     size = 20 + len(options)
-    ttl = 1 if protocol == IGMP else 64
+    ttl = 64 if protocol == UDP else 1
     header = struct.pack(
         *("!BBHHHBBH4s4s", 0x40 | size // 4, 0, size + len(payload), 0, 0x4000, ttl, protocol, 0),
         *(ipaddress.ip_address(source).packed, ipaddress.ip_address(to).packed),
@@ -114,6 +115,27 @@ def reports(mac: str, source: str, kind: int, group: str, sources: Sequence[str]
 def asks(mac: str, source: str, interval: int) -> bytes:
     """A query of all groups, of version 3 of IGMP, by a router that asks so often."""
     return igmp(mac, source, ALL_SYSTEMS, struct.pack("!BBHIBBH", 0x11, 1, 0, 0, 1, interval, 0))
+
+
+def asks_for_ipv6(mac: str, source: str) -> bytes:
+    """Likewise of MLD, of version 2, by a router that asks every two minutes."""
+    query = struct.pack("!BBHHH16sBBH", 130, 0, 0, 1000, 0, bytes(16), 0, 125, 0)
+    return _frame(mac, source, "ff02::1", ICMPV6, query)
+
+
+def routes(mac: str, source: str) -> bytes:
+    """An advertisement of a multicast router, as one makes it every twenty seconds."""
+    return igmp(mac, source, "224.0.0.106", struct.pack("!BBHHH", 0x30, 20, 0, 125, 2))
+
+
+def routes_ipv6(mac: str, source: str) -> bytes:
+    return _frame(mac, source, "ff02::6a", ICMPV6, struct.pack("!BBHHH", 151, 20, 0, 125, 2))
+
+
+def routes_by_pim(mac: str, source: str) -> bytes:
+    """A hello of version 2, which holds for a minute."""
+    hello = struct.pack("!BBHHHH", 0x20, 0, 0, 1, 2, 60)
+    return _frame(mac, source, "224.0.0.13", PIM, _with_sum(hello, 2))
 
 
 def is_query(frame: bytes) -> bool:
