@@ -136,7 +136,10 @@ def test_vlans_and_priorities_hold_across_hosts(rack: Rack, clients: List[Client
         rack.set_all(vlan=0)
 
 
-def test_private_vlans_hold_across_hosts(rack: Rack, clients: List[Client]) -> None:
+def test_private_vlans_hold_across_hosts(
+    rack: Rack, clients: List[Client], encapsulation: str
+) -> None:
+    use(rack, encapsulation)
     promiscuous, isolated, other = clients
     rack.set_all(vlan={"id": 101, "private": True})
     rack.hosts[0].set_port("lab", "a", vlan={"id": 100, "private": True})
@@ -195,22 +198,26 @@ def test_a_host_dies_and_returns(rack: Rack, clients: List[Client]) -> None:
 
 WRAPPED = """
 import socket, sys
-to, key, inner = sys.argv[1], int(sys.argv[2]), bytes.fromhex(sys.argv[3])
-wrapped = bytes([8, 0, 0, 0]) + key.to_bytes(3, "big") + bytes(1) + inner
-socket.socket(socket.AF_INET, socket.SOCK_DGRAM).sendto(wrapped, (to, 4789))
+to, at, head, key, inner = sys.argv[1:]
+wrapped = bytes.fromhex(head) + int(key).to_bytes(3, "big") + bytes(1) + bytes.fromhex(inner)
+socket.socket(socket.AF_INET, socket.SOCK_DGRAM).sendto(wrapped, (to, int(at)))
 """
+# The port, and what stands before the key.
+HEADS = {"vxlan": ["4789", "08000000"], "geneve": ["6081", "00006558"]}
 
 
 def test_frames_of_strangers_reach_nothing(
-    rack: Rack, routers: Routers, clients: List[Client]
+    rack: Rack, routers: Routers, clients: List[Client], encapsulation: str
 ) -> None:
     one, other, _ = clients
+    use(rack, encapsulation)
     all_reach(clients)
 
     def sends(sender: Namespace, key: int) -> bytes:
         inner = hello(other)
         to = Routers.address(0)
-        sender.run(sys.executable, "-c", WRAPPED, to, str(key), inner.hex())
+        words = [to, *HEADS[encapsulation], str(key), inner.hex()]
+        sender.run(sys.executable, "-c", WRAPPED, *words)
         return inner
 
     peer, stranger = rack.hosts[1].host, routers.namespace
@@ -252,6 +259,35 @@ def test_it_is_said_what_keeps_frames_from_a_tunnel(rack: Rack, clients: List[Cl
     host.host.run("ip", "link", "set", "eth1", "mtu", "1500")
     assert says("")
     host.apply({"switches": [{"alias": "lab", "mtu": 1400}]})
+
+
+def test_packets_as_large_as_a_tunnel_bears_pass(
+    rack: Rack, clients: List[Client], encapsulation: str
+) -> None:
+    one, other, _ = clients
+    use(rack, encapsulation)
+    for host in rack.hosts:
+        host.apply({"switches": [{"alias": "lab", "mtu": 1442}]})
+    rack.set_all(vlan={"guest_tagging": True}, nested_tag=True)
+
+    def sent(tags: str, size: int) -> bytes:
+        start = hello(one)
+        made = start[:12] + bytes.fromhex(tags) + start[12:]
+        return made.ljust(14 + len(tags) // 2 + size, b".")
+
+    try:
+        # The second tag is counted in.
+        for tags, most in ("", 1442), ("81000007", 1442), ("8100000781000008", 1438):
+            assert comes_sooner_or_later(one, other, sent(tags, most))
+            larger, largest = sent(tags, most + 1), sent(tags, most)
+            one.send(larger)
+            one.send(largest)
+            other.expect(largest)
+            other.expect_none(larger, timeout=0)
+    finally:
+        rack.set_all(vlan=0, nested_tag=False)
+        for host in rack.hosts:
+            host.apply({"switches": [{"alias": "lab", "mtu": 1400}]})
 
 
 def test_packets_that_no_tunnel_bears_are_refused(rack: Rack, clients: List[Client]) -> None:
