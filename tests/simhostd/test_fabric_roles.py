@@ -166,6 +166,16 @@ def test_hosts_write_what_is_theirs_and_switches_that_they_belong_to(lab: RoleLa
     }
     said = lab.says(three, FOR_HOSTS, {"op": "update", **row})
     assert prohibited("three", 'modification of table \\"Switch\\"') in said
+    of_port: Dict[str, Any] = {"table": "Port", "where": [["id", "==", "d"]]}
+    for column, value in (
+        ("settings", ["map", [["mtu", "1900"]]]),
+        ("host", "three"),
+        ("counters", ["map", [["three", "{}"]]]),
+    ):
+        said = lab.says(three, FOR_HOSTS, {"op": "update", **of_port, "row": {column: value}})
+        assert prohibited("three", 'modification of table \\"Port\\"') in said
+    said = lab.says(three, FOR_HOSTS, {"op": "delete", **of_port})
+    assert prohibited("three", 'row deletion from table \\"Port\\"') in said
     assert one.call("VSDVS_RemoveDVPort", "lab", "d") == QEX_OK
 
 
