@@ -5,6 +5,7 @@ import json
 import shutil
 import signal
 import subprocess
+import sys
 import uuid
 from contextlib import ExitStack
 from pathlib import Path
@@ -322,3 +323,20 @@ def kept(host: Host, name: str) -> None:
 
 def killed(host: Host) -> None:
     host.stop(signal.SIGKILL)
+
+
+def in_background(host: Host, call: str) -> "subprocess.Popen[str]":
+    """A call in a process of its own, which prints its status."""
+    words = [sys.executable, "-c", f"import _libvswitch as vs; print({call})"]
+    return subprocess.Popen(words, env=host.environment, stdout=subprocess.PIPE, text=True)
+
+
+def is_locked(host: Host) -> bool:
+    """Whether somebody changes its state."""
+    program = (
+        "import sqlite3, sys\n"
+        "state = sqlite3.connect(sys.argv[1], timeout=0)\n"
+        "try:\n    state.execute('BEGIN IMMEDIATE')\nexcept sqlite3.OperationalError:\n    print(1)"
+    )
+    words = [sys.executable, "-c", program, str(host.state)]
+    return subprocess.run(words, stdout=subprocess.PIPE, check=True).stdout == b"1\n"

@@ -40,9 +40,9 @@ class Relay:
         """Passes on later what comes from now on; 0 as before."""
         self._tell(f"delay {seconds}")
 
-    def hold(self) -> None:
-        """Passes on nothing, and goes on listening."""
-        self._tell("hold")
+    def hold(self, *directions: str) -> None:
+        """Passes on nothing in them, or in any if none is named, and goes on listening."""
+        self._tell(" ".join(["hold", *(directions or (FROM_HOST, TO_HOST))]))
 
     def release(self) -> None:
         """Passes on what was held back, too."""
@@ -78,8 +78,8 @@ class _Passing:
 
     def __init__(self) -> None:
         self.delay = 0.0
-        self.goes = asyncio.Event()
-        self.goes.set()
+        self.goes = {direction: asyncio.Event() for direction in (FROM_HOST, TO_HOST)}
+        self.obey("release")
         self.repeats = False
         self.connections: List["_Connection"] = []
 
@@ -87,9 +87,11 @@ class _Passing:
         if command == "delay":
             self.delay = float(values[0])
         elif command == "hold":
-            self.goes.clear()
+            for direction in values:
+                self.goes[direction].clear()
         elif command == "release":
-            self.goes.set()
+            for goes in self.goes.values():
+                goes.set()
         elif command == "repeat":
             self.repeats = values == ("1",)
         else:
@@ -135,7 +137,7 @@ class _Connection:
         messages = _Messages()
         while data := await reader.read(65536):
             await asyncio.sleep(self._passing.delay)
-            await self._passing.goes.wait()
+            await self._passing.goes[direction].wait()
             for text, said in messages.add(data):
                 if said.get("id") == _FIRST:
                     self._is_made.set()

@@ -4,15 +4,23 @@ is said."""
 import json
 import shutil
 import signal
-import subprocess
-import sys
 from pathlib import Path
 from typing import Any, Dict, Iterator, Tuple
 
 import pytest
 from _libvswitch import QEX_BUSY, QEX_OK
 
-from fabric_lab import SCHEMA, FabricLab, Host, kept, killed, restored, started
+from fabric_lab import (
+    SCHEMA,
+    FabricLab,
+    Host,
+    in_background,
+    is_locked,
+    kept,
+    killed,
+    restored,
+    started,
+)
 from frame_lab import comes_true
 from simhost._daemon import Daemon
 
@@ -101,12 +109,49 @@ def test_hosts_have_what_they_share_and_what_is_their_own(
     assert "x.y" in one.ports("lab")["a"]["properties"]
 
 
+# Each call that replaces the state, and the switches that are there then.
+REPLACED = """
+import json
+import libvswitch as vs
+from vswitch import Host
+
+data, length = vs.Cell("void *"), vs.Cell("int")
+assert vs.DVSQEX_PersistentStateGet(data.pointer, length.pointer) == vs.QEX_OK
+image = vs.Cell("qex_uint8", list(data.read(length.value)))
+
+def replaces(name, *words, how=""):
+    status = getattr(vs, name)(*words)
+    assert status == vs.QEX_OK, (name, status)
+    switches = Host().switches
+    there = [f"{one.alias} {one.mtu} {','.join(sorted(one.ports))}" for one in switches.values()]
+    print(f"{name}{how}: {json.dumps(sorted(there))}")
+
+replaces("DVSQEX_StateSanitize")
+replaces("DVSQEX_StateCleanup")
+replaces("DVSQEX_StateInit", image.pointer, length.value, how=" with an image")
+replaces("DVSState_ConfigReset")
+replaces("DVSQEX_StateInit", image.pointer, length.value, how=" with an image")
+replaces("DVSQEX_StateInit", None, 0, how=" with nothing")
+"""
+
+
 def test_what_replaces_the_state_leaves_what_is_shared(
     lab: FabricLab, two: Tuple[Host, Host]
 ) -> None:
     one, other = two
     before = lab.databases.rows("Switch"), lab.databases.rows("Port")
-    for host in (one, other):
+    for host, own in ((one, "own"), (other, "mine")):
+        shared = ["lab 9000 a,b"]
+        both = sorted([*shared, f"{own} 1500 a" if host is one else f"{own} 1500 "])
+        seen = [line.split(": ") for line in host.python(REPLACED).splitlines()]
+        assert [(what, json.loads(switches)) for what, switches in seen] == [
+            ("DVSQEX_StateSanitize", both),
+            ("DVSQEX_StateCleanup", shared),
+            ("DVSQEX_StateInit with an image", both),
+            ("DVSState_ConfigReset", shared),
+            ("DVSQEX_StateInit with an image", both),
+            ("DVSQEX_StateInit with nothing", shared),
+        ]
         host.ctl("restart")
         host.ctl("reset")
         assert host.setting("lab", "mtu") == 9000
@@ -186,22 +231,6 @@ def pause(daemon: Daemon, host: Host) -> None:
         daemon.send(signal.SIGSTOP)
 
 
-def in_background(host: Host, call: str) -> "subprocess.Popen[str]":
-    """A call in a process of its own, which prints its status."""
-    words = [sys.executable, "-c", f"import _libvswitch as vs; print({call})"]
-    return subprocess.Popen(words, env=host.environment, stdout=subprocess.PIPE, text=True)
-
-
-def is_locked(host: Host) -> bool:
-    program = (
-        "import sqlite3, sys\n"
-        "state = sqlite3.connect(sys.argv[1], timeout=0)\n"
-        "try:\n    state.execute('BEGIN IMMEDIATE')\nexcept sqlite3.OperationalError:\n    print(1)"
-    )
-    words = [sys.executable, "-c", program, str(host.state)]
-    return subprocess.run(words, stdout=subprocess.PIPE, check=True).stdout == b"1\n"
-
-
 def test_a_host_without_its_daemon_changes_nothing_shared(
     lab: FabricLab, two: Tuple[Host, Host]
 ) -> None:
@@ -246,6 +275,17 @@ def test_what_a_host_cannot_bear_is_told(lab: FabricLab, two: Tuple[Host, Host])
     lab.databases.set("Port", "vlan", 8, id="a")
     assert comes_true(lambda: told() == [{}, {}])
     assert of_port(other, "a")["vlan"] == 8
+
+    # A limit that it has passed, as no host could write it.
+    lab.databases.set("Switch", "max_ports", 1)
+    lab.databases.set("Port", "vlan", 12, id="b")
+    assert comes_true(lambda: of_port(one, "b")["vlan"] == of_port(other, "b")["vlan"] == 12)
+    passed = {"lab": "Limit exceeded (QEX_LIMIT_EXCEEDED)"}
+    assert comes_true(lambda: told() == [passed, passed]), told()
+    assert one.setting("lab", "max_ports") == other.setting("lab", "max_ports") == 200
+    assert one.call("VSDVS_RemoveDVPort", "lab", "b") == QEX_OK
+    assert comes_true(lambda: told() == [{}, {}]), told()
+    assert one.setting("lab", "max_ports") == other.setting("lab", "max_ports") == 1
 
     # An alias that a switch of the host's own has.
     third = started(lab.host("three", {"switches": [{"alias": "lab"}]}))

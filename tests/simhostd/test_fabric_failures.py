@@ -1,8 +1,6 @@
 """Databases of a fabric that fail: no change that was made is lost, and none that was
 refused appears."""
 
-import subprocess
-import sys
 from pathlib import Path
 from typing import Any, Iterator, Tuple
 
@@ -11,7 +9,7 @@ from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
 
 import fabric_by_chance
 from fabric_by_chance import relay_of, revision
-from fabric_lab import FabricLab, Host, are_reported, started
+from fabric_lab import FabricLab, Host, are_reported, in_background, is_locked, started
 from frame_lab import comes_true
 from going_frames import GoingFrames
 from relays import FROM_HOST, TO_HOST
@@ -31,13 +29,6 @@ def two(lab: FabricLab) -> Tuple[Host, Host]:
     one.ctl("share", "lab")
     other.ctl("join", "lab")
     return one, other
-
-
-def calling(host: Host, mtu: int) -> "subprocess.Popen[str]":
-    """A call in a process of its own, which prints its status."""
-    program = f"import _libvswitch as vs; print(vs.VSDVS_SetMTU('lab', {mtu}))"
-    words = [sys.executable, "-c", program]
-    return subprocess.Popen(words, env=host.environment, stdout=subprocess.PIPE, text=True)
 
 
 def mtu(host: Host) -> Any:
@@ -71,7 +62,10 @@ def test_nobody_knows_and_then_it_is_decided(lab: FabricLab, two: Tuple[Host, Ho
     # Servers that hear of it, and say nothing.
     assert comes_true(lambda: are_reported(lab))
     lab.databases.pause()
-    calls = [calling(one, 1600), calling(other, 1700)]
+    calls = [
+        in_background(host, f"vs.VSDVS_SetMTU('lab', {wanted})")
+        for host, wanted in ((one, 1600), (other, 1700))
+    ]
     for call in calls:
         assert call.communicate(timeout=30)[0] == f"{QEX_TIMEOUT}\n"
     assert mtu(one) == mtu(other) == 1500
@@ -101,6 +95,29 @@ def test_a_message_that_is_cut_loses_and_doubles_nothing(lab: FabricLab) -> None
     one.relay.delay(0.2)
     assert one.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK
     assert (lab.databases.settings("Switch")["mtu"], revision(lab)) == (1800, before + 3)
+
+
+@pytest.mark.parametrize("reply_only", [False, True], ids=["unheard", "made"])
+def test_the_leader_is_lost_in_mid_change(lab: FabricLab, reply_only: bool) -> None:
+    """With what it was told, or with what it would have told."""
+    one = started(lab.relayed(lab.host("one", LAB)))
+    relay = relay_of(one)
+    one.ctl("share", "lab")
+    assert comes_true(lambda: are_reported(lab))
+    before, leader = revision(lab), lab.databases.leader()
+    relay.hold(*([TO_HOST] if reply_only else [FROM_HOST, TO_HOST]))
+    call = in_background(one, "vs.VSDVS_SetMTU('lab', 1600)")
+    if reply_only:
+        assert comes_true(lambda: revision(lab) == before + 1)
+    else:
+        assert comes_true(lambda: is_locked(one))
+        assert revision(lab) == before
+    lab.databases.kill(leader)
+    relay.cut(TO_HOST)
+    relay.release()
+    assert call.communicate(timeout=30)[0] == f"{QEX_OK}\n"
+    assert (lab.databases.settings("Switch")["mtu"], revision(lab)) == (1600, before + 1)
+    assert mtu(one) == 1600
 
 
 def test_what_a_server_makes_twice_is_made_once(lab: FabricLab) -> None:
