@@ -12,9 +12,12 @@ import pytest
 from counted_frames import BROADCAST, LENGTH, come_to, counters, send
 from fabric_lab import FabricLab, Host, are_reported, kept, restored, started
 from frame_lab import comes_true
-from simhost import Client
+from simhost import Client, frame
 
 CLIENT = "02:00:00:00:00:0a"
+# Of the port, and not of its client.
+STATIC = "02:00:00:00:00:bb"
+STRANGER = "02:00:00:00:00:cc"
 UPLINKS = [{"name": "nic0"}]
 LAB = {
     "uplinks": UPLINKS,
@@ -27,6 +30,7 @@ LAB = {
                     "id": "a",
                     "vlan": {"id": 7},
                     "teaming": {"active": ["nic0"], "flags": ["notify"]},
+                    "addresses": [{"mac": STATIC, "vlan": 7, "type": "static"}],
                 },
                 {"id": "b", "vlan": {"id": 7}},
             ],
@@ -61,18 +65,32 @@ def test_a_port_is_where_it_was_connected_last(lab: FabricLab) -> None:
     other.apply({"switches": [{"alias": "lab", "uplinks": ["nic0"]}]})
     wires = [host.network("nic0") for host in (one, other)]
     here, there = (network.client() for network in wires)
-    other.client("lab", "b")
-    one.frames.client("lab", "a", mac=CLIENT)
+    at_b = other.client("lab", "b")
+    left = one.frames.client("lab", "a", mac=CLIENT)
     assert lab.databases.rows("Port", id="a")[0]["host"] == "one"
     assert lab.databases.rows("Port", id="b")[0]["host"] == "two"
     here.expect(is_announcement)
     there.expect_none(is_announcement)
+    left.send(frame(BROADCAST, CLIENT, payload=b"left first"))
+    here.expect(frame(BROADCAST, CLIENT, vlan=7, payload=b"left first"))
+    to_static = frame(STATIC, STRANGER, vlan=7), frame(STATIC, STRANGER)
+    here.send(to_static[0])
+    left.expect(to_static[1])
 
-    other.frames.client("lab", "a", mac=CLIENT)
+    moved = other.frames.client("lab", "a", mac=CLIENT)
     assert lab.databases.rows("Port", id="a")[0]["host"] == "two"
     there.expect(is_announcement)
-    assert comes_true(lambda: device_of(one, "a") is None)
+    assert comes_true(lambda: device_of(one, "a") is None and one.is_in_force())
     here.expect_none(is_announcement)
+    for client in here, there:
+        client.send(to_static[0])
+    moved.expect(to_static[1])
+    left.expect_none(lambda came: came == to_static[1])
+    at_b.expect_none(lambda came: came == to_static[1])
+    # Who was left is heard no more.
+    left.send(frame(BROADCAST, CLIENT, payload=b"left now"))
+    for client in here, there, moved, at_b:
+        client.expect_none(lambda came: b"left now" in came)
     assert device_of(other, "b") is not None
     # Nobody has it when it is disconnected where it is.
     other.ctl("disconnect", "lab", "a")
