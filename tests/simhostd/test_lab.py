@@ -148,11 +148,16 @@ class Labs:
         return [one for folder in self.folder.glob("simhost-labs-*") for one in folder.iterdir()]
 
 
-def rack(**more: Any) -> Dict[str, Any]:
-    """The one that the guide shows: two hosts with a router between them, and a client at each."""
+def of_the_guide(number: int) -> Dict[str, Any]:
+    """A document that it shows, from 1."""
     guide = (Path(__file__).parents[2] / "docs/guides/rack.md").read_text(encoding="utf-8")
-    document: Dict[str, Any] = json.loads(guide.split("json\n")[1].split("```")[0])
-    return {**document, **more}
+    document: Dict[str, Any] = json.loads(guide.split("} json\n")[number].split("```")[0])
+    return document
+
+
+def rack(**more: Any) -> Dict[str, Any]:
+    """The first one: two hosts with a router between them, and a client at each."""
+    return {**of_the_guide(1), **more}
 
 
 @pytest.fixture
@@ -190,6 +195,46 @@ def test_a_lab_is_up_until_it_is_ended(labs: Labs) -> None:
     assert labs.run("down", "rack") == "lab rack is down\n"
     assert labs.processes() == []
     assert labs.try_run("down", "rack").stdout == "simhostctl lab: there is no lab 'rack'\n"
+
+
+def test_networks_that_join_are_one_whatever_their_order(labs: Labs) -> None:
+    """Two that the guide shows, and more of them that name one another round and round."""
+    teaming = {"balance": "explicit", "active": ["nic0"], "standby": ["nic1"]}
+    uplinks = ["nic0", "nic1"]
+    switch = {"alias": "s", "uplinks": uplinks, "teaming": teaming, "ports": [{"id": "a"}]}
+    host = {"uplinks": [{"name": name} for name in uplinks], "switches": [switch]}
+    left, right = of_the_guide(2)["networks"]
+    document = {
+        "hosts": [{"name": name, "document": host} for name in ("h1", "h2")],
+        "networks": [
+            left,
+            {**right, "joins": ["left"]},
+            {"name": "up", "joins": ["down", "right"]},
+            {"name": "down", "joins": ["left", "up"]},
+        ],
+        "clients": [
+            {**CLIENT, "name": "one"},
+            {**CLIENT, "name": "two", "host": "h2", "address": "10.0.0.2/24"},
+            {"name": "far", "network": "down", "address": "10.0.0.3/24"},
+        ],
+    }
+    file = labs.folder / "joined.json"
+    file.write_text(json.dumps(document), encoding="utf-8")
+    said = labs.run("up", str(file)).splitlines()
+    assert said[:2] == [
+        "network left: h1/nic0, h2/nic0, right",
+        "network right: h1/nic1, h2/nic1, left",
+    ]
+
+    def wires(network: str) -> int:
+        at_bridge = ["exec", network, "ip", "-json", "link", "show", "master", "bridge"]
+        return len(json.loads(labs.run(*at_bridge)))
+
+    # Uplinks, clients, and a wire for each of three that joined another one.
+    assert [wires(name) for name in ("left", "right", "up", "down")] == [3, 4, 2, 2]
+    for one, address in (("one", "10.0.0.2"), ("one", "10.0.0.3"), ("two", "10.0.0.3")):
+        ping = ["exec", one, "ping", "-c", "1", "-W", "1", address]
+        assert comes_true(lambda: labs.try_run(*ping).returncode == 0)
 
 
 def test_what_a_host_refuses_leaves_nothing(labs: Labs) -> None:

@@ -71,6 +71,7 @@ class RunningLab:
                 )
             for network in self._spec.networks:
                 self._lay_network(network)
+            self._join_networks()
             for router in self._spec.routers:
                 self._lay_router(router)
             for name, running in self._hosts.items():
@@ -105,15 +106,23 @@ class RunningLab:
             wire = host.cabling.to_network(machine, self._at_bridge())
             machine.run("ip", "link", "set", wire.name, "master", "bridge")
             host.apply({"uplinks": [{"name": end.uplink, "device": wire.near}]})
-        for other in spec.joins:
-            if other not in self._machines:
-                continue  # which joins this one
-            names = self._at_bridge(), self._at_bridge()
-            Cabling(machine).connect(machine, names[0], self._machines[other], names[1])
-            for one, name in zip((machine, self._machines[other]), names):
-                one.run("ip", "link", "set", name, "master", "bridge")
         ends = ", ".join([*map(str, spec.uplinks), *spec.joins])
         self._say(f"network {spec.name}: {ends or 'nothing yet'}")
+
+    def _join_networks(self) -> None:
+        """Between any two there is one way at most, or frames would go round for ever."""
+        whole = {network.name: {network.name} for network in self._spec.networks}
+        for network in self._spec.networks:
+            for other in network.joins:
+                if other in whole[network.name]:
+                    continue
+                ends = (self._machines[network.name], self._at_bridge())
+                other_ends = (self._machines[other], self._at_bridge())
+                Cabling(ends[0]).connect(*ends, *other_ends)
+                for machine, name in (ends, other_ends):
+                    machine.run("ip", "link", "set", name, "master", "bridge")
+                both = whole[network.name] | whole[other]
+                whole.update({name: both for name in both})
 
     def _at_bridge(self) -> str:
         return f"w{next(self._names)}"
