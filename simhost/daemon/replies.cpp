@@ -153,22 +153,20 @@ Json Daemon::is_there(Json const &question) {
 Json Daemon::carry(Json const &question) {
   PacketSizes sizes;
   devices_.refresh();
-  {
-    storage::ReadingTransaction transaction(store_);
-    for (auto const &one : question.at("tunnels")) {
-      if (auto const why = why_too_large(transaction, tunnel_in(one), devices_)) {
-        return {{"why", *why}};
-      }
+  storage::ReadingTransaction transaction(store_);
+  for (auto const &one : question.at("tunnels")) {
+    if (auto const why = why_too_large(transaction, tunnel_in(one), devices_)) {
+      return {{"why", *why}};
     }
-    for (auto const &one : question.at("switches")) {
-      add_packet_sizes(transaction, storage::SwitchKey{one.at(0).get<std::int64_t>()},
-                       one.at(1).get<std::uint32_t>(), sizes);
-    }
+  }
+  for (auto const &one : question.at("switches")) {
+    add_packet_sizes(transaction, storage::SwitchKey{one.at(0).get<std::int64_t>()},
+                     one.at(1).get<std::uint32_t>(), sizes);
   }
   for (auto const &one : question.at("devices")) {
     sizes[one.at(0).get<std::string>()] = one.at(1).get<std::uint32_t>();
   }
-  auto const why = raise_all_packet_sizes(sizes, devices_);
+  auto const why = raise_all_packet_sizes(transaction, sizes, devices_);
   return {{"why", why.value_or("")}};
 }
 

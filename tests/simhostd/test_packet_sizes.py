@@ -86,6 +86,12 @@ def test_what_a_device_can_do_no_more_is_told(lab: Lab, narrow: str) -> None:
     why = "the device narrow cannot carry packets of 1500 bytes: Invalid argument"
     assert comes_true(lambda: lab.ctl("plane").endswith(f" is in force, but {why}\n"))
     assert lab.log().count(why) == 1
+    # Nor does it stand in the way of others, or of what would help.
+    lab.client("lab", "a")
+    larger = lab.try_ctl(
+        "apply", "-", given=json.dumps({"switches": [{"alias": "lab", "mtu": 1501}]})
+    )
+    assert "the device narrow cannot carry packets of 1501 bytes" in larger.stdout
     set_mtu(lab, "low", 1500)
     assert comes_true(lambda: lab.ctl("plane").endswith(" is in force\n"))
     assert mtu(lab, "narrow") == 1500

@@ -59,6 +59,12 @@ std::optional<storage::SwitchKey> find_switch_at(storage::Transaction &transacti
   return port ? std::optional(storage::get_port_row(transaction, *port).switch_key) : std::nullopt;
 }
 
+// 0 if it is at none.
+std::uint32_t size_of_switch_at(storage::Transaction &transaction, std::string_view device) {
+  auto const key = find_switch_at(transaction, device);
+  return key ? effective(transaction, switches::mtu, storage::PropertyOwner::global(*key)) : 0;
+}
+
 }  // namespace
 
 void add_packet_sizes(storage::Transaction &transaction, storage::SwitchKey key, std::uint32_t size,
@@ -102,9 +108,13 @@ void raise_packet_sizes(PacketSizes const &sizes, NetworkDevices const &devices,
   }
 }
 
-std::optional<std::string> raise_all_packet_sizes(PacketSizes const &sizes,
+std::optional<std::string> raise_all_packet_sizes(storage::Transaction &before,
+                                                  PacketSizes const &sizes,
                                                   NetworkDevices const &devices) {
-  auto const raised = too_small(sizes, devices);
+  auto raised = too_small(sizes, devices);
+  std::erase_if(raised, [&](auto const &one) {
+    return size_of_switch_at(before, one.first) >= sizes.at(one.first);
+  });
   for (std::size_t at = 0; at < raised.size(); ++at) {
     auto const &name = raised[at].first;
     try {

@@ -27,8 +27,10 @@ void add_packet_sizes(storage::Transaction &transaction, storage::SwitchKey key,
 /// to.
 void raise_packet_sizes(PacketSizes const &sizes, NetworkDevices const &devices,
                         std::function<void(std::string const &)> const &say);
-/// Likewise all of them, or none: returns why not.
-std::optional<std::string> raise_all_packet_sizes(PacketSizes const &sizes,
+/// Likewise all of them, or none: returns why not. What is no more than the state wanted before
+/// counts for nothing: one that cannot do it must not stand in the way of every other change.
+std::optional<std::string> raise_all_packet_sizes(storage::Transaction &before,
+                                                  PacketSizes const &sizes,
                                                   NetworkDevices const &devices);
 
 }  // namespace simhost::daemon
