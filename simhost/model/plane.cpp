@@ -44,10 +44,17 @@ void commit(storage::ChangingTransaction &transaction) {
   auto &plane = running_plane();
   plane.prepare(transaction);
   // Last, because what others were told cannot be taken back.
-  if (sharing != nullptr) {
-    sharing->prepare(transaction);
+  bool const is_told = sharing != nullptr && sharing->prepare(transaction);
+  try {
+    transaction.commit();
+  } catch (storage::StateFailure const &failure) {
+    if (is_told) {
+      throw Refused(
+          QEX_TIMEOUT,
+          std::string("other hosts have the change, and this one will follow: ") + failure.what());
+    }
+    throw;
   }
-  transaction.commit();
   plane.committed();
 }
 

@@ -15,9 +15,10 @@ class Sharing {
   virtual ~Sharing() = default;
 
   /// A transaction is about to be committed, and nothing but that can fail any more. Returns when
-  /// what it changes of what is shared is decided, and has written so into the transaction. Refuses
-  /// it if it is decided otherwise (QEX_BUSY), or nobody knows (QEX_TIMEOUT).
-  virtual void prepare(storage::ChangingTransaction &transaction) = 0;
+  /// what it changes of what is shared is decided, and has written so into the transaction, and
+  /// into the file all of it: whether there was anything to decide. Refuses it if it is decided
+  /// otherwise (QEX_BUSY), or nobody knows (QEX_TIMEOUT).
+  virtual bool prepare(storage::ChangingTransaction &transaction) = 0;
 };
 
 /// Chooses it for the transactions of this process; null: its host shares nothing. It must live as

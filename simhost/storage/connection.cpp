@@ -157,6 +157,15 @@ void Connection::begin(std::string_view sql, std::chrono::nanoseconds longest_wa
   run(sql);
 }
 
+void Connection::flush() {
+  // All other functions say no more of a failure than this.
+  constexpr int kKind = 0xFF;
+  auto *const handle = database_->getHandle();
+  if (auto const code = sqlite3_db_cacheflush(handle) & kKind; code != SQLITE_OK) {
+    guarded([&] { throw SQLite::Exception(handle, code); });
+  }
+}
+
 void Connection::roll_back() {
   if (sqlite3_get_autocommit(database_->getHandle()) == 0) {
     run("ROLLBACK");

@@ -52,6 +52,8 @@ class Connection {
   /// Begins a transaction with such a literal, which waits for other processes no longer than that.
   void begin(std::string_view sql, std::chrono::nanoseconds longest_wait);
   void commit() { run("COMMIT"); }
+  /// Writes what the transaction changed where a commit finds it.
+  void flush();
   /// Undoes the transaction, unless SQLite has done so by itself.
   void roll_back();
   /// `sql` is a literal: the statement prepared from it is kept. Throws std::logic_error for one

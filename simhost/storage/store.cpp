@@ -103,6 +103,10 @@ void Transaction::commit() {
   }
 }
 
+void ChangingTransaction::flush() {
+  connection().flush();
+}
+
 std::int64_t ChangingTransaction::last_key() const {
   return connection().database().getLastInsertRowid();
 }

@@ -92,6 +92,9 @@ class ChangingTransaction : public Transaction {
   ChangingTransaction(Store &store, Patience &patience)
       : Transaction(store, Access::write, patience) {}
 
+  /// Writes into the file what was changed so far, which others see only when it is committed: a
+  /// file that has no room for it fails here, and a commit after it needs next to none.
+  void flush();
   /// The key of the row that was inserted last.
   [[nodiscard]] std::int64_t last_key() const;
 

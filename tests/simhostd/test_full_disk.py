@@ -4,8 +4,10 @@ kept until it can be put there, and who asks is told."""
 import resource
 from pathlib import Path
 
+from _libvswitch import QEX_IO_ERROR, QEX_OK
+
 from counted_frames import BROADCAST, LENGTH, come_to, counters, send
-from fabric_lab import FabricLab, are_reported, started
+from fabric_lab import FabricLab, Host, are_reported, started
 from frame_lab import Lab, comes_true
 
 FULL = "host.db cannot be read or written"
@@ -81,6 +83,36 @@ def test_a_daemon_goes_on_that_cannot_even_say_what_is_wrong(lab: Lab) -> None:
     make_room(lab)
     assert comes_true(lambda: not lab.plane()["said"])
     come_to(lambda: counters(lab, "a"), of_broadcasts(2))
+
+
+def called_without_room(host: Host, mtu: int) -> int:
+    """The status of a call that cannot put anything into the state."""
+    return int(
+        host.python(
+            "import _libvswitch as vs, os, resource\n"
+            f"size = os.stat('{host.state}-wal').st_size\n"
+            "resource.setrlimit(resource.RLIMIT_FSIZE, (size, resource.RLIM_INFINITY))\n"
+            f"print(vs.VSDVS_SetMTU('lab', {mtu}))"
+        )
+    )
+
+
+def test_nothing_is_shared_by_a_call_whose_state_takes_nothing(tmp_path: Path) -> None:
+    with FabricLab(tmp_path) as lab:
+        one, other = started(lab.host("one", SHARED)), started(lab.host("two"))
+        one.ctl("share", "lab")
+        other.ctl("join", "lab")
+        assert comes_true(lambda: are_reported(lab))
+
+        def shared() -> object:
+            return lab.databases.settings("Switch"), lab.databases.rows("Fabric")
+
+        before = shared()
+        assert called_without_room(one, 1600) == QEX_IO_ERROR
+        assert shared() == before
+        assert one.setting("lab", "mtu") != 1600
+        assert one.call("VSDVS_SetMTU", "lab", 1700) == QEX_OK
+        assert comes_true(lambda: other.setting("lab", "mtu") == 1700)
 
 
 def test_a_fabric_is_told_of_a_full_disk_and_when_it_has_room(tmp_path: Path) -> None:

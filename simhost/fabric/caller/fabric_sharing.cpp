@@ -79,17 +79,21 @@ Json status(std::filesystem::path const &state) {
   return asked(state, {{"ask", "status"}});
 }
 
-void FabricSharing::prepare(storage::ChangingTransaction &transaction) {
+bool FabricSharing::prepare(storage::ChangingTransaction &transaction) {
   auto const membership = storage::find_membership(transaction);
   if (!membership) {
-    return;
+    return false;
   }
   auto const changes = changes_of(transaction, *membership);
-  if (!changes.empty()) {
-    asked(state_, {{"ask", "commit"}, {"change", new_change()}, {"rows", changes}});
-    agree(transaction, changes);
-  }
+  agree(transaction, changes);
   storage::forget_touched(transaction);
+  if (changes.empty()) {
+    return false;
+  }
+  // A state that takes nothing says so before others are told.
+  transaction.flush();
+  asked(state_, {{"ask", "commit"}, {"change", new_change()}, {"rows", changes}});
+  return true;
 }
 
 }  // namespace simhost::fabric

@@ -30,7 +30,7 @@ class FabricSharing : public Sharing {
  public:
   explicit FabricSharing(std::filesystem::path state) : state_(std::move(state)) {}
 
-  void prepare(storage::ChangingTransaction &transaction) override;
+  bool prepare(storage::ChangingTransaction &transaction) override;
 
  private:
   std::filesystem::path state_;

@@ -13,6 +13,7 @@
 #include <string>
 #include <type_traits>
 
+#include "largest_file.h"
 #include "named_switch.h"
 #include "storage/ports.h"
 #include "storage/query.h"
@@ -147,6 +148,46 @@ TEST(Store, AWriterWaitsForWhatIsLeftOfItsPatience) {
   simhost::storage::Query query(transaction, "PRAGMA busy_timeout");
   query.require_row();
   EXPECT_EQ(query.integer(0), 0) << "SQLite waits longer";
+}
+
+void add_many(ChangingTransaction &transaction) {
+  for (int number = 0; number < 200; ++number) {
+    simhost::storage::add_switch(transaction, named("s" + std::to_string(number)));
+  }
+}
+
+TEST(Store, WhatIsFlushedNeedsNextToNoRoomToBeCommitted) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.db");
+  Store store(file, populate_nothing);
+  Store other(file, populate_nothing);
+  ChangingTransaction transaction(store);
+  add_many(transaction);
+  transaction.flush();
+  EXPECT_FALSE(has(other, "s7"));
+  LargestFile const full(bytes_of_log(file) + kPageInLog);
+  transaction.commit();
+  EXPECT_TRUE(has(other, "s7"));
+}
+
+TEST(Store, AFileWithoutRoomSaysSoWhenItIsFlushed) {
+  TemporaryFolder const folder;
+  auto const file = folder.file("host.db");
+  Store store(file, populate_nothing);
+  {
+    ChangingTransaction transaction(store);
+    add_many(transaction);
+    LargestFile const full(bytes_of_log(file));
+    try {
+      transaction.flush();
+      ADD_FAILURE() << "it had room";
+    } catch (simhost::storage::StateFailure const &failure) {
+      EXPECT_EQ(failure.kind(), simhost::storage::FailureKind::io);
+    }
+  }
+  EXPECT_FALSE(has(store, "s7"));
+  add(store, "a");
+  EXPECT_TRUE(has(store, "a"));
 }
 
 // What changes the state comes down to one of these, so that the compiler knows it everywhere.
