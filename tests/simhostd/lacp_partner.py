@@ -17,10 +17,12 @@ class Partner:
     """Its wires are at the devices u0, u1, ... of the host. A wire is in the bond, or nothing is at
     its end although it has a link."""
 
-    def __init__(self, lab: Lab, folder: Path, *uplinks: str) -> None:
+    def __init__(
+        self, lab: Lab, folder: Path, *uplinks: str, clock_may_stand: bool = False
+    ) -> None:
         self._namespace = lab.frames.new_namespace()
         self._folder = folder
-        self._open_vswitch = LastingOpenVSwitch(self._namespace, folder)
+        self.open_vswitch = LastingOpenVSwitch(self._namespace, folder, clock_may_stand)
         self._wires: Dict[str, Wire] = {}
         for number, uplink in enumerate(uplinks):
             wire = lab.frames.cabling.to_network(self._namespace, f"w{number}")
@@ -32,14 +34,14 @@ class Partner:
         lab.apply({"uplinks": devices})
 
     def __enter__(self) -> "Partner":
-        self._open_vswitch.__enter__()
+        self.open_vswitch.__enter__()
         self._vsctl("--no-wait", "init")
         self._vsctl("add-br", "far", "--", "set", "bridge", "far", "datapath_type=netdev")
         self._vsctl("add-port", "far", "client")
         return self
 
     def __exit__(self, *unused: object) -> None:
-        self._open_vswitch.__exit__()
+        self.open_vswitch.__exit__()
 
     def _vsctl(self, *words: str) -> str:
         return self._namespace.run("ovs-vsctl", f"--db=unix:{self._folder}/db.sock", *words)
@@ -69,7 +71,6 @@ class Partner:
 
     def rate_wanted(self) -> str:
         """How often the other side of a bond wants to hear of this one."""
-        control = f"{self._folder}/ovs-vswitchd.ctl"
-        said = self._namespace.run("ovs-appctl", "-t", control, "lacp/show")
+        said = self.open_vswitch.ask("lacp/show")
         states = [line for line in said.splitlines() if "partner state:" in line]
         return "fast" if states and all("timeout" in line for line in states) else "slow"

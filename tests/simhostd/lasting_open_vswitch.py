@@ -39,16 +39,17 @@ class LastingOpenVSwitch:
 
     def stop_clock(self) -> None:
         """Which goes on no more but by warp()."""
-        self._ask("time/stop")
+        self.ask("time/stop")
 
     def warp(self, seconds: int) -> None:
         """Lets so much time pass, and all that is due then happen."""
-        self._ask("time/warp", str(seconds * 1000), str(max(1000, seconds * 50)))
-        self._ask("revalidator/wait")
+        self.ask("time/warp", str(seconds * 1000), str(max(1000, seconds * 50)))
+        self.ask("revalidator/wait")
 
-    def _ask(self, *words: str) -> None:
+    def ask(self, *words: str) -> str:
+        """What the switch says to a command of its own."""
         control = f"{self._folder}/ovs-vswitchd.ctl"
-        self._namespace.run("ovs-appctl", "-t", control, *words)
+        return self._namespace.run("ovs-appctl", "-t", control, *words)
 
     def _start(self, program: str, *words: str) -> None:
         folder = str(self._folder)

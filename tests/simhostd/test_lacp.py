@@ -1,13 +1,15 @@
 """Groups of uplinks whose partner is another Open vSwitch."""
 
 import json
-from typing import Any, Dict, Iterator, List
+from pathlib import Path
+from typing import Any, Callable, Dict, Iterator, List, Tuple
 
 import pytest
 
 import simhost
 from frame_lab import Lab, comes_true
 from lacp_partner import Partner
+from lasting_open_vswitch import LastingOpenVSwitch
 from simhost import Client
 
 HOST: Dict[str, Any] = {
@@ -22,6 +24,7 @@ HOST: Dict[str, Any] = {
         }
     ],
 }
+BOTH = ["nic0", "nic1"]
 BROADCAST = "ff:ff:ff:ff:ff:ff"
 # What tells the frames of these tests from all others.
 MARK = b"one of many "
@@ -91,14 +94,6 @@ def send_many(client: Client, destination: str) -> List[int]:
     return numbers
 
 
-def test_a_group_may_be_slow(lab: Lab, partner: Partner) -> None:
-    assert partner.rate_wanted() == "fast"
-    lags = [{"name": "lag1", "uplinks": ["nic0", "nic1"], "rate": "slow"}]
-    lab.apply({"switches": [{"alias": "lab", "lags": lags}]})
-    assert comes_true(lambda: partner.rate_wanted() == "slow")
-    assert up(lab) == ["nic0", "nic1"]
-
-
 def test_flows_are_spread_over_the_uplinks_of_a_group(partner: Partner, near: Client) -> None:
     """In both directions, and of each frame there is one copy."""
     far = partner.client
@@ -164,3 +159,62 @@ def test_a_daemon_that_comes_later_finds_the_partners(
     assert comes_true(lambda: up(lab) == [])
     partner.bond("nic0", "nic1")
     assert near.comes_to_reach(partner.client)
+
+
+@pytest.fixture
+def standing(tmp_path: Path) -> Iterator[Tuple[Lab, LastingOpenVSwitch, Partner]]:
+    """A host, its Open vSwitch and that of its partner, whose clocks can be stopped."""
+    with Lab(tmp_path, HOST) as lab:
+        own = LastingOpenVSwitch(lab.host, lab.run_folder(), clock_may_stand=True)
+        with own, Partner(lab, tmp_path / "partner", *BOTH, clock_may_stand=True) as partner:
+            lab.start(own.where)
+            yield lab, own, partner
+
+
+def members(own: LastingOpenVSwitch) -> List[str]:
+    """What Open vSwitch says of them."""
+    said = own.ask("lacp/show").splitlines()
+    return [line.split(": ")[2] for line in said if line.startswith("member: ")]
+
+
+def heard(own: LastingOpenVSwitch) -> List[int]:
+    """How many messages came over each member."""
+    said = own.ask("lacp/show-stats").splitlines()
+    return [int(line.split(": ")[1]) for line in said if "  RX PDUs: " in line]
+
+
+def test_a_silent_partner_is_left_in_time_and_one_that_waits_is_asked(
+    standing: Tuple[Lab, LastingOpenVSwitch, Partner]
+) -> None:
+    lab, own, partner = standing
+    clocks = own, partner.open_vswitch
+    for clock in clocks:
+        clock.stop_clock()
+
+    def comes_in_time(condition: Callable[[], bool]) -> bool:
+        def is_true() -> bool:
+            for clock in clocks:
+                clock.warp(1)
+            return condition()
+
+        return comes_true(is_true)
+
+    # Three times what a partner may take from one message to the next.
+    for lacp, rate, next_message, still, too_long in (
+        ("active", "fast", 2, 2, 2),
+        ("passive", "slow", 31, 85, 10),
+    ):
+        partner.bond(*BOTH, lacp=lacp, rate=rate)
+        assert comes_in_time(lambda: up(lab) == BOTH)
+        lags = [{"name": "lag1", "uplinks": BOTH, "rate": rate}]
+        lab.apply({"switches": [{"alias": "lab", "lags": lags}]})
+        assert comes_in_time(lambda: partner.rate_wanted() == rate)
+        before = heard(own)
+        partner.open_vswitch.warp(next_message)
+        assert comes_true(lambda: all(now > was for now, was in zip(heard(own), before)))
+        partner.leave()
+        own.warp(still)
+        assert members(own) == ["current attached"] * 2
+        assert up(lab) == BOTH
+        own.warp(too_long)
+        assert comes_true(lambda: up(lab) == []), members(own)
