@@ -6,6 +6,7 @@ from pathlib import Path
 from typing import Any, Dict, Iterator, List
 
 import pytest
+from counted_frames import come_to
 from frame_lab import ONE_SWITCH, Lab, comes_true
 from simhost import frame
 from simhost._wires import PacketSocket
@@ -66,11 +67,13 @@ def mirror(lab: Lab, *sessions: Dict[str, Any], switch: str = "lab") -> None:
     lab.set_port(switch, "a", vlan=7, mirror_sessions=list(sessions))
 
 
+def counters_of_sessions(lab: Lab, alias: str) -> Any:
+    switches = json.loads(lab.ctl("show", "--json"))["switches"]
+    return next(one for one in switches if one["alias"] == alias).get("mirror_counters", {})
+
+
 def counters(lab: Lab) -> Any:
-    switch = next(
-        one for one in json.loads(lab.ctl("show", "--json"))["switches"] if one["alias"] == "lab"
-    )
-    return switch.get("mirror_counters", {}).get("s", {})
+    return counters_of_sessions(lab, "lab").get("s", {})
 
 
 def all_reply(lab: Lab) -> bool:
@@ -138,14 +141,23 @@ def test_two_switches_mirror_to_one_collector(lab: Lab, collectors: Collectors) 
         mirror(
             lab,
             said,
-            {**said, "sid": "t", "encapsulation": encapsulation("erspan2")},
+            {**said, "sid": "t", "to": to(ONE, OTHER), "encapsulation": encapsulation("erspan2")},
             switch=switch,
         )
     assert all_reply(lab)
     for client in both:
         sent = frame(BROADCAST, client.mac, payload=b"both" * 20)
-        client.send(sent)
-        assert {packet.kind for packet in collectors.expect(sent, 2)} == {ETHERNET, ERSPAN_2}
+        for _ in range(3):
+            client.send(sent)
+            came = [(packet.kind, packet.destination) for packet in collectors.expect(sent, 3)]
+            assert sorted(came) == [(ETHERNET, ONE), (ERSPAN_2, ONE), (ERSPAN_2, OTHER)]
+    # Each session for itself: what it took, and what became of that.
+    counted = {
+        "s": {"mirroredPkts": 3, "mirrorPktCnt": 3},
+        "t": {"mirroredPkts": 3, "mirrorPktCnt": 6},
+    }
+    for switch in ("lab", "more"):
+        come_to(lambda: counters_of_sessions(lab, switch), counted)
 
 
 def test_a_collector_that_does_not_reply_is_told_and_counted(
