@@ -49,17 +49,21 @@ class Operator:
 
     def process(self, *words: str, before: Sequence[str] = ()) -> Done:
         """In one of its own, at a machine that reaches the servers."""
+        process = self.start(*words, before=before)
+        said, wrong = process.communicate()
+        return Done(process.returncode, said, wrong)
+
+    def start(self, *words: str, before: Sequence[str] = ()) -> "subprocess.Popen[str]":
+        """Likewise, and goes on."""
         # No library of a host is found from here.
         own = ["env", "-u", "LD_LIBRARY_PATH", "-u", "SIMHOST_STATE"]
         servers = ["--fabric", self._lab.databases.addresses]
-        done = subprocess.run(
+        return subprocess.Popen(
             [*self._lab.hub.words(), *own, str(PROGRAM), *before, *servers, *words],
             stdout=subprocess.PIPE,
             stderr=subprocess.PIPE,
             text=True,
-            check=False,
         )
-        return Done(done.returncode, done.stdout, done.stderr)
 
     def told(self, *words: str, given: Any = None) -> str:
         done = self(*words, given=given)

@@ -1,11 +1,16 @@
 """The commands of an operator that are a short document each, and those that a fabric has not."""
 
+import itertools
+import re
+import select
+import signal
 from pathlib import Path
 from typing import Iterator
 
 import pytest
 
 from fabric_lab import FabricLab
+from frame_lab import comes_true
 from operating import Operator, of_lab, populate
 from vswitch import _table
 from vswitch.fabric import Fabric, View
@@ -131,6 +136,27 @@ def test_a_backup_is_a_document_that_has_it_back(operator: Operator) -> None:
     operator.told("apply", "-", given=backup)
     assert operator.json("backup") == backup
     assert "alias: lab" in operator.told("backup")
+
+
+def test_what_changes_is_told_until_somebody_interrupts(operator: Operator) -> None:
+    watch = operator.start("watch", "--kind", "setting")
+    assert watch.stdout is not None
+    changes = itertools.count(1600)
+
+    def is_told() -> bool:
+        operator.told("set", "lab", f"mtu={next(changes)}")
+        return bool(select.select([watch.stdout], [], [], 0.2)[0])
+
+    try:
+        # What is set before it watches it does not tell.
+        assert comes_true(is_told)
+        line = watch.stdout.readline()
+    finally:
+        watch.send_signal(signal.SIGINT)
+        _, wrong = watch.communicate(timeout=30)
+    told = r"\d\d:\d\d:\d\d setting lab/mtu: (absent|16\d\d) -> 16\d\d\n"
+    assert re.fullmatch(told, line), wrong
+    assert watch.returncode == 0, wrong
 
 
 def test_what_is_for_one_host_says_so(operator: Operator) -> None:
