@@ -27,7 +27,12 @@ void Program::add(std::uint8_t table, Rule rule) {
 }
 
 std::vector<openflow::Flow> Program::take_flows() {
+  std::size_t count = 0;
+  for (auto const &[place, flows] : flows_) {
+    count += flows.size();
+  }
   std::vector<openflow::Flow> all;
+  all.reserve(count);
   for (auto &[place, flows] : flows_) {
     if (!std::ranges::is_sorted(flows)) {
       std::ranges::sort(flows);

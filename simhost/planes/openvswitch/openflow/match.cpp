@@ -8,7 +8,7 @@ namespace simhost::openflow {
 namespace {
 
 // As many as most matches have.
-constexpr std::size_t kUsual = 4;
+constexpr std::size_t kUsual = 2;
 
 }  // namespace
 
