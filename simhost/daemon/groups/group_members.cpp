@@ -18,7 +18,6 @@ namespace simhost::daemon {
 namespace {
 
 using multicast::Family;
-using multicast::Place;
 using openvswitch::Network;
 using openvswitch::PrivateKind;
 namespace field = openvswitch::field;
@@ -166,7 +165,7 @@ void GroupMembers::note_places(Switch &known, Network const &network) const {
       }
     }
   }
-  std::erase_if(known.heard, [&](Place const &place) {
+  std::erase_if(known.heard, [&](multicast::Place const &place) {
     auto const vlans = known.many.find(place.port);
     return vlans == known.many.end() || !vlans->second.test(place.vlan);
   });
@@ -188,7 +187,7 @@ void GroupMembers::receive(storage::SwitchKey key, openflow::PacketIn const &pac
   if (number == heard.numbers.end() || !message) {
     return;
   }
-  Place const place{
+  multicast::Place const place{
       .port = number->second,
       .vlan = static_cast<std::uint16_t>(number_in(packet.metadata, field::kDomain).value_or(0))};
   auto const vlans = heard.many.find(place.port);
