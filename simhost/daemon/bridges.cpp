@@ -19,6 +19,10 @@ namespace {
 using openvswitch::Deadline;
 
 constexpr auto *kLock = "simhostd";
+// For as long as a data path is there, Open vSwitch takes it to tell as many tags apart as it did
+// itself when the first bridge of it came, or when it started: of frames with more it would count
+// what becomes of others.
+constexpr std::uint32_t kTellingAll = 2;
 
 }  // namespace
 
@@ -88,12 +92,17 @@ void Bridges::read_database_events() {
   }
 }
 
-std::set<std::string> Bridges::apply_rows(Wanted const &wanted,
-                                          std::vector<openvswitch::BridgeRow> const &rows,
-                                          Deadline deadline) {
+std::uint32_t Bridges::most_tags(Wanted const &wanted) {
+  if (place_.lives.empty()) {
+    // It may start anew when nobody of us is there.
+    return kTellingAll;
+  }
   // As many as those need that stay as they are, too.
-  auto const most_tags =
-      wanted.unfit.empty() ? wanted.most_tags : std::max(wanted.most_tags, present().most_tags);
+  return wanted.unfit.empty() ? wanted.most_tags : std::max(wanted.most_tags, present().most_tags);
+}
+
+std::set<std::string> Bridges::apply_rows(std::vector<openvswitch::BridgeRow> const &rows,
+                                          std::uint32_t most_tags, Deadline deadline) {
   RowsMade made{.rows = rows, .most_tags = most_tags};
   if (rows_made_ == made) {
     return {};
@@ -211,9 +220,11 @@ Bridges::Applied Bridges::apply(Wanted const &wanted, Forget const &forget) {
     }
   }
   auto const rows = wanted_rows(wanted, present());
+  auto const tags = most_tags(wanted);
   bool const any_new = has_new(rows, present());
   auto const bare = any_new ? rows_before_flows(rows, present()) : decltype(rows){};
-  auto const added = apply_rows(wanted, any_new ? bare : rows, deadline);
+  auto const added =
+      any_new ? apply_rows(bare, kTellingAll, deadline) : apply_rows(rows, tags, deadline);
   std::erase_if(bridges_, [](auto const &bridge) { return bridge.second->is_altered(); });
   std::erase_if(bridges_, goes);
   Applied applied;
@@ -221,7 +232,7 @@ Bridges::Applied Bridges::apply(Wanted const &wanted, Forget const &forget) {
     try_flows(bridge, wanted.change, added, any_new ? nullptr : forget, deadline, applied);
   }
   if (any_new) {
-    apply_rows(wanted, rows, deadline);
+    apply_rows(rows, tags, deadline);
     if (applied.changed > 0 && forget) {
       forget(wanted.bridges.front().row.name, wanted.change);
     }

@@ -89,10 +89,11 @@ class Bridges {
   void read_database_events();
   openvswitch::PresentRows const &present();
   void forget_rows();
+  // How many Open vSwitch is to tell apart.
+  std::uint32_t most_tags(Wanted const &wanted);
   // Returns the devices that were put at bridges.
-  std::set<std::string> apply_rows(Wanted const &wanted,
-                                   std::vector<openvswitch::BridgeRow> const &rows,
-                                   openvswitch::Deadline deadline);
+  std::set<std::string> apply_rows(std::vector<openvswitch::BridgeRow> const &rows,
+                                   std::uint32_t most_tags, openvswitch::Deadline deadline);
   void try_flows(WantedBridge const &wanted, std::uint64_t change,
                  std::set<std::string> const &added, Forget const &forget,
                  openvswitch::Deadline deadline, Applied &applied);

@@ -223,6 +223,12 @@ def test_a_private_vlan(traced: Traced) -> None:
         (
             {},
             "nic0",
+            frame(EVERYBODY, "02:00:00:00:00:99", vlan=7, ethertype=0x8100, payload=bytes(46)),
+            ("it has a second tag", None, None),
+        ),
+        (
+            {},
+            "nic0",
             frame(EVERYBODY, MACS["a"], vlan=7),
             ("the switch sent it itself, and it came back", None, None),
         ),
@@ -266,6 +272,7 @@ def test_a_private_vlan(traced: Traced) -> None:
         "forged",
         "wrong_tag",
         "nested_tag",
+        "nested_tag_outside",
         "own_frame",
         "limit",
         "another_uplink",

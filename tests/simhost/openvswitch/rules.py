@@ -150,6 +150,8 @@ class Rules:
             return None
         if at in self.uplinks:
             entered: Optional[Entered] = ((frame.tags or ((0, 0),))[0], frame.tags[1:])
+            if frame.tags[1:] and not self._has_use_for_second_tags():
+                return None
         else:
             entered = self._enters_port(at, frame)
         if entered is None:
@@ -167,6 +169,11 @@ class Rules:
         if self.switch.get("disabled") or _is_malformed(frame):
             return True
         return frame.destination.startswith("01:80:c2:00:00:0")
+
+    def _has_use_for_second_tags(self) -> bool:
+        """A port that may have them, or a mirror session."""
+        nested = (self.ports[port].get("nested_tag") for port in self.connected)
+        return any(nested) or any(self._sessions())
 
     def _enters_port(self, at: str, frame: Frame) -> Optional[Entered]:
         forged = at in self.macs and frame.source != self.macs[at]

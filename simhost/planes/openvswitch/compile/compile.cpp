@@ -113,7 +113,8 @@ Compiled compile(Network const &network) {
         compile_delivery, compile_teams, compile_counting}) {
     stage(plan, program);
   }
-  return {.rows = {.most_learned = network.addresses.limit},
+  return {.rows = {.most_tags = has_use_for_second_tags(network) ? 2U : 1U,
+                   .most_learned = network.addresses.limit},
           .flows = program.take_flows(),
           .groups = program.take_groups()};
 }

@@ -188,7 +188,9 @@ class Story {
       case Counted::wrong_tag:
         return drop("the port has no such VLAN", of_port("vlan"));
       case Counted::nested_tag:
-        return drop("it has a second tag", of_port("nested_tag"));
+        // Of an uplink no setting decides it by itself.
+        return entry_.station.is_uplink ? drop("it has a second tag")
+                                        : drop("it has a second tag", of_port("nested_tag"));
       case Counted::own_frame:
         return drop("the switch sent it itself, and it came back");
       case Counted::unwanted_copy:

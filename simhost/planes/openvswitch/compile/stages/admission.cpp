@@ -19,14 +19,16 @@ void refuse(Program &program, std::uint16_t priority, Match const &match, std::u
               {.priority = priority, .match = match, .actions = drop(), .cookie = cookie});
 }
 
-void refuse_malformed(Program &program) {
+void refuse_malformed(Plan const &plan, Program &program) {
   auto const reserved = cookie(Counted::reserved);
   refuse(program, 900, Match().with(Field::eth_dst, openflow::to_value(kLinkLocal), kLinkLocalMask),
          reserved);
   refuse(program, 890, Match().with(Field::eth_src, kGroupBit, kGroupBit), reserved);
   refuse(program, 890, Match().with(Field::eth_src, 0), reserved);
+  auto const too_many =
+      has_use_for_second_tags(plan.network) ? reserved : cookie(Counted::nested_tag);
   for (auto const type : kTagTypes) {
-    refuse(program, 880, Match().with(Field::eth_type, type), reserved);
+    refuse(program, 880, Match().with(Field::eth_type, type), too_many);
   }
   refuse(program, 870, Match().vlan(kReservedVlan), reserved);
 }
@@ -87,7 +89,7 @@ void compile_admission(Plan const &plan, Program &program) {
   if (plan.network.disabled) {
     refuse(program, 1000, Match(), cookie(Counted::disabled));
   }
-  refuse_malformed(program);
+  refuse_malformed(plan, program);
   hear_beacons(plan, program);
   for (auto const &port : plan.network.ports) {
     admit(program, port);

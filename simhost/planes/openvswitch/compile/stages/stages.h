@@ -7,6 +7,11 @@
 
 namespace simhost::openvswitch {
 
+/// Whether a port takes frames with a second tag, or a mirror session may copy them, or put a tag
+/// above another. Where nobody does, Open vSwitch is to tell one tag apart: while it tells two, a
+/// flow that it remembers of a frame with one passes all that differ from that by a second one.
+bool has_use_for_second_tags(Network const &network);
+
 void compile_admission(Plan const &plan, Program &program);
 void compile_sources(Plan const &plan, Program &program);
 void compile_tags(Plan const &plan, Program &program);

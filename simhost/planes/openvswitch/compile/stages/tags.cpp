@@ -1,4 +1,5 @@
 // From the tags of frames to VLANs and priorities in registers.
+#include <algorithm>
 #include <optional>
 #include <utility>
 
@@ -170,14 +171,21 @@ void compile_nested_tags(Plan const &plan, Program &program) {
                                        .cookie = cookie(Counted::port, port.number)});
     }
   }
+  auto const from_others =
+      has_use_for_second_tags(plan.network) ? Match().with(field::kOrigin, kFromClient) : Match();
   program.add(table::kNestedTags, {.priority = 100,
-                                   .match = Match().with(field::kOrigin, kFromClient).tagged(),
+                                   .match = Match(from_others).tagged(),
                                    .actions = drop(),
                                    .cookie = cookie(Counted::nested_tag)});
   program.add(table::kNestedTags, {.actions = {check_size(plan), go_to(table::kPrivateVlans)}});
 }
 
 }  // namespace
+
+bool has_use_for_second_tags(Network const &network) {
+  return !network.mirrors.empty() ||
+         std::ranges::any_of(network.ports, [](Port const &port) { return port.vlan.nested; });
+}
 
 void compile_tags(Plan const &plan, Program &program) {
   for (auto const &port : plan.network.ports) {
