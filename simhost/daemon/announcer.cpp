@@ -59,7 +59,7 @@ std::vector<std::uint16_t> vlans_of(openvswitch::PortVlan const &vlan) {
 
 }  // namespace
 
-void Announcer::follow(Wanted const &wanted, Memory const &memory) {
+void Announcer::follow(Wanted const &wanted, Memory const &memory, IsLive const &is_live) {
   most_ = wanted.most_announced;
   duration_ = wanted.announced_for;
   std::erase_if(switches_, [&](auto const &known) {
@@ -67,7 +67,7 @@ void Announcer::follow(Wanted const &wanted, Memory const &memory) {
     return std::ranges::none_of(wanted.bridges, is_it) && std::ranges::none_of(wanted.unfit, is_it);
   });
   for (auto const &bridge : wanted.bridges) {
-    follow(bridge, memory);
+    follow(bridge, memory, is_live);
   }
   has_begun_ = true;
   if (!next_interval_) {
@@ -75,7 +75,10 @@ void Announcer::follow(Wanted const &wanted, Memory const &memory) {
   }
 }
 
-void Announcer::follow(WantedBridge const &bridge, Memory const &memory) {
+void Announcer::follow(WantedBridge const &bridge, Memory const &memory, IsLive const &is_live) {
+  auto const has_link = [&](openvswitch::Slot const &slot) {
+    return std::ranges::any_of(slot, [&](auto port) { return is_live(bridge.key, port); });
+  };
   auto &known = switches_[bridge.key];
   std::map<std::uint32_t, Place> places;
   std::vector<Moved> moved;
@@ -84,6 +87,12 @@ void Announcer::follow(WantedBridge const &bridge, Memory const &memory) {
     bool const is_elsewhere = before == known.places.end() ||
                               before->second.device != carried.device ||
                               before->second.links != carried.links;
+    if (has_begun_ && is_elsewhere && !std::ranges::all_of(carried.slots, has_link)) {
+      if (before != known.places.end()) {
+        places.insert(*before);
+      }
+      continue;
+    }
     if (has_begun_ && is_elsewhere && carried.is_announced && !carried.links.empty()) {
       moved.push_back(clients_at(carried, memory.learned_at(bridge.key, carried.number)));
     }

@@ -26,9 +26,13 @@ class Announcer {
 
   Announcer(events::Loop &loop, Send send) : loop_(loop), send_(std::move(send)) {}
 
+  /// Whether Open vSwitch sees a link at a port of a switch's bridge.
+  using IsLive = std::function<bool(storage::SwitchKey, openflow::Port)>;
+
   /// This is in force. What is so when it is told first is no news; clients whose address is not
-  /// known are announced by what `memory` has learned of them.
-  void follow(Wanted const &wanted, Memory const &memory);
+  /// known are announced by what `memory` has learned of them. Open vSwitch may see later that a
+  /// link is back than this host does: until then frames go as before, and a port is where it was.
+  void follow(Wanted const &wanted, Memory const &memory, IsLive const &is_live);
 
  private:
   // Where a client was.
@@ -54,7 +58,7 @@ class Announcer {
     std::deque<Due> due;
   };
 
-  void follow(WantedBridge const &bridge, Memory const &memory);
+  void follow(WantedBridge const &bridge, Memory const &memory, IsLive const &is_live);
   static Moved clients_at(Carried const &carried, std::vector<openflow::Flow> const &learned);
   static std::set<openvswitch::Announced> clients_in(std::vector<Moved> const &moved,
                                                      std::size_t place);

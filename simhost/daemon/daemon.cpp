@@ -323,7 +323,9 @@ void Daemon::sync() {
   if (changed > 0 && is_told) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
-  announcer_.follow(all, memory_);
+  announcer_.follow(all, memory_, [this](auto key, auto port) {
+    return bridges_->is_live(key, port).value_or(false);
+  });
   follow_tunnels(all);
   settle(all);
   try {

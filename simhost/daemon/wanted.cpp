@@ -177,12 +177,20 @@ bool notifies(VSTeamPolicy const &policy) {
   return (policy.flags & TEAM_FRP_FLAG_NOTIFY_SWITCH) != 0;
 }
 
-// The links that may carry a frame of a port: where a team looks into frames, any in use.
+// Of what may carry a frame of a port: where a team looks into frames, any in use.
+template <typename Value>
+std::vector<Value> in_use(openvswitch::Way const &way, std::vector<Value> const &of_slots) {
+  return way.spreads_frames() ? of_slots : std::vector<Value>{of_slots.front()};
+}
+
 std::vector<std::uint32_t> links_of(openvswitch::Way const *way) {
-  if (way == nullptr || way->spreads_frames()) {
-    return way == nullptr ? std::vector<std::uint32_t>() : way->links;
-  }
-  return {way->links.front()};
+  return way == nullptr ? std::vector<std::uint32_t>() : in_use(*way, way->links);
+}
+
+// Where there is nothing to choose, links are not looked at.
+std::vector<openvswitch::Slot> chosen_slots(openvswitch::Way const *way) {
+  return way == nullptr || way->is_single() ? std::vector<openvswitch::Slot>()
+                                            : in_use(*way, way->slots);
 }
 
 bool gets_out(openvswitch::Port const &port) {
@@ -202,10 +210,12 @@ void add_carried(storage::Transaction &transaction, openvswitch::Network const &
   }
   for (auto const &port : network.ports) {
     auto const set = own.find(port.number);
+    auto const *const way = gets_out(port) ? ways.of(port) : nullptr;
     bridge.carried.push_back(
         {.number = port.number,
          .device = devices[port.number],
-         .links = links_of(gets_out(port) ? ways.of(port) : nullptr),
+         .links = links_of(way),
+         .slots = chosen_slots(way),
          .is_announced = set == own.end() ? notifies(shared) : set->second,
          .client = {.port = port.port,
                     .number = port.number,

@@ -27,9 +27,11 @@ struct Carried {
   std::uint32_t number;              ///< of its port of the switch
   std::string device;                ///< of the port
   std::vector<std::uint32_t> links;  ///< see Way::links; none: it reaches nobody beyond
-  bool is_announced;                 ///< when that changes
-  openvswitch::Announced client;     ///< with its address if that is known, else zero
-  openvswitch::PortVlan vlan;        ///< in which VLANs it is announced
+  /// Of each, Open vSwitch is to see the link of an uplink before frames go as they are to.
+  std::vector<openvswitch::Slot> slots;
+  bool is_announced;              ///< when that changes
+  openvswitch::Announced client;  ///< with its address if that is known, else zero
+  openvswitch::PortVlan vlan;     ///< in which VLANs it is announced
 
   [[nodiscard]] bool has_address() const { return client.address != openflow::EthernetAddress{}; }
 };

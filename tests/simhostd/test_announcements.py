@@ -1,5 +1,7 @@
 """Clients that move to another uplink, or come to a port, are announced to the network."""
 
+import os
+import signal
 import sqlite3
 import time
 from typing import List, Tuple
@@ -72,6 +74,32 @@ def test_a_client_that_is_moved_is_announced(lab: Lab, around: Around) -> None:
     near.expect(hello)
     far.expect_none(reverse_arp(near.mac))
     assert comes_true(lambda: sent(lab) == 2)
+
+
+LINK = """
+from libvswitch import checked
+print(checked.VSQEX_GetUplinkLinkState("lab", "nic0").name)
+"""
+
+
+def test_an_announcement_goes_over_a_link_that_open_vswitch_sees_late(
+    lab: Lab, around: Around
+) -> None:
+    network, far = around
+    near = lab.client("lab", "a")
+    assert near.comes_to_reach(far)
+    switch = lab.processes()["ovs-vswitchd"]
+    # It chooses by chance what to look at first: links, or what it is told.
+    for _ in range(2):
+        network.pull("nic0")
+        far.expect(reverse_arp(near.mac))
+        assert comes_true(lambda: network.came_over(near.mac) == "nic1")
+        os.kill(switch, signal.SIGSTOP)
+        network.plug("nic0")
+        assert comes_true(lambda: "UP" in lab.python(LINK))
+        os.kill(switch, signal.SIGCONT)
+        far.expect(reverse_arp(near.mac))
+        assert comes_true(lambda: network.came_over(near.mac) == "nic0")
 
 
 def test_a_client_is_announced_when_its_device_is_connected(lab: Lab, around: Around) -> None:

@@ -76,4 +76,14 @@ std::set<std::string> aggregated_devices(BridgeRow const &row) {
   return devices;
 }
 
+std::set<openflow::Port> chosen_uplinks(WantedBridge const &wanted) {
+  std::set<openflow::Port> uplinks;
+  for (auto const &carried : wanted.carried) {
+    for (auto const &slot : carried.slots) {
+      uplinks.insert(slot.begin(), slot.end());
+    }
+  }
+  return uplinks;
+}
+
 }  // namespace simhost::daemon

@@ -26,5 +26,7 @@ std::set<std::string> added_devices(openvswitch::PresentRows const &present,
 
 /// Devices of a bridge that are in groups.
 std::set<std::string> aggregated_devices(openvswitch::BridgeRow const &row);
+/// Of which Open vSwitch chooses by their links; see Carried::slots.
+std::set<openflow::Port> chosen_uplinks(WantedBridge const &wanted);
 
 }  // namespace simhost::daemon

@@ -157,7 +157,8 @@ void RunningBridge::follow_events() {
     }
     if (auto const *const status = std::get_if<openflow::PortStatus>(&*event)) {
       bool const is_another = live_.follow(*status);
-      has_lived = has_lived || (is_another && aggregated_.contains(status->port.name));
+      has_lived = has_lived || (is_another && (aggregated_.contains(status->port.name) ||
+                                               uplinks_.contains(status->port.port)));
     }
     auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
     if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
@@ -348,6 +349,7 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
   sessions_ = wanted.sessions;
   aging_ = wanted.aging;
   aggregated_ = aggregated_devices(wanted.row);
+  uplinks_ = chosen_uplinks(wanted);
   return size_of(difference) + std::exchange(added_ahead_, 0);
 }
 

@@ -45,7 +45,7 @@ class RunningBridge {
     std::function<void(std::string const &)> altered;
     /// It has learned what its flows do not teach, or not any more.
     std::function<void()> strayed;
-    /// Devices in groups are live, or are not any more; see is_live().
+    /// Uplinks, or devices in groups, are live, or are not any more; see is_live().
     std::function<void()> lived;
     /// A flow sent up a frame.
     std::function<void(storage::SwitchKey, openflow::PacketIn const &)> heard;
@@ -127,6 +127,7 @@ class RunningBridge {
   std::chrono::seconds aging_{};
   LivePorts live_;
   std::set<std::string> aggregated_;  // devices that are in groups
+  std::set<openflow::Port> uplinks_;  // that are chosen from by their links
   openvswitch::Deadline counted_{};
   std::size_t added_ahead_ = 0;  // of flows and groups, before what it has was read
   bool is_closed_ = false;       // by gate()

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <fstream>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -30,6 +31,7 @@ simhost::daemon::Carried trunk(std::uint32_t number, std::uint32_t link) {
   simhost::daemon::Carried carried{.number = number,
                                    .device = "c" + std::to_string(number),
                                    .links = {link},
+                                   .slots = {{link}, {link + 1}},
                                    .is_announced = true,
                                    .client = {.port = number, .number = number},
                                    .vlan = {}};
@@ -49,11 +51,14 @@ struct AnAnnouncer : MemoryState {
       bridge.carried.push_back(trunk(number, link));
     }
     wanted.bridges.push_back(bridge);
-    announcer.follow(wanted, memory);
+    announcer.follow(wanted, memory, [this](SwitchKey key, std::uint32_t port) {
+      return key == kSwitch && !dead.contains(port);
+    });
   }
 
   simhost::events::Loop loop;
   Memory memory{store, [] {}};
+  std::set<std::uint32_t> dead;  // links that Open vSwitch does not see
   std::vector<Announced> sent;
   Announcer announcer{loop, [this](SwitchKey, std::vector<Announced> const &some) {
                         sent.insert(sent.end(), some.begin(), some.end());
@@ -66,6 +71,25 @@ TEST_F(AnAnnouncer, TellsOfEachPortBeforeItTellsOfAnyInAnotherVlan) {
   follow(2, 2);
   EXPECT_THAT(sent, SizeIs(1));
   EXPECT_THAT(sent, Each(Field(&Announced::vlan, 0)));
+}
+
+TEST_F(AnAnnouncer, WaitsForOpenVSwitchToSeeALink) {
+  follow(1, 1);
+  dead = {3};
+  follow(1, 2);
+  EXPECT_THAT(sent, SizeIs(0));
+  dead = {};
+  follow(1, 2);
+  EXPECT_THAT(sent, SizeIs(1));
+}
+
+TEST_F(AnAnnouncer, TellsNothingOfALinkThatGoesBeforeItIsSeen) {
+  follow(1, 1);
+  dead = {2};
+  follow(1, 2);
+  dead = {};
+  follow(1, 1);
+  EXPECT_THAT(sent, SizeIs(0));
 }
 
 // In kB; the most since it was asked to forget that.
