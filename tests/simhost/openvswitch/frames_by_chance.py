@@ -3,9 +3,9 @@
 
     frames_by_chance.py [--seconds N] [--seed N]
 
-Holds every copy that comes out to the rules, byte by byte, for as long as it is told; prints the
-switch and the frame that the rules and the data path do not agree about, and at the end how many
-frames there were.
+Holds every copy that comes out to the rules, byte by byte, and what flows count of it, for as long
+as it is told; prints the switch and the frame that the rules and the data path do not agree about,
+or what was counted, and at the end how many frames there were.
 """
 
 import random
@@ -23,6 +23,7 @@ from hypothesis import given, seed  # noqa: E402
 from hypothesis import strategies as st  # noqa: E402
 
 from compiler import Compiler  # noqa: E402
+from counting_rules import CountingRules  # noqa: E402
 from drawn_switches import (  # noqa: E402
     CLIENTS,
     PLACES,
@@ -91,14 +92,22 @@ def run(
     def each(drawn: Any, clients: Any, chance: int) -> None:
         switch, links = drawn
         rules = wires.load(switch, clients, change, links)
+        counting = CountingRules(rules)
         frames = random.Random(chance)
-        for at, data in (frame_of_bytes(frames) for _ in range(OF_A_SWITCH)):
-            if at in wires.devices and at not in links.down:
-                wires.forget()
-                found, wanted = wires.transmit(at, data), may_come_out(rules, at, data)
-                assert found in wanted, disagreement(at, data, found, wanted)
-                count.sent += 1
-                count.passed += bool(found)
+        sent = [frame_of_bytes(frames) for _ in range(OF_A_SWITCH)]
+        sent = [(at, data) for at, data in sent if at in wires.devices and at not in links.down]
+        # What is too large leaves open where it would have gone, and counts there.
+        for is_large in False, True:
+            for at, data in sent:
+                if counting.is_large(Frame.read(data)) == is_large:
+                    wires.forget()
+                    found, wanted = wires.transmit(at, data), may_come_out(rules, at, data)
+                    assert found in wanted, disagreement(at, data, found, wanted)
+                    count.sent += 1
+                    count.passed += bool(found)
+                    counting.add(at, data, Counter(name for name, _ in found.elements()))
+            unlike = counting.wrong(*wires.counted())
+            assert not unlike, "\n".join(unlike)
 
     try:
         each()

@@ -218,13 +218,19 @@ class OpenVSwitch:
     def counted(self, bridge: str) -> Dict[int, int]:
         """The frames that its flows counted, by their cookies; those of the tables that count."""
         self.ask("revalidator/wait")
-        counted: Dict[int, int] = {}
+        return {cookie: frames for cookie, (frames, _) in self.counts(bridge).items()}
+
+    def counts(self, bridge: str) -> Dict[int, Tuple[int, int]]:
+        """Likewise with their bytes, without what the data path did by itself and has not told."""
+        counted: Dict[int, Tuple[int, int]] = {}
         for line in self._ofctl("dump-flows", bridge).splitlines()[1:]:
-            found = re.search(r"cookie=(0x[0-9a-f]+), .*table=(\d+), n_packets=(\d+)", line)
-            if found and int(found[2]) in COUNTING:
-                cookie = int(found[1], 16)
-                counted[cookie] = counted.get(cookie, 0) + int(found[3])
-        return {cookie: frames for cookie, frames in counted.items() if frames}
+            found = re.search(
+                r"cookie=(0x[0-9a-f]+), .*table=(\d+), n_packets=(\d+), n_bytes=(\d+)", line
+            )
+            if found and int(found[2]) in COUNTING and found[3] != "0":
+                frames, size = counted.get(int(found[1], 16), (0, 0))
+                counted[int(found[1], 16)] = frames + int(found[3]), size + int(found[4])
+        return counted
 
     def known_places(self, bridge: str) -> Dict[str, int]:
         """Where the addresses are that it learned."""

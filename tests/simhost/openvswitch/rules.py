@@ -146,7 +146,7 @@ class Rules:
 
     def enters(self, at: str, frame: Frame) -> Optional[Inside]:
         """A frame as one of the switch's; nothing if it is none."""
-        if self._is_refused(frame):
+        if self._is_for_nobody(frame):
             return None
         if at in self.uplinks:
             entered: Optional[Entered] = ((frame.tags or ((0, 0),))[0], frame.tags[1:])
@@ -164,7 +164,10 @@ class Rules:
             return None
         return Inside(vlan, priority, rest, frame.size + tags)
 
-    def _is_refused(self, frame: Frame) -> bool:
+    def mirrors(self) -> bool:
+        return bool(self.switch.get("uplink_mirror_sessions")) or any(self._sessions())
+
+    def _is_for_nobody(self, frame: Frame) -> bool:
         """Wherever it comes from."""
         if self.switch.get("disabled") or _is_malformed(frame):
             return True
@@ -387,7 +390,7 @@ class Rules:
     def _copies_of_others(self, at: str, frame: Frame) -> Optional[Counts[Copy]]:
         """What comes out of a copy that comes in at an uplink; nothing if it is none."""
         vlan, priority = frame.tags[0] if frame.tags else (0, 0)
-        if self._is_refused(frame) or not any(
+        if self._is_for_nobody(frame) or not any(
             vlan in self._taken(session) for session in self._sessions()
         ):
             return None
@@ -402,6 +405,17 @@ class Rules:
 
     # All of it
 
+    def is_refused(self, at: str, frame: Frame) -> bool:
+        """Whether it is not let in there, and is no copy that another switch made."""
+        if at in self.uplinks and self._copies_of_others(at, frame) is not None:
+            return False
+        return at in self.blocked or self._let_in(at, frame) is None
+
+    def _let_in(self, at: str, frame: Frame) -> Optional[Inside]:
+        inside = self.enters(at, frame)
+        is_back = at in self.uplinks and inside and self._is_back(frame, inside.vlan)
+        return None if is_back else inside
+
     def comes_out(self, at: str, frame: Frame) -> List[Counts[Copy]]:
         """What comes out of a frame: one of these, for the uplink that carries it may be one of
         several."""
@@ -411,8 +425,8 @@ class Rules:
         copies = self._copies_of_others(at, frame) if from_uplink else None
         if copies is not None:
             return [copies]
-        inside = self.enters(at, frame)
-        if inside is None or (from_uplink and self._is_back(frame, inside.vlan)):
+        inside = self._let_in(at, frame)
+        if inside is None:
             return [Counter()]
         direction, source = ("received_by", "uplink") if from_uplink else ("sent_by", "port")
         out = self._mirrored(direction, {source: at}, inside, at)

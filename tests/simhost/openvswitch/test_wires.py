@@ -81,6 +81,30 @@ def test_what_is_wrong_would_be_noticed(
     assert len(wrong) == 1 and "the rules say" in wrong[0]
 
 
+@pytest.mark.parametrize(
+    "found, becomes, said",
+    [
+        # What goes out counts as dropped as well.
+        (r"(table=23, .*actions=output:\d+)$", r"\1,resubmit(,24)", "came in: "),
+        # What is dropped counts nowhere.
+        (r".*table=24, .*", None, "came in: "),
+        # What comes in for all counts as if it were for several, and so does what goes out.
+        ("^cookie=0x14", "cookie=0x13", "came in at least: "),
+        ("^cookie=0x17", "cookie=0x16", "went out: "),
+    ],
+)
+def test_what_is_counted_wrong_would_be_noticed(
+    wires: Wires, found: str, becomes: Optional[str], said: str
+) -> None:
+    def change(flow: str) -> Optional[str]:
+        if becomes is None:
+            return None if re.fullmatch(found, flow) else flow
+        return re.sub(found, becomes, flow)
+
+    _, wrong = frames_by_chance.run(wires, 7, 40, shrink=False, change=change)
+    assert len(wrong) == 1 and f"counted that {said}" in wrong[0]
+
+
 @pytest.mark.parametrize("vlan, tags", [(0, ()), ({"trunk": [7]}, ((7, 0),))])
 def test_a_giant_does_not_pass(wires: Wires, vlan: Any, tags: Tags) -> None:
     """A tag is no part of the packet."""

@@ -18,6 +18,7 @@ from typing import (
 
 from bench import Bench
 from compiler import Compiler
+from counting_rules import KINDS as COUNTED_KINDS, Counted
 from drawn_switches import COLLECTORS
 from frames import Frame, plain
 from links import Links
@@ -61,6 +62,8 @@ class Wires(Bench):
         self._underlay = ""
         self._devices = devices
         self._seen: Dict[str, int] = {}
+        # Devices by the numbers in cookies.
+        self._counting: Dict[int, str] = {}
         fence, end = devices + 1, devices + 2
         self.more_flows = [f"priority=65535,in_port={fence} actions=output:{end}"]
         self.host = {"underlay": {"device": "eth9", "address": f"{HERE}/24"}}
@@ -75,6 +78,8 @@ class Wires(Bench):
         heard: Optional[Mapping[str, Any]] = None,
     ) -> Rules:
         rules = super().load(switch, clients, change, links, multicast, heard)
+        at = {port["id"]: port["uplink"] for port in switch.get("uplink_ports", [])}
+        self._counting = {number: at.get(port, port) for port, number in rules.numbers.items()}
         # What the data path keeps of the flows before goes with them, but not at that moment.
         self.ask("revalidator/purge")
         return rules
@@ -89,6 +94,18 @@ class Wires(Bench):
     def forget(self) -> None:
         """Makes the switch one that has learned nothing."""
         self._open_vswitch.forget(self._bridge)
+
+    def counted(self) -> "Tuple[Counts[Counted], Counts[Counted]]":
+        """The frames that its flows counted, none of which went like another, and the bytes of
+        these."""
+        frames: Counts[Counted] = Counter()
+        size: Counts[Counted] = Counter()
+        for cookie, (number, length) in self._open_vswitch.counts(self._bridge).items():
+            device, kind = self._counting.get(cookie & 0xFFFFFFFF), COUNTED_KINDS.get(cookie >> 56)
+            if device is not None and kind is not None:
+                frames[device, kind] += number
+                size[device, kind] += length
+        return frames, size
 
     def transmit(self, at: str, data: bytes) -> "Counts[Arrived]":
         """What comes out where of a frame that comes in there."""
