@@ -6,6 +6,7 @@
 #include <sys/socket.h>
 
 #include <array>
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
@@ -46,6 +47,9 @@ class SpoilingRelay {
   }
   SpoilingRelay(SpoilingRelay const &) = delete;
   SpoilingRelay &operator=(SpoilingRelay const &) = delete;
+
+  /// What is asked from now on about the flows of a table, too.
+  void have_refused(std::uint8_t table) { refused_ = table; }
 
   [[nodiscard]] std::filesystem::path folder() const { return socket_.parent_path(); }
 
@@ -94,6 +98,8 @@ class SpoilingRelay {
       said_.erase(said_.begin(), end);
       if (header.type == openflow::MessageType::bundle_add) {
         spoil(message);
+      } else if (header.type == openflow::MessageType::multipart_request) {
+        spoil_question(message);
       }
       whole.insert(whole.end(), message.begin(), message.end());
     }
@@ -112,7 +118,17 @@ class SpoilingRelay {
     }
   }
 
+  void spoil_question(std::vector<std::uint8_t> &message) const {
+    constexpr std::size_t kTable = openflow::kHeaderSize + 8;
+    openflow::Reader in(openflow::BytesView(message).subspan(openflow::kHeaderSize));
+    if (in.u16() == static_cast<std::uint16_t>(openflow::MultipartType::flows) &&
+        message.at(kTable) == refused_) {
+      message.at(openflow::kHeaderSize) = 0x7f;
+    }
+  }
+
   std::uint64_t cookie_;
+  std::atomic<int> refused_ = -1;  // a table
   Stream switch_;
   TemporaryFolder folder_;
   std::filesystem::path socket_;
