@@ -2,11 +2,14 @@
 it has its own again."""
 
 import json
+from pathlib import Path
 from typing import Any, Dict
+
+import pytest
 
 from simhost import Client, frame
 
-from frame_lab import Lab, comes_sooner_or_later, comes_true
+from frame_lab import TOOLS, Lab, comes_sooner_or_later, comes_true
 
 OWN, OTHER, CHANGED = (f"02:00:00:00:00:{number}" for number in ("01", "02", "99"))
 BROADCAST = "ff:ff:ff:ff:ff:ff"
@@ -41,6 +44,36 @@ def test_what_becomes_of_a_client_that_changes_its_address(lab: Lab) -> None:
     lab.set_port("lab", "a", **ALLOWED)
     other.send(frame(CHANGED, OTHER, payload=b"it may now"))
     one.expect(frame(CHANGED, OTHER, payload=b"it may now"))
+
+
+# Without the right to hear what other namespaces tell, which nothing else takes.
+DEAF = """#!/bin/sh
+exec setpriv --bounding-set=-net_broadcast --inh-caps=-net_broadcast {} "$@"
+"""
+NET_BROADCAST = 1 << 11
+
+
+def test_a_client_is_reached_that_changes_its_address_where_the_kernel_does_not_tell(
+    idle: Lab, tmp_path: Path, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    deaf = tmp_path / "simhostd"
+    deaf.write_text(DEAF.format(TOOLS / "simhostd"), encoding="utf-8")
+    deaf.chmod(0o755)
+    monkeypatch.setattr("simhost._loaded.program", lambda *_, **__: deaf)
+    idle.start()
+    assert idle.daemon is not None and not rights_of(idle.daemon.pid) & NET_BROADCAST
+    one, other = (idle.frames.client("lab", port, mac=mac) for port, mac in zip("ab", (OWN, OTHER)))
+    idle.set_port("lab", "a", **ALLOWED)
+    for number in range(2):
+        address = f"02:00:00:00:00:9{number}"
+        change(one, address)
+        assert comes_sooner_or_later(other, one, frame(address, OTHER, payload=b"at last"))
+
+
+def rights_of(process: int) -> int:
+    status = Path(f"/proc/{process}/status").read_text(encoding="utf-8")
+    (rights,) = (line for line in status.splitlines() if line.startswith("CapEff:"))
+    return int(rights.split()[1], 16)
 
 
 def is_reached_as_it_is_now(lab: Lab, one: Client, other: Client, everything: Client) -> None:
