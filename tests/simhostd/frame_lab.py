@@ -31,11 +31,15 @@ ONE_SWITCH: Dict[str, Any] = {
 
 
 def comes_true(condition: Callable[[], Any]) -> bool:
-    """Whether it is true at some time."""
+    """Whether it is true at some time. Most of what is looked at takes a process to see it, so that
+    what comes late is not looked for all the time."""
     deadline = time.monotonic() + PATIENCE
+    pause = 0.01
     while time.monotonic() < deadline:
         if condition():
             return True
+        time.sleep(pause)
+        pause = min(2 * pause, 0.2)
     return False
 
 
