@@ -88,6 +88,9 @@ storage::Store &Host::state() {
       share_through(&sharing_.emplace(file->location()));
     }
   }
+  if (plane_) {
+    plane_->begin_call();
+  }
   return *state_;
 }
 

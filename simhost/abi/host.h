@@ -24,7 +24,7 @@ class Host {
   /// The file of the state, the one that SIMHOST_STATE names when it is first asked for or used;
   /// none in memory. Throws storage::UnusableState.
   std::optional<storage::StateFile> const &state_file();
-  /// The state; opened on first use. Throws storage::UnusableState.
+  /// The state, for a call that begins; opened on first use. Throws storage::UnusableState.
   storage::Store &state();
   /// The plane of a state file that is open; null for a state in memory.
   openvswitch::OpenVswitchPlane *find_openvswitch_plane() { return plane_ ? &*plane_ : nullptr; }

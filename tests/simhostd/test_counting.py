@@ -365,3 +365,20 @@ def test_only_what_frames_leave_behind_is_asked_of_the_daemon(
             except socket.timeout:
                 pass
         assert asking.returncode == 0
+
+
+def test_a_daemon_that_says_nothing_is_waited_for_once(
+    idle: Lab, monkeypatch: pytest.MonkeyPatch
+) -> None:
+    idle.start()
+    for port in "abc":
+        idle.client("lab", port)
+    idle.stop()
+    with socket.socket(socket.AF_UNIX) as line:
+        monkeypatch.chdir(idle.folder)
+        line.bind(f"{idle.state.name}-simhostd")
+        line.listen()
+        assert "switch lab: 3 of 128 ports" in idle.ctl("show")
+        line.setblocking(False)
+        with line.accept()[0], pytest.raises(BlockingIOError):
+            line.accept()

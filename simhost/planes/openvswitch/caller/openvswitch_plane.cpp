@@ -32,33 +32,6 @@
 namespace simhost::openvswitch {
 namespace {
 
-Json asked(std::filesystem::path const &file, Json const &question) {
-  try {
-    auto reply = ask(file, question, kPatience);
-    if (reply.contains("refused")) {
-      throw Refused(QEX_IO_ERROR, reply["refused"].get<std::string>());
-    }
-    return reply;
-  } catch (NoDaemon const &none) {
-    throw Refused(QEX_TIMEOUT, none.what());
-  } catch (Json::exception const &error) {
-    throw Refused(QEX_IO_ERROR,
-                  fmt::format("simhostd says what nobody understands: {}", error.what()));
-  }
-}
-
-// Nothing without a daemon.
-std::optional<Json> asked_if_there(std::filesystem::path const &file, Json const &question) {
-  try {
-    return asked(file, question);
-  } catch (Refused const &refused) {
-    if (refused.status() != QEX_TIMEOUT) {
-      throw;
-    }
-    return std::nullopt;
-  }
-}
-
 Counters counters_in(Json const &said, CounterKind kind) {
   Counters counters;
   for (auto const &counter : counters_of(kind)) {
@@ -223,7 +196,7 @@ void check_switches(storage::Transaction &transaction, std::filesystem::path con
 }  // namespace
 
 OpenVswitchPlane::OpenVswitchPlane(Plane &stored, std::filesystem::path file)
-    : stored_(stored), file_(std::move(file)) {}
+    : stored_(stored), file_(std::move(file)), asking_(file_) {}
 
 bool OpenVswitchPlane::has_frames(storage::Transaction &transaction, Place const &place) const {
   if (!storage::frames_change(transaction)) {
@@ -262,7 +235,7 @@ std::string OpenVswitchPlane::team_uplink(storage::Transaction &transaction,
   if (!goes_by_load(transaction, port) || !has_frames(transaction, place)) {
     return known;
   }
-  auto const reply = asked_if_there(file_, question_about("carrier", place));
+  auto const reply = asking_.reply_if_there(question_about("carrier", place));
   for (auto const &uplink : storage::uplinks_of(transaction, port.switch_key)) {
     auto const device = storage::device_of(transaction, uplink.name);
     if (reply && device && device->number == reply->at("device").get<std::uint32_t>()) {
@@ -277,7 +250,7 @@ std::vector<VSMACEntry> OpenVswitchPlane::addresses(storage::Transaction &transa
   auto entries = stored_.addresses(transaction, place, type);
   bool const asks_for_learned = type == VS_MAC_ADDR_TYPE_LEARNED || type == VS_MAC_ADDR_TYPE_ALL;
   if (asks_for_learned && has_frames(transaction, place)) {
-    auto const reply = asked(file_, question_about("addresses", place));
+    auto const reply = asking_.reply(question_about("addresses", place));
     // What was learned before a device came is none of what its bridge knows.
     std::erase_if(entries, [](VSMACEntry const &entry) {
       return entry.macAddrType == VS_MAC_ADDR_TYPE_LEARNED;
@@ -294,7 +267,7 @@ VSPMACLearningStats OpenVswitchPlane::learning_stats(storage::Transaction &trans
                                                      Place const &place) {
   auto stats = stored_.learning_stats(transaction, place);
   if (has_frames(transaction, place)) {
-    auto const reply = asked(file_, question_about("addresses", place));
+    auto const reply = asking_.reply(question_about("addresses", place));
     stats.numMACsLearned = static_cast<std::uint32_t>(reply.at("addresses").size());
     show(counters(transaction, {.switch_key = place.switch_key, .port = place.port}), stats);
   }
@@ -326,7 +299,7 @@ std::map<AddressBytes, McastGroup> OpenVswitchPlane::joined(storage::Transaction
     return joined;
   }
   auto const reply =
-      asked(file_, question_about("groups", {.switch_key = port.switch_key, .port = port.number}));
+      asking_.reply(question_about("groups", {.switch_key = port.switch_key, .port = port.number}));
   auto const now = clock_now(transaction);
   for (auto const &one : reply.at("groups")) {
     auto const group = group_in(one, now);
@@ -369,7 +342,7 @@ int OpenVswitchPlane::multicast_mode(storage::Transaction &transaction, storage:
     return wanted;
   }
   auto const question = question_about("multicast mode", {.switch_key = key, .port = {}});
-  return asked(file_, question).value("mode", wanted);
+  return asking_.reply(question).value("mode", wanted);
 }
 
 // Without a daemon they are what they were when it counted last.
@@ -379,7 +352,7 @@ Counters OpenVswitchPlane::counters(storage::Transaction &transaction, CounterOw
   }
   auto question = question_about("counters", {.switch_key = owner.switch_key, .port = owner.port});
   question["session"] = owner.session;
-  auto const reply = asked_if_there(file_, question);
+  auto const reply = asking_.reply_if_there(question);
   return reply ? counters_in(reply->at("counters"), kind_of(owner))
                : stored_.counters(transaction, owner);
 }
@@ -389,7 +362,7 @@ std::vector<std::string> OpenVswitchPlane::counting_sessions(storage::Transactio
   auto sessions = stored_.counting_sessions(transaction, key);
   if (counts_frames(transaction, {.switch_key = key, .session = "any"})) {
     auto const question = question_about("sessions", {.switch_key = key, .port = std::nullopt});
-    if (auto const reply = asked_if_there(file_, question)) {
+    if (auto const reply = asking_.reply_if_there(question)) {
       auto const more = reply->at("sessions").get<std::vector<std::string>>();
       sessions.insert(sessions.end(), more.begin(), more.end());
       std::ranges::sort(sessions);
@@ -428,7 +401,7 @@ void OpenVswitchPlane::remove_address(storage::ChangingTransaction &transaction,
     question["mac"] = std::to_array(entry.macAddress);
     question["vlan"] = qex_uint16{entry.vid};
     // Frames are in no virtual network.
-    if (entry.vni != 0 || !asked(file_, question).at("learned").get<bool>()) {
+    if (entry.vni != 0 || !asking_.reply(question).at("learned").get<bool>()) {
       throw Refused(QEX_NOT_FOUND);
     }
   }
@@ -445,7 +418,7 @@ void OpenVswitchPlane::check_device(storage::Transaction &transaction, std::stri
     return;
   }
   try {
-    auto const reply = ask(file_, {{"ask", "device"}, {"name", device}}, kPatience);
+    auto const reply = asking_.said({{"ask", "device"}, {"name", device}});
     if (!reply.value("there", true)) {
       throw Refused(QEX_NOT_FOUND, fmt::format("simhostd sees no device {}", device));
     }
@@ -479,7 +452,7 @@ void OpenVswitchPlane::check_packet_sizes(storage::Transaction &transaction) {
   if (!question) {
     return;
   }
-  if (auto const reply = asked_if_there(file_, *question)) {
+  if (auto const reply = asking_.reply_if_there(*question)) {
     if (auto const why = reply->value("why", std::string()); !why.empty()) {
       throw Refused(QEX_NOT_SUPPORTED, why);
     }

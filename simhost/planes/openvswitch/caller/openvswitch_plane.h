@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "model/plane.h"
+#include "planes/openvswitch/caller/asking.h"
 #include "planes/openvswitch/caller/packet_sizes.h"
 #include "planes/openvswitch/trace/story.h"
 #include "storage/switches.h"
@@ -56,6 +57,8 @@ class OpenVswitchPlane : public Plane {
   void committed() noexcept override;
   Wires *find_wires() override;
 
+  /// Another call begins, which waits for the daemon anew.
+  void begin_call() { asking_.begin(); }
   InForce in_force(storage::Transaction &transaction);
   /// What becomes of a frame that comes in at a port or an uplink of a switch. Refuses one without
   /// a device (QEX_IS_DISCONNECTED), and what Open vSwitch refuses (QEX_IO_ERROR).
@@ -74,6 +77,7 @@ class OpenVswitchPlane : public Plane {
 
   Plane &stored_;
   std::filesystem::path file_;
+  Asking asking_;
   std::optional<std::uint64_t> prepared_;  // the change that is about to be committed
   PacketSizes packet_sizes_;
 };
