@@ -6,6 +6,7 @@
 #include <future>
 #include <limits>
 #include <span>
+#include <utility>
 #include <vector>
 
 #include "planes/openvswitch/compile/pipeline.h"
@@ -19,13 +20,31 @@ using openflow::Flow;
 using openvswitch::Deadline;
 using openvswitch::Lives;
 
-// It accepts one in each turn, so that more of them begin too late.
-constexpr std::size_t kConnections = 16;
+// So many messages of a connection.
+constexpr std::size_t kInATurn = 50;
+// More than twice as many have no room to wait until they are accepted.
+constexpr std::size_t kMostConnections = 32;
 // To connect takes longer than one connection takes for fewer.
 constexpr std::size_t kMany = 1000;
 
-bool is_bare(Connection &connection, Deadline deadline) {
-  return connection.aggregate({}, deadline).flows == 0 && connection.groups(deadline).empty();
+// It accepts one in each turn, so that each begins a turn after the one before.
+std::size_t taken_in(std::size_t turns) {
+  auto const connections = std::min(turns, kMostConnections);
+  return kInATurn * (connections * turns - connections * (connections - 1) / 2);
+}
+
+// How many of these flows each connection takes, so that all end in the same turn.
+std::vector<std::size_t> shares_of(std::size_t flows) {
+  std::size_t turns = 1;
+  while (taken_in(turns) < flows) {
+    ++turns;
+  }
+  std::vector<std::size_t> shares;
+  for (; flows > 0; --turns) {
+    shares.push_back(std::min(flows, kInATurn * turns));
+    flows -= shares.back();
+  }
+  return shares;
 }
 
 void add_gate_and_groups(Connection &connection, std::span<openflow::Group const> groups,
@@ -38,14 +57,13 @@ void add_gate_and_groups(Connection &connection, std::span<openflow::Group const
   connection.change(changes, deadline);
 }
 
-void add_flows(std::filesystem::path const &socket, std::span<Flow const> flows, Deadline deadline,
-               Lives const &lives) {
+void add_flows(Connection connection, std::span<Flow const> flows, Deadline deadline) {
   Changes changes;
   changes.reserve(flows.size());
   for (auto const &flow : flows) {
     changes.emplace_back(openflow::FlowChange{.command = openflow::FlowCommand::add, .flow = flow});
   }
-  Connection(socket, deadline, lives).change(changes, deadline);
+  connection.change(changes, deadline);
 }
 
 }  // namespace
@@ -60,23 +78,27 @@ openflow::Flow gate() {
 std::size_t add_unreached(Connection &connection, std::filesystem::path const &socket,
                           openvswitch::Compiled const &wanted, Deadline deadline,
                           Lives const &lives) {
-  std::span const flows(wanted.flows);
-  if (flows.size() < kMany || !is_bare(connection, deadline)) {
+  std::span flows(wanted.flows);
+  if (flows.size() < kMany || !connection.is_bare(deadline)) {
     return 0;
+  }
+  auto const shares = shares_of(flows.size());
+  std::vector<Connection> connections;
+  for (std::size_t number = 0; number < shares.size(); ++number) {
+    connections.emplace_back(socket, deadline, lives);
   }
   // First, as flows lead to them.
   add_gate_and_groups(connection, wanted.groups, deadline);
-  auto const share = (flows.size() + kConnections - 1) / kConnections;
-  std::vector<std::future<void>> shares;
-  for (std::size_t first = 0; first < flows.size(); first += share) {
-    shares.push_back(std::async(std::launch::async, add_flows, socket,
-                                flows.subspan(first, std::min(share, flows.size() - first)),
-                                deadline, lives));
+  std::vector<std::future<void>> all_added;
+  for (std::size_t number = 0; number < shares.size(); ++number) {
+    all_added.push_back(std::async(std::launch::async, add_flows, std::move(connections[number]),
+                                   flows.first(shares[number]), deadline));
+    flows = flows.subspan(shares[number]);
   }
-  for (auto &done : shares) {
-    done.get();
+  for (auto &added : all_added) {
+    added.get();
   }
-  return wanted.groups.size() + flows.size();
+  return wanted.groups.size() + wanted.flows.size();
 }
 
 }  // namespace simhost::daemon

@@ -139,7 +139,8 @@ TEST(Switch, ThatRefusesWhatItTookBeforeIsNotTrustedInThat) {
 TEST(Switch, ThatSaysNothingIsNotWaitedForForEver) {
   Peer const peer("");
   EXPECT_EQ(words_of<TimedOut>([&] {
-              openflow::Connection const connection(peer.socket(), Deadline::clock::now());
+              openflow::Connection connection(peer.socket(), soon());
+              connection.barrier(Deadline::clock::now());
             }),
             peer.socket().native() + ": no reply in time");
 }

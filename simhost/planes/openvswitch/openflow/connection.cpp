@@ -34,14 +34,12 @@ bool is_flow_update(BytesView message) {
 Connection::Connection(std::filesystem::path const &socket, Deadline deadline,
                        openvswitch::Lives lives)
     : stream_(socket, deadline, std::move(lives)) {
-  greet(deadline);
-}
-
-void Connection::greet(Deadline deadline) {
   Writer out;
   put_hello(out, next_xid());
   send(out);
-  auto const message = wait_for_message(deadline);
+}
+
+void Connection::require_hello(BytesView message) {
   auto const header = header_of(message);
   if (header.type == MessageType::error) {
     throw Refused(error_of(message));
@@ -72,6 +70,10 @@ std::optional<Connection::Message> Connection::take_message() {
   }
   auto const message = left.first(header.length);
   taken_ += header.length;
+  if (!std::exchange(is_greeted_, true)) {
+    require_hello(message);
+    return take_message();
+  }
   return Message(message.begin(), message.end());
 }
 
@@ -326,6 +328,21 @@ std::vector<Item> Connection::ask(Put const &put, Take const &take, Deadline dea
   return ask_each<Item>(
       std::span<Put const>(&put, 1), [](Writer &out, Xid xid, Put const &one) { one(out, xid); },
       take, deadline);
+}
+
+bool Connection::is_bare(Deadline deadline) {
+  Writer out;
+  auto const flows = next_xid();
+  put_flows_request(out, flows, MultipartType::aggregate, {});
+  auto const groups = next_xid();
+  put_groups_request(out, groups, MultipartType::groups, kAllGroups);
+  send(out);
+  std::vector<Aggregate> all_flows;
+  take_items(flows, take_aggregate, all_flows, deadline);
+  std::vector<GroupEntry> all_groups;
+  take_items(groups, take_group, all_groups, deadline);
+  return all_groups.empty() &&
+         std::ranges::all_of(all_flows, [](Aggregate const &one) { return one.flows == 0; });
 }
 
 Contents Connection::follow(AsyncMessages const &wanted, std::span<FlowMonitor const> monitors,

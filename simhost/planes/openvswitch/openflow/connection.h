@@ -30,7 +30,8 @@ using openvswitch::Deadline;
 class Connection {
  public:
   /// `socket` is BRIDGE.mgmt in Open vSwitch's run folder; for `lives` see Stream. Throws
-  /// Disconnected, TimedOut, and Refused by a switch that speaks another version.
+  /// Disconnected and TimedOut. The switch may greet later: whoever takes the first message finds
+  /// out whether it does, and throws Refused by one that speaks another version.
   Connection(std::filesystem::path const &socket, Deadline deadline, openvswitch::Lives lives = {});
 
   /// For poll(2): readable when there is something to receive.
@@ -73,6 +74,8 @@ class Connection {
   /// Returns all that there is.
   Contents follow(AsyncMessages const &wanted, std::span<FlowMonitor const> monitors,
                   Deadline deadline);
+  /// Whether it has neither flows nor groups.
+  bool is_bare(Deadline deadline);
   std::vector<FlowEntry> flows(FlowFilter const &filter, Deadline deadline);
   /// Of one filter after the other.
   std::vector<FlowEntry> flows_of(std::span<FlowFilter const> filters, Deadline deadline);
@@ -94,7 +97,7 @@ class Connection {
   void send(Writer const &out);
   /// Sends what is replied to only if it is refused, and waits until it is done.
   void order(std::function<void(Writer &, std::uint32_t)> const &put, Deadline deadline);
-  void greet(Deadline deadline);
+  static void require_hello(std::span<std::uint8_t const> message);
   /// The next whole message that is received already.
   std::optional<Message> take_message();
   Message wait_for_message(Deadline deadline);
@@ -122,6 +125,7 @@ class Connection {
   openvswitch::Stream stream_;
   std::vector<std::uint8_t> received_;
   std::size_t taken_ = 0;  // of that
+  bool is_greeted_ = false;
   std::deque<Event> events_;
   std::uint32_t xid_ = 0;
   std::uint32_t bundle_ = 0;
