@@ -2,6 +2,7 @@
 #include "planes/openvswitch/compile/vlan_masks.h"
 
 #include <algorithm>
+#include <array>
 
 #include "base/vlan.h"
 
@@ -10,38 +11,28 @@ namespace {
 
 constexpr unsigned kNumbers = 4096;
 
-struct Found {
-  bool any = false;
-  bool all = true;
-};
-
 // Of a set, as far as somebody asks for its members.
 class Masks {
  public:
-  Masks(Vlans const &vlans, unsigned first_asked_for) : vlans_(vlans), first_(first_asked_for) {
+  Masks(Vlans const &vlans, unsigned first_asked_for) : first_(first_asked_for) {
+    for (auto number = first_; number <= kGreatestVlan; ++number) {
+      members_below_[number + 1] = members_below_[number] + (vlans[number] ? 1 : 0);
+    }
     collect(0, kNumbers);
   }
 
   std::vector<VlanMask> found;
 
  private:
-  [[nodiscard]] Found look_at(unsigned first, unsigned count) const {
-    Found found;
-    for (auto number = std::max(first, first_);
-         number < std::min<unsigned>(first + count, kGreatestVlan + 1); ++number) {
-      found.any = found.any || vlans_[number];
-      found.all = found.all && vlans_[number];
-    }
-    return found;
-  }
-
   // `count` is a power of 2.
   void collect(unsigned first, unsigned count) {
-    auto const inside = look_at(first, count);
-    if (!inside.any) {
+    auto const from = std::max(first, first_);
+    auto const to = std::min<unsigned>(first + count, kGreatestVlan + 1);
+    auto const members = members_below_[to] - members_below_[from];
+    if (members == 0) {
       return;
     }
-    if (inside.all) {
+    if (members == to - from) {
       found.push_back({.vlan = static_cast<std::uint16_t>(first),
                        .mask = static_cast<std::uint16_t>(kNumbers - count)});
       return;
@@ -50,8 +41,8 @@ class Masks {
     collect(first + count / 2, count / 2);
   }
 
-  Vlans const &vlans_;
   unsigned const first_;
+  std::array<unsigned, kNumbers> members_below_{};
 };
 
 }  // namespace
