@@ -33,16 +33,20 @@ Bridges::Bridges(events::Loop &loop, std::filesystem::path const &socket, openvs
       memory_(memory),
       told_(std::move(told)),
       database_(socket, "Open_vSwitch", soon(), place_.lives) {
+  bool const is_owner = database_.lock(kLock, soon());
   ovsdb::Selected followed;
   ovsdb::select_configuration(followed);
   openvswitch::select_rows(followed);
-  database_.monitor(followed, soon());
-  take_ownership();
+  database_.begin_monitor(std::move(followed));
+  if (!is_owner) {
+    fail_as_another_owns_it();
+  }
   database_watch_ = loop_.watch(database_.fd(), [this] { read_database_events(); });
 }
 
 openvswitch::PresentRows const &Bridges::present() {
   if (!present_) {
+    database_.end_monitor(soon());
     present_ = openvswitch::present_rows(database_.replica(), told_.host);
   }
   return *present_;
@@ -58,13 +62,11 @@ std::optional<std::string> Bridges::elsewhere(std::string const &device) {
   return found == present().elsewhere.end() ? std::nullopt : std::optional(found->second);
 }
 
-void Bridges::take_ownership() {
-  if (!database_.lock(kLock, soon())) {
-    auto const &owner = present().owner;
-    bool const is_known = !owner.empty() && owner != told_.owner;
-    throw std::runtime_error(
-        fmt::format("{} writes to this Open vSwitch", is_known ? owner : "another one"));
-  }
+void Bridges::fail_as_another_owns_it() {
+  auto const &owner = present().owner;
+  bool const is_known = !owner.empty() && owner != told_.owner;
+  throw std::runtime_error(
+      fmt::format("{} writes to this Open vSwitch", is_known ? owner : "another one"));
 }
 
 // Returns whether there were any.
@@ -81,6 +83,7 @@ bool Bridges::take_database_events() {
 
 void Bridges::read_database_events() {
   try {
+    database_.end_monitor(soon());
     database_.receive();
     if (take_database_events()) {
       forget_rows();

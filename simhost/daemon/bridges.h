@@ -84,7 +84,7 @@ class Bridges {
     bool operator==(RowsMade const &) const = default;
   };
 
-  void take_ownership();
+  [[noreturn]] void fail_as_another_owns_it();
   bool take_database_events();
   void read_database_events();
   openvswitch::PresentRows const &present();

@@ -130,20 +130,28 @@ void Client::wait_for_news(Deadline deadline) {
   }
 }
 
-Json Client::call(std::string const &method, Json params, Deadline deadline) {
+Client::Called Client::begin_call(std::string const &method, Json params) {
   auto const id = ++id_;
   send({{"method", method}, {"params", std::move(params)}, {"id", id}});
+  return {.method = method, .id = id};
+}
+
+Json Client::end_call(Called const &called, Deadline deadline) {
   while (true) {
     auto const message = wait_for_message(deadline);
-    if (is_handled(message) || message.value("id", Json()) != id) {
+    if (is_handled(message) || message.value("id", Json()) != called.id) {
       continue;
     }
     if (is_error(message)) {
-      throw Refused(
-          fmt::format("the database refuses to {}: {}", method, error_text(message["error"])));
+      throw Refused(fmt::format("the database refuses to {}: {}", called.method,
+                                error_text(message["error"])));
     }
     return message.value("result", Json());
   }
+}
+
+Json Client::call(std::string const &method, Json params, Deadline deadline) {
+  return end_call(begin_call(method, std::move(params)), deadline);
 }
 
 Json Client::transact(Json const &operations, Deadline deadline) {
@@ -155,14 +163,26 @@ Json Client::transact(Json const &operations, Deadline deadline) {
 }
 
 void Client::monitor(Selected const &selected, Deadline deadline) {
-  auto const schema = call("get_schema", Json::array({database_}), deadline);
-  replica_ = Replica(selected_schema(schema, selected));
+  begin_monitor(selected);
+  end_monitor(deadline);
+}
+
+void Client::begin_monitor(Selected selected) {
   auto tables = Json::object();
   for (auto const &[table, columns] : selected) {
     tables[table] = Json::array({{{"columns", columns}}});
   }
-  replica_.apply(
-      call("monitor_cond", Json::array({database_, kMonitor, std::move(tables)}), deadline));
+  begun_ = Monitor{
+      .selected = std::move(selected),
+      .schema = begin_call("get_schema", Json::array({database_})),
+      .rows = begin_call("monitor_cond", Json::array({database_, kMonitor, std::move(tables)}))};
+}
+
+void Client::end_monitor(Deadline deadline) {
+  if (auto const begun = std::exchange(begun_, std::nullopt)) {
+    replica_ = Replica(selected_schema(end_call(begun->schema, deadline), begun->selected));
+    replica_.apply(end_call(begun->rows, deadline));
+  }
 }
 
 std::string Client::version(Deadline deadline) {

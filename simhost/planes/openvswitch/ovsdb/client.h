@@ -73,6 +73,9 @@ class Client {
   void receive();
   /// What the database sent by itself, in its order; none when all is told.
   std::optional<Event> next_event();
+  /// Asks for what end_monitor() takes: meanwhile the database finds it, of which there is much.
+  /// Nothing else may be done with the client until then.
+  void begin_monitor(Selected selected);
 
   // These wait. They throw Disconnected, TimedOut, Malformed and Refused.
 
@@ -81,6 +84,8 @@ class Client {
   Json transact(Json const &operations, Deadline deadline);
   /// Fills the replica, and keeps it up to date from now on. Once in a client's life.
   void monitor(Selected const &selected, Deadline deadline);
+  /// Returns when that is so after begin_monitor(), at once if it is already.
+  void end_monitor(Deadline deadline);
   [[nodiscard]] Replica const &replica() const { return replica_; }
   /// Of the database's schema, such as "1.0.0".
   std::string version(Deadline deadline);
@@ -94,7 +99,19 @@ class Client {
   void unlock(std::string const &name, Deadline deadline);
 
  private:
+  struct Called {
+    std::string method;
+    std::int64_t id;
+  };
+  struct Monitor {
+    Selected selected;
+    Called schema;
+    Called rows;
+  };
+
   Json wait_for_message(Deadline deadline);
+  Called begin_call(std::string const &method, Json params);
+  Json end_call(Called const &called, Deadline deadline);
   Json call(std::string const &method, Json params, Deadline deadline);
   void send(Json const &message);
   /// Replies to an echo, keeps an event; returns whether it was such a message.
@@ -105,6 +122,7 @@ class Client {
   Splitter splitter_;
   std::deque<Event> events_;
   Replica replica_;
+  std::optional<Monitor> begun_;
   std::int64_t id_ = 0;
 };
 
