@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 
 #include <algorithm>
+#include <chrono>
 #include <exception>
 #include <stdexcept>
 #include <utility>
@@ -18,11 +19,17 @@ namespace {
 
 using openvswitch::Deadline;
 
+using namespace std::chrono_literals;
+
 constexpr auto *kLock = "simhostd";
 // For as long as a data path is there, Open vSwitch takes it to tell as many tags apart as it did
 // itself when the first bridge of it came, or when it started: of frames with more it would count
 // what becomes of others.
 constexpr std::uint32_t kTellingAll = 2;
+
+ovsdb::Json while_owner() {
+  return {{"op", "assert"}, {"lock", kLock}};
+}
 
 }  // namespace
 
@@ -95,6 +102,16 @@ void Bridges::read_database_events() {
   }
 }
 
+// Open vSwitch is not asked to do that: to find that it has nothing to do takes it long. What was
+// asked of it before may not be done yet, if whoever did so ended.
+void Bridges::sign(Deadline deadline) {
+  database_.transact(ovsdb::Json::array({while_owner(), openvswitch::signature(told_.owner)}),
+                     deadline);
+  ovsdb::wait_for_configuration(database_, ovsdb::wanted_configuration(database_.replica()),
+                                deadline);
+  next_database_events_ = loop_.after(0ms, [this] { read_database_events(); });
+}
+
 std::uint32_t Bridges::most_tags(Wanted const &wanted) {
   if (place_.lives.empty()) {
     // It may start anew when nobody of us is there.
@@ -110,12 +127,18 @@ std::set<std::string> Bridges::apply_rows(std::vector<openvswitch::BridgeRow> co
   if (rows_made_ == made) {
     return {};
   }
-  auto operations = openvswitch::operations(present(), rows, told_.host, told_.owner, most_tags);
+  auto operations = openvswitch::operations(present(), rows, told_.host, most_tags);
   if (operations.empty()) {
+    if (!is_signed()) {
+      sign(deadline);
+    }
     rows_made_ = std::move(made);
     return {};
   }
-  operations.insert(operations.begin(), ovsdb::Json{{"op", "assert"}, {"lock", kLock}});
+  operations.insert(operations.begin(), while_owner());
+  if (!is_signed()) {
+    operations.push_back(openvswitch::signature(told_.owner));
+  }
   auto added = added_devices(present(), rows);
   ovsdb::raise_configuration(operations);
   auto const number = ovsdb::raised_configuration(database_.transact(operations, deadline));

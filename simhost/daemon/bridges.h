@@ -89,6 +89,8 @@ class Bridges {
   void read_database_events();
   openvswitch::PresentRows const &present();
   void forget_rows();
+  [[nodiscard]] bool is_signed() { return present().owner == told_.owner; }
+  void sign(openvswitch::Deadline deadline);
   // How many Open vSwitch is to tell apart.
   std::uint32_t most_tags(Wanted const &wanted);
   // Returns the devices that were put at bridges.
@@ -109,6 +111,7 @@ class Bridges {
   std::optional<openvswitch::PresentRows> present_;
   std::optional<RowsMade> rows_made_;  // of which nothing in those differs
   events::Loop::Watch database_watch_;
+  events::Loop::Timer next_database_events_;
   std::map<storage::SwitchKey, std::unique_ptr<RunningBridge>> bridges_;
 };
 

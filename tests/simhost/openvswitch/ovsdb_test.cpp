@@ -69,10 +69,24 @@ TEST(Ovsdb, MakesABridgeInOneTransactionAndWaitsUntilItIsInForce) {
   auto operations = bridge_operations("made");
   raise_configuration(operations);
   auto const results = client.transact(operations, soon());
-  wait_for_configuration(client, raised_configuration(results), soon());
+  auto const number = raised_configuration(results);
+  wait_for_configuration(client, number, soon());
+  EXPECT_EQ(wanted_configuration(client.replica()), number);
   EXPECT_TRUE(std::filesystem::is_socket(Lab::shared().bridge_socket("made")));
   EXPECT_THAT(Lab::shared().ovs_vsctl({"list-br"}), testing::HasSubstr("made\n"));
   Lab::shared().ovs_vsctl({"del-br", "made"});
+}
+
+TEST(Ovsdb, IsMonitoredWhileSomethingElseIsDone) {
+  Bridge const bridge;
+  auto client = connected();
+  client.begin_monitor({{"Bridge", {"name"}}});
+  EXPECT_TRUE(client.replica().rows("Bridge").empty());
+  client.end_monitor(soon());
+  EXPECT_FALSE(client.replica().rows("Bridge").empty());
+  auto const before = client.replica().rows("Bridge").size();
+  client.end_monitor(soon());
+  EXPECT_EQ(client.replica().rows("Bridge").size(), before);
 }
 
 TEST(Ovsdb, ChangesNothingIfAnOperationIsRefused) {

@@ -15,6 +15,7 @@ using simhost::openvswitch::Json;
 using simhost::openvswitch::operations;
 using simhost::openvswitch::present_rows;
 using simhost::openvswitch::PresentRows;
+using simhost::openvswitch::signature;
 using simhost::ovsdb::Column;
 using simhost::ovsdb::Replica;
 using simhost::ovsdb::Schema;
@@ -103,7 +104,7 @@ BridgeRow vs1() {
 
 std::vector<std::string> told(PresentRows const &present, Rows const &wanted) {
   std::vector<std::string> all;
-  for (auto const &operation : operations(present, wanted, kHost, kOwner, 2)) {
+  for (auto const &operation : operations(present, wanted, kHost, 2)) {
     all.push_back(operation["op"].get<std::string>() + " " + operation["table"].get<std::string>());
   }
   return all;
@@ -123,6 +124,13 @@ TEST(TheRows, ThatAreAsTheyAreWantedAreLeftAlone) {
   EXPECT_THAT(told(present_rows(replica(), kHost), {vs1()}), SizeIs(0));
 }
 
+TEST(TheRows, SayWhoWritesThem) {
+  auto const said = signature("another one");
+  EXPECT_EQ(said["table"], "Open_vSwitch");
+  EXPECT_THAT(said["mutations"].back().dump(),
+              HasSubstr(R"(["external_ids","insert",["map",[["simhostd","another one"]]]])"));
+}
+
 TEST(TheRows, ChangeInPlace) {
   auto const present = present_rows(replica(), kHost);
   auto more = vs1();
@@ -135,7 +143,7 @@ TEST(TheRows, ChangeInPlace) {
   // A device whose number is another is put at the bridge anew.
   auto renumbered = vs1();
   renumbered.devices["c1"] = 9;
-  auto const all = operations(present, Rows{renumbered}, kHost, kOwner, 2);
+  auto const all = operations(present, Rows{renumbered}, kHost, 2);
   EXPECT_EQ(all[0]["row"]["ofport_request"], 9);
   EXPECT_THAT(all[2]["mutations"].dump(),
               HasSubstr(R"(["ports","delete",["set",[["uuid","p1"]]])"));
@@ -174,14 +182,12 @@ TEST(TheRows, OfTunnelsAndTheirUnderlayAreAddedAndThenLeftAlone) {
   BridgeRow const underlay{
       .name = "vu1", .datapath = "netdev", .is_underlay = true, .address = "02:00:00:00:00:01"};
   Rows const wanted{tunnelled, underlay};
-  auto const all = operations(present_rows(replica(), kHost), wanted, kHost, kOwner, 2);
+  auto const all = operations(present_rows(replica(), kHost), wanted, kHost, 2);
   EXPECT_EQ(all[0]["row"], Json::parse(R"json({
     "name": "vt1", "type": "vxlan", "ofport_request": 65216,
     "options": ["map", [["key", "5"], ["remote_ip", "192.0.2.2"]]]})json"));
   EXPECT_EQ(all[5]["row"]["fail_mode"], Json::parse(R"(["set", ["standalone"]])"));
-  EXPECT_EQ(
-      operations(present_rows(replica_with_tunnels(), kHost), wanted, kHost, kOwner, 2).dump(),
-      "[]");
+  EXPECT_EQ(operations(present_rows(replica_with_tunnels(), kHost), wanted, kHost, 2).dump(), "[]");
   // Another key is another tunnel.
   auto other = wanted;
   other[0].tunnels["vt1"].options["key"] = "6";
@@ -268,8 +274,7 @@ TEST(TheRows, OfGroupsAreRead) {
 }
 
 TEST(TheRows, OfAGroupAreOnePortWithItsDevices) {
-  auto const all =
-      operations(present_rows(replica(), kHost), Rows{vs1_with_lag()}, kHost, kOwner, 2);
+  auto const all = operations(present_rows(replica(), kHost), Rows{vs1_with_lag()}, kHost, 2);
   ASSERT_THAT(all, SizeIs(4));
   EXPECT_EQ(all[0]["row"], Json::parse(R"json({
     "name": "u0", "ofport_request": 7, "type": "", "ingress_policing_rate": 0,
@@ -289,7 +294,7 @@ TEST(TheRows, OfADeviceGoWithItIntoAGroupAndOutOfIt) {
                           "mutate Bridge"));
   auto joined = vs1_with_lag();
   joined.lags["vs1-lag1"].devices.insert("c1");
-  auto const all = operations(present_rows(with_lag(), kHost), Rows{joined}, kHost, kOwner, 2);
+  auto const all = operations(present_rows(with_lag(), kHost), Rows{joined}, kHost, 2);
   ASSERT_THAT(all, SizeIs(3));
   EXPECT_EQ(all[1]["table"], "Port") << "that of the group stays, and so do its partners";
   EXPECT_THAT(all[2]["mutations"].dump(),
@@ -303,7 +308,7 @@ TEST(TheRows, OfAGroupChangeInPlace) {
   EXPECT_THAT(told(present, {slow}), ElementsAre("update Port"));
   auto fewer = vs1_with_lag();
   fewer.devices.erase("u0");
-  auto const all = operations(present, Rows{fewer}, kHost, kOwner, 2);
+  auto const all = operations(present, Rows{fewer}, kHost, 2);
   ASSERT_THAT(all, SizeIs(1));
   EXPECT_EQ(all[0]["mutations"].dump(), R"([["interfaces","delete",["set",[["uuid","i3"]]]]])");
   auto none = vs1();

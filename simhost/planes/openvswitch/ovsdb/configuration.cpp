@@ -9,12 +9,13 @@ constexpr char const *kTable = "Open_vSwitch";
 constexpr char const *kWanted = "next_cfg";
 constexpr char const *kInForce = "cur_cfg";
 
-bool is_in_force(Replica const &replica, std::int64_t number) {
-  auto const &rows = replica.rows(kTable);
-  return std::any_of(rows.begin(), rows.end(), [&](auto const &row) {
-    auto const &in_force = row.second.at(kInForce);
-    return in_force.is_number_integer() && in_force >= number;
-  });
+std::int64_t number_in(Replica const &replica, char const *column) {
+  std::int64_t number = 0;
+  for (auto const &[id, row] : replica.rows(kTable)) {
+    auto const &value = row.at(column);
+    number = std::max(number, value.is_number_integer() ? value.get<std::int64_t>() : 0);
+  }
+  return number;
 }
 
 }  // namespace
@@ -43,11 +44,15 @@ std::int64_t raised_configuration(Json const &results) {
 }
 
 void select_configuration(Selected &selected) {
-  selected[kTable].emplace_back(kInForce);
+  selected[kTable].insert(selected[kTable].end(), {kWanted, kInForce});
+}
+
+std::int64_t wanted_configuration(Replica const &replica) {
+  return number_in(replica, kWanted);
 }
 
 void wait_for_configuration(Client &client, std::int64_t number, Deadline deadline) {
-  while (!is_in_force(client.replica(), number)) {
+  while (number_in(client.replica(), kInForce) < number) {
     client.wait_for_news(deadline);
   }
 }

@@ -14,6 +14,8 @@ std::int64_t raised_configuration(Json const &results);
 
 /// The columns that the following needs of the client's replica.
 void select_configuration(Selected &selected);
+/// The number of the last one that anybody asked for, as far as that is known.
+std::int64_t wanted_configuration(Replica const &replica);
 /// Returns when a configuration with this number, or a later one, is in force. Throws what waits
 /// do.
 void wait_for_configuration(Client &client, std::int64_t number, Deadline deadline);

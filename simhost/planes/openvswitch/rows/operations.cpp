@@ -140,13 +140,6 @@ class Writer {
     }
   }
 
-  void sign(std::string const &owner) {
-    std::string const key = kOwner;
-    told_.push_back(mutate("Open_vSwitch", kEverywhere,
-                           Json::array({{"external_ids", "delete", ovsdb::set({key})},
-                                        {"external_ids", "insert", map_of({{key, owner}})}})));
-  }
-
   void allow_tags(std::uint32_t most_tags) {
     std::string const key = kMostTags;
     told_.push_back(mutate(
@@ -275,7 +268,7 @@ bool is_same_bridge(PresentBridge const &present, BridgeRow const &wanted) {
 }  // namespace
 
 Json operations(PresentRows const &present, std::span<BridgeRow const> wanted,
-                std::string_view host, std::string_view owner, std::uint32_t most_tags) {
+                std::string_view host, std::uint32_t most_tags) {
   Writer writer(host);
   if (present.is_new) {
     writer.begin();
@@ -296,13 +289,17 @@ Json operations(PresentRows const &present, std::span<BridgeRow const> wanted,
       writer.remove(bridge);
     }
   }
-  if (present.owner != owner) {
-    writer.sign(std::string(owner));
-  }
   if (present.most_tags != most_tags && !wanted.empty()) {
     writer.allow_tags(most_tags);
   }
   return std::move(writer).told();
+}
+
+Json signature(std::string const &owner) {
+  std::string const key = kOwner;
+  return mutate("Open_vSwitch", kEverywhere,
+                Json::array({{"external_ids", "delete", ovsdb::set({key})},
+                             {"external_ids", "insert", map_of({{key, owner}})}}));
 }
 
 }  // namespace simhost::openvswitch

@@ -83,9 +83,10 @@ void select_rows(ovsdb::Selected &selected);
 /// The bridges are those of `host`. Throws std::runtime_error for rows that do not fit together.
 PresentRows present_rows(ovsdb::Replica const &replica, std::string_view host);
 
-/// Makes the present ones as they are wanted; none for those that are so already. `owner` is who
-/// tells, in words.
+/// Makes the present ones as they are wanted; none for those that are so already.
 Json operations(PresentRows const &present, std::span<BridgeRow const> wanted,
-                std::string_view host, std::string_view owner, std::uint32_t most_tags);
+                std::string_view host, std::uint32_t most_tags);
+/// Says who writes them, in words. Open vSwitch itself does not look at that.
+Json signature(std::string const &owner);
 
 }  // namespace simhost::openvswitch
