@@ -20,7 +20,7 @@ using openflow::Flow;
 using openvswitch::Deadline;
 using openvswitch::Lives;
 
-// So many messages of a connection.
+// It takes so many messages of a connection.
 constexpr std::size_t kInATurn = 50;
 // More than twice as many have no room to wait until they are accepted.
 constexpr std::size_t kMostConnections = 32;
@@ -47,21 +47,17 @@ std::vector<std::size_t> shares_of(std::size_t flows) {
   return shares;
 }
 
+struct Part {
+  Connection connection;
+  std::span<Flow const> flows;
+};
+
 void add_gate_and_groups(Connection &connection, std::span<openflow::Group const> groups,
                          Deadline deadline) {
   Changes changes{openflow::FlowChange{.flow = gate()}};
   for (auto const &group : groups) {
     changes.emplace_back(
         openflow::GroupChange{.command = openflow::GroupCommand::add, .group = group});
-  }
-  connection.change(changes, deadline);
-}
-
-void add_flows(Connection connection, std::span<Flow const> flows, Deadline deadline) {
-  Changes changes;
-  changes.reserve(flows.size());
-  for (auto const &flow : flows) {
-    changes.emplace_back(openflow::FlowChange{.command = openflow::FlowCommand::add, .flow = flow});
   }
   connection.change(changes, deadline);
 }
@@ -82,18 +78,18 @@ std::size_t add_unreached(Connection &connection, std::filesystem::path const &s
   if (flows.size() < kMany || !connection.is_bare(deadline)) {
     return 0;
   }
-  auto const shares = shares_of(flows.size());
-  std::vector<Connection> connections;
-  for (std::size_t number = 0; number < shares.size(); ++number) {
-    connections.emplace_back(socket, deadline, lives);
+  std::vector<Part> parts;
+  for (auto const share : shares_of(flows.size())) {
+    parts.push_back({Connection(socket, deadline, lives), flows.first(share)});
+    flows = flows.subspan(share);
   }
   // First, as flows lead to them.
   add_gate_and_groups(connection, wanted.groups, deadline);
   std::vector<std::future<void>> all_added;
-  for (std::size_t number = 0; number < shares.size(); ++number) {
-    all_added.push_back(std::async(std::launch::async, add_flows, std::move(connections[number]),
-                                   flows.first(shares[number]), deadline));
-    flows = flows.subspan(shares[number]);
+  all_added.reserve(parts.size());
+  for (auto &part : parts) {
+    all_added.push_back(std::async(
+        std::launch::async, [&part, deadline] { part.connection.add(part.flows, deadline); }));
   }
   for (auto &added : all_added) {
     added.get();

@@ -94,7 +94,7 @@ TEST_F(ABridge, SaysSoIfOpenVswitchRefusesAFlow) {
   auto wanted = switch_of(150);
   auto &last = wanted.flows.back();
   last.actions = {openflow::ToGroup{.group = 12345}};
-  EXPECT_THROW(add(wanted), openflow::ChangeRefused);
+  EXPECT_THROW(add(wanted), openflow::HalfMade);
 }
 
 }  // namespace

@@ -288,6 +288,23 @@ void Connection::change(Changes const &changes, Deadline deadline,
   throw ChangeRefused(index, refused, *error);
 }
 
+void Connection::add(std::span<Flow const> flows, Deadline deadline) {
+  Writer out;
+  auto const first = xid_ + 1;
+  for (auto const &flow : flows) {
+    put_added_flow(out, next_xid(), flow);
+  }
+  put_barrier_request(out, next_xid());
+  send(out);
+  if (auto const error = wait_for_outcome(first, xid_, deadline).error) {
+    auto const index = error->xid - first;
+    if (index >= flows.size()) {
+      throw Refused(*error);
+    }
+    throw HalfMade(to_text(FlowChange{.flow = flows[index]}), *error);
+  }
+}
+
 template <typename Item, typename Take>
 void Connection::take_items(Xid xid, Take const &take, std::vector<Item> &items,
                             Deadline deadline) {

@@ -59,28 +59,32 @@ void put_instructions(Writer &out, Actions const &actions) {
   out.put_length(start + 2, start);
 }
 
+void put_flow_mod(Writer &out, Xid xid, FlowCommand command, Flow const &flow,
+                  std::uint64_t cookie_mask) {
+  put_message(out, MessageType::flow_mod, xid, [&] {
+    out.u64(flow.cookie);
+    out.u64(cookie_mask);
+    out.u8(flow.table);
+    out.u8(static_cast<std::uint8_t>(command));
+    out.u16(flow.idle_timeout);
+    out.u16(flow.hard_timeout);
+    out.u16(flow.priority);
+    out.u32(kNoBuffer);
+    out.u32(kAnyPort);
+    out.u32(kAnyGroup);
+    out.u16(flow.tells_removal ? kSendFlowRemoved : 0);
+    out.zeros(2);
+    put_match(out, flow.match);
+    put_instructions(out, flow.actions);
+  });
+}
+
 class ChangePut {
  public:
   ChangePut(Writer &out, Xid xid) : out_(out), xid_(xid) {}
 
   void operator()(FlowChange const &change) const {
-    auto const &flow = change.flow;
-    put_message(out_, MessageType::flow_mod, xid_, [&] {
-      out_.u64(flow.cookie);
-      out_.u64(change.cookie_mask);
-      out_.u8(flow.table);
-      out_.u8(static_cast<std::uint8_t>(change.command));
-      out_.u16(flow.idle_timeout);
-      out_.u16(flow.hard_timeout);
-      out_.u16(flow.priority);
-      out_.u32(kNoBuffer);
-      out_.u32(kAnyPort);
-      out_.u32(kAnyGroup);
-      out_.u16(flow.tells_removal ? kSendFlowRemoved : 0);
-      out_.zeros(2);
-      put_match(out_, flow.match);
-      put_instructions(out_, flow.actions);
-    });
+    put_flow_mod(out_, xid_, change.command, change.flow, change.cookie_mask);
   }
 
   void operator()(GroupChange const &change) const {
@@ -140,6 +144,10 @@ void put_barrier_request(Writer &out, Xid xid) {
 
 void put_change(Writer &out, Xid xid, Change const &change) {
   std::visit(ChangePut(out, xid), change);
+}
+
+void put_added_flow(Writer &out, Xid xid, Flow const &flow) {
+  put_flow_mod(out, xid, FlowCommand::add, flow, 0);
 }
 
 void put_packet_out(Writer &out, Xid xid, PacketOut const &packet) {

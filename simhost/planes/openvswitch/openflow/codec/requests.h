@@ -18,6 +18,7 @@ void put_barrier_request(Writer &out, Xid xid);
 // too long. What is put by then is no message: none of it is to be sent.
 
 void put_change(Writer &out, Xid xid, Change const &change);
+void put_added_flow(Writer &out, Xid xid, Flow const &flow);
 void put_packet_out(Writer &out, Xid xid, PacketOut const &packet);
 
 /// Of a bundle that is ordered and atomic.
