@@ -44,6 +44,12 @@ bool is_gate(openflow::FlowEntry const &entry) {
   return entry.foreign.empty() && entry.flow == gate();
 }
 
+// All that add_unreached() adds, and nothing else, unless somebody replaced some of it since.
+bool has_what_was_added(openflow::Contents const &contents, openvswitch::Compiled const &wanted) {
+  return contents.flow_count == wanted.flows.size() + 1 &&
+         openvswitch::present_of({}, contents.groups).groups == wanted.groups;
+}
+
 // Of all tables but one: what is there is recent for a second, and much.
 std::vector<openflow::FlowMonitor> monitors() {
   using openflow::OwnChanges;
@@ -97,9 +103,11 @@ RunningBridge::RunningBridge(events::Loop &loop, Place const &place, Memory &mem
   meters_.replace(connection_, wanted.flows->flows, deadline);
   added_ahead_ = add_unreached(connection_, socket_of(wanted, place.folder), *wanted.flows,
                                deadline, place.lives);
-  auto contents =
-      connection_.follow({.packet_in = true, .port_status = true, .group_and_meter_changes = true},
-                         monitors(), deadline);
+  // To be told so many flows takes a part of what it takes to add them.
+  bool const are_added = added_ahead_ > 0;
+  auto contents = connection_.follow(
+      {.packet_in = true, .port_status = true, .group_and_meter_changes = true}, monitors(),
+      are_added ? openflow::PresentFlows::untold : openflow::PresentFlows::told, deadline);
   // What counted while nobody was here, before any of it is changed.
   tell_counted(contents.flows, contents.port_statistics);
   for (auto const &port : contents.ports) {
@@ -108,7 +116,15 @@ RunningBridge::RunningBridge(events::Loop &loop, Place const &place, Memory &mem
   if (!wanted.row.lags.empty()) {
     told_.lived();
   }
-  take(std::move(contents));
+  if (are_added && has_what_was_added(contents, *wanted.flows)) {
+    is_closed_ = true;
+    have(wanted.flows);
+  } else {
+    if (are_added) {
+      contents.flows = connection_.flows({}, deadline);
+    }
+    take(std::move(contents));
+  }
   follow_events();
   watch_ = loop.watch(connection_.fd(), [this] { read_events(); });
 }

@@ -342,9 +342,6 @@ TEST(OpenFlow, CountsFrames) {
   auto const flow = connection.flows({}, soon()).at(0);
   EXPECT_EQ(flow.traffic, (Traffic{2, 2 * kFrame}));
   EXPECT_GT(flow.age.count(), 0);
-  auto const all = connection.aggregate({}, soon());
-  EXPECT_EQ(all.flows, 1);
-  EXPECT_EQ(all.traffic, (Traffic{2, 2 * kFrame}));
 
   auto const groups = connection.group_statistics(soon());
   auto const group = std::find_if(groups.begin(), groups.end(),
@@ -513,11 +510,12 @@ TEST(OpenFlow, TellsAllThatThereIsOnceItIsFollowed) {
   Bridge const bridge(2);
   Connection connection(bridge.socket(), soon());
   connection.change(to_add(sample_groups(), {Flow{5}, Flow{6}}), soon());
-  auto const all =
-      connection.follow({.group_and_meter_changes = true}, of_table_5(OwnChanges::told), soon());
+  auto const all = connection.follow({.group_and_meter_changes = true},
+                                     of_table_5(OwnChanges::told), PresentFlows::told, soon());
   ASSERT_EQ(all.monitored.size(), 1);
   EXPECT_EQ(all.monitored[0].flow, Flow{5});
   ASSERT_EQ(all.flows.size(), 2);
+  EXPECT_EQ(all.flow_count, 2);
   EXPECT_EQ(all.groups.size(), sample_groups().size());
   // The bridge has one of its own name.
   EXPECT_EQ(all.ports.size(), 3);
@@ -528,6 +526,43 @@ TEST(OpenFlow, TellsAllThatThereIsOnceItIsFollowed) {
   EXPECT_EQ(std::get<FlowUpdate>(next_event(connection)).event, FlowUpdate::Event::removed);
   other.change({GroupChange{GroupCommand::remove, Group{kAllGroups}}}, soon());
   EXPECT_TRUE(std::holds_alternative<GroupsOrMetersChanged>(next_event(connection)));
+}
+
+TEST(OpenFlow, TellsHowManyFlowsThereAreIfTheyAreNotToBeTold) {
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  connection.change(to_add({}, {Flow{5}, Flow{6}, Flow{7}}), soon());
+  auto const all =
+      connection.follow({}, std::span<FlowMonitor const>(), PresentFlows::untold, soon());
+  EXPECT_EQ(all.flow_count, 3);
+  EXPECT_TRUE(all.flows.empty());
+}
+
+TEST(OpenFlow, TellsWhetherABridgeIsBare) {
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  EXPECT_TRUE(connection.is_bare(soon()));
+  connection.change(to_add({}, {Flow{5}}), soon());
+  EXPECT_FALSE(connection.is_bare(soon()));
+  connection.change({FlowChange{FlowCommand::remove, Flow{5}}}, soon());
+  EXPECT_TRUE(connection.is_bare(soon()));
+  connection.change(to_add(sample_groups(), {}), soon());
+  EXPECT_FALSE(connection.is_bare(soon()));
+}
+
+TEST(OpenFlow, AddsFlowsEachByItself) {
+  Bridge const bridge;
+  Connection connection(bridge.socket(), soon());
+  std::vector<Flow> const flows{Flow{5}, flow_of_table(6, {ToGroup{12345}}), Flow{7}};
+  try {
+    connection.add(flows, soon());
+    FAIL();
+  } catch (HalfMade const &refused) {
+    EXPECT_THAT(refused.what(), testing::HasSubstr("refuses to " + to_text(to_add({}, flows)[1])));
+  }
+  EXPECT_THAT(bridge.flows(), testing::ElementsAre(to_text(flows[0]), to_text(flows[2])));
+  connection.add({flows.begin(), 1}, soon());
+  EXPECT_EQ(bridge.flows().size(), 2);
 }
 
 TEST(OpenFlow, MonitorsFlows) {

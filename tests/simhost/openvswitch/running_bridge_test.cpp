@@ -3,6 +3,8 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
+#include <memory>
 #include <ostream>
 #include <string>
 #include <tuple>
@@ -11,6 +13,8 @@
 #include "events/loop.h"
 #include "lab.h"
 #include "memory_state.h"
+#include "planes/openvswitch/compile/compile.h"
+#include "planes/openvswitch/openflow/text.h"
 #include "spoiling_relay.h"
 
 namespace simhost::daemon {
@@ -75,6 +79,51 @@ TEST_F(ARunningBridge, IsAsBeforeWhenOpenVswitchRefusesOneOfTheChanges) {
       openflow::HalfMade);
   EXPECT_EQ(bridge.flows(), before);
   EXPECT_THAT(forgotten, testing::ElementsAre(3, 2));
+}
+
+struct ALargeBridge : ARunningBridge {
+  static std::vector<Flow> many_flows() {
+    constexpr std::uint64_t kMany = 1500;
+    std::vector<Flow> flows;
+    for (std::uint64_t number = 1; number <= kMany; ++number) {
+      flows.push_back(numbered(number, number));
+    }
+    std::ranges::sort(flows);
+    return flows;
+  }
+
+  std::unique_ptr<RunningBridge> running_as(WantedBridge const &wanted) {
+    return std::make_unique<RunningBridge>(
+        loop, Place{.folder = bridge.socket().parent_path(), .lives = {}}, memory, told, wanted,
+        soon());
+  }
+
+  static std::vector<std::string> texts_of(std::vector<Flow> flows, std::uint64_t generation) {
+    flows.push_back(openvswitch::generation_marker(generation));
+    std::vector<std::string> texts;
+    for (auto const &flow : flows) {
+      texts.push_back(to_text(flow));
+    }
+    std::ranges::sort(texts);
+    return texts;
+  }
+};
+
+TEST_F(ALargeBridge, IsToldEachFlowOnce) {
+  auto const all = wanted(many_flows());
+  auto const large = running_as(all);
+  EXPECT_EQ(large->apply(all, 1, {}, nullptr, soon()), many_flows().size());
+  EXPECT_EQ(bridge.flows(), texts_of(many_flows(), 1));
+  EXPECT_EQ(large->apply(all, 1, {}, nullptr, soon()), 0U);
+}
+
+// Of two at one place Open vSwitch has one, as if somebody had taken a flow away.
+TEST_F(ALargeBridge, IsPutRightIfItHasFewerFlowsThanItWasTold) {
+  auto flows = many_flows();
+  flows.insert(flows.begin(), flows.front());
+  auto const all = wanted(flows);
+  running_as(all)->apply(all, 1, {}, nullptr, soon());
+  EXPECT_EQ(bridge.flows(), texts_of(many_flows(), 1));
 }
 
 struct Asked {

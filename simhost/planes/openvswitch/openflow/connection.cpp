@@ -324,6 +324,16 @@ void Connection::take_items(Xid xid, Take const &take, std::vector<Item> &items,
   }
 }
 
+std::size_t Connection::take_count(Xid xid, Deadline deadline) {
+  std::vector<Aggregate> all;
+  take_items(xid, take_aggregate, all, deadline);
+  std::size_t count = 0;
+  for (auto const &one : all) {
+    count += one.flows;
+  }
+  return count;
+}
+
 template <typename Item, typename Asked, typename Put, typename Take>
 std::vector<Item> Connection::ask_each(std::span<Asked const> all, Put const &put, Take const &take,
                                        Deadline deadline) {
@@ -354,16 +364,14 @@ bool Connection::is_bare(Deadline deadline) {
   auto const groups = next_xid();
   put_groups_request(out, groups, MultipartType::groups, kAllGroups);
   send(out);
-  std::vector<Aggregate> all_flows;
-  take_items(flows, take_aggregate, all_flows, deadline);
+  auto const flow_count = take_count(flows, deadline);
   std::vector<GroupEntry> all_groups;
   take_items(groups, take_group, all_groups, deadline);
-  return all_groups.empty() &&
-         std::ranges::all_of(all_flows, [](Aggregate const &one) { return one.flows == 0; });
+  return flow_count == 0 && all_groups.empty();
 }
 
 Contents Connection::follow(AsyncMessages const &wanted, std::span<FlowMonitor const> monitors,
-                            Deadline deadline) {
+                            PresentFlows present, Deadline deadline) {
   Writer out;
   auto const begin = next_xid();
   put_set_async(out, begin, wanted);
@@ -371,8 +379,9 @@ Contents Connection::follow(AsyncMessages const &wanted, std::span<FlowMonitor c
   for (auto const &monitor : monitors) {
     put_flow_monitor_request(out, next_xid(), monitor);
   }
+  bool const are_told = present == PresentFlows::told;
   auto const flows = next_xid();
-  put_flows_request(out, flows, MultipartType::flows, {});
+  put_flows_request(out, flows, are_told ? MultipartType::flows : MultipartType::aggregate, {});
   auto const groups = next_xid();
   put_groups_request(out, groups, MultipartType::groups, kAllGroups);
   auto const ports = next_xid();
@@ -385,7 +394,12 @@ Contents Connection::follow(AsyncMessages const &wanted, std::span<FlowMonitor c
   for (auto monitor = begin + 1; monitor != flows; ++monitor) {
     take_items(monitor, take_flow_update, all.monitored, deadline);
   }
-  take_items(flows, take_flow, all.flows, deadline);
+  if (are_told) {
+    take_items(flows, take_flow, all.flows, deadline);
+    all.flow_count = all.flows.size();
+  } else {
+    all.flow_count = take_count(flows, deadline);
+  }
   take_items(groups, take_group, all.groups, deadline);
   take_items(ports, take_port_description, all.ports, deadline);
   take_items(statistics, take_port_statistics, all.port_statistics, deadline);
@@ -404,16 +418,6 @@ std::vector<FlowEntry> Connection::flows_of(std::span<FlowFilter const> filters,
         put_flows_request(out, xid, MultipartType::flows, filter);
       },
       take_flow, deadline);
-}
-
-Aggregate Connection::aggregate(FlowFilter const &filter, Deadline deadline) {
-  auto const all = ask<Aggregate>(
-      [&](Writer &out, Xid xid) { put_flows_request(out, xid, MultipartType::aggregate, filter); },
-      take_aggregate, deadline);
-  if (all.size() != 1) {
-    throw Malformed("the reply has no aggregate, or several");
-  }
-  return all.front();
 }
 
 std::vector<PortStatistics> Connection::port_statistics(Port port, Deadline deadline) {

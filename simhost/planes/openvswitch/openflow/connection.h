@@ -73,15 +73,14 @@ class Connection {
   // before it listens to a connection again.
 
   /// From now on it sends these by itself, and each change of flows as monitor_flows() says.
-  /// Returns all that there is.
+  /// Returns all that there is; of the flows only how many, unless they are to be told.
   Contents follow(AsyncMessages const &wanted, std::span<FlowMonitor const> monitors,
-                  Deadline deadline);
+                  PresentFlows present, Deadline deadline);
   /// Whether it has neither flows nor groups.
   bool is_bare(Deadline deadline);
   std::vector<FlowEntry> flows(FlowFilter const &filter, Deadline deadline);
   /// Of one filter after the other.
   std::vector<FlowEntry> flows_of(std::span<FlowFilter const> filters, Deadline deadline);
-  Aggregate aggregate(FlowFilter const &filter, Deadline deadline);
   std::vector<PortStatistics> port_statistics(Port port, Deadline deadline);
   std::vector<PortDescription> ports(Deadline deadline);
   std::vector<GroupEntry> groups(Deadline deadline);
@@ -123,6 +122,8 @@ class Connection {
                              Deadline deadline);
   template <typename Item, typename Take>
   void take_items(std::uint32_t xid, Take const &take, std::vector<Item> &items, Deadline deadline);
+  /// The reply to how many flows there are.
+  std::size_t take_count(std::uint32_t xid, Deadline deadline);
 
   openvswitch::Stream stream_;
   std::vector<std::uint8_t> received_;

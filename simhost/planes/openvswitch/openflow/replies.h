@@ -126,6 +126,7 @@ struct FlowUpdate : ReadFlow {
 struct Contents {
   std::vector<FlowUpdate> monitored;  ///< what monitors begin with
   std::vector<FlowEntry> flows;
+  std::size_t flow_count = 0;  ///< of all, though they may not be told
   std::vector<GroupEntry> groups;
   std::vector<PortDescription> ports;
   std::vector<PortStatistics> port_statistics;
