@@ -323,10 +323,13 @@ void Daemon::sync() {
   if (changed > 0 && is_told) {
     say_(fmt::format("change {} is in force: {} flows and groups changed", all.change, changed));
   }
+  follow_tunnels(all);
+  // What follows from a change is for others than those who wait for it.
+  in_force_ = all.change;
+  reply_to_waiting();
   announcer_.follow(all, memory_, [this](auto key, auto port) {
     return bridges_->is_live(key, port).value_or(false);
   });
-  follow_tunnels(all);
   settle(all);
   try {
     counting_.save_new();
@@ -397,7 +400,6 @@ void Daemon::settle(Wanted const &wanted) {
     }
   }
   age_by(wanted);
-  in_force_ = wanted.change;
   sync_after(wanted.lasts);
   for (auto const &unfit : wanted.unfit) {
     troubles_.add(fmt::format("the switch '{}' cannot be run: {}", unfit.alias, unfit.why));
@@ -405,7 +407,6 @@ void Daemon::settle(Wanted const &wanted) {
   if (!why_nothing_is_kept_.empty()) {
     troubles_.add(why_nothing_is_kept_);
   }
-  reply_to_waiting();
   if (auto const ready = std::exchange(ready_, nullptr)) {
     ready();
   }

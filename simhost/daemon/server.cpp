@@ -79,6 +79,8 @@ void Server::accept_one() {
     }
   });
   clients_.insert(client);
+  // Most have asked by now: what goes on meanwhile is replied to as soon as it is done.
+  serve(client);
 }
 
 void Server::serve(std::shared_ptr<Client> const &client) {
