@@ -62,7 +62,6 @@ class Namespace:
                 f"no network namespace can be made here ({said}): be root, or have the system allow"
                 " namespaces of users"
             )
-        self.run("ip", "link", "set", "lo", "up")
 
     @property
     def pid(self) -> int:
