@@ -21,6 +21,12 @@ def send(client: Client, times: int, to: str, source: str = "", head: str = PLAI
         client.send(frame)
 
 
+def expect_from(client: Client, source: str) -> None:
+    """Of two wires nobody knows at which one Open vSwitch looks first: what another one sends goes
+    there before, with all that is learned of it."""
+    client.expect(lambda frame: frame[6:12].hex(":") == source)
+
+
 def counters(lab: Lab, port: str) -> Dict[str, int]:
     (switch,) = json.loads(lab.ctl("show", "--json"))["switches"]
     (found,) = (one for one in switch["ports"] if one["id"] == port)

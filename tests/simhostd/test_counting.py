@@ -19,6 +19,7 @@ from counted_frames import (
     PLAIN,
     come_to,
     counters,
+    expect_from,
     send,
 )
 from frame_lab import TOOLS, Lab, comes_true, learned_ages
@@ -28,6 +29,7 @@ from lasting_open_vswitch import LastingOpenVSwitch
 def test_frames_count_where_they_come_in_and_go_out(lab: Lab) -> None:
     one, other, _ = (lab.client("lab", port) for port in "abc")
     send(other, 1, BROADCAST)
+    expect_from(one, other.mac)
     send(one, 5, other.mac)
     send(one, 3, BROADCAST)
     send(one, 2, MULTICAST)
@@ -306,6 +308,7 @@ def test_an_address_that_moves_counts_where_it_comes_to(lab: Lab) -> None:
     one, other = lab.client("lab", "a"), lab.client("lab", "b")
     moving = "02:00:00:00:77:01"
     send(one, 1, BROADCAST, source=moving)
+    expect_from(other, moving)
     send(other, 1, BROADCAST, source=moving)
     come_to(lambda: counters(lab, "b").get("numMACsMoved"), 1)
     assert "numMACsMoved" not in counters(lab, "a")
