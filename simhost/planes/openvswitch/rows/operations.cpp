@@ -166,6 +166,7 @@ class Writer {
       }
     }
     std::vector<Json> gone;
+    gone.reserve(there.size());
     for (auto const &[name, port] : there) {
       gone.push_back(ovsdb::uuid(present.ports.at(name)));
     }
