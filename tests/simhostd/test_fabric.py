@@ -280,7 +280,8 @@ def test_what_a_host_cannot_bear_is_told(lab: FabricLab, two: Tuple[Host, Host])
     lab.databases.set("Switch", "max_ports", 1)
     lab.databases.set("Port", "vlan", 12, id="b")
     assert comes_true(lambda: of_port(one, "b")["vlan"] == of_port(other, "b")["vlan"] == 12)
-    passed = {"lab": "Limit exceeded (QEX_LIMIT_EXCEEDED)"}
+    why = "max_ports: 1 is below the 2 ports that there are (QEX_LIMIT_EXCEEDED)"
+    passed = {"lab": why}
     assert comes_true(lambda: told() == [passed, passed]), told()
     assert one.setting("lab", "max_ports") == other.setting("lab", "max_ports") == 200
     assert one.call("VSDVS_RemoveDVPort", "lab", "b") == QEX_OK

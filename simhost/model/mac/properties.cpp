@@ -1,6 +1,8 @@
 // The rules of MAC learning and of filters.
 #include "model/mac/properties.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <span>
 
@@ -23,7 +25,8 @@ void check_management(VSPMACManagement const &management) {
     throw Refused(QEX_BAD_PARAM);
   }
   if (management.portMACLearning.macLimit > VSPORT_MAC_LEARNING_LIMIT_ENTRIES_MAX) {
-    throw Refused(QEX_LIMIT_EXCEEDED);
+    throw Refused(QEX_LIMIT_EXCEEDED, fmt::format("a port learns at most {} addresses",
+                                                  VSPORT_MAC_LEARNING_LIMIT_ENTRIES_MAX));
   }
 }
 
@@ -32,7 +35,8 @@ void check_filter(VSExtraEthFilter const &filter) {
     throw Refused(QEX_BAD_PARAM);
   }
   if (filter.numMulticastAddrs > VSWITCH_ETH_MAX_EXACT_MULTICAST_ADDRS) {
-    throw Refused(QEX_LIMIT_EXCEEDED);
+    throw Refused(QEX_LIMIT_EXCEEDED, fmt::format("a filter has at most {} multicast addresses",
+                                                  VSWITCH_ETH_MAX_EXACT_MULTICAST_ADDRS));
   }
   auto const addresses = std::span(filter.multicastAddrs).first(filter.numMulticastAddrs);
   if (!std::all_of(addresses.begin(), addresses.end(),

@@ -1,6 +1,8 @@
 // Taking tables apart and putting them together: each session with its entities in one run.
 #include "model/mirror/properties.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <set>
 #include <span>
@@ -76,7 +78,9 @@ void check_header(DVMirrorSessionTable const &header) {
     refuse(QEX_BAD_PARAM);
   }
   if (header.numSessions > kMostSessions || header.numEntities > kMostEntities) {
-    refuse(QEX_LIMIT_EXCEEDED);
+    throw Refused(QEX_LIMIT_EXCEEDED,
+                  fmt::format("there are at most {} mirror sessions, and {} entities of theirs",
+                              kMostSessions, kMostEntities));
   }
 }
 

@@ -144,8 +144,10 @@ storage::Port add_client_port(storage::ChangingTransaction &transaction,
                               storage::SwitchKey switch_key, std::string_view identifier) {
   auto port = added_port(transaction, switch_key, identifier, storage::PortKind::client);
   auto const count = storage::count_ports(transaction, switch_key, storage::PortKind::client);
-  if (count > storage::get_switch_row(transaction, switch_key).row.max_ports) {
-    throw Refused(QEX_LIMIT_EXCEEDED);
+  auto const most = storage::get_switch_row(transaction, switch_key).row.max_ports;
+  if (count > most) {
+    throw Refused(QEX_LIMIT_EXCEEDED,
+                  fmt::format("the switch has the {} ports that max_ports allows", most));
   }
   return port;
 }

@@ -1,6 +1,8 @@
 // Switches over the store: bounds, defaults, and what the host chooses by itself.
 #include "model/switches/switches.h"
 
+#include <fmt/format.h>
+
 #include <algorithm>
 #include <array>
 #include <cstdio>
@@ -136,8 +138,11 @@ void change_max_ports(storage::ChangingTransaction &transaction, storage::Switch
   if (max_ports == 0 || max_ports > storage::kGreatestMaxPorts) {
     throw Refused(QEX_BAD_PARAM);
   }
-  if (max_ports < storage::count_ports(transaction, key, storage::PortKind::client)) {
-    throw Refused(QEX_LIMIT_EXCEEDED);
+  auto const count = storage::count_ports(transaction, key, storage::PortKind::client);
+  if (max_ports < count) {
+    throw Refused(
+        QEX_LIMIT_EXCEEDED,
+        fmt::format("max_ports: {} is below the {} ports that there are", max_ports, count));
   }
   storage::set_max_ports(transaction, key, max_ports);
 }

@@ -1,6 +1,8 @@
 // The rules of teaming policies.
 #include "model/teaming/properties.h"
 
+#include <fmt/format.h>
+
 #include <set>
 #include <span>
 #include <string_view>
@@ -15,7 +17,8 @@ void check_policy(VSTeamPolicy const &policy) {
   }
   auto const count = qex_uint64{policy.numActive} + policy.numStandby;
   if (count > QEX_TEAM_MAX_UPLINKS) {
-    throw Refused(QEX_LIMIT_EXCEEDED);
+    throw Refused(QEX_LIMIT_EXCEEDED,
+                  fmt::format("a team has at most {} uplinks", QEX_TEAM_MAX_UPLINKS));
   }
   std::set<std::string_view> names;
   for (auto const &field : std::span(policy.uplinkPortName).first(count)) {
