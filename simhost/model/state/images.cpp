@@ -189,12 +189,14 @@ void clear_state(storage::ChangingTransaction &transaction) {
 
 void sanitize_state(storage::ChangingTransaction &transaction) {
   for (auto const &[key, row] : storage::all_switches(transaction)) {
-    if (!row.associated && !row.persistent && !storage::is_shared(transaction, row.identifier)) {
+    bool const is_shared = storage::is_shared(transaction, row.identifier);
+    if (!row.associated && !row.persistent && !is_shared) {
       storage::remove_switch(transaction, key);
       continue;
     }
     for (auto const &port : storage::ports_of(transaction, key)) {
-      if (type_of(transaction, port) == DVSPORT_TYPE_ZOMBIE) {
+      bool const is_own = !is_shared || port.kind == storage::PortKind::uplink;
+      if (is_own && type_of(transaction, port) == DVSPORT_TYPE_ZOMBIE) {
         storage::remove_port(transaction, port.number);
       }
     }

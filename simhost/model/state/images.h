@@ -22,7 +22,7 @@ SIMHOST_API void load_state(storage::ChangingTransaction &transaction, BytesView
 /// Removes all switches that are not shared with other hosts; their uplinks become free.
 SIMHOST_API void clear_state(storage::ChangingTransaction &transaction);
 /// Removes the ports of type DVSPORT_TYPE_ZOMBIE, and the switches that neither run on this host
-/// nor are persistent nor shared with other hosts.
+/// nor are persistent; not what is shared with other hosts.
 SIMHOST_API void sanitize_state(storage::ChangingTransaction &transaction);
 
 /// The properties of a port, for a switch of that version; refuses version 0 (QEX_BAD_PARAM).

@@ -10,7 +10,9 @@
 #include "fabric/shared/settings.h"
 #include "memory_state.h"
 #include "model/ports/ports.h"
+#include "model/ports/properties.h"
 #include "model/properties/properties.h"
+#include "model/state/images.h"
 #include "model/switches/switches.h"
 #include "scenario/scenario.h"
 #include "scenario/settings.h"
@@ -105,6 +107,22 @@ TEST_F(WhatChanges, IsNothingOfWhatIsTheHostsOwn) {
                  storage::PropertyType::runtime);
   });
   EXPECT_EQ(changes, Json::array());
+}
+
+TEST_F(WhatChanges, IsNoPortThatOnlyThisHostHasNoUseFor) {
+  auto const changes = changes_by([](ChangingTransaction &transaction) {
+    add_vacant_uplink_port(transaction, found_in(transaction)->key, "up");
+    for (auto const *const name : {"a", "up"}) {
+      auto const port = *port_in(transaction, name);
+      set(transaction, ports::type, PropertyOwner::port(port.switch_key, port.number),
+          DVSPORT_TYPE_ZOMBIE);
+    }
+    sanitize_state(transaction);
+  });
+  EXPECT_EQ(changes, Json::array());
+  ChangingTransaction transaction(store);
+  EXPECT_TRUE(port_in(transaction, "a"));
+  EXPECT_FALSE(port_in(transaction, "up")) << "it is the host's own";
 }
 
 TEST_F(WhatChanges, IsSeenWhoeverHasCommittedIt) {
