@@ -127,15 +127,6 @@ void serve(Words const &words) {
                 say);
   daemon.when_ready([&] { tell_ready(words); });
   std::optional<fabric::Agent> agent;
-  if (!words.fabric.empty()) {
-    agent.emplace(fabric::Options{.state = std::filesystem::absolute(words.state),
-                                  .servers = servers_of(words),
-                                  .host = words.host},
-                  say, [] { kill(getpid(), SIGTERM); });
-    daemon.when_settled([&](std::uint64_t change, std::string const &troubles) {
-      agent->tell({.change = change, .troubles = troubles});
-    });
-  }
   // Ends before the daemon does.
   std::optional<PrivateOpenVswitch> own;
   if (own_folder) {
@@ -146,6 +137,16 @@ void serve(Words const &words) {
   }
   // Not before all is there that it takes: what changes waits then until a daemon is there.
   daemon.begin();
+  // Whoever asks it has the state, and may wait for longer than the daemon does to begin.
+  if (!words.fabric.empty()) {
+    agent.emplace(fabric::Options{.state = std::filesystem::absolute(words.state),
+                                  .servers = servers_of(words),
+                                  .host = words.host},
+                  say, [] { kill(getpid(), SIGTERM); });
+    daemon.when_settled([&](std::uint64_t change, std::string const &troubles) {
+      agent->tell({.change = change, .troubles = troubles});
+    });
+  }
   if (own) {
     own->start();
   } else {
