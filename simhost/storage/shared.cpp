@@ -95,6 +95,13 @@ std::vector<SharedName> touched(Transaction &transaction) {
       });
 }
 
+void touch(ChangingTransaction &transaction, SharedName const &name) {
+  Change(transaction, "INSERT OR IGNORE INTO touched (switch, port) VALUES (?, ?)")
+      .with(std::string_view(name.switch_identifier))
+      .with(std::string_view(name.port))
+      .run();
+}
+
 void touch(ChangingTransaction &transaction, std::string_view switch_identifier) {
   Change(transaction,
          "INSERT OR IGNORE INTO touched SELECT switch, port FROM shared WHERE switch = ?")

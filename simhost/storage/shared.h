@@ -54,7 +54,9 @@ bool is_shared(Transaction &transaction, std::string_view switch_identifier);
 /// Those that may have become other since they were put or removed, whoever did it, each switch
 /// before its ports: all of a switch that is gone, and ports that were never put.
 std::vector<SharedName> touched(Transaction &transaction);
-/// All of a switch may have become other.
+/// One may have become other.
+void touch(ChangingTransaction &transaction, SharedName const &name);
+/// All of a switch may.
 void touch(ChangingTransaction &transaction, std::string_view switch_identifier);
 /// None of them has.
 void forget_touched(ChangingTransaction &transaction);

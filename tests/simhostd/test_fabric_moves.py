@@ -97,6 +97,24 @@ def test_a_port_is_where_it_was_connected_last(lab: FabricLab) -> None:
     assert lab.databases.rows("Port", id="a")[0]["host"] == ""
 
 
+def test_a_port_that_its_host_knows_not_to_be_connected_is_nowhere(lab: FabricLab) -> None:
+    one, other = started(lab.host("one", TWO_PORTS)), started(lab.host("two"))
+    one.ctl("share", "lab")
+    other.ctl("join", "lab")
+    kept(one, "before")
+    one.client("lab", "a")
+    other.client("lab", "b")
+    one.stop()
+    restored(one, "before")
+    started(one)
+    assert comes_true(lambda: lab.databases.rows("Port", id="a")[0]["host"] == "")
+    assert lab.databases.rows("Port", id="b")[0]["host"] == "two"
+    assert device_of(one, "a") is None and device_of(other, "b") is not None
+    # It may be connected again like any other.
+    connect(other)
+    assert lab.databases.rows("Port", id="a")[0]["host"] == "two"
+
+
 def counted(frames: int) -> Dict[str, int]:
     return {"pktsInBroadcast": frames, "bytesInBroadcast": frames * LENGTH}
 

@@ -199,6 +199,7 @@ void Member::sync() {
     pause_ = {};
     state_pause_ = {};
     tell_of_state({});
+    let_go();
   } catch (Json::exception const &error) {
     lose(fmt::format("its rows are none of this version: {}", error.what()));
   } catch (storage::StateFailure const &failure) {
@@ -244,7 +245,8 @@ bool Member::follow_touched() {
       if (is_other) {
         storage::put_membership(transaction, membership_);
       }
-      is_other = follow(transaction, membership_, news, unborne_) || is_other;
+      auto const followed = follow(transaction, membership_, news, unborne_);
+      is_other = followed.is_other || is_other;
       if (is_other) {
         storage::advance_frames_change(transaction);
         change_ = storage::frames_change(transaction).value_or(0);
@@ -253,6 +255,7 @@ bool Member::follow_touched() {
         transaction.commit();
       }
       touched_.clear();
+      is_left_ = is_left_ || followed.is_left;
       return true;
     } catch (Unborne const &why) {
       unborne_[why.name()] = why.what();
@@ -288,6 +291,34 @@ void Member::tell_joined() {
                                             : Json{{"refused", unborne->second}});
     }
     joining_.erase(first, end);
+  }
+}
+
+// Of ports that only others believe to be connected here.
+void Member::let_go() {
+  if (!std::exchange(is_left_, false)) {
+    return;
+  }
+  try {
+    storage::Patience none(0ns);
+    storage::ChangingTransaction transaction(store_, none);
+    auto const changes = changes_of(transaction, membership_);
+    agree(transaction, changes);
+    storage::forget_touched(transaction);
+    transaction.flush();
+    if (changes.empty() ||
+        decided(proposed(random_name(), operations_for(changes)), kPatience).verdict ==
+            Verdict::made) {
+      transaction.commit();
+    }
+  } catch (storage::StateFailure const &failure) {
+    if (failure.kind() != storage::FailureKind::busy) {
+      throw;
+    }
+    is_left_ = true;
+    sync_soon(kLongestWait);
+  } catch (Refused const &) {
+    // It touches what this host cannot bear, which is tried again with the next change.
   }
 }
 
@@ -433,12 +464,12 @@ daemon::Questions Member::questions() {
   };
 }
 
-Decision Member::decided(Proposal const &proposal) {
+Decision Member::decided(Proposal const &proposal, std::chrono::milliseconds longest) {
   if (!claim_.speaks() && (!lost_ || events::Clock::now() - *lost_ > kElection)) {
     return {.verdict = Verdict::refused, .why = "the fabric cannot be used: " + trouble_};
   }
   auto const connections = cluster_.connections();
-  auto decision = decide(cluster_, proposal, from_now(kLongestDecision));
+  auto decision = decide(cluster_, proposal, from_now(longest));
   if (decision.verdict == Verdict::unknown) {
     undecided_.push_back(proposal);
   }
@@ -456,20 +487,14 @@ Decision Member::decided(Proposal const &proposal) {
 
 void Member::commit(Json const &question, Reply const &reply) {
   auto const changes = question.at("rows").get<std::vector<Change>>();
-  RowNames ports;
-  if (cluster_.is_connected()) {
-    writers_ = writers_in(cluster_.replica());
-    ports = port_rows_.of(cluster_.replica(), changes);
-  }
-  auto const proposal =
-      proposed(question.at("change").get<std::string>(), operations_of(changes, ports, writers_));
-  auto const decision = decided(proposal);
+  auto const proposal = proposed(question.at("change").get<std::string>(), operations_for(changes));
+  auto const decision = decided(proposal, kLongestDecision);
   reply(decision.verdict == Verdict::made ? Json{{"made", proposal.id}} : told(proposal, decision));
 }
 
 void Member::join(std::string const &alias, Reply const &reply) {
   auto const proposal = proposed(random_name(), fabric::join(alias, options_.host));
-  auto const decision = decided(proposal);
+  auto const decision = decided(proposal, kLongestDecision);
   if (decision.verdict == Verdict::made) {
     joining_.emplace(alias, reply);
   } else if (cluster_.is_connected() && !has_switch(cluster_.replica(), alias)) {
@@ -477,6 +502,15 @@ void Member::join(std::string const &alias, Reply const &reply) {
   } else {
     reply(told(proposal, decision));
   }
+}
+
+Json Member::operations_for(std::vector<Change> const &changes) {
+  RowNames ports;
+  if (cluster_.is_connected()) {
+    writers_ = writers_in(cluster_.replica());
+    ports = port_rows_.of(cluster_.replica(), changes);
+  }
+  return operations_of(changes, ports, writers_);
 }
 
 // With a change id, so that it is made once, whatever a server tries again.

@@ -2,6 +2,7 @@
 // of it here is decided there.
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <map>
@@ -61,6 +62,7 @@ class Member {
   bool follow_touched();
   void tell_of_state(std::string const &why);
   void tell_joined();
+  void let_go();
   void reply_to_drills();
 
   void report_soon();
@@ -72,7 +74,8 @@ class Member {
 
   [[nodiscard]] daemon::Questions questions();
   [[nodiscard]] Proposal proposed(std::string const &id, Json const &operations) const;
-  Decision decided(Proposal const &proposal);
+  Json operations_for(std::vector<Change> const &changes);
+  Decision decided(Proposal const &proposal, std::chrono::milliseconds longest);
   void commit(Json const &question, Reply const &reply);
   void join(std::string const &alias, Reply const &reply);
   [[nodiscard]] Json status() const;
@@ -91,6 +94,7 @@ class Member {
   Touched touched_;
   PortRows port_rows_;
   std::map<SharedName, std::string> unborne_;
+  bool is_left_ = false;                       // of what follow() found
   std::multimap<std::string, Reply> joining_;  // by the alias of the switch
   Writers writers_;                            // as they were seen last
   std::int64_t revision_ = 0;                  // that is in the state

@@ -33,7 +33,7 @@ class Following {
     }
   }
 
-  bool run() {
+  Followed run() {
     for (auto const &[name, row] : known_) {
       if (!records_.contains(name) && !row.fabric.empty()) {
         remove(name);
@@ -48,7 +48,7 @@ class Following {
         apply(name, record);
       }
     }
-    return changed_;
+    return followed_;
   }
 
  private:
@@ -79,7 +79,7 @@ class Following {
   }
 
   void remove(SharedName const &name) {
-    changed_ = true;
+    followed_.is_other = true;
     if (name.port.empty()) {
       if (auto const found = find_switch(name)) {
         destroy_switch(transaction_, found->key);
@@ -94,7 +94,7 @@ class Following {
   }
 
   void apply(SharedName const &name, Json const &record) {
-    changed_ = true;
+    followed_.is_other = true;
     if (!unborne_.contains(name)) {
       try {
         name.port.empty() ? apply_switch(name, record) : apply_port(name, record);
@@ -114,14 +114,25 @@ class Following {
                .fabric = record.dump(),
                .image = std::nullopt,
                .fits = !unborne_.contains(name)};
+    bool is_left = false;
     if (name.port.empty()) {
       if (auto const found = find_switch(name)) {
         row.image = image_of(transaction_, *found);
       }
     } else if (auto const port = find_port(name)) {
       row.image = image_of(transaction_, *port);
+      bool const is_told_here = row.fits && record.at("host") == membership_.host;
+      is_left = is_told_here && !storage::device_of(transaction_, port->number);
+    }
+    if (is_left) {
+      // No port has such an image.
+      row.image = Bytes();
     }
     storage::put_shared(transaction_, row);
+    if (is_left) {
+      storage::touch(transaction_, name);
+      followed_.is_left = true;
+    }
   }
 
   void apply_switch(SharedName const &name, Json const &record) {
@@ -171,13 +182,13 @@ class Following {
   Records const &records_;
   std::map<SharedName, std::string> const &unborne_;
   std::map<SharedName, Shared> known_;
-  bool changed_ = false;
+  Followed followed_;
 };
 
 }  // namespace
 
-bool follow(storage::ChangingTransaction &transaction, Membership const &membership,
-            News const &news, std::map<SharedName, std::string> const &unborne) {
+Followed follow(storage::ChangingTransaction &transaction, Membership const &membership,
+                News const &news, std::map<SharedName, std::string> const &unborne) {
   return Following(transaction, membership, news, unborne).run();
 }
 

@@ -59,10 +59,16 @@ struct News {
   std::map<SharedName, CountsOfHosts> counts;
 };
 
+struct Followed {
+  bool is_other = false;  ///< whether anything became other
+  /// Whether the fabric has ports connected here that are not, as in a state that was restored: by
+  /// changes_of they are connected nowhere.
+  bool is_left = false;
+};
+
 /// Makes what is shared here what the fabric says, but for the rows that are known to be unborne.
-/// Returns whether anything became other; throws Unborne, and the transaction must not be committed
-/// then.
-bool follow(storage::ChangingTransaction &transaction, Membership const &membership,
-            News const &news, std::map<SharedName, std::string> const &unborne);
+/// Throws Unborne, and the transaction must not be committed then.
+Followed follow(storage::ChangingTransaction &transaction, Membership const &membership,
+                News const &news, std::map<SharedName, std::string> const &unborne);
 
 }  // namespace simhost::fabric

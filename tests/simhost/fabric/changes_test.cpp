@@ -125,6 +125,24 @@ TEST_F(WhatChanges, IsNoPortThatOnlyThisHostHasNoUseFor) {
   EXPECT_FALSE(port_in(transaction, "up")) << "it is the host's own";
 }
 
+TEST_F(WhatChanges, IsAPortThatOnlyOthersBelieveToBeConnectedHere) {
+  auto const record_at = [](char const *host) {
+    return Json{{"host", host}, {"settings", Json::object()}};
+  };
+  for (auto const *const host : {"there", "here"}) {
+    ChangingTransaction transaction(store);
+    News const news{
+        .names = {{port_name("a")}}, .records = {{port_name("a"), record_at(host)}}, .counts = {}};
+    bool const is_here = host == membership.host;
+    EXPECT_EQ(follow(transaction, membership, news, {}).is_left, is_here);
+    auto const expected =
+        is_here ? Json::array({Change{port_name("a"), record_at(host), record_at("")}})
+                : Json::array();
+    EXPECT_EQ(in_json(settle(transaction)), expected);
+  }
+  EXPECT_EQ(changes_by([](ChangingTransaction &) {}), Json::array());
+}
+
 TEST_F(WhatChanges, IsSeenWhoeverHasCommittedIt) {
   {
     ChangingTransaction transaction(store);
