@@ -4,16 +4,18 @@ database, and a wire from each host to it."""
 import json
 import shutil
 import signal
+import sqlite3
 import subprocess
 import sys
 import uuid
-from contextlib import ExitStack
+from contextlib import ExitStack, closing
 from pathlib import Path
 from typing import Any, Dict, List, Mapping, Optional
 
 from simhost._namespaces import PATIENCE, Namespace, own_user_needed
 
 from certificates import Authority, Certificate
+from fabric_history import Transaction, history
 from frame_lab import Lab, comes_true
 from relays import Relay
 
@@ -175,6 +177,13 @@ class Databases:
             {**old, "mutations": [["settings", "insert", entries]]},
         )
 
+    def history(self) -> List[Transaction]:
+        """All changes so far."""
+        (fabric,) = self.rows("Fabric")
+        made = history(Path(self._file(min(self._running))))
+        # A leader may have begun what is yet to be decided.
+        return [one for one in made if one.revision <= fabric["revision"]]
+
     def close(self) -> None:
         for server in list(self._running):
             self.kill(server)
@@ -304,21 +313,36 @@ def started(host: Host) -> Host:
     return host
 
 
+def relay_of(host: Host) -> Relay:
+    assert host.relay is not None
+    return host.relay
+
+
+def revision(lab: FabricLab) -> int:
+    (row,) = lab.databases.rows("Fabric")
+    return int(row["revision"])
+
+
 def are_reported(lab: FabricLab) -> bool:
     """Whether all hosts have told that the last change is in force."""
-    (fabric,) = lab.databases.rows("Fabric")
-    return all(row["in_force"] == fabric["revision"] for row in lab.databases.rows("Host"))
+    now = revision(lab)
+    return all(row["in_force"] == now for row in lab.databases.rows("Host"))
 
 
 def restored(host: Host, name: str) -> None:
     """Puts a copy of the state that was kept under a name in its place."""
+    assert host.daemon is None
+    for beside in ("-wal", "-shm"):
+        # Of another state, if it was left by who was killed.
+        Path(f"{host.state}{beside}").unlink(missing_ok=True)
     shutil.copy(host.folder / name, host.state)
 
 
 def kept(host: Host, name: str) -> None:
-    """Keeps a copy of the state, while nobody uses it."""
-    assert host.daemon is None
-    shutil.copy(host.state, host.folder / name)
+    """Keeps a copy of the state, whoever uses it."""
+    with closing(sqlite3.connect(host.state)) as state:
+        with closing(sqlite3.connect(host.folder / name)) as copy:
+            state.backup(copy)
 
 
 def killed(host: Host) -> None:

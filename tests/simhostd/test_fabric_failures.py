@@ -7,12 +7,21 @@ from typing import Any, Iterator, Tuple
 import pytest
 from _libvswitch import QEX_BUSY, QEX_OK, QEX_TIMEOUT
 
-import fabric_by_chance
-from fabric_by_chance import relay_of, revision
-from fabric_lab import FabricLab, Host, are_reported, in_background, is_locked, started
+from counted_frames import BROADCAST
+from fabric_lab import (
+    FabricLab,
+    Host,
+    are_reported,
+    in_background,
+    is_locked,
+    relay_of,
+    revision,
+    started,
+)
 from frame_lab import comes_true
 from going_frames import GoingFrames
 from relays import FROM_HOST, TO_HOST
+from simhost import frame
 
 LAB = {"switches": [{"alias": "lab", "ports": [{"id": "a"}]}]}
 
@@ -37,8 +46,9 @@ def mtu(host: Host) -> Any:
 
 def test_a_majority_decides(lab: FabricLab, two: Tuple[Host, Host]) -> None:
     one, other = two
-    one.set_port("lab", "b")
-    near, far = one.client("lab", "a"), one.client("lab", "b")
+    more = [{"id": "b"}, {"id": "c"}, {"id": "d", "vlan": 9}]
+    one.apply({"switches": [{"alias": "lab", "ports": more}]})
+    near, far, beside, apart = (one.client("lab", port) for port in "abcd")
     assert near.comes_to_reach(far)
     with GoingFrames(near, far):
         lab.databases.kill(lab.databases.leader())
@@ -51,6 +61,9 @@ def test_a_majority_decides(lab: FabricLab, two: Tuple[Host, Host]) -> None:
         assert other.call("VSDVS_SetMTU", "lab", 1700) == QEX_BUSY
         assert other.call("VSDVS_CreateVSwitch", "own", "", "", 0, 1, 0, 1700, 0) == QEX_OK
         assert mtu(other) == 1600
+        near.send(frame(BROADCAST, near.mac, payload=b"to one VLAN"))
+        beside.expect(lambda came: b"to one VLAN" in came)
+        apart.expect_none(lambda came: b"to one VLAN" in came)
         lab.databases.start(last)
         assert comes_true(lambda: other.call("VSDVS_SetMTU", "lab", 1800) == QEX_OK)
         assert comes_true(lambda: mtu(one) == 1800)
@@ -142,19 +155,3 @@ def test_what_a_server_makes_twice_is_made_once(lab: FabricLab) -> None:
         # An election may have come in between, but no refusal was believed.
         for refusal in ("refuses to wait", "constraint violation", "another simhostd"):
             assert refusal not in host.log(), host.log()
-
-
-def test_whatever_fails_all_hosts_end_alike() -> None:
-    calls, wrong = fabric_by_chance.run(7, steps=15, hosts=2)
-    assert wrong == []
-    assert calls >= 15
-
-
-def test_a_lost_port_and_one_that_was_refused_are_found() -> None:
-    calls = fabric_by_chance.Calls()
-    calls.made, calls.refused, calls.unknown = {"a", "b"}, {"c": "QEX_BUSY", "d": ""}, {"e"}
-    assert calls.wrong({"a", "b", "e"}) == []
-    assert calls.wrong({"a", "c"}) == [
-        "the port b was added, and is lost",
-        "the port c is there, and was refused: QEX_BUSY",
-    ]
