@@ -1,15 +1,17 @@
 """The commands of an operator that are a short document each, and those that a fabric has not."""
 
 import itertools
+import json
 import re
 import select
 import signal
+import subprocess
 from pathlib import Path
 from typing import Iterator
 
 import pytest
 
-from fabric_lab import FabricLab
+from fabric_lab import SCHEMA, FabricLab
 from frame_lab import comes_true
 from operating import Operator, of_lab, populate
 from vswitch import _table
@@ -138,18 +140,20 @@ def test_a_backup_is_a_document_that_has_it_back(operator: Operator) -> None:
     assert "alias: lab" in operator.told("backup")
 
 
+_MTUS = itertools.count(1600)
+
+
+def is_told_of_a_change(watch: "subprocess.Popen[str]", operator: Operator) -> bool:
+    """What is set before it watches it does not tell."""
+    operator.told("set", "lab", f"mtu={next(_MTUS)}")
+    return bool(select.select([watch.stdout], [], [], 0.2)[0])
+
+
 def test_what_changes_is_told_until_somebody_interrupts(operator: Operator) -> None:
     watch = operator.start("watch", "--kind", "setting")
     assert watch.stdout is not None
-    changes = itertools.count(1600)
-
-    def is_told() -> bool:
-        operator.told("set", "lab", f"mtu={next(changes)}")
-        return bool(select.select([watch.stdout], [], [], 0.2)[0])
-
     try:
-        # What is set before it watches it does not tell.
-        assert comes_true(is_told)
+        assert comes_true(lambda: is_told_of_a_change(watch, operator))
         line = watch.stdout.readline()
     finally:
         watch.send_signal(signal.SIGINT)
@@ -157,6 +161,38 @@ def test_what_changes_is_told_until_somebody_interrupts(operator: Operator) -> N
     told = r"\d\d:\d\d:\d\d setting lab/mtu: (absent|16\d\d) -> 16\d\d\n"
     assert re.fullmatch(told, line), wrong
     assert watch.returncode == 0, wrong
+
+
+def test_a_watch_says_once_that_all_servers_are_lost(lab: FabricLab, operator: Operator) -> None:
+    watch = operator.start("watch", "--kind", "setting", "--for", "120")
+    assert watch.stdout is not None and watch.stderr is not None
+    try:
+        assert comes_true(lambda: is_told_of_a_change(watch, operator))
+        lab.databases.kill(0)
+        lost = watch.stderr.readline()
+        lab.databases.start(0)
+        found = watch.stderr.readline()
+        operator.told("set", "lab", "mtu=9000")
+        told = watch.stdout.readline()
+        while told and not told.endswith(" -> 9000\n"):
+            told = watch.stdout.readline()
+    finally:
+        watch.send_signal(signal.SIGINT)
+        _, more = watch.communicate(timeout=30)
+    assert told.endswith(" -> 9000\n")
+    assert lost.startswith("vswitch: the fabric is lost: tcp:192.0.2.1:6640: ")
+    assert found == "vswitch: the fabric can be reached again\n"
+    assert (watch.returncode, more) == (0, "")
+
+
+def test_a_fabric_of_another_version_is_told(tmp_path: Path) -> None:
+    schema = tmp_path / "other.ovsschema"
+    text = SCHEMA.read_text(encoding="utf-8")
+    schema.write_text(json.dumps({**json.loads(text), "version": "2.0.0"}), encoding="utf-8")
+    with FabricLab(tmp_path, schema=schema) as lab:
+        done = Operator(lab)("list")
+        assert done.status == 1
+        assert "has a schema of version 2.0.0, which is none of 1.x" in done.stderr
 
 
 def test_what_is_for_one_host_says_so(operator: Operator) -> None:

@@ -7,10 +7,11 @@ from typing import Any, Dict, Iterator
 
 import pytest
 
-from certificates import Authority
+from certificates import Authority, Certificate
 from fabric_lab import FabricLab, Host, Trust, killed, started
 from frame_lab import comes_true
 from operating import PROGRAM, Operator, of_lab
+from vswitch.command.fabric import program
 
 LAB: Dict[str, Any] = {
     "uplinks": [{"name": "nic0"}],
@@ -184,6 +185,7 @@ def test_servers_and_operators_prove_who_they_are(tmp_path: Path) -> None:
     place.mkdir()
     trust = Trust(place)
     ours = trust.of_hosts.issue("operator")
+    expired = trust.of_hosts.issue("late", days=-1)
     stranger = Authority(place, "others").issue("operator")
     with FabricLab(tmp_path, trust=trust) as lab:
         operator = Operator(lab)
@@ -191,8 +193,41 @@ def test_servers_and_operators_prove_who_they_are(tmp_path: Path) -> None:
         for options, said in (
             (trust.options_of_host(ours), ""),
             (trust.options_of_host(stranger), "one does that does not take this certificate"),
+            (trust.options_of_host(expired), "one does that does not take this certificate"),
             (ours.options(trust.of_hosts.certificate), "certificate verify failed"),
-            (ours.options(tmp_path / "none"), "No such file or directory"),
         ):
             done = operator.process("hosts", before=options)
             assert (done.status, said in done.stderr) == (1 if said else 0, True), done
+        trust.server = trust.of_servers.issue("database", days=-1)
+        lab.databases.kill(0)
+        lab.databases.start(0)
+        done = operator.process("hosts", before=trust.options_of_host(ours))
+        assert (done.status, "certificate has expired" in done.stderr) == (1, True), done
+
+
+def test_a_file_that_will_not_do_is_told_with_its_option(
+    tmp_path: Path, capsys: pytest.CaptureFixture[str]
+) -> None:
+    authority = Authority(tmp_path, "ours")
+    ours, other = authority.issue("operator"), authority.issue("other")
+    junk, none, trusted = tmp_path / "junk", tmp_path / "none", authority.certificate
+    junk.write_text("none\n", encoding="utf-8")
+    missing = "No such file or directory"
+    empty = "it has no certificate"
+    for certificate, ca_cert, said in (
+        (Certificate(ours.certificate, none), trusted, f"--private-key {none}: {missing}"),
+        (Certificate(none, ours.key), trusted, f"--certificate {none}: {missing}"),
+        (ours, none, f"--ca-cert {none}: {missing}"),
+        (Certificate(ours.certificate, junk), trusted, f"--private-key {junk}: it has no"),
+        (Certificate(junk, ours.key), trusted, f"--certificate {junk}: {empty}"),
+        (ours, junk, f"--ca-cert {junk}: {empty}"),
+        (
+            Certificate(ours.certificate, other.key),
+            trusted,
+            f"--private-key {other.key}: it is not the key of the certificate {ours.certificate}",
+        ),
+    ):
+        with pytest.raises(SystemExit) as end:
+            program.main(["--fabric", "ssl:192.0.2.1:6640", *certificate.options(ca_cert), "list"])
+        wrong = capsys.readouterr().err
+        assert (end.value.code, wrong.startswith(f"vswitch: {said}")) == (1, True), wrong

@@ -17,7 +17,7 @@ except ImportError:
     _front.stand_in_front({})
 
 from vswitch.fabric._drilling import Failover
-from vswitch.fabric._errors import OtherVersion, Unreachable
+from vswitch.fabric._errors import OtherVersion, Unreachable, UnusableFile
 from vswitch.fabric._fabric import Fabric
 from vswitch.fabric._plan import Plan
 from vswitch.fabric._view import Member, SharedPort, SharedSwitch, View
@@ -31,5 +31,6 @@ __all__ = [
     "SharedPort",
     "SharedSwitch",
     "Unreachable",
+    "UnusableFile",
     "View",
 ]

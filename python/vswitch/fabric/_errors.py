@@ -2,7 +2,7 @@
 
 from libvswitch.errors import Busy
 
-__all__ = ["OtherVersion", "TransactionRefused", "Unreachable"]
+__all__ = ["OtherVersion", "TransactionRefused", "Unreachable", "UnusableFile"]
 
 
 class Unreachable(Busy):
@@ -11,6 +11,16 @@ class Unreachable(Busy):
 
 class OtherVersion(Unreachable):
     """A server has a schema that this client does not know."""
+
+
+class UnusableFile(Unreachable):
+    """A file by which one side knows the other will not do: that of the parameter `parameter`."""
+
+    def __init__(self, parameter: str, file: str, why: str) -> None:
+        super().__init__(f"{parameter} {file}: {why}")
+        self.parameter = parameter
+        self.file = file
+        self.why = why
 
 
 class TransactionRefused(Exception):

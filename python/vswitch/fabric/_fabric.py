@@ -2,14 +2,14 @@
 
 import re
 import time
-from typing import Iterator, List, Optional, Sequence, Tuple
+from typing import Callable, Iterator, List, Optional, Sequence, Tuple
 
 import ovs.stream
 
 from libvswitch.errors import BadParameter, NotRestored
 from vswitch import transaction
 from vswitch.documents import Document
-from vswitch.fabric import _deciding, _documents, _server
+from vswitch.fabric import _deciding, _documents, _tls
 from vswitch.fabric._cluster import Cluster
 from vswitch.fabric._drilling import Replies, drill
 from vswitch.fabric._errors import OtherVersion, Unreachable
@@ -24,6 +24,10 @@ __all__ = ["Fabric"]
 # An election takes less.
 _PATIENCE = 3.0
 _LONGEST = 10.0**9
+
+
+def _say_nothing(_: Optional[str]) -> None:
+    pass
 
 
 class Fabric:
@@ -45,8 +49,7 @@ class Fabric:
         if any(one.startswith("ssl:") for one in addresses):
             if private_key is None or certificate is None or ca_cert is None:
                 raise BadParameter("ssl: takes a private key, its certificate and an authority's")
-            _require_readable(private_key, certificate, ca_cert)
-            _server.use(_server.Tls(private_key, certificate, ca_cert))
+            _tls.use(_tls.Tls(private_key, certificate, ca_cert))
         self._cluster = Cluster(addresses)
 
     def __enter__(self) -> "Fabric":
@@ -134,25 +137,36 @@ class Fabric:
         switch = self.view().switches[alias]
         return drill(self._cluster, switch.id, switch.hosts, time.monotonic() + seconds)
 
-    def watch(self, seconds: Optional[float] = None) -> Iterator[Event]:
+    def watch(
+        self, seconds: Optional[float] = None, lost: Callable[[Optional[str]], None] = _say_nothing
+    ) -> Iterator[Event]:
         """What changes from now on: without end, or for a time.
 
         What changed while no server could be reached is told when one can; until then the view is
-        the last one.
+        the last one. `lost` is told why none can, once, and None when one can again.
         """
         end = time.monotonic() + (_LONGEST if seconds is None else seconds)
         # What is there when the watch begins is no event.
-        return self._events(self.view(), end)
+        return self._events(self.view(), end, lost)
 
-    def _events(self, before: View, end: float) -> Iterator[Event]:
+    def _events(
+        self, before: View, end: float, lost: Callable[[Optional[str]], None]
+    ) -> Iterator[Event]:
+        is_lost = False
         while time.monotonic() < end:
             self._follow(end)
             try:
                 self._cluster.connect(min(end, time.monotonic() + _PATIENCE))
             except OtherVersion:
                 raise
-            except Unreachable:
+            except Unreachable as why:
+                if not is_lost:
+                    is_lost = True
+                    lost(str(why))
                 continue
+            if is_lost:
+                is_lost = False
+                lost(None)
             after = view_of(self._cluster.rows)
             yield from events(before, after)
             before = after
@@ -186,9 +200,3 @@ def _addresses(servers: str) -> Tuple[str, ...]:
         if not is_form or not ovs.stream.Stream.is_valid_name(one):
             raise BadParameter(f"{one!r} is no server: tcp:ADDRESS:PORT or ssl:ADDRESS:PORT")
     return found
-
-
-def _require_readable(*files: str) -> None:
-    for one in files:
-        with open(one, "rb"):
-            pass

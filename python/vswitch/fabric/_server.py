@@ -12,23 +12,7 @@ import ovs.stream
 from vswitch.fabric._errors import TransactionRefused, Unreachable
 from vswitch.fabric._notation import Operation
 
-__all__ = ["News", "Server", "Tls", "use"]
-
-
-class Tls(NamedTuple):
-    """Files in PEM."""
-
-    private_key: str
-    certificate: str
-    ca_cert: str
-
-
-def use(tls: Tls) -> None:
-    """From now on this process is known by that certificate."""
-    stream = ovs.stream.Stream
-    stream.ssl_set_private_key_file(tls.private_key)
-    stream.ssl_set_certificate_file(tls.certificate)
-    stream.ssl_set_ca_cert_file(tls.ca_cert)
+__all__ = ["News", "Server"]
 
 
 class News(NamedTuple):
@@ -48,7 +32,7 @@ class Server:
         try:
             error, stream = ovs.stream.Stream.open_block(ovs.stream.Stream.open(address), left)
         except (OSError, ValueError) as why:
-            # A file that is none of a key, say.
+            # A file that became none of a key, say.
             raise Unreachable(f"{address}: {why}") from None
         if error:
             raise Unreachable(f"{address}: {_words(error)}")

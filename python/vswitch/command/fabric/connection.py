@@ -6,7 +6,7 @@ from typing import Any, Dict, Iterator, Optional
 import click
 
 from libvswitch.errors import BadParameter
-from vswitch.fabric import Fabric
+from vswitch.fabric import Fabric, Unreachable, UnusableFile
 
 __all__ = ["connected", "options_of"]
 
@@ -26,5 +26,8 @@ def connected(context: Optional[click.Context] = None) -> Iterator[Fabric]:
         fabric = Fabric(servers, **options)
     except BadParameter as error:
         raise click.UsageError(f"--fabric: {error}") from None
+    except UnusableFile as wrong:
+        option = f"--{wrong.parameter.replace('_', '-')}"
+        raise Unreachable(f"{option} {wrong.file}: {wrong.why}") from None
     with fabric:
         yield fabric

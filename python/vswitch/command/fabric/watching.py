@@ -3,6 +3,7 @@
 import contextlib
 import dataclasses
 import datetime
+import sys
 from typing import List, Optional
 
 import typer
@@ -13,9 +14,14 @@ from vswitch.command.fabric.arguments import kinds as kinds_begun
 from vswitch.command.fabric.connection import connected
 from vswitch.command.session import from_words, is_json
 from vswitch.fabric._watching import KINDS
-from vswitch.words import choice
+from vswitch.words import choice, printable
 
 __all__ = ["watch"]
+
+
+def _say_lost(why: Optional[str]) -> None:
+    said = "the fabric can be reached again" if why is None else f"the fabric is lost: {why}"
+    print(f"vswitch: {printable(said)}", file=sys.stderr, flush=True)
 
 
 def watch(
@@ -31,13 +37,13 @@ def watch(
 ) -> None:
     """Tell what changes from now on, on any host, until interrupted.
 
-    Programs get a line of JSON for each change. While no server can be reached nothing is told;
-    what changed meanwhile is told after that.
+    Programs get a line of JSON for each change. While no server can be reached, which standard
+    error says, nothing is told; what changed meanwhile is told after that.
     """
     with from_words("--kind"):
         wanted = [choice(one, "", KINDS) for one in kind or KINDS]
     with contextlib.suppress(KeyboardInterrupt), connected() as fabric:
-        for event in fabric.watch(seconds):
+        for event in fabric.watch(seconds, _say_lost):
             if event.kind not in wanted:
                 continue
             if is_json():
