@@ -133,6 +133,16 @@ def test_the_leader_is_lost_in_mid_change(lab: FabricLab, reply_only: bool) -> N
     assert mtu(one) == 1600
 
 
+def test_servers_may_be_slow_as_long_as_they_reply(lab: FabricLab) -> None:
+    one = started(lab.relayed(lab.host("one", LAB)))
+    one.ctl("share", "lab")
+    one.stop()
+    relay_of(one).delay(0.4)
+    started(one)
+    assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
+    assert lab.databases.settings("Switch")["mtu"] == 1600
+
+
 def test_what_a_server_makes_twice_is_made_once(lab: FabricLab) -> None:
     one, other = lab.relayed(lab.host("one", LAB)), lab.relayed(lab.host("two"))
     for host in (one, other):

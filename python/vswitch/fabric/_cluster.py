@@ -21,8 +21,10 @@ _COLUMNS = {
     "Host": ["name", "in_force", "links", "errors"],
     "Drill": ["id", "reply"],
 }
-# For one server to accept a connection, and to say what it has.
+# For one server to accept a connection, and to say what it is.
 _PATIENCE = 2.0
+# For one that has done so to say what it has, which may be much.
+_PATIENCE_WITH_CONTENTS = 10.0
 _PAUSE = 0.1
 # What ends so near to a deadline was cut short by it.
 _NEAR = 0.01
@@ -84,6 +86,7 @@ class Cluster:
                 why = f"has a schema of version {version}, which is none of {_VERSION}x"
                 raise OtherVersion(f"{server.address}: its database '{_DATABASE}' {why}")
             self.rows = {table: {} for table in _COLUMNS}
+            deadline = max(deadline, time.monotonic() + _PATIENCE_WITH_CONTENTS)
             self._take(News(_DATABASE, self._monitor(_DATABASE, _COLUMNS, deadline)))
         except Unreachable:
             self.disconnect()

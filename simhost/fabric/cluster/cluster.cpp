@@ -15,8 +15,14 @@ namespace {
 
 using namespace std::chrono_literals;
 
-// For one server to accept a connection and to say what it has.
+// For a server to accept a connection, and for each thing that it says of itself.
 constexpr auto kPatience = 2s;
+// For one that has done so to say what it has, which may be much.
+constexpr auto kPatienceWithContents = 10s;
+
+Deadline reply_deadline() {
+  return Deadline::clock::now() + kPatience;
+}
 
 // A server that will not do, and why.
 class Unfit : public std::runtime_error {
@@ -95,19 +101,19 @@ void Cluster::connect() {
 }
 
 void Cluster::connect_to(Server const &server) {
-  auto const deadline = Deadline::clock::now() + kPatience;
-  auto const stream = [&] { return connected_to(server, servers_.credentials, deadline); };
+  auto const stream = [&] { return connected_to(server, servers_.credentials, reply_deadline()); };
   connection_.emplace(Connection{{stream(), database_.name}, {stream(), "_Server"}});
-  connection_->server.monitor({{"Database", {"name", "connected", "cid", "index"}}}, deadline);
+  connection_->server.monitor({{"Database", {"name", "connected", "cid", "index"}}},
+                              reply_deadline());
   check_server();
-  auto const version = connection_->database.version(deadline);
+  auto const version = connection_->database.version(reply_deadline());
   if (!version.starts_with(database_.version)) {
     throw WrongVersion(
         fmt::format("{}: its database '{}' has a schema of version {}, which is none "
                     "of {}x",
                     this->server(), database_.name, version, database_.version));
   }
-  connection_->database.monitor(database_.selected, deadline);
+  connection_->database.monitor(database_.selected, Deadline::clock::now() + kPatienceWithContents);
   ++connections_;
 }
 
