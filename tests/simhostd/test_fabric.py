@@ -293,6 +293,10 @@ def test_what_a_host_cannot_bear_is_told(lab: FabricLab, two: Tuple[Host, Host])
     done = third.try_ctl("join", "lab")
     assert done.returncode == 1 and "QEX_BUSY" in done.stdout
     assert third.setting("lab", "mtu") == 1500
+    # Nothing has changed.
+    (shared,) = lab.databases.rows("Switch")
+    assert shared["hosts"] == ["set", ["one", "two"]]
+    assert comes_true(lambda: told() == [{}, {}, {}]), told()
 
 
 def test_a_switch_that_the_fabric_has_not_cannot_be_joined(

@@ -5,6 +5,7 @@
 #include <fmt/format.h>
 
 #include <chrono>
+#include <random>
 #include <stdexcept>
 #include <utility>
 
@@ -27,6 +28,21 @@ std::int64_t long_ago() {
 }
 
 }  // namespace
+
+std::string random_name() {
+  std::random_device random;
+  return fmt::format("{:08x}{:08x}", random(), random());
+}
+
+Membership membership_in(storage::Store &store, std::string const &host) {
+  storage::ReadingTransaction transaction(store);
+  auto const found = storage::find_membership(transaction);
+  if (found && found->host != host) {
+    throw std::runtime_error(
+        fmt::format("the state belongs to a fabric as '{}', not as '{}'", found->host, host));
+  }
+  return found.value_or(Membership{.host = host, .state = random_name()});
+}
 
 Claim::Claim(Speaker speaker, std::string state)
     : speaker_(std::move(speaker)), state_(std::move(state)) {}

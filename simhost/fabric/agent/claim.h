@@ -6,8 +6,17 @@
 #include "fabric/cluster/cluster.h"
 #include "fabric/rows/operations.h"
 #include "fabric/rows/rows.h"
+#include "storage/shared.h"
+#include "storage/store.h"
 
 namespace simhost::fabric {
+
+/// Of a session, a state, a change: no other has it.
+std::string random_name();
+
+/// That in the state, or a new one if it belongs to no fabric. Throws std::runtime_error if it
+/// belongs to one by another name.
+storage::Membership membership_in(storage::Store &store, std::string const &host);
 
 /// Claims a name for a process, as often as it is asked.
 class Claim {

@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <chrono>
-#include <random>
 #include <utility>
 
 #include "base/outcomes.h"
@@ -36,23 +35,8 @@ constexpr auto kLongestDecision = 10s;
 // A server is looked for that long before callers are refused.
 constexpr auto kElection = 3s;
 
-std::string random_name() {
-  std::random_device random;
-  return fmt::format("{:08x}{:08x}", random(), random());
-}
-
 Deadline from_now(std::chrono::milliseconds time) {
   return Deadline::clock::now() + time;
-}
-
-Membership membership_in(storage::Store &store, std::string const &host) {
-  storage::ReadingTransaction transaction(store);
-  auto const found = storage::find_membership(transaction);
-  if (found && found->host != host) {
-    throw std::runtime_error(
-        fmt::format("the state belongs to a fabric as '{}', not as '{}'", found->host, host));
-  }
-  return found.value_or(Membership{.host = host, .state = random_name()});
 }
 
 Json map_of(std::map<std::string, std::string> const &texts) {
@@ -193,12 +177,13 @@ void Member::sync() {
       malloc_trim(0);
     }
     revision_ = revision_of(cluster_.replica());
-    tell_joined();
     reply_to_drills();
     report_soon();
     pause_ = {};
     state_pause_ = {};
     tell_of_state({});
+    // These decide something themselves, by which servers may be lost.
+    tell_joined();
     let_go();
   } catch (Json::exception const &error) {
     lose(fmt::format("its rows are none of this version: {}", error.what()));
@@ -287,11 +272,25 @@ void Member::tell_joined() {
     }
     auto const unborne = unborne_.find(name);
     for (auto one = first; one != end; ++one) {
-      one->second(unborne == unborne_.end() ? Json{{"joined", name.switch_identifier}}
-                                            : Json{{"refused", unborne->second}});
+      one->second.reply(unborne == unborne_.end() ? Json{{"joined", name.switch_identifier}}
+                                                  : unjoined(one->second, *unborne));
     }
     joining_.erase(first, end);
   }
+}
+
+// Of a switch that this host cannot bear. Whoever asked for it is told that nothing changed.
+Json Member::unjoined(Joining const &joining, std::pair<SharedName const, std::string> const &why) {
+  auto const &[name, words] = why;
+  if (joining.is_new) {
+    auto const proposal = proposed(random_name(), leave(name.switch_identifier, options_.host));
+    auto const decision = decided(proposal, kPatience);
+    if (decision.verdict != Verdict::made) {
+      return {{"unknown", fmt::format("{}; this host may be at the switch all the same: {}", words,
+                                      decision.why)}};
+    }
+  }
+  return {{"refused", words}};
 }
 
 // Of ports that only others believe to be connected here.
@@ -493,10 +492,13 @@ void Member::commit(Json const &question, Reply const &reply) {
 }
 
 void Member::join(std::string const &alias, Reply const &reply) {
+  auto const is_it = [&](auto const &one) { return one.second.value("alias", "") == alias; };
+  bool const is_new = cluster_.is_connected() &&
+                      std::ranges::none_of(switches_of(cluster_.replica(), options_.host), is_it);
   auto const proposal = proposed(random_name(), fabric::join(alias, options_.host));
   auto const decision = decided(proposal, kLongestDecision);
   if (decision.verdict == Verdict::made) {
-    joining_.emplace(alias, reply);
+    joining_.emplace(alias, Joining{.reply = reply, .is_new = is_new});
   } else if (cluster_.is_connected() && !has_switch(cluster_.replica(), alias)) {
     reply({{"refused", fmt::format("the fabric has no switch '{}'", alias)}});
   } else {

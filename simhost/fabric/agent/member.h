@@ -9,6 +9,7 @@
 #include <optional>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "daemon/server.h"
@@ -49,6 +50,11 @@ class Member {
   void tell(InForce const &in_force);
 
  private:
+  struct Joining {
+    Reply reply;
+    bool is_new;  // the fabric did not have this host at the switch before
+  };
+
   void connect();
   void begin_anew();
   void lose(std::string const &why);
@@ -62,6 +68,7 @@ class Member {
   bool follow_touched();
   void tell_of_state(std::string const &why);
   void tell_joined();
+  Json unjoined(Joining const &joining, std::pair<SharedName const, std::string> const &why);
   void let_go();
   void reply_to_drills();
 
@@ -94,11 +101,11 @@ class Member {
   Touched touched_;
   PortRows port_rows_;
   std::map<SharedName, std::string> unborne_;
-  bool is_left_ = false;                       // of what follow() found
-  std::multimap<std::string, Reply> joining_;  // by the alias of the switch
-  Writers writers_;                            // as they were seen last
-  std::int64_t revision_ = 0;                  // that is in the state
-  std::uint64_t change_ = 0;                   // of the state, with which it came
+  bool is_left_ = false;                         // of what follow() found
+  std::multimap<std::string, Joining> joining_;  // by the alias of the switch
+  Writers writers_;                              // as they were seen last
+  std::int64_t revision_ = 0;                    // that is in the state
+  std::uint64_t change_ = 0;                     // of the state, with which it came
   InForce in_force_;
   Json reported_;
   bool counts_are_due_ = false;

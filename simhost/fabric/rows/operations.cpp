@@ -238,6 +238,11 @@ Json join(std::string const &alias, std::string const &host) {
                       mutation("Switch", where, "hosts", "insert", ovsdb::set({host}))});
 }
 
+Json leave(std::string const &switch_identifier, std::string const &host) {
+  return Json::array({mutation("Switch", conditions({{"id", switch_identifier}}), "hosts", "delete",
+                               ovsdb::set({host}))});
+}
+
 Json together(std::initializer_list<Json> lists) {
   auto all = Json::array();
   for (auto const &list : lists) {

@@ -36,6 +36,7 @@ Json change_selection(std::string const &id);
 Json old_changes_deletion(std::string const &host, std::int64_t time);
 /// Refuses the transaction if there is no switch of that alias.
 Json join(std::string const &alias, std::string const &host);
+Json leave(std::string const &switch_identifier, std::string const &host);
 
 /// All of the operations in all of the lists.
 Json together(std::initializer_list<Json> lists);
