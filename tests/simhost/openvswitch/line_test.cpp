@@ -10,11 +10,13 @@
 #include <thread>
 
 #include "events/unix_address.h"
+#include "planes/openvswitch/caller/asking.h"
 #include "temporary_folder.h"
 
 namespace {
 
 using simhost::openvswitch::ask;
+using simhost::openvswitch::Asking;
 using simhost::openvswitch::Lines;
 using simhost::openvswitch::NoDaemon;
 using testing::HasSubstr;
@@ -109,6 +111,27 @@ TEST(AQuestion, GoesToASocketWhateverItsFolderIsCalled) {
   // No address of a socket is that long.
   Peer const peer(deep / "h.db", "{\"change\": 7}\n");
   EXPECT_EQ(ask(deep / "h.db", {{"ask", "status"}}, 10s)["change"], 7);
+}
+
+std::string refusal(Asking &asking) {
+  try {
+    asking.said({{"ask", "status"}});
+  } catch (NoDaemon const &none) {
+    return none.what();
+  }
+  return {};
+}
+
+TEST(ACall, IsToldTheSameAgainOfADaemonThatSaidNothing) {
+  TemporaryFolder const folder;
+  Asking asking(folder.file("h.db"));
+  {
+    Peer const peer(folder.file("h.db"), "");
+    EXPECT_THAT(refusal(asking), StrEq("simhostd ended"));
+  }
+  EXPECT_THAT(refusal(asking), StrEq("simhostd ended"));
+  asking.begin();
+  EXPECT_THAT(refusal(asking), StrEq("no simhostd: Connection refused"));
 }
 
 }  // namespace

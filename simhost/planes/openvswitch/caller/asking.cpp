@@ -13,13 +13,13 @@ namespace simhost::openvswitch {
 Asking::Asking(std::filesystem::path state) : state_(std::move(state)) {}
 
 Json Asking::said(Json const &question) {
-  if (is_silent_) {
-    throw NoDaemon("simhostd says nothing in time");
+  if (none_) {
+    throw NoDaemon(*none_);
   }
   try {
     return ask(state_, question, kPatience);
-  } catch (NoDaemon const &) {
-    is_silent_ = true;
+  } catch (NoDaemon const &none) {
+    none_ = none;
     throw;
   }
 }

@@ -15,7 +15,7 @@ class Asking {
   explicit Asking(std::filesystem::path state);
 
   /// Another call begins.
-  void begin() { is_silent_ = false; }
+  void begin() { none_.reset(); }
   /// What the daemon says. Throws NoDaemon.
   Json said(Json const &question);
   /// Its reply. Refuses: without a daemon (QEX_TIMEOUT), and what the daemon refuses
@@ -26,7 +26,7 @@ class Asking {
 
  private:
   std::filesystem::path state_;
-  bool is_silent_ = false;
+  std::optional<NoDaemon> none_;  // in this call
 };
 
 }  // namespace simhost::openvswitch
