@@ -7,7 +7,8 @@ command_packages='python3-typer python3-rich python3-yaml'
 docs_packages='python3-sphinx python3-myst-parser furo'
 frame_packages='openvswitch-switch python3-openvswitch iproute2 ethtool iputils-ping'
 test_packages="libgtest-dev libgmock-dev python3-pytest python3-pytest-xdist python3-hypothesis
-  valgrind nodejs uidmap groff-base openssl $frame_packages $command_packages $docs_packages"
+  python3-pexpect valgrind nodejs uidmap groff-base openssl
+  $frame_packages $command_packages $docs_packages"
 check_packages=git
 fuzz_packages='clang libclang-rt-14-dev'
 lint_packages='clang-format clang-tidy shellcheck black flake8 mypy'

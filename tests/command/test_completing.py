@@ -1,14 +1,12 @@
 """What a shell is told when somebody presses the key for completion."""
 
-import contextlib
 import functools
-import os
-import pty
 import subprocess
 from pathlib import Path
 from typing import Dict, List
 
 import click
+import pexpect
 import pytest
 from command_line import PROGRAM, Refused, Vswitch
 from simhost import SharedHost
@@ -122,38 +120,32 @@ def test_a_setting_that_there_is_not_has_no_values() -> None:
         list(assignments.offered(_table.SWITCH, "nope=", list))
 
 
-TYPED = r"""
-eval "$SCRIPT"
-bind 'set enable-bracketed-paste off'
-PS1= PS2=
-"""
+TO_THE_BEGINNING = "\x01"  # of the line
 
 
 def test_bash_puts_in_what_is_offered(lab: SharedHost) -> None:
-    """The key for completion is pressed after some letters of each word; the line is shown then."""
-    terminal, other = pty.openpty()
-    typed = "vswitch set lab/web-1 forb\tp\tupl\tr\t\x01echo typed: \n"
-    with subprocess.Popen(
-        ["bash", "--norc", "--noprofile", "-i"],
+    """The key for completion is pressed after some letters of each word; then the line is run."""
+    with pexpect.spawn(
+        "bash --norc --noprofile -i",
         env={**environment(lab), "TERM": "dumb", "SCRIPT": script()},
-        stdin=other,
-        stdout=other,
-        stderr=other,
+        dimensions=(24, 200),
+        encoding="ascii",
+        timeout=300,
     ) as shell:
-        os.close(other)
-        os.write(terminal, (TYPED + typed + "exit\n").encode("ascii"))
-        said = read_all(terminal)
-    assert shell.returncode == 0
-    assert "\ntyped: vswitch set lab/web-1 forbids=promiscuous uplink=right" in said
-
-
-def read_all(terminal: int) -> str:
-    """What is written until nobody writes there any more."""
-    said = b""
-    with open(terminal, "rb", buffering=0) as file, contextlib.suppress(OSError):
-        while True:
-            said += file.read(4096)
-    return said.decode("ascii").replace("\r", "")
+        # What is typed is echoed: it does not look as the prompt does.
+        shell.sendline(r"""eval "$SCRIPT"; PS1='$? now: '""")
+        shell.expect_exact("0 now: ")
+        shell.send("vswitch set lab/web-1 forb\t")
+        shell.expect_exact("vswitch set lab/web-1 forbids=")
+        shell.send("p\t")
+        shell.expect_exact("promiscuous ")
+        shell.send("upl\t")
+        shell.expect_exact("uplink=")
+        shell.send("r\t")
+        shell.expect_exact("right ")
+        shell.sendline(f"{TO_THE_BEGINNING}echo typed: ")
+        typed = "typed: vswitch set lab/web-1 forbids=promiscuous uplink=right"
+        shell.expect_exact(f"\r\n{typed}\r\n0 now: ")
 
 
 @pytest.mark.parametrize("shell", ["bash", "zsh", "fish"])
