@@ -27,6 +27,8 @@ SHARED_ANEW = {"max_ports": 100, "version": 200, "mtu": 1500}
 
 _REFUSED = ("QEX_BUSY", "QEX_NOT_FOUND", "QEX_IS_DISCONNECTED")
 _KILLED = -9
+# Which of the calls that may be a change is taken to be it.
+_ORDER = {"made": 0, "unknown": 1, "refused": 2}
 
 
 # What is wanted.
@@ -46,6 +48,8 @@ class Wanted:
     """The alias of a switch that it shares."""
     is_change: bool = False
     """Also where it makes nothing other."""
+    taken_back: Optional[Effect] = None
+    """By a change that follows, where its host finds that it cannot bear what is made."""
 
 
 def _applied(*of_switch: Mapping[str, Any]) -> str:
@@ -141,7 +145,12 @@ def join(host: str, alias: str) -> Wanted:
     def effect(switches: Switches) -> None:
         switches[alias].hosts.add(host)
 
-    return Wanted(f"join {alias}", [CTL, "join", alias], effect, is_change=True)
+    def taken_back(switches: Switches) -> None:
+        if alias in switches:
+            switches[alias].hosts.discard(host)
+
+    command = [CTL, "join", alias]
+    return Wanted(f"join {alias}", command, effect, is_change=True, taken_back=taken_back)
 
 
 def leave(host: str, alias: str) -> Wanted:
@@ -189,7 +198,7 @@ class Call:
     def may_be(self, transaction: Transaction, before: Switches, may_leave: bool = False) -> bool:
         """Whether it is that change, to all that is known; and ports that its host leaves with it,
         if that may be."""
-        if self.host != transaction.host or self.outcome == "refused":
+        if self.host != transaction.host or not self._may_be_made():
             return False
         if self.change and self.change != transaction.change:
             return False
@@ -202,6 +211,18 @@ class Call:
         if expected == now:
             return is_other or self.wanted.is_change
         return may_leave and is_other and left(expected, transaction) == now
+
+    def _may_be_made(self) -> bool:
+        return self.outcome != "refused" or self.wanted.taken_back is not None
+
+    def is_taken_back(self, transaction: Transaction, before: Switches) -> bool:
+        """Whether it was made, and is no more with that change."""
+        if self.host != transaction.host or self.outcome == "made":
+            return False
+        expected = copy.deepcopy(before)
+        assert self.wanted.taken_back is not None
+        self.wanted.taken_back(expected)
+        return expected == transaction.switches
 
     def hear(self, status: int, said: str) -> None:
         """Of its end."""
@@ -298,6 +319,7 @@ def wrong(
     connected leave these ports."""
     found: List[str] = []
     open_, before = list(calls), first
+    taken_back: List[Call] = []
     unknown = {one.host for one in calls if one.outcome == "unknown"}
     for transaction in made:
         if transaction.revision != before.revision + 1:
@@ -305,23 +327,34 @@ def wrong(
         # Whose callers are killed, that may have connected what it does not know of.
         may_leave = transaction.host in {*forgetful, *unknown}
         fitting = [one for one in open_ if one.may_be(transaction, before.switches, may_leave)]
-        if fitting:
+        ended = [one for one in taken_back if one.is_taken_back(transaction, before.switches)]
+        # Nothing else can be that change, while one of which nobody knows may stay.
+        refused = [one for one in ended if one.outcome == "refused"]
+        if refused or (ended and not fitting):
+            taken_back.remove((refused or ended)[0])
+        elif fitting:
             # Of those of which nobody knows, any may be none.
             alone = [one for one in fitting if one.may_be(transaction, before.switches)]
-            fitting = alone or fitting
-            open_.remove(min(fitting, key=lambda one: (not one.change, one.outcome != "made")))
+            chosen = min(alone or fitting, key=lambda one: (not one.change, _ORDER[one.outcome]))
+            open_.remove(chosen)
+            if chosen.wanted.taken_back and transaction.switches != before.switches:
+                taken_back.append(chosen)
         elif not may_leave or not _only_leaves(transaction, before.switches):
-            refused = [str(one) for one in open_ if _would_be(one, transaction, before.switches)]
-            why = f", as was refused to {', '.join(refused)}" if refused else ""
+            no = [str(one) for one in open_ if _would_be(one, transaction, before.switches)]
+            why = f", as was refused to {', '.join(no)}" if no else ""
             whose = f"revision {transaction.revision} of {transaction.host or 'an operator'}"
             found.append(f"{whose} is no call's{why}: {difference(before.switches, transaction)}")
         before = transaction
     seen = [first.switches, *(transaction.switches for transaction in made)]
-    return found + [
-        f"made, and lost: {one}"
-        for one in open_
-        if one.outcome == "made" and not any(map(one.wanted.is_idle, seen))
-    ]
+    return (
+        found
+        + [
+            f"made, and lost: {one}"
+            for one in open_
+            if one.outcome == "made" and not any(map(one.wanted.is_idle, seen))
+        ]
+        + [f"refused, and made: {one}" for one in taken_back if one.outcome == "refused"]
+    )
 
 
 def _only_leaves(transaction: Transaction, before: Switches) -> bool:

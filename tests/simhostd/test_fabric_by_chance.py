@@ -9,7 +9,7 @@ import pytest
 
 import fabric_by_chance
 from fabric_by_chance import begun_and_made, found_wrong
-from fabric_calls import CTL, Call, Calls, put_port, remove_port, set_switch, wrong
+from fabric_calls import CTL, Call, Calls, Wanted, join, put_port, remove_port, set_switch, wrong
 from fabric_history import Port, Switch, Transaction
 from fabric_lab import FabricLab, started
 
@@ -20,6 +20,10 @@ REFUSED = Call("h1", set_switch([], "lab", mtu=1700), "refused")
 UNKNOWN = Call("h1", remove_port("lab", "p"))
 DECIDED = Call("h0", set_switch([], "lab", mtu=1800), change="that")
 CALLS = (MADE, ADDED, REFUSED, UNKNOWN, DECIDED)
+JOIN = join("h2", "lab")
+JOINED = Call("h2", JOIN, "refused")
+assert JOIN.taken_back
+TAKEN_BACK = Call("h2", Wanted("", [], JOIN.taken_back))
 
 
 def changes(*calls: Call) -> List[Transaction]:
@@ -61,6 +65,17 @@ def test_what_nobody_knows_of_may_be_made_or_not(made: Sequence[Call]) -> None:
 def test_what_cannot_be_is_found(made: Sequence[Call], found: str) -> None:
     (said,) = wrong(CALLS, changes(*made), FIRST)
     assert found in said
+
+
+@pytest.mark.parametrize("outcome", ["refused", "unknown"])
+def test_a_switch_that_a_host_cannot_bear_is_joined_and_left_again(outcome: str) -> None:
+    calls = [MADE, Call("h2", JOIN, outcome)]
+    assert wrong(calls, changes(JOINED, MADE, TAKEN_BACK), FIRST) == []
+    (said,) = wrong(calls, changes(MADE, TAKEN_BACK), FIRST)
+    assert "revision 3 of h2 is no call's" in said
+    is_refused = outcome == "refused"
+    stays = ["refused, and made: h2: join lab"] * is_refused
+    assert wrong(calls, changes(JOINED, MADE), FIRST) == stays
 
 
 def test_a_change_that_undoes_another_is_found() -> None:
