@@ -190,19 +190,28 @@ def test_servers_and_operators_prove_who_they_are(tmp_path: Path) -> None:
     with FabricLab(tmp_path, trust=trust) as lab:
         operator = Operator(lab)
         assert operator.process("list").status == 2
-        for options, said in (
+        expected = (
             (trust.options_of_host(ours), ""),
             (trust.options_of_host(stranger), "one does that does not take this certificate"),
-            (trust.options_of_host(expired), "one does that does not take this certificate"),
+            (
+                trust.options_of_host(expired),
+                f" (the certificate {expired.certificate} expired on ",
+            ),
             (ours.options(trust.of_hosts.certificate), "certificate verify failed"),
-        ):
-            done = operator.process("hosts", before=options)
-            assert (done.status, said in done.stderr) == (1 if said else 0, True), done
+        )
+        # Each waits for servers that will do.
+        asked = [operator.start("hosts", before=options) for options, _ in expected]
+        for process, (_, said) in zip(asked, expected):
+            _, wrong = process.communicate()
+            assert (process.returncode, said in wrong) == (1 if said else 0, True), wrong
         trust.server = trust.of_servers.issue("database", days=-1)
         lab.databases.kill(0)
         lab.databases.start(0)
         done = operator.process("hosts", before=trust.options_of_host(ours))
         assert (done.status, "certificate has expired" in done.stderr) == (1, True), done
+        lab.databases.kill(0)
+        done = operator.process("hosts", before=trust.options_of_host(ours))
+        assert (done.status, "it is not there, or hung up\n" in done.stderr) == (1, True), done
 
 
 def test_a_file_that_will_not_do_is_told_with_its_option(

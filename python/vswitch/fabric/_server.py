@@ -2,6 +2,7 @@
 
 import errno
 import os
+import ssl
 import time
 from typing import Any, Dict, List, NamedTuple, Optional, Sequence
 
@@ -11,8 +12,11 @@ import ovs.stream
 
 from vswitch.fabric._errors import TransactionRefused, Unreachable
 from vswitch.fabric._notation import Operation
+from vswitch.fabric._tls import expired
 
 __all__ = ["News", "Server"]
+
+_GONE = "it is not there, or hung up"
 
 
 class News(NamedTuple):
@@ -33,9 +37,12 @@ class Server:
             error, stream = ovs.stream.Stream.open_block(ovs.stream.Stream.open(address), left)
         except (OSError, ValueError) as why:
             # A file that became none of a key, say.
-            raise Unreachable(f"{address}: {why}") from None
+            raise Unreachable(f"{address}: {why}{_of_certificate(address)}") from None
         if error:
-            raise Unreachable(f"{address}: {_words(error)}")
+            # The module tells what TLS says in numbers of its own.
+            is_gone = error == ssl.SSL_ERROR_EOF and address.startswith("ssl:")
+            words = _GONE if is_gone else _words(error)
+            raise Unreachable(f"{address}: {words}{_of_certificate(address)}")
         self._rpc = ovs.jsonrpc.Connection(stream)
 
     def close(self) -> None:
@@ -98,8 +105,15 @@ class Server:
         if error:
             # With TLS 1.3 a server says only after the agreement whom it will not have.
             is_shy = self.address.startswith("ssl:") and not self._rpc.get_received_bytes()
-            more = ", as one does that does not take this certificate" if is_shy else ""
+            maybe = ", as one does that does not take this certificate" if is_shy else ""
+            more = _of_certificate(self.address) or maybe
             raise Unreachable(f"{self.address}: {_words(error)}{more}")
+
+
+def _of_certificate(address: str) -> str:
+    """What the server at an address does not like of this side's, if that is known."""
+    why = expired() if address.startswith("ssl:") else ""
+    return f" ({why})" if why else ""
 
 
 def _words(error: int) -> str:

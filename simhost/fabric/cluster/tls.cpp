@@ -95,13 +95,29 @@ Owned<SSL_CTX> context_of(Credentials const &credentials) {
   return context;
 }
 
-// Without what a terminal would obey: it is somebody else's text.
-std::string subject_of(X509 *certificate) {
+template <typename Print>
+std::string printed(Print const &print) {
   Owned<BIO> const text(BIO_new(BIO_s_mem()));
-  X509_NAME_print_ex(text.get(), X509_get_subject_name(certificate), 0, XN_FLAG_RFC2253);
+  print(text.get());
   char *begin = nullptr;
   auto const size = BIO_get_mem_data(text.get(), &begin);
   return {begin, static_cast<std::size_t>(size)};
+}
+
+// Without what a terminal would obey: it is somebody else's text.
+std::string subject_of(X509 *certificate) {
+  return printed([&](BIO *text) {
+    X509_NAME_print_ex(text, X509_get_subject_name(certificate), 0, XN_FLAG_RFC2253);
+  });
+}
+
+// An empty text of one that has not.
+std::string expired(X509 const *certificate) {
+  auto const *const until = X509_get0_notAfter(certificate);
+  if (X509_cmp_current_time(until) >= 0) {
+    return {};
+  }
+  return "; it expired on " + printed([&](BIO *text) { ASN1_TIME_print(text, until); });
 }
 
 class Tls : public openvswitch::Cipher {
@@ -207,9 +223,11 @@ class Tls : public openvswitch::Cipher {
       why = "the other side closed the connection";
     } else if (ERR_GET_LIB(error) == ERR_LIB_SSL && complaint >= 0) {
       auto const *const words = SSL_alert_desc_string_long(complaint);
-      why = is_of_certificate(complaint) ? fmt::format("it does not accept the certificate {}: {}",
-                                                       credentials_.certificate.native(), words)
-                                         : fmt::format("it ends the agreement: {}", words);
+      why = is_of_certificate(complaint)
+                ? fmt::format("it does not accept the certificate {}: {}{}",
+                              credentials_.certificate.native(), words,
+                              expired(SSL_get_certificate(connection_.get())))
+                : fmt::format("it ends the agreement: {}", words);
     } else {
       why = words_of(error);
     }
