@@ -240,6 +240,13 @@ def test_nobody_writes_what_is_another_host_s(lab: RoleLab) -> None:
     one.ctl("share", "lab")
     # An operator may, and does not come in where hosts do, nor they where operators do.
     olga = lab.roles.of_operators.issue("olga")
+    # All hosts count changes, so that one may end all changes, until an operator begins anew.
+    count: Dict[str, Any] = {"op": "update", "table": "Fabric", "where": []}
+    assert '"count":1' in lab.says(two, FOR_HOSTS, {**count, "row": {"revision": 2**63 - 1}})
+    changed = {"switches": [{"alias": "lab", "mtu": 1700}]}
+    assert "range error" in one.refusal(changed)
+    assert '"count":1' in lab.says(olga, FOR_OPERATORS, {**count, "row": {"revision": 0}})
+    one.apply(changed)
     assert '"count":1' in lab.says(olga, FOR_OPERATORS, {"op": "delete", **row_of_one})
     select = {"op": "select", "table": "Host", "where": []}
     assert "fabric" in hello_of(lab, two)

@@ -22,9 +22,9 @@ constexpr auto kReachedBy = 3s;
 
 // By these words the database says that it will not; all others may be those of a server in need.
 bool is_final(ovsdb::TransactionRefused const &refusal) {
-  constexpr std::array<std::string_view, 4> kFinal{"refuses to wait", "constraint violation",
+  constexpr std::array<std::string_view, 5> kFinal{"refuses to wait", "constraint violation",
                                                    "referential integrity violation",
-                                                   "permission error"};
+                                                   "permission error", "range error"};
   std::string_view const words(refusal.what());
   return std::ranges::any_of(kFinal,
                              [&](auto one) { return words.find(one) != std::string_view::npos; });
