@@ -64,9 +64,9 @@ class Partner:
                 self._vsctl("del-port", "far", port)
 
     def received(self) -> Dict[str, int]:
-        """How many frames came over each wire, whatever they are."""
+        """How many bytes came over each wire, of whatever frames."""
         said = json.loads(self._namespace.run("ip", "-json", "-stats", "link", "show"))
-        counts = {device["ifname"]: int(device["stats64"]["rx"]["packets"]) for device in said}
+        counts = {device["ifname"]: int(device["stats64"]["rx"]["bytes"]) for device in said}
         return {uplink: counts[wire.name] for uplink, wire in self._wires.items()}
 
     def rate_wanted(self) -> str:
