@@ -241,6 +241,10 @@ def test_a_host_without_its_daemon_changes_nothing_shared(
     assert other.call("VSDVS_SetMTU", "mine", 1700) == QEX_OK
     asks = "this is shared with other hosts, and no simhostd --fabric is there"
     assert asks in other.refusal({"switches": [{"alias": "lab", "mtu": 1700}]})
+    other.ctl("reset")
+    for replaced in "DVSState_ConfigReset", "DVSQEX_StateCleanup":
+        assert other.call(replaced) == QEX_OK
+        assert mtu(other) == 9000 and sorted(other.ports("lab")) == ["a", "b"]
     # It catches up after its absence, also from a state of long ago.
     kept(other, "old")
     assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
