@@ -6,7 +6,7 @@ import signal
 import socket
 import sqlite3
 import subprocess
-from typing import Any, Dict, Set, Tuple
+from typing import Any, Dict, List, Set, Tuple
 
 import pytest
 
@@ -370,8 +370,16 @@ def test_only_what_frames_leave_behind_is_asked_of_the_daemon(
         assert asking.returncode == 0
 
 
+@pytest.mark.parametrize(
+    "words, said",
+    [
+        (["show"], "switch lab: 3 of 128 ports"),
+        # It asks before what it changes is in the state, and after that.
+        (["disconnect", "lab", "a"], ""),
+    ],
+)
 def test_a_daemon_that_says_nothing_is_waited_for_once(
-    idle: Lab, monkeypatch: pytest.MonkeyPatch
+    idle: Lab, monkeypatch: pytest.MonkeyPatch, words: List[str], said: str
 ) -> None:
     idle.start()
     for port in "abc":
@@ -381,7 +389,7 @@ def test_a_daemon_that_says_nothing_is_waited_for_once(
         monkeypatch.chdir(idle.folder)
         line.bind(f"{idle.state.name}-simhostd")
         line.listen()
-        assert "switch lab: 3 of 128 ports" in idle.ctl("show")
+        assert said in idle.ctl(*words)
         line.setblocking(False)
         with line.accept()[0], pytest.raises(BlockingIOError):
             line.accept()

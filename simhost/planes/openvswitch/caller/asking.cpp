@@ -18,6 +18,9 @@ Json Asking::said(Json const &question) {
   }
   try {
     return ask(state_, question, kPatience);
+  } catch (NobodyListens const &) {
+    // To ask again costs nothing, and a daemon may have come.
+    throw;
   } catch (NoDaemon const &none) {
     none_ = none;
     throw;

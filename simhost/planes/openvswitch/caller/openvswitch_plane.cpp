@@ -16,7 +16,6 @@
 #include "model/properties/properties.h"
 #include "model/teaming/properties.h"
 #include "model/teaming/team.h"
-#include "planes/openvswitch/caller/patience.h"
 #include "planes/openvswitch/caller/switches_with_frames.h"
 #include "planes/openvswitch/line/line.h"
 #include "planes/openvswitch/multicast/address.h"
@@ -414,7 +413,7 @@ void OpenVswitchPlane::committed() noexcept {
     return;
   }
   try {
-    ask(file_, {{"ask", "in force"}, {"change", *prepared_}}, kPatience);
+    asking_.said({{"ask", "in force"}, {"change", *prepared_}});
   } catch (std::exception const &) {
     // It is pending then, which those who ask are told.
   }
@@ -428,7 +427,7 @@ InForce OpenVswitchPlane::in_force(storage::Transaction &transaction) {
   InForce all{.wanted = storage::frames_change(transaction), .done = std::nullopt, .said = {}};
   if (all.wanted) {
     try {
-      auto const reply = ask(file_, {{"ask", "status"}}, kPatience);
+      auto const reply = asking_.said({{"ask", "status"}});
       all.done = reply.at("change").get<std::uint64_t>();
       all.said = reply.at("said").get<std::string>();
     } catch (std::exception const &error) {
