@@ -71,9 +71,14 @@ std::optional<std::string> Bridges::elsewhere(std::string const &device) {
 
 void Bridges::fail_as_another_owns_it() {
   auto const &owner = present().owner;
-  bool const is_known = !owner.empty() && owner != told_.owner;
+  if (owner == told_.owner) {
+    // The server may hear of a new connection before it hears that the one of before has ended.
+    throw std::runtime_error(
+        "another one writes to this Open vSwitch, or this daemon's connection of before has not "
+        "ended yet");
+  }
   throw std::runtime_error(
-      fmt::format("{} writes to this Open vSwitch", is_known ? owner : "another one"));
+      fmt::format("{} writes to this Open vSwitch", owner.empty() ? "another one" : owner));
 }
 
 // Returns whether there were any.
