@@ -4,7 +4,7 @@ goes."""
 import os
 import subprocess
 from pathlib import Path
-from typing import List
+from typing import Dict
 
 from simhost._namespaces import Namespace
 
@@ -18,7 +18,7 @@ class LastingOpenVSwitch:
         self._namespace = namespace
         self._folder = folder
         self._options = ["--enable-dummy"] if clock_may_stand else []
-        self._processes: List["subprocess.Popen[str]"] = []
+        self._processes: Dict[str, "subprocess.Popen[str]"] = {}
 
     @property
     def where(self) -> str:
@@ -28,14 +28,21 @@ class LastingOpenVSwitch:
     def __enter__(self) -> "LastingOpenVSwitch":
         folder = self._folder
         folder.mkdir()
-        database, schema = f"{folder}/conf.db", "/usr/share/openvswitch/vswitch.ovsschema"
-        subprocess.run(["ovsdb-tool", "create", database, schema], check=True)
-        socket = f"{folder}/db.sock"
-        self._start("ovsdb-server", database, f"--remote=punix:{socket}")
-        while not os.path.exists(socket):
-            assert self._processes[0].poll() is None
-        self._start("ovs-vswitchd", self.where, "--disable-system", *self._options)
+        schema = "/usr/share/openvswitch/vswitch.ovsschema"
+        subprocess.run(["ovsdb-tool", "create", f"{folder}/conf.db", schema], check=True)
+        self._start_database()
+        self._start_switch()
         return self
+
+    def start_anew(self, *programs: str) -> None:
+        """Kills these of its two programs at once, and then starts them."""
+        for program in programs:
+            self._end(program)
+        if "ovsdb-server" in programs:
+            os.unlink(f"{self._folder}/db.sock")
+            self._start_database()
+        if "ovs-vswitchd" in programs:
+            self._start_switch()
 
     def stop_clock(self) -> None:
         """Which goes on no more but by warp()."""
@@ -51,17 +58,28 @@ class LastingOpenVSwitch:
         control = f"{self._folder}/ovs-vswitchd.ctl"
         return self._namespace.run("ovs-appctl", "-t", control, *words)
 
+    def _start_database(self) -> None:
+        socket = f"{self._folder}/db.sock"
+        self._start("ovsdb-server", f"{self._folder}/conf.db", f"--remote=punix:{socket}")
+        while not os.path.exists(socket):
+            assert self._processes["ovsdb-server"].poll() is None
+
+    def _start_switch(self) -> None:
+        self._start("ovs-vswitchd", self.where, "--disable-system", *self._options)
+
     def _start(self, program: str, *words: str) -> None:
         folder = str(self._folder)
         options = [f"--unixctl={folder}/{program}.ctl", f"--log-file={folder}/{program}.log"]
         environment = {**os.environ, "OVS_RUNDIR": folder}
-        self._processes.append(
-            self._namespace.start(
-                program, "-vconsole:off", "-vsyslog:off", *words, *options, env=environment
-            )
+        self._processes[program] = self._namespace.start(
+            program, "-vconsole:off", "-vsyslog:off", *words, *options, env=environment
         )
 
+    def _end(self, program: str) -> None:
+        process = self._processes.pop(program)
+        process.kill()
+        process.communicate()
+
     def __exit__(self, *_: object) -> None:
-        for process in reversed(self._processes):
-            process.kill()
-            process.communicate()
+        for program in reversed(list(self._processes)):
+            self._end(program)

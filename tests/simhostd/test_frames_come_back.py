@@ -113,10 +113,49 @@ def test_a_killed_daemon_leaves_nothing_running_and_another_takes_over(lab: Lab)
     assert not lab.processes()
 
 
+# Flows of many kinds.
+SETTINGS = {
+    "switches": [
+        {
+            "alias": "lab",
+            "teaming": {"balance": "mac", "active": ["nic0", "nic1"]},
+            "mac_learning": {"aging_time": 70000, "limit": 50},
+            "private_vlans": [
+                {"primary": 70, "secondary": 70, "type": "promiscuous"},
+                {"primary": 70, "secondary": 71, "type": "isolated"},
+            ],
+            "ports": [
+                {
+                    "id": "a",
+                    "mirror_sessions": [
+                        {"sid": "m", "to": [{"port": "c"}], "sent_by": [{"port": "a"}]}
+                    ],
+                },
+                {
+                    "id": "c",
+                    "vlan": {"trunk": ["7-9"]},
+                    "mac_learning": {"learning": True, "limit": 5, "limit_policy": "drop"},
+                },
+                {
+                    "id": "d",
+                    "vlan": {"id": 71, "private": True},
+                    "forbids": ["forged_transmits", "mac_changes"],
+                    "teaming": {"balance": "ip"},
+                },
+            ],
+        }
+    ]
+}
+
+
 def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> None:
+    idle.apply(SETTINGS)
+    idle.network("nic0", "nic1")
     with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
         idle.start(open_vswitch.where)
         one, other = idle.client("lab", "a"), idle.client("lab", "b")
+        for port in "cd":
+            idle.client("lab", port)
         assert one.comes_to_reach(other)
         with GoingFrames(one, other):
             idle.stop()
@@ -127,8 +166,28 @@ def test_a_restart_changes_no_flow_of_an_open_vswitch_that_stays(idle: Lab) -> N
             assert "in force" not in idle.log().replace(said, "")
             kept(before, counted(idle))
             # An unrelated change leaves what was counted and learned alone.
-            idle.set_port("lab", "c", vlan=9)
+            idle.set_port("lab", "e", vlan=9)
             kept(before, counted(idle))
+
+
+def test_an_open_vswitch_that_stays_may_be_started_anew(idle: Lab) -> None:
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
+        idle.start(open_vswitch.where)
+        one, other = idle.client("lab", "a"), idle.client("lab", "b")
+        assert one.comes_to_reach(other)
+        vlan = 0
+        for programs in (
+            ("ovs-vswitchd",),
+            ("ovsdb-server",),
+            ("ovs-vswitchd", "ovsdb-server"),
+        ):
+            open_vswitch.start_anew(*programs)
+            assert one.comes_to_reach(other)
+            vlan += 1
+            idle.set_port("lab", "a", vlan=vlan)
+            assert one.ceases_to_reach(other)
+            idle.set_port("lab", "b", vlan=vlan)
+            assert one.comes_to_reach(other)
 
 
 def test_frames_that_do_not_go_on_are_missed(lab: Lab) -> None:
