@@ -169,9 +169,9 @@ RunningBridge *Bridges::find(storage::SwitchKey key) const {
   return found == bridges_.end() ? nullptr : found->second.get();
 }
 
-void Bridges::count() {
+void Bridges::count(Devices devices) {
   for (auto const &[key, bridge] : bridges_) {
-    bridge->count(soon());
+    bridge->count(devices, soon());
     bridge->look_for_strays(soon());
   }
 }
@@ -247,7 +247,7 @@ Bridges::Applied Bridges::apply(Wanted const &wanted, Forget const &forget) {
   };
   for (auto const &bridge : bridges_) {
     if (goes(bridge)) {
-      bridge.second->count(deadline);
+      bridge.second->count(Devices::always, deadline);
     }
   }
   auto const rows = wanted_rows(wanted, present());

@@ -65,7 +65,7 @@ class Bridges {
   /// Sends frames from the bridge of a switch; returns whether there is one.
   bool send(storage::SwitchKey key, std::vector<openflow::PacketOut> const &frames);
   /// Tells what all bridges counted, and where addresses moved.
-  void count();
+  void count(Devices devices);
   /// Likewise of the bridge of a switch, unless that was told just before.
   void count(storage::SwitchKey key);
   /// What the bridge of a switch has learned.

@@ -300,7 +300,7 @@ void Daemon::sync() {
   }
   transaction.commit();
   if (counts_anew) {
-    bridges_->count();
+    bridges_->count(Devices::always);
   }
   // What was committed since members were heard is told all the same.
   bool const is_told = !follows_members || all.change != in_force_;

@@ -63,7 +63,7 @@ class Daemon {
   void leave_devices();
 
  private:
-  void count();
+  void count(Devices devices);
   void attempt(std::function<void()> const &work);
   void fail(std::string const &why);
   [[nodiscard]] RunningBridge::Told told_by_bridges();

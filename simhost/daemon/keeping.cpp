@@ -24,13 +24,13 @@ constexpr auto kBetweenSaves = 100ms;
 
 void Daemon::save() {
   age();
-  count();
+  count(Devices::always);
 }
 
-void Daemon::count() {
+void Daemon::count(Devices devices) {
   try {
     if (bridges_) {
-      bridges_->count();
+      bridges_->count(devices);
     }
   } catch (std::exception const &error) {
     fail(error.what());
@@ -123,7 +123,7 @@ void Daemon::look_at_wires() {
 
 void Daemon::count_from_now_on() {
   next_count_ = loop_.after(kBetweenCounts, [this] {
-    count();
+    count(Devices::now_and_then);
     balance();
     look_at_wires();
     count_from_now_on();

@@ -109,7 +109,7 @@ RunningBridge::RunningBridge(events::Loop &loop, Place const &place, Memory &mem
       {.packet_in = true, .port_status = true, .group_and_meter_changes = true}, monitors(),
       are_added ? openflow::PresentFlows::untold : openflow::PresentFlows::told, deadline);
   // What counted while nobody was here, before any of it is changed.
-  tell_counted(contents.flows, contents.port_statistics);
+  tell_counted(totals_of(contents.flows, contents.port_statistics, numbers_));
   for (auto const &port : contents.ports) {
     live_.follow(port);
   }
@@ -215,6 +215,9 @@ void RunningBridge::note_origin(Origin origin) {
 }
 
 void RunningBridge::look_for_strays(Deadline deadline) {
+  if (!totals_.has_recent_sources()) {
+    return;
+  }
   for (auto const &entry :
        connection_.flows({.table = openvswitch::table::kRecentSources}, deadline)) {
     note_origin(taught_.origin_of(entry));
@@ -222,21 +225,19 @@ void RunningBridge::look_for_strays(Deadline deadline) {
   follow_events();
 }
 
-void RunningBridge::tell_counted(std::span<openflow::FlowEntry const> flows,
-                                 std::span<openflow::PortStatistics const> ports) {
-  told_.counted(key_, totals_of(flows, ports, numbers_), sessions_);
+void RunningBridge::tell_counted(openvswitch::Totals const &totals) {
+  told_.counted(key_, totals, sessions_);
   counted_ = Deadline::clock::now();
 }
 
-void RunningBridge::count(Deadline deadline) {
-  auto const flows = counting_flows(connection_, deadline);
-  tell_counted(flows, connection_.port_statistics(openflow::kAnyPort, deadline));
+void RunningBridge::count(Devices devices, Deadline deadline) {
+  tell_counted(totals_.ask(connection_, devices, numbers_, deadline));
   follow_events();
 }
 
 void RunningBridge::count_anew(Deadline deadline) {
   if (counted_ + kCountsLast < Deadline::clock::now()) {
-    count(deadline);
+    count(Devices::always, deadline);
   }
 }
 
@@ -329,7 +330,7 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
     std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
   }
   if (sessions_ != wanted.sessions || ends_counting(difference)) {
-    count(deadline);
+    count(Devices::always, deadline);
   }
   meters_.add(connection_, difference.added_flows, deadline);
   if (!is_new) {
@@ -344,6 +345,7 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
     changes.emplace_back(
         openflow::FlowChange{.command = FlowCommand::remove_strict, .flow = gate()});
   }
+  totals_.forget();
   if (!changes.empty()) {
     auto const forget_it = forget ? [&] { return forget(name_, change); } : std::function<bool()>();
     try {

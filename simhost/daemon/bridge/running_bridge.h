@@ -76,7 +76,7 @@ class RunningBridge {
                     openvswitch::Deadline deadline);
   void send(std::vector<openflow::PacketOut> const &frames, openvswitch::Deadline deadline);
   /// Tells what it counted.
-  void count(openvswitch::Deadline deadline);
+  void count(Devices devices, openvswitch::Deadline deadline);
   /// Likewise, unless that was told just before.
   void count_anew(openvswitch::Deadline deadline);
   /// Looks for what strayed where so much comes and goes that nobody follows it.
@@ -92,8 +92,7 @@ class RunningBridge {
  private:
   // What is there once it is told of changes, so that none is missed.
   void take(openflow::Contents contents);
-  void tell_counted(std::span<openflow::FlowEntry const> flows,
-                    std::span<openflow::PortStatistics const> ports);
+  void tell_counted(openvswitch::Totals const &totals);
   void add_relearned(WantedBridge const &wanted, openvswitch::Difference &difference,
                      openvswitch::Deadline deadline);
   void add_renewed(WantedBridge const &wanted, openvswitch::Difference &difference,
@@ -128,6 +127,7 @@ class RunningBridge {
   LivePorts live_;
   std::set<std::string> aggregated_;  // devices that are in groups
   std::set<openflow::Port> uplinks_;  // that are chosen from by their links
+  BridgeTotals totals_;
   openvswitch::Deadline counted_{};
   std::size_t added_ahead_ = 0;  // of flows and groups, before what it has was read
   bool is_closed_ = false;       // by gate()

@@ -355,6 +355,12 @@ TEST(OpenFlow, CountsFrames) {
   EXPECT_EQ(port.port, 1);
   EXPECT_EQ(port.sent.packets, 2);
   EXPECT_EQ(connection.port_statistics(kAnyPort, soon()).size(), 3);
+
+  std::vector<FlowFilter> const tables{{1}, {0}};
+  auto const sums = connection.sums_of(tables, true, soon());
+  EXPECT_THAT(sums.flows, testing::ElementsAre(Aggregate{}, Aggregate{{2, 2 * kFrame}, 1}));
+  EXPECT_EQ(sums.ports.size(), 3);
+  EXPECT_EQ(connection.sums_of(tables, false, soon()).ports.size(), 0);
 }
 
 TEST(OpenFlow, DescribesPorts) {

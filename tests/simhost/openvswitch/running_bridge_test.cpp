@@ -151,7 +151,7 @@ INSTANTIATE_TEST_SUITE_P(
     All, ARunningBridgeThatIsAsked,
     testing::Values(
         Asked{"Send", [](RunningBridge &running) { running.send({}, soon()); }},
-        Asked{"Count", [](RunningBridge &running) { running.count(soon()); }},
+        Asked{"Count", [](RunningBridge &running) { running.count(Devices::always, soon()); }},
         Asked{"Strays", [](RunningBridge &running) { running.look_for_strays(soon()); }},
         Asked{"Learned", [](RunningBridge &running) { std::ignore = running.learned(soon()); }},
         Asked{"Age", [](RunningBridge &running) { std::ignore = running.age(soon()); }}),

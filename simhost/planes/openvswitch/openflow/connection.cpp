@@ -420,6 +420,31 @@ std::vector<FlowEntry> Connection::flows_of(std::span<FlowFilter const> filters,
       take_flow, deadline);
 }
 
+Sums Connection::sums_of(std::span<FlowFilter const> filters, bool are_ports_asked,
+                         Deadline deadline) {
+  Writer out;
+  auto xid = xid_;
+  for (auto const &filter : filters) {
+    put_flows_request(out, next_xid(), MultipartType::aggregate, filter);
+  }
+  auto const ports = xid_ + 1;
+  if (are_ports_asked) {
+    put_ports_request(out, next_xid(), MultipartType::port_statistics, kAnyPort);
+  }
+  send(out);
+  Sums sums;
+  while (++xid != ports) {
+    take_items(xid, take_aggregate, sums.flows, deadline);
+  }
+  if (sums.flows.size() != filters.size()) {
+    throw Malformed("the sums of flows are not those that were asked for");
+  }
+  if (are_ports_asked) {
+    take_items(ports, take_port_statistics, sums.ports, deadline);
+  }
+  return sums;
+}
+
 std::vector<PortStatistics> Connection::port_statistics(Port port, Deadline deadline) {
   return ask<PortStatistics>(
       [&](Writer &out, Xid xid) {

@@ -81,6 +81,8 @@ class Connection {
   std::vector<FlowEntry> flows(FlowFilter const &filter, Deadline deadline);
   /// Of one filter after the other.
   std::vector<FlowEntry> flows_of(std::span<FlowFilter const> filters, Deadline deadline);
+  /// One sum of each filter, in a part of the time that its flows take; of all ports, if asked.
+  Sums sums_of(std::span<FlowFilter const> filters, bool are_ports_asked, Deadline deadline);
   std::vector<PortStatistics> port_statistics(Port port, Deadline deadline);
   std::vector<PortDescription> ports(Deadline deadline);
   std::vector<GroupEntry> groups(Deadline deadline);

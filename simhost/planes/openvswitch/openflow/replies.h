@@ -42,6 +42,8 @@ struct FlowEntry : ReadFlow {
 struct Aggregate {
   Traffic traffic;
   std::uint32_t flows = 0;
+
+  friend bool operator==(Aggregate const &, Aggregate const &) = default;
 };
 
 struct GroupEntry {
@@ -120,6 +122,12 @@ struct FlowUpdate : ReadFlow {
 
   Event event{};
   FlowRemoved::Reason reason{};  // of a removal
+};
+
+/// What flows counted together, those of one filter after the other, and ports by themselves.
+struct Sums {
+  std::vector<Aggregate> flows;
+  std::vector<PortStatistics> ports;
 };
 
 /// What a switch has, and what it counted.
