@@ -328,6 +328,22 @@ def test_without_a_majority_nothing_is_changed(
         assert comes_true(lambda: "it has lost the majority of its cluster" in why_not(told))
 
 
+def test_a_first_server_that_hangs_hides_nothing(tmp_path: Path) -> None:
+    with FabricLab(tmp_path, servers=3) as lab:
+        populate(lab.databases)
+        servers = lab.databases.local_addresses
+        with Fabric(servers) as fabric, Fabric(servers) as other:
+            assert mtu(fabric) is None
+            lab.databases.pause_first()
+            other.plan(of_lab(mtu=1600)).apply()
+            assert mtu(fabric) == 1600
+            # What it has still to learn nobody sees.
+            lab.databases.resume(0)
+            for _ in range(3):
+                fabric.close()
+                assert mtu(fabric) == 1600
+
+
 def test_a_fabric_of_another_version_is_none(tmp_path: Path) -> None:
     schema = tmp_path / "other.ovsschema"
     text = SCHEMA.read_text(encoding="utf-8")

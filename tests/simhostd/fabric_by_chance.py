@@ -149,7 +149,7 @@ class Disturbed:
             return
         host = self._chance.choice(self._lab.hosts)
         disturbances = [
-            *(self._kill_database, self._pause, self._cut, self._kill_daemon),
+            *(self._kill_database, self._pause, self._hang, self._cut, self._kill_daemon),
             *(self._slow, self._hold, self._repeat, self._cut_in_a_message, self._restore),
         ]
         self._chance.choice(disturbances)(host)
@@ -179,6 +179,17 @@ class Disturbed:
         self._lab.databases.pause()
         time.sleep(self._chance.random())
         self._lab.databases.resume()
+
+    def _hang(self, _: Host) -> None:
+        databases = self._lab.databases
+        server = self._chance.choice(databases.running())
+        databases.pause(server)
+
+        def resume() -> None:
+            if server in databases.running():
+                databases.resume(server)
+
+        self._mends.append(resume)
 
     def _cut(self, host: Host) -> None:
         self._lab.cut(host)

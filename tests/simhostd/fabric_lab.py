@@ -10,7 +10,7 @@ import sys
 import uuid
 from contextlib import ExitStack, closing
 from pathlib import Path
-from typing import Any, Dict, List, Mapping, Optional
+from typing import Any, Dict, List, Mapping, Optional, Sequence
 
 from simhost._namespaces import PATIENCE, Namespace, own_user_needed
 
@@ -101,14 +101,22 @@ class Databases:
     def processes(self) -> List[int]:
         return [process.pid for process in self._running.values()]
 
-    def pause(self) -> None:
-        """They go on listening."""
-        for process in self._running.values():
-            process.send_signal(signal.SIGSTOP)
+    def pause(self, *servers: int) -> None:
+        """These, or all of them. They go on listening."""
+        self._signal(signal.SIGSTOP, servers)
 
-    def resume(self) -> None:
-        for process in self._running.values():
-            process.send_signal(signal.SIGCONT)
+    def resume(self, *servers: int) -> None:
+        self._signal(signal.SIGCONT, servers)
+
+    def _signal(self, number: signal.Signals, servers: Sequence[int]) -> None:
+        for server in servers or self.running():
+            self._running[server].send_signal(number)
+
+    def pause_first(self) -> None:
+        """The others have a leader when this returns."""
+        self.pause(0)
+        others = self.running()[1:]
+        assert comes_true(lambda: any(self.tells("leader", one) for one in others))
 
     def leader(self) -> int:
         """The one that says so."""

@@ -70,6 +70,25 @@ def test_a_majority_decides(lab: FabricLab, two: Tuple[Host, Host]) -> None:
         assert lab.databases.settings("Switch")["mtu"] == 1800
 
 
+def test_a_first_server_that_hangs_keeps_nobody(lab: FabricLab, two: Tuple[Host, Host]) -> None:
+    one, other = two
+    assert all("192.0.2.1:6640" in host.ctl("fabric") for host in two)
+    lab.databases.pause_first()
+    third = lab.host("three")
+    third.start()
+    assert one.call("VSDVS_SetMTU", "lab", 1600) == QEX_OK
+    # Nobody asks for anything there, and who hangs does not say so.
+    assert comes_true(lambda: mtu(other) == 1600)
+    assert comes_true(lambda: "in the fabric at" in third.ctl("fabric")), third.log()
+    # What the server has still to learn nobody follows.
+    lab.databases.resume(0)
+    other.stop()
+    started(other)
+    assert mtu(other) == 1600
+    assert one.call("VSDVS_SetMTU", "lab", 1700) == QEX_OK
+    assert comes_true(lambda: mtu(other) == 1700)
+
+
 def test_nobody_knows_and_then_it_is_decided(lab: FabricLab, two: Tuple[Host, Host]) -> None:
     one, other = two
     # Servers that hear of it, and say nothing.

@@ -132,6 +132,16 @@ class Cluster:
             self.disconnect()
             raise
 
+    def catch_up(self) -> None:
+        """Has all that the server knows by now: one that hangs tells nothing by itself."""
+        assert self._server is not None
+        try:
+            self._server.request("echo", [], time.monotonic() + _PATIENCE)
+            self._take_all(self._server.news(0))
+        except Unreachable:
+            self.disconnect()
+            raise
+
     def follow(self, deadline: float) -> bool:
         """Waits for news of the rows; returns whether there were any."""
         assert self._server is not None

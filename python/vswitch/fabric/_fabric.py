@@ -2,6 +2,7 @@
 
 import re
 import time
+from contextlib import suppress
 from typing import Callable, Iterator, List, Optional, Sequence, Tuple
 
 import ovs.stream
@@ -65,7 +66,8 @@ class Fabric:
     def view(self) -> View:
         """All that it has now. Raises Unreachable if no server tells."""
         if self._cluster.is_connected:
-            self._follow(time.monotonic())
+            with suppress(Unreachable):
+                self._cluster.catch_up()
         self._cluster.connect(time.monotonic() + _PATIENCE)
         return view_of(self._cluster.rows)
 

@@ -28,6 +28,8 @@ constexpr events::Clock::duration kLongestWait = 50ms;
 constexpr auto kLongestDecision = 10s;
 // A server is looked for that long before callers are refused.
 constexpr auto kElection = 3s;
+// A server that hangs tells of nothing, and one without news does not either.
+constexpr events::Clock::duration kBetweenQuestions = 5s;
 
 // Of a change that is not known to be made.
 Json told(Proposal const &proposal, Decision const &decision) {
@@ -54,6 +56,7 @@ Member::Member(events::Loop &loop, Options options, Say say)
       touched_(options_.host) {
   next_connect_ = loop_.after({}, [this] { connect(); });
   tell_counts_later();
+  ask_server_later();
 }
 
 // The connection.
@@ -113,6 +116,21 @@ void Member::receive() {
   } catch (std::runtime_error const &error) {
     lose(error.what());
   }
+}
+
+void Member::ask_server_later() {
+  next_question_ = loop_.after(kBetweenQuestions, [this] {
+    ask_server_later();
+    if (claim_.speaks()) {
+      try {
+        cluster_.require_reply(from_now(kPatience));
+        // The reply may have come with news.
+        receive();
+      } catch (std::runtime_error const &error) {
+        lose(error.what());
+      }
+    }
+  });
 }
 
 bool Member::take_news() {

@@ -60,6 +60,7 @@ class Member {
   void lose(std::string const &why);
   void watch();
   void receive();
+  void ask_server_later();
   void settle_undecided();
 
   void sync_soon(events::Clock::duration wait = {});
@@ -114,6 +115,7 @@ class Member {
   std::vector<events::Loop::Watch> watches_;
   events::Loop::Timer next_connect_;
   events::Clock::duration pause_{};  // before it
+  events::Loop::Timer next_question_;
   events::Loop::Timer next_sync_;
   events::Clock::duration next_wait_{};
   events::Clock::duration state_pause_{};  // while the state takes nothing

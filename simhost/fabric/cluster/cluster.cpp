@@ -155,4 +155,8 @@ Json Cluster::transact(Json const &operations, Deadline deadline) {
   return guarded([&] { return connection_->database.transact(operations, deadline); });
 }
 
+void Cluster::require_reply(Deadline deadline) {
+  guarded([&] { connection_->database.echo(deadline); });
+}
+
 }  // namespace simhost::fabric

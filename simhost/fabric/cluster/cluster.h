@@ -56,6 +56,9 @@ class Cluster {
   std::vector<ovsdb::RowChange> receive();
   /// As ovsdb::Client does: throws TransactionRefused, too.
   Json transact(Json const &operations, Deadline deadline);
+  /// Returns when the server has replied: the kernel keeps up a connection for one that hangs. What
+  /// came with the reply is for receive().
+  void require_reply(Deadline deadline);
   [[nodiscard]] ovsdb::Replica const &replica() const { return connection_->database.replica(); }
   /// The server that is talked to.
   [[nodiscard]] std::string server() const;

@@ -189,6 +189,10 @@ std::string Client::version(Deadline deadline) {
   return member_text(call("get_schema", Json::array({database_}), deadline), "version");
 }
 
+void Client::echo(Deadline deadline) {
+  call("echo", Json::array(), deadline);
+}
+
 bool Client::lock(std::string const &name, Deadline deadline) {
   auto const result = call("lock", Json::array({name}), deadline);
   auto const found = result.is_object() ? result.find("locked") : result.end();

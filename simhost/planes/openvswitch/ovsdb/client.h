@@ -89,6 +89,8 @@ class Client {
   [[nodiscard]] Replica const &replica() const { return replica_; }
   /// Of the database's schema, such as "1.0.0".
   std::string version(Deadline deadline);
+  /// Returns when the server has replied to nothing in particular.
+  void echo(Deadline deadline);
   /// Returns when the database has sent something by itself.
   void wait_for_news(Deadline deadline);
 
