@@ -79,7 +79,8 @@ def test_what_was_learned_is_cleared_and_gives_way(lab: Lab) -> None:
     assert change(lab, whatever_it_is, whatever_it_is) == [[DONE, *NOWHERE], [NOT_FOUND, *NOWHERE]]
     learn(clients, LEARNED)
     come_to(clients, "a", "c", b"learned again")
-    assert change(lab, ("Set", "b", USER, LEARNED)) == [[DONE, *NOWHERE]]
-    come_to(clients, "b", "c", b"put elsewhere")
-    assert change(lab, ("Clear", "b", USER, LEARNED)) == [[DONE, *NOWHERE]]
-    come_to(clients, "c", "b", b"nowhere")
+    for kind in USER, STATIC:
+        assert change(lab, ("Set", "b", kind, LEARNED)) == [[DONE, *NOWHERE]]
+        come_to(clients, "b", "c", b"put elsewhere")
+        assert change(lab, ("Clear", "b", kind, LEARNED)) == [[DONE, *NOWHERE]]
+        come_to(clients, "c", "b", b"nowhere")

@@ -7,8 +7,10 @@ from typing import Iterator, List
 
 import pytest
 
-from frame_lab import Lab, comes_true
+from counted_frames import MULTICAST, come_to, counters, send
+from frame_lab import Lab, comes_sooner_or_later, comes_true
 from lasting_open_vswitch import LastingOpenVSwitch
+from simhost import frame
 
 
 # The tables that a switch fills by itself, with the kind that their cookies begin with.
@@ -83,6 +85,45 @@ def test_flows_and_groups_are_put_right(
     meddler.ofctl(command, *words)
     assert comes_true(lambda: (meddler.flows(), meddler.groups()) == before)
     assert f"somebody else changed flows or groups of the bridge {meddler.bridge}" in busy.log()
+
+
+def test_what_was_counted_stays(lab: Lab) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.comes_to_reach(other)
+    meddler = Meddler(lab)
+    before, counted = meddler.flows(), 0
+
+    def count(times: int) -> None:
+        nonlocal counted
+        counted += times
+        send(one, times, MULTICAST)
+        come_to(lambda: counters(lab, "a").get("pktsInMulticast", 0), counted)
+
+    count(3)
+    meddler.ofctl("del-flows")
+    assert comes_true(lambda: meddler.flows() == before)
+    assert one.comes_to_reach(other)
+    count(4)
+    meddler.vsctl("del-br", meddler.bridge)
+    assert one.comes_to_reach(other)
+    count(5)
+
+
+@pytest.mark.parametrize("words", [["del-flows"], ["del-flows", "table=31"], []])
+def test_who_says_nothing_is_reached_after_it(lab: Lab, words: List[str]) -> None:
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+    assert one.comes_to_reach(other)
+    # It is not to ask who was there.
+    other.run("ip", "neighbour", "flush", "dev", "eth0")
+    meddler = Meddler(lab)
+    before = meddler.learned(31)
+    assert len(before) == 2
+    if words:
+        meddler.ofctl(*words)
+    else:
+        meddler.vsctl("del-br", meddler.bridge)
+    assert comes_sooner_or_later(one, other, frame(other.mac, one.mac, payload=b"are you there?"))
+    assert comes_true(lambda: meddler.learned(31) == before)
 
 
 def has_learned_all(meddler: Meddler, table: int) -> bool:

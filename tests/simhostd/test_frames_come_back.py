@@ -205,10 +205,12 @@ def come_to_count_more(lab: Lab) -> None:
 
 
 def counted(lab: Lab) -> Dict[str, int]:
-    """How many frames each flow counted, but for the one that says which change is in force."""
+    """How many frames each flow counted, but for the one that says which change is in force, and
+    those that are there for a while."""
     found = (re.fullmatch(r"(.*), n_packets=(\d+), n_bytes=\d+(.*)", one) for one in lab.flows())
     flows = {one.group(1) + one.group(3): int(one.group(2)) for one in found if one}
-    return {flow: count for flow, count in flows.items() if "table=250" not in flow}
+    left_out = re.compile("table=250|_timeout=")
+    return {flow: count for flow, count in flows.items() if not left_out.search(flow)}
 
 
 def kept(before: Dict[str, int], after: Dict[str, int]) -> None:

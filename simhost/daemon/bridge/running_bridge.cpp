@@ -164,7 +164,7 @@ void RunningBridge::read_events() {
   }
 }
 
-void RunningBridge::follow_events() {
+void RunningBridge::follow_events(Doer doer) {
   bool is_altered = false;
   bool has_lived = false;
   while (auto const event = connection_.next_event()) {
@@ -178,7 +178,7 @@ void RunningBridge::follow_events() {
     }
     auto const *const update = std::get_if<openflow::FlowUpdate>(&*event);
     if (update != nullptr && openvswitch::table::is_learned(update->flow.table)) {
-      follow_learned(*update);
+      follow_learned(*update, doer);
     } else if (update != nullptr) {
       is_altered = is_altered || update->event != openflow::FlowUpdate::Event::own;
     } else if (std::holds_alternative<openflow::GroupsOrMetersChanged>(*event)) {
@@ -193,7 +193,16 @@ void RunningBridge::follow_events() {
   }
 }
 
-void RunningBridge::follow_learned(openflow::FlowUpdate const &update) {
+void RunningBridge::follow_learned(openflow::FlowUpdate const &update, Doer doer) {
+  bool const is_taken = update.event == openflow::FlowUpdate::Event::removed &&
+                        update.reason == openflow::FlowRemoved::Reason::removed &&
+                        doer == Doer::others;
+  if (is_taken) {
+    if (memory_.miss(key_, update.flow)) {
+      note_origin(Origin::foreign);
+    }
+    return;
+  }
   if (auto const port = memory_.follow(key_, update)) {
     told_.moved(key_, *port);
   }
@@ -247,8 +256,6 @@ void RunningBridge::add_relearned(WantedBridge const &wanted, openvswitch::Diffe
   if (difference.forgotten.empty()) {
     return;
   }
-  connection_.receive();
-  follow_events();
   openvswitch::Teachers const teachers(wanted.flows->flows,
                                        {difference.forgotten.begin(), difference.forgotten.end()});
   for (auto const &learned : difference.forgotten) {
@@ -305,6 +312,9 @@ std::vector<Flow> RunningBridge::learned_elsewhere(
 std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t change,
                                  std::set<std::string> const &added, Forget const &forget,
                                  Deadline deadline) {
+  // What others did is told before what is done here.
+  connection_.receive();
+  follow_events();
   // A bridge without a marker was made just before.
   bool const is_new = !change_;
   memory_.follow_devices(key_, wanted.ports);
@@ -327,6 +337,8 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
     if (aging_ != wanted.aging && !forgets) {
       add_renewed(wanted, difference, deadline);
     }
+    std::ranges::move(memory_.missed(key_, wanted.flows->flows),
+                      std::back_inserter(difference.added_flows));
     std::ranges::copy(first_addresses(wanted, added), std::back_inserter(difference.forgotten));
   }
   if (sessions_ != wanted.sessions || ends_counting(difference)) {
@@ -361,7 +373,7 @@ std::size_t RunningBridge::apply(WantedBridge const &wanted, std::uint64_t chang
     }
     have(wanted.flows);
     change_ = change;
-    follow_events();
+    follow_events(Doer::this_connection);
   }
   numbers_ = wanted.numbers;
   sessions_ = wanted.sessions;
@@ -402,7 +414,7 @@ bool RunningBridge::forget_learned(std::uint32_t port, KnownAddress const &addre
   openflow::Changes changes;
   add_removals(flows, changes);
   connection_.change(changes, deadline);
-  follow_events();
+  follow_events(Doer::this_connection);
   return true;
 }
 
@@ -420,7 +432,7 @@ std::vector<Source> RunningBridge::age(Deadline deadline) {
   });
   if (!changes.empty()) {
     connection_.change(changes, deadline);
-    follow_events();
+    follow_events(Doer::this_connection);
   }
   return sources;
 }

@@ -101,9 +101,11 @@ class RunningBridge {
       openvswitch::Difference const &difference) const;
   std::vector<openflow::Flow> learned_flows(openvswitch::LearnedFlows const &learned,
                                             openvswitch::Deadline deadline);
+  // Who did what the switch tells of.
+  enum class Doer { others, this_connection };
   void read_events();
-  void follow_events();
-  void follow_learned(openflow::FlowUpdate const &update);
+  void follow_events(Doer doer = Doer::others);
+  void follow_learned(openflow::FlowUpdate const &update, Doer doer);
   void note_origin(Origin origin);
   void have(Flows flows);
 

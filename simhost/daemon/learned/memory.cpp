@@ -126,7 +126,7 @@ void Memory::note(storage::SwitchKey key, Known const &known, bool is_known) {
 template <typename IsGone>
 void Memory::remove(storage::SwitchKey key, IsGone const &is_gone) {
   std::erase_if(of_bridge(key).flows, [&](auto const &flow) {
-    bool const goes = is_gone(flow.second.flow);
+    bool const goes = is_gone(flow.second);
     if (goes) {
       note(key, flow.second, false);
     }
@@ -155,6 +155,7 @@ std::optional<std::uint32_t> Memory::follow(storage::SwitchKey key,
       known != flows.end() && openvswitch::number_of(known->second.flow.cookie) != port;
   if (known != flows.end()) {
     known->second.flow = update.flow;
+    known->second.is_missed = false;
     if (is_elsewhere) {
       note(key, known->second, true);
     }
@@ -172,12 +173,24 @@ std::optional<std::uint32_t> Memory::follow(storage::SwitchKey key,
              : std::nullopt;
 }
 
+bool Memory::miss(storage::SwitchKey key, Flow const &flow) {
+  auto &flows = of_bridge(key).flows;
+  auto const known = flows.find(openflow::place(flow));
+  if (known == flows.end()) {
+    return false;
+  }
+  known->second.is_missed = true;
+  return true;
+}
+
 void Memory::replace(storage::SwitchKey key, std::span<Flow const> flows) {
   std::set<Place> there;
   for (auto const &flow : flows) {
     there.insert(openflow::place(flow));
   }
-  remove(key, [&](Flow const &flow) { return !there.contains(openflow::place(flow)); });
+  remove(key, [&](Known const &known) {
+    return !known.is_missed && !there.contains(openflow::place(known.flow));
+  });
   for (auto const &flow : flows) {
     openflow::FlowUpdate update;
     update.flow = flow;
@@ -194,15 +207,15 @@ void Memory::follow_devices(storage::SwitchKey key,
   for (auto const &[device, port] : std::exchange(known, devices)) {
     auto const now = devices.find(device);
     if (now == devices.end() || now->second != port) {
-      remove(key, [gone = port](Flow const &flow) {
-        return openvswitch::number_of(flow.cookie) == gone;
+      remove(key, [gone = port](Known const &one) {
+        return openvswitch::number_of(one.flow.cookie) == gone;
       });
     }
   }
 }
 
 void Memory::forget(storage::SwitchKey key) {
-  remove(key, [](Flow const &) { return true; });
+  remove(key, [](Known const &) { return true; });
 }
 
 void Memory::keep(std::set<storage::SwitchKey> const &switches) {
@@ -309,7 +322,7 @@ std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> w
       aged.insert(openflow::place(where_learned(known.flow)));
     }
   }
-  remove(key, [&](Flow const &flow) { return aged.contains(openflow::place(flow)); });
+  remove(key, [&](Known const &known) { return aged.contains(openflow::place(known.flow)); });
   std::vector<Flow> recalled;
   openvswitch::Teachers const teachers(wanted);
   for (auto const &[place, known] : of_bridge(key).flows) {
@@ -318,6 +331,26 @@ std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> w
     }
   }
   return recalled;
+}
+
+std::vector<Flow> Memory::missed(storage::SwitchKey key, std::span<Flow const> wanted) const {
+  std::vector<Flow> flows;
+  auto const bridge = bridges_.find(key);
+  if (bridge == bridges_.end()) {
+    return flows;
+  }
+  std::optional<openvswitch::Teachers> teachers;
+  for (auto const &[place, known] : bridge->second.flows) {
+    if (known.is_missed) {
+      if (!teachers) {
+        teachers.emplace(wanted);
+      }
+      if (auto again = relearned(*teachers, known.flow)) {
+        flows.push_back(*std::move(again));
+      }
+    }
+  }
+  return flows;
 }
 
 std::vector<Flow> Memory::with_other_timeouts(storage::SwitchKey key,

@@ -38,7 +38,10 @@ class Memory {
   /// A bridge was told, or learned, a flow of a table that it fills by itself; or lost one. Returns
   /// the port at which an address is learned that was learned elsewhere; 0 beyond the uplinks.
   std::optional<std::uint32_t> follow(storage::SwitchKey key, openflow::FlowUpdate const &update);
-  /// A bridge has these flows in its tables, and what it was known to have besides it has lost.
+  /// Somebody took a flow from a bridge, which is to have it again. Returns whether it was known.
+  bool miss(storage::SwitchKey key, openflow::Flow const &flow);
+  /// A bridge has these flows in its tables, and what it was known to have besides it has lost, but
+  /// for what is missed.
   void replace(storage::SwitchKey key, std::span<openflow::Flow const> flows);
   /// The devices of a bridge, with the numbers of their ports. What was learned at a port that has
   /// another device than before is forgotten.
@@ -68,6 +71,9 @@ class Memory {
   [[nodiscard]] std::vector<openflow::Flow> recall(storage::SwitchKey key,
                                                    std::span<openflow::Flow const> wanted,
                                                    std::chrono::seconds aging, storage::SeenAt now);
+  /// What is missed of what a bridge knows that is to have these flows.
+  [[nodiscard]] std::vector<openflow::Flow> missed(storage::SwitchKey key,
+                                                   std::span<openflow::Flow const> wanted) const;
   /// What a bridge knows for another time than these flows would teach it.
   [[nodiscard]] std::vector<openflow::Flow> with_other_timeouts(
       storage::SwitchKey key, std::span<openflow::Flow const> wanted) const;
@@ -82,6 +88,7 @@ class Memory {
   struct Known {
     openflow::Flow flow;
     Sighting seen = {};  // of a source
+    bool is_missed = false;
   };
 
   struct OfBridge {

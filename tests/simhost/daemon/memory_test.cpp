@@ -59,4 +59,18 @@ TEST_F(TheMemory, ForgetsSwitchesThatAreGoneAndNoOthers) {
   EXPECT_THAT(remembered_of(gone), SizeIs(1)) << "a switch of which nobody knows anything any more";
 }
 
+TEST_F(TheMemory, KeepsWhatSomebodyTookUntilItIsThereAgain) {
+  auto const key = add_switch("lab");
+  memory.follow_devices(key, {});
+  auto const learned = memory.learned_at(key, kBeyond);
+  ASSERT_THAT(learned, SizeIs(1));
+  EXPECT_TRUE(memory.miss(key, learned.front()));
+  memory.replace(key, {});
+  EXPECT_THAT(memory.learned_at(key, kBeyond), SizeIs(1));
+  memory.replace(key, learned);
+  memory.replace(key, {});
+  EXPECT_THAT(memory.learned_at(key, kBeyond), SizeIs(0));
+  EXPECT_FALSE(memory.miss(key, learned.front()));
+}
+
 }  // namespace
