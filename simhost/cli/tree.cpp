@@ -197,7 +197,7 @@ Branch switch_branch(Json const &host_switch) {
   if (host_switch.contains("fabric")) {
     auto const &fabric = host_switch["fabric"];
     branches.push_back(
-        {fmt::format("{}: {} with the key {} to {}", fabric["uplink"].get<std::string>(),
+        {fmt::format("{}: {} with the key {} among {}", fabric["uplink"].get<std::string>(),
                      fabric["encapsulation"].get<std::string>(), fabric["key"].get<std::int64_t>(),
                      fabric["peers"].empty() ? "nobody" : joined(fabric["peers"]))});
   }

@@ -23,7 +23,7 @@ inline constexpr std::array kFabricMembers{
                           "the number by which the hosts of the switch know its frames"),
     form::required_member(
         "peers", form::list<form::VectorField<&FabricSpec::peers>>(kPeer, storage::kMostTunnels),
-        "the addresses of the other hosts"),
+        "the addresses of all hosts of the switch"),
     form::sparse(kUplink, text_member<&FabricSpec::uplink>(),
                  "what its uplink is called, chosen by the host unless given"),
 };

@@ -83,10 +83,7 @@ Json to_json(storage::Fabric const &fabric) {
   FabricSpec members{.uplink = fabric.uplink,
                      .encapsulation = fabric.encapsulation,
                      .key = fabric.key,
-                     .peers = {}};
-  for (auto const &tunnel : fabric.tunnels) {
-    members.peers.push_back(tunnel.peer);
-  }
+                     .peers = fabric.peers};
   Json said = Json::object();
   add_members(said, kFabricMembers, &members);
   return said;

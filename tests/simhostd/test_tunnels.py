@@ -231,7 +231,7 @@ def test_a_host_tells_of_its_tunnels(rack: Rack, clients: List[Client]) -> None:
     host = rack.hosts[0]
     shown = host.ctl("show")
     assert "underlay 192.0.2.1/24 at eth1" in shown
-    assert "fabric0: vxlan with the key 4711 to 192.0.3.1, 192.0.4.1" in shown
+    assert "fabric0: vxlan with the key 4711 among 192.0.3.1, 192.0.4.1" in shown
     assert "sends over fabric0" in shown
     told = host.ctl("trace", "lab/a", f"dst={ALL}", f"src={clients[0].mac}")
     assert "goes out at uplink fabric0 to 192.0.3.1, without a tag" in told

@@ -1,4 +1,4 @@
-// A key is one switch's, and no peer is this host.
+// A key is one switch's, and a peer is a host.
 #include "model/fabric/fabric.h"
 
 #include <fmt/format.h>
@@ -32,21 +32,17 @@ bool is_of_a_host(AddressBytes const &address) {
 void require_host(AddressBytes const &address) {
   if (!is_of_a_host(address)) {
     throw Refused(QEX_INVALID_ADDRESS,
-                  fmt::format("{} is the address of no other host", ip_text(address)));
+                  fmt::format("{} is the address of no host", ip_text(address)));
   }
 }
 
-void check_peers(storage::Transaction &transaction, std::vector<AddressBytes> const &peers) {
+void check_peers(std::vector<AddressBytes> const &peers) {
   if (peers.size() > storage::kMostTunnels) {
     throw Refused(QEX_LIMIT_EXCEEDED);
   }
-  auto const underlay = storage::underlay_of(transaction);
   std::set<AddressBytes> seen;
   for (auto const &peer : peers) {
     require_host(peer);
-    if (underlay && underlay->address == peer) {
-      throw Refused(QEX_INVALID_ADDRESS, fmt::format("the peer {} is this host", ip_text(peer)));
-    }
     if (!seen.insert(peer).second) {
       throw Refused(QEX_EXISTS, fmt::format("the peer {} is there twice", ip_text(peer)));
     }
@@ -98,7 +94,7 @@ void set_fabric(storage::ChangingTransaction &transaction, storage::SwitchKey ke
                 FabricSpec const &spec) {
   require_real_time(transaction);
   check_key(transaction, key, spec);
-  check_peers(transaction, spec.peers);
+  check_peers(spec.peers);
   auto const uplink = uplink_for(transaction, key, spec.uplink);
   storage::put_fabric(transaction, key, uplink, spec.encapsulation, spec.key, spec.peers);
 }
@@ -113,14 +109,6 @@ void attach_fabric(storage::ChangingTransaction &transaction, storage::SwitchKey
 void set_underlay(storage::ChangingTransaction &transaction, storage::Underlay const &underlay) {
   check_underlay_device(transaction, underlay.device);
   require_host(underlay.address);
-  for (auto const &known : storage::all_switches(transaction)) {
-    auto const fabric = storage::fabric_of(transaction, known.key);
-    if (fabric && std::ranges::find(fabric->tunnels, underlay.address, &storage::Tunnel::peer) !=
-                      fabric->tunnels.end()) {
-      throw Refused(QEX_INVALID_ADDRESS, fmt::format("{} is a peer of the switch '{}'",
-                                                     ip_text(underlay.address), known.row.alias));
-    }
-  }
   if (!underlay.gateway.empty()) {
     require_host(underlay.gateway);
     if (underlay.gateway.size() != underlay.address.size()) {

@@ -2,6 +2,7 @@
 #include "storage/tunnels/fabrics.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "qexapi/protocols.h"
 #include "qexapi/types.h"
@@ -27,25 +28,48 @@ Fabric fabric_at(Query const &row) {
           .uplink = row.name(1),
           .encapsulation = row.choice(2, Encapsulation::geneve),
           .key = static_cast<std::uint32_t>(row.integer(3, 0, kGreatestTunnelKey)),
+          .peers = {},
           .tunnels = {}};
+}
+
+struct Peer {
+  Tunnel tunnel;
+  bool is_this_host = false;
+};
+
+// By their places.
+std::vector<Peer> peers_of(Transaction &transaction, SwitchKey key) {
+  Query select(transaction,
+               "SELECT place, peer, EXISTS (SELECT 1 FROM underlay WHERE address = peer)"
+               " FROM tunnel WHERE switch = ? ORDER BY place");
+  return select.with(key).all([](Query const &row) {
+    auto const place = row.integer(0, 0, kMostTunnels - 1);
+    return Peer{.tunnel = {.number = static_cast<std::uint16_t>(kFirstTunnel + place),
+                           .peer = address_at(row, 1)},
+                .is_this_host = row.flag(2)};
+  });
 }
 
 std::optional<Fabric> with_tunnels(Transaction &transaction, std::optional<Fabric> fabric) {
   if (fabric) {
-    Query select(transaction, "SELECT place, peer FROM tunnel WHERE switch = ? ORDER BY place");
-    fabric->tunnels = select.with(fabric->switch_key).all([](Query const &row) {
-      auto const place = row.integer(0, 0, kMostTunnels - 1);
-      return Tunnel{.number = static_cast<std::uint16_t>(kFirstTunnel + place),
-                    .peer = address_at(row, 1)};
+    for (auto &[tunnel, is_this_host] : peers_of(transaction, fabric->switch_key)) {
+      fabric->peers.push_back(tunnel.peer);
+      if (!is_this_host) {
+        fabric->tunnels.push_back(std::move(tunnel));
+      }
+    }
+    std::ranges::sort(fabric->peers, [](AddressBytes const &one, AddressBytes const &other) {
+      return one.size() == other.size() ? one < other : one.size() < other.size();
     });
   }
   return fabric;
 }
 
 // The first place that is free.
-std::size_t free_place(std::vector<Tunnel> const &taken) {
+std::size_t free_place(std::vector<Peer> const &taken) {
   std::size_t place = 0;
-  while (std::ranges::find(taken, kFirstTunnel + place, &Tunnel::number) != taken.end()) {
+  while (std::ranges::any_of(
+      taken, [&](Peer const &peer) { return peer.tunnel.number == kFirstTunnel + place; })) {
     ++place;
   }
   return place;
@@ -94,19 +118,20 @@ void put_fabric(ChangingTransaction &transaction, SwitchKey key, std::string_vie
                 " ON CONFLICT (switch) DO UPDATE SET uplink = excluded.uplink,"
                 " encapsulation = excluded.encapsulation, key = excluded.key");
   upsert.with(key).with(uplink).with(encapsulation).with(std::int64_t{tunnel_key}).run();
-  auto kept = fabric_of(transaction, key)->tunnels;
-  std::erase_if(kept, [&](Tunnel const &tunnel) {
-    bool const goes = std::ranges::find(peers, tunnel.peer) == peers.end();
+  auto kept = peers_of(transaction, key);
+  std::erase_if(kept, [&](Peer const &one) {
+    bool const goes = std::ranges::find(peers, one.tunnel.peer) == peers.end();
     if (goes) {
-      remove_tunnel(transaction, key, tunnel.peer);
+      remove_tunnel(transaction, key, one.tunnel.peer);
     }
     return goes;
   });
   for (auto const &peer : peers) {
-    if (std::ranges::find(kept, peer, &Tunnel::peer) == kept.end()) {
+    if (std::ranges::none_of(kept, [&](Peer const &one) { return one.tunnel.peer == peer; })) {
       auto const place = free_place(kept);
       put_tunnel(transaction, key, place, peer);
-      kept.push_back({.number = static_cast<std::uint16_t>(kFirstTunnel + place), .peer = peer});
+      kept.push_back(
+          {.tunnel = {.number = static_cast<std::uint16_t>(kFirstTunnel + place), .peer = peer}});
     }
   }
 }

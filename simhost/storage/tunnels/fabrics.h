@@ -17,7 +17,7 @@ namespace simhost::storage {
 enum class Encapsulation : std::uint8_t { vxlan, geneve };
 inline constexpr std::uint32_t kGreatestTunnelKey = 0xFFFFFF;
 
-/// The tunnels of one switch have so many places.
+/// The peers of one switch have so many places.
 inline constexpr std::size_t kMostTunnels = 64;
 /// By which the data path knows the first of them; no device has one of these numbers.
 inline constexpr std::uint16_t kFirstTunnel = 0xFEC0;
@@ -36,7 +36,8 @@ struct Fabric {
   std::string uplink;
   Encapsulation encapsulation;
   std::uint32_t key;
-  std::vector<Tunnel> tunnels;  ///< in the order of their numbers
+  std::vector<AddressBytes> peers;  ///< IPv4 first, by the addresses; this host may be one
+  std::vector<Tunnel> tunnels;      ///< to the other ones, in the order of their numbers
 };
 
 std::optional<Fabric> fabric_of(Transaction &transaction, SwitchKey key);

@@ -121,10 +121,10 @@ TEST_F(Fabrics, ThatCannotBeAreRefused) {
   EXPECT_EQ(refusal(R"("encapsulation": "vxlan", "key": 1, "peers": ["there"])"),
             "switches[0].fabric.peers[0]: must be an IPv4 or IPv6 address");
   EXPECT_EQ(refusal(R"("encapsulation": "vxlan", "key": 1, "peers": ["239.0.0.1"])"),
-            "switches[0].fabric: the host refuses it: 239.0.0.1 is the address of no other host"
+            "switches[0].fabric: the host refuses it: 239.0.0.1 is the address of no host"
             " (QEX_INVALID_ADDRESS)");
   EXPECT_EQ(refusal(R"("encapsulation": "vxlan", "key": 1, "peers": ["::1"])"),
-            "switches[0].fabric: the host refuses it: ::1 is the address of no other host"
+            "switches[0].fabric: the host refuses it: ::1 is the address of no host"
             " (QEX_INVALID_ADDRESS)");
   EXPECT_EQ(
       refusal(R"("encapsulation": "vxlan", "key": 1, "peers": ["192.0.2.2", "192.0.2.2"])"),
@@ -143,14 +143,30 @@ TEST_F(Fabrics, OfTwoSwitchesHaveTwoKeys) {
 }
 
 TEST_F(Fabrics, LeadToOtherHosts) {
+  auto const last_bytes = [&] {
+    std::vector<int> all;
+    auto const fabric = fabric_of(transaction, key);
+    for (auto const &peer : fabric->peers) {
+      all.push_back(std::to_integer<int>(peer.back()));
+    }
+    return all;
+  };
+  set_fabric(
+      R"("encapsulation": "vxlan", "key": 1, "peers": ["192.0.2.3", "192.0.2.1", "192.0.2.2"])");
+  EXPECT_THAT(numbers(), ElementsAre(0xFEC0, 0xFEC1, 0xFEC2));
   apply(R"({"underlay": {)" + std::string(kUnderlay) + "}}");
-  EXPECT_EQ(refusal(R"("encapsulation": "vxlan", "key": 1, "peers": ["192.0.2.1"])"),
-            "switches[0].fabric: the host refuses it: the peer 192.0.2.1 is this host"
-            " (QEX_INVALID_ADDRESS)");
-  set_fabric(kMembers);
-  EXPECT_EQ(underlay_refusal(R"("device": "eth1", "address": "192.0.2.2/24")"),
-            "underlay: the host refuses it: 192.0.2.2 is a peer of the switch 's'"
-            " (QEX_INVALID_ADDRESS)");
+  EXPECT_THAT(numbers(), ElementsAre(0xFEC0, 0xFEC2));
+  EXPECT_THAT(last_bytes(), ElementsAre(1, 2, 3));
+  apply(R"({"underlay": {"device": "eth1", "address": "192.0.2.3/24"}})");
+  EXPECT_THAT(numbers(), ElementsAre(0xFEC1, 0xFEC2));
+  set_fabric(
+      R"("encapsulation": "vxlan", "key": 1, "peers": ["192.0.2.4", "192.0.2.3", "192.0.2.2"])");
+  EXPECT_THAT(numbers(), ElementsAre(0xFEC1, 0xFEC2)) << "the place of this host is taken";
+  EXPECT_THAT(last_bytes(), ElementsAre(2, 3, 4));
+  set_fabric(R"("encapsulation": "vxlan", "key": 1, "peers": ["192.0.2.3"])");
+  EXPECT_THAT(numbers(), ElementsAre());
+  apply(R"({"underlay": {}})");
+  EXPECT_THAT(numbers(), ElementsAre(0xFEC0));
 }
 
 TEST_F(Fabrics, HaveAnUplinkThatIsNoWire) {
