@@ -9,7 +9,7 @@ namespace simhost::scenario {
 
 /// Applies a member "underlay" of a document; an empty object stands for none.
 void apply_underlay(storage::ChangingTransaction &transaction, Node const &node);
-/// Likewise a member "fabric" of a switch.
+/// Likewise a member "fabric" of a switch. Its uplink is not yet at a port.
 void apply_fabric(storage::ChangingTransaction &transaction, storage::SwitchKey key,
                   Node const &node);
 

@@ -139,7 +139,7 @@ std::vector<std::string> free_uplinks(Transaction &transaction) {
 }
 
 void remove_uplinks(ChangingTransaction &transaction) {
-  Change(transaction, "DELETE FROM uplink").run();
+  Change(transaction, "DELETE FROM uplink WHERE name NOT IN (SELECT uplink FROM fabric)").run();
 }
 
 void attach_uplink(ChangingTransaction &transaction, std::string_view name, PortNumber port) {

@@ -70,7 +70,7 @@ std::optional<Uplink> find_uplink(Transaction &transaction, std::string_view nam
 std::vector<Uplink> all_uplinks(Transaction &transaction);
 /// Adds a free uplink to the host. Its name is unique there.
 void add_uplink(ChangingTransaction &transaction, std::string_view name);
-/// Removes all uplinks from the host.
+/// Removes all uplinks from the host but for those that are tunnels, which go with their fabric.
 void remove_uplinks(ChangingTransaction &transaction);
 /// The free uplinks of the host that are wires, in the order in which they were added.
 std::vector<std::string> free_uplinks(Transaction &transaction);

@@ -9,7 +9,7 @@ namespace simhost::storage {
 inline constexpr std::int64_t kApplicationId = 0x5653696D;
 /// Rises with every change of the tables, by a step of state_format.cpp that brings a file of the
 /// version before forward.
-inline constexpr std::int64_t kSchemaVersion = 14;
+inline constexpr std::int64_t kSchemaVersion = 15;
 /// The version that the first of those steps begins with; what is older is refused.
 inline constexpr std::int64_t kOldestSchema = 3;
 
@@ -39,5 +39,7 @@ extern char const *const kChosenSchema;
 extern char const *const kCountedSchema;
 /// Likewise the names of what is shared that a transaction touched.
 extern char const *const kTouchedSchema;
+/// Adds to those what a transaction touched of tunnels.
+extern char const *const kTouchedTunnelsSchema;
 
 }  // namespace simhost::storage

@@ -136,4 +136,30 @@ char const *const kTouchedSchema = R"sql(
   END;
 )sql";
 
+char const *const kTouchedTunnelsSchema = R"sql(
+  -- What the uplink of a fabric is called is each host's own.
+  INSERT INTO touched_place SELECT switch, NULL FROM fabric;
+
+  CREATE TRIGGER touched_by_added_fabric AFTER INSERT ON fabric
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched_place VALUES (new.switch, NULL);
+  END;
+  CREATE TRIGGER touched_by_changed_fabric AFTER UPDATE OF encapsulation, key ON fabric
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched_place VALUES (new.switch, NULL);
+  END;
+  CREATE TRIGGER touched_by_removed_fabric AFTER DELETE ON fabric
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched_place VALUES (old.switch, NULL);
+  END;
+  CREATE TRIGGER touched_by_added_peer AFTER INSERT ON tunnel
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched_place VALUES (new.switch, NULL);
+  END;
+  CREATE TRIGGER touched_by_removed_peer AFTER DELETE ON tunnel
+    WHEN EXISTS (SELECT 1 FROM shared) BEGIN
+    INSERT INTO touched_place VALUES (old.switch, NULL);
+  END;
+)sql";
+
 }  // namespace simhost::storage

@@ -19,7 +19,7 @@ namespace {
 std::array<char const *, kSchemaVersion - kOldestSchema> const kSteps{
     kGenerationSchema, kFramesSchema,  kReadingSchema, kRememberedSchema,
     kSeenSchema,       kSharedSchema,  kLacpSchema,    kFabricSchema,
-    kChosenSchema,     kCountedSchema, kTouchedSchema};
+    kChosenSchema,     kCountedSchema, kTouchedSchema, kTouchedTunnelsSchema};
 
 // A table, index, view or trigger.
 struct Part {

@@ -133,13 +133,13 @@ class Segment:
 
 
 class Routers:
-    """A network of each host, 192.0.2.0/24, 192.0.3.0/24, ..., and a router between them. A host
-    reaches it over its device eth1."""
+    """A network of each host, 192.0.2.0/24, 192.0.3.0/24, ... by the numbers of the hosts, and a
+    router between them. A host reaches it over its device eth1."""
 
-    def __init__(self, rack: Rack) -> None:
+    def __init__(self, rack: Hosts, first: int = 0) -> None:
         self.namespace = rack.namespace()
         self.namespace.run("sh", "-c", "echo 1 > /proc/sys/net/ipv4/ip_forward")
-        for number, host in enumerate(rack.hosts):
+        for number, host in enumerate(rack.hosts, first):
             wire = f"r{number}"
             host.wire("eth1", self.namespace, wire)
             address = f"192.0.{2 + number}.254/24"

@@ -139,6 +139,9 @@ def test_what_replaces_the_state_leaves_what_is_shared(
     lab: FabricLab, two: Tuple[Host, Host]
 ) -> None:
     one, other = two
+    tunnels = {"encapsulation": "vxlan", "key": 4711, "peers": []}
+    one.apply({"switches": [{"alias": "lab", "fabric": tunnels}]})
+    assert comes_true(lambda: other.setting("lab", "fabric") is not None)
     before = lab.databases.rows("Switch"), lab.databases.rows("Port")
     for host, own in ((one, "own"), (other, "mine")):
         shared = ["lab 9000 a,b"]

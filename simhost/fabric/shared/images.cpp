@@ -1,5 +1,6 @@
 // What is stored, as it is stored: nothing is read out of it.
 #include <algorithm>
+#include <cstdint>
 #include <utility>
 
 #include "base/blocks.h"
@@ -8,6 +9,7 @@
 #include "storage/running/addresses.h"
 #include "storage/running/devices.h"
 #include "storage/store.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::fabric {
 namespace {
@@ -34,6 +36,14 @@ void write_addresses(Writer &writer, std::vector<storage::Address> const &addres
   }
 }
 
+void write_fabric(Writer &writer, storage::Fabric const &fabric) {
+  writer.number(static_cast<std::uint32_t>(fabric.encapsulation));
+  writer.number(fabric.key);
+  for (auto const &peer : fabric.peers) {
+    writer.bytes(peer);
+  }
+}
+
 }  // namespace
 
 Bytes image_of(Transaction &transaction, storage::FoundSwitch const &found) {
@@ -45,6 +55,9 @@ Bytes image_of(Transaction &transaction, storage::FoundSwitch const &found) {
                    storage::properties_of(transaction, storage::PropertyOwner::global(found.key)));
   write_addresses(writer, storage::fixed_addresses(
                               transaction, {.switch_key = found.key, .port = std::nullopt}));
+  if (auto const fabric = storage::fabric_of(transaction, found.key)) {
+    write_fabric(writer, *fabric);
+  }
   return writer.block(BlockKind::state, 0);
 }
 

@@ -9,15 +9,18 @@
 #include <vector>
 
 #include "base/outcomes.h"
+#include "model/fabric/fabric.h"
 #include "model/plane.h"
 #include "model/ports/ports.h"
 #include "model/properties/properties.h"
 #include "model/properties/registry.h"
 #include "model/switches/switches.h"
+#include "scenario/fabric_members.h"
 #include "scenario/forms.h"
 #include "scenario/keys.h"
 #include "scenario/members.h"
 #include "scenario/reading.h"
+#include "scenario/scenario_fabric.h"
 #include "scenario/settings.h"
 #include "scenario/texts.h"
 #include "storage/store.h"
@@ -108,6 +111,14 @@ void describe_addresses(Json &said, Transaction &transaction, PropertyOwner cons
   if (!list.empty()) {
     said[scenario::keys::addresses] = std::move(list);
   }
+}
+
+// By what its uplink is called each host knows it for itself.
+Json fabric_to_json(Transaction &transaction, storage::SwitchKey key) {
+  auto const fabric = storage::fabric_of(transaction, key);
+  auto said = fabric ? scenario::to_json(*fabric) : Json::object();
+  said.erase(std::string(scenario::kUplink));
+  return said;
 }
 
 Settings texts_of(Json const &said) {
@@ -226,12 +237,34 @@ void apply_members(storage::ChangingTransaction &transaction, PropertyOwner cons
   apply_addresses(transaction, owner, wanted);
 }
 
+void apply_fabric(storage::ChangingTransaction &transaction, storage::SwitchKey key,
+                  Json const &wanted) {
+  auto const now = fabric_to_json(transaction, key);
+  auto const fabric = wanted.value(scenario::keys::fabric, Json::object());
+  if (are_equal(now, fabric)) {
+    return;
+  }
+  Node const node(fabric, scenario::keys::fabric);
+  if (auto const uplink = node.find(scenario::kUplink)) {
+    uplink->fail("each host has its own");
+  }
+  scenario::do_at(node, [&] {
+    scenario::apply_fabric(transaction, key, node);
+    if (now.empty()) {
+      attach_fabric(transaction, key);
+    }
+  });
+}
+
 }  // namespace
 
 Settings settings_of(Transaction &transaction, storage::FoundSwitch const &found) {
   auto const owner = PropertyOwner::global(found.key);
   auto said = properties_to_json(transaction, owner);
   describe_addresses(said, transaction, owner);
+  if (auto fabric = fabric_to_json(transaction, found.key); !fabric.empty()) {
+    said[scenario::keys::fabric] = std::move(fabric);
+  }
   said[kMaxPorts] = found.row.max_ports;
   said[kVersion] = found.row.version;
   return texts_of(said);
@@ -251,7 +284,7 @@ void apply_settings(storage::ChangingTransaction &transaction, storage::FoundSwi
                     Settings const &settings) {
   auto const owner = PropertyOwner::global(found.key);
   auto const wanted = json_of(settings);
-  require_known(wanted, owner, {kMaxPorts, kVersion});
+  require_known(wanted, owner, {kMaxPorts, kVersion, scenario::keys::fabric});
   auto const max_ports = number_in(wanted, kMaxPorts, kDefaultMaxPorts);
   if (max_ports != found.row.max_ports) {
     change_max_ports(transaction, found.key, max_ports);
@@ -261,6 +294,7 @@ void apply_settings(storage::ChangingTransaction &transaction, storage::FoundSwi
     change_version(transaction, found.key, version);
   }
   apply_members(transaction, owner, wanted);
+  apply_fabric(transaction, found.key, wanted);
 }
 
 void apply_settings(storage::ChangingTransaction &transaction, storage::Port const &port,

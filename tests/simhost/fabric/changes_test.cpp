@@ -6,9 +6,8 @@
 
 #include <random>
 
-#include "fabric/shared/records.h"
 #include "fabric/shared/settings.h"
-#include "memory_state.h"
+#include "model/fabric/fabric.h"
 #include "model/ports/ports.h"
 #include "model/ports/properties.h"
 #include "model/properties/properties.h"
@@ -16,6 +15,7 @@
 #include "model/switches/switches.h"
 #include "scenario/scenario.h"
 #include "scenario/settings.h"
+#include "sharing_host.h"
 #include "storage/running/devices.h"
 
 namespace simhost::fabric {
@@ -24,77 +24,6 @@ namespace {
 using storage::ChangingTransaction;
 using storage::PropertyOwner;
 using testing::Contains;
-
-constexpr auto *kSwitch = "s-1";
-
-SharedName port_name(std::string const &port) {
-  return {.switch_identifier = kSwitch, .port = port};
-}
-
-Json in_json(std::vector<Change> const &changes) {
-  std::map<SharedName, Json> sorted;
-  for (auto const &change : changes) {
-    sorted.emplace(change.name, change);
-  }
-  auto all = Json::array();
-  for (auto const &[name, change] : sorted) {
-    all.push_back(change);
-  }
-  return all;
-}
-
-// A host that shares the switch s-1, which has the alias lab and the port a.
-struct SharingHost : MemoryState {
-  SharingHost() {
-    ChangingTransaction transaction(store);
-    storage::put_membership(transaction, membership);
-    begin(transaction);
-    settle(transaction);
-  }
-  void TestBody() override {}
-
-  static void begin(ChangingTransaction &transaction) {
-    create_switch(transaction, {.alias = "lab", .identifier = kSwitch, .persistent = true});
-    add_client_port(transaction, found_in(transaction)->key, "a");
-    storage::put_shared(transaction, {.name = port_name(""), .fabric = {}, .image = std::nullopt});
-    storage::touch(transaction, kSwitch);
-  }
-  static std::optional<storage::FoundSwitch> found_in(storage::Transaction &transaction) {
-    return storage::find_switch(transaction, storage::SwitchName::identifier, kSwitch);
-  }
-  static std::optional<storage::Port> port_in(storage::Transaction &transaction,
-                                              std::string const &port) {
-    auto const found = found_in(transaction);
-    return found ? storage::find_port(transaction, found->key, port) : std::nullopt;
-  }
-
-  // As a call does before it commits. Returns what it changed.
-  std::vector<Change> settle(ChangingTransaction &transaction) const {
-    auto changes = changes_of(transaction, membership);
-    agree(transaction, changes);
-    storage::forget_touched(transaction);
-    transaction.commit();
-    return changes;
-  }
-  template <typename Work>
-  Json changes_by(Work const &work) {
-    ChangingTransaction transaction(store);
-    work(transaction);
-    return in_json(settle(transaction));
-  }
-  [[nodiscard]] Json whole_look(ChangingTransaction &transaction) const {
-    std::set<std::string> switches;
-    for (auto const &row : storage::all_shared(transaction)) {
-      switches.insert(row.name.switch_identifier);
-    }
-    for (auto const &one : switches) {
-      storage::touch(transaction, one);
-    }
-    return in_json(changes_of(transaction, membership));
-  }
-
-  Membership membership{.host = "here", .state = "x"};
-};
 
 using WhatChanges = SharingHost;
 
@@ -237,6 +166,22 @@ TEST_F(WhatChanges, IsSeenOfEachSettingThatIsNoProperty) {
   changed("", [](auto &transaction) {
     change_version(transaction, found_in(transaction)->key, kDefaultVersion + 1);
   });
+  auto const set_tunnels = [](auto &transaction, FabricSpec const &spec) {
+    set_fabric(transaction, found_in(transaction)->key, spec);
+  };
+  changed("", [&](auto &transaction) { set_tunnels(transaction, {.key = 7}); });
+  changed("", [&](auto &transaction) { set_tunnels(transaction, {.key = 8}); });
+  changed("", [&](auto &transaction) {
+    set_tunnels(transaction, {.encapsulation = storage::Encapsulation::geneve, .key = 8});
+  });
+  FabricSpec tunnels{.key = 8, .peers = {host_address(1)}};
+  changed("", [&](auto &transaction) { set_tunnels(transaction, tunnels); });
+  changed("", [&](auto &transaction) {
+    set_tunnels(transaction, {.key = 8, .peers = {host_address(2)}});
+  });
+  changed("", [](auto &transaction) {
+    storage::remove_fabric(transaction, found_in(transaction)->key);
+  });
   changed("a", [](auto &transaction) {
     set_external_id(transaction, *port_in(transaction, "a"), "vm-7");
   });
@@ -264,7 +209,7 @@ class History : public SharingHost, public testing::WithParamInterface<unsigned>
     }
     auto const name = std::string(1, static_cast<char>('a' + below(4)));
     auto const port = storage::find_port(transaction, found->key, name);
-    switch (below(13)) {
+    switch (below(14)) {
       case 0:
         return set(transaction, fmt::format(R"("mtu": {})", 1500 + below(3)));
       case 1:
@@ -286,6 +231,8 @@ class History : public SharingHost, public testing::WithParamInterface<unsigned>
         return below(8) == 0 ? destroy_switch(transaction, found->key) : void();
       case 8:
         return below(2) == 0 ? follow_another_host(transaction, name) : void();
+      case 9:
+        return set_tunnels(transaction, found->key);
       default:
         return change_port(transaction, *found, name, port);
     }
@@ -317,6 +264,19 @@ class History : public SharingHost, public testing::WithParamInterface<unsigned>
     } else {
       begin(transaction);
     }
+  }
+
+  void set_tunnels(ChangingTransaction &transaction, storage::SwitchKey key) {
+    if (below(3) == 0) {
+      return storage::remove_fabric(transaction, key);
+    }
+    FabricSpec spec{.uplink = below(4) == 0 ? "mesh" : "", .key = below(2)};
+    for (unsigned number = 1; number <= 2; ++number) {
+      if (below(2) == 0) {
+        spec.peers.push_back(host_address(number));
+      }
+    }
+    set_fabric(transaction, key, spec);
   }
 
   void set_address(ChangingTransaction &transaction, storage::FoundSwitch const &found,

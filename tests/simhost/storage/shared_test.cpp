@@ -8,6 +8,7 @@
 #include "state_files.h"
 #include "storage/ports.h"
 #include "storage/store.h"
+#include "storage/tunnels/fabrics.h"
 
 namespace simhost::storage {
 namespace {
@@ -98,6 +99,29 @@ TEST(WhatIsShared, IsAllLookedAtOnceInAFileOfAnOlderHost) {
     found.push_back(name.switch_identifier + "/" + name.port);
   }
   EXPECT_THAT(found, testing::UnorderedElementsAre("a/", "a/gone", "a/new"));
+}
+
+TEST(WhatIsShared, IsLookedAtOnceWhereAnOlderHostHasTunnels) {
+  TemporaryFolder const folder;
+  auto const file = made(folder);
+  {
+    Store store(file, populate_nothing);
+    ChangingTransaction transaction(store);
+    auto const key = find_switch(transaction, SwitchName::alias, "a")->key;
+    put_shared(transaction, {.name = {"a", ""}, .fabric = "{}", .image = {}});
+    add_uplink(transaction, "fabric0");
+    put_fabric(transaction, key, "fabric0", Encapsulation::vxlan, 7, {});
+    forget_touched(transaction);
+    transaction.commit();
+  }
+  SQLite::Database(file, SQLite::OPEN_READWRITE)
+      .exec(
+          "DROP TRIGGER touched_by_added_fabric; DROP TRIGGER touched_by_changed_fabric;"
+          "DROP TRIGGER touched_by_removed_fabric; DROP TRIGGER touched_by_added_peer;"
+          "DROP TRIGGER touched_by_removed_peer; PRAGMA user_version = 14");
+  Store store(file, populate_nothing);
+  ReadingTransaction transaction(store);
+  EXPECT_THAT(touched(transaction), testing::ElementsAre(SharedName{"a", ""}));
 }
 
 }  // namespace
