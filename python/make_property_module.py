@@ -32,7 +32,8 @@ def main() -> None:
             thing: {one["name"]: one["default"] for one in has if "default" in one}
             for thing, has in reference["objects"].items()
         }
-        for name, said in (("NUMBERS", numbers), ("DEFAULTS", defaults)):
+        fabric = reference["objects"]["fabric"]
+        for name, said in (("NUMBERS", numbers), ("DEFAULTS", defaults), ("FABRIC", fabric)):
             held = pprint.pformat(said, width=100, sort_dicts=False)
             file.write(f"\n{name} = {held}\n")
         file.write(f"\nLONGEST_KEY = {reference['longest_key']}\n")

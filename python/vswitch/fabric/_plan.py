@@ -6,13 +6,13 @@ import json
 import typing
 import uuid
 from dataclasses import replace
-from typing import Any, Dict, Iterable, List, Mapping, Optional, Sequence, Set, Tuple
+from typing import Any, Dict, Iterable, List, Mapping, Sequence, Set, Tuple
 
 from libvswitch.errors import NotFound
 from vswitch import _settings, _table
 from vswitch._describing import property_words
 from vswitch.documents import MacWish, PortWish, PropertyWish, SwitchWish, ThingWish
-from vswitch.fabric._documents import Wish
+from vswitch.fabric._documents import Wish, read_fabric
 from vswitch.fabric._notation import (
     Operation,
     Where,
@@ -81,9 +81,9 @@ class Difference:
             if there is not None:
                 self._remove_switch(there)
         elif there is None:
-            self._add_switch(switch, wish.hosts)
+            self._add_switch(wish)
         else:
-            self._change_switch(there, switch, wish.hosts)
+            self._change_switch(there, wish)
         if len(self.changes) > before:
             self.hosts.update(there.hosts if there is not None else (), wish.hosts or ())
 
@@ -109,26 +109,26 @@ class Difference:
             delete("Switch", where(id=there.id)),
         ]
 
-    def _add_switch(self, wish: SwitchWish, hosts: Optional[Tuple[str, ...]]) -> None:
+    def _add_switch(self, wanted: Wish) -> None:
+        wish, hosts = wanted.switch, wanted.hosts
         if not hosts:
             raise DocumentError(wish.path, "'hosts' is missing: the names of those that have it")
         self._check_hosts(wish, hosts)
         identifier = wish.fixed.get("id") or str(uuid.uuid4())
         self.tell(wish.alias, None, {"id": identifier, "hosts": list(hosts)})
-        texts = self._texts(wish.alias, {}, wish, _table.SWITCH)
+        texts = self._texts_of_switch(wish.alias, {}, wanted)
         row = {"alias": wish.alias, "hosts": set_of(hosts), "settings": map_of(texts)}
         self.operations.append(insert("Switch", id=identifier, writers=_writers(hosts), **row))
         there = SharedSwitch(wish.alias, identifier, hosts, writers=hosts)
         for port in wish.ports:
             self._port(there, port)
 
-    def _change_switch(
-        self, there: SharedSwitch, wish: SwitchWish, hosts: Optional[Tuple[str, ...]]
-    ) -> None:
+    def _change_switch(self, there: SharedSwitch, wanted: Wish) -> None:
+        wish, hosts = wanted.switch, wanted.hosts
         if wish.fixed.get("id", there.id) != there.id:
             raise DocumentError(f"{wish.path}.id", f"the switch has {there.id!r}, which stays")
         of_switch = where(id=there.id)
-        texts = self._texts(there.alias, there.texts, wish, _table.SWITCH)
+        texts = self._texts_of_switch(there.alias, there.texts, wanted)
         if texts != there.texts:
             self.operations.append(_same_switch(there))
             self.operations.append(update("Switch", of_switch, settings=map_of(texts)))
@@ -180,7 +180,7 @@ class Difference:
             return
         if there is None:
             self.tell(path, None, {"id": wish.id})
-            texts = map_of(self._texts(path, {}, wish, _table.PORT))
+            texts = map_of(self._texts_of_port(path, {}, wish))
             writers = _writers(switch.writers)
             row = {"switch": switch.id, "id": wish.id, "host": "", "settings": texts}
             self.operations += [
@@ -188,34 +188,34 @@ class Difference:
                 insert("Port", writers=writers, **row),
             ]
             return
-        texts_now = self._texts(path, there.texts, wish, _table.PORT)
+        texts_now = self._texts_of_port(path, there.texts, wish)
         if texts_now != there.texts:
             self.operations += [
                 _same_port(there),
                 update("Port", _row_of(there), settings=map_of(texts_now)),
             ]
 
-    # Settings
+    # All settings as they are to be
 
-    def _texts(
-        self,
-        path: str,
-        texts: Mapping[str, str],
-        wish: "typing.Union[SwitchWish, PortWish]",
-        known: Mapping[str, _table.Property],
-    ) -> Texts:
-        """All settings as they are to be."""
+    def _texts_of_switch(self, path: str, texts: Mapping[str, str], wanted: Wish) -> Texts:
         found = _Members(self, path, texts)
-        if isinstance(wish, SwitchWish):
-            for name in ("max_ports", "version"):
-                if name in wish.fixed:
-                    found.set(name, wish.fixed[name])
-        elif wish.external_id is not None:
-            found.set("external_id", wish.external_id)
-        found.add_settings(wish, known)
+        wish = wanted.switch
+        for name in ("max_ports", "version"):
+            if name in wish.fixed:
+                found.set(name, wish.fixed[name])
+        if wanted.fabric is not None:
+            found.set_fabric(wanted.fabric)
+        found.add_settings(wish, _table.SWITCH)
         found.add_properties(wish.properties)
-        if isinstance(wish, PortWish):
-            found.add_addresses(wish.macs)
+        return found.texts
+
+    def _texts_of_port(self, path: str, texts: Mapping[str, str], wish: PortWish) -> Texts:
+        found = _Members(self, path, texts)
+        if wish.external_id is not None:
+            found.set("external_id", wish.external_id)
+        found.add_settings(wish, _table.PORT)
+        found.add_properties(wish.properties)
+        found.add_addresses(wish.macs)
         return found.texts
 
 
@@ -242,6 +242,16 @@ class _Members:
         if before != after:
             self._told.tell(f"{self._path}/{name}", before, after)
             self._put(name, after)
+
+    def set_fabric(self, wanted: Dict[str, Any]) -> None:
+        held = self._now("fabric")
+        try:
+            before = read_fabric({} if held is None else held, "fabric")
+        except DocumentError:
+            # Nor can any host read it.
+            self.set("fabric", wanted or None, held)
+        else:
+            self.set("fabric", wanted or None, before or None)
 
     def add_settings(self, wish: ThingWish, known: Mapping[str, _table.Property]) -> None:
         given = {named.key for named in wish.properties}

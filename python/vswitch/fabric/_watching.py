@@ -28,7 +28,7 @@ where a port is connected, a setting, an address; and of a host that it comes or
 it cannot bear, and the revision that it has in force."""
 
 # Beside what has a property.
-_NUMBERS = ("max_ports", "version", "external_id")
+_MORE = ("max_ports", "version", "fabric", "external_id")
 
 
 def events(before: View, after: View) -> Iterator[Event]:
@@ -64,7 +64,7 @@ def _settings_seen(
     path: str, settings: Dict[str, Words], known: Dict[str, _table.Property]
 ) -> Seen:
     found = settings_and_macs(path, settings, known)
-    for name in _NUMBERS:
+    for name in _MORE:
         if name in settings:
             found["setting", f"{path}/{name}"] = settings[name]
     return found
