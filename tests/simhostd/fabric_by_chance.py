@@ -85,7 +85,13 @@ class Asking:
         return calls_of.put_port([CTL], "lab", f"n{self._number()}")
 
     def _set_switch(self, _: Host, __: str) -> Wanted:
-        return calls_of.set_switch([CTL], "lab", mtu=self._number())
+        return self._set_by([CTL])
+
+    def _set_by(self, command: Sequence[str]) -> Wanted:
+        number = self._number()
+        kinds: List[Dict[str, Any]] = [{"mtu": number}, {"fabric": tunnels(number)}]
+        settings = self._chance.choice(kinds)
+        return calls_of.set_switch(command, "lab", **settings)
 
     def _set_port(self, _: Host, port: str) -> Wanted:
         return calls_of.put_port([CTL], "lab", port, external_id=f"vm-{self._number()}")
@@ -122,7 +128,7 @@ class Asking:
         wanted = [
             calls_of.put_port(command, "lab", f"n{number}"),
             calls_of.put_port(command, "lab", port, external_id=f"vm-{number}"),
-            calls_of.set_switch(command, "lab", mtu=number),
+            self._set_by(command),
             calls_of.operator_removes_port(command, "lab", port),
             *(
                 calls_of.operator_removes_switch(command, alias)
@@ -230,6 +236,11 @@ class Disturbed:
         self._mends.append(host.start)
 
 
+def tunnels(key: int) -> Dict[str, Any]:
+    """To nobody: all that is asked is whose key it is."""
+    return {"encapsulation": "geneve", "key": key, "peers": []}
+
+
 def device_of(port: str) -> str:
     """The same on each host."""
     return f"tap-{port}"
@@ -315,7 +326,12 @@ def decided_otherwise(lab: FabricLab, made: Sequence[Transaction]) -> List[str]:
 
 def told(host: Host) -> Dict[str, Any]:
     """Of its switches."""
-    return {one["alias"]: one for one in json.loads(host.ctl("show", "--json"))["switches"]}
+    switches = json.loads(host.ctl("show", "--json"))["switches"]
+    for switch in switches:
+        if "fabric" in switch:
+            # What the uplink is called is the host's own.
+            del switch["fabric"]["uplink"]
+    return {one["alias"]: one for one in switches}
 
 
 def differences(host: Host, fabric: Switches, was_restored: bool) -> List[str]:
