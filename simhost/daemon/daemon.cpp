@@ -275,7 +275,9 @@ void Daemon::sync() {
   commits_ = storage::commits_of_others(transaction);
   auto const is_there = [this](std::string const &name) {
     auto const device = devices_.find(name);
-    if (device && !device->has_ethernet) {
+    if (!device) {
+      troubles_.add(fmt::format("there is no device {}", name));
+    } else if (!device->has_ethernet) {
       troubles_.add(fmt::format("the device {} carries no frames of Ethernet", name));
     }
     return device && device->has_ethernet;

@@ -259,9 +259,13 @@ def test_a_device_may_vanish_and_return(lab: Lab) -> None:
     assert one.comes_to_reach(other)
     lab.host.run("ip", "link", "delete", "c1")
     assert one.ceases_to_reach(other)
+    said = "there is no device c1\n"
+    assert comes_true(lambda: said in lab.ctl("plane"))
+    assert said in lab.log()
     lab.wire("c1", one.namespace, "eth0")
     one.set_up()
     assert one.comes_to_reach(other)
+    assert comes_true(lambda: said not in lab.ctl("plane"))
 
 
 def test_a_device_may_vanish_and_return_while_another_change_is_made(lab: Lab) -> None:
