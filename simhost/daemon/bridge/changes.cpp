@@ -66,17 +66,12 @@ void add_forgetting(openflow::Changes &changes) {
   }
 }
 
-std::set<std::uint32_t> meters_of(std::vector<Flow> const &flows) {
-  std::set<std::uint32_t> meters;
-  for (auto const &flow : flows) {
-    if (flow.actions.empty()) {
-      continue;
-    }
-    if (auto const *const to = std::get_if<openflow::ToMeter>(&flow.actions.front())) {
-      meters.insert(to->meter);
-    }
+std::optional<std::uint32_t> meter_of(Flow const &flow) {
+  if (flow.actions.empty()) {
+    return std::nullopt;
   }
-  return meters;
+  auto const *const to = std::get_if<openflow::ToMeter>(&flow.actions.front());
+  return to == nullptr ? std::nullopt : std::optional(to->meter);
 }
 
 bool ends_counting(openvswitch::Difference const &difference) {

@@ -3,7 +3,7 @@
 
 #include <cstddef>
 #include <cstdint>
-#include <set>
+#include <optional>
 #include <vector>
 
 #include "planes/openvswitch/openflow/change.h"
@@ -20,8 +20,8 @@ void add_changes(openvswitch::Difference const &difference, openflow::Changes &c
 void add_removals(std::vector<openflow::Flow> const &flows, openflow::Changes &changes);
 /// All that the bridge learned goes: before anything that teaches it otherwise.
 void add_forgetting(openflow::Changes &changes);
-/// The meters that flows send frames through.
-std::set<std::uint32_t> meters_of(std::vector<openflow::Flow> const &flows);
+/// The meter that a flow sends frames through.
+std::optional<std::uint32_t> meter_of(openflow::Flow const &flow);
 /// Whether flows go, or begin anew, that count for others.
 bool ends_counting(openvswitch::Difference const &difference);
 /// How many flows and groups it changes, those not counted that are forgotten.

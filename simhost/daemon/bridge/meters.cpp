@@ -15,12 +15,15 @@ constexpr std::uint32_t kMostOfAClient = 100;
 
 }  // namespace
 
-void Meters::replace(openflow::Connection &connection, std::vector<openflow::Flow> const &flows,
+void Meters::replace(openflow::Connection &connection, openflow::FlowParts const &flows,
                      openvswitch::Deadline deadline) {
   std::map<std::uint32_t, std::uint32_t> rates{{openflow::kControllerMeter, kMostPacketIns}};
-  present_ = meters_of(flows);
-  for (auto const meter : present_) {
-    rates.emplace(meter, kMostOfAClient);
+  present_.clear();
+  for (auto const &flow : flows) {
+    if (auto const meter = meter_of(flow)) {
+      present_.insert(*meter);
+      rates.emplace(*meter, kMostOfAClient);
+    }
   }
   connection.have_meters(rates, deadline);
 }
@@ -28,9 +31,9 @@ void Meters::replace(openflow::Connection &connection, std::vector<openflow::Flo
 void Meters::add(openflow::Connection &connection, std::vector<openflow::Flow> const &flows,
                  openvswitch::Deadline deadline) {
   std::vector<std::uint32_t> added;
-  for (auto const meter : meters_of(flows)) {
-    if (present_.insert(meter).second) {
-      added.push_back(meter);
+  for (auto const &flow : flows) {
+    if (auto const meter = meter_of(flow); meter && present_.insert(*meter).second) {
+      added.push_back(*meter);
     }
   }
   if (!added.empty()) {

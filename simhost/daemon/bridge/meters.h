@@ -6,13 +6,14 @@
 #include <vector>
 
 #include "planes/openvswitch/openflow/connection.h"
+#include "planes/openvswitch/openflow/flow_parts.h"
 
 namespace simhost::daemon {
 
 class Meters {
  public:
   /// The bridge has those of these flows from now on, and none that others made.
-  void replace(openflow::Connection &connection, std::vector<openflow::Flow> const &flows,
+  void replace(openflow::Connection &connection, openflow::FlowParts const &flows,
                openvswitch::Deadline deadline);
   /// Likewise those of flows that come, before they do. All stay: another device will have the
   /// number.

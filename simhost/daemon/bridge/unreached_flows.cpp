@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <future>
+#include <iterator>
 #include <limits>
 #include <span>
 #include <utility>
@@ -49,7 +50,7 @@ std::vector<std::size_t> shares_of(std::size_t flows) {
 
 struct Part {
   Connection connection;
-  std::span<Flow const> flows;
+  std::span<Flow const *const> flows;
 };
 
 void add_gate_and_groups(Connection &connection, std::span<openflow::Group const> groups,
@@ -74,12 +75,15 @@ openflow::Flow gate() {
 std::size_t add_unreached(Connection &connection, std::filesystem::path const &socket,
                           openvswitch::Compiled const &wanted, Deadline deadline,
                           Lives const &lives) {
-  std::span flows(wanted.flows);
-  if (flows.size() < kMany || !connection.is_bare(deadline)) {
+  if (wanted.flows.size() < kMany || !connection.is_bare(deadline)) {
     return 0;
   }
+  std::vector<Flow const *> all;
+  std::ranges::transform(wanted.flows, std::back_inserter(all),
+                         [](Flow const &flow) { return &flow; });
+  std::span<Flow const *const> flows(all);
   std::vector<Part> parts;
-  for (auto const share : shares_of(flows.size())) {
+  for (auto const share : shares_of(all.size())) {
     parts.push_back({Connection(socket, deadline, lives), flows.first(share)});
     flows = flows.subspan(share);
   }
@@ -94,7 +98,7 @@ std::size_t add_unreached(Connection &connection, std::filesystem::path const &s
   for (auto &added : all_added) {
     added.get();
   }
-  return wanted.groups.size() + wanted.flows.size();
+  return wanted.groups.size() + all.size();
 }
 
 }  // namespace simhost::daemon

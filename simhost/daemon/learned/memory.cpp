@@ -313,7 +313,7 @@ std::vector<Flow> Memory::learned(storage::SwitchKey key, LearnedFlows const &kn
   });
 }
 
-std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> wanted,
+std::vector<Flow> Memory::recall(storage::SwitchKey key, openflow::FlowParts const &wanted,
                                  std::chrono::seconds aging, storage::SeenAt now) {
   std::set<Place> aged;
   for (auto const &[place, known] : of_bridge(key).flows) {
@@ -333,7 +333,7 @@ std::vector<Flow> Memory::recall(storage::SwitchKey key, std::span<Flow const> w
   return recalled;
 }
 
-std::vector<Flow> Memory::missed(storage::SwitchKey key, std::span<Flow const> wanted) const {
+std::vector<Flow> Memory::missed(storage::SwitchKey key, openflow::FlowParts const &wanted) const {
   std::vector<Flow> flows;
   auto const bridge = bridges_.find(key);
   if (bridge == bridges_.end()) {
@@ -354,7 +354,7 @@ std::vector<Flow> Memory::missed(storage::SwitchKey key, std::span<Flow const> w
 }
 
 std::vector<Flow> Memory::with_other_timeouts(storage::SwitchKey key,
-                                              std::span<Flow const> wanted) const {
+                                              openflow::FlowParts const &wanted) const {
   std::vector<Flow> others;
   openvswitch::Teachers const teachers(wanted);
   for (auto const &flow : flows_that(key, [](Flow const &) { return true; })) {

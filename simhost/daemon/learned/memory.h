@@ -69,14 +69,14 @@ class Memory {
   /// What a bridge that is to have these flows knows once more. What was not seen for too long is
   /// forgotten.
   [[nodiscard]] std::vector<openflow::Flow> recall(storage::SwitchKey key,
-                                                   std::span<openflow::Flow const> wanted,
+                                                   openflow::FlowParts const &wanted,
                                                    std::chrono::seconds aging, storage::SeenAt now);
   /// What is missed of what a bridge knows that is to have these flows.
   [[nodiscard]] std::vector<openflow::Flow> missed(storage::SwitchKey key,
-                                                   std::span<openflow::Flow const> wanted) const;
+                                                   openflow::FlowParts const &wanted) const;
   /// What a bridge knows for another time than these flows would teach it.
   [[nodiscard]] std::vector<openflow::Flow> with_other_timeouts(
-      storage::SwitchKey key, std::span<openflow::Flow const> wanted) const;
+      storage::SwitchKey key, openflow::FlowParts const &wanted) const;
 
   /// Puts into the state what is not there yet. Returns whether all of it is: nothing is put while
   /// somebody else writes.

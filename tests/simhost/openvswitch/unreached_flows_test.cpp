@@ -5,8 +5,11 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <memory>
+#include <vector>
 
 #include "lab.h"
+#include "planes/openvswitch/compile/pipeline.h"
 #include "planes/openvswitch/openflow/text.h"
 
 namespace simhost::daemon {
@@ -92,8 +95,10 @@ TEST_F(ABridge, OfFewFlowsIsToldInOneBundle) {
 
 TEST_F(ABridge, SaysSoIfOpenVswitchRefusesAFlow) {
   auto wanted = switch_of(150);
-  auto &last = wanted.flows.back();
-  last.actions = {openflow::ToGroup{.group = 12345}};
+  openflow::Flow refused;
+  refused.table = openvswitch::table::kGeneration;
+  refused.actions = {openflow::ToGroup{.group = 12345}};
+  wanted.flows.add(std::make_shared<std::vector<openflow::Flow> const>(1, refused));
   EXPECT_THROW(add(wanted), openflow::HalfMade);
 }
 

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "planes/openvswitch/compile/network.h"
-#include "planes/openvswitch/openflow/flow.h"
+#include "planes/openvswitch/openflow/flow_parts.h"
 #include "planes/openvswitch/openflow/group.h"
 
 namespace simhost::openvswitch {
@@ -27,8 +27,8 @@ struct Rows {
 /// kCountedSources.
 struct Compiled {
   Rows rows;
-  std::vector<openflow::Flow> flows;    ///< in their order
-  std::vector<openflow::Group> groups;  ///< likewise
+  openflow::FlowParts flows;
+  std::vector<openflow::Group> groups;  ///< in their order
 };
 
 /// Refuses, in words, what no flows can be made of (QEX_LIMIT_EXCEEDED, QEX_BAD_PARAM).

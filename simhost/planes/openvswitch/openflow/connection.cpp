@@ -288,11 +288,11 @@ void Connection::change(Changes const &changes, Deadline deadline,
   throw ChangeRefused(index, refused, *error);
 }
 
-void Connection::add(std::span<Flow const> flows, Deadline deadline) {
+void Connection::add(std::span<Flow const *const> flows, Deadline deadline) {
   Writer out;
   auto const first = xid_ + 1;
-  for (auto const &flow : flows) {
-    put_added_flow(out, next_xid(), flow);
+  for (auto const *const flow : flows) {
+    put_added_flow(out, next_xid(), *flow);
   }
   put_barrier_request(out, next_xid());
   send(out);
@@ -301,7 +301,7 @@ void Connection::add(std::span<Flow const> flows, Deadline deadline) {
     if (index >= flows.size()) {
       throw Refused(*error);
     }
-    throw HalfMade(to_text(FlowChange{.flow = flows[index]}), *error);
+    throw HalfMade(to_text(FlowChange{.flow = *flows[index]}), *error);
   }
 }
 

@@ -57,7 +57,7 @@ class Connection {
   void change(Changes const &changes, Deadline deadline,
               std::function<void()> const &meanwhile = nullptr);
   /// Adds these one after the other, each by itself: throws HalfMade if one is refused.
-  void add(std::span<Flow const> flows, Deadline deadline);
+  void add(std::span<Flow const *const> flows, Deadline deadline);
   /// Returns when the switch is done with all that it was sent.
   void barrier(Deadline deadline);
   /// There are these meters from now on and no others, each of which drops what is more than so

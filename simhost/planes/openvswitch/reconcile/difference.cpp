@@ -1,4 +1,4 @@
-// Side by side, in the order of the places.
+// Side by side, in the order of the places, but for what both have in common.
 #include "planes/openvswitch/reconcile/difference.h"
 
 #include <algorithm>
@@ -27,7 +27,7 @@ struct InOrder {
 using Learned = std::map<LearnedFlows, std::set<Specs const *, InOrder>>;
 
 // What is learned by `wanted`, as far as it was learned by what goes: nearly all flows stay.
-Learned learned_instead(std::span<Flow const> wanted, Learned const &gone) {
+Learned learned_instead(openflow::FlowParts const &wanted, Learned const &gone) {
   Learned learned;
   if (!gone.empty()) {
     for (auto const &flow : wanted) {
@@ -54,7 +54,8 @@ std::vector<LearnedFlows> learned_otherwise(Learned const &before, Learned const
 }
 
 // Without those that somebody wanted teaches, and those that are forgotten anyway.
-std::vector<Flow> removed(std::vector<Flow const *> const &unwanted, std::span<Flow const> wanted,
+std::vector<Flow> removed(std::vector<Flow const *> const &unwanted,
+                          openflow::FlowParts const &wanted,
                           std::vector<LearnedFlows> const &forgotten) {
   std::set<LearnedFlows> known;
   for (auto const *flow : unwanted) {
@@ -74,8 +75,8 @@ std::vector<Flow> removed(std::vector<Flow const *> const &unwanted, std::span<F
 
 // Does `removed` with what is only present, `added` with what is only wanted, and `both` with
 // pairs.
-template <typename Value, typename Place, typename Removed, typename Added, typename Both>
-void side_by_side(std::span<Value const> present, std::span<Value const> wanted, Place const &place,
+template <typename Values, typename Place, typename Removed, typename Added, typename Both>
+void side_by_side(Values const &present, Values const &wanted, Place const &place,
                   Removed const &removed, Added const &added, Both const &both) {
   auto have = present.begin();
   auto want = wanted.begin();
@@ -101,8 +102,10 @@ bool Difference::empty() const {
          removed_groups.empty();
 }
 
-Difference difference(std::span<Flow const> present_flows, std::span<Group const> present_groups,
-                      std::span<Flow const> wanted_flows, std::span<Group const> wanted_groups) {
+Difference difference(openflow::FlowParts const &present_flows,
+                      std::span<Group const> present_groups,
+                      openflow::FlowParts const &wanted_flows,
+                      std::span<Group const> wanted_groups) {
   Difference all;
   side_by_side(
       present_groups, wanted_groups, [](Group const &group) { return group.id; },
@@ -120,17 +123,18 @@ Difference difference(std::span<Flow const> present_flows, std::span<Group const
                    [&](Learn const &learn) { gone[taught_by(learn)].insert(&learn.specs); });
   };
   side_by_side(
-      present_flows, wanted_flows, [](Flow const &flow) { return place(flow); },
-      [&](Flow const &flow) {
-        note_learned(flow);
-        unwanted.push_back(&flow);
+      present_flows.beside(wanted_flows), wanted_flows.beside(present_flows),
+      [](Flow const *flow) { return place(*flow); },
+      [&](Flow const *flow) {
+        note_learned(*flow);
+        unwanted.push_back(flow);
       },
-      [&](Flow const &flow) { all.added_flows.push_back(flow); },
-      [&](Flow const &present, Flow const &wanted) {
-        bool const is_same_kind = settings(present) == settings(wanted);
-        if (!is_same_kind || present.actions != wanted.actions) {
-          note_learned(present);
-          (is_same_kind ? all.changed_flows : all.added_flows).push_back(wanted);
+      [&](Flow const *flow) { all.added_flows.push_back(*flow); },
+      [&](Flow const *present, Flow const *wanted) {
+        bool const is_same_kind = settings(*present) == settings(*wanted);
+        if (!is_same_kind || present->actions != wanted->actions) {
+          note_learned(*present);
+          (is_same_kind ? all.changed_flows : all.added_flows).push_back(*wanted);
         }
       });
   all.forgotten = learned_otherwise(gone, learned_instead(wanted_flows, gone));

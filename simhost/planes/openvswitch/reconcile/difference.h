@@ -7,7 +7,7 @@
 #include <span>
 #include <vector>
 
-#include "planes/openvswitch/openflow/flow.h"
+#include "planes/openvswitch/openflow/flow_parts.h"
 #include "planes/openvswitch/openflow/group.h"
 
 namespace simhost::openvswitch {
@@ -46,11 +46,11 @@ struct Difference {
   [[nodiscard]] bool empty() const;
 };
 
-/// What the switch learned by a wanted flow that teaches as it did stays: see Teachers. All lists
-/// are in their order, no two flows of one have one place, and no two groups one number.
-Difference difference(std::span<openflow::Flow const> present_flows,
+/// What the switch learned by a wanted flow that teaches as it did stays: see Teachers. Groups are
+/// in their order, and no two have one number.
+Difference difference(openflow::FlowParts const &present_flows,
                       std::span<openflow::Group const> present_groups,
-                      std::span<openflow::Flow const> wanted_flows,
+                      openflow::FlowParts const &wanted_flows,
                       std::span<openflow::Group const> wanted_groups);
 
 }  // namespace simhost::openvswitch

@@ -46,7 +46,6 @@ Present present_of(std::span<FlowEntry const> flows, std::span<GroupEntry const>
     }
   }
   std::ranges::transform(groups, std::back_inserter(present.groups), group_of);
-  std::ranges::sort(present.flows);
   std::ranges::sort(present.groups);
   present.unplaced.assign(unplaced.begin(), unplaced.end());
   return present;

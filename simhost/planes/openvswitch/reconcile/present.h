@@ -13,8 +13,8 @@ namespace simhost::openvswitch {
 
 /// Flows and groups that say more than the values here can are like none that is wanted.
 struct Present {
-  std::vector<openflow::Flow> flows;    ///< in their order
-  std::vector<openflow::Group> groups;  ///< likewise
+  std::vector<openflow::Flow> flows;
+  std::vector<openflow::Group> groups;  ///< in their order
   /// Flows among which some cannot be told by their places: to be removed by their cookies, of
   /// which no other flow is among `flows`.
   std::vector<LearnedFlows> unplaced;

@@ -2,6 +2,7 @@
 #include "planes/openvswitch/reconcile/relearning.h"
 
 #include <algorithm>
+#include <utility>
 #include <variant>
 
 namespace simhost::openvswitch {
@@ -46,15 +47,16 @@ bool add(openflow::LearnedOutput const & /*spec*/, Flow const & /*before*/, Flow
 
 }  // namespace
 
-Teachers::Teachers(std::span<Flow const> flows) {
-  for (auto const &flow : flows) {
+Teachers::Teachers(openflow::FlowParts flows) : flows_(std::move(flows)) {
+  for (auto const &flow : flows_) {
     for_each_learn(flow.actions,
                    [&](Learn const &learn) { ways_[taught_by(learn)].push_back(&learn); });
   }
 }
 
-Teachers::Teachers(std::span<Flow const> flows, std::set<LearnedFlows> const &learned) {
-  for (auto const &flow : flows) {
+Teachers::Teachers(openflow::FlowParts flows, std::set<LearnedFlows> const &learned)
+    : flows_(std::move(flows)) {
+  for (auto const &flow : flows_) {
     for_each_learn(flow.actions, [&](Learn const &learn) {
       if (auto const taught = taught_by(learn); learned.contains(taught)) {
         ways_[taught].push_back(&learn);

@@ -5,20 +5,19 @@
 #include <map>
 #include <optional>
 #include <set>
-#include <span>
 #include <vector>
 
-#include "planes/openvswitch/openflow/flow.h"
+#include "planes/openvswitch/openflow/flow_parts.h"
 #include "planes/openvswitch/reconcile/difference.h"
 
 namespace simhost::openvswitch {
 
-/// How flows teach others. They outlive it.
+/// How flows teach others.
 class Teachers {
  public:
-  explicit Teachers(std::span<openflow::Flow const> flows);
+  explicit Teachers(openflow::FlowParts flows);
   /// Likewise, as far as they teach those: nothing is known of others.
-  Teachers(std::span<openflow::Flow const> flows, std::set<LearnedFlows> const &learned);
+  Teachers(openflow::FlowParts flows, std::set<LearnedFlows> const &learned);
 
   /// The one way in which some of them teach those, whatever their limits; nothing if there are
   /// several.
@@ -28,6 +27,7 @@ class Teachers {
   [[nodiscard]] bool teach(openflow::Flow const &flow) const;
 
  private:
+  openflow::FlowParts flows_;
   std::map<LearnedFlows, std::vector<openflow::Learn const *>> ways_;
 };
 
