@@ -5,15 +5,16 @@
 namespace simhost::daemon {
 
 CompiledSwitch const &Compiler::compile(storage::SwitchKey key, openvswitch::Network network) {
-  auto const found = kept_.find(key);
-  if (found != kept_.end() && found->second.made.network == network) {
-    found->second.is_asked_for = true;
-    return found->second.made;
-  }
-  auto flows = std::make_shared<openvswitch::Compiled const>(openvswitch::compile(network));
   auto &kept = kept_[key];
+  if (kept.made.flows && kept.made.network == network) {
+    kept.is_asked_for = true;
+    return kept.made;
+  }
+  auto flows = std::make_shared<openvswitch::Compiled const>(
+      openvswitch::compile(network, kept.made_of_ports));
   replaced_.push_back(std::move(kept.made.flows));
-  kept = {.made = {.network = std::move(network), .flows = std::move(flows)}};
+  kept.made = {.network = std::move(network), .flows = std::move(flows)};
+  kept.is_asked_for = true;
   return kept.made;
 }
 

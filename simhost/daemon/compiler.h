@@ -1,5 +1,5 @@
-// What was made of each switch last: most changes are of one switch or of none, and what happens
-// around a host of none at all.
+// What was made of each switch last: most changes are of one port of one switch or of none, and
+// what happens around a host of none at all.
 #pragma once
 
 #include <map>
@@ -33,6 +33,7 @@ class Compiler {
  private:
   struct Kept {
     CompiledSwitch made;
+    openvswitch::MadeOfPorts made_of_ports;
     bool is_asked_for = true;
   };
 

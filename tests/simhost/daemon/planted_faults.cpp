@@ -7,14 +7,15 @@
 
 using simhost::openflow::Group;
 using simhost::openvswitch::Compiled;
+using simhost::openvswitch::MadeOfPorts;
 using simhost::openvswitch::Network;
 
-Compiled compile_well(Network const &network) asm(
-    "__real__ZN7simhost11openvswitch7compileERKNS0_7NetworkE");
-Compiled compile_with_faults(Network const &network) asm(
-    "__wrap__ZN7simhost11openvswitch7compileERKNS0_7NetworkE");
+Compiled compile_well(Network const &network, MadeOfPorts &before) asm(
+    "__real__ZN7simhost11openvswitch7compileERKNS0_7NetworkERNS0_11MadeOfPortsE");
+Compiled compile_with_faults(Network const &network, MadeOfPorts &before) asm(
+    "__wrap__ZN7simhost11openvswitch7compileERKNS0_7NetworkERNS0_11MadeOfPortsE");
 
-Compiled compile_with_faults(Network const &network) {
+Compiled compile_with_faults(Network const &network, MadeOfPorts &before) {
   constexpr std::uint16_t kNotCompiled = 6001;
   constexpr std::uint16_t kNotEncoded = 6002;
   constexpr std::uint16_t kRefused = 6003;
@@ -22,7 +23,7 @@ Compiled compile_with_faults(Network const &network) {
   if (network.mtu == kNotCompiled) {
     throw std::logic_error("a fault planted in the compiler");
   }
-  auto compiled = compile_well(network);
+  auto compiled = compile_well(network, before);
   if (network.mtu == kNotEncoded) {
     compiled.groups.push_back({.id = kLast, .selection = {.method = std::string(16, 'x')}});
   } else if (network.mtu == kRefused) {

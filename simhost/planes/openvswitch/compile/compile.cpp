@@ -2,8 +2,10 @@
 #include "planes/openvswitch/compile/compile.h"
 
 #include <algorithm>
+#include <memory>
 #include <set>
 #include <string>
+#include <utility>
 
 #include "base/outcomes.h"
 #include "planes/openvswitch/compile/stages/stages.h"
@@ -93,6 +95,27 @@ void check_mirrors(Network const &network) {
   }
 }
 
+template <typename OfWhat>
+using Stage = void(OfWhat const &, Program &);
+
+constexpr Stage<Plan> *kStages[]{
+    compile_admission,  compile_sources, compile_tags,           compile_private_vlans,
+    compile_own_frames, compile_mirrors, compile_remote_mirrors, compile_learning,
+    compile_adding_up,  compile_lookup,  compile_receiving,      compile_dispatch,
+    compile_groups,     compile_lists,   compile_teams,          compile_counting};
+constexpr Stage<PortPlan> *kStagesOfPorts[]{compile_admission,  compile_sources,  compile_tags,
+                                            compile_own_frames, compile_mirrors,  compile_learning,
+                                            compile_lookup,     compile_dispatch, compile_delivery,
+                                            compile_teams,      compile_counting};
+
+openflow::FlowPart made_of(PortPlan const &plan) {
+  Program program;
+  for (auto *const stage : kStagesOfPorts) {
+    stage(plan, program);
+  }
+  return std::make_shared<std::vector<openflow::Flow> const>(program.take_flows());
+}
+
 }  // namespace
 
 void check(Network const &network) {
@@ -102,21 +125,56 @@ void check(Network const &network) {
   check_mirrors(network);
 }
 
-Compiled compile(Network const &network) {
+openflow::FlowPart const &MadeOfPorts::of(PortPlan const &plan) {
+  auto const known = made_.find(plan.port.port);
+  if (known != made_.end() && known->second.port == plan.port &&
+      known->second.among_others == plan.among_others) {
+    return known->second.flows;
+  }
+  Made made{.port = plan.port, .among_others = plan.among_others, .flows = made_of(plan)};
+  return made_.insert_or_assign(plan.port.port, std::move(made)).first->second.flows;
+}
+
+std::vector<openflow::FlowPart> MadeOfPorts::of(Plan const &plan) {
+  if (common_ != plan.common) {
+    made_.clear();
+    common_ = plan.common;
+  }
+  std::vector<openflow::FlowPart> parts;
+  parts.reserve(plan.ports().size());
+  for (auto const &port : plan.ports()) {
+    parts.push_back(of(port));
+  }
+  if (made_.size() > parts.size()) {
+    std::set<openflow::Port> there;
+    for (auto const &port : plan.ports()) {
+      there.insert(port.port.port);
+    }
+    std::erase_if(made_, [&](auto const &made) { return !there.contains(made.first); });
+  }
+  return parts;
+}
+
+Compiled compile(Network const &network, MadeOfPorts &before) {
   check(network);
   Plan const plan(network);
   Program program;
-  for (auto *stage :
-       {compile_admission, compile_sources, compile_tags, compile_private_vlans, compile_own_frames,
-        compile_mirrors, compile_remote_mirrors, compile_learning, compile_adding_up,
-        compile_lookup, compile_receiving, compile_dispatch, compile_groups, compile_lists,
-        compile_delivery, compile_teams, compile_counting}) {
+  for (auto *const stage : kStages) {
     stage(plan, program);
   }
-  return {.rows = {.most_tags = has_use_for_second_tags(network) ? 2U : 1U,
-                   .most_learned = network.addresses.limit},
-          .flows = program.take_flows(),
-          .groups = program.take_groups()};
+  Compiled compiled{.rows = {.most_tags = has_use_for_second_tags(network) ? 2U : 1U,
+                             .most_learned = network.addresses.limit},
+                    .flows = program.take_flows(),
+                    .groups = program.take_groups()};
+  for (auto &part : before.of(plan)) {
+    compiled.flows.add(std::move(part));
+  }
+  return compiled;
+}
+
+Compiled compile(Network const &network) {
+  MadeOfPorts nothing;
+  return compile(network, nothing);
 }
 
 openflow::Flow generation_marker(std::uint64_t generation) {

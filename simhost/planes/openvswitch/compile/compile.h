@@ -3,9 +3,11 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <vector>
 
 #include "planes/openvswitch/compile/network.h"
+#include "planes/openvswitch/compile/plan.h"
 #include "planes/openvswitch/openflow/flow_parts.h"
 #include "planes/openvswitch/openflow/group.h"
 
@@ -31,9 +33,31 @@ struct Compiled {
   std::vector<openflow::Group> groups;  ///< in their order
 };
 
+/// What was made of each port of a switch for itself when it was compiled last. Each is kept with
+/// all that it was made of, and made anew unless all of that is the same.
+class MadeOfPorts {
+ public:
+  /// What is made of these, one after the other. The others are forgotten.
+  std::vector<openflow::FlowPart> of(Plan const &plan);
+
+ private:
+  struct Made {
+    Port port;
+    AmongOthers among_others;
+    openflow::FlowPart flows;
+  };
+
+  openflow::FlowPart const &of(PortPlan const &plan);
+
+  Common common_;
+  std::map<openflow::Port, Made> made_;
+};
+
 /// Refuses, in words, what no flows can be made of (QEX_LIMIT_EXCEEDED, QEX_BAD_PARAM).
 void check(Network const &network);
-/// Likewise.
+/// Likewise. What `before` has is not made again, which makes it nothing else.
+Compiled compile(Network const &network, MadeOfPorts &before);
+/// Likewise, all of it.
 Compiled compile(Network const &network);
 
 /// The flow that says which change of the configuration is in force.

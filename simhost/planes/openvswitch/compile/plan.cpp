@@ -23,36 +23,30 @@ bool is_mirrored_to(Network const &network, Port const &port) {
   });
 }
 
+bool may_return(Network const &network) {
+  auto const &uplinks = network.uplinks;
+  if (network.is_mesh() || uplinks.empty()) {
+    return false;
+  }
+  return uplinks.size() > 1 || std::ranges::any_of(network.ports, &Port::transmits_by_uplink);
+}
+
 }  // namespace
 
-Plan::Plan(Network const &given) : network(given), ways(given) {
-  note_private_vlans();
-  note_addresses();
-  note_fixed_addresses();
-  note_lookups();
+Common::Common(Network const &network)
+    : mtu(network.mtu),
+      addresses(network.addresses),
+      mirrors(network.mirrors),
+      hears_igmp(network.multicast.hears_igmp),
+      hears_mld(network.multicast.hears_mld),
+      has_uplinks(!network.uplinks.empty()),
+      any_promiscuous(std::ranges::any_of(network.ports, &Port::promiscuous)),
+      frames_may_return(may_return(network)) {
+  note_private_vlans(network);
 }
 
-bool Plan::is_looked_at(Port const &port) const {
-  return looked_at_[index_of(port)];
-}
-
-bool Plan::counts_sent(Port const &port) const {
-  return index_of(port) < counted_ports_;
-}
-
-std::uint16_t Plan::hard_timeout() const {
-  auto const aging = network.addresses.aging;
-  return aging > kLongestTimeout ? 0 : static_cast<std::uint16_t>(aging);
-}
-
-bool Plan::filters_by_address() const {
-  auto const &multicast = network.multicast;
-  return !multicast.hears_igmp && !multicast.hears_mld &&
-         std::ranges::any_of(network.ports,
-                             [](Port const &port) { return port.asked_groups.has_value(); });
-}
-
-void Plan::note_private_vlans() {
+void Common::note_private_vlans(Network const &network) {
+  kinds_.resize(Vlans().size());
   for (std::size_t vlan = 0; vlan < kinds_.size(); ++vlan) {
     kinds_[vlan].domain = static_cast<std::uint16_t>(vlan);
   }
@@ -65,16 +59,44 @@ void Plan::note_private_vlans() {
   private_vlans_.assign(named.begin(), named.end());
 }
 
-bool Plan::frames_may_return() const {
-  auto const &uplinks = network.uplinks;
-  auto const &ports = network.ports;
-  if (network.is_mesh()) {
-    return false;
+std::uint16_t Common::hard_timeout() const {
+  return addresses.aging > kLongestTimeout ? 0 : static_cast<std::uint16_t>(addresses.aging);
+}
+
+Plan::Plan(Network const &given)
+    : network(given), common(given), ways(given), outlets(outlets_of(ways)) {
+  note_lookups();
+  note_ports();
+  note_addresses();
+  note_fixed_addresses();
+}
+
+bool Plan::is_looked_at(Port const &port) const {
+  return looked_at_[index_of(port)];
+}
+
+bool Plan::counts_sent(Port const &port) const {
+  return index_of(port) < counted_ports_;
+}
+
+bool Plan::filters_by_address() const {
+  auto const &multicast = network.multicast;
+  return !multicast.hears_igmp && !multicast.hears_mld &&
+         std::ranges::any_of(network.ports,
+                             [](Port const &port) { return port.asked_groups.has_value(); });
+}
+
+void Plan::note_ports() {
+  ports_.reserve(network.ports.size());
+  for (auto const &port : network.ports) {
+    AmongOthers among_others;
+    if (auto const *const way = ways.of(port)) {
+      among_others.way = way->number;
+      among_others.out = outlets.actions.at(way->number);
+    }
+    among_others.counts_sent = counts_sent(port);
+    ports_.push_back({.common = common, .port = port, .among_others = std::move(among_others)});
   }
-  return uplinks.size() > 1 ||
-         (!uplinks.empty() && std::any_of(ports.begin(), ports.end(), [](Port const &port) {
-           return port.transmits_by_uplink;
-         }));
 }
 
 Vlans Plan::domains_of(Port const &port) const {
@@ -82,7 +104,7 @@ Vlans Plan::domains_of(Port const &port) const {
   auto const carried = carried_by(port.vlan);
   for (std::size_t vlan = 0; vlan < carried.tagged.size(); ++vlan) {
     if (carried.tagged[vlan] || vlan == carried.untagged) {
-      domains.set(kinds_[vlan].domain);
+      domains.set(common.kind_of(static_cast<std::uint16_t>(vlan)).domain);
     }
   }
   return domains;
@@ -90,20 +112,18 @@ Vlans Plan::domains_of(Port const &port) const {
 
 void Plan::note_addresses() {
   std::map<EthernetAddress, Vlans> all_taken;
-  for (auto const &port : network.ports) {
-    if (!port.address || !has_vlan(*this, port)) {
+  for (auto &[_, port, among_others] : ports_) {
+    if (!port.address || !has_vlan(common, port)) {
       continue;
     }
-    auto const add = [&](VlanMask const &domains) {
-      own_addresses_.push_back({.port = &port, .address = *port.address, .domains = domains});
-    };
+    auto &own = among_others.own_domains;
     auto &taken = all_taken[*port.address];
     if (port.vlan.carried) {
       auto const domains = domains_of(port) & ~taken;
-      std::ranges::for_each(masks_with_0_of(domains), add);
+      own = masks_with_0_of(domains);
       taken |= domains;
-    } else if (auto const domain = kind_of(port.vlan.vlan).domain; !taken[domain]) {
-      add({.vlan = domain, .mask = kWholeVlan});
+    } else if (auto const domain = common.kind_of(port.vlan.vlan).domain; !taken[domain]) {
+      own.push_back({.vlan = domain, .mask = kWholeVlan});
       taken.set(domain);
     }
   }
@@ -117,7 +137,7 @@ void Plan::note_fixed_addresses() {
   }
   std::set<std::pair<EthernetAddress, std::uint16_t>> taken;
   for (auto const &fixed : network.fixed_addresses) {
-    auto const domain = kind_of(fixed.vlan).domain;
+    auto const domain = common.kind_of(fixed.vlan).domain;
     if (taken.insert({fixed.address, domain}).second) {
       auto const found = fixed.port ? ports.find(*fixed.port) : ports.end();
       fixed_places_.push_back({.address = fixed.address,
@@ -130,7 +150,8 @@ void Plan::note_fixed_addresses() {
 
 void Plan::note_lookups() {
   for (auto const &port : network.ports) {
-    looked_at_.push_back(port.vlan.carried || kind_of(port.vlan.vlan).kind != PrivateKind::none ||
+    looked_at_.push_back(port.vlan.carried ||
+                         common.kind_of(port.vlan.vlan).kind != PrivateKind::none ||
                          port.transmits_by_uplink || is_mirrored_to(network, port));
   }
   auto const taken = static_cast<std::size_t>(std::ranges::count(looked_at_, true));
@@ -141,12 +162,12 @@ bool is_closed(Port const &port) {
   return port.blocked || port.address_changed;
 }
 
-bool has_vlan(Plan const &plan, Port const &port) {
-  return !port.vlan.must_be_private || plan.kind_of(port.vlan.vlan).kind != PrivateKind::none;
+bool has_vlan(Common const &common, Port const &port) {
+  return !port.vlan.must_be_private || common.kind_of(port.vlan.vlan).kind != PrivateKind::none;
 }
 
-bool takes_frames(Plan const &plan, Port const &port) {
-  return !is_closed(port) && !port.mirrors_only && has_vlan(plan, port);
+bool takes_frames(Common const &common, Port const &port) {
+  return !is_closed(port) && !port.mirrors_only && has_vlan(common, port);
 }
 
 bool sends_frames(Port const &port) {

@@ -1,8 +1,7 @@
-// Flows in their order, and the tags that ports and uplinks get alike.
+// Flows as they are counted, and the tags that ports and uplinks get alike.
 #include "planes/openvswitch/compile/program.h"
 
 #include <algorithm>
-#include <iterator>
 
 namespace simhost::openvswitch {
 namespace {
@@ -19,27 +18,11 @@ constexpr openflow::Value kAllReceivers = openflow::ones(48);
 }  // namespace
 
 void Program::add(std::uint8_t table, Rule rule) {
-  flows_[{table, rule.priority}].push_back({.table = table,
-                                            .priority = rule.priority,
-                                            .match = std::move(rule.match),
-                                            .cookie = rule.cookie,
-                                            .actions = std::move(rule.actions)});
-}
-
-std::vector<openflow::Flow> Program::take_flows() {
-  std::size_t count = 0;
-  for (auto const &[place, flows] : flows_) {
-    count += flows.size();
-  }
-  std::vector<openflow::Flow> all;
-  all.reserve(count);
-  for (auto &[place, flows] : flows_) {
-    if (!std::ranges::is_sorted(flows)) {
-      std::ranges::sort(flows);
-    }
-    std::ranges::move(flows, std::back_inserter(all));
-  }
-  return all;
+  flows_.push_back({.table = table,
+                    .priority = rule.priority,
+                    .match = std::move(rule.match),
+                    .cookie = rule.cookie,
+                    .actions = std::move(rule.actions)});
 }
 
 std::vector<openflow::Group> Program::take_groups() {

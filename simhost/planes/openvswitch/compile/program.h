@@ -3,7 +3,6 @@
 
 #include <cstdint>
 #include <initializer_list>
-#include <map>
 #include <utility>
 #include <vector>
 
@@ -31,14 +30,13 @@ class Program {
   void add(std::uint8_t table, Rule rule);
   void add(openflow::Group group) { groups_.push_back(std::move(group)); }
 
+  /// In no order: to sort all of a switch takes as long as all stages.
+  std::vector<openflow::Flow> take_flows() { return std::move(flows_); }
   /// In their order.
-  std::vector<openflow::Flow> take_flows();
   std::vector<openflow::Group> take_groups();
 
  private:
-  // By table and priority: what is added for one port after the other is mostly in its order there,
-  // and sorting all of it takes as long as all stages.
-  std::map<std::pair<std::uint8_t, std::uint16_t>, std::vector<openflow::Flow>> flows_;
+  std::vector<openflow::Flow> flows_;
   std::vector<openflow::Group> groups_;
 };
 

@@ -57,18 +57,6 @@ void hear_beacons(Plan const &plan, Program &program) {
   }
 }
 
-void admit(Program &program, Port const &port) {
-  auto const match = from(port.port);
-  if (!sends_frames(port)) {
-    refuse(program, 500, match, cookie(Counted::blocked, port.number));
-    return;
-  }
-  program.add(table::kAdmission, {.priority = 500,
-                                  .match = match,
-                                  .actions = {go_to(table::kSources)},
-                                  .cookie = cookie(Counted::port, port.number)});
-}
-
 void admit(Program &program, Uplink const &uplink) {
   auto const match = from(uplink.port);
   if (uplink.blocked) {
@@ -91,12 +79,22 @@ void compile_admission(Plan const &plan, Program &program) {
   }
   refuse_malformed(plan, program);
   hear_beacons(plan, program);
-  for (auto const &port : plan.network.ports) {
-    admit(program, port);
-  }
   for (auto const &uplink : plan.network.uplinks) {
     admit(program, uplink);
   }
+}
+
+void compile_admission(PortPlan const &plan, Program &program) {
+  auto const &port = plan.port;
+  auto const match = from(port.port);
+  if (!sends_frames(port)) {
+    refuse(program, 500, match, cookie(Counted::blocked, port.number));
+    return;
+  }
+  program.add(table::kAdmission, {.priority = 500,
+                                  .match = match,
+                                  .actions = {go_to(table::kSources)},
+                                  .cookie = cookie(Counted::port, port.number)});
 }
 
 }  // namespace simhost::openvswitch

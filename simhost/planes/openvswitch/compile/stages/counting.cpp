@@ -35,18 +35,19 @@ void keep_own_frames(Program &program, Port const &port) {
 }  // namespace
 
 void compile_counting(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    count_dropped(program, port);
-    if (takes_frames(plan, port) && plan.counts_sent(port)) {
-      keep_own_frames(program, port);
-      send(program, port);
-    }
-  }
   for (auto const &uplink : plan.network.uplinks) {
     count_dropped(program, uplink);
     if (!uplink.blocked) {
       send(program, uplink);
     }
+  }
+}
+
+void compile_counting(PortPlan const &plan, Program &program) {
+  count_dropped(program, plan.port);
+  if (takes_frames(plan.common, plan.port) && plan.among_others.counts_sent) {
+    keep_own_frames(program, plan.port);
+    send(program, plan.port);
   }
 }
 

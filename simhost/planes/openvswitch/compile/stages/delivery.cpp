@@ -16,10 +16,14 @@ openflow::Value number_of(PrivateKind kind) {
 
 class Delivery {
  public:
-  Delivery(Plan const &plan, Program &program, Port const &port)
-      : plan_(plan), program_(program), port_(port) {
-    copies_ = copies(plan, &Mirror::received, &MirrorSources::ports, port.port, Copied::leaving);
-  }
+  Delivery(PortPlan const &plan, Program &program)
+      : common_(plan.common),
+        program_(program),
+        port_(plan.port),
+        copies_(copies(common_.mirrors, &Mirror::received, &MirrorSources::ports, port_.port,
+                       Copied::leaving)),
+        out_(plan.among_others.counts_sent ? Actions{go_to(table::kSending)}
+                                           : Actions{openflow::Output{.port = port_.port}}) {}
 
   void compile() {
     keep_own_frames();
@@ -50,7 +54,7 @@ class Delivery {
 
   void compile_access() {
     auto const vlan = port_.vlan.vlan;
-    auto const &[domain, kind] = plan_.kind_of(vlan);
+    auto const &[domain, kind] = common_.kind_of(vlan);
     if (kind == PrivateKind::promiscuous) {
       deliver(100, to_vlan_port().with(field::kDomain, domain), out_);
       return;
@@ -70,7 +74,7 @@ class Delivery {
   void compile_trunk() {
     auto const carried = carried_by(port_.vlan);
     auto const masks = masks_of(carried.tagged);
-    if (!plan_.private_vlans().empty()) {
+    if (!common_.private_vlans().empty()) {
       // What is isolated is not even for ports that carry its VLAN; the primary one stands for it.
       in_domain(300, PrivateKind::isolated, carried.untagged, masks);
       add(250, to_port().with(field::kPrivateKind, number_of(PrivateKind::isolated)), {});
@@ -85,7 +89,7 @@ class Delivery {
       deliver(100, to_vlan_port().with(field::kVlan, mask.vlan, mask.mask),
               with_tag(field::kVlan, out_));
     }
-    if (!plan_.private_vlans().empty()) {
+    if (!common_.private_vlans().empty()) {
       in_domain(50, PrivateKind::community, carried.untagged, masks);
     }
   }
@@ -126,21 +130,18 @@ class Delivery {
                                     .cookie = cookie(Counted::port, port_.number)});
   }
 
-  Plan const &plan_;
+  Common const &common_;
   Program &program_;
   Port const &port_;
-  Actions copies_;  ///< of the frame as it is inside
-  Actions const out_ = plan_.counts_sent(port_) ? Actions{go_to(table::kSending)}
-                                                : Actions{openflow::Output{.port = port_.port}};
+  Actions const copies_;  ///< of the frame as it is inside
+  Actions const out_;
 };
 
 }  // namespace
 
-void compile_delivery(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    if (takes_frames(plan, port)) {
-      Delivery(plan, program, port).compile();
-    }
+void compile_delivery(PortPlan const &plan, Program &program) {
+  if (takes_frames(plan.common, plan.port)) {
+    Delivery(plan, program).compile();
   }
 }
 

@@ -130,7 +130,7 @@ Ports reached(Plan const &plan, Ports const &ports, Way const *way) {
 std::map<EthernetAddress, Ports> asked_groups(Plan const &plan) {
   std::map<EthernetAddress, Ports> asked;
   for (auto const &port : plan.network.ports) {
-    if (port.asked_groups && !port.promiscuous && takes_frames(plan, port)) {
+    if (port.asked_groups && !port.promiscuous && takes_frames(plan.common, port)) {
       for (auto const &address : *port.asked_groups) {
         auto &ports = asked[address];
         if (ports.empty() || ports.back() != &port) {
@@ -204,11 +204,12 @@ class ByMembership {
   // Null unless the port takes part in that VLAN. One that tags is looked at when frames come.
   [[nodiscard]] Port const *find(std::uint32_t number, std::uint16_t domain) const {
     auto const found = ports_.find(number);
-    if (found == ports_.end() || !takes_frames(plan_, *found->second)) {
+    if (found == ports_.end() || !takes_frames(plan_.common, *found->second)) {
       return nullptr;
     }
     auto const &vlan = found->second->vlan;
-    return vlan.carried || plan_.kind_of(vlan.vlan).domain == domain ? found->second : nullptr;
+    return vlan.carried || plan_.common.kind_of(vlan.vlan).domain == domain ? found->second
+                                                                            : nullptr;
   }
   void note(Takers &takers, multicast::Place const &place) const {
     if (auto const *port = find(place.port, place.vlan)) {
@@ -218,7 +219,7 @@ class ByMembership {
 
   void note_takers() {
     for (auto const &port : plan_.network.ports) {
-      if (!takes_frames(plan_, port)) {
+      if (!takes_frames(plan_.common, port)) {
         continue;
       }
       if (port.promiscuous) {
@@ -246,7 +247,7 @@ class ByMembership {
   }
 
   [[nodiscard]] std::uint16_t domain_of(Port const *port) const {
-    return plan_.kind_of(port->vlan.vlan).domain;
+    return plan_.common.kind_of(port->vlan.vlan).domain;
   }
 
   void compile_list(List list, Takers const &takers) {

@@ -19,13 +19,13 @@ constexpr std::uint16_t kLongestUnadded = 15;
 // At a port: somebody may send from one address after the other.
 constexpr std::uint32_t kMostRefused = 100;
 
-openflow::Action learn(Plan const &plan, std::uint32_t number, openflow::Port place,
+openflow::Action learn(Common const &common, std::uint32_t number, openflow::Port place,
                        std::uint32_t limit) {
   return openflow::Learn{
       .table = table::kLearnedAddresses,
       .priority = 100,
       .cookie = cookie(Counted::learned, number),
-      .hard_timeout = plan.hard_timeout(),
+      .hard_timeout = common.hard_timeout(),
       .deletes_learned = true,
       .limit = limit,
       .result = field::kVerdict,
@@ -46,25 +46,29 @@ void add(Program &program, std::uint8_t where, std::uint16_t priority, Match con
 
 // An address that stays where it is teaches nothing.
 void pass_over_fixed(Plan const &plan, Program &program) {
-  for (auto const &own : plan.own_addresses()) {
-    add(program, table::kLearning, 200, with_address(Match(), Field::eth_src, own),
-        {go_to(table::kLookup)}, own.port->number);
-  }
   for (auto const &fixed : plan.fixed_places()) {
     add(program, table::kLearning, 210, with_address(Match(), Field::eth_src, fixed),
         {go_to(table::kLookup)}, 0);
   }
 }
 
+void pass_over_own(PortPlan const &plan, Program &program) {
+  auto const &port = plan.port;
+  for (auto const &domains : plan.among_others.own_domains) {
+    add(program, table::kLearning, 200,
+        with_address(Match(), Field::eth_src, *port.address, domains), {go_to(table::kLookup)},
+        port.number);
+  }
+}
+
 // One that moves when it is seen elsewhere moves back when it is seen here.
-void learn_own_again(Plan const &plan, Program &program) {
-  for (auto const &own : plan.own_addresses()) {
-    auto const match = with_address(from(own.port->port), Field::eth_src, own);
-    add(program, table::kLearning, 220, questions(match), {go_to(table::kLookup)},
-        own.port->number);
+void learn_own_again(PortPlan const &plan, Program &program) {
+  auto const &port = plan.port;
+  for (auto const &domains : plan.among_others.own_domains) {
+    auto const match = with_address(from(port.port), Field::eth_src, *port.address, domains);
+    add(program, table::kLearning, 220, questions(match), {go_to(table::kLookup)}, port.number);
     add(program, table::kLearning, 200, match,
-        {learn(plan, own.port->number, own.port->port, 0), go_to(table::kLookup)},
-        own.port->number);
+        {learn(plan.common, port.number, port.port, 0), go_to(table::kLookup)}, port.number);
   }
 }
 
@@ -76,7 +80,7 @@ openflow::Action count_for_switch(Plan const &plan) {
       .table = table::kCountedSources,
       .priority = 100,
       .cookie = cookie(Counted::counted_source),
-      .hard_timeout = plan.hard_timeout(),
+      .hard_timeout = plan.common.hard_timeout(),
       .deletes_learned = true,
       .limit = plan.network.addresses.limit,
       .result = field::kVerdict,
@@ -139,12 +143,12 @@ void judge(Program &program, std::uint8_t where, Port const &port, Actions actio
                                        port.number)});
 }
 
-void learn_at(Plan const &plan, Program &program, Port const &port) {
-  bool const may_have_some = port.learning->limit != 0 && plan.network.addresses.limit != 0;
+void learn_at(Common const &common, Program &program, Port const &port) {
+  bool const may_have_some = port.learning->limit != 0 && common.addresses.limit != 0;
   if (may_have_some) {
     add(program, table::kLearning, 100, from(port.port), learn_source(), port.number);
     teach(program, from(port.port), port.port,
-          learn(plan, port.number, port.port, port.learning->limit),
+          learn(common, port.number, port.port, port.learning->limit),
           cookie(Counted::port, port.number));
     ask(program, from(port.port), port.number);
     add(program, table::kLearning, 160, questions(from(port.port), kHasNoRoom),
@@ -174,7 +178,7 @@ void learn_beyond(Plan const &plan, Program &program) {
     auto const learn_from = [&](Match const &match, openflow::Port place) {
       ask(program, match, 0);
       add(program, table::kLearning, 100, match, learn_source(), 0);
-      teach(program, match, place, learn(plan, 0, place, addresses.uplink_limit),
+      teach(program, match, place, learn(plan.common, 0, place, addresses.uplink_limit),
             cookie(Counted::port));
     };
     // What is not learned takes no room of the switch.
@@ -192,25 +196,14 @@ void learn_beyond(Plan const &plan, Program &program) {
   }
 }
 
-void learn_at_ports(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    if (sends_frames(port) && port.learning) {
-      learn_at(plan, program, port);
-    }
-  }
-}
-
 }  // namespace
 
 void compile_learning(Plan const &plan, Program &program) {
   auto const &addresses = plan.network.addresses;
   if (addresses.aging != 0) {
-    if (addresses.fixed_ones_move) {
-      learn_own_again(plan, program);
-    } else {
+    if (!addresses.fixed_ones_move) {
       pass_over_fixed(plan, program);
     }
-    learn_at_ports(plan, program);
     if (!plan.network.uplinks.empty()) {
       learn_beyond(plan, program);
     }
@@ -221,6 +214,21 @@ void compile_learning(Plan const &plan, Program &program) {
                 {.actions = {go_to(table::kCountedSources), go_to(table::kTakingRoom)}});
     take_room(plan, program);
     program.add(table::kSwitchLimit, {.actions = {go_to(table::kLookup)}});
+  }
+}
+
+void compile_learning(PortPlan const &plan, Program &program) {
+  auto const &addresses = plan.common.addresses;
+  if (addresses.aging == 0) {
+    return;
+  }
+  if (addresses.fixed_ones_move) {
+    learn_own_again(plan, program);
+  } else {
+    pass_over_own(plan, program);
+  }
+  if (sends_frames(plan.port) && plan.port.learning) {
+    learn_at(plan.common, program, plan.port);
   }
 }
 

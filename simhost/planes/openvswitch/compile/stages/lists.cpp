@@ -63,11 +63,12 @@ class Lists {
     Members members;
     for (auto const &port : plan_.network.ports) {
       bool const of_way = way == nullptr || plan_.ways.of(port) == way;
-      if (!takes_frames(plan_, port) || !of_way || !is_on(list, port)) {
+      if (!takes_frames(plan_.common, port) || !of_way || !is_on(list, port)) {
         continue;
       }
-      auto &ports = port.vlan.carried ? members.trunks
-                                      : members.by_domain[plan_.kind_of(port.vlan.vlan).domain];
+      auto &ports = port.vlan.carried
+                        ? members.trunks
+                        : members.by_domain[plan_.common.kind_of(port.vlan.vlan).domain];
       ports.push_back(&port);
     }
     return members;

@@ -10,9 +10,9 @@ namespace {
 using openflow::Field;
 
 // The later table of two that know an address has the last word.
-Actions look_up(Plan const &plan, std::uint8_t next) {
+Actions look_up(Addresses const &addresses, std::uint8_t next) {
   Actions actions;
-  if (plan.network.addresses.fixed_ones_move) {
+  if (addresses.fixed_ones_move) {
     append(actions, {go_to(table::kFirstAddresses), go_to(table::kFixedAddresses),
                      go_to(table::kLearnedAddresses)});
   } else {
@@ -51,21 +51,24 @@ void put(Program &program, FixedPlace const &fixed) {
 }  // namespace
 
 void compile_lookup(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    if (sends_frames(port)) {
-      let_in(program, port, look_up(plan, table::kDispatch));
-    }
-  }
   for (auto const &uplink : plan.network.uplinks) {
     if (!uplink.blocked) {
-      let_in(program, uplink, look_up(plan, table::kReceiving));
+      let_in(program, uplink, look_up(plan.network.addresses, table::kReceiving));
     }
-  }
-  for (auto const &own : plan.own_addresses()) {
-    put(program, 200, with_address(Match(), Field::eth_dst, own), own.port->port, own.port->number);
   }
   for (auto const &fixed : plan.fixed_places()) {
     put(program, fixed);
+  }
+}
+
+void compile_lookup(PortPlan const &plan, Program &program) {
+  auto const &port = plan.port;
+  if (sends_frames(port)) {
+    let_in(program, port, look_up(plan.common.addresses, table::kDispatch));
+  }
+  for (auto const &domains : plan.among_others.own_domains) {
+    put(program, 200, with_address(Match(), Field::eth_dst, *port.address, domains), port.port,
+        port.number);
   }
 }
 

@@ -18,30 +18,27 @@ void add_if_any(Program &program, std::uint8_t where, Match match, Actions actio
   }
 }
 
-void copy_by_port(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    add_if_any(program, table::kMirrorsOfPorts, from(port.port),
-               copies(plan, &Mirror::sent, &MirrorSources::ports, port.port, Copied::coming));
-  }
-  for (auto const &uplink : plan.network.uplinks) {
-    add_if_any(
-        program, table::kMirrorsOfPorts, from(uplink.port),
-        copies(plan, &Mirror::received, &MirrorSources::uplinks, uplink.port, Copied::coming));
+void copy_by_uplink(Network const &network, Program &program) {
+  for (auto const &uplink : network.uplinks) {
+    add_if_any(program, table::kMirrorsOfPorts, from(uplink.port),
+               copies(network.mirrors, &Mirror::received, &MirrorSources::uplinks, uplink.port,
+                      Copied::coming));
   }
 }
 
-void copy_by_vlan(Plan const &plan, Program &program) {
+void copy_by_vlan(Network const &network, Program &program) {
   std::set<std::uint16_t> vlans;
-  for (auto const &mirror : plan.network.mirrors) {
+  for (auto const &mirror : network.mirrors) {
     vlans.insert(mirror.sent.vlans.begin(), mirror.sent.vlans.end());
     vlans.insert(mirror.received.vlans.begin(), mirror.received.vlans.end());
   }
   for (auto const vlan : vlans) {
     auto const in_vlan = Match().with(field::kVlan, vlan);
     add_if_any(program, table::kMirrorsOfVlans, Match(in_vlan).with(field::kOrigin, kFromClient),
-               copies(plan, &Mirror::sent, &MirrorSources::vlans, vlan, Copied::coming));
-    add_if_any(program, table::kMirrorsOfVlans, Match(in_vlan).with(field::kOrigin, kFromUplink),
-               copies(plan, &Mirror::received, &MirrorSources::vlans, vlan, Copied::coming));
+               copies(network.mirrors, &Mirror::sent, &MirrorSources::vlans, vlan, Copied::coming));
+    add_if_any(
+        program, table::kMirrorsOfVlans, Match(in_vlan).with(field::kOrigin, kFromUplink),
+        copies(network.mirrors, &Mirror::received, &MirrorSources::vlans, vlan, Copied::coming));
   }
 }
 
@@ -202,12 +199,19 @@ void compile_mirrors(Plan const &plan, Program &program) {
   }
   mirroring.push_back(go_to(table::kRemembering));
   program.add(table::kMirroring, {.actions = mirroring});
-  copy_by_port(plan, program);
-  copy_by_vlan(plan, program);
+  copy_by_uplink(plan.network, program);
+  copy_by_vlan(plan.network, program);
   auto const closed = closed_ones(plan.network);
   for (auto const &mirror : plan.network.mirrors) {
     Copies(program, mirror, closed).compile();
   }
+}
+
+void compile_mirrors(PortPlan const &plan, Program &program) {
+  auto const port = plan.port.port;
+  add_if_any(
+      program, table::kMirrorsOfPorts, from(port),
+      copies(plan.common.mirrors, &Mirror::sent, &MirrorSources::ports, port, Copied::coming));
 }
 
 }  // namespace simhost::openvswitch

@@ -28,10 +28,10 @@ inline void append_copies(Actions &actions, Mirror const &mirror, Copied where) 
 /// What copies a frame to each session that names a source: `direction` is Mirror::received or
 /// Mirror::sent, `kind` where in it the source is.
 template <typename Source>
-Actions copies(Plan const &plan, MirrorSources Mirror::*direction,
+Actions copies(std::vector<Mirror> const &mirrors, MirrorSources Mirror::*direction,
                std::vector<Source> MirrorSources::*kind, Source const &source, Copied where) {
   Actions actions;
-  for (auto const &mirror : plan.network.mirrors) {
+  for (auto const &mirror : mirrors) {
     auto const &sources = mirror.*direction.*kind;
     if (std::find(sources.begin(), sources.end(), source) != sources.end()) {
       append_copies(actions, mirror, where);

@@ -26,12 +26,7 @@ void drop_own(Program &program, std::uint16_t priority, Match const &match, Port
                                   .cookie = cookie(Counted::own_frame, port.number)});
 }
 
-void drop_known(Plan const &plan, Program &program, Actions const &others) {
-  for (auto const &own : plan.own_addresses()) {
-    if (never_returns(*own.port)) {
-      drop_own(program, 200, with_address(from_uplink(), Field::eth_src, own), *own.port);
-    }
-  }
+void drop_fixed(Plan const &plan, Program &program, Actions const &others) {
   if (plan.network.addresses.fixed_ones_move) {
     return;
   }
@@ -61,23 +56,23 @@ bool is_remembered(Port const &port) {
   return sends_frames(port) && (port.transmits_by_uplink || port.may_forge || !port.address);
 }
 
-void remember_at_ports(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    if (is_remembered(port)) {
-      program.add(table::kRemembering, {.priority = 100,
-                                        .match = from(port.port),
-                                        .actions = {remember(port), go_to(table::kLearning)},
-                                        .cookie = cookie(Counted::port, port.number)});
-    }
+void remember_at(PortPlan const &plan, Program &program) {
+  auto const &port = plan.port;
+  if (is_remembered(port)) {
+    program.add(table::kRemembering, {.priority = 100,
+                                      .match = from(port.port),
+                                      .actions = {remember(port), go_to(table::kLearning)},
+                                      .cookie = cookie(Counted::port, port.number)});
   }
-  for (auto const &own : plan.own_addresses()) {
-    if (never_returns(*own.port)) {
-      program.add(table::kRemembering,
-                  {.priority = 200,
-                   .match = with_address(from(own.port->port), Field::eth_src, own),
-                   .actions = {go_to(table::kLearning)},
-                   .cookie = cookie(Counted::port, own.port->number)});
-    }
+  if (!never_returns(port)) {
+    return;
+  }
+  for (auto const &domains : plan.among_others.own_domains) {
+    program.add(table::kRemembering,
+                {.priority = 200,
+                 .match = with_address(from(port.port), Field::eth_src, *port.address, domains),
+                 .actions = {go_to(table::kLearning)},
+                 .cookie = cookie(Counted::port, port.number)});
   }
 }
 
@@ -98,7 +93,7 @@ openflow::Learn recent_source(std::uint32_t number, Recent recent) {
 
 void compile_own_frames(Plan const &plan, Program &program) {
   Actions others{go_to(table::kMirroring)};
-  if (plan.frames_may_return()) {
+  if (plan.common.frames_may_return) {
     others.insert(others.begin(), go_to(table::kRecentSources));
     program.add(table::kOwnFrames, {.priority = 100, .match = from_uplink(), .actions = others});
     program.add(table::kMirroring, {.priority = 200,
@@ -106,14 +101,27 @@ void compile_own_frames(Plan const &plan, Program &program) {
                                                        static_cast<openflow::Value>(Recent::drops)),
                                     .actions = drop(),
                                     .cookie = cookie(Counted::own_frame)});
-    remember_at_ports(plan, program);
     program.add(
         table::kRemembering,
         {.priority = 300, .match = questions(Match()), .actions = {go_to(table::kLearning)}});
   }
-  drop_known(plan, program, others);
+  drop_fixed(plan, program, others);
   program.add(table::kOwnFrames, {.actions = {go_to(table::kMirroring)}});
   program.add(table::kRemembering, {.actions = {go_to(table::kLearning)}});
+}
+
+void compile_own_frames(PortPlan const &plan, Program &program) {
+  auto const &port = plan.port;
+  if (plan.common.frames_may_return) {
+    remember_at(plan, program);
+  }
+  if (!never_returns(port)) {
+    return;
+  }
+  for (auto const &domains : plan.among_others.own_domains) {
+    drop_own(program, 200, with_address(from_uplink(), Field::eth_src, *port.address, domains),
+             port);
+  }
 }
 
 }  // namespace simhost::openvswitch

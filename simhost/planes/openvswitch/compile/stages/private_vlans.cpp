@@ -8,8 +8,8 @@ void compile_private_vlans(Plan const &plan, Program &program) {
   program.add(table::kPrivateVlans, {.priority = 1000,
                                      .match = with_bits(Match(), field::kTooLarge, 1),
                                      .cookie = cookie(Counted::too_large)});
-  for (auto const vlan : plan.private_vlans()) {
-    auto const &kind = plan.kind_of(vlan);
+  for (auto const vlan : plan.common.private_vlans()) {
+    auto const &kind = plan.common.kind_of(vlan);
     program.add(
         table::kPrivateVlans,
         {.priority = 100,

@@ -9,7 +9,7 @@ namespace {
 
 using openflow::Field;
 
-openflow::Action learn_first_address(Plan const &plan, Port const &port) {
+openflow::Action learn_first_address(Common const &common, Port const &port) {
   openflow::Learn learn{
       .table = table::kFirstAddresses,
       .priority = 100,
@@ -24,7 +24,7 @@ openflow::Action learn_first_address(Plan const &plan, Port const &port) {
   if (!port.vlan.carried) {
     learn.specs.emplace_back(
         openflow::LearnedMatch{.field = vlan_bits(field::kDomain),
-                               .content = openflow::Value{plan.kind_of(port.vlan.vlan).domain}});
+                               .content = openflow::Value{common.kind_of(port.vlan.vlan).domain}});
   }
   return learn;
 }
@@ -38,16 +38,16 @@ void drop_forged(Program &program, std::uint8_t where, Match const &match, Port 
 
 // Where it is known, which is all there is to go by when a frame is added up later: in the VLAN of
 // the port, unless in all.
-Actions look_up_first(Plan const &plan, Port const &port) {
+Actions look_up_first(Common const &common, Port const &port) {
   Actions actions;
   if (!port.vlan.carried) {
-    actions.push_back(openflow::set(field::kDomain, plan.kind_of(port.vlan.vlan).domain));
+    actions.push_back(openflow::set(field::kDomain, common.kind_of(port.vlan.vlan).domain));
   }
   append(actions, look_up_source(table::kFirstAddresses));
   return actions;
 }
 
-void judge_first_address(Plan const &plan, Program &program, Port const &port) {
+void judge_first_address(Common const &common, Program &program, Port const &port) {
   auto const at_port = from(port.port);
   program.add(table::kFirstAddress,
               {.priority = 200,
@@ -57,7 +57,7 @@ void judge_first_address(Plan const &plan, Program &program, Port const &port) {
   program.add(table::kFirstAddress,
               {.priority = 100,
                .match = at_port,
-               .actions = {openflow::set(field::kDestination, 0), learn_first_address(plan, port),
+               .actions = {openflow::set(field::kDestination, 0), learn_first_address(common, port),
                            does_it_add_up(), go_to(table::kFirstOrForged)},
                .cookie = cookie(Counted::port, port.number)});
   drop_forged(program, table::kFirstOrForged, at_port, port);
@@ -77,7 +77,7 @@ void ask_without_address(Program &program, Port const &port) {
   }
 }
 
-void compile(Plan const &plan, Program &program, Port const &port) {
+void compile(Common const &common, Program &program, Port const &port) {
   auto const at_port = from(port.port);
   if (port.address_changed) {
     program.add(table::kSources, {.priority = 300,
@@ -87,14 +87,14 @@ void compile(Plan const &plan, Program &program, Port const &port) {
   } else if (!port.address) {
     ask_without_address(program, port);
     auto actions =
-        port.may_forge ? Actions{learn_first_address(plan, port)} : look_up_first(plan, port);
+        port.may_forge ? Actions{learn_first_address(common, port)} : look_up_first(common, port);
     actions.push_back(go_to(table::kFirstAddress));
     program.add(table::kSources, {.priority = 100,
                                   .match = at_port,
                                   .actions = std::move(actions),
                                   .cookie = cookie(Counted::port, port.number)});
     if (!port.may_forge) {
-      judge_first_address(plan, program, port);
+      judge_first_address(common, program, port);
     }
   } else if (!port.may_forge) {
     program.add(table::kSources,
@@ -108,12 +108,7 @@ void compile(Plan const &plan, Program &program, Port const &port) {
 
 }  // namespace
 
-void compile_sources(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    if (sends_frames(port)) {
-      compile(plan, program, port);
-    }
-  }
+void compile_sources(Plan const & /*plan*/, Program &program) {
   program.add(table::kSources, {.actions = {go_to(table::kTags)}});
   program.add(table::kFirstAddress, {.actions = {go_to(table::kTags)}});
   // Known by the time it is added up, it was so before.
@@ -122,6 +117,12 @@ void compile_sources(Plan const &plan, Program &program) {
   program.add(table::kFirstOrForged, {.priority = 200,
                                       .match = Match().with(field::kFacts, says, says | adds_up),
                                       .actions = {go_to(table::kTags)}});
+}
+
+void compile_sources(PortPlan const &plan, Program &program) {
+  if (sends_frames(plan.port)) {
+    compile(plan.common, program, plan.port);
+  }
 }
 
 }  // namespace simhost::openvswitch

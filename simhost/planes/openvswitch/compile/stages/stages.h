@@ -1,5 +1,5 @@
 // The stages of the pipeline in the order in which a frame passes them. Each adds the rules of its
-// own tables.
+// own tables: those of the switch, or those that one port has for itself.
 #pragma once
 
 #include "planes/openvswitch/compile/plan.h"
@@ -24,10 +24,21 @@ void compile_receiving(Plan const &plan, Program &program);
 void compile_dispatch(Plan const &plan, Program &program);
 void compile_groups(Plan const &plan, Program &program);
 void compile_lists(Plan const &plan, Program &program);
-void compile_delivery(Plan const &plan, Program &program);
 void compile_teams(Plan const &plan, Program &program);
 void compile_mirrors(Plan const &plan, Program &program);
 void compile_remote_mirrors(Plan const &plan, Program &program);
 void compile_counting(Plan const &plan, Program &program);
+
+void compile_admission(PortPlan const &plan, Program &program);
+void compile_sources(PortPlan const &plan, Program &program);
+void compile_tags(PortPlan const &plan, Program &program);
+void compile_own_frames(PortPlan const &plan, Program &program);
+void compile_mirrors(PortPlan const &plan, Program &program);
+void compile_learning(PortPlan const &plan, Program &program);
+void compile_lookup(PortPlan const &plan, Program &program);
+void compile_dispatch(PortPlan const &plan, Program &program);
+void compile_delivery(PortPlan const &plan, Program &program);
+void compile_teams(PortPlan const &plan, Program &program);
+void compile_counting(PortPlan const &plan, Program &program);
 
 }  // namespace simhost::openvswitch

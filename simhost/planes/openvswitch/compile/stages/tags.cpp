@@ -116,9 +116,9 @@ void compile_trunk(PortTags &tags, PortVlan const &vlan) {
   }
 }
 
-void compile_port(Plan const &plan, Program &program, Port const &port) {
+void compile_port(Common const &common, Program &program, Port const &port) {
   PortTags tags(program, port);
-  if (has_vlan(plan, port)) {
+  if (has_vlan(common, port)) {
     if (port.vlan.carried) {
       compile_trunk(tags, port.vlan);
     } else {
@@ -153,9 +153,9 @@ void compile_client_tags(Program &program) {
 }
 
 // While the tag is off, for some data paths count it as a part of the packet.
-openflow::Action check_size(Plan const &plan) {
-  return openflow::CheckPacketLarger{
-      .bytes = static_cast<std::uint16_t>(plan.network.mtu + kHeader), .result = field::kTooLarge};
+openflow::Action check_size(Common const &common) {
+  return openflow::CheckPacketLarger{.bytes = static_cast<std::uint16_t>(common.mtu + kHeader),
+                                     .result = field::kTooLarge};
 }
 
 void compile_nested_tags(Plan const &plan, Program &program) {
@@ -163,21 +163,21 @@ void compile_nested_tags(Plan const &plan, Program &program) {
                                    .match = Match().with(field::kVlan, 0).tagged(),
                                    .actions = drop(),
                                    .cookie = cookie(Counted::nested_tag)});
-  for (auto const &port : plan.network.ports) {
-    if (port.vlan.nested && sends_frames(port)) {
-      program.add(table::kNestedTags, {.priority = 200,
-                                       .match = from(port.port).tagged(),
-                                       .actions = {check_size(plan), go_to(table::kPrivateVlans)},
-                                       .cookie = cookie(Counted::port, port.number)});
-    }
-  }
   auto const from_others =
       has_use_for_second_tags(plan.network) ? Match().with(field::kOrigin, kFromClient) : Match();
   program.add(table::kNestedTags, {.priority = 100,
                                    .match = Match(from_others).tagged(),
                                    .actions = drop(),
                                    .cookie = cookie(Counted::nested_tag)});
-  program.add(table::kNestedTags, {.actions = {check_size(plan), go_to(table::kPrivateVlans)}});
+  program.add(table::kNestedTags,
+              {.actions = {check_size(plan.common), go_to(table::kPrivateVlans)}});
+}
+
+void take_second_tag(Common const &common, Program &program, Port const &port) {
+  program.add(table::kNestedTags, {.priority = 200,
+                                   .match = from(port.port).tagged(),
+                                   .actions = {check_size(common), go_to(table::kPrivateVlans)},
+                                   .cookie = cookie(Counted::port, port.number)});
 }
 
 }  // namespace
@@ -188,14 +188,19 @@ bool has_use_for_second_tags(Network const &network) {
 }
 
 void compile_tags(Plan const &plan, Program &program) {
-  for (auto const &port : plan.network.ports) {
-    if (sends_frames(port)) {
-      compile_port(plan, program, port);
-    }
-  }
   compile_uplinks(program);
   compile_client_tags(program);
   compile_nested_tags(plan, program);
+}
+
+void compile_tags(PortPlan const &plan, Program &program) {
+  if (!sends_frames(plan.port)) {
+    return;
+  }
+  compile_port(plan.common, program, plan.port);
+  if (plan.port.vlan.nested) {
+    take_second_tag(plan.common, program, plan.port);
+  }
 }
 
 }  // namespace simhost::openvswitch
