@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "planes/openvswitch/openflow/connection.h"
-#include "planes/openvswitch/openflow/flow_parts.h"
+#include "planes/openvswitch/openflow/flows/flow_parts.h"
 
 namespace simhost::daemon {
 

@@ -8,7 +8,7 @@
 
 #include "planes/openvswitch/compile/network.h"
 #include "planes/openvswitch/compile/plan.h"
-#include "planes/openvswitch/openflow/flow_parts.h"
+#include "planes/openvswitch/openflow/flows/flow_parts.h"
 #include "planes/openvswitch/openflow/group.h"
 
 namespace simhost::openvswitch {

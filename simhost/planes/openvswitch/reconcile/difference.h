@@ -7,7 +7,7 @@
 #include <span>
 #include <vector>
 
-#include "planes/openvswitch/openflow/flow_parts.h"
+#include "planes/openvswitch/openflow/flows/flow_parts.h"
 #include "planes/openvswitch/openflow/group.h"
 
 namespace simhost::openvswitch {

@@ -7,7 +7,7 @@
 #include <set>
 #include <vector>
 
-#include "planes/openvswitch/openflow/flow_parts.h"
+#include "planes/openvswitch/openflow/flows/flow_parts.h"
 #include "planes/openvswitch/reconcile/difference.h"
 
 namespace simhost::openvswitch {

@@ -1,5 +1,5 @@
 // Parts are the same if they are one, whatever is in them.
-#include "planes/openvswitch/openflow/flow_parts.h"
+#include "planes/openvswitch/openflow/flows/flow_parts.h"
 
 #include <algorithm>
 #include <functional>
