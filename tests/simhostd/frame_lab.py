@@ -185,9 +185,9 @@ class Lab:
         lines = self.host.run(*dump).splitlines()[1:]
         return [", ".join(p for p in line.split(", ") if not _is_time(p)) for line in lines]
 
-    def control(self, command: str) -> None:
-        """Tells the switch something of its own."""
-        self.host.run("ovs-appctl", "-t", f"{self.run_folder()}/ovs-vswitchd.ctl", command)
+    def control(self, command: str) -> str:
+        """What the switch says to a command of its own."""
+        return self.host.run("ovs-appctl", "-t", f"{self.run_folder()}/ovs-vswitchd.ctl", command)
 
     def have_counted(self) -> None:
         """All frames so far are counted: until then each of them may teach Open vSwitch once more

@@ -1,5 +1,6 @@
 """What frames leave behind: counters, exact, whatever ends or changes in between."""
 
+import itertools
 import json
 import os
 import signal
@@ -393,3 +394,42 @@ def test_a_daemon_that_says_nothing_is_waited_for_once(
         line.setblocking(False)
         with line.accept()[0], pytest.raises(BlockingIOError):
             line.accept()
+
+
+@pytest.mark.parametrize("forbids", [[], ["forged_transmits"]])
+def test_what_is_remembered_of_frames_outlasts_what_others_teach(
+    lab: Lab, forbids: List[str]
+) -> None:
+    """What goes by it while it is forgotten may not be counted."""
+    database = f"--db=unix:{lab.run_folder()}/db.sock"
+    # However long it takes to look at it.
+    settings = ["set", "Open_vSwitch", ".", "other_config:max-revalidator=9000"]
+    lab.host.run("ovs-vsctl", database, *settings)
+    learning = {"learning": True, "flooding": True, "limit": 4096, "limit_policy": "drop"}
+    lab.set_port("lab", "a", forbids=forbids, mac_learning=learning)
+    lab.set_port("lab", "b", mac_learning=learning)
+    one, other = lab.client("lab", "a"), lab.client("lab", "b")
+
+    def frames_in() -> int:
+        found = counters(lab, "a")
+        return found.get("pktsInBroadcast", 0) + found.get("pktsInDropped", 0)
+
+    def send_from(source: str) -> None:
+        wanted = frames_in() + 1
+        send(one, 1, BROADCAST, source=source)
+        come_to(frames_in, wanted)
+
+    send_from(one.mac)
+    numbers = itertools.count()
+
+    def is_kept() -> bool:
+        number = next(numbers)
+        source, teacher = (f"02:00:00:00:{where}:{number:02x}" for where in ("66", "67"))
+        send_from(source)
+        send(other, 1, BROADCAST, source=teacher)
+        expect_from(one, teacher)
+        lab.have_counted()
+        return f"src={source}" in lab.control("dpctl/dump-flows")
+
+    # A setting that comes late may have it looked up anew, once.
+    assert comes_true(is_kept)

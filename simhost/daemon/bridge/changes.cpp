@@ -58,11 +58,12 @@ void add_removals(std::vector<Flow> const &flows, openflow::Changes &changes) {
 }
 
 void add_forgetting(openflow::Changes &changes) {
-  for (auto number = openvswitch::table::kFirstAddresses; openvswitch::table::is_learned(number);
-       ++number) {
-    Flow all;
-    all.table = number;
-    changes.emplace_back(openflow::FlowChange{.command = FlowCommand::remove, .flow = all});
+  for (std::uint8_t number = 0; number <= openvswitch::kLastReached; ++number) {
+    if (openvswitch::table::is_learned(number)) {
+      Flow all;
+      all.table = number;
+      changes.emplace_back(openflow::FlowChange{.command = FlowCommand::remove, .flow = all});
+    }
   }
 }
 

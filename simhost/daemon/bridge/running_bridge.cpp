@@ -80,9 +80,11 @@ std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wante
   std::vector<openvswitch::LearnedFlows> forgotten;
   for (auto const &[device, port] : wanted.ports) {
     if (added.contains(device)) {
-      forgotten.push_back(
-          {.table = openvswitch::table::kFirstAddresses,
-           .cookie = openvswitch::cookie(openvswitch::Counted::first_address, port)});
+      using openvswitch::Counted;
+      forgotten.push_back({.table = openvswitch::table::kFirstAddresses,
+                           .cookie = openvswitch::cookie(Counted::first_address, port)});
+      forgotten.push_back({.table = openvswitch::table::kPortsWithFirst,
+                           .cookie = openvswitch::cookie(Counted::port_with_first, port)});
     }
   }
   return forgotten;

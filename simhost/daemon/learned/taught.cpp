@@ -19,6 +19,8 @@ openvswitch::Counted taught_in(std::uint8_t table) {
       return Counted::recent_source;
     case openvswitch::table::kMovedSources:
       return Counted::moved_source;
+    case openvswitch::table::kPortsWithFirst:
+      return Counted::port_with_first;
     case openvswitch::table::kRefusedSources:
       return Counted::refused_source;
     default:

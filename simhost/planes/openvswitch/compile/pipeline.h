@@ -16,8 +16,8 @@ namespace table {
 inline constexpr std::uint8_t kAdmission = 0;
 /// Whose addresses a port may send from; asks kFirstAddresses for the next one.
 inline constexpr std::uint8_t kSources = 1;
-/// Whether a client whose address is not known sends from its first one; reads kDestination, writes
-/// kVerdict.
+/// Whether a client whose address is not known sends from its first one; reads kDestination and
+/// kHasFirst, writes kVerdict.
 inline constexpr std::uint8_t kFirstAddress = 2;
 /// From tags to kVlan and kPriority; the tag goes.
 inline constexpr std::uint8_t kTags = 3;
@@ -107,9 +107,12 @@ inline constexpr std::uint8_t kTakingRoom = 40;
 /// Of clients whose address is not known: whether a source is the first one; reads kVerdict.
 inline constexpr std::uint8_t kFirstOrForged = 41;
 
+/// Ports whose client has a first address; filled by the switch itself. Writes kHasFirst.
+inline constexpr std::uint8_t kPortsWithFirst = 42;
+
 /// Whether the switch fills the table by itself.
 constexpr bool is_learned(std::uint8_t table) {
-  return table >= kFirstAddresses && table <= kMovedSources;
+  return (table >= kFirstAddresses && table <= kMovedSources) || table == kPortsWithFirst;
 }
 
 /// Reached by no frame: the cookie of its one flow is the number of the change that is in force.
@@ -118,7 +121,7 @@ inline constexpr std::uint8_t kGeneration = 250;
 }  // namespace table
 
 /// The last table that frames reach.
-inline constexpr std::uint8_t kLastReached = table::kFirstOrForged;
+inline constexpr std::uint8_t kLastReached = table::kPortsWithFirst;
 
 namespace field {
 
@@ -143,6 +146,8 @@ inline constexpr openflow::SubField kIsCounted{kFacts, 6, 1};
 inline constexpr openflow::SubField kStays{kFacts, 7, 1};
 /// Likewise, and nothing of that has been added up yet.
 inline constexpr openflow::SubField kJustMoved{kFacts, 8, 1};
+/// The client has a first address, be it this one or another.
+inline constexpr openflow::SubField kHasFirst{kFacts, 9, 1};
 /// The frame's own VLAN, 0 for none.
 inline constexpr auto kVlan = openflow::Field::reg2;
 /// A PrivateKind.
@@ -248,10 +253,11 @@ enum class Counted : std::uint8_t {
   out_lost = 25,  ///< by the device itself, like the next ones
   in_damaged = 26,
   out_damaged = 27,
-  unwanted_copy = 28,   ///< dropped: a copy of a mirror session, which none here takes
-  adding_up = 29,       ///< what kAddingUp holds
-  refused_source = 30,  ///< what kRefusedSources holds
-  moved_source = 31,    ///< what kMovedSources holds
+  unwanted_copy = 28,    ///< dropped: a copy of a mirror session, which none here takes
+  adding_up = 29,        ///< what kAddingUp holds
+  refused_source = 30,   ///< what kRefusedSources holds
+  moved_source = 31,     ///< what kMovedSources holds
+  port_with_first = 32,  ///< what kPortsWithFirst holds
 };
 
 constexpr std::uint64_t cookie(Counted counted, std::uint32_t number = 0) {

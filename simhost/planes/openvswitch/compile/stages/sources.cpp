@@ -1,6 +1,7 @@
 // From which addresses a client may send. One whose address is not known has the first that it
 // sends from: a flow that is learned in a table of its own, where there is room for one of each
-// port.
+// port. Another table says that there is none left, as Open vSwitch forgets how frames went that
+// were to be learned where there was no room, whenever it looks.
 #include "planes/openvswitch/compile/stages/adding_up.h"
 #include "planes/openvswitch/compile/stages/stages.h"
 
@@ -8,6 +9,15 @@ namespace simhost::openvswitch {
 namespace {
 
 using openflow::Field;
+
+// In the VLAN of the port, unless in all.
+void add_domain(Common const &common, Port const &port, openflow::Learn &learn) {
+  if (!port.vlan.carried) {
+    learn.specs.emplace_back(
+        openflow::LearnedMatch{.field = vlan_bits(field::kDomain),
+                               .content = openflow::Value{common.kind_of(port.vlan.vlan).domain}});
+  }
+}
 
 openflow::Action learn_first_address(Common const &common, Port const &port) {
   openflow::Learn learn{
@@ -21,11 +31,21 @@ openflow::Action learn_first_address(Common const &common, Port const &port) {
                                        .content = openflow::whole(Field::eth_src)},
                 openflow::LearnedLoad{.destination = openflow::part(field::kDestination, 0, 15),
                                       .content = openflow::Value{port.port}}}};
-  if (!port.vlan.carried) {
-    learn.specs.emplace_back(
-        openflow::LearnedMatch{.field = vlan_bits(field::kDomain),
-                               .content = openflow::Value{common.kind_of(port.vlan.vlan).domain}});
-  }
+  add_domain(common, port, learn);
+  return learn;
+}
+
+// What goes with a first address: where that is to be learned anew, so is this.
+openflow::Action learn_that_it_has_one(Common const &common, Port const &port) {
+  openflow::Learn learn{.table = table::kPortsWithFirst,
+                        .priority = 100,
+                        .cookie = cookie(Counted::port_with_first, port.number),
+                        .deletes_learned = true,
+                        .specs = {openflow::LearnedMatch{.field = openflow::whole(Field::in_port),
+                                                         .content = openflow::Value{port.port}},
+                                  openflow::LearnedLoad{.destination = field::kHasFirst,
+                                                        .content = openflow::Value{1}}}};
+  add_domain(common, port, learn);
   return learn;
 }
 
@@ -36,15 +56,32 @@ void drop_forged(Program &program, std::uint8_t where, Match const &match, Port 
                       .cookie = cookie(Counted::forged, port.number)});
 }
 
-// Where it is known, which is all there is to go by when a frame is added up later: in the VLAN of
-// the port, unless in all.
+// Where it is known, which is all there is to go by when a frame is added up later.
 Actions look_up_first(Common const &common, Port const &port) {
   Actions actions;
   if (!port.vlan.carried) {
     actions.push_back(openflow::set(field::kDomain, common.kind_of(port.vlan.vlan).domain));
   }
-  append(actions, look_up_source(table::kFirstAddresses));
+  if (!port.may_forge) {
+    append(actions, look_up_source(table::kFirstAddresses));
+  }
+  append(actions, {go_to(table::kPortsWithFirst), go_to(table::kFirstAddress)});
   return actions;
+}
+
+// Whoever may send from any address is asked for the first one only.
+void note_first_address(Common const &common, Program &program, Port const &port) {
+  auto const at_port = from(port.port);
+  program.add(table::kFirstAddress, {.priority = 150,
+                                     .match = with_bits(at_port, field::kHasFirst, 1),
+                                     .actions = {go_to(table::kTags)},
+                                     .cookie = cookie(Counted::port, port.number)});
+  program.add(table::kFirstAddress,
+              {.priority = 100,
+               .match = at_port,
+               .actions = {learn_first_address(common, port), learn_that_it_has_one(common, port),
+                           go_to(table::kTags)},
+               .cookie = cookie(Counted::port, port.number)});
 }
 
 void judge_first_address(Common const &common, Program &program, Port const &port) {
@@ -55,10 +92,16 @@ void judge_first_address(Common const &common, Program &program, Port const &por
                .actions = {openflow::set(field::kDestination, 0), go_to(table::kTags)},
                .cookie = cookie(Counted::port, port.number)});
   program.add(table::kFirstAddress,
+              {.priority = 150,
+               .match = with_bits(at_port, field::kHasFirst, 1),
+               .actions = {openflow::set(field::kDestination, 0), go_to(table::kDropped)},
+               .cookie = cookie(Counted::forged, port.number)});
+  program.add(table::kFirstAddress,
               {.priority = 100,
                .match = at_port,
                .actions = {openflow::set(field::kDestination, 0), learn_first_address(common, port),
-                           does_it_add_up(), go_to(table::kFirstOrForged)},
+                           learn_that_it_has_one(common, port), does_it_add_up(),
+                           go_to(table::kFirstOrForged)},
                .cookie = cookie(Counted::port, port.number)});
   drop_forged(program, table::kFirstOrForged, at_port, port);
 }
@@ -86,14 +129,13 @@ void compile(Common const &common, Program &program, Port const &port) {
                                   .cookie = cookie(Counted::address_changed, port.number)});
   } else if (!port.address) {
     ask_without_address(program, port);
-    auto actions =
-        port.may_forge ? Actions{learn_first_address(common, port)} : look_up_first(common, port);
-    actions.push_back(go_to(table::kFirstAddress));
     program.add(table::kSources, {.priority = 100,
                                   .match = at_port,
-                                  .actions = std::move(actions),
+                                  .actions = look_up_first(common, port),
                                   .cookie = cookie(Counted::port, port.number)});
-    if (!port.may_forge) {
+    if (port.may_forge) {
+      note_first_address(common, program, port);
+    } else {
       judge_first_address(common, program, port);
     }
   } else if (!port.may_forge) {
