@@ -106,6 +106,7 @@ void add_wrapping_ports(storage::Transaction &transaction, openvswitch::Network 
       {"remote_ip", "flow"},
       {"in_key", std::to_string(static_cast<std::int64_t>(bridge.key))},
       {"out_key", "flow"}};
+  bool const is_ipv6 = underlay && underlay->address.size() == sizeof(openflow::Ipv6Address);
   if (underlay) {
     options.emplace("local_ip", ip_text(underlay->address));
   }
@@ -116,7 +117,7 @@ void add_wrapping_ports(storage::Transaction &transaction, openvswitch::Network 
   };
   for (auto const &mirror : network.mirrors) {
     if (!mirror.collectors.empty() && mirror.wrapping == openvswitch::Wrapping::gre) {
-      add(openvswitch::kGrePort, "gre");
+      add(openvswitch::kGrePort, is_ipv6 ? "ip6gre" : "gre");
     }
   }
   for (auto const *option : {"erspan_ver", "erspan_idx", "erspan_dir", "erspan_hwid"}) {
@@ -124,7 +125,7 @@ void add_wrapping_ports(storage::Transaction &transaction, openvswitch::Network 
   }
   for (auto const &mirror : network.mirrors) {
     if (!mirror.collectors.empty() && mirror.wrapping != openvswitch::Wrapping::gre) {
-      add(openvswitch::kErspanPort, "erspan");
+      add(openvswitch::kErspanPort, is_ipv6 ? "ip6erspan" : "erspan");
     }
   }
 }

@@ -2,8 +2,9 @@
 
 import json
 import struct
+from itertools import product
 from pathlib import Path
-from typing import Any, Dict, Iterator, List
+from typing import Any, Dict, Iterator, List, NamedTuple, Tuple
 
 import pytest
 from counted_frames import come_to
@@ -14,7 +15,26 @@ from wrapped_copies import ERSPAN_2, ERSPAN_3, ETHERNET, Packet, is_wrapped, rea
 
 BROADCAST = "ff:ff:ff:ff:ff:ff"
 STRANGER = "02:00:00:00:88:01"
-HERE, ONE, OTHER, NOBODY = (f"198.51.100.{number}" for number in (1, 7, 8, 9))
+
+
+class Family(NamedTuple):
+    """Addresses of the host and of collectors, and of one that is not there."""
+
+    bits: int
+    here: str
+    one: str
+    other: str
+    nobody: str
+
+    @property
+    def underlay(self) -> Dict[str, str]:
+        return {"device": "under", "address": f"{self.here}/{self.bits}"}
+
+
+IPV4 = Family(24, *(f"198.51.100.{number}" for number in (1, 7, 8, 9)))
+IPV6 = Family(64, *(f"2001:db8::{number}" for number in (1, 7, 8, 9)))
+BOTH = pytest.mark.parametrize("family", [IPV4, IPV6], ids=["ipv4", "ipv6"], indirect=True)
+_, HERE, ONE, OTHER, NOBODY = IPV4
 GATEWAY, BEYOND = "198.51.100.254", "203.0.113.9"
 KEY = 0xC0FFEE
 ERSPAN = 1023
@@ -23,13 +43,24 @@ ERSPAN = 1023
 class Collectors:
     """A machine beyond the underlay with two addresses."""
 
-    def __init__(self, lab: Lab) -> None:
+    def __init__(self, lab: Lab, family: Family) -> None:
         self.lab = lab
         self.machine = lab.frames.new_namespace()
+        self._bits = family.bits
+        if family == IPV6:
+            for namespace, devices in product((lab.host, self.machine), ("all", "default")):
+                namespace.run("sysctl", "-qw", f"net.ipv6.conf.{devices}.disable_ipv6=0")
+            # As of IPv4: whoever is switched off and on again has the same addresses.
+            self.machine.run("sysctl", "-qw", "net.ipv6.conf.all.keep_addr_on_down=1")
         lab.wire("under", self.machine, "eth0")
-        for address in (ONE, OTHER):
-            self.machine.run("ip", "address", "add", f"{address}/24", "dev", "eth0")
+        for address in (family.one, family.other):
+            self.add_address(address)
         self._socket = PacketSocket(self.machine, "eth0")
+
+    def add_address(self, address: str) -> None:
+        # Without a second in which somebody else may have it.
+        how = ["nodad"] if ":" in address else []
+        self.machine.run("ip", "address", "add", f"{address}/{self._bits}", "dev", "eth0", *how)
 
     def expect(self, copy: bytes, count: int) -> List[Packet]:
         """So many wrapped copies, and no more than these."""
@@ -80,7 +111,13 @@ def all_reply(lab: Lab) -> bool:
     return comes_true(lambda: lab.is_in_force() and "does not reply" not in lab.plane()["said"])
 
 
-UNDERLAY = {"device": "under", "address": f"{HERE}/24"}
+UNDERLAY = IPV4.underlay
+
+
+@pytest.fixture(name="family")
+def family_of_the_underlay(request: pytest.FixtureRequest) -> Family:
+    family: Family = getattr(request, "param", IPV4)
+    return family
 
 
 @pytest.fixture
@@ -93,38 +130,40 @@ def lab(tmp_path: Path) -> Iterator[Lab]:
 
 
 @pytest.fixture
-def collectors(lab: Lab) -> Iterator[Collectors]:
-    collectors = Collectors(lab)
+def collectors(lab: Lab, family: Family) -> Iterator[Collectors]:
+    collectors = Collectors(lab, family)
     lab.start()
-    lab.apply({"underlay": UNDERLAY})
+    lab.apply({"underlay": family.underlay})
     yield collectors
     collectors.close()
 
 
-def test_copies_come_wrapped(lab: Lab, collectors: Collectors) -> None:
+@BOTH
+def test_copies_come_wrapped(lab: Lab, family: Family, collectors: Collectors) -> None:
+    _, here, first, second, _ = family
     macs = {port: f"02:00:00:00:77:0{port}" for port in "ab"}
     one, other = (lab.frames.client("lab", port, mac=mac) for port, mac in macs.items())
     lab.set_port("lab", "b", vlan=7)
     sent = frame(other.mac, one.mac, payload=bytes(range(200)) * 6)
     for kind, number in (("gre", ETHERNET), ("erspan2", ERSPAN_2), ("erspan3", ERSPAN_3)):
         key = KEY if kind == "gre" else ERSPAN
-        mirror(lab, session(to=to(ONE, OTHER), encapsulation=encapsulation(kind)))
+        mirror(lab, session(to=to(first, second), encapsulation=encapsulation(kind)))
         assert all_reply(lab)
         one.send(sent)
         other.expect(sent)
         assert sorted(collectors.expect(sent, 2)) == [
-            Packet(number, HERE, address, key, False, sent) for address in (ONE, OTHER)
+            Packet(number, here, address, key, False, sent) for address in (first, second)
         ]
         told = lab.ctl("trace", "lab/a", sent.hex())
         which = f"the key {KEY}" if kind == "gre" else f"the id {ERSPAN}"
         name = {"gre": "GRE", "erspan2": "ERSPAN II", "erspan3": "ERSPAN III"}[kind]
-        for address in (ONE, OTHER):
+        for address in (first, second):
             wrapped = f"the collector {address}, in {name} with {which}, without a tag"
             assert f"is copied by the mirror session s to {wrapped}" in told
         collectors.drain()
         # What the port gets, a part of it, with its tag.
         cut = {"snap_length": 64, "keeps_vlan": True, "encapsulation": encapsulation(kind)}
-        mirror(lab, session(to=to(ONE), sent_by=[], received_by=[{"port": "a"}], **cut))
+        mirror(lab, session(to=to(first), sent_by=[], received_by=[{"port": "a"}], **cut))
         back = frame(one.mac, other.mac, payload=bytes(range(200)))
         tagged = frame(one.mac, other.mac, vlan=7, payload=bytes(range(200)))[:68]
         other.send(back)
@@ -160,12 +199,13 @@ def test_two_switches_mirror_to_one_collector(lab: Lab, collectors: Collectors) 
         come_to(lambda: counters_of_sessions(lab, switch), counted)
 
 
+@BOTH
 def test_a_collector_that_does_not_reply_is_told_and_counted(
-    lab: Lab, collectors: Collectors
+    lab: Lab, family: Family, collectors: Collectors
 ) -> None:
     client = lab.client("lab", "a")
-    mirror(lab, session(to=to(NOBODY)))
-    told = f"the collector {NOBODY} of mirror sessions does not reply"
+    mirror(lab, session(to=to(family.nobody)))
+    told = f"the collector {family.nobody} of mirror sessions does not reply"
 
     def send() -> bytes:
         sent = frame(BROADCAST, client.mac, payload=b"three" * 20)
@@ -177,13 +217,13 @@ def test_a_collector_that_does_not_reply_is_told_and_counted(
     send()
     failed = {"failedPkts": 3, "mirrorPktFailCnt": 3}
     assert comes_true(lambda: bool(counters(lab) == failed)), counters(lab)
-    mirror(lab, session(to=to(ONE, NOBODY)))
-    assert comes_true(lambda: ONE not in lab.plane()["said"])
+    mirror(lab, session(to=to(family.one, family.nobody)))
+    assert comes_true(lambda: family.one not in lab.plane()["said"])
     collectors.expect(send(), 3)
     both = {"failedPkts": 3, "mirrorPktFailCnt": 6, "mirroredPkts": 3, "mirrorPktCnt": 3}
     assert comes_true(lambda: bool(counters(lab) == both)), counters(lab)
     # It comes, its wire is pulled, and plugged in again.
-    collectors.machine.run("ip", "address", "add", f"{NOBODY}/24", "dev", "eth0")
+    collectors.add_address(family.nobody)
     assert all_reply(lab)
     collectors.machine.run("ip", "link", "set", "eth0", "down")
     assert comes_true(lambda: told in lab.plane()["said"])
@@ -204,7 +244,7 @@ def test_a_collector_beyond_a_gateway_is_reached_while_that_replies(
     client.send(sent)
     failed = {"failedPkts": 1, "mirrorPktFailCnt": 1}
     assert comes_true(lambda: bool(counters(lab) == failed)), counters(lab)
-    collectors.machine.run("ip", "address", "add", f"{GATEWAY}/24", "dev", "eth0")
+    collectors.add_address(GATEWAY)
     assert all_reply(lab)
     client.send(sent)
     (packet,) = collectors.expect(sent, 1)
@@ -283,19 +323,18 @@ try:
 except HostError as error:
     print(type(error).__name__, error)
 """
-OF_IPV6 = "2001:db8::7"
-NOT_OF_IPV6 = "mirrors to an address of IPv6, or over an underlay of IPv6, which is not done here"
 
 
 @pytest.mark.parametrize(
-    "underlay, address",
-    [(UNDERLAY, OF_IPV6), ({"device": "under", "address": "2001:db8::1/64"}, ONE)],
+    "family, address, kinds",
+    [(IPV4, IPV6.one, ("IPv6", "IPv4")), (IPV6, IPV4.one, ("IPv4", "IPv6"))],
+    ids=["ipv4", "ipv6"],
+    indirect=["family"],
 )
-def test_collectors_of_ipv6_are_refused_however_one_asks(
-    lab: Lab, collectors: Collectors, underlay: Dict[str, str], address: str
+def test_collectors_of_the_other_family_are_refused_however_one_asks(
+    lab: Lab, collectors: Collectors, address: str, kinds: Tuple[str, str]
 ) -> None:
     lab.client("lab", "a")
-    lab.apply({"underlay": underlay})
     before = lab.plane()["change"]
     assert lab.python(APPENDS.format(address=address, status="QEX_NOT_SUPPORTED")) == "True\n"
     assert lab.python(ASSIGNS.format(address=address)).startswith("NotSupported ")
@@ -303,7 +342,8 @@ def test_collectors_of_ipv6_are_refused_however_one_asks(
     document = {"switches": [{"alias": "lab", "ports": ports}]}
     refused = lab.try_ctl("apply", "-", given=json.dumps(document))
     assert refused.returncode == 1
-    why = f"the mirror session 's' {NOT_OF_IPV6} (QEX_NOT_SUPPORTED)"
-    assert why in refused.stdout
+    collector, underlay = kinds
+    why = f"mirrors to an address of {collector}, and the underlay has one of {underlay}"
+    assert f"the mirror session 's' {why} (QEX_NOT_SUPPORTED)" in refused.stdout
     assert lab.plane()["change"] == before
     assert "mirror_sessions" not in port_a(lab)

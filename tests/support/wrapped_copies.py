@@ -2,7 +2,8 @@
 drafts of ERSPAN."""
 
 import struct
-from typing import NamedTuple
+from ipaddress import ip_address
+from typing import NamedTuple, Optional
 
 GRE_KEY, GRE_SEQUENCE = 0x2000, 0x1000
 # What GRE says that it has in it.
@@ -21,25 +22,46 @@ class Packet(NamedTuple):
     copy: bytes
 
 
+_GRE = 47
+# Of Ethernet.
+_HEADER = 14
+
+
+def _payload(data: bytes) -> Optional[int]:
+    """Where that of a packet begins in which there is GRE."""
+    if data[12:14] == b"\x08\x00" and data[23] == _GRE:
+        return _HEADER + 20
+    if data[12:14] == b"\x86\xdd" and data[20] == _GRE:
+        return _HEADER + 40
+    return None
+
+
 def is_wrapped(data: bytes) -> bool:
-    return data[12:14] == b"\x08\x00" and data[23] == 47
+    return _payload(data) is not None
 
 
 def read(data: bytes) -> Packet:
     """A packet of GRE, with its Ethernet."""
-    source, destination = (".".join(map(str, data[at : at + 4])) for at in (26, 30))
-    flags, kind = struct.unpack_from("!HH", data, 34)
+    begin = _payload(data)
+    assert begin is not None
+    # The addresses are the last of what comes before.
+    size = 4 if begin == _HEADER + 20 else 16
+    source, destination = (
+        str(ip_address(data[at : at + size])) for at in (begin - 2 * size, begin - size)
+    )
+    gre = data[begin:]
+    flags, kind = struct.unpack_from("!HH", gre)
     if kind == ETHERNET:
         assert flags == GRE_KEY
-        (key,) = struct.unpack_from("!I", data, 38)
-        return Packet(kind, source, destination, key, False, data[42:])
+        (key,) = struct.unpack_from("!I", gre, 4)
+        return Packet(kind, source, destination, key, False, gre[8:])
     assert flags == GRE_SEQUENCE
-    first, session = struct.unpack_from("!HH", data, 42)
+    first, session = struct.unpack_from("!HH", gre, 8)
     # The version; of VLANs, classes of service, trunks and damage nothing is told.
     assert first == {ERSPAN_2: 0x1000, ERSPAN_3: 0x2000}[kind] and session <= GREATEST_ERSPAN
     if kind == ERSPAN_2:
-        assert data[46:50] == bytes(4)
-        return Packet(kind, source, destination, session, False, data[50:])
-    (rest,) = struct.unpack_from("!H", data, 52)
+        assert gre[12:16] == bytes(4)
+        return Packet(kind, source, destination, session, False, gre[16:])
+    (rest,) = struct.unpack_from("!H", gre, 18)
     assert rest & ~8 == 0
-    return Packet(kind, source, destination, session, bool(rest & 8), data[54:])
+    return Packet(kind, source, destination, session, bool(rest & 8), gre[20:])

@@ -8,6 +8,7 @@
 #include <cstddef>
 #include <stdexcept>
 #include <utility>
+#include <variant>
 
 #include "base/ip_text.h"
 #include "daemon/underlay/neighbors.h"
@@ -25,34 +26,38 @@ constexpr events::Clock::duration kLongestWait = 1s;
 constexpr std::uint32_t kEthernet = 14;
 constexpr std::uint32_t kTwoTags = 8;
 
-storage::AddressBytes bytes_of(openflow::Ipv4Address const &address) {
-  auto const bytes = std::as_bytes(std::span(address));
-  return {bytes.begin(), bytes.end()};
+storage::AddressBytes bytes_of(openvswitch::Collector const &collector) {
+  return std::visit(
+      [](auto const &address) {
+        auto const bytes = std::as_bytes(std::span(address));
+        return storage::AddressBytes(bytes.begin(), bytes.end());
+      },
+      collector.address);
 }
 
 // In front of a copy: the headers of IP, of GRE with a key or a sequence number, and of ERSPAN.
-std::uint32_t header_of(openvswitch::Wrapping wrapping) {
-  constexpr std::uint32_t kIpAndGre = 20 + 8;
+std::uint32_t header_of(openvswitch::Wrapping wrapping, std::size_t address_bytes) {
+  std::uint32_t const ip_and_gre = (address_bytes == 4 ? 20 : 40) + 8;
   switch (wrapping) {
     case openvswitch::Wrapping::erspan2:
-      return kIpAndGre + 8;
+      return ip_and_gre + 8;
     case openvswitch::Wrapping::erspan3:
-      return kIpAndGre + 12;
+      return ip_and_gre + 12;
     default:
-      return kIpAndGre;
+      return ip_and_gre;
   }
 }
 
-std::uint32_t largest_packet(openvswitch::Network const &network,
-                             openvswitch::Mirror const &mirror) {
+std::uint32_t largest_packet(openvswitch::Network const &network, openvswitch::Mirror const &mirror,
+                             std::size_t address_bytes) {
   std::uint32_t const whole = network.mtu + kEthernet + kTwoTags;
   std::uint32_t const copy =
       mirror.most_bytes == 0 ? whole : std::min<std::uint32_t>(whole, mirror.most_bytes + 4);
-  return header_of(mirror.wrapping) + copy;
+  return header_of(mirror.wrapping, address_bytes) + copy;
 }
 
 bool is_reached(WantedUnderlay const &underlay, NetworkDevices const &devices,
-                openflow::Ipv4Address const &collector) {
+                storage::AddressBytes const &address) {
   for (auto const &[name, number] : underlay.row.devices) {
     auto const device = devices.find(name);
     if (!device || !device->has_link) {
@@ -60,7 +65,6 @@ bool is_reached(WantedUnderlay const &underlay, NetworkDevices const &devices,
     }
   }
   auto const bridge = devices.find(underlay.row.name);
-  auto const address = bytes_of(collector);
   auto const route = find_route(address);
   return bridge && route && !route->is_local && route->device == underlay.row.name &&
          replies(bridge->index, route->gateway.empty() ? address : route->gateway);
@@ -82,10 +86,12 @@ void Collectors::begin() {
 void Collectors::follow(openvswitch::Network &network) {
   for (auto &mirror : network.mirrors) {
     for (auto &wanted : mirror.collectors) {
-      auto const [known, is_new] = collectors_.try_emplace(wanted.address);
+      auto const address = bytes_of(wanted);
+      auto const [known, is_new] = collectors_.try_emplace(address);
       auto &collector = known->second;
       collector.is_wanted = true;
-      collector.largest = std::max(collector.largest, largest_packet(network, mirror));
+      collector.largest =
+          std::max(collector.largest, largest_packet(network, mirror, address.size()));
       wanted.is_reached = collector.is_reached;
       if (is_new) {
         pause_ = {};
@@ -129,9 +135,9 @@ void Collectors::look_again() {
   }
 }
 
-std::string Collectors::obstacle(openflow::Ipv4Address const &address) const {
+std::string Collectors::obstacle(storage::AddressBytes const &address) const {
   auto const &collector = collectors_.at(address);
-  auto const who = "the collector " + ip_text(bytes_of(address));
+  auto const who = "the collector " + ip_text(address);
   if (!collector.is_reached) {
     return fmt::format("{} of mirror sessions does not reply", who);
   }

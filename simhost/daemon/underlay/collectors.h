@@ -36,12 +36,12 @@ class Collectors {
   };
 
   void look_again();
-  [[nodiscard]] std::string obstacle(openflow::Ipv4Address const &address) const;
+  [[nodiscard]] std::string obstacle(storage::AddressBytes const &address) const;
 
   events::Loop &loop_;
   NetworkDevices const &devices_;
   std::function<void()> changed_;
-  std::map<openflow::Ipv4Address, Collector> collectors_;
+  std::map<storage::AddressBytes, Collector> collectors_;
   std::optional<WantedUnderlay> underlay_;
   events::Clock::duration pause_{};
   events::Loop::Timer next_look_;

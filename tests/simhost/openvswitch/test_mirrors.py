@@ -214,7 +214,7 @@ def test_a_session_that_stands_for_a_promiscuous_port(bench: Bench) -> None:
 
 OF_A_KIND = "mirrors clients of a kind, which are not told apart here"
 SOME_TRAFFIC = "mirrors some traffic of uplinks, which is not told apart here"
-OF_IPV6 = "mirrors to an address of IPv6, or over an underlay of IPv6, which is not done here"
+OF_IPV6 = "mirrors to an address of IPv6, and the underlay has one of IPv4"
 MOST_SESSIONS = "is session 1024 of ERSPAN, which has 1023 at most"
 NO_PORTS = "takes copies from uplinks, and mirrors to others than ports"
 TAKES_MORE = "takes copies from uplinks, and mirrors from what is no VLAN of them"

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <variant>
 #include <vector>
 
 #include "planes/openvswitch/multicast/groups.h"
@@ -144,7 +145,7 @@ enum class Wrapping : std::uint8_t { gre, erspan2, erspan3 };
 
 /// A machine that gets copies over the underlay.
 struct Collector {
-  openflow::Ipv4Address address = {};
+  std::variant<openflow::Ipv4Address, openflow::Ipv6Address> address;
   bool is_reached = true;  ///< otherwise it gets none
 
   bool operator==(Collector const &) const = default;

@@ -197,7 +197,8 @@ constexpr bool is_tunnel(openflow::Port port) {
   return port >= kFirstTunnel && port <= kGreatestPort;
 }
 
-/// Where copies leave for collectors; no device has these numbers.
+/// Where copies leave for collectors, of either family: a host has an underlay of one. No device
+/// has these numbers.
 inline constexpr openflow::Port kGrePort = 0xfebe;
 inline constexpr openflow::Port kErspanPort = 0xfebf;
 

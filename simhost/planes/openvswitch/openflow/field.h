@@ -17,6 +17,7 @@ enum class Field : std::uint8_t {
   tun_id,
   tun_src,
   tun_dst,
+  tun_ipv6_dst,
   tun_erspan_idx,
   tun_erspan_ver,
   tun_erspan_dir,

@@ -30,6 +30,22 @@ static_assert(mirror::kMostSessions < 1U << kSessionBits);
 
 constexpr auto *kTakesMore = "takes copies from uplinks, and mirrors from what is no VLAN of them";
 
+template <typename Bytes, typename Address>
+void copy_into(Bytes const &bytes, Address &address) {
+  std::memcpy(address.data(), bytes.data(), address.size());
+}
+
+template <typename Bytes>
+Collector collector_at(Bytes const &address) {
+  Collector collector;
+  if (address.size() == sizeof(openflow::Ipv6Address)) {
+    copy_into(address, collector.address.emplace<openflow::Ipv6Address>());
+  } else {
+    copy_into(address, std::get<openflow::Ipv4Address>(collector.address));
+  }
+  return collector;
+}
+
 // A device that a session names, by its port or as an uplink.
 struct Place {
   openflow::Port port;
@@ -146,16 +162,16 @@ class Sessions {
     if (!underlay) {
       refuse_session("mirrors to an address, and the host has no underlay");
     }
-    Collector collector;
     auto const address = mirror::Address::bytes(entity);
-    if (address.size() != collector.address.size() || underlay->address.size() != address.size()) {
-      refuse_session(
-          "mirrors to an address of IPv6, or over an underlay of IPv6, which is not done here");
+    if (underlay->address.size() != address.size()) {
+      refuse_session(address.size() == sizeof(openflow::Ipv4Address)
+                         ? "mirrors to an address of IPv4, and the underlay has one of IPv6"
+                         : "mirrors to an address of IPv6, and the underlay has one of IPv4");
     }
     if (address == underlay->address) {
       refuse_session("mirrors to the address of this host");
     }
-    std::memcpy(collector.address.data(), address.data(), address.size());
+    auto const collector = collector_at(address);
     if (std::ranges::find(mirror.collectors, collector) == mirror.collectors.end()) {
       mirror.collectors.push_back(collector);
     }

@@ -316,7 +316,7 @@ class Story {
     steps_before_output_ = steps_.size();
     left_before_ = left_;
     bool const is_wrapped = port == kGrePort || port == kErspanPort;
-    auto const to = is_wrapped ? Station{.name = wrapped_["tun_dst"], .is_uplink = false}
+    auto const to = is_wrapped ? Station{.name = collector(), .is_uplink = false}
                                : names_.station(static_cast<openflow::Port>(port));
     auto const tags = tags_in_words(vlans_);
     if (kind_of(line.cookie) == Counted::mirrored) {
@@ -356,6 +356,12 @@ class Story {
       say(Kind::passes, "has its source learned at " + in_words(entry_.station),
           {entry_.station.name, "mac_learning"});
     }
+  }
+
+  // Of one family, as all of a host are.
+  [[nodiscard]] std::string collector() {
+    auto const of_ipv6 = wrapped_.find("tun_ipv6_dst");
+    return of_ipv6 == wrapped_.end() ? wrapped_["tun_dst"] : of_ipv6->second;
   }
 
   // What was said of the copy before it went to the port that wraps it.

@@ -4,6 +4,7 @@
 
 #include <set>
 #include <utility>
+#include <variant>
 
 #include "planes/openvswitch/compile/stages/stages.h"
 
@@ -113,7 +114,10 @@ Actions copies_to(Mirror const &mirror, Actions const &outputs, Tagged *tagged) 
 
 // What a port that wraps frames takes of each of them, beside its bytes.
 Actions wrapping(Mirror const &mirror, Collector const &collector, Copied where) {
-  Actions actions{openflow::set(Field::tun_dst, openflow::to_value(collector.address)),
+  bool const is_ipv6 = std::holds_alternative<openflow::Ipv6Address>(collector.address);
+  auto const address =
+      std::visit([](auto const &bytes) { return openflow::to_value(bytes); }, collector.address);
+  Actions actions{openflow::set(is_ipv6 ? Field::tun_ipv6_dst : Field::tun_dst, address),
                   openflow::set(Field::tun_id, mirror.key)};
   if (mirror.wrapping == Wrapping::erspan2) {
     actions.emplace_back(openflow::set(Field::tun_erspan_ver, 1));
