@@ -9,7 +9,7 @@ import sys
 import time
 from contextlib import suppress
 from pathlib import Path
-from typing import Any, Callable, Dict, Iterator, List, Set, Tuple
+from typing import Any, Callable, Dict, List, Set, Tuple
 
 import pytest
 from ovs.jsonrpc import Message
@@ -33,19 +33,6 @@ from vswitch.fabric._cluster import Cluster
 from vswitch.fabric._errors import TransactionRefused
 from vswitch.fabric._server import News, Server
 from vswitch.words import DocumentError
-
-
-@pytest.fixture
-def databases(tmp_path: Path) -> Iterator[Databases]:
-    with FabricLab(tmp_path) as lab:
-        populate(lab.databases)
-        yield lab.databases
-
-
-@pytest.fixture
-def fabric(databases: Databases) -> Iterator[Fabric]:
-    with Fabric(databases.local_addresses) as fabric:
-        yield fabric
 
 
 def mtu(fabric: Fabric) -> Any:

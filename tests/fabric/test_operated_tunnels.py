@@ -1,14 +1,14 @@
 """The tunnels of switches that hosts share, in the hands of an operator."""
 
 from pathlib import Path
-from typing import Any, Dict, Iterator
+from typing import Any, Dict
 
 import pytest
 
 from fabric_lab import Databases, FabricLab, started
 from frame_lab import comes_true
 from libvswitch.errors import Busy
-from operating import Operator, of_lab, populate
+from operating import Operator, of_lab
 from vswitch.fabric import Fabric
 from vswitch.words import DocumentError
 
@@ -17,19 +17,6 @@ TUNNELS: Dict[str, Any] = {
     "key": 4711,
     "peers": ["192.0.2.1", "192.0.2.2", "2001:db8::2"],
 }
-
-
-@pytest.fixture
-def databases(tmp_path: Path) -> Iterator[Databases]:
-    with FabricLab(tmp_path) as lab:
-        populate(lab.databases)
-        yield lab.databases
-
-
-@pytest.fixture
-def fabric(databases: Databases) -> Iterator[Fabric]:
-    with Fabric(databases.local_addresses) as fabric:
-        yield fabric
 
 
 def test_a_document_says_them(databases: Databases, fabric: Fabric) -> None:
