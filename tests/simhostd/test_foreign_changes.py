@@ -14,7 +14,7 @@ from simhost import frame
 
 
 # The tables that a switch fills by itself, with the kind that their cookies begin with.
-SELF_FILLED = {31: 0x0D, 32: 0x0C, 33: 0x0E, 34: 0x0F}
+SELF_FILLED = {31: 0x0D, 32: 0x0C, 33: 0x0E, 34: 0x0F, 42: 0x20}
 
 
 def _is_in(flow: str, table: int) -> bool:
@@ -126,9 +126,22 @@ def test_who_says_nothing_is_reached_after_it(lab: Lab, words: List[str]) -> Non
     assert comes_true(lambda: meddler.learned(31) == before)
 
 
+def test_who_may_forge_nothing_sends_after_it(idle: Lab) -> None:
+    """Also where no daemon saw that the bridge lost its client's address."""
+    with LastingOpenVSwitch(idle.host, idle.run_folder()) as open_vswitch:
+        idle.start(open_vswitch.where)
+        idle.set_port("lab", "a", forbids=["forged_transmits"])
+        one, other = idle.client("lab", "a"), idle.client("lab", "b")
+        assert one.comes_to_reach(other)
+        idle.stop()
+        Meddler(idle).ofctl("del-flows", f"table=31,dl_dst={one.mac}")
+        idle.start(open_vswitch.where)
+        assert one.comes_to_reach(other)
+
+
 def has_learned_all(meddler: Meddler, table: int) -> bool:
-    """Whether all that is in the table looks at an address, as what is learned does."""
-    return all(",dl_" in flow for flow in meddler.learned(table))
+    """Whether all that is in the table looks at an address or a port, as what is learned does."""
+    return all(",dl_" in flow or ",in_port=" in flow for flow in meddler.learned(table))
 
 
 def test_what_nobody_learned_goes(busy: Lab, meddler: Meddler) -> None:
@@ -137,13 +150,19 @@ def test_what_nobody_learned_goes(busy: Lab, meddler: Meddler) -> None:
     of_another_port = "cookie={}abcdef,priority=100,actions=drop"
     # There are no words for this field here.
     of_the_first_port = "cookie={}000003,priority=100,ct_state=-trk,actions=drop"
-    planted = {31: somebodys, 32: of_another_port, 34: of_the_first_port, 33: somebodys}
+    planted = {
+        31: somebodys,
+        32: of_another_port,
+        34: of_the_first_port,
+        33: somebodys,
+        42: somebodys,
+    }
     for table, said in planted.items():
         flow = said.format(f"{SELF_FILLED[table]:#x}00000000")
         meddler.ofctl("add-flow", f"table={table},{flow}")
         assert comes_true(partial(has_learned_all, meddler, table))
     said = f"somebody else changed flows or groups of the bridge {meddler.bridge}"
-    assert busy.log().count(said) == 3
+    assert busy.log().count(said) == 4
 
 
 def test_a_meter_goes(meddler: Meddler) -> None:

@@ -74,6 +74,24 @@ openvswitch::Difference difference_between(openvswitch::Compiled const &present,
              : openvswitch::difference(present.flows, present.groups, wanted.flows, wanted.groups);
 }
 
+// Of ports that are said to have a first address, and have none: their clients could send nothing.
+std::vector<openvswitch::LearnedFlows> without_first_address(std::span<Flow const> learned) {
+  std::set<std::uint32_t> have;
+  for (auto const &flow : learned) {
+    if (flow.table == openvswitch::table::kFirstAddresses) {
+      have.insert(openvswitch::number_of(flow.cookie));
+    }
+  }
+  std::vector<openvswitch::LearnedFlows> without;
+  for (auto const &flow : learned) {
+    if (flow.table == openvswitch::table::kPortsWithFirst &&
+        !have.contains(openvswitch::number_of(flow.cookie))) {
+      without.push_back({.table = flow.table, .cookie = flow.cookie});
+    }
+  }
+  return without;
+}
+
 // Another client may have come with a device, with an address of its own.
 std::vector<openvswitch::LearnedFlows> first_addresses(WantedBridge const &wanted,
                                                        std::set<std::string> const &added) {
@@ -153,6 +171,7 @@ void RunningBridge::take(openflow::Contents contents) {
       learned.push_back(std::move(update.flow));
     }
     memory_.replace(key_, learned);
+    std::ranges::copy(without_first_address(learned), std::back_inserter(unplaced_));
   }
 }
 
